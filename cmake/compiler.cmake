@@ -1,0 +1,24 @@
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+find_package(Threads REQUIRED)
+
+find_program(CCACHE_PROGRAM ccache)
+if(CCACHE_PROGRAM)
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CCACHE_PROGRAM})
+endif()
+
+# The flags of every target of the project.
+add_library(zrm_flags INTERFACE)
+target_compile_options(zrm_flags INTERFACE -Wall -Wextra -Wpedantic -Wconversion -Werror)
+target_link_libraries(zrm_flags INTERFACE Threads::Threads)
+
+if(ZRM_SANITIZE)
+  add_compile_options(-fsanitize=${ZRM_SANITIZE} -fno-omit-frame-pointer)
+  add_link_options(-fsanitize=${ZRM_SANITIZE})
+  if(ZRM_SANITIZE MATCHES undefined)
+    add_compile_options(-fno-sanitize-recover=undefined)
+  endif()
+endif()

@@ -1,0 +1,29 @@
+#ifndef ZRM_HOST_CONTEXT_INFO_H
+#define ZRM_HOST_CONTEXT_INFO_H
+
+class ctreq;
+
+/// Receives what a request dispatches. For a situation this is called on a log's thread under the
+/// table manager's lock and may wait while the event queue is full; for a report on the thread
+/// that takes the sample.
+class RowReceiver {
+public:
+    virtual ~RowReceiver() = default;
+    /// Takes `count` rows (back to back, request.rowSize bytes each); copies what it keeps.
+    /// Returns 0 or a status.
+    virtual unsigned receive(const ctreq& request, const char* rows, unsigned count) = 0;
+    /// The agent has marked the request as stopped (reason of ctreq::Stopped).
+    virtual void stopped(const ctreq& request, unsigned reason) = 0;
+};
+
+/// The surroundings of a request: where its rows go. Outlives the request.
+class ContextInfo {
+public:
+    explicit ContextInfo(RowReceiver& receiver) : m_receiver(receiver) {}
+    RowReceiver& receiver() const noexcept { return m_receiver; }
+
+private:
+    RowReceiver& m_receiver;
+};
+
+#endif

@@ -1,0 +1,1 @@
+// The host implementation of trace.h.

@@ -1,0 +1,22 @@
+#ifndef ZRM_ERROR_TEXT_H
+#define ZRM_ERROR_TEXT_H
+
+/// The number and text of a system error, for the "errno = %d; %s" and "Return code = %d; %s" of
+/// messages. Unlike strerror it shares no buffer between threads. The text is "Unknown error"
+/// where the system has none.
+class ErrorText {
+public:
+    /// `number` is errno or the return code of a thread call; pass errno at once, before another
+    /// call can change it.
+    explicit ErrorText(int number) noexcept;
+
+    int number() const noexcept { return m_number; }
+    const char* text() const noexcept { return m_text; }
+
+private:
+    int m_number;
+    const char* m_text;
+    char m_buffer[128];
+};
+
+#endif

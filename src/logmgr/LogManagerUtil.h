@@ -1,0 +1,24 @@
+#ifndef ZRM_LOG_MANAGER_UTIL_H
+#define ZRM_LOG_MANAGER_UTIL_H
+
+#include <cstddef>
+#include <ctime>
+
+/// Helpers of the log manager.
+namespace LogManagerUtil {
+
+/// Modification time (seconds since the epoch) of a regular file; 0 when there is no such file.
+std::time_t fileLastModified(const char* path);
+
+/// Returns the next record of a configuration file, without leading white space and newline, or
+/// null at its end. The record lies in a process-wide buffer until the next call; while a file is
+/// open, `path` only names it in messages. Manager thread only.
+char* getNextRec(const char* path);
+
+/// Hexadecimal dump for traces; `out` holds 2 * length + 1 bytes. Always gives the empty text,
+/// since the output position is never advanced. Returns `out`.
+char* xtoa(char* out, const void* data, std::size_t length);
+
+} // namespace LogManagerUtil
+
+#endif

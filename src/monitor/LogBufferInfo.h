@@ -1,0 +1,17 @@
+#ifndef ZRM_LOG_BUFFER_INFO_H
+#define ZRM_LOG_BUFFER_INFO_H
+
+#include <cstdint>
+
+/// The reading state of one report that reads a log backwards, block by block. Owned by the log
+/// type's report state. The descriptor stands at the start of the block last read (at the file's
+/// end right after opening).
+struct _LogBufferInfo {
+    char* pBuffer;            ///< the block, owned by the log type
+    std::int64_t bytesLeft;   ///< bytes in front of the block that are still unread
+    std::int64_t bufferCount; ///< after a fill the bytes read; before the next one the bytes at
+                              ///< the block's start that were not consumed, to be pushed back
+    std::int32_t fd;          ///< the report's descriptor; -1: none
+};
+
+#endif

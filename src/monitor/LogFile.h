@@ -1,0 +1,111 @@
+#ifndef ZRM_LOG_FILE_H
+#define ZRM_LOG_FILE_H
+
+#include "logmgr/LogBase.h"
+#include "monitor/LogBufferInfo.h"
+#include "monitor/MonitorStatus.h"
+
+#include <atomic>
+#include <cstdint>
+#include <cstdio>
+#include <ctime>
+
+#include <pthread.h>
+#include <sys/time.h>
+
+class ValidLog;
+struct zrm_rmlogent_data_t;
+
+/// One monitored log with one thread of its own, which tails it and turns new entries into Log
+/// Entries rows; reports read it backwards on the threads of their requests. The log manager's
+/// thread constructs, reconfigures and destroys it. The log types derive from it: their
+/// constructors end with startThread, their destructors begin with stopThread.
+class LogFile : public LogBase {
+public:
+    /// Copies the configuration line and joins the chain of logs behind `chainHead` (null: none).
+    LogFile(const ValidLog& log, LogFile* chainHead);
+    LogFile(const LogFile&) = delete;
+    /// Takes over the debug mode of a changed line and restarts a monitor that is not running.
+    LogFile& operator=(const ValidLog& log);
+
+    // The virtual operations stand in slot order.
+
+    ~LogFile() override;
+    /// Ends a report, frees its state and clears the caller's pointer.
+    virtual void endReportRequest(void** reportState) = 0;
+    /// Fills `row` (zrm_rmlogent_data_t*) with the next older entry within the thresholds
+    /// (_RequestThresholds*) and returns it; null at the report's end.
+    virtual void* getNextLogEntry(void* row, void* reportState, void* thresholds) = 0;
+    /// Opens the log for a report over the thresholds (_RequestThresholds*) and returns the
+    /// report's state; null when the report cannot start.
+    virtual void* startReportRequest(void* thresholds) = 0;
+    /// Fills one row from one entry, a terminated line or one record; `context` is the report's
+    /// state, null while monitoring. 0 when the row is built, non-zero when the entry is rejected.
+    virtual long formatEntryAsRow(char* entry, void* row, void* context) = 0;
+    /// The body of the monitoring thread: open, seek to the end, wait loop, close.
+    virtual void processLogData() = 0;
+    /// Consumes everything between LogEOF and the end of the file; 0, or -1 on a read error.
+    virtual long readLog();
+
+    void startThread();
+    /// Ends the monitoring thread and joins it; at once when no thread was ever started.
+    void stopThread();
+    void setMonitorStatus(_MonitorStatus status);
+    /// Copies the status text, at most `bufferLength` bytes, without a terminator. Any thread.
+    void getMonitorStatus(char* buffer, long bufferLength) const;
+    void printSelf() const;
+
+    // Read by the tables on their own threads.
+    _MonitorStatus monitorStatus() const noexcept { return MonitorStatus.load(); }
+    std::int64_t numEvents() const noexcept { return NumEvents.load(); }
+    std::int64_t numFormatErrors() const noexcept { return NumFormatErrors.load(); }
+    std::time_t monitorStartStopTime() const noexcept { return MonitorStartStopTime.load(); }
+
+    // The log manager's mark of logs that a new configuration no longer names.
+    bool isMarked() const noexcept { return RefreshMode; }
+    void setMarked(bool marked) noexcept { RefreshMode = marked; }
+
+    LogFile* next() const noexcept { return static_cast<LogFile*>(Next); }
+
+protected:
+    void lockLog() const;
+    void unlockLog() const;
+    void openLogAndSeek();
+    void closeLog();
+    void waitForEventLoop(timeval interval);
+    void fillCommonColumns(zrm_rmlogent_data_t* row) const;
+
+    // The debug log, shared by all logs.
+    static void lockDebugFile(const char* who);
+    static void unlockDebugFile();
+    void writeToDebugLog(const void* data1, unsigned long length1, const void* data2,
+                         unsigned long length2);
+
+    // Reading backwards for reports, on the request's thread.
+    unsigned char determineOptimumBlockSize();
+    long openLogForReport(_LogBufferInfo* info);
+    long fillReportBuffer(_LogBufferInfo* info);
+    void closeLogForReport(int fd);
+
+    bool RefreshMode = false;
+    std::FILE* LogFileP = nullptr;
+    std::atomic<_MonitorStatus> MonitorStatus{MONITOR_NOT_STARTED};
+    std::int64_t LogEOF = -1;
+    pthread_t LogThread{};
+    mutable pthread_mutex_t LogLock;
+    int LogFD = -1;
+    std::atomic<std::int64_t> NumEvents{0};
+    std::atomic<std::int64_t> NumFormatErrors{0};
+    std::atomic<std::time_t> MonitorStartStopTime;
+    std::atomic<std::int64_t> OptimumBlockSize{0};
+
+    static pthread_mutex_t m_debugFileLock;
+
+private:
+    friend void* logThread(void* logFile);
+};
+
+/// The monitoring thread's start routine; its argument is the LogFile.
+void* logThread(void* logFile);
+
+#endif

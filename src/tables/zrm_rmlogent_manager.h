@@ -1,0 +1,25 @@
+#ifndef ZRM_RMLOGENT_MANAGER_H
+#define ZRM_RMLOGENT_MANAGER_H
+
+#include "agent/framework/TableManager.h"
+#include "tables/zrm_rmlogent_data.h"
+
+/// Manager of the Log Entries table: creates its request objects and hands fresh rows to every
+/// open situation. One per process, never destroyed.
+class zrm_rmlogent_manager : public TableManager {
+public:
+    zrm_rmlogent_manager(const char* application, const char* table);
+    ctreq* CreateCtreq(RequestDetail* detail, ContextInfo* context) override;
+
+    /// Hands `count` fresh rows, back to back, to every open situation; called by the threads of
+    /// all logs. The thresholds' columns of the rows are written in place. Returns 0, or the last
+    /// non-zero status of a dispatch; 0 and nothing else before the table was registered.
+    static unsigned EventArrived(zrm_rmlogent_data_t* rows, int count);
+
+    unsigned AddDataToEvent(zrm_rmlogent_data_t* rows, int count);
+};
+
+/// Creates and registers the table's manager. Returns 0 or a framework status.
+unsigned zrm_rmlogent_init();
+
+#endif
