@@ -1,0 +1,323 @@
+"""The real agent, run from outside: processes, files and signals."""
+
+import json
+import os
+import re
+import signal
+import subprocess
+import threading
+import time
+from pathlib import Path
+
+import pytest
+
+ROOT = Path(__file__).resolve().parents[2]
+PROGRAM = os.environ.get("ZRM_AGENT", str(ROOT / "build/dev/bin/zrmagent"))
+
+# Sanitized programs on a busy machine are slow; a test that passes never waits this long.
+PATIENCE = 60
+
+SANITIZER = re.compile(
+    r"ERROR: AddressSanitizer|ERROR: LeakSanitizer|WARNING: ThreadSanitizer|runtime error:"
+)
+
+# The variables that steer the agent; a test sets those that it means.
+AGENT_VARIABLES = (
+    "ZRM_CONFIG_FILE",
+    "ZRM_SYSLOG_CONF",
+    "AGENT_DEBUG_LOG",
+    "ZRM_MAX_ROWS",
+    "CTREQ_NODETYPE",
+    "QFW_TRC1",
+)
+
+# Errors of every unit, and what the log manager says of its decisions.
+DEFAULT_TRACE = "error,LogManager=error+detail"
+
+
+def wait_until(condition, what, seconds=PATIENCE):
+    """Polls until `condition()` is true and returns its value; fails the test after the limit."""
+    deadline = time.monotonic() + seconds
+    while True:
+        value = condition()
+        if value:
+            return value
+        if time.monotonic() > deadline:
+            pytest.fail(f"waited {seconds} s for {what() if callable(what) else what}")
+        time.sleep(0.02)
+
+
+class Lines:
+    """The lines of one output of a process, collected by a thread until its end."""
+
+    def __init__(self, stream):
+        self._lines = []
+        self._stream = stream
+        self._thread = threading.Thread(target=self._collect, daemon=True)
+        self._thread.start()
+
+    def _collect(self):
+        for line in self._stream:
+            self._lines.append(line.rstrip(b"\n"))
+
+    def __call__(self):
+        return list(self._lines)
+
+    def text(self):
+        return b"\n".join(self._lines).decode("utf-8", "replace")
+
+    def finish(self):
+        self._thread.join(PATIENCE)
+        self._stream.close()
+
+
+class Log:
+    """A monitored log file."""
+
+    def __init__(self, path):
+        self.path = Path(path)
+
+    def __str__(self):
+        return str(self.path)
+
+    def append(self, data):
+        """One write, so that the agent sees all of it or nothing."""
+        data = data.encode() if isinstance(data, str) else data
+        with open(self.path, "ab", buffering=0) as stream:
+            stream.write(data)
+
+
+def syslog_line(message, source="app[1]", host="web1", when=None):
+    stamp = time.strftime("%b %e %H:%M:%S", when or time.localtime())
+    return f"{stamp} {host} {source}: {message}\n"
+
+
+class Agent:
+    """One zrmagent in a directory of its own: configuration, process, outputs."""
+
+    def __init__(self, directory):
+        self.directory = Path(directory)
+        self.logs_conf = self.directory / "logs.conf"
+        self.zrm_toml = self.directory / "zrm.toml"
+        self.syslog_conf = self.directory / "syslog.conf"
+        self.environment = {}
+        self.situations = []
+        self.sink = "-"
+        self.extra_toml = ""
+        self.agent_keys = {}
+        self.process = None
+        self.stdout = None
+        self.stderr = None
+
+    # ------------------------------------------------------------------ configuration
+
+    def log(self, name="app.log", content=b"Jan  1 00:00:00 web1 old: before the start\n", fields=""):
+        """Makes a log file and its configuration line. It has an old line unless told otherwise."""
+        log = Log(self.directory / name)
+        log.path.write_bytes(content)
+        self.configure(f"{log} {fields}".rstrip(), append=True)
+        return log
+
+    def configure(self, *lines, append=False):
+        """Writes configuration lines; a changed file always has a changed modification time."""
+        before = self.logs_conf.stat().st_mtime if self.logs_conf.exists() else None
+        with open(self.logs_conf, "a" if append else "w", encoding="utf-8") as stream:
+            stream.writelines(line + "\n" for line in lines)
+        if before is not None:
+            os.utime(self.logs_conf, (before + 2, before + 2))
+
+    def situation(self, name="every-entry", log=None, when=(), **keys):
+        """A situation on a log; every entry of it unless told otherwise."""
+        keys = {"name": name, "text": name, "severity": "info", **keys}
+        if log is not None:
+            keys["log"] = str(log)
+        if when:
+            keys["when"] = list(when)
+        self.situations.append(keys)
+
+    def _write_toml(self):
+        keys = {"log_config": str(self.logs_conf), "syslog_conf": str(self.syslog_conf)}
+        keys.update(self.agent_keys)
+        text = "[agent]\n"
+        text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
+        text += self.extra_toml
+        if self.sink is not None:
+            text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
+        for situation in self.situations:
+            text += "\n[[situation]]\n"
+            text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in situation.items())
+        self.zrm_toml.write_text(text, encoding="utf-8")
+
+    # ------------------------------------------------------------------ process
+
+    def start(self, *arguments, trace=DEFAULT_TRACE, wait=True, preload=None):
+        """Starts the agent and waits until it serves and every configured log is open."""
+        self._write_toml()
+        environment = {k: v for k, v in os.environ.items() if k not in AGENT_VARIABLES}
+        environment["QFW_TRC1"] = trace
+        environment.update(self.environment)
+        if preload is not None:
+            environment["LD_PRELOAD"] = str(preload)
+        self.process = subprocess.Popen(
+            [PROGRAM, "--config", str(self.zrm_toml), *arguments],
+            stdin=subprocess.DEVNULL,
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            cwd=self.directory,
+            env=environment,
+        )
+        self.stdout = Lines(self.process.stdout)
+        self.stderr = Lines(self.process.stderr)
+        if wait:
+            self.wait_trace("Agent server is listening; signal sent.")
+            for line in self.logs_conf.read_text(encoding="utf-8").splitlines():
+                if line.startswith("/") and os.access(line.split()[0], os.R_OK):
+                    self.wait_open(line.split()[0])
+        return self
+
+    def running(self):
+        return self.process.poll() is None
+
+    def signal(self, number):
+        self.process.send_signal(number)
+
+    def refresh(self):
+        self.signal(signal.SIGHUP)
+
+    def wait_end(self, seconds=PATIENCE):
+        """Waits for the process's end by itself; its exit status, negative for a signal."""
+        try:
+            self.process.wait(seconds)
+        except subprocess.TimeoutExpired:
+            pytest.fail(f"the agent did not end within {seconds} s\n{self.stderr.text()[-3000:]}")
+        self.stdout.finish()
+        self.stderr.finish()
+        return self.process.returncode
+
+    def stop(self, number=signal.SIGTERM):
+        """Stops the agent; its exit status."""
+        self.signal(number)
+        return self.wait_end()
+
+    def dispose(self):
+        if self.process is not None and self.process.poll() is None:
+            self.process.kill()
+            self.wait_end()
+
+    # ------------------------------------------------------------------ waiting
+
+    def _describe(self):
+        tail = self.stderr.text()[-3000:]
+        return f"{len(self.events())} events so far; standard error ends:\n{tail}"
+
+    def _alive_until(self, condition, what, seconds):
+        def check():
+            value = condition()
+            if not value and not self.running():
+                self.stdout.finish()
+                self.stderr.finish()
+                value = condition()
+                if not value:
+                    pytest.fail(f"the agent ended before {what}: {self._describe()}")
+            return value
+
+        return wait_until(check, lambda: f"{what}: {self._describe()}", seconds)
+
+    def wait_trace(self, text, count=1, seconds=PATIENCE):
+        """Waits until `count` lines of standard error contain the text; those lines."""
+
+        def found():
+            lines = self.trace(text)
+            return lines if len(lines) >= count else None
+
+        return self._alive_until(found, f"{count} times {text!r} on standard error", seconds)
+
+    def trace(self, text=""):
+        """The lines of standard error so far that contain the text."""
+        lines = (line.decode("utf-8", "replace") for line in self.stderr())
+        return [line for line in lines if text in line]
+
+    def events(self):
+        """The events so far: of standard output, or of the sink's file."""
+        if self.sink in ("-", None):
+            lines = self.stdout()
+        else:
+            path = Path(self.sink)
+            data = path.read_bytes() if path.is_file() else b""
+            lines = data.split(b"\n")[:-1]
+        return [json.loads(line) for line in lines]
+
+    def wait_events(self, count, seconds=PATIENCE):
+        """Waits for at least `count` events; all events so far."""
+
+        def arrived():
+            events = self.events()
+            return events if len(events) >= count else None
+
+        return self._alive_until(arrived, f"{count} events", seconds)
+
+    def wait_open(self, path):
+        """Waits until the agent has the file open and stands at its end: it monitors from here."""
+        path = os.path.realpath(str(path))
+
+        def at_end():
+            size = os.path.getsize(path)
+            for position in self._positions(path):
+                if position == size:
+                    return True
+            return False
+
+        self._alive_until(at_end, f"{path} open at its end", PATIENCE)
+        if os.path.getsize(path) == 0:
+            time.sleep(0.3)  # from outside, a seek to the end of nothing cannot be seen
+
+    def _positions(self, path):
+        """The read positions of the agent's descriptors of a file."""
+        descriptors = Path(f"/proc/{self.process.pid}/fd")
+        try:
+            names = list(descriptors.iterdir())
+        except OSError:
+            return
+        for name in names:
+            try:
+                if os.readlink(name) == path:
+                    text = Path(f"/proc/{self.process.pid}/fdinfo/{name.name}").read_text()
+                    yield int(re.search(r"^pos:\s*(\d+)", text, re.M).group(1))
+            except OSError:
+                continue
+
+    def is_open(self, path):
+        return any(True for _ in self._positions(os.path.realpath(str(path))))
+
+    def resident_kilobytes(self):
+        status = Path(f"/proc/{self.process.pid}/status").read_text()
+        return int(re.search(r"^VmRSS:\s*(\d+)", status, re.M).group(1))
+
+
+def descriptions(events):
+    return [event["row"]["ENTRYDESC"] for event in events]
+
+
+@pytest.fixture
+def agents(tmp_path):
+    """Makes agents, and sees that none outlives its test or leaves a sanitizer's finding."""
+    made = []
+
+    def make():
+        directory = tmp_path / f"agent{len(made)}"
+        directory.mkdir()
+        made.append(Agent(directory))
+        return made[-1]
+
+    yield make
+    for agent in made:
+        agent.dispose()
+    for agent in made:
+        if agent.stderr is not None:
+            text = agent.stderr.text()
+            assert not SANITIZER.search(text), text[-6000:]
+
+
+@pytest.fixture
+def agent(agents):
+    return agents()
