@@ -3,11 +3,11 @@
 import json
 import os
 import re
-import signal
 import subprocess
 import threading
 import time
 from pathlib import Path
+from signal import SIGHUP, SIGTERM
 
 import pytest
 
@@ -178,11 +178,11 @@ class Agent:
     def running(self):
         return self.process.poll() is None
 
-    def signal(self, number):
+    def send(self, number):
         self.process.send_signal(number)
 
     def refresh(self):
-        self.signal(signal.SIGHUP)
+        self.send(SIGHUP)
 
     def wait_end(self, seconds=PATIENCE):
         """Waits for the process's end by itself; its exit status, negative for a signal."""
@@ -194,9 +194,9 @@ class Agent:
         self.stderr.finish()
         return self.process.returncode
 
-    def stop(self, number=signal.SIGTERM):
+    def stop(self, number=SIGTERM):
         """Stops the agent; its exit status."""
-        self.signal(number)
+        self.send(number)
         return self.wait_end()
 
     def dispose(self):
