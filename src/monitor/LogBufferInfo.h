@@ -12,6 +12,9 @@ struct _LogBufferInfo {
     std::int64_t bufferCount; ///< after a fill the bytes read; before the next one the bytes at
                               ///< the block's start that were not consumed, to be pushed back
     std::int32_t fd;          ///< the report's descriptor; -1: none
+    /// Bytes that pBuffer has room for, without the terminator; 0: the log's OptimumBlockSize.
+    /// Another report may change that size while this one reads.
+    std::int64_t blockSize = 0;
 };
 
 #endif

@@ -2,6 +2,7 @@
 #define ZRM_LOG_FILE_H
 
 #include "logmgr/LogBase.h"
+#include "monitor/LineReader.h"
 #include "monitor/LogBufferInfo.h"
 #include "monitor/MonitorStatus.h"
 
@@ -88,12 +89,13 @@ protected:
     void closeLogForReport(int fd);
 
     bool RefreshMode = false;
-    std::FILE* LogFileP = nullptr;
+    // The thread owns the open file and the counters; a dump may read them on another thread.
+    std::atomic<std::FILE*> LogFileP{nullptr};
     std::atomic<_MonitorStatus> MonitorStatus{MONITOR_NOT_STARTED};
-    std::int64_t LogEOF = -1;
+    std::atomic<std::int64_t> LogEOF{-1};
     pthread_t LogThread{};
     mutable pthread_mutex_t LogLock;
-    int LogFD = -1;
+    std::atomic<int> LogFD{-1};
     std::atomic<std::int64_t> NumEvents{0};
     std::atomic<std::int64_t> NumFormatErrors{0};
     std::atomic<std::time_t> MonitorStartStopTime;
@@ -103,6 +105,14 @@ protected:
 
 private:
     friend void* logThread(void* logFile);
+
+    void initializeLock();
+    bool checkForChange();
+    bool readGrowth();
+    void pushBack(_LogBufferInfo* info);
+
+    LineReader m_lineReader;  ///< the thread's
+    bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
 };
 
 /// The monitoring thread's start routine; its argument is the LogFile.

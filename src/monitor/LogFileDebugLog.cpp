@@ -1,0 +1,92 @@
+#include "monitor/LogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "agent/zrmmain.h"
+#include "logmgr/LogManager.h"
+
+#include <cerrno>
+#include <cstdlib>
+
+// The debug log that all logs share: every entry as it was read, and the row built from it.
+
+namespace {
+
+TRC1_Anchor anchor{"LogFileDebugLog.cpp"};
+
+std::int64_t numRecords = 0; // guarded by m_debugFileLock
+
+/// One piece of a record and a newline behind it; false when nothing of it could be written.
+bool writePiece(std::FILE* stream, const void* data, unsigned long length) {
+    if (std::fwrite(data, 1, length, stream) == 0) {
+        return false;
+    }
+    std::fputc('\n', stream);
+    return true;
+}
+
+} // namespace
+
+pthread_mutex_t LogFile::m_debugFileLock = PTHREAD_MUTEX_INITIALIZER;
+
+void LogFile::lockDebugFile(const char* who) {
+    TraceScope trace(anchor);
+    if (const int code = pthread_mutex_lock(&m_debugFileLock)) {
+        const ErrorText error(code);
+        trace.error()("Error locking mutex for debug file by %s. Return code = %d; %s.  Use the "
+                      "return code and message to investigate the failure.  Agent is terminating.",
+                      who, error.number(), error.text());
+        std::exit(-1);
+    }
+    trace.detail()("Debug file mutex locked by %s.", who);
+}
+
+void LogFile::unlockDebugFile() {
+    TraceScope trace(anchor);
+    if (const int code = pthread_mutex_unlock(&m_debugFileLock)) {
+        const ErrorText error(code);
+        trace.error()("Error unlocking mutex for debug file.  Return code = %d; %s.  Use the "
+                      "return code and message to investigate the failure.  Agent is terminating.",
+                      error.number(), error.text());
+        std::exit(-1);
+    }
+    trace.detail()("Debug file mutex unlocked.");
+}
+
+void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const void* data2,
+                              unsigned long length2) {
+    TraceScope trace(anchor);
+    int result = 0;
+    int cause = 0;
+    std::FILE* const stream = debugMode() == 'Y' && pTheLogManager != nullptr
+                                  ? pTheLogManager->debugLogStream()
+                                  : nullptr;
+    if (stream != nullptr) {
+        lockDebugFile(fileNameLocal());
+        std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
+                     " <<<<<<<<<\n");
+        const auto write = [&](const void* data, unsigned long length) {
+            if (data == nullptr || length == 0 || result == -1) {
+                return;
+            }
+            if (writePiece(stream, data, length)) {
+                ++result;
+            } else {
+                cause = errno;
+                result = -1;
+            }
+        };
+        write(data1, length1);
+        write(data2, length2);
+        unlockDebugFile();
+    }
+    if (result == -1) {
+        const ErrorText error(cause);
+        trace.error()("Error writing %s entry to debug log.  errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+    } else if (result > 0) {
+        trace.detail()("Record written to debug log for log %s.", fileNameLocal());
+    } else {
+        trace.detail()("%s monitor detected event.", fileNameLocal());
+    }
+}

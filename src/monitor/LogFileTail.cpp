@@ -1,0 +1,150 @@
+#include "monitor/LogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "tables/zrm_rmlogent_data.h"
+#include "tables/zrm_rmlogent_manager.h"
+
+#include <cerrno>
+#include <cstring>
+
+#include <fcntl.h>
+#include <sys/select.h>
+#include <unistd.h>
+
+// Following a log's growth, on the log's own thread.
+
+namespace {
+
+TRC1_Anchor anchor{"LogFileTail.cpp"};
+
+/// Counts without a locked instruction: only the log's thread writes the counter.
+void count(std::atomic<std::int64_t>& counter) {
+    counter.store(counter.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
+}
+
+} // namespace
+
+void LogFile::openLogAndSeek() {
+    TraceScope trace(anchor);
+    LogFileP = std::fopen(fileNameLocal(), "r");
+    if (LogFileP == nullptr) {
+        const ErrorText error(errno);
+        trace.error()("Error opening file %s.  errno = %d; %s", fileNameLocal(), error.number(),
+                      error.text());
+        setMonitorStatus(MONITOR_ERR_OPEN);
+        return;
+    }
+    LogFD = fileno(LogFileP);
+    fcntl(LogFD, F_SETFD, FD_CLOEXEC); // not for the commands that other logs run
+    LogEOF = lseek(LogFD, 0, SEEK_END);
+    if (LogEOF < 0) {
+        const ErrorText error(errno);
+        trace.error()("Error while seeking EOF for file %s.  errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+        closeLog();
+        setMonitorStatus(MONITOR_ERR_SEEK_EOF);
+    }
+}
+
+void LogFile::closeLog() {
+    TraceScope trace(anchor);
+    std::fclose(LogFileP);
+    LogFileP = nullptr;
+    LogFD = -1;
+    LogEOF = -1;
+    m_lineReader.release();
+}
+
+void LogFile::waitForEventLoop(timeval interval) {
+    TraceScope trace(anchor);
+    fd_set none;
+    FD_ZERO(&none);
+    while (monitorStatus() == MONITOR_RUNNING) {
+        if (!checkForChange()) {
+            return;
+        }
+        timeval timeOut = interval;
+        fd_set readable = none;
+        fd_set writable = none;
+        fd_set exceptional = none;
+        if (select(0, &readable, &writable, &exceptional, &timeOut) < 0 && errno != EINTR) {
+            const ErrorText error(errno);
+            trace.error()("Error occurred while waiting for data for file %s; errno = %d; %s",
+                          fileNameLocal(), error.number(), error.text());
+            setMonitorStatus(MONITOR_ERR_WAIT_LOOP);
+            return;
+        }
+    }
+}
+
+/// One look at the file's size; false when the monitor has failed and its status says why.
+bool LogFile::checkForChange() {
+    TraceScope trace(anchor);
+    const std::int64_t newEOF = lseek(LogFD, 0, SEEK_END);
+    if (newEOF > LogEOF) {
+        return trace.result(readGrowth());
+    }
+    if (newEOF < 0) {
+        const ErrorText error(errno);
+        trace.error()("Error while seeking new EOF for file %s. errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+        setMonitorStatus(MONITOR_ERR_SEEK_EOF);
+        return trace.result(false);
+    }
+    if (newEOF < LogEOF) {
+        trace.error()("Warning: log file %s truncated. Resetting EOF to offset %ld.",
+                      fileNameLocal(), static_cast<long>(newEOF));
+        LogEOF = newEOF;
+    }
+    return trace.result(true);
+}
+
+bool LogFile::readGrowth() {
+    TraceScope trace(anchor);
+    if (lseek(LogFD, static_cast<off_t>(LogEOF), SEEK_SET) < 0) {
+        const ErrorText error(errno);
+        trace.error()("Error while rewinding file pointer for file %s; errno = %d; %s",
+                      fileNameLocal(), error.number(), error.text());
+        setMonitorStatus(MONITOR_ERR_REWIND);
+        return trace.result(false);
+    }
+    if (readLog() != 0) {
+        setMonitorStatus(MONITOR_ERR_READ);
+        return trace.result(false);
+    }
+    // Where reading stopped: what was appended meanwhile counts only if it was read.
+    const std::int64_t consumed = lseek(LogFD, 0, SEEK_CUR);
+    if (consumed < 0) {
+        const ErrorText error(errno);
+        trace.error()("Error occurred while determining new EOF for file %s. errno = %d; %s",
+                      fileNameLocal(), error.number(), error.text());
+        setMonitorStatus(MONITOR_ERR_RESET_EOF);
+        return trace.result(false);
+    }
+    LogEOF = consumed;
+    return trace.result(true);
+}
+
+long LogFile::readLog() {
+    TraceScope trace(anchor);
+    m_lineReader.start(LogFD);
+    while (char* const line = m_lineReader.next()) {
+        count(NumEvents);
+        zrm_rmlogent_data_t row{};
+        if (formatEntryAsRow(line, &row, nullptr) == 0) {
+            zrm_rmlogent_manager::EventArrived(&row, 1);
+            writeToDebugLog(line, std::strlen(line), &row, sizeof row);
+        } else {
+            count(NumFormatErrors);
+            writeToDebugLog(line, std::strlen(line), nullptr, 0);
+        }
+    }
+    if (m_lineReader.error() != 0) {
+        const ErrorText error(m_lineReader.error());
+        trace.error()("Error occurred while reading file %s.  errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+        return trace.result(-1L);
+    }
+    return trace.result(0L);
+}
