@@ -1,0 +1,25 @@
+#include "tables/TableDescription.h"
+
+const TableColumn* TableDescription::find(std::string_view name) const noexcept {
+    for (const TableColumn& column : columns) {
+        if (column.name == name) {
+            return &column;
+        }
+    }
+    return nullptr;
+}
+
+unsigned TableDescription::describe(ColumnInfo* info, int index) const noexcept {
+    // The framework's probe for the end of the columns, one behind the last, is no error.
+    if (index < 0 || index > numColumns()) {
+        return TABLE_NO_SUCH_COLUMN;
+    }
+    if (index < numColumns()) {
+        const TableColumn& column = columns[static_cast<std::size_t>(index)];
+        info->name = column.internalName;
+        info->offset = static_cast<std::int16_t>(column.offset);
+        info->length = static_cast<std::int16_t>(column.width);
+        info->type = column.type;
+    }
+    return 0;
+}

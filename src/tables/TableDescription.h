@@ -1,0 +1,60 @@
+#ifndef ZRM_TABLE_DESCRIPTION_H
+#define ZRM_TABLE_DESCRIPTION_H
+
+#include "agent/framework/filters.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string_view>
+
+// Statuses that the tables give to the framework.
+inline constexpr unsigned TABLE_NO_MANAGER = 0x21060002;
+inline constexpr unsigned TABLE_NO_SUCH_COLUMN = 0x21060007;
+
+/// One column of a table's row record.
+struct TableColumn {
+    std::string_view name;    ///< upper-case name, by which conditions refer to the column
+    const char* internalName; ///< the name that the framework learns
+    ColumnType type;
+    std::size_t offset; ///< bytes from the row's start
+    std::size_t width;  ///< bytes
+};
+
+/// One table as its request objects describe it to the framework. Constant data of static
+/// duration.
+struct TableDescription {
+    const char* className; ///< the row holder class, which heads a state dump
+    std::span<const TableColumn> columns;
+    unsigned rowSize;   ///< bytes
+    unsigned allocSize; ///< rows of room added each time the data array is full
+
+    int numColumns() const noexcept { return static_cast<int>(columns.size()); }
+
+    /// The column of this upper-case name, letter by letter; null when there is none.
+    const TableColumn* find(std::string_view name) const noexcept;
+
+    /// Describes column `index` and returns 0. An index out of range gives TABLE_NO_SUCH_COLUMN;
+    /// the one right behind the last column gives 0. Both leave `info` as it was.
+    unsigned describe(ColumnInfo* info, int index) const noexcept;
+
+    /// True when the columns, in order, cover the whole record: each begins where the one before
+    /// ends, integers at the next multiple of four.
+    constexpr bool coversRow() const noexcept {
+        constexpr std::size_t integerSize = sizeof(std::int32_t);
+        std::size_t end = 0;
+        for (const TableColumn& column : columns) {
+            if (column.type == COLUMN_INTEGER) {
+                end = (end + integerSize - 1) / integerSize * integerSize;
+            }
+            if (column.offset != end ||
+                (column.type == COLUMN_INTEGER && column.width != integerSize)) {
+                return false;
+            }
+            end += column.width;
+        }
+        return end == rowSize && end <= INT16_MAX;
+    }
+};
+
+#endif

@@ -1,0 +1,62 @@
+#ifndef ZRM_TABLE_OPERATIONS_H
+#define ZRM_TABLE_OPERATIONS_H
+
+#include "agent/framework/TableManager.h"
+#include "agent/framework/ctreq.h"
+#include "agent/framework/values.h"
+#include "tables/CtreqListIter.h"
+#include "tables/TableDescription.h"
+#include "tables/TableLock.h"
+
+#include <atomic>
+#include <new>
+
+// What the managers of both tables do alike.
+
+/// Creates the table's manager, keeps it in `singleton` for the rest of the process and registers
+/// it. Returns TABLE_NO_MANAGER when memory runs out, else the framework's status.
+template <typename Manager>
+unsigned registerTable(std::atomic<Manager*>& singleton, const char* table) {
+    auto* const manager = new (std::nothrow) Manager("ZRM", table);
+    singleton.store(manager, std::memory_order_release);
+    if (manager == nullptr) {
+        return TABLE_NO_MANAGER;
+    }
+    return TableManager::RegisterWithManager(manager);
+}
+
+/// Creates a request object that is ready for the framework, which owns it; null when memory runs
+/// out.
+template <typename Agent>
+ctreq* createRequest(RequestDetail* detail, ContextInfo* context, TableManager* manager) {
+    auto* const agent = new (std::nothrow) Agent(detail, context, manager);
+    if (agent != nullptr) {
+        agent->TakeSampleConstructor();
+    }
+    return agent;
+}
+
+/// Offers `count` rows, back to back, to every open request of the table and dispatches what each
+/// one accepts. Returns the last non-zero status of a dispatch, else 0. Any thread; one array of
+/// rows at a time.
+template <typename RowHolder, typename Row>
+unsigned offerRows(TableManager& manager, Row* rows, int count) {
+    unsigned status = 0;
+    const TableLock lock(manager);
+    CtreqListIter requests(manager.requests());
+    while (void* const element = requests.Next()) {
+        auto* const request = static_cast<RowHolder*>(static_cast<ctreq*>(element));
+        const unsigned handle = request->handle();
+        ctreq::UseHandle(handle);
+        request->AddData(rows, count);
+        const unsigned dispatched = request->Dispatch();
+        if (dispatched != 0) {
+            status = dispatched;
+        }
+        request->count = 0; // the same rows are never dispatched twice
+        RSC1_Drop(handle);
+    }
+    return status;
+}
+
+#endif

@@ -1,0 +1,143 @@
+#include "tables/zrm_rmlogent_agent.h"
+
+#include "agent/TraceScope.h"
+#include "agent/zrmmain.h"
+#include "logmgr/LogManager.h"
+
+#include <cstdlib>
+#include <ctime>
+#include <new>
+
+namespace {
+
+TRC1_Anchor anchor{"zrm_rmlogent_agent.cpp"};
+
+// Reasons of ctreq::Stopped.
+constexpr unsigned stoppedCorruptedChain = 1;
+constexpr unsigned stoppedInvalidSampleType = 2;
+
+/// Traces what becomes of a situation, with the time as ctime prints it, newline included.
+void traceSituation(const TraceScope& trace, const char* event, const char* name) {
+    if (!trace.isOn(TRC1_DETAIL)) {
+        return;
+    }
+    const std::time_t now = std::time(nullptr);
+    char text[26] = "";
+    ctime_r(&now, text);
+    trace.detail()("Object %s for situation %s at %s", event, name, text);
+}
+
+} // namespace
+
+zrm_rmlogent_agent::~zrm_rmlogent_agent() {
+    TakeSampleDestructor();
+}
+
+void zrm_rmlogent_agent::TakeSampleConstructor() {
+    const TraceScope trace(anchor);
+    switch (sampleType()) {
+    case SAMPLE_REPORT:
+        if (pTheLogManager != nullptr) {
+            pTheLogManager->beginRequest();
+        }
+        break;
+    case SAMPLE_SITUATION:
+        traceSituation(trace, "created", name());
+        getFreqPeriodThresholds();
+        break;
+    default:
+        trace.error()("Invalid request received; sample type = %d", static_cast<int>(sampleType()));
+        Stopped(stoppedInvalidSampleType);
+    }
+}
+
+void zrm_rmlogent_agent::TakeSampleDestructor() {
+    const TraceScope trace(anchor);
+    switch (sampleType()) {
+    case SAMPLE_REPORT:
+        if (pTheLogManager != nullptr) {
+            pTheLogManager->endRequest();
+        }
+        break;
+    case SAMPLE_SITUATION:
+        dropTimestampChain();
+        traceSituation(trace, "destroyed", name());
+        break;
+    default:
+        break;
+    }
+}
+
+unsigned zrm_rmlogent_agent::AddData(zrm_rmlogent_data_t* rows, int count) {
+    TraceScope trace(anchor);
+    trace.fine()("Event passed to situation %s for evaluation.", name());
+    const bool inForce = hasThresholds();
+    const auto frequency =
+        static_cast<std::int32_t>(inForce ? std::abs(thresholds.freqThreshold) : 0);
+    const auto period = static_cast<std::int32_t>(inForce ? thresholds.periodThreshold : 0);
+    for (int i = 0; i < count; ++i) {
+        rows[i].freqthresh = frequency;
+        rows[i].periodthrs = period;
+    }
+    return trace.result(zrm_rmlogent_base::AddData(rows, count));
+}
+
+unsigned zrm_rmlogent_agent::InsertRow(char* row) {
+    TraceScope trace(anchor);
+    return trace.result(hasThresholds() ? insertWithinThresholds(row) : ctreq::InsertRow(row));
+}
+
+unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
+    TraceScope trace(anchor);
+    trace.fine()("Performing frequency/period threshold checks for situation %s.", name());
+    auto* const entry = reinterpret_cast<zrm_rmlogent_data_t*>(row);
+    if (!addEventTime(entry->entrytime)) {
+        return trace.result(0U);
+    }
+    const long frequency =
+        timestampChain->countEvents(static_cast<long>(thresholds.periodThreshold));
+    if (frequency == -1) {
+        trace.error()("Timestamp chain corrupted.  Stopping situation.");
+        Stopped(stoppedCorruptedChain);
+        Stop();
+        return trace.result(0U);
+    }
+    if (frequency == 0) {
+        dropTimestampChain();
+        return trace.result(0U);
+    }
+    const bool isUpperBound = thresholds.freqThreshold < 0;
+    const auto bound = static_cast<long>(std::abs(thresholds.freqThreshold));
+    if (isUpperBound ? frequency > bound : frequency < bound) {
+        trace.detail()("Event frequency of %ld is %s the thresholdof %ld for situation %s. Event "
+                       "discarded.",
+                       frequency, isUpperBound ? ">" : "<", bound, name());
+        return trace.result(0U);
+    }
+    trace.detail()("Event frequency of %ld is %s the threshold of %ld for situation %s. Event "
+                   "accepted.",
+                   frequency, isUpperBound ? "<=" : ">=", bound, name());
+    entry->freqthresh = static_cast<std::int32_t>(frequency);
+    return trace.result(ctreq::InsertRow(row));
+}
+
+/// Adds the entry's time to the chain; false when the time does not convert or memory runs out.
+bool zrm_rmlogent_agent::addEventTime(const char* entrytime) {
+    TraceScope trace(anchor);
+    auto* const timestamp = new (std::nothrow) Timestamp(&timestampChain, entrytime);
+    if (timestamp == nullptr) {
+        trace.error()("Memory allocation for %d bytes failed. Event discarded.",
+                      static_cast<int>(sizeof(Timestamp)));
+        return trace.result(false);
+    }
+    if (timestamp->eventTime() < 0) {
+        delete timestamp; // it stands alone, outside the chain
+        return trace.result(false);
+    }
+    return trace.result(true);
+}
+
+void zrm_rmlogent_agent::dropTimestampChain() {
+    delete timestampChain;
+    timestampChain = nullptr;
+}

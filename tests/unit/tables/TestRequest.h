@@ -1,0 +1,56 @@
+#ifndef ZRM_TESTS_TEST_REQUEST_H
+#define ZRM_TESTS_TEST_REQUEST_H
+
+#include "agent/framework/ctreq.h"
+#include "host/framework/RequestDetail.h"
+
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <string>
+#include <vector>
+
+// A double of the framework's request class. It honours the contract, lets a test state each
+// condition byte by byte and each status, and records what the agent asks of it. It takes the
+// place of the host's requests at link time.
+
+/// What a test states about one request, and what it learns about it. Outlives the request.
+class TestRequest : public RequestDetail {
+public:
+    explicit TestRequest(SampleType type, std::string requestName = "alpha");
+
+    /// A condition with these bytes as its value; `length` defaults to their number.
+    TestRequest& raw(const std::string& column, int op, int dataType, const std::string& bytes,
+                     int length = -32768);
+    /// A condition on an integer column, with a value of eight bytes.
+    TestRequest& number(const std::string& column, int op, std::int64_t value);
+    /// A condition on a character column.
+    TestRequest& text(const std::string& column, int op, const std::string& value);
+
+    struct Filter {
+        std::string column;
+        std::string bytes;
+        SEL1_FILTERINFO info;
+    };
+    std::deque<Filter> filters; ///< published one at a time, in this order
+
+    // Results of the framework's operations.
+    std::function<bool(const char* row)> accepts; ///< conditions; without it every row passes
+    std::deque<unsigned> insertStatus;            ///< of the next insertions; then 0
+    unsigned dispatchStatus = 0;
+    int comparison = 0; ///< result of both IsException operations
+
+    // What was asked.
+    std::vector<std::string> calls;      ///< in order; TestCalls holds those of all requests
+    std::vector<std::string> dispatched; ///< the rows of all dispatches
+    std::vector<unsigned> stopped;       ///< reasons
+    int stops = 0;
+};
+
+/// The calls to all requests, in order, as "NAME CALL".
+class TestCalls {
+public:
+    static std::vector<std::string>& all();
+};
+
+#endif
