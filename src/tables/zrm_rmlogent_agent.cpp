@@ -37,8 +37,8 @@ void zrm_rmlogent_agent::TakeSampleConstructor() {
     const TraceScope trace(anchor);
     switch (sampleType()) {
     case SAMPLE_REPORT:
-        if (pTheLogManager != nullptr) {
-            pTheLogManager->beginRequest();
+        if (LogManager* const logManager = pTheLogManager) {
+            logManager->beginRequest();
         }
         break;
     case SAMPLE_SITUATION:
@@ -55,8 +55,8 @@ void zrm_rmlogent_agent::TakeSampleDestructor() {
     const TraceScope trace(anchor);
     switch (sampleType()) {
     case SAMPLE_REPORT:
-        if (pTheLogManager != nullptr) {
-            pTheLogManager->endRequest();
+        if (LogManager* const logManager = pTheLogManager) {
+            logManager->endRequest();
         }
         break;
     case SAMPLE_SITUATION:

@@ -136,7 +136,8 @@ LogFile* zrm_rmlogent_agent::validateFileName() {
     }
     char joined[pathRoom + nameRoom];
     std::snprintf(joined, sizeof joined, "%s%s", path, name);
-    LogFile* const found = pTheLogManager->findLogObject(joined);
+    LogManager* const logManager = pTheLogManager;
+    LogFile* const found = logManager->findLogObject(joined);
     if (found == nullptr) {
         trace.error()("Log file %s is not being monitored.", joined);
     }

@@ -2,7 +2,9 @@
 #include "logmgr/LogManager.h"
 #include "monitor/UTF8Conv.h"
 
-LogManager* pTheLogManager = nullptr;
+decltype(pTheLogManager) pTheLogManager{nullptr};
+char* gSystemName = nullptr;
+char* gHostName = nullptr;
 std::int32_t gMaxRows = 1000;
 
 void LogManager::beginRequest() {}
