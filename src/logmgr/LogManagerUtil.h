@@ -2,10 +2,15 @@
 #define ZRM_LOG_MANAGER_UTIL_H
 
 #include <cstddef>
+#include <cstdio>
 #include <ctime>
 
 /// Helpers of the log manager.
 namespace LogManagerUtil {
+
+/// Opens a file to read ("r") or to append ("a") such that no child process inherits it; null and
+/// errno on failure. The caller closes it.
+std::FILE* openStream(const char* path, const char* mode);
 
 /// Modification time (seconds since the epoch) of a regular file; 0 when there is no such file.
 std::time_t fileLastModified(const char* path);

@@ -3,6 +3,8 @@
 
 #include "logmgr/LogBase.h"
 
+class TraceScope;
+
 /// Where a line comes from.
 enum WhenceConfig : char {
     CONFIG_USER = 'U',    ///< a line of the log configuration file
@@ -10,8 +12,8 @@ enum WhenceConfig : char {
 };
 
 /// One accepted line of the log configuration, or, while isValid() is false, a refused one. Lives
-/// on the log manager's chain of valid logs, under its lock, until the monitoring objects are
-/// built. Manager thread only.
+/// on the log manager's chain of valid logs until the monitoring objects are built. Manager thread
+/// only.
 class ValidLog : public LogBase {
 public:
     /// Parses `line` (and modifies it), checks it against the chain that starts at `head` (null for
@@ -22,14 +24,30 @@ public:
     ~ValidLog() override;
 
     bool isValid() const noexcept { return Valid; }
-    /// Replaces each "${@}" by the local file name and stores the result.
+    /// Replaces each "${@}" by the local file name and stores the result. Ends the process when
+    /// memory runs out.
     void setLogProcedure(const char* procedure);
+    /// Writes the records of LogBase and of this class, whatever the level.
     void printSelf() const;
 
+    ValidLog* next() const noexcept { return static_cast<ValidLog*>(Next); }
+    ValidLog* prev() const noexcept { return static_cast<ValidLog*>(Prev); }
+
 private:
+    /// Parses a line of the log configuration file: name ;debug ;type ;procedure.
     void extractTokens(char* line);
+    /// Parses a line of the syslog configuration file: selector, action.
     void extractFileName(char* line);
-    void checkForDups(ValidLog* head);
+    /// Refuses this line when its log is already on the chain.
+    void checkForDups(const ValidLog* head);
+
+    bool hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const;
+    // The fields of a configuration line; a refused line loses Valid.
+    void takeFileName(const TraceScope& trace, const char* token);
+    void takeField(const TraceScope& trace, int field, const char* token);
+    void takeType(const TraceScope& trace, const char* token);
+    void takeProcedure(const TraceScope& trace, const char* procedure);
+    bool isErrorLogSystem(const TraceScope& trace) const;
 
     bool Valid = true;
 };
