@@ -58,9 +58,9 @@ void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const vo
     TraceScope trace(anchor);
     int result = 0;
     int cause = 0;
-    std::FILE* const stream = debugMode() == 'Y' && pTheLogManager != nullptr
-                                  ? pTheLogManager->debugLogStream()
-                                  : nullptr;
+    const LogManager* const logManager = pTheLogManager;
+    std::FILE* const stream =
+        debugMode() == 'Y' && logManager != nullptr ? logManager->debugLogStream() : nullptr;
     if (stream != nullptr) {
         lockDebugFile(fileNameLocal());
         std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
