@@ -1,0 +1,145 @@
+#include "logtypes/AdminLogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "tables/zrm_rmlogent_manager.h"
+
+#include <cerrno>
+
+#include <fcntl.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"AdminLogFile.cpp"};
+
+constexpr std::size_t recordLength = AdminLogFile::recordLength;
+
+/// Reads whole records, many with one call. The outcome is that of reading them one by one: a
+/// record whose end is missing when its turn comes has what there is by then, and those bytes are
+/// consumed.
+class RecordReader {
+public:
+    explicit RecordReader(int fd) : m_fd(fd) {}
+
+    /// The next record, valid until the next call; null at the end.
+    char* next() {
+        if (m_end - m_begin < recordLength) {
+            refill();
+        }
+        if (m_end - m_begin < recordLength) {
+            return nullptr;
+        }
+        char* const record = m_buffer + m_begin;
+        m_begin += recordLength;
+        return record;
+    }
+
+    /// After the end: 0, the bytes of an incomplete record, or -1 for a read error.
+    ssize_t outcome() const { return m_failed ? -1 : static_cast<ssize_t>(m_end - m_begin); }
+
+private:
+    void refill() {
+        // Fewer bytes than a record are left, so the source never overlaps its new place.
+        for (std::size_t i = 0; i < m_end - m_begin; ++i) {
+            m_buffer[i] = m_buffer[m_begin + i];
+        }
+        m_end -= m_begin;
+        m_begin = 0;
+        const ssize_t count = read(m_fd, m_buffer + m_end, sizeof m_buffer - m_end);
+        m_failed = count < 0;
+        if (count > 0) {
+            m_end += static_cast<std::size_t>(count);
+        }
+    }
+
+    int m_fd;
+    bool m_failed = false;
+    std::size_t m_begin = 0;
+    std::size_t m_end = 0;
+    char m_buffer[1024 * recordLength];
+};
+
+} // namespace
+
+AdminLogFile::AdminLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        printSelf();
+    }
+    startThread();
+}
+
+AdminLogFile::~AdminLogFile() {
+    TraceScope trace(anchor);
+    stopThread();
+}
+
+void AdminLogFile::processLogData() {
+    TraceScope trace(anchor);
+    openAdminLog();
+    if (LogFD >= 0) {
+        waitForEventLoop({1, 0});
+        closeAdminLog();
+    }
+}
+
+void AdminLogFile::openAdminLog() {
+    TraceScope trace(anchor);
+    LogFD = open(fileNameLocal(), O_RDONLY | O_CLOEXEC);
+    if (LogFD < 0) {
+        const ErrorText error(errno);
+        trace.error()("Error opening file %s. errno = %d; %s", fileNameLocal(), error.number(),
+                      error.text());
+        setMonitorStatus(MONITOR_ERR_OPEN);
+        return;
+    }
+    LogEOF = lseek(LogFD, 0, SEEK_END);
+    if (LogEOF == -1) {
+        const ErrorText error(errno);
+        trace.error()("Error while seeking EOF for file %s.  errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+        closeAdminLog();
+        setMonitorStatus(MONITOR_ERR_SEEK_EOF);
+    }
+}
+
+void AdminLogFile::closeAdminLog() {
+    TraceScope trace(anchor);
+    close(LogFD);
+    LogFD = -1;
+    LogEOF = -1;
+}
+
+long AdminLogFile::readLog() {
+    TraceScope trace(anchor);
+    RecordReader reader(LogFD);
+    while (char* const record = reader.next()) {
+        deliverRecord(record);
+    }
+    const ErrorText error(errno);
+    const ssize_t outcome = reader.outcome();
+    if (outcome == 0) {
+        return trace.result(0L);
+    }
+    if (outcome < 0) {
+        trace.error()("Error occurred reading file %s.  errno = %d; %s", fileNameLocal(),
+                      error.number(), error.text());
+    } else {
+        trace.error()("Incomplete record read from file %s. Bytes read = %d; bytes expected = %d",
+                      fileNameLocal(), static_cast<int>(outcome), static_cast<int>(recordLength));
+    }
+    return trace.result(-1L);
+}
+
+void AdminLogFile::deliverRecord(char* record) {
+    ++NumEvents;
+    zrm_rmlogent_data_t row;
+    if (formatEntryAsRow(record, &row, nullptr) == 0) {
+        zrm_rmlogent_manager::EventArrived(&row, 1);
+        writeToDebugLog(record, recordLength, &row, sizeof row);
+    } else {
+        ++NumFormatErrors;
+        writeToDebugLog(record, recordLength, nullptr, 0);
+    }
+}

@@ -1,0 +1,63 @@
+#ifndef ZRM_ADMIN_LOG_FILE_H
+#define ZRM_ADMIN_LOG_FILE_H
+
+#include "monitor/LogFile.h"
+
+#include <cstddef>
+#include <cstdint>
+
+/// A login accounting log: a file of 40-byte binary records, each of which becomes one row. Life
+/// and threads are those of every LogFile: the log's own thread follows the file's end, a report
+/// reads the file backwards on its request's thread.
+class AdminLogFile : public LogFile {
+public:
+    /// One record of the file. Texts are padded with NULs and not terminated when full; numbers are
+    /// in the byte order of the host that wrote them.
+    struct utmp {
+        char ut_user[8];
+        char ut_id[4];
+        char ut_line[12];
+        std::int16_t ut_pid;
+        std::int16_t ut_type;
+        std::int16_t e_termination;
+        std::int16_t e_exit;
+        std::int64_t ut_time; ///< seconds since the epoch
+    };
+    static constexpr std::size_t recordLength = 40;
+
+    AdminLogFile(const ValidLog& log, LogFile* chainHead);
+    ~AdminLogFile() override;
+
+    void endReportRequest(void** reportState) override;
+    /// The next older record within the window. Null at the first record that is older than the
+    /// window, and at the file's start, which is traced as an incomplete record.
+    void* getNextLogEntry(void* row, void* reportState, void* thresholds) override;
+    /// The report's state is a _LogBufferInfo.
+    void* startReportRequest(void* thresholds) override;
+    /// Fills the row from the 40 bytes at `record`, of any alignment; always 0.
+    long formatEntryAsRow(char* record, void* row, void* context) override;
+    void processLogData() override;
+    /// Consumes the records between LogEOF and the file's end. -1 on a read error and when the file
+    /// ends within a record, whose bytes are lost.
+    long readLog() override;
+
+    /// Copies the text of a record type, at most `room` bytes, without a terminator.
+    static void fillEntryType(char* dest, unsigned long room, int type);
+    /// Writes the description of a record, at most `room` bytes, without a terminator; in UTF-8
+    /// when `toUTF8` is not 0, else in the local code page.
+    static void formatEntryDesc(char* dest, unsigned long room, const utmp* record, int toUTF8);
+
+private:
+    void openAdminLog();
+    void closeAdminLog();
+    void deliverRecord(char* record);
+    bool allocateReportBuffers(_LogBufferInfo** reportState);
+    static void deallocateReportBuffers(_LogBufferInfo** reportState);
+};
+
+static_assert(sizeof(AdminLogFile::utmp) == AdminLogFile::recordLength);
+static_assert(offsetof(AdminLogFile::utmp, ut_line) == 12);
+static_assert(offsetof(AdminLogFile::utmp, ut_pid) == 24);
+static_assert(offsetof(AdminLogFile::utmp, ut_time) == 32);
+
+#endif

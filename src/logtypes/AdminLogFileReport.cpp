@@ -1,0 +1,108 @@
+#include "logtypes/AdminLogFile.h"
+
+#include "agent/TraceScope.h"
+#include "tables/RequestThresholds.h"
+#include "tables/zrm_rmlogent_data.h"
+
+#include <algorithm>
+#include <cstring>
+#include <new>
+
+namespace {
+
+TRC1_Anchor anchor{"AdminLogFileReport.cpp"};
+
+/// Compares 16-character time stamps.
+int compareTimes(const char* left, const char* right) {
+    return std::memcmp(left, right, sizeof zrm_rmlogent_data_t::entrytime);
+}
+
+} // namespace
+
+void* AdminLogFile::startReportRequest(void* /*thresholds*/) {
+    TraceScope trace(anchor);
+    _LogBufferInfo* info = nullptr;
+    if (!allocateReportBuffers(&info) || openLogForReport(info) < 0) {
+        deallocateReportBuffers(&info);
+        return trace.result(static_cast<void*>(nullptr));
+    }
+    info->bufferCount = 0;
+    trace.detail()("Read buffer of size %ld allocated for file %s.",
+                   static_cast<long>(OptimumBlockSize), fileNameLocal());
+    return trace.result(static_cast<void*>(info));
+}
+
+bool AdminLogFile::allocateReportBuffers(_LogBufferInfo** reportState) {
+    TraceScope trace(anchor);
+    if (OptimumBlockSize == 0) {
+        if (determineOptimumBlockSize() != 0) {
+            return trace.result(false);
+        }
+        if (OptimumBlockSize <= static_cast<std::int64_t>(recordLength)) {
+            OptimumBlockSize = recordLength;
+        }
+    }
+    auto* const info = new (std::nothrow) _LogBufferInfo{};
+    if (info == nullptr) {
+        trace.error()("Memory allocation of %d bytes failed.",
+                      static_cast<int>(sizeof(_LogBufferInfo)));
+        return trace.result(false);
+    }
+    *reportState = info;
+    info->fd = -1;
+    // Another report may just be raising the size: this buffer holds a record whatever it sees.
+    const std::int64_t blockSize =
+        std::max(OptimumBlockSize.load(), static_cast<std::int64_t>(recordLength));
+    info->pBuffer = new (std::nothrow) char[static_cast<std::size_t>(blockSize)];
+    if (info->pBuffer == nullptr) {
+        // Names one byte more than was asked for, the size that the text logs allocate.
+        trace.error()("Memory allocation of %d bytes failed.", static_cast<int>(blockSize + 1));
+        return trace.result(false);
+    }
+    return trace.result(true);
+}
+
+void* AdminLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds) {
+    TraceScope trace(anchor);
+    auto* const info = static_cast<_LogBufferInfo*>(reportState);
+    const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
+    const auto* const columns = static_cast<const zrm_rmlogent_data_t*>(row);
+    constexpr auto length = static_cast<std::int64_t>(recordLength);
+    for (;;) {
+        if (info->bufferCount < length && fillReportBuffer(info) < length) {
+            trace.error()("Incomplete record found while building report for file %s. "
+                          "Record length = %d; expected length = %d.",
+                          fileNameLocal(), static_cast<int>(info->bufferCount),
+                          static_cast<int>(recordLength));
+            return trace.result(static_cast<void*>(nullptr));
+        }
+        info->bufferCount -= length;
+        if (formatEntryAsRow(info->pBuffer + info->bufferCount, row, nullptr) != 0) {
+            return trace.result(static_cast<void*>(nullptr));
+        }
+        if (compareTimes(columns->entrytime, window.endTime) > 0) {
+            continue;
+        }
+        const bool isInWindow = compareTimes(columns->entrytime, window.startTime) >= 0;
+        return trace.result(isInWindow ? row : nullptr);
+    }
+}
+
+void AdminLogFile::endReportRequest(void** reportState) {
+    TraceScope trace(anchor);
+    auto* info = static_cast<_LogBufferInfo*>(*reportState);
+    if (info != nullptr) {
+        closeLogForReport(info->fd);
+    }
+    deallocateReportBuffers(&info);
+    *reportState = nullptr;
+}
+
+void AdminLogFile::deallocateReportBuffers(_LogBufferInfo** reportState) {
+    TraceScope trace(anchor);
+    if (*reportState != nullptr) {
+        delete[](*reportState)->pBuffer;
+        delete *reportState;
+    }
+    *reportState = nullptr;
+}

@@ -1,0 +1,42 @@
+#ifndef ZRM_CHILD_PROCESS_H
+#define ZRM_CHILD_PROCESS_H
+
+#include "agent/ErrorText.h"
+
+#include <sys/types.h>
+
+/// The system's side of running a command whose standard output the agent reads through a pipe.
+///
+/// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
+/// the blocked signals, and locks that nobody will release. So the descriptors of the agent close
+/// on exec, whatever a child needs is prepared before the fork, and between fork and exec a child
+/// makes only calls that are safe in a signal handler.
+namespace ChildProcess {
+
+/// Makes a pipe whose ends do not reach other children. As pipe(): 0, or -1 and errno. Any thread.
+int openPipe(int fds[2]);
+
+/// Forks: 0 in the child, its id in the parent, -1 and errno on failure. Any thread.
+pid_t start();
+
+/// In the child: makes the pipe's write end its standard output and closes both ends.
+void redirectOutput(const int fds[2]);
+
+/// In the child: undoes what the agent's threads do with signals, so that the command can be ended
+/// by signal 15 and by a pipe that nobody reads.
+void restoreSignals();
+
+} // namespace ChildProcess
+
+/// The texts of the errors with which exec fails, made before the fork: a text may come from the
+/// locale's message catalogue, which is out of a child's reach.
+class ExecErrorTexts {
+public:
+    ExecErrorTexts() noexcept;
+    const char* text(int number) const noexcept;
+
+private:
+    ErrorText m_texts[12];
+};
+
+#endif

@@ -1,0 +1,147 @@
+#include "logtypes/ErrLogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "tables/zrm_rmlogent_manager.h"
+
+#include <cerrno>
+#include <cstring>
+
+#include <poll.h>
+#include <sys/select.h>
+
+namespace {
+
+TRC1_Anchor anchor{"ErrLogFile.cpp"};
+
+/// Waits up to one second until the descriptor can be read. As select(): above 0 when it can, 0
+/// when not, -1 and errno.
+int waitForData(int fd) {
+    if (fd >= FD_SETSIZE) {
+        // Outside the descriptor sets of select().
+        pollfd entry{fd, POLLIN, 0};
+        return poll(&entry, 1, 1000);
+    }
+    fd_set readable;
+    FD_ZERO(&readable);
+    FD_SET(fd, &readable);
+    timeval limit{1, 0};
+    const int count = select(fd + 1, &readable, nullptr, nullptr, &limit);
+    return count > 0 && !FD_ISSET(fd, &readable) ? 0 : count;
+}
+
+} // namespace
+
+ErrLogFile::ErrLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        printSelf();
+    }
+    startThread();
+}
+
+ErrLogFile::~ErrLogFile() {
+    TraceScope trace(anchor);
+    stopThread();
+}
+
+void ErrLogFile::processLogData() {
+    TraceScope trace(anchor);
+    int fds[2];
+    if (openPipe(fds) != 0) {
+        return;
+    }
+    m_readFd = fds[0];
+    createChild(fds);
+    if (m_childPid <= 0) {
+        closePipe(&m_readFd);
+        return;
+    }
+    if (m_readStream == nullptr) {
+        closePipe(&m_readFd);
+    } else {
+        waitForEventLoop();
+        closePipe(&m_readStream);
+        m_readFd = -1;
+    }
+    killChild();
+}
+
+void ErrLogFile::waitForEventLoop() {
+    TraceScope trace(anchor);
+    while (monitorStatus() == MONITOR_RUNNING) {
+        const int ready = waitForData(m_readFd);
+        if (ready > 0) {
+            if (readLog() != 0) {
+                setMonitorStatus(MONITOR_ERR_READ);
+                return;
+            }
+        } else if (ready < 0 && errno != EINTR) {
+            const ErrorText error(errno);
+            trace.error()("Error occurred during select() system call for command %s on fd %d. "
+                          "errno = %d; %s",
+                          procedure(), m_readFd, error.number(), error.text());
+            setMonitorStatus(MONITOR_ERR_WAIT_EVENT);
+            // This path releases the lock, and traces that, although it does not hold it: it is
+            // taken here first, without a message, since releasing a free mutex is undefined.
+            pthread_mutex_lock(&LogLock);
+            unlockLog();
+            return;
+        }
+    }
+}
+
+long ErrLogFile::readLog() {
+    TraceScope trace(anchor);
+    while (readLine()) {
+        deliverLine();
+        if (monitorStatus() == MONITOR_STOPPED) {
+            return trace.result(0L);
+        }
+    }
+    const ErrorText error(errno);
+    if (std::feof(m_readStream) != 0) {
+        trace.error()("EOF detected during fgets() system call on pipe %d to command %s.", m_readFd,
+                      procedure());
+        return trace.result(-1L);
+    }
+    if (error.number() != EAGAIN) {
+        trace.error()("Error occurred during fgets() system call on pipe %d to command %s. "
+                      "errno = %d; %s",
+                      m_readFd, procedure(), error.number(), error.text());
+        return trace.result(-1L);
+    }
+    std::clearerr(m_readStream);
+    return trace.result(0L);
+}
+
+// Reads as fgets does, up to 255 characters, but keeps a line whose end has not come yet: the
+// stream does not block, and fgets says nothing of what it has read when it fails.
+bool ErrLogFile::readLine() {
+    int character = 0;
+    while (m_lineLength < sizeof m_line - 1 && character != '\n') {
+        character = getc_unlocked(m_readStream);
+        if (character != EOF) {
+            m_line[m_lineLength++] = static_cast<char>(character);
+        } else if (m_lineLength > 0 && std::feof(m_readStream) != 0) {
+            break;
+        } else {
+            return false;
+        }
+    }
+    m_line[m_lineLength] = '\0';
+    m_lineLength = 0;
+    return true;
+}
+
+void ErrLogFile::deliverLine() {
+    ++NumEvents;
+    zrm_rmlogent_data_t row;
+    if (formatEntryAsRow(m_line, &row, nullptr) == 0) {
+        zrm_rmlogent_manager::EventArrived(&row, 1);
+        writeToDebugLog(m_line, std::strlen(m_line), &row, sizeof row);
+    } else {
+        ++NumFormatErrors;
+        writeToDebugLog(m_line, std::strlen(m_line), nullptr, 0);
+    }
+}
