@@ -12,6 +12,9 @@ namespace {
 
 TRC1_Anchor anchor{"AdminLogFileReport.cpp"};
 
+constexpr auto length = static_cast<std::int64_t>(AdminLogFile::recordLength);
+constexpr int statedStateLength = 32; // of a report's state, in the message of its failure
+
 /// Compares 16-character time stamps.
 int compareTimes(const char* left, const char* right) {
     return std::memcmp(left, right, sizeof zrm_rmlogent_data_t::entrytime);
@@ -38,25 +41,24 @@ bool AdminLogFile::allocateReportBuffers(_LogBufferInfo** reportState) {
         if (determineOptimumBlockSize() != 0) {
             return trace.result(false);
         }
-        if (OptimumBlockSize <= static_cast<std::int64_t>(recordLength)) {
-            OptimumBlockSize = recordLength;
+        if (OptimumBlockSize <= length) {
+            OptimumBlockSize = length;
         }
     }
     auto* const info = new (std::nothrow) _LogBufferInfo{};
     if (info == nullptr) {
-        trace.error()("Memory allocation of %d bytes failed.",
-                      static_cast<int>(sizeof(_LogBufferInfo)));
+        trace.error()("Memory allocation of %d bytes failed.", statedStateLength);
         return trace.result(false);
     }
     *reportState = info;
     info->fd = -1;
-    // Another report may just be raising the size: this buffer holds a record whatever it sees.
-    const std::int64_t blockSize =
-        std::max(OptimumBlockSize.load(), static_cast<std::int64_t>(recordLength));
-    info->pBuffer = new (std::nothrow) char[static_cast<std::size_t>(blockSize)];
+    // Another report may just be raising the size: this block holds a record whatever it saw.
+    info->blockSize = std::max(OptimumBlockSize.load(), length);
+    info->pBuffer = new (std::nothrow) char[static_cast<std::size_t>(info->blockSize)];
     if (info->pBuffer == nullptr) {
-        // Names one byte more than was asked for, the size that the text logs allocate.
-        trace.error()("Memory allocation of %d bytes failed.", static_cast<int>(blockSize + 1));
+        // Names one byte more than was asked for: what the text logs allocate.
+        trace.error()("Memory allocation of %d bytes failed.",
+                      static_cast<int>(info->blockSize + 1));
         return trace.result(false);
     }
     return trace.result(true);
@@ -67,13 +69,12 @@ void* AdminLogFile::getNextLogEntry(void* row, void* reportState, void* threshol
     auto* const info = static_cast<_LogBufferInfo*>(reportState);
     const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
     const auto* const columns = static_cast<const zrm_rmlogent_data_t*>(row);
-    constexpr auto length = static_cast<std::int64_t>(recordLength);
     for (;;) {
         if (info->bufferCount < length && fillReportBuffer(info) < length) {
             trace.error()("Incomplete record found while building report for file %s. "
                           "Record length = %d; expected length = %d.",
                           fileNameLocal(), static_cast<int>(info->bufferCount),
-                          static_cast<int>(recordLength));
+                          static_cast<int>(length));
             return trace.result(static_cast<void*>(nullptr));
         }
         info->bufferCount -= length;

@@ -40,7 +40,8 @@ long ErrLogFile::formatEntryAsRow(char* entry, void* row, void* /*context*/) {
     if (position == nullptr) {
         return trace.result(-1L);
     }
-    std::memcpy(columns.entrysys, gHostName, strnlen(gHostName, sizeof columns.entrysys));
+    const char* const host = gHostName != nullptr ? gHostName : "";
+    std::memcpy(columns.entrysys, host, strnlen(host, sizeof columns.entrysys));
     position = extractNextField(columns.entrytype, position, sizeof columns.entrytype, end);
     position = extractNextField(columns.entryclass, position, sizeof columns.entryclass, end);
     position = extractNextField(columns.entrysrc, position, sizeof columns.entrysrc, end);
