@@ -2,6 +2,21 @@
 #define ZRM_RMMONLOG_MANAGER_H
 
 #include "agent/framework/TableManager.h"
+#include "tables/zrm_rmmonlog_data.h"
+
+/// Manager of the Monitored Logs table: creates its request objects. One per process, never
+/// destroyed.
+class zrm_rmmonlog_manager : public TableManager {
+public:
+    zrm_rmmonlog_manager(const char* application, const char* table);
+    ctreq* CreateCtreq(RequestDetail* detail, ContextInfo* context) override;
+
+    /// Hands `count` rows to every open request, as zrm_rmlogent_manager::EventArrived does. The
+    /// table's rows come from samples; nothing in the agent raises events on it.
+    static unsigned EventArrived(zrm_rmmonlog_data_t* rows, int count);
+
+    unsigned AddDataToEvent(zrm_rmmonlog_data_t* rows, int count);
+};
 
 /// Creates and registers the Monitored Logs table's manager. Returns 0 or a framework status.
 unsigned zrm_rmmonlog_init();

@@ -1,0 +1,32 @@
+#ifndef ZRM_RMMONLOG_AGENT_H
+#define ZRM_RMMONLOG_AGENT_H
+
+#include "tables/zrm_rmmonlog_base.h"
+
+#include <memory>
+
+class LogFile;
+
+/// One request on the Monitored Logs table: each sample builds one row per monitored log afresh.
+/// Owned by the framework; used by the thread that takes the sample. The log manager exists before
+/// the first request and is told by it that requests are being served.
+class zrm_rmmonlog_agent : public zrm_rmmonlog_base {
+public:
+    using zrm_rmmonlog_base::zrm_rmmonlog_base;
+    ~zrm_rmmonlog_agent() override;
+
+    /// Begins the request; called once, by the manager, right after construction.
+    void TakeSampleConstructor();
+
+    /// Inserts the rows of the monitored logs that meet the request's conditions. Failures are
+    /// only traced and leave no rows.
+    void TakeSample() override;
+
+private:
+    void TakeSampleDestructor();
+    unsigned getMonitoredLogs(std::unique_ptr<zrm_rmmonlog_data_t[]>& rows);
+    unsigned buildTableRows(zrm_rmmonlog_data_t* rows, unsigned room);
+    void buildTableRow(zrm_rmmonlog_data_t* row, LogFile* log);
+};
+
+#endif
