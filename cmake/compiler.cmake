@@ -22,3 +22,7 @@ if(ZRM_SANITIZE)
     add_compile_options(-fno-sanitize-recover=undefined)
   endif()
 endif()
+
+if(ZRM_FUZZ)
+  add_compile_options(-fsanitize=fuzzer-no-link)
+endif()

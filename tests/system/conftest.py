@@ -1,8 +1,10 @@
 """The real agent, run from outside: processes, files and signals."""
 
+import io
 import json
 import os
 import re
+import resource
 import subprocess
 import threading
 import time
@@ -16,6 +18,9 @@ PROGRAM = os.environ.get("ZRM_AGENT", str(ROOT / "build/dev/bin/zrmagent"))
 
 # Sanitized programs on a busy machine are slow; a test that passes never waits this long.
 PATIENCE = 60
+
+# SIGQUIT aborts the agent; its core file is of no use here.
+resource.setrlimit(resource.RLIMIT_CORE, (0, 0))
 
 SANITIZER = re.compile(
     r"ERROR: AddressSanitizer|ERROR: LeakSanitizer|WARNING: ThreadSanitizer|runtime error:"
@@ -150,23 +155,24 @@ class Agent:
 
     # ------------------------------------------------------------------ process
 
-    def start(self, *arguments, trace=DEFAULT_TRACE, wait=True, preload=None):
-        """Starts the agent and waits until it serves and every configured log is open."""
+    def start(self, *arguments, trace=DEFAULT_TRACE, wait=True, wrapper=(), stdout=None):
+        """Starts the agent and waits until it serves and every configured log is open.
+
+        `wrapper` is a command that ends by becoming the agent; `stdout` a descriptor to write to.
+        """
         self._write_toml()
         environment = {k: v for k, v in os.environ.items() if k not in AGENT_VARIABLES}
         environment["QFW_TRC1"] = trace
         environment.update(self.environment)
-        if preload is not None:
-            environment["LD_PRELOAD"] = str(preload)
         self.process = subprocess.Popen(
-            [PROGRAM, "--config", str(self.zrm_toml), *arguments],
+            [*wrapper, PROGRAM, "--config", str(self.zrm_toml), *arguments],
             stdin=subprocess.DEVNULL,
-            stdout=subprocess.PIPE,
+            stdout=subprocess.PIPE if stdout is None else stdout,
             stderr=subprocess.PIPE,
             cwd=self.directory,
             env=environment,
         )
-        self.stdout = Lines(self.process.stdout)
+        self.stdout = Lines(self.process.stdout or io.BytesIO())
         self.stderr = Lines(self.process.stderr)
         if wait:
             self.wait_trace("Agent server is listening; signal sent.")

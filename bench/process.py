@@ -1,0 +1,119 @@
+"""The agent as the benchmark sees it: a process whose CPU, memory and events are measured."""
+
+import json
+import os
+import re
+import subprocess
+import sys
+import threading
+import time
+from pathlib import Path
+
+LIMIT = 300  # seconds that any wait may take
+
+
+class AgentProcess:
+    """A running agent on the given logs; ends with the `with` block."""
+
+    def __init__(self, program, directory, logs, situations):
+        self.directory = Path(directory)
+        self.logs = logs
+        (self.directory / "logs.conf").write_text("".join(f"{log}\n" for log in logs))
+        config = self.directory / "zrm.toml"
+        config.write_text(self._configuration(situations))
+        self.events = 0
+        self.last_event_time = None
+        self.trace = open(self.directory / "trace", "wb")
+        self.process = subprocess.Popen(
+            [program, "--config", str(config)],
+            stdin=subprocess.DEVNULL,
+            stdout=subprocess.PIPE,
+            stderr=self.trace,
+            env={**os.environ, "QFW_TRC1": "error,LogManager=error+detail"},
+        )
+        self.reader = threading.Thread(target=self._count_events, daemon=True)
+        self.reader.start()
+
+    def _configuration(self, situations):
+        text = f'[agent]\nlog_config = "{self.directory}/logs.conf"\n'
+        text += '[[sink]]\ntype = "jsonl"\npath = "-"\n'
+        for situation in situations:
+            keys = {"text": "benchmark", "severity": "info", **situation}
+            text += "[[situation]]\n"
+            text += "".join(f"{key} = {json.dumps(value)}\n" for key, value in keys.items())
+        return text
+
+    def _count_events(self):
+        while data := os.read(self.process.stdout.fileno(), 1 << 20):
+            self.last_event_time = time.monotonic()
+            self.events += data.count(b"\n")
+
+    def __enter__(self):
+        trace = self.directory / "trace"
+        self._wait(lambda: b"Agent server is listening" in trace.read_bytes(), "the start")
+        self._wait(self._all_at_end, "open logs")
+        time.sleep(0.5)  # what the start leaves to do
+        return self
+
+    def __exit__(self, *_):
+        self.process.terminate()
+        status = self.process.wait(LIMIT)
+        self.reader.join(LIMIT)
+        self.trace.close()
+        if status != 0:
+            sys.exit(f"the agent ended with status {status}")
+
+    def _wait(self, condition, what):
+        deadline = time.monotonic() + LIMIT
+        while not condition():
+            if self.process.poll() is not None or time.monotonic() > deadline:
+                sys.exit(f"waited for {what}:\n{(self.directory / 'trace').read_text()[-2000:]}")
+            time.sleep(0.005)
+
+    def _positions(self):
+        """Read position of each open file."""
+        positions = {}
+        for entry in os.scandir(f"/proc/{self.process.pid}/fd"):
+            try:
+                path = os.readlink(entry.path)
+                info = Path(f"/proc/{self.process.pid}/fdinfo/{entry.name}").read_text()
+            except OSError:
+                continue
+            positions[path] = int(re.search(r"pos:\s*(\d+)", info).group(1))
+        return positions
+
+    def _all_at_end(self):
+        positions = self._positions()
+        return all(positions.get(str(log)) == os.path.getsize(log) for log in self.logs)
+
+    def wait_read(self, log):
+        """Waits until the log has been read to its end."""
+        self._wait(lambda: self._positions().get(str(log)) == os.path.getsize(log), "reading")
+
+    def wait_events(self, count):
+        """Waits for that many events; the number that came, counted a little longer."""
+        self._wait(lambda: self.events >= count, f"{count} events")
+        return self.events
+
+    def cpu(self):
+        """CPU seconds of all threads since the start, to the nanosecond."""
+        clock = (~self.process.pid << 3) | 2  # the process's CPU clock, as clock_getcpuclockid has it
+        return time.clock_gettime(clock)
+
+    def wait_idle(self):
+        """Waits until the process uses no CPU but for its polls; when that began."""
+        deadline = time.monotonic() + LIMIT
+        quiet_since, last = time.monotonic(), self.cpu()
+        while time.monotonic() - quiet_since < 0.25:
+            time.sleep(0.01)
+            now = self.cpu()
+            if now - last > 0.002:
+                quiet_since = time.monotonic()
+            last = now
+            if time.monotonic() > deadline:
+                sys.exit("the agent does not come to rest")
+        return quiet_since
+
+    def resident_kilobytes(self):
+        status = Path(f"/proc/{self.process.pid}/status").read_text()
+        return int(re.search(r"^VmRSS:\s*(\d+)", status, re.M).group(1))
