@@ -1,0 +1,163 @@
+#include "logtypes/SysLogFile.h"
+
+#include "agent/TraceScope.h"
+#include "logtypes/SyslogBufferInfo.h"
+#include "monitor/BrevanTime.h"
+#include "tables/RequestThresholds.h"
+#include "tables/zrm_rmlogent_data.h"
+
+#include <algorithm>
+#include <cstring>
+#include <ctime>
+#include <new>
+
+// Reports on a syslog file, newest entry first.
+
+namespace {
+
+TRC1_Anchor anchor{"SysLogFileReport.cpp"};
+
+constexpr std::int64_t longestLine = 999; ///< bytes; of a longer line only so many are given
+
+/// The last newline at or behind `from` and before `to`; -1 when there is none.
+std::int64_t lastNewline(const char* text, std::int64_t from, std::int64_t to) {
+    while (to > from) {
+        if (text[--to] == '\n') {
+            return to;
+        }
+    }
+    return -1;
+}
+
+} // namespace
+
+void* SysLogFile::startReportRequest(void* /*request*/) {
+    TraceScope trace(anchor);
+    if (determineOptimumBlockSize() != 0) {
+        return trace.result<void*>(nullptr);
+    }
+    const std::int64_t blockSize = OptimumBlockSize;
+    const std::size_t bufferSize = static_cast<std::size_t>(blockSize) + 1;
+    auto* state = new (std::nothrow) SyslogBufferInfo{};
+    if (state == nullptr) {
+        trace.error()("Memory allocation of %d bytes failed.",
+                      static_cast<int>(sizeof(SyslogBufferInfo)));
+        return trace.result<void*>(nullptr);
+    }
+    state->block.reset(new (std::nothrow) char[bufferSize]);
+    if (!state->block) {
+        trace.error()("Memory allocation of %d bytes failed.", static_cast<int>(bufferSize));
+        deallocateReportBuffers(&state);
+        return trace.result<void*>(nullptr);
+    }
+    trace.detail()("Read buffer of size %ld allocated for file %s.", static_cast<long>(bufferSize),
+                   fileNameLocal());
+    state->pBuffer = state->block.get();
+    state->blockSize = blockSize;
+    if (openLogForReport(state) < 0) {
+        deallocateReportBuffers(&state);
+        return trace.result<void*>(nullptr);
+    }
+    state->bufferCount = 0;
+    state->pBuffer[blockSize] = '\0';
+    BrevanTime::generateTimestamp(std::time(nullptr), state->timestamp);
+    return trace.result<void*>(state);
+}
+
+void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds) {
+    TraceScope trace(anchor);
+    auto& state = *static_cast<SyslogBufferInfo*>(reportState);
+    const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
+    const auto& entry = *static_cast<const zrm_rmlogent_data_t*>(row);
+    while (char* const line = previousLine(state)) {
+        if (formatEntryAsRow(line, row, reportState) != 0) {
+            break;
+        }
+        if (std::memcmp(entry.entrytime, window.endTime, sizeof entry.entrytime) > 0) {
+            continue;
+        }
+        if (std::memcmp(entry.entrytime, window.startTime, sizeof entry.entrytime) < 0) {
+            break; // what stands before it is older still
+        }
+        return trace.result(row);
+    }
+    return trace.result<void*>(nullptr);
+}
+
+/// The newest line that was not given yet, terminated; null at the report's end.
+char* SysLogFile::previousLine(SyslogBufferInfo& state) {
+    TraceScope trace(anchor);
+    for (;;) {
+        if (state.bufferCount == 0 && !refill(state)) {
+            return trace.result<char*>(nullptr);
+        }
+        // The line begins behind the newline before its own, which is the last byte.
+        const std::int64_t end = state.bufferCount;
+        state.pBuffer[end] = '\0';
+        const std::int64_t newline =
+            lastNewline(state.pBuffer, std::max<std::int64_t>(end - longestLine - 1, 0), end - 1);
+        const bool isLong = newline < 0 && end > longestLine;
+        if (newline >= 0 || (!isLong && state.bytesLeft == 0)) {
+            state.bufferCount = newline + 1;
+            return trace.result(state.pBuffer + state.bufferCount);
+        }
+        if (isLong) {
+            if (!cutLongLine(state)) {
+                return trace.result<char*>(nullptr);
+            }
+        } else if (end >= state.blockSize) {
+            --state.bufferCount; // pushing back a whole block would read it again for ever
+        }
+        if (!refill(state)) {
+            return trace.result<char*>(nullptr);
+        }
+    }
+}
+
+/// Drops the end of a line that is too long, so that its first bytes alone remain as a line; false
+/// when that ends the report.
+///
+/// The rule is to drop one byte, to read a block that ends there, and to search again: the report
+/// ends where nothing precedes such a block while the line is still too long. What this comes to
+/// is found without reading a block per byte.
+bool SysLogFile::cutLongLine(SyslogBufferInfo& state) {
+    TraceScope trace(anchor);
+    const std::int64_t blockStart = state.bytesLeft;
+    const std::int64_t lineEnd = blockStart + state.bufferCount;
+    // The newline before the line, or the last place where it may still be.
+    const std::int64_t newline =
+        blockStart + lastNewline(state.pBuffer, 0, state.bufferCount - longestLine - 1);
+    const std::int64_t lastTooLongEnd = newline + longestLine + 2;
+    if (blockStart == 0 || (lastTooLongEnd < lineEnd && lastTooLongEnd <= state.blockSize)) {
+        return trace.result(false);
+    }
+    state.bufferCount = lastTooLongEnd - 1 - blockStart;
+    return trace.result(true);
+}
+
+/// Reads the block before the present one; false when there is none, which ends the report for
+/// good.
+bool SysLogFile::refill(SyslogBufferInfo& state) {
+    if (fillReportBuffer(&state) > 0) {
+        return true;
+    }
+    state.bufferCount = 0;
+    state.bytesLeft = 0;
+    return false;
+}
+
+void SysLogFile::endReportRequest(void** reportState) {
+    TraceScope trace(anchor);
+    auto* state = static_cast<SyslogBufferInfo*>(*reportState);
+    if (state != nullptr) {
+        closeLogForReport(state->fd);
+        deallocateReportBuffers(&state);
+        *reportState = nullptr;
+    }
+}
+
+void SysLogFile::deallocateReportBuffers(SyslogBufferInfo** reportState) {
+    TraceScope trace(anchor);
+    delete *reportState;
+    *reportState = nullptr;
+}

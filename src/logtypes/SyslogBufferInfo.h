@@ -1,0 +1,16 @@
+#ifndef ZRM_SYSLOG_BUFFER_INFO_H
+#define ZRM_SYSLOG_BUFFER_INFO_H
+
+#include "monitor/LogBufferInfo.h"
+
+#include <memory>
+
+/// The state of one report on a syslog file.
+struct SyslogBufferInfo : _LogBufferInfo {
+    /// ENTRYTIME of the entry formatted last, at first the time of the report's start: it tells
+    /// the year of the entries before it.
+    char timestamp[16];
+    std::unique_ptr<char[]> block; ///< owns what pBuffer points to
+};
+
+#endif

@@ -1,0 +1,44 @@
+#include "logtypes/createLogFile.h"
+
+#include "logmgr/ValidLog.h"
+#include "logtypes/AdminLogFile.h"
+#include "logtypes/ErrLogFile.h"
+#include "logtypes/SysLogFile.h"
+
+#include <new>
+
+namespace {
+
+template <typename Kind> LogFile* create(const ValidLog& log, LogFile* chainHead) {
+    return new (std::nothrow) Kind(log, chainHead);
+}
+
+struct LogKind {
+    char letter;
+    LogFile* (*create)(const ValidLog& log, LogFile* chainHead);
+};
+
+constexpr LogKind logKinds[] = {
+    {'S', create<SysLogFile>},
+    {'A', create<AdminLogFile>},
+    {'E', create<ErrLogFile>},
+};
+
+const LogKind* findKind(char type) noexcept {
+    for (const LogKind& kind : logKinds) {
+        if (kind.letter == type) {
+            return &kind;
+        }
+    }
+    return nullptr;
+}
+
+} // namespace
+
+bool isKnownLogType(char type) noexcept {
+    return findKind(type) != nullptr;
+}
+
+LogFile* createLogFile(const ValidLog& log, LogFile* chainHead) {
+    return findKind(log.type())->create(log, chainHead);
+}
