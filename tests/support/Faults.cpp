@@ -41,6 +41,8 @@ std::atomic<bool> g_fakeClock{false};
 std::atomic<std::time_t> g_now{0};
 std::atomic<bool> g_fakeSleep{false};
 std::atomic<unsigned> g_slept{0};
+std::atomic<long> g_blockSize{0};
+std::atomic<pid_t> g_waitedId{0};
 std::string* g_unameSystem = nullptr;
 std::string* g_unameNode = nullptr;
 
@@ -138,6 +140,20 @@ FakeUname::~FakeUname() {
     g_unameSystem = g_unameNode = nullptr;
 }
 
+FakeBlockSize::FakeBlockSize(long size) {
+    g_blockSize = size;
+}
+FakeBlockSize::~FakeBlockSize() {
+    g_blockSize = 0;
+}
+
+FakeWaitedId::FakeWaitedId(pid_t pid) {
+    g_waitedId = pid;
+}
+FakeWaitedId::~FakeWaitedId() {
+    g_waitedId = 0;
+}
+
 // Replaceable allocation functions. The real operator new allocates, so that the matching operator
 // delete of the library or of a sanitizer frees.
 void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
@@ -191,7 +207,6 @@ WRAP_ERRNO(int, close, -1, (int fd), (fd))
 WRAP_ERRNO(int, fclose, EOF, (std::FILE * stream), (stream))
 WRAP_ERRNO(std::FILE*, fdopen, nullptr, (int fd, const char* mode), (fd, mode))
 WRAP_ERRNO(std::FILE*, fopen, nullptr, (const char* path, const char* mode), (path, mode))
-WRAP_ERRNO(pid_t, fork, -1, (), ())
 WRAP_ERRNO(size_t, fread, 0, (void* data, size_t size, size_t count, std::FILE* stream),
            (data, size, count, stream))
 WRAP_ERRNO(size_t, fwrite, 0, (const void* data, size_t size, size_t count, std::FILE* stream),
@@ -238,9 +253,61 @@ WRAP_ERRNO(int, select, -1,
             struct timeval* limit),
            (count, readable, writable, exceptional, limit))
 WRAP_CODE(sigwait, (const sigset_t* set, int* signal), (set, signal))
-WRAP_ERRNO(int, stat, -1, (const char* path, struct stat* status), (path, status))
 WRAP_ERRNO(long, sysconf, -1, (int name), (name))
-WRAP_ERRNO(pid_t, waitpid, -1, (pid_t pid, int* status, int options), (pid, status, options))
+
+// The state's lock is held meanwhile, so that the child finds it free.
+extern "C" pid_t __real_fork();
+extern "C" pid_t __wrap_fork();
+extern "C" pid_t __wrap_fork() {
+    if (const int error = fault("fork")) {
+        errno = error;
+        return -1;
+    }
+    const SpinGuard guard;
+    return __real_fork();
+}
+
+extern "C" int __wrap_execl(const char* path, const char* first, ...);
+extern "C" int __wrap_execl(const char* path, const char* first, ...) {
+    if (const int error = fault("execl")) {
+        errno = error;
+        return -1;
+    }
+    char* arguments[8] = {const_cast<char*>(first)};
+    std::va_list list;
+    va_start(list, first);
+    for (std::size_t i = 1; i < 7 && arguments[i - 1] != nullptr; ++i) {
+        arguments[i] = va_arg(list, char*);
+    }
+    va_end(list);
+    return execv(path, arguments);
+}
+
+extern "C" int __real_stat(const char* path, struct stat* status);
+extern "C" int __wrap_stat(const char* path, struct stat* status);
+extern "C" int __wrap_stat(const char* path, struct stat* status) {
+    if (const int error = fault("stat")) {
+        errno = error;
+        return -1;
+    }
+    const int result = __real_stat(path, status);
+    if (const long blockSize = g_blockSize) {
+        status->st_blksize = blockSize;
+    }
+    return result;
+}
+
+extern "C" pid_t __real_waitpid(pid_t pid, int* status, int options);
+extern "C" pid_t __wrap_waitpid(pid_t pid, int* status, int options);
+extern "C" pid_t __wrap_waitpid(pid_t pid, int* status, int options) {
+    if (const int error = fault("waitpid")) {
+        errno = error;
+        return -1;
+    }
+    const pid_t result = __real_waitpid(pid, status, options);
+    const pid_t waitedId = g_waitedId;
+    return waitedId != 0 ? waitedId : result;
+}
 
 extern "C" int __real_open(const char* path, int flags, ...);
 extern "C" int __wrap_open(const char* path, int flags, ...);

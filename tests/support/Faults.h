@@ -5,6 +5,8 @@
 #include <functional>
 #include <string>
 
+#include <sys/types.h>
+
 /// Makes calls of the C library fail for real. The test programs are linked with --wrap for every
 /// call listed in tests/support/CMakeLists.txt, so the product's own code runs unchanged.
 
@@ -62,6 +64,24 @@ public:
     ~FakeUname();
     FakeUname(const FakeUname&) = delete;
     FakeUname& operator=(const FakeUname&) = delete;
+};
+
+/// While it lives, stat() reports this preferred block size.
+class FakeBlockSize {
+public:
+    explicit FakeBlockSize(long size);
+    ~FakeBlockSize();
+    FakeBlockSize(const FakeBlockSize&) = delete;
+    FakeBlockSize& operator=(const FakeBlockSize&) = delete;
+};
+
+/// While it lives, waitpid() waits for the child that it is asked for and then gives this id.
+class FakeWaitedId {
+public:
+    explicit FakeWaitedId(pid_t pid);
+    ~FakeWaitedId();
+    FakeWaitedId(const FakeWaitedId&) = delete;
+    FakeWaitedId& operator=(const FakeWaitedId&) = delete;
 };
 
 #endif

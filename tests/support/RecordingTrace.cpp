@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <chrono>
 #include <condition_variable>
@@ -10,6 +11,7 @@
 #include <cstdio>
 #include <mutex>
 
+#include <sys/mman.h>
 #include <unistd.h>
 
 std::atomic<unsigned> TRC1_Generation{1};
@@ -24,6 +26,45 @@ struct Recorder {
     std::vector<std::string> events;
     std::atomic<unsigned> level{0};
 };
+
+/// Records of forked children. They share this memory with the test and must neither lock nor
+/// allocate.
+struct ChildRecords {
+    struct Record {
+        std::atomic<bool> isComplete;
+        char text[2048];
+    };
+    std::atomic<std::size_t> used;
+    std::array<Record, 128> records;
+
+    void clear() {
+        for (Record& record : records) {
+            record.isComplete = false;
+        }
+        used = 0;
+    }
+    void add(const char* text) {
+        const std::size_t place = used++;
+        if (place < records.size()) {
+            char* const copy = records[place].text;
+            copy[std::string_view(text).copy(copy, sizeof records[place].text - 1)] = '\0';
+            records[place].isComplete = true;
+        }
+    }
+};
+
+ChildRecords& childRecords() {
+    static auto* const theRecords = static_cast<ChildRecords*>(mmap(
+        nullptr, sizeof(ChildRecords), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0));
+    return *theRecords;
+}
+
+/// The process that reads the records.
+std::atomic<pid_t> testProcess{0};
+
+bool isForkedChild() {
+    return testProcess != 0 && getpid() != testProcess && !testing::internal::InDeathTestChild();
+}
 
 Recorder& recorder() {
     static Recorder* const theRecorder = new Recorder;
@@ -51,6 +92,11 @@ void TRC1_VPrintf(const TRC1_Anchor& /*anchor*/, int /*line*/, const char* forma
     const int savedErrno = errno;
     char text[16384];
     std::vsnprintf(text, sizeof text, format, arguments);
+    if (isForkedChild()) {
+        childRecords().add(text);
+        errno = savedErrno;
+        return;
+    }
     echoInDeathTest(text);
     {
         const std::lock_guard guard(recorder().mutex);
@@ -68,6 +114,9 @@ void TRC1_Printf(const TRC1_Anchor& anchor, int line, const char* format, ...) n
 }
 
 void TRC1_Event(const TRC1_Anchor& anchor, int /*line*/, TRC1_EventKind kind, long value) noexcept {
+    if (isForkedChild()) {
+        return;
+    }
     std::string text = std::string(anchor.unit) + (kind == TRC1_ENTRY ? " entry" : " exit");
     if (kind == TRC1_EXIT_VALUE) {
         text += " " + std::to_string(value);
@@ -77,6 +126,7 @@ void TRC1_Event(const TRC1_Anchor& anchor, int /*line*/, TRC1_EventKind kind, lo
 }
 
 RecordingTrace::RecordingTrace(unsigned level) {
+    testProcess = getpid();
     clear();
     setLevel(level);
 }
@@ -93,6 +143,17 @@ void RecordingTrace::setLevel(unsigned level) {
 std::vector<std::string> RecordingTrace::messages() const {
     const std::lock_guard guard(recorder().mutex);
     return recorder().messages;
+}
+
+std::vector<std::string> RecordingTrace::childMessages() const {
+    const ChildRecords& children = childRecords();
+    std::vector<std::string> messages;
+    for (std::size_t i = 0; i < std::min(children.used.load(), children.records.size()); ++i) {
+        if (children.records[i].isComplete) {
+            messages.emplace_back(children.records[i].text);
+        }
+    }
+    return messages;
 }
 
 std::vector<std::string> RecordingTrace::events() const {
@@ -118,4 +179,5 @@ void RecordingTrace::clear() {
     const std::lock_guard guard(recorder().mutex);
     recorder().messages.clear();
     recorder().events.clear();
+    childRecords().clear();
 }

@@ -21,6 +21,9 @@ public:
     void setLevel(unsigned level);
     /// The texts recorded so far, in order.
     std::vector<std::string> messages() const;
+    /// The texts that forked children of this process recorded before their exec, in order. Wait
+    /// for a child's end, or for what its command does, before asking.
+    std::vector<std::string> childMessages() const;
     /// The entry and exit events, as "unit entry", "unit exit" or "unit exit VALUE".
     std::vector<std::string> events() const;
     /// Number of records with exactly this text.
