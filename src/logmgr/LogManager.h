@@ -15,23 +15,26 @@
 class LogFile;
 
 /// The single owner of everything that is monitored. Its manager thread reads the configuration,
-/// builds and deletes the monitoring objects and takes the process's signals; requests of the
-/// tables bracket their use of the chain of logs with beginRequest and endRequest.
+/// builds and deletes the monitoring objects and takes the process's signals (SIGHUP, SIGINT,
+/// SIGTERM, SIGQUIT and SIGCHLD, which the creator has blocked before any thread exists); requests
+/// of the tables bracket their use of the chain of logs with beginRequest and endRequest. Lives
+/// from start-up until the exit routine destroys it.
 class LogManager {
 public:
-    /// Reads the environment and starts the manager thread.
+    /// Reads the environment and starts the manager thread. Ends the process when that fails.
     LogManager();
     LogManager(const LogManager&) = delete;
     LogManager& operator=(const LogManager&) = delete;
-    /// Stops the manager thread and every log.
+    /// Stops the manager thread and every log; may run on the manager thread itself.
     ~LogManager();
 
     // For requests, on any thread.
 
     /// Holds the chain of logs still until endRequest: a refresh waits.
     void beginRequest();
+    /// Ends a request; a refresh that waits for the last one goes on.
     void endRequest();
-    /// Records that the framework has begun to serve requests.
+    /// Records that the framework has begun to serve requests; a stop waits for that.
     void setServerUp();
     /// Walks the chain between beginRequest and endRequest: null gives the first log; `index` is
     /// the number of logs already given. Null at the end.
@@ -39,46 +42,66 @@ public:
     /// The monitored log of this local name, or null. Between beginRequest and endRequest.
     LogFile* findLogObject(const char* localName);
     std::uint32_t numLogs() const noexcept { return NumLogs.load(); }
-    /// The open debug log, or null. Any thread.
+    /// The open debug log, or null. Any thread; it stays open as long as any log exists.
     std::FILE* debugLogStream() const noexcept { return DebugLogP.load(); }
 
+    /// Writes one record of all fields, whatever the level. Any thread.
     void printSelf() const;
 
 private:
     friend void* managerThread(void* manager);
 
     void getEnvVars();
-    std::unique_ptr<char[]> allocMem(std::size_t size);
+    std::unique_ptr<char[]> allocMem(std::size_t size) const;
+    std::unique_ptr<char[]> copyOf(const char* text) const;
+
     void startManagerThread();
     void stopManagerThread();
+    /// Waits for the next signal that matters: true for a refresh, false to stop.
     bool waitForSignal();
+    void terminateFramework();
+    void waitForServer();
+    /// Waits on a condition with the manager locked (`limit` null: for ever); only here and in
+    /// sleep and sigwait can the manager thread be cancelled.
+    int waitFor(pthread_cond_t& condition, const timespec* limit);
+
+    /// Re-reads the configuration; returns the number of logs, 0 when there is nothing to do.
     std::uint32_t refresh();
+    void waitForRequests();
     std::uint32_t getValidLogs();
+    std::uint32_t getDefaultLogs();
     std::uint32_t createValidLogList(WhenceConfig whence, const char* path);
+    void discardValidLogs();
     void buildLogObjects(unsigned validCount);
+    void buildLogObject(const ValidLog& log);
+    void deleteMarkedLogs();
     void deleteNextLog(LogFile* log, unsigned depth);
     void deleteLogObject(LogFile* log);
+
     void lockManager();
     void unlockManager();
     void shutdown();
     void openDebugLog();
     void closeDebugLog();
 
-    bool AgentServerUp = false;
+    // What printSelf reads while other threads write is atomic.
+    std::atomic<bool> AgentServerUp{false};
     std::unique_ptr<char[]> ConfigFile;
     std::unique_ptr<char[]> DebugLog;
     std::unique_ptr<char[]> SyslogConfFile;
     std::atomic<std::FILE*> DebugLogP{nullptr};
-    LogFile* FirstLogObject = nullptr;
+    std::atomic<LogFile*> FirstLogObject{nullptr}; ///< owns the circular chain of NumLogs objects
     pthread_cond_t AgentServerNotUp;
     pthread_cond_t ManagerNotInUse;
-    pthread_mutex_t ManagerLock;
-    pthread_t ManagerThread;
-    std::time_t ConfigFileLastChanged = 0;
-    std::time_t SyslogConfFileLastChanged = 0;
+    pthread_mutex_t ManagerLock; ///< guards AgentServerUp, UseCount, the chain and NumLogs
+    std::atomic<pthread_t> ManagerThread{};
+    std::atomic<std::time_t> ConfigFileLastChanged{0};
+    std::atomic<std::time_t> SyslogConfFileLastChanged{0};
     std::atomic<std::uint32_t> NumLogs{0};
-    std::int32_t UseCount = 0;
-    ValidLog* FirstValidLog = nullptr;
+    std::atomic<std::int32_t> UseCount{0};
+    /// Owns the circular chain of valid logs, which exists from the reading of the configuration
+    /// to the building of the objects.
+    std::atomic<ValidLog*> FirstValidLog{nullptr};
 };
 
 /// The manager thread's start routine; its argument is the LogManager.

@@ -1,0 +1,177 @@
+// The refresh of LogManager: monitoring objects are built and deleted to fit the configuration.
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "logmgr/LogManager.h"
+#include "logmgr/ManagerCancellation.h"
+#include "logtypes/createLogFile.h"
+#include "monitor/LogFile.h"
+
+#include <cstdlib>
+#include <cstring>
+
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"LogManagerRefresh.cpp"};
+
+constexpr unsigned noWorkSeconds = 60; ///< how long an agent without logs stays before it ends
+
+/// True when the object goes on as the monitor of this line, under a new debug mode perhaps.
+bool canMonitor(const LogFile& object, const ValidLog& log) {
+    return object.type() == log.type() && std::strcmp(object.procedure(), log.procedure()) == 0;
+}
+
+} // namespace
+
+std::uint32_t LogManager::refresh() {
+    TraceScope trace(anchor);
+    if (DebugLog && DebugLogP == nullptr) {
+        openDebugLog();
+    }
+    const std::uint32_t validCount = getValidLogs();
+    if (validCount > 0) {
+        lockManager();
+        waitForRequests();
+        buildLogObjects(validCount);
+        unlockManager();
+        if (trace.isOn(TRC1_DETAIL)) {
+            printSelf();
+        }
+    } else if (NumLogs != 0) {
+        trace.detail()("Continuing to monitor existing log files.");
+    }
+    if (NumLogs == 0) {
+        trace.error()("Agent has no work to do.  Exiting...");
+        const ManagerCancellation allowed;
+        sleep(noWorkSeconds);
+    }
+    return trace.result(NumLogs.load());
+}
+
+/// Waits, with the manager locked, until no request uses the chain.
+void LogManager::waitForRequests() {
+    TraceScope trace(anchor);
+    if (UseCount == 0) {
+        return;
+    }
+    while (UseCount != 0) {
+        trace.detail()("Refresh suspended pending completion of outstanding requests.");
+        if (const int code = waitFor(ManagerNotInUse, nullptr)) {
+            const ErrorText error(code);
+            trace.error()("Error blocking on the manager-not-in-use condition variable. Return "
+                          "code = %d; %s",
+                          error.number(), error.text());
+        }
+    }
+    trace.detail()("Refresh resuming.");
+}
+
+void LogManager::buildLogObjects(unsigned validCount) {
+    TraceScope trace(anchor);
+    LogFile* object = FirstLogObject;
+    for (std::uint32_t i = 0; i < NumLogs; ++i) {
+        object->setMarked(true);
+        object = object->next();
+    }
+    const ValidLog* log = FirstValidLog;
+    for (unsigned i = 0; i < validCount; ++i) {
+        buildLogObject(*log);
+        log = log->next();
+    }
+    deleteMarkedLogs();
+    if (NumLogs != validCount) {
+        trace.error()("Fatal error during refresh processing. No. of valid logs = %d: No. of "
+                      "actual logs = %d. Agent is terminating.",
+                      static_cast<int>(validCount), static_cast<int>(NumLogs.load()));
+        std::exit(-1);
+    }
+    discardValidLogs();
+}
+
+/// Lets the log's present object go on, or creates a new one.
+void LogManager::buildLogObject(const ValidLog& log) {
+    TraceScope trace(anchor);
+    LogFile* const present = findLogObject(log.fileNameLocal());
+    if (present != nullptr && canMonitor(*present, log)) {
+        *present = log;
+        present->setMarked(false);
+        return;
+    }
+    if (!isKnownLogType(log.type())) {
+        trace.error()("Error during refresh processing. Unknown log type %d encountered for file "
+                      "%s. Log not monitored.",
+                      static_cast<int>(log.type()), log.fileNameLocal());
+        return;
+    }
+    LogFile* const created = createLogFile(log, FirstLogObject);
+    if (created == nullptr) {
+        trace.error()("Memory allocation for LogFile object failed.  Agent is terminating.");
+        std::exit(-1);
+    }
+    if (FirstLogObject == nullptr) {
+        FirstLogObject = created;
+    }
+    ++NumLogs;
+}
+
+void LogManager::deleteMarkedLogs() {
+    TraceScope trace(anchor);
+    LogFile* object = FirstLogObject;
+    for (std::uint32_t left = NumLogs; left > 0; --left) {
+        LogFile* const next = object->next();
+        if (object->isMarked()) {
+            deleteLogObject(object);
+        }
+        object = next;
+    }
+}
+
+void LogManager::discardValidLogs() {
+    TraceScope trace(anchor);
+    ValidLog* const first = FirstValidLog.exchange(nullptr);
+    if (first == nullptr) {
+        return;
+    }
+    while (first->prev() != first) {
+        delete first->prev();
+    }
+    delete first;
+}
+
+void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
+    TraceScope trace(anchor);
+    if (depth > NumLogs) {
+        trace.error()("Log object chain corrupted. Expected number of logs = %d; actual number = "
+                      "%d. Agent is terminating.",
+                      static_cast<int>(NumLogs.load()), static_cast<int>(depth));
+        std::exit(-1);
+    }
+    if (log->next() != FirstLogObject) {
+        deleteNextLog(log->next(), depth + 1);
+    }
+    deleteLogObject(log);
+}
+
+void LogManager::deleteLogObject(LogFile* log) {
+    TraceScope trace(anchor);
+    std::uint32_t count = 0;
+    const LogFile* member = FirstLogObject;
+    do {
+        ++count;
+        member = member->next();
+    } while (member != FirstLogObject && count < NumLogs);
+    if (count != NumLogs) {
+        trace.error()("Log object chain corrupted. Expected number of logs = %d; actual number = "
+                      "%d. Agent is terminating.",
+                      static_cast<int>(NumLogs.load()), static_cast<int>(count));
+        std::exit(-1);
+    }
+    if (log == FirstLogObject) {
+        FirstLogObject = NumLogs == 1 ? nullptr : log->next();
+    }
+    trace.detail()("Deleting log object for file %s.", log->fileNameLocal());
+    delete log;
+    --NumLogs;
+}
