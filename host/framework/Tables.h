@@ -5,9 +5,14 @@
 
 class TableManager;
 
-/// The tables that the agent has registered. Written by TableManager::RegisterWithManager while the
-/// agent's loader runs, read-only afterwards.
+/// The tables that the agent has registered. Any thread; neither locks nor allocates.
 namespace Tables {
+
+/// Makes a table known (TableManager::RegisterWithManager); returns 0 or a status.
+unsigned add(TableManager* manager) noexcept;
+
+/// Forgets a table; nothing happens when it is not known.
+void remove(const TableManager* manager) noexcept;
 
 /// The manager of this table ("RMLOGENT", "RMMONLOG"), or null.
 TableManager* find(std::string_view table) noexcept;

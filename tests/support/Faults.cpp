@@ -212,6 +212,7 @@ WRAP_ERRNO(size_t, fread, 0, (void* data, size_t size, size_t count, std::FILE* 
 WRAP_ERRNO(size_t, fwrite, 0, (const void* data, size_t size, size_t count, std::FILE* stream),
            (data, size, count, stream))
 WRAP_ERRNO(char*, getcwd, nullptr, (char* buffer, size_t size), (buffer, size))
+WRAP_ERRNO(int, gethostname, -1, (char* name, size_t size), (name, size))
 WRAP_ERRNO(int, kill, -1, (pid_t pid, int signal), (pid, signal))
 WRAP_ERRNO(struct tm*, localtime_r, nullptr, (const time_t* time, struct tm* result),
            (time, result))

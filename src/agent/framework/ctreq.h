@@ -50,9 +50,10 @@ public:
     unsigned GetFilterInfo(SEL1_FILTERINFO** filter);
     /// Starts the walk over the conditions afresh.
     void ResetFilterIndex();
-    /// Compares a character column of `width` bytes with a filter value.
+    /// Compares a character column of `width` bytes with a terminated text, neither's padding
+    /// counting.
     int IsException(_IntfOper op, const char* column, const char* value, int width);
-    /// Compares an integer column with a filter value.
+    /// Compares an integer column with a number of 8 bytes in host order, perhaps unaligned.
     int IsException(_IntfOper op, int column, const char* value);
     /// Dumps the conditions to the trace.
     void DumpThresholds();

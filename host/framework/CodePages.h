@@ -1,0 +1,31 @@
+#ifndef ZRM_HOST_CODE_PAGES_H
+#define ZRM_HOST_CODE_PAGES_H
+
+#include "agent/framework/locale.h"
+
+#include <cstdint>
+#include <string_view>
+
+inline constexpr std::uint32_t LOC2_ASCII = 367; ///< code page number of ASCII
+
+/// One code set that the host knows by number; also what the agent holds as a locale. Every code
+/// set here holds ASCII as its first 128 codes and keeps no shift state. Immutable and static.
+struct LOC2_Locale {
+    std::string_view codeSet; ///< as nl_langinfo(CODESET) names it, also a name that iconv knows
+    std::uint32_t codePage;   ///< 0: a code set without a number
+    bool singleByte;          ///< every character is one byte
+};
+
+/// The code sets and their code page numbers.
+namespace CodePages {
+
+/// The code set of this name, whatever its capitals, hyphens and underscores; the one without a
+/// number when the name is unknown. Never null.
+const LOC2_Locale* byName(std::string_view codeSet) noexcept;
+
+/// The first code set of this number; null when there is none.
+const LOC2_Locale* byNumber(std::uint32_t codePage) noexcept;
+
+} // namespace CodePages
+
+#endif

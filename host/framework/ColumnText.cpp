@@ -1,0 +1,58 @@
+#include "host/framework/ColumnText.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+
+#include <string.h>
+
+namespace {
+
+constexpr std::uint64_t kBlanks = 0x2020202020202020;
+
+/// Difference of the text's first byte that is not a blank from a blank; 0 when there is none.
+int compareWithBlanks(std::string_view text) noexcept {
+    const std::size_t position = text.find_first_not_of(' ');
+    return position == std::string_view::npos ? 0
+                                              : static_cast<unsigned char>(text[position]) - ' ';
+}
+
+} // namespace
+
+std::string_view ColumnText::withoutTrailingBlanks(std::string_view text) noexcept {
+    std::size_t size = text.size();
+    // Most columns are mostly padding, so eight blanks are taken at a time.
+    while (size >= sizeof kBlanks) {
+        std::uint64_t word;
+        std::memcpy(&word, text.data() + size - sizeof word, sizeof word);
+        if (word != kBlanks) {
+            break;
+        }
+        size -= sizeof word;
+    }
+    while (size > 0 && text[size - 1] == ' ') {
+        --size;
+    }
+    return text.substr(0, size);
+}
+
+std::string_view ColumnText::unpadded(const char* field, std::size_t width) noexcept {
+    return withoutTrailingBlanks({field, strnlen(field, width)});
+}
+
+bool ColumnText::isPadding(const char* rest, std::size_t width) noexcept {
+    std::size_t position = 0;
+    while (position < width && rest[position] == ' ') {
+        ++position;
+    }
+    return position == width || rest[position] == '\0';
+}
+
+int ColumnText::compare(const char* field, std::size_t width, std::string_view value) noexcept {
+    const std::string_view text(field, strnlen(field, width));
+    const std::size_t common = std::min(text.size(), value.size());
+    if (const int order = std::memcmp(text.data(), value.data(), common)) {
+        return order;
+    }
+    return compareWithBlanks(text.substr(common)) - compareWithBlanks(value.substr(common));
+}

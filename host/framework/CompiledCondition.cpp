@@ -1,0 +1,215 @@
+#include "host/framework/CompiledCondition.h"
+
+#include "agent/TraceScope.h"
+#include "agent/framework/ctreq.h"
+#include "agent/framework/locale.h"
+#include "host/framework/ColumnText.h"
+#include "host/framework/Comparison.h"
+#include "host/framework/Condition.h"
+#include "host/framework/Utf8.h"
+
+#include <algorithm>
+#include <cstring>
+#include <utility>
+
+#include <re2/re2.h>
+#include <string.h>
+
+namespace {
+
+TRC1_Anchor anchor{"CompiledCondition.cpp"};
+
+/// The columns that name a log. Most situations are on one log, and most rows are another's; names
+/// differ more than directories do.
+constexpr std::pair<std::string_view, int> kLogColumns[] = {
+    {"LOGNAME", 1}, {"ULOGNAME", 1}, {"LOGPATH", 2}, {"ULOGPATH", 2}};
+
+std::string_view textOf(const SEL1_FILTERINFO& filter) {
+    return {filter.value, static_cast<std::size_t>(std::max<int>(filter.valueLength, 0))};
+}
+
+std::vector<std::string_view> linesOf(std::string_view text) {
+    std::vector<std::string_view> lines;
+    for (std::size_t end; (end = text.find('\n')) != std::string_view::npos;) {
+        lines.push_back(text.substr(0, end));
+        text.remove_prefix(end + 1);
+    }
+    lines.push_back(text);
+    return lines;
+}
+
+/// The part of a value that a column of this width can hold.
+std::string_view cut(std::string_view value, const RowColumn& column) {
+    return column.type == COLUMN_UTF8 ? Utf8::prefix(value, column.width)
+                                      : value.substr(0, column.width);
+}
+
+/// Columns in the local code page are matched byte by byte where that is not UTF-8; the pattern
+/// must be ASCII then.
+bool isByteMatch(const RowColumn& column, std::string_view pattern) {
+    return column.type != COLUMN_UTF8 && Utf8::asciiPrefix(pattern) == pattern.size() &&
+           LOC2_GetLocaleNumInfo(LOC2_GetLocale(0, 0, 0, nullptr), LOC2_CODEPAGE, nullptr) !=
+               LOC2_UTF8;
+}
+
+} // namespace
+
+CompiledCondition::CompiledCondition(const SEL1_FILTERINFO& filter, const RowColumn* column)
+    : m_op(filter.compareOperator), m_value(textOf(filter)), m_filter(&filter) {
+    if (column == nullptr) {
+        m_kind = Kind::FOREIGN;
+    } else {
+        m_offset = column->offset;
+        m_width = column->width;
+        if (column->isInteger()) {
+            compileInteger(filter);
+        } else {
+            compileText(*column);
+        }
+    }
+    m_rank = rankOf(column);
+}
+
+CompiledCondition::CompiledCondition(CompiledCondition&&) noexcept = default;
+CompiledCondition& CompiledCondition::operator=(CompiledCondition&&) noexcept = default;
+CompiledCondition::~CompiledCondition() = default;
+
+void CompiledCondition::compileInteger(const SEL1_FILTERINFO& filter) {
+    if (m_op == INTF_IN) {
+        for (const std::string_view text : linesOf(m_value)) {
+            if (const auto number = Comparison::number(text)) {
+                m_numbers.push_back(*number);
+            }
+        }
+        m_kind = Kind::INTEGER_IN;
+        return;
+    }
+    if (!Comparison::isRelational(m_op)) {
+        return;
+    }
+    if (filter.dataType == SEL1_INTEGER) {
+        std::memcpy(&m_number, filter.value, sizeof m_number);
+        m_kind = Kind::INTEGER;
+    } else if (const auto number = Comparison::number(m_value)) {
+        m_number = *number;
+        m_kind = Kind::INTEGER;
+    }
+}
+
+void CompiledCondition::compileText(const RowColumn& column) {
+    if (m_filter->dataType == SEL1_INTEGER) {
+        return;
+    }
+    if (Comparison::isRelational(m_op)) {
+        m_value = ColumnText::withoutTrailingBlanks(cut(m_value, column));
+        m_kind = m_op == INTF_EQUAL ? Kind::TEXT_EQUAL : Kind::TEXT_ORDER;
+    } else if (m_op == INTF_IN) {
+        for (const std::string_view text : linesOf(m_value)) {
+            m_values.push_back(ColumnText::withoutTrailingBlanks(cut(text, column)));
+        }
+        m_kind = Kind::TEXT_IN;
+    } else if (m_op == INTF_STARTS) {
+        m_kind = Kind::STARTS;
+    } else if (m_op == INTF_CONTAINS) {
+        m_kind = Kind::CONTAINS;
+    } else if (m_op == INTF_MATCHES) {
+        compilePattern(column);
+    }
+}
+
+void CompiledCondition::compilePattern(const RowColumn& column) {
+    TraceScope trace(anchor);
+    re2::RE2::Options options;
+    options.set_log_errors(false);
+    if (isByteMatch(column, m_value)) {
+        options.set_encoding(re2::RE2::Options::EncodingLatin1);
+    }
+    m_pattern =
+        std::make_unique<re2::RE2>(re2::StringPiece(m_value.data(), m_value.size()), options);
+    if (m_pattern->ok()) {
+        m_kind = Kind::MATCHES;
+    } else {
+        trace.error()("Pattern %.*s for column %s cannot be used: %s.",
+                      static_cast<int>(m_value.size()), m_value.data(), column.name.c_str(),
+                      m_pattern->error().c_str());
+    }
+}
+
+int CompiledCondition::rankOf(const RowColumn* column) const noexcept {
+    if (m_kind == Kind::TEXT_EQUAL) {
+        for (const auto& [name, rank] : kLogColumns) {
+            if (column->name == name) {
+                return rank;
+            }
+        }
+    }
+    // The kinds stand in the order of their cost; one that never holds spares all others.
+    return m_kind == Kind::NEVER ? 0 : 2 + static_cast<int>(m_kind);
+}
+
+bool CompiledCondition::holds(ctreq* request, char* row) const {
+    const char* const field = row + m_offset;
+    std::int32_t number;
+    switch (m_kind) {
+    case Kind::NEVER:
+        return false;
+    case Kind::INTEGER:
+        std::memcpy(&number, field, sizeof number);
+        return Comparison::holds(m_op, Comparison::order(number, m_number));
+    case Kind::INTEGER_IN:
+        std::memcpy(&number, field, sizeof number);
+        return std::find(m_numbers.begin(), m_numbers.end(), number) != m_numbers.end();
+    case Kind::TEXT_EQUAL:
+        return isEqual(field);
+    case Kind::TEXT_ORDER:
+        return Comparison::holds(m_op, ColumnText::compare(field, m_width, m_value));
+    case Kind::TEXT_IN:
+        return isOneOf(field);
+    case Kind::STARTS:
+        return startsWith(field);
+    case Kind::CONTAINS:
+        return contains(field);
+    case Kind::MATCHES:
+        return matches(field);
+    case Kind::FOREIGN:
+        return request->ColumnIsException(row, const_cast<char*>(m_filter->columnName), m_op,
+                                          const_cast<char*>(m_filter->value)) != 0;
+    }
+    return false;
+}
+
+bool CompiledCondition::isEqual(const char* field) const noexcept {
+    // The value holds no NUL, so where its bytes are the field's, the field's text reaches as far.
+    const std::size_t length = m_value.size();
+    return std::memcmp(field, m_value.data(), length) == 0 &&
+           ColumnText::isPadding(field + length, m_width - length);
+}
+
+bool CompiledCondition::startsWith(const char* field) const noexcept {
+    const std::size_t length = m_value.size();
+    if (length > m_width || std::memcmp(field, m_value.data(), length) != 0) {
+        return false;
+    }
+    // A value that ends in a blank must not be met by padding.
+    return length == 0 || m_value.back() != ' ' ||
+           ColumnText::unpadded(field, m_width).size() >= length;
+}
+
+bool CompiledCondition::contains(const char* field) const noexcept {
+    std::string_view text(field, strnlen(field, m_width));
+    if (m_value.ends_with(' ')) {
+        text = ColumnText::withoutTrailingBlanks(text);
+    }
+    return memmem(text.data(), text.size(), m_value.data(), m_value.size()) != nullptr;
+}
+
+bool CompiledCondition::isOneOf(const char* field) const noexcept {
+    const std::string_view text = ColumnText::unpadded(field, m_width);
+    return std::find(m_values.begin(), m_values.end(), text) != m_values.end();
+}
+
+bool CompiledCondition::matches(const char* field) const {
+    const std::string_view text = ColumnText::unpadded(field, m_width);
+    return m_pattern->Match(re2::StringPiece(text.data(), text.size()), 0, text.size(),
+                            re2::RE2::UNANCHORED, nullptr, 0);
+}

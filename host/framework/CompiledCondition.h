@@ -1,0 +1,76 @@
+#ifndef ZRM_HOST_COMPILED_CONDITION_H
+#define ZRM_HOST_COMPILED_CONDITION_H
+
+#include "agent/framework/filters.h"
+#include "host/framework/RowLayout.h"
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+class ctreq;
+namespace re2 {
+class RE2;
+}
+
+/// One condition made ready for evaluation: the column found, numbers read, the pattern compiled.
+/// A column compares without its padding; a value longer than the column is cut to the column's
+/// width when it is compared by order, since that is all the column can hold. A condition that
+/// makes no sense (no number for an integer column, a bad pattern, an unknown operator) never
+/// holds. Evaluation neither locks nor allocates, patterns excepted: these are RE2's.
+class CompiledCondition {
+public:
+    /// `column` is null for a column that the table does not describe: then the table itself is
+    /// asked. The filter's texts must outlive the object.
+    CompiledCondition(const SEL1_FILTERINFO& filter, const RowColumn* column);
+    CompiledCondition(CompiledCondition&&) noexcept;
+    CompiledCondition& operator=(CompiledCondition&&) noexcept;
+    ~CompiledCondition();
+
+    /// Whether the row meets the condition. `request` is asked about columns unknown here.
+    bool holds(ctreq* request, char* row) const;
+
+    /// Rank in the order of evaluation: what is cheap and refuses most comes first.
+    int rank() const noexcept { return m_rank; }
+
+private:
+    enum class Kind : unsigned char {
+        NEVER,
+        INTEGER,
+        INTEGER_IN,
+        TEXT_EQUAL,
+        TEXT_ORDER,
+        TEXT_IN,
+        STARTS,
+        CONTAINS,
+        MATCHES,
+        FOREIGN,
+    };
+
+    void compileInteger(const SEL1_FILTERINFO& filter);
+    void compileText(const RowColumn& column);
+    void compilePattern(const RowColumn& column);
+    int rankOf(const RowColumn* column) const noexcept;
+
+    bool isEqual(const char* field) const noexcept;
+    bool startsWith(const char* field) const noexcept;
+    bool contains(const char* field) const noexcept;
+    bool isOneOf(const char* field) const noexcept;
+    bool matches(const char* field) const;
+
+    Kind m_kind = Kind::NEVER;
+    _IntfOper m_op;
+    int m_rank;
+    std::size_t m_offset = 0;
+    std::size_t m_width = 0;
+    std::string_view m_value;
+    std::int64_t m_number = 0;
+    std::vector<std::int64_t> m_numbers;    ///< of INTEGER_IN
+    std::vector<std::string_view> m_values; ///< of TEXT_IN
+    std::unique_ptr<re2::RE2> m_pattern;    ///< of MATCHES
+    const SEL1_FILTERINFO* m_filter;
+};
+
+#endif

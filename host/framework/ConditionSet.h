@@ -1,0 +1,25 @@
+#ifndef ZRM_HOST_CONDITION_SET_H
+#define ZRM_HOST_CONDITION_SET_H
+
+#include "host/framework/CompiledCondition.h"
+
+#include <vector>
+
+class FilterList;
+
+/// All conditions of one request, ready for evaluation, in the order in which a row is refused
+/// soonest. Immutable once built; the filters and the request must outlive it.
+class ConditionSet {
+public:
+    /// Asks the request for its columns, so it must be fully constructed.
+    ConditionSet(const FilterList& filters, ctreq& request);
+
+    /// True when every condition holds; so also when there is none.
+    bool holds(char* row) const;
+
+private:
+    ctreq& m_request;
+    std::vector<CompiledCondition> m_conditions;
+};
+
+#endif

@@ -1,0 +1,147 @@
+#include "host/framework/Converter.h"
+
+#include "host/framework/IconvCache.h"
+#include "host/framework/Utf8.h"
+
+#include <algorithm>
+#include <cerrno>
+
+namespace {
+
+std::string_view substituteOf(const LOC2_Locale& codeSet) noexcept {
+    if (codeSet.codePage == LOC2_UTF8) {
+        return Utf8::kReplacement;
+    }
+    return codeSet.singleByte ? "\x1A" : "?";
+}
+
+/// The target of one conversion and how far it is filled.
+class Target {
+public:
+    Target(const LOC2_Locale& codeSet, char* data, std::size_t size) noexcept
+        : m_data(data), m_size(size), m_substitute(substituteOf(codeSet)) {}
+
+    /// Appends a text of single-byte characters as far as it fits; true when it fits whole.
+    bool put(std::string_view text) noexcept {
+        const std::size_t fitting = std::min(text.size(), room());
+        std::copy_n(text.data(), fitting, m_data + m_written);
+        m_written += fitting;
+        return fitting == text.size();
+    }
+    /// The same for valid UTF-8.
+    bool putUtf8(std::string_view text) noexcept {
+        const std::string_view fitting = Utf8::prefix(text, room());
+        put(fitting);
+        return fitting.size() == text.size();
+    }
+    /// Appends the substitution character; false when there is no room for it.
+    bool putSubstitute() noexcept { return m_substitute.size() <= room() && put(m_substitute); }
+
+    char* end() noexcept { return m_data + m_written; }
+    void advanceTo(const char* end) noexcept { m_written = static_cast<std::size_t>(end - m_data); }
+    std::size_t room() const noexcept { return m_size - m_written; }
+    std::size_t written() const noexcept { return m_written; }
+
+private:
+    char* m_data;
+    std::size_t m_size;
+    std::string_view m_substitute;
+    std::size_t m_written = 0;
+};
+
+bool copyUtf8(Target& target, std::string_view source) noexcept {
+    while (!source.empty()) {
+        const std::size_t valid = Utf8::validPrefix(source);
+        if (!target.putUtf8(source.substr(0, valid))) {
+            return false;
+        }
+        source.remove_prefix(valid);
+        if (!source.empty()) {
+            if (!target.putSubstitute()) {
+                return false;
+            }
+            source.remove_prefix(Utf8::firstSequence(source).length);
+        }
+    }
+    return true;
+}
+
+/// ASCII has no characters beyond 127.
+bool copyAscii(Target& target, std::string_view source) noexcept {
+    while (!source.empty()) {
+        const std::size_t valid = Utf8::asciiPrefix(source);
+        if (!target.put(source.substr(0, valid))) {
+            return false;
+        }
+        source.remove_prefix(valid);
+        if (!source.empty()) {
+            if (!target.putSubstitute()) {
+                return false;
+            }
+            source.remove_prefix(1);
+        }
+    }
+    return true;
+}
+
+/// Length of the source that one substitution character stands for, after iconv refused it.
+std::size_t refusedLength(const LOC2_Locale& from, std::string_view source, int error) noexcept {
+    if (from.codePage == LOC2_UTF8) {
+        return Utf8::firstSequence(source).length;
+    }
+    // EINVAL: the text ends within a character.
+    return error == EINVAL ? source.size() : 1;
+}
+
+bool convertWith(iconv_t converter, Target& target, const LOC2_Locale& from,
+                 std::string_view source) noexcept {
+    while (!source.empty()) {
+        // iconv does not write to its source, whatever its declaration says.
+        char* in = const_cast<char*>(source.data());
+        std::size_t inLeft = source.size();
+        char* out = target.end();
+        std::size_t outLeft = target.room();
+        const std::size_t result = iconv(converter, &in, &inLeft, &out, &outLeft);
+        const int error = errno;
+        target.advanceTo(out);
+        source.remove_prefix(source.size() - inLeft);
+        if (result != static_cast<std::size_t>(-1)) {
+            return true;
+        }
+        if (error == E2BIG || !target.putSubstitute()) {
+            return false;
+        }
+        source.remove_prefix(refusedLength(from, source, error));
+    }
+    return true;
+}
+
+} // namespace
+
+Converted Converter::convert(const LOC2_Locale& to, char* target, std::size_t targetSize,
+                             const LOC2_Locale& from, std::string_view source) noexcept {
+    Target out(to, target, targetSize);
+    // Most text is ASCII, which every code set holds as it is.
+    const std::size_t ascii = Utf8::asciiPrefix(source);
+    if (!out.put(source.substr(0, ascii))) {
+        return {out.written(), false};
+    }
+    source.remove_prefix(ascii);
+    if (source.empty()) {
+        return {out.written(), true};
+    }
+    bool complete = false;
+    if (to.codePage == from.codePage && to.codePage == LOC2_UTF8) {
+        complete = copyUtf8(out, source);
+    } else if (to.codePage == from.codePage && to.singleByte) {
+        const bool isAscii = to.codePage == LOC2_ASCII;
+        complete = isAscii ? copyAscii(out, source) : out.put(source);
+    } else {
+        const iconv_t converter = IconvCache::find(to, from);
+        if (converter == IconvCache::none()) {
+            return {0, false, false};
+        }
+        complete = convertWith(converter, out, from, source);
+    }
+    return {out.written(), complete};
+}

@@ -1,0 +1,154 @@
+#include "host/framework/HandleTable.h"
+
+#include <atomic>
+#include <cstdint>
+#include <mutex>
+#include <new>
+
+namespace {
+
+// A slot's state: generation in the upper 16 bits, the closed flag, the number of pins. One 32-bit
+// word, so that taking a pin and checking the generation are one atomic step.
+constexpr unsigned kGenerationShift = 16;
+constexpr std::uint32_t kClosed = 0x8000;
+constexpr std::uint32_t kPins = 0x7fff;
+
+constexpr unsigned kChunkSize = 1024;
+constexpr unsigned kChunks = 64;
+constexpr std::uint32_t kNone = 0xffffffff;
+
+struct Slot {
+    std::atomic<std::uint32_t> state{kClosed};
+    std::atomic<ctreq*> request{nullptr};
+    std::uint32_t nextFree = kNone; ///< guarded by the mutex
+};
+
+// Constant-initialised and without destructors: requests are used while the process exits.
+std::atomic<Slot*> g_chunks[kChunks];
+constinit std::mutex g_mutex;
+// The free slots, oldest first; guarded by the mutex.
+unsigned g_chunkCount = 0;
+std::uint32_t g_firstFree = kNone;
+std::uint32_t g_lastFree = kNone;
+
+Slot& slotAt(std::uint32_t index) noexcept {
+    return g_chunks[index / kChunkSize].load(std::memory_order_acquire)[index % kChunkSize];
+}
+
+Slot* slotOf(unsigned handle) noexcept {
+    const std::uint32_t index = handle & 0xffff;
+    Slot* const chunk = g_chunks[index / kChunkSize].load(std::memory_order_acquire);
+    return chunk != nullptr ? chunk + index % kChunkSize : nullptr;
+}
+
+bool isOf(std::uint32_t state, unsigned handle) noexcept {
+    return state >> kGenerationShift == handle >> kGenerationShift;
+}
+
+void pushFree(std::uint32_t index) noexcept {
+    slotAt(index).nextFree = kNone;
+    (g_lastFree != kNone ? slotAt(g_lastFree).nextFree : g_firstFree) = index;
+    g_lastFree = index;
+}
+
+void addChunk() noexcept {
+    if (g_chunkCount == kChunks) {
+        return;
+    }
+    auto* const chunk = new (std::nothrow) Slot[kChunkSize];
+    if (chunk == nullptr) {
+        return;
+    }
+    const std::uint32_t first = g_chunkCount * kChunkSize;
+    g_chunks[g_chunkCount++].store(chunk, std::memory_order_release);
+    for (std::uint32_t index = first; index < first + kChunkSize; ++index) {
+        pushFree(index);
+    }
+}
+
+std::uint32_t popFree() noexcept {
+    if (g_firstFree == kNone) {
+        addChunk();
+    }
+    const std::uint32_t index = g_firstFree;
+    if (index != kNone) {
+        g_firstFree = slotAt(index).nextFree;
+        if (g_firstFree == kNone) {
+            g_lastFree = kNone;
+        }
+    }
+    return index;
+}
+
+/// The generation after this one; never 0, so that no handle is 0.
+std::uint32_t nextGeneration(std::uint32_t generation) noexcept {
+    return generation == 0xffff ? 1 : generation + 1;
+}
+
+} // namespace
+
+unsigned HandleTable::open(ctreq* request) noexcept {
+    const std::lock_guard guard(g_mutex);
+    const std::uint32_t index = popFree();
+    if (index == kNone) {
+        return 0;
+    }
+    Slot& slot = slotAt(index);
+    const std::uint32_t generation =
+        nextGeneration(slot.state.load(std::memory_order_relaxed) >> kGenerationShift);
+    slot.request.store(request, std::memory_order_relaxed);
+    slot.state.store(generation << kGenerationShift, std::memory_order_release);
+    return generation << kGenerationShift | index;
+}
+
+ctreq* HandleTable::pin(unsigned handle) noexcept {
+    Slot* const slot = slotOf(handle);
+    if (slot == nullptr) {
+        return nullptr;
+    }
+    std::uint32_t state = slot->state.load(std::memory_order_relaxed);
+    do {
+        if (!isOf(state, handle) || (state & kClosed) != 0 || (state & kPins) == kPins) {
+            return nullptr;
+        }
+    } while (!slot->state.compare_exchange_weak(state, state + 1, std::memory_order_acquire,
+                                                std::memory_order_relaxed));
+    return slot->request.load(std::memory_order_relaxed);
+}
+
+void HandleTable::unpin(unsigned handle) noexcept {
+    Slot* const slot = slotOf(handle);
+    if (slot == nullptr) {
+        return;
+    }
+    std::uint32_t state = slot->state.load(std::memory_order_relaxed);
+    do {
+        if (!isOf(state, handle) || (state & kPins) == 0) {
+            return;
+        }
+    } while (!slot->state.compare_exchange_weak(state, state - 1, std::memory_order_release,
+                                                std::memory_order_relaxed));
+    if ((state & kClosed) != 0 && (state & kPins) == 1) {
+        slot->state.notify_all();
+    }
+}
+
+void HandleTable::close(unsigned handle) noexcept {
+    Slot* const slot = slotOf(handle);
+    if (slot == nullptr) {
+        return;
+    }
+    std::uint32_t state = slot->state.load(std::memory_order_relaxed);
+    do {
+        if (!isOf(state, handle) || (state & kClosed) != 0) {
+            return;
+        }
+    } while (!slot->state.compare_exchange_weak(state, state | kClosed, std::memory_order_relaxed));
+    // Acquire pairs with the release of the last unpin: what its holder did is done.
+    while (((state = slot->state.load(std::memory_order_acquire)) & kPins) != 0) {
+        slot->state.wait(state, std::memory_order_acquire);
+    }
+    slot->request.store(nullptr, std::memory_order_relaxed);
+    const std::lock_guard guard(g_mutex);
+    pushFree(handle & 0xffff);
+}

@@ -1,0 +1,22 @@
+#ifndef ZRM_HOST_ICONV_CACHE_H
+#define ZRM_HOST_ICONV_CACHE_H
+
+#include "host/framework/CodePages.h"
+
+#include <iconv.h>
+
+/// The calling thread's open converters. They close when the thread ends; a conversion that a
+/// thread makes later still, while the process exits, opens its converter afresh.
+namespace IconvCache {
+
+/// What iconv_open returns when it fails.
+inline iconv_t none() noexcept {
+    return reinterpret_cast<iconv_t>(-1); // NOLINT: the value that POSIX gives
+}
+
+/// The converter of this pair in its initial state; none() when the system has no such converter.
+iconv_t find(const LOC2_Locale& to, const LOC2_Locale& from) noexcept;
+
+} // namespace IconvCache
+
+#endif

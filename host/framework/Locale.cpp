@@ -1,0 +1,60 @@
+// The host's implementation of locale.h.
+#include "agent/framework/locale.h"
+
+#include "host/framework/CodePages.h"
+#include "host/framework/Converter.h"
+#include "host/framework/Status.h"
+
+#include <langinfo.h>
+
+namespace {
+
+void report(std::uint32_t* status, std::uint32_t value) noexcept {
+    if (status != nullptr) {
+        *status = value;
+    }
+}
+
+std::uint32_t statusOf(const Converted& converted) noexcept {
+    if (!converted.supported) {
+        return STATUS_NO_CONVERSION;
+    }
+    return converted.complete ? STATUS_OK : STATUS_TRUNCATED;
+}
+
+} // namespace
+
+LOC2_Locale* LOC2_GetLocale(int /*category*/, int /*territory*/, int /*flags*/,
+                            std::uint32_t* status) {
+    report(status, STATUS_OK);
+    // The agent's handle is not const; nobody writes through it.
+    return const_cast<LOC2_Locale*>(CodePages::byName(nl_langinfo(CODESET)));
+}
+
+std::uint32_t LOC2_GetLocaleNumInfo(LOC2_Locale* locale, int item, std::uint32_t* status) {
+    const bool known = locale != nullptr && item == LOC2_CODEPAGE;
+    report(status, known ? STATUS_OK : STATUS_INVALID_ARGUMENT);
+    return known ? locale->codePage : 0;
+}
+
+std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
+                                  std::uint32_t targetSize, std::uint32_t sourceCodePage,
+                                  const char* source, std::uint32_t sourceLength,
+                                  std::uint32_t* resultLength, int flags, std::uint32_t* status) {
+    const bool terminates = (flags & LOC2_NO_TERMINATOR) == 0;
+    Converted converted{0, false, false};
+    if (!terminates || targetSize > 0) {
+        const std::size_t room = terminates ? targetSize - 1 : targetSize;
+        const LOC2_Locale* const to = CodePages::byNumber(targetCodePage);
+        const LOC2_Locale* const from = CodePages::byNumber(sourceCodePage);
+        if (to != nullptr && from != nullptr) {
+            converted = Converter::convert(*to, target, room, *from, {source, sourceLength});
+        }
+        if (terminates) {
+            target[converted.written] = '\0';
+        }
+    }
+    report(resultLength, static_cast<std::uint32_t>(converted.written));
+    report(status, statusOf(converted));
+    return static_cast<std::int32_t>(converted.written);
+}

@@ -1,0 +1,32 @@
+#include "host/framework/Request.h"
+
+#include "agent/framework/TableManager.h"
+#include "host/framework/HandleTable.h"
+#include "host/framework/LockGuard.h"
+
+#include <utility>
+
+Request::Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver)
+    : m_manager(manager), m_detail(std::move(detail)), m_context(receiver),
+      m_request(manager.CreateCtreq(&m_detail, &m_context)) {
+    if (m_request != nullptr && m_request->handle() == 0) {
+        m_request.reset();
+    }
+    // A report in the list would be handed live rows while it samples.
+    if (m_request != nullptr && isSituation()) {
+        const LockGuard guard(m_manager.lock());
+        m_manager.requests().Add(m_request.get());
+    }
+}
+
+Request::~Request() {
+    if (m_request == nullptr) {
+        return;
+    }
+    if (isSituation()) {
+        const LockGuard guard(m_manager.lock());
+        m_manager.requests().Remove(m_request.get());
+    }
+    // Waits for the pins while the object is still whole.
+    HandleTable::close(m_request->handle());
+}

@@ -1,0 +1,34 @@
+#ifndef ZRM_HOST_SAMPLE_H
+#define ZRM_HOST_SAMPLE_H
+
+#include "host/framework/Condition.h"
+#include "host/framework/RowLayout.h"
+
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// The rows of one sample of a table, in the order in which the table gave them.
+class Sample {
+public:
+    /// Takes a sample: a report of the log entries, or the monitored logs. `label` names the
+    /// request in the agent's trace. Nothing when there is no such table, or when it opens no
+    /// request. Any thread, several at once; waits while the agent refreshes its logs.
+    static std::optional<Sample> take(std::string_view table, std::vector<Condition> conditions,
+                                      std::string label = "report");
+
+    const RowLayout& layout() const noexcept { return m_layout; }
+    std::size_t size() const noexcept { return m_rowSize == 0 ? 0 : m_rows.size() / m_rowSize; }
+    /// The row of this index, less than size().
+    const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }
+
+private:
+    Sample(RowLayout layout, std::size_t rowSize, std::vector<char> rows);
+
+    RowLayout m_layout;
+    std::size_t m_rowSize;
+    std::vector<char> m_rows;
+};
+
+#endif

@@ -1,0 +1,55 @@
+#include "host/framework/Tables.h"
+
+#include "agent/framework/TableManager.h"
+#include "host/framework/Status.h"
+
+#include <atomic>
+
+namespace {
+
+// Far more than the agent has. Constant-initialised and without a destructor, since requests may
+// be asked for while the process exits.
+constexpr unsigned kMaxTables = 16;
+std::atomic<TableManager*> g_tables[kMaxTables];
+
+} // namespace
+
+unsigned Tables::add(TableManager* manager) noexcept {
+    if (manager == nullptr) {
+        return STATUS_INVALID_ARGUMENT;
+    }
+    if (find(manager->table()) != nullptr) {
+        return STATUS_DUPLICATE;
+    }
+    for (std::atomic<TableManager*>& table : g_tables) {
+        TableManager* expected = nullptr;
+        if (table.compare_exchange_strong(expected, manager)) {
+            return STATUS_OK;
+        }
+    }
+    return STATUS_NO_MEMORY;
+}
+
+void Tables::remove(const TableManager* manager) noexcept {
+    for (std::atomic<TableManager*>& table : g_tables) {
+        if (table.load() == manager) {
+            table.store(nullptr);
+        }
+    }
+}
+
+TableManager* Tables::find(std::string_view table) noexcept {
+    for (const std::atomic<TableManager*>& entry : g_tables) {
+        TableManager* const manager = entry.load();
+        if (manager != nullptr && manager->table() == table) {
+            return manager;
+        }
+    }
+    return nullptr;
+}
+
+void Tables::clear() noexcept {
+    for (std::atomic<TableManager*>& table : g_tables) {
+        table.store(nullptr);
+    }
+}

@@ -1,1 +1,0 @@
-// The host implementation of trace.h.

@@ -1,0 +1,97 @@
+#include "host/framework/Utf8.h"
+
+#include <cstdint>
+#include <cstring>
+
+namespace {
+
+constexpr std::uint64_t kHighBits = 0x8080808080808080;
+
+/// The form of the characters that begin with one of these bytes: the range of the second byte
+/// keeps out over-long forms, surrogates and what lies beyond the last character.
+struct Form {
+    unsigned char first;
+    unsigned char last;
+    unsigned char length;
+    unsigned char secondFirst;
+    unsigned char secondLast;
+};
+
+constexpr Form kForms[] = {
+    {0xC2, 0xDF, 2, 0x80, 0xBF}, {0xE0, 0xE0, 3, 0xA0, 0xBF}, {0xE1, 0xEC, 3, 0x80, 0xBF},
+    {0xED, 0xED, 3, 0x80, 0x9F}, {0xEE, 0xEF, 3, 0x80, 0xBF}, {0xF0, 0xF0, 4, 0x90, 0xBF},
+    {0xF1, 0xF3, 4, 0x80, 0xBF}, {0xF4, 0xF4, 4, 0x80, 0x8F},
+};
+
+bool isContinuation(unsigned char byte) {
+    return (byte & 0xC0) == 0x80;
+}
+
+} // namespace
+
+std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
+    std::size_t position = 0;
+    for (; position + sizeof kHighBits <= text.size(); position += sizeof kHighBits) {
+        std::uint64_t word;
+        std::memcpy(&word, text.data() + position, sizeof word);
+        if ((word & kHighBits) != 0) {
+            break;
+        }
+    }
+    while (position < text.size() && static_cast<unsigned char>(text[position]) < 0x80) {
+        ++position;
+    }
+    return position;
+}
+
+Utf8::Sequence Utf8::firstSequence(std::string_view text) noexcept {
+    const auto byteAt = [text](std::size_t index) {
+        return static_cast<unsigned char>(text[index]);
+    };
+    const unsigned char lead = byteAt(0);
+    if (lead < 0x80) {
+        return {1, true};
+    }
+    for (const Form& form : kForms) {
+        if (lead < form.first || lead > form.last) {
+            continue;
+        }
+        if (text.size() < 2 || byteAt(1) < form.secondFirst || byteAt(1) > form.secondLast) {
+            return {1, false};
+        }
+        std::size_t length = 2;
+        while (length < form.length && length < text.size() && isContinuation(byteAt(length))) {
+            ++length;
+        }
+        return {length, length == form.length};
+    }
+    return {1, false};
+}
+
+std::size_t Utf8::validPrefix(std::string_view text) noexcept {
+    std::size_t position = 0;
+    for (;;) {
+        position += asciiPrefix(text.substr(position));
+        if (position == text.size()) {
+            return position;
+        }
+        const Sequence sequence = firstSequence(text.substr(position));
+        if (!sequence.valid) {
+            return position;
+        }
+        position += sequence.length;
+    }
+}
+
+std::string_view Utf8::prefix(std::string_view text, std::size_t size) noexcept {
+    if (size >= text.size()) {
+        return text;
+    }
+    // A character has at most three bytes behind its first; more of them are no character's.
+    for (std::size_t back = 0; back < 4 && back < size + 1; ++back) {
+        if (!isContinuation(static_cast<unsigned char>(text[size - back]))) {
+            return text.substr(0, size - back);
+        }
+    }
+    return text.substr(0, size);
+}

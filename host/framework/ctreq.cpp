@@ -1,0 +1,172 @@
+#include "agent/framework/ctreq.h"
+
+#include "agent/TraceScope.h"
+#include "agent/framework/TableManager.h"
+#include "host/framework/ConditionSet.h"
+#include "host/framework/ContextInfo.h"
+#include "host/framework/FilterList.h"
+#include "host/framework/HandleTable.h"
+#include "host/framework/RequestDetail.h"
+#include "host/framework/Status.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cstring>
+#include <new>
+#include <optional>
+
+namespace {
+
+TRC1_Anchor anchor{"ctreq.cpp"};
+
+std::atomic<unsigned> g_lastIdentifier{0};
+
+} // namespace
+
+class ctreq::Framework {
+public:
+    Framework(const RequestDetail& detail, ContextInfo& context)
+        : filters(detail.conditions), receiver(context.receiver()) {}
+
+    FilterList filters;
+    /// Built when the first row is judged: only then the table's columns can be asked for.
+    std::optional<ConditionSet> conditions;
+    RowReceiver& receiver;
+    std::atomic<bool> stopped{false};
+    std::size_t capacity = 0; ///< rows that fit into the memory of the data array
+};
+
+ctreq::ctreq(RequestDetail* detail, ContextInfo* context, TableManager* manager)
+    : m_manager(manager), m_name(detail->name.c_str()), m_sampleType(detail->sampleType),
+      m_interval(detail->interval), m_identifier(++g_lastIdentifier),
+      m_handle(HandleTable::open(this)),
+      m_framework(std::make_unique<Framework>(*detail, *context)) {}
+
+ctreq::~ctreq() {
+    HandleTable::close(m_handle);
+}
+
+void ctreq::PrintSelf() {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        trace.detail()("ctreq @%p <%u,%u>\n", static_cast<void*>(this), m_identifier, m_handle);
+        DumpThresholds();
+    }
+}
+
+int ctreq::NumColumns() {
+    return 0;
+}
+
+unsigned ctreq::GetColumnInfo(ColumnInfo* /*info*/, int /*index*/) {
+    return STATUS_INVALID_ARGUMENT;
+}
+
+unsigned ctreq::ExecuteCommand(char* /*command*/, int /*length*/, char* /*result*/) {
+    return STATUS_NOT_SUPPORTED;
+}
+
+unsigned ctreq::InsertRow(char* row) {
+    if (rowSize == 0) {
+        return STATUS_INVALID_ARGUMENT;
+    }
+    if (count >= allocated) {
+        // The room is counted in steps of allocSize, but the memory doubles, so that a report of
+        // many rows is not copied for every few of them.
+        const std::size_t room = std::size_t{allocated} + std::max(allocSize, 1u);
+        if (room > m_framework->capacity) {
+            const std::size_t capacity = std::max(room, m_framework->capacity * 2);
+            std::unique_ptr<char[]> grown(new (std::nothrow) char[capacity * rowSize]);
+            if (grown == nullptr) {
+                return STATUS_NO_MEMORY;
+            }
+            std::copy_n(m_rows.get(), std::size_t{count} * rowSize, grown.get());
+            m_rows = std::move(grown);
+            m_framework->capacity = capacity;
+        }
+        allocated = static_cast<unsigned>(room);
+    }
+    std::memcpy(m_rows.get() + std::size_t{count} * rowSize, row, rowSize);
+    ++count;
+    return STATUS_OK;
+}
+
+unsigned ctreq::CheckForException(char* row) {
+    if (m_framework->stopped.load(std::memory_order_relaxed)) {
+        return 0;
+    }
+    if (!m_framework->conditions) {
+        m_framework->conditions.emplace(m_framework->filters, *this);
+    }
+    return m_framework->conditions->holds(row) ? 1 : 0;
+}
+
+unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,
+                                  char* /*value*/) {
+    return 0;
+}
+
+void ctreq::CommandCompleted(CtreqAutomationCapsule* /*capsule*/) {}
+
+unsigned ctreq::GetFilterInfo(SEL1_FILTERINFO** filter) {
+    SEL1_FILTERINFO* const next = m_framework->filters.next();
+    if (next == nullptr) {
+        return STATUS_END;
+    }
+    *filter = next;
+    return STATUS_OK;
+}
+
+void ctreq::ResetFilterIndex() {
+    m_framework->filters.reset();
+}
+
+int ctreq::IsException(_IntfOper op, const char* column, const char* value, int width) {
+    const SEL1_FILTERINFO filter{"", op, SEL1_CHARACTER,
+                                 static_cast<std::int16_t>(std::strlen(value)), value};
+    const RowColumn described{"", 0, static_cast<std::size_t>(width), COLUMN_CHARACTER};
+    return CompiledCondition(filter, &described).holds(this, const_cast<char*>(column)) ? 1 : 0;
+}
+
+int ctreq::IsException(_IntfOper op, int column, const char* value) {
+    const bool isList = op == INTF_IN;
+    const SEL1_FILTERINFO filter{"", op, isList ? SEL1_CHARACTER : SEL1_INTEGER,
+                                 static_cast<std::int16_t>(isList ? std::strlen(value) : 8), value};
+    const RowColumn described{"", 0, sizeof column, COLUMN_INTEGER};
+    return CompiledCondition(filter, &described).holds(this, reinterpret_cast<char*>(&column)) ? 1
+                                                                                               : 0;
+}
+
+void ctreq::DumpThresholds() {
+    for (const SEL1_FILTERINFO& filter : m_framework->filters.all()) {
+        if (filter.dataType == SEL1_INTEGER) {
+            std::int64_t number;
+            std::memcpy(&number, filter.value, sizeof number);
+            TRC1_Printf(anchor, __LINE__, "\t_filter %s op=%d value=%lld\n", filter.columnName,
+                        filter.compareOperator, static_cast<long long>(number));
+        } else {
+            TRC1_Printf(anchor, __LINE__, "\t_filter %s op=%d value=\"%.*s\"\n", filter.columnName,
+                        filter.compareOperator, filter.valueLength, filter.value);
+        }
+    }
+}
+
+unsigned ctreq::Dispatch() {
+    return count == 0 ? STATUS_OK : m_framework->receiver.receive(*this, m_rows.get(), count);
+}
+
+unsigned ctreq::Stop() {
+    m_framework->stopped = true;
+    return STATUS_OK;
+}
+
+unsigned ctreq::Stopped(unsigned reason) {
+    if (!m_framework->stopped.exchange(true)) {
+        m_framework->receiver.stopped(*this, reason);
+    }
+    return STATUS_OK;
+}
+
+ctreq* ctreq::UseHandle(unsigned handle) {
+    return HandleTable::pin(handle);
+}
