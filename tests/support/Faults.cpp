@@ -41,7 +41,7 @@ std::atomic<bool> g_fakeClock{false};
 std::atomic<std::time_t> g_now{0};
 std::atomic<bool> g_fakeSleep{false};
 std::atomic<unsigned> g_slept{0};
-std::atomic<long> g_blockSize{0};
+std::atomic<long> g_blockSize{-1}; // negative: the real one
 std::atomic<pid_t> g_waitedId{0};
 std::string* g_unameSystem = nullptr;
 std::string* g_unameNode = nullptr;
@@ -144,7 +144,7 @@ FakeBlockSize::FakeBlockSize(long size) {
     g_blockSize = size;
 }
 FakeBlockSize::~FakeBlockSize() {
-    g_blockSize = 0;
+    g_blockSize = -1;
 }
 
 FakeWaitedId::FakeWaitedId(pid_t pid) {
@@ -292,7 +292,7 @@ extern "C" int __wrap_stat(const char* path, struct stat* status) {
         return -1;
     }
     const int result = __real_stat(path, status);
-    if (const long blockSize = g_blockSize) {
+    if (const long blockSize = g_blockSize; blockSize >= 0) {
         status->st_blksize = blockSize;
     }
     return result;

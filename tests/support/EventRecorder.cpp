@@ -1,0 +1,52 @@
+#include "support/EventRecorder.h"
+
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
+
+namespace {
+
+struct Recorder {
+    std::mutex mutex;
+    std::condition_variable changed;
+    std::vector<zrm_rmlogent_data_t> rows;
+};
+
+Recorder& recorder() {
+    static auto* const theRecorder = new Recorder; // log threads may outlive main's objects
+    return *theRecorder;
+}
+
+} // namespace
+
+void EventRecorder::clear() {
+    const std::lock_guard guard(recorder().mutex);
+    recorder().rows.clear();
+}
+
+std::vector<zrm_rmlogent_data_t> EventRecorder::rows() {
+    const std::lock_guard guard(recorder().mutex);
+    return recorder().rows;
+}
+
+std::vector<zrm_rmlogent_data_t> EventRecorder::waitForRows(std::size_t count, int seconds) {
+    std::unique_lock lock(recorder().mutex);
+    recorder().changed.wait_for(lock, std::chrono::seconds(seconds),
+                                [&] { return recorder().rows.size() >= count; });
+    return recorder().rows;
+}
+
+// zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t*, int) under its linker name.
+extern "C" unsigned
+__wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlogent_data_t* rows,
+                                                                       int count);
+extern "C" unsigned
+__wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlogent_data_t* rows,
+                                                                       int count) {
+    {
+        const std::lock_guard guard(recorder().mutex);
+        recorder().rows.insert(recorder().rows.end(), rows, rows + count);
+    }
+    recorder().changed.notify_all();
+    return 0;
+}

@@ -1,0 +1,85 @@
+#ifndef ZRM_TESTS_TEST_LOG_H
+#define ZRM_TESTS_TEST_LOG_H
+
+#include "monitor/LogFile.h"
+
+#include "LocaleDouble.h"
+#include "support/EventRecorder.h"
+#include "support/Faults.h"
+#include "support/RecordingTrace.h"
+#include "support/TemporaryDirectory.h"
+#include "support/TestValidLog.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <functional>
+#include <string>
+#include <vector>
+
+/// A kind of log of the tests: a line that begins with "bad" is rejected, any other becomes the
+/// description of its row. Its thread polls every millisecond. The operations that the kinds of
+/// logs use are public, so that a test may also go through them on its own thread.
+class TestLog : public LogFile {
+public:
+    explicit TestLog(const ValidLog& log, LogFile* chainHead = nullptr) : LogFile(log, chainHead) {}
+    using LogFile::operator=;
+    ~TestLog() override { stopThread(); }
+
+    void endReportRequest(void** /*reportState*/) override {}
+    void* getNextLogEntry(void* /*row*/, void* /*state*/, void* /*thresholds*/) override {
+        return nullptr;
+    }
+    void* startReportRequest(void* /*thresholds*/) override { return nullptr; }
+    long formatEntryAsRow(char* entry, void* row, void* context) override;
+    void processLogData() override;
+
+    using LogFile::closeLog;
+    using LogFile::closeLogForReport;
+    using LogFile::determineOptimumBlockSize;
+    using LogFile::fillCommonColumns;
+    using LogFile::fillReportBuffer;
+    using LogFile::lockDebugFile;
+    using LogFile::lockLog;
+    using LogFile::openLogAndSeek;
+    using LogFile::openLogForReport;
+    using LogFile::unlockDebugFile;
+    using LogFile::unlockLog;
+    using LogFile::waitForEventLoop;
+    using LogFile::writeToDebugLog;
+
+    /// Runs the wait loop on the test's own thread until something ends it.
+    void follow();
+    std::int64_t eof() const { return LogEOF; }
+    int fd() const { return LogFD; }
+    std::FILE* stream() const { return LogFileP; }
+    pthread_mutex_t& lock() const { return LogLock; }
+    std::int64_t blockSize() const { return OptimumBlockSize; }
+    void setBlockSize(std::int64_t size) { OptimumBlockSize = size; }
+    void setType(char type) { LogType = type; }
+    std::string statusText() const;
+
+    std::function<void(const std::string&)> onLine; ///< called with every line, on its thread
+    std::vector<std::string> lines;                 ///< of the thread that reads
+    std::atomic<bool> closes{true};                 ///< false: the log stays open at the end
+};
+
+/// A directory with one log file, "messages", empty at first.
+class MonitoredFile : public testing::Test {
+protected:
+    MonitoredFile();
+    ~MonitoredFile() override;
+    void append(std::string_view text) { m_directory.append("messages", text); }
+
+    TemporaryDirectory m_directory;
+    std::string m_path = m_directory.write("messages", "");
+    std::unique_ptr<ValidLog> m_line = validLog(m_path);
+};
+
+/// Waits until the condition holds; false after ten seconds.
+bool waitUntil(const std::function<bool()>& condition);
+
+/// The text as a regular expression that matches it alone.
+std::string exactly(const std::string& text);
+
+#endif
