@@ -1,0 +1,41 @@
+#ifndef ZRM_BUILD_AREA_H
+#define ZRM_BUILD_AREA_H
+
+#include <cstddef>
+#include <cstring>
+
+/// Where one directive is put together while it is learned: the place in the format text and the
+/// directive built so far. One thread, one directive.
+struct _BuildArea {
+    static constexpr std::size_t LIMIT = 255; ///< characters of a directive; one more terminates it
+
+    explicit _BuildArea(const char* start) noexcept : position(start) {}
+
+    /// Appends one character; false when the area is full.
+    bool append(char character) noexcept { return append(&character, 1); }
+    /// Appends all of the characters, or none and returns false.
+    bool append(const char* text, std::size_t length) noexcept {
+        return insert(count, text, length);
+    }
+    /// Inserts all of the characters in front of the one at `index`, or none and returns false.
+    bool insert(std::size_t index, const char* text, std::size_t length) noexcept {
+        if (count + length > LIMIT) {
+            return false;
+        }
+        std::memmove(buffer + index + length, buffer + index, count - index);
+        std::memcpy(buffer + index, text, length);
+        count += length;
+        buffer[count] = '\0';
+        return true;
+    }
+    /// Takes the last character out.
+    void removeLast() noexcept { buffer[--count] = '\0'; }
+    /// The number of characters, for the "%.*s" of messages.
+    int length() const noexcept { return static_cast<int>(count); }
+
+    const char* position; ///< in the format text
+    char buffer[LIMIT + 1] = "";
+    std::size_t count = 0; ///< characters in the buffer
+};
+
+#endif

@@ -1,0 +1,89 @@
+#ifndef ZRM_DIRECTIVE_RULES_H
+#define ZRM_DIRECTIVE_RULES_H
+
+#include "parser/DataType.h"
+
+#include <string_view>
+
+// The rules that scan directives and print directives share.
+
+/// A size modifier and the base of the data types that it gives.
+struct SizeModifier {
+    std::string_view text;
+    _DataType base;
+};
+
+/// Longest first, so that the first match is the right one; the last one always matches.
+inline constexpr SizeModifier sizeModifiers[] = {
+    {"ll", DATATYPE_BASE_LONGLONG}, {"l", DATATYPE_BASE_LONG}, {"h", DATATYPE_BASE_SHORT},
+    {"L", DATATYPE_BASE_BIGLONG},   {"", DATATYPE_BASE_NONE},
+};
+
+/// Which size modifiers a conversion code goes with.
+enum class ModifierRule { ANY, FLOATING, NONE };
+
+constexpr bool isAllowed(ModifierRule rule, _DataType base) {
+    switch (rule) {
+    case ModifierRule::ANY:
+        return base != DATATYPE_BAD;
+    case ModifierRule::FLOATING:
+        return base == DATATYPE_BASE_NONE || base == DATATYPE_BASE_LONG ||
+               base == DATATYPE_BASE_BIGLONG;
+    case ModifierRule::NONE:
+        return base == DATATYPE_BASE_NONE;
+    }
+    return false;
+}
+
+/// A conversion code, its number within the data types, and where it may stand.
+struct ConversionCode {
+    char code;
+    int number;
+    ModifierRule modifiers;
+    bool scans;
+    bool prints;
+};
+
+inline constexpr ConversionCode conversionCodes[] = {
+    {'d', 1, ModifierRule::ANY, true, true},       {'i', 1, ModifierRule::ANY, true, true},
+    {'o', 2, ModifierRule::ANY, true, true},       {'u', 3, ModifierRule::ANY, true, true},
+    {'x', 4, ModifierRule::ANY, true, true},       {'X', 4, ModifierRule::ANY, false, true},
+    {'e', 5, ModifierRule::FLOATING, true, true},  {'E', 5, ModifierRule::FLOATING, false, true},
+    {'f', 6, ModifierRule::FLOATING, true, true},  {'g', 7, ModifierRule::FLOATING, true, true},
+    {'G', 7, ModifierRule::FLOATING, false, true}, {'s', 8, ModifierRule::NONE, true, true},
+    {'[', 8, ModifierRule::NONE, true, false},     {'c', 9, ModifierRule::NONE, true, true},
+};
+
+/// An escape of scan formats and print directives: the character behind the backslash and what
+/// both stand for. The list is the whole set: neither form feeds nor numbers.
+struct Escape {
+    char written;
+    char meant;
+};
+
+inline constexpr Escape escapes[] = {
+    {'"', '"'},  {'\'', '\''}, {'?', '?'},  {'\\', '\\'}, {'a', '\a'},
+    {'b', '\b'}, {'n', '\n'},  {'r', '\r'}, {'t', '\t'},  {'v', '\v'},
+};
+
+inline constexpr int MAX_COLUMN = 1023;         ///< last column that a field may start at
+inline constexpr int MAX_COLUMN_CHARACTERS = 4; ///< digits and ')': columns end at 999 in fact
+inline constexpr int MAX_SCAN_WIDTH = 1023;     ///< most characters that a field may take
+inline constexpr int MAX_SCAN_WIDTH_DIGITS = 4;
+inline constexpr int MAX_PRINT_WIDTH = 256; ///< largest minimum width of a printed field
+inline constexpr int MAX_PRINT_WIDTH_DIGITS = 3;
+inline constexpr int MAX_PRECISION = 256;
+inline constexpr int MAX_PRECISION_CHARACTERS = 3; ///< the point included: two digits in fact
+inline constexpr unsigned DEFAULT_TEXT_SIZE = 31;  ///< most characters of a text without a width
+inline constexpr std::string_view DEFAULT_TEXT_WIDTH = "31";
+inline constexpr std::string_view CONSUMED_COUNT = "%n"; ///< ends each scan directive
+
+/// White space as the C library's scanner knows it in the "C" locale.
+constexpr bool isWhiteSpace(char character) noexcept {
+    return character == ' ' || (character >= '\t' && character <= '\r');
+}
+constexpr bool isDigit(char character) noexcept {
+    return character >= '0' && character <= '9';
+}
+
+#endif

@@ -1,0 +1,55 @@
+#ifndef ZRM_PRINT_OPTIONS_H
+#define ZRM_PRINT_OPTIONS_H
+
+#include "parser/DataType.h"
+
+/// The options of print directives, as the set in which they are remembered.
+enum PrintOptionFlag : unsigned {
+    OPTION_GROUPING = 1,
+    OPTION_LEFT = 2,
+    OPTION_SIGN = 4,
+    OPTION_BLANK = 8,
+    OPTION_ALTERNATE = 16,
+    OPTION_ZERO = 32,
+};
+
+/// Which scan data types an option goes with.
+enum class OptionTypes { ALL, SIGNED, GROUPED, NUMBERS };
+
+constexpr bool isAllowed(OptionTypes types, const DataTypeInfo& scanned) {
+    switch (types) {
+    case OptionTypes::ALL:
+        return true;
+    case OptionTypes::SIGNED:
+        return scanned.signOptions;
+    case OptionTypes::GROUPED:
+        return scanned.groupingOption;
+    case OptionTypes::NUMBERS:
+        return scanned.receiver != Receiver::TEXT && scanned.receiver != Receiver::CHARACTER;
+    }
+    return false;
+}
+
+/// The texts with which a refused option is reported. They differ, in blanks too.
+enum class OptionRefusal { OPTION, THOUSANDS, ZERO };
+
+/// One option: what it goes with, and the option that it meets badly when that came first.
+struct PrintOption {
+    char character;
+    unsigned flag;
+    OptionTypes types;
+    OptionRefusal refusal;
+    unsigned rival;  ///< flag of the option that was given before; 0: none
+    bool isYielding; ///< the rival wins: this option is dropped
+};
+
+inline constexpr PrintOption printOptions[] = {
+    {' ', OPTION_BLANK, OptionTypes::SIGNED, OptionRefusal::OPTION, OPTION_SIGN, true},
+    {'#', OPTION_ALTERNATE, OptionTypes::NUMBERS, OptionRefusal::OPTION, 0, false},
+    {'\'', OPTION_GROUPING, OptionTypes::GROUPED, OptionRefusal::THOUSANDS, 0, false},
+    {'-', OPTION_LEFT, OptionTypes::ALL, OptionRefusal::OPTION, OPTION_ZERO, false},
+    {'0', OPTION_ZERO, OptionTypes::NUMBERS, OptionRefusal::ZERO, OPTION_LEFT, true},
+    {'+', OPTION_SIGN, OptionTypes::SIGNED, OptionRefusal::OPTION, OPTION_BLANK, false},
+};
+
+#endif

@@ -1,0 +1,178 @@
+#include "parser/PrintProgram.h"
+
+#include "parser/DirectiveRules.h"
+
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
+
+namespace {
+
+/// Holds the longest text that a directive can give: a long double has up to 4933 digits, which
+/// thousands grouping stretches by a third, and the directive's own text adds 255.
+constexpr std::size_t WORK_SIZE = 8192;
+
+template <typename Type> Type valueAt(const void* value) {
+    Type result;
+    std::memcpy(&result, value, sizeof result);
+    return result;
+}
+
+/// The integer in its full width: the sign extended for signed conversions, not for others.
+std::int64_t integerAt(const void* value, Receiver receiver, bool isSigned) {
+    if (receiver == Receiver::INTEGER2) {
+        return isSigned ? valueAt<std::int16_t>(value) : valueAt<std::uint16_t>(value);
+    }
+    if (receiver == Receiver::INTEGER4) {
+        return isSigned ? std::int64_t{valueAt<std::int32_t>(value)}
+                        : std::int64_t{valueAt<std::uint32_t>(value)};
+    }
+    return valueAt<std::int64_t>(value);
+}
+
+bool isInteger(Receiver receiver) {
+    return receiver == Receiver::INTEGER2 || receiver == Receiver::INTEGER4 ||
+           receiver == Receiver::INTEGER8;
+}
+
+} // namespace
+
+bool PrintProgram::compile(const char* directive, _DataType type) noexcept {
+    const DataTypeInfo* info = findDataType(type);
+    if (info == nullptr) {
+        return false;
+    }
+    m_directive = directive;
+    m_receiver = info->receiver;
+    const char* conversion = std::strchr(directive, '%');
+    m_prefixLength = conversion != nullptr ? static_cast<std::size_t>(conversion - directive)
+                                           : std::strlen(directive);
+    m_kind = conversion != nullptr ? classify(conversion + 1) : Kind::CONSTANT;
+    return true;
+}
+
+/// Looks for a directive that needs no help of the C library: at most zero padding and a minimum
+/// width, and no second '%'.
+PrintProgram::Kind PrintProgram::classify(const char* conversion) noexcept {
+    m_fill = *conversion == '0' ? '0' : ' ';
+    conversion += *conversion == '0' ? 1 : 0;
+    const char* const width = conversion;
+    for (m_width = 0; isDigit(*conversion); ++conversion) {
+        m_width = m_width * 10 + static_cast<std::size_t>(*conversion - '0');
+    }
+    const bool isPlain = conversion == width && m_fill == ' ';
+    for (const SizeModifier& modifier : sizeModifiers) {
+        if (std::strncmp(conversion, modifier.text.data(), modifier.text.size()) == 0) {
+            conversion += modifier.text.size();
+            break;
+        }
+    }
+    m_suffix = conversion + (*conversion != '\0' ? 1 : 0);
+    m_suffixLength = std::strlen(m_suffix);
+    if (std::strchr(m_suffix, '%') != nullptr) {
+        return Kind::LIBRARY;
+    }
+    m_isSigned = *conversion != 'u';
+    if (isInteger(m_receiver) && (*conversion == 'd' || *conversion == 'i' || *conversion == 'u')) {
+        return Kind::INTEGER;
+    }
+    if (isPlain && m_receiver == Receiver::TEXT && *conversion == 's') {
+        return Kind::TEXT;
+    }
+    if (isPlain && m_receiver == Receiver::CHARACTER && *conversion == 'c') {
+        return Kind::CHARACTER;
+    }
+    return Kind::LIBRARY;
+}
+
+bool PrintProgram::run(const void* value, _FormatBuffer& buffer) const noexcept {
+    if (m_kind == Kind::LIBRARY) {
+        return printByLibrary(value, buffer);
+    }
+    buffer.append(m_directive, m_prefixLength);
+    switch (m_kind) {
+    case Kind::TEXT: {
+        const auto* text = static_cast<const char*>(value);
+        buffer.append(text, std::strlen(text));
+        break;
+    }
+    case Kind::CHARACTER:
+        buffer.append(static_cast<const char*>(value), 1);
+        break;
+    case Kind::INTEGER:
+        printInteger(value, buffer);
+        break;
+    case Kind::CONSTANT:
+    case Kind::LIBRARY:
+        break;
+    }
+    buffer.append(m_suffix, m_suffixLength);
+    return true;
+}
+
+void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const noexcept {
+    const std::int64_t number = integerAt(value, m_receiver, m_isSigned);
+    const bool isNegative = m_isSigned && number < 0;
+    auto magnitude = static_cast<std::uint64_t>(number);
+    if (isNegative) {
+        magnitude = 0 - magnitude;
+    }
+    // Digits, sign and padding, from the right end of a text as wide as any directive asks for.
+    char text[MAX_PRINT_WIDTH + 32];
+    char* const end = text + sizeof text;
+    char* begin = end;
+    do {
+        *--begin = static_cast<char>('0' + magnitude % 10);
+        magnitude /= 10;
+    } while (magnitude != 0);
+    const std::size_t length = static_cast<std::size_t>(end - begin) + (isNegative ? 1U : 0U);
+    const std::size_t padding = m_width > length ? m_width - length : 0;
+    const bool isZeroFilled = m_fill == '0'; // Zeros go behind the sign, blanks before it.
+    if (isNegative && !isZeroFilled) {
+        *--begin = '-';
+    }
+    begin -= padding;
+    std::memset(begin, m_fill, padding);
+    if (isNegative && isZeroFilled) {
+        *--begin = '-';
+    }
+    buffer.append(begin, static_cast<std::size_t>(end - begin));
+}
+
+bool PrintProgram::printByLibrary(const void* value, _FormatBuffer& buffer) const noexcept {
+    char work[WORK_SIZE];
+    int length = -1;
+    switch (m_receiver) {
+    case Receiver::INTEGER2:
+        length = std::snprintf(work, sizeof work, m_directive, int{valueAt<std::int16_t>(value)});
+        break;
+    case Receiver::INTEGER4:
+        length = std::snprintf(work, sizeof work, m_directive, valueAt<std::int32_t>(value));
+        break;
+    case Receiver::INTEGER8:
+        length = std::snprintf(work, sizeof work, m_directive, valueAt<std::int64_t>(value));
+        break;
+    case Receiver::FLOAT:
+        length = std::snprintf(work, sizeof work, m_directive, double{valueAt<float>(value)});
+        break;
+    case Receiver::DOUBLE:
+        length = std::snprintf(work, sizeof work, m_directive, valueAt<double>(value));
+        break;
+    case Receiver::LONG_DOUBLE:
+        length = std::snprintf(work, sizeof work, m_directive, valueAt<long double>(value));
+        break;
+    case Receiver::TEXT:
+        length = std::snprintf(work, sizeof work, m_directive, static_cast<const char*>(value));
+        break;
+    case Receiver::CHARACTER:
+        length = std::snprintf(work, sizeof work, m_directive,
+                               static_cast<unsigned char>(*static_cast<const char*>(value)));
+        break;
+    }
+    if (length < 0) {
+        return false;
+    }
+    const auto written = static_cast<std::size_t>(length);
+    buffer.append(work, written < sizeof work ? written : sizeof work - 1);
+    return true;
+}

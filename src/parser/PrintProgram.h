@@ -1,0 +1,45 @@
+#ifndef ZRM_PRINT_PROGRAM_H
+#define ZRM_PRINT_PROGRAM_H
+
+#include "parser/DataType.h"
+#include "parser/FormatBuffer.h"
+
+#include <cstddef>
+
+/// One print directive made ready for printing values of one data type. It writes what snprintf
+/// would write; the usual directives (constant text, plain texts and characters, decimal integers
+/// with or without a minimum width) do not go through it. Compiled once, then read-only.
+class PrintProgram {
+public:
+    PrintProgram() = default;
+    PrintProgram(const PrintProgram&) = delete;
+    PrintProgram& operator=(const PrintProgram&) = delete;
+
+    /// Compiles the directive, whose text must live as long as the program, for values of `type`.
+    /// False when that is no data type.
+    bool compile(const char* directive, _DataType type) noexcept;
+    bool isCompiled() const noexcept { return m_directive != nullptr; }
+
+    /// Appends the printed value (a receiving variable of the type) to the buffer, cut to its room.
+    /// False when the C library fails to print it.
+    bool run(const void* value, _FormatBuffer& buffer) const noexcept;
+
+private:
+    enum class Kind { CONSTANT, TEXT, CHARACTER, INTEGER, LIBRARY };
+
+    Kind classify(const char* conversion) noexcept;
+    void printInteger(const void* value, _FormatBuffer& buffer) const noexcept;
+    bool printByLibrary(const void* value, _FormatBuffer& buffer) const noexcept;
+
+    const char* m_directive = nullptr;
+    std::size_t m_prefixLength = 0;
+    const char* m_suffix = nullptr;
+    std::size_t m_suffixLength = 0;
+    Kind m_kind = Kind::LIBRARY;
+    Receiver m_receiver = Receiver::TEXT;
+    bool m_isSigned = false;
+    char m_fill = ' ';
+    std::size_t m_width = 0; ///< minimum width of an integer
+};
+
+#endif

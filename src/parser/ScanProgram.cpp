@@ -1,0 +1,360 @@
+#include "parser/ScanProgram.h"
+
+#include "parser/DirectiveRules.h"
+#include "parser/FloatField.h"
+
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+#include <limits>
+
+#include <langinfo.h>
+
+namespace {
+
+constexpr unsigned char byteOf(char character) {
+    return static_cast<unsigned char>(character);
+}
+
+constexpr unsigned char NO_DIGIT = 255;
+
+/// The value of each digit, NO_DIGIT for characters that are none.
+constexpr auto digitValues = [] {
+    std::array<unsigned char, 256> values{};
+    values.fill(NO_DIGIT);
+    for (unsigned char digit = 0; digit < 10; ++digit) {
+        values[byteOf('0') + digit] = digit;
+    }
+    for (unsigned char digit = 0; digit < 6; ++digit) {
+        values[byteOf('a') + digit] = values[byteOf('A') + digit] =
+            static_cast<unsigned char>(10 + digit);
+    }
+    return values;
+}();
+
+/// The characters of a "%s".
+constexpr auto wordCharacters = [] {
+    std::array<bool, 256> accepted{};
+    for (int character = 1; character < 256; ++character) {
+        accepted[static_cast<unsigned>(character)] = !isWhiteSpace(static_cast<char>(character));
+    }
+    return accepted;
+}();
+
+/// What an integer conversion reads.
+struct IntegerCode {
+    char code;
+    unsigned base;
+    bool isSigned;
+};
+constexpr IntegerCode integerCodes[] = {
+    {'d', 10, true}, {'i', 0, true}, {'o', 8, false}, {'u', 10, false}, {'x', 16, false},
+};
+
+const char* skipWhiteSpace(const char* position) {
+    while (isWhiteSpace(*position)) {
+        ++position;
+    }
+    return position;
+}
+
+/// Reads digits of a base, at most `width` of them. Returns the position behind them.
+template <unsigned Base>
+const char* readDigits(const char* position, unsigned width, std::uint64_t& magnitude,
+                       bool& overflowed) {
+    constexpr std::uint64_t MAX = std::numeric_limits<std::uint64_t>::max();
+    for (; width > 0; --width, ++position) {
+        const unsigned digit = digitValues[byteOf(*position)];
+        if (digit >= Base) {
+            break;
+        }
+        overflowed =
+            overflowed || magnitude > MAX / Base || (magnitude == MAX / Base && digit > MAX % Base);
+        magnitude = magnitude * Base + digit;
+    }
+    return position;
+}
+
+template <typename Integer> void store(std::uint64_t bits, void* value) {
+    const auto number = static_cast<Integer>(bits);
+    std::memcpy(value, &number, sizeof number);
+}
+
+} // namespace
+
+void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
+    m_literal = m_literalEnd = directive;
+    while (*m_literalEnd != '\0' && (m_literalEnd[0] != '%' || m_literalEnd[1] == '%')) {
+        m_literalEnd += *m_literalEnd == '%' ? 2 : 1;
+    }
+    if (*m_literalEnd == '\0') {
+        return;
+    }
+    const char* point = nl_langinfo(RADIXCHAR);
+    if (*point != '\0' && std::strlen(point) < sizeof m_decimalPoint) {
+        std::strcpy(m_decimalPoint, point);
+    }
+    const char* position = m_literalEnd + 1;
+    m_isSuppressed = *position == '*';
+    position += m_isSuppressed ? 1 : 0;
+    m_width = 0;
+    for (; isDigit(*position); ++position) {
+        m_width = m_width * 10 + static_cast<unsigned>(*position - '0');
+    }
+    for (const SizeModifier& modifier : sizeModifiers) {
+        if (std::strncmp(position, modifier.text.data(), modifier.text.size()) == 0) {
+            position = compileConversion(position + modifier.text.size(),
+                                         static_cast<unsigned>(modifier.base));
+            break;
+        }
+    }
+    if (m_width == 0) {
+        m_width = m_kind == Kind::CHARACTERS              ? 1
+                  : m_kind == Kind::TEXT && textWidth > 0 ? textWidth
+                                                          : UINT_MAX;
+    }
+    m_isCounted = CONSUMED_COUNT == position;
+}
+
+/// Returns the position behind the conversion.
+const char* ScanProgram::compileConversion(const char* conversion, unsigned base) noexcept {
+    for (const ConversionCode& candidate : conversionCodes) {
+        if (!candidate.scans || candidate.code != *conversion) {
+            continue;
+        }
+        const DataTypeInfo* info =
+            findDataType(static_cast<_DataType>(static_cast<int>(base) + candidate.number));
+        if (info == nullptr) {
+            break;
+        }
+        m_receiver = info->receiver;
+        switch (m_receiver) {
+        case Receiver::INTEGER2:
+        case Receiver::INTEGER4:
+        case Receiver::INTEGER8:
+            m_kind = Kind::INTEGER;
+            for (const IntegerCode& integer : integerCodes) {
+                if (integer.code == *conversion) {
+                    m_base = integer.base;
+                    m_isSigned = integer.isSigned;
+                }
+            }
+            return conversion + 1;
+        case Receiver::FLOAT:
+        case Receiver::DOUBLE:
+        case Receiver::LONG_DOUBLE:
+            m_kind = Kind::FLOATING;
+            return conversion + 1;
+        case Receiver::CHARACTER:
+            m_kind = Kind::CHARACTERS;
+            return conversion + 1;
+        case Receiver::TEXT:
+            m_kind = Kind::TEXT;
+            m_accepted = wordCharacters.data();
+            return *conversion == '[' ? compileSet(conversion + 1) : conversion + 1;
+        }
+    }
+    return conversion;
+}
+
+/// Reads a scan set, from behind its '[', as the C library does: "a-f" is a range when its ends are
+/// in order, and a '-' or ']' that comes first is itself. Returns the position behind the ']'.
+const char* ScanProgram::compileSet(const char* set) noexcept {
+    m_skipsWhiteSpace = false;
+    m_accepted = m_set.data();
+    const bool isInverted = *set == '^';
+    set += isInverted ? 1 : 0;
+    CharacterSet named{};
+    if (*set == ']' || *set == '-') {
+        named[byteOf(*set++)] = true;
+    }
+    for (; *set != '\0' && *set != ']'; ++set) {
+        if (*set == '-' && set[1] != '\0' && set[1] != ']' && byteOf(set[-1]) <= byteOf(set[1])) {
+            for (unsigned member = byteOf(set[-1]); member < byteOf(set[1]); ++member) {
+                named[member] = true;
+            }
+        } else {
+            named[byteOf(*set)] = true;
+        }
+    }
+    for (std::size_t member = 1; member < named.size(); ++member) {
+        m_set[member] = named[member] != isInverted;
+    }
+    return *set == ']' ? set + 1 : set;
+}
+
+int ScanProgram::run(const char* text, void* value) const noexcept {
+    const char* position = text;
+    Outcome outcome = matchLiteral(position);
+    if (outcome == Outcome::MATCHED) {
+        void* const receiver = m_isSuppressed ? nullptr : value;
+        switch (m_kind) {
+        case Kind::INTEGER:
+            outcome = scanInteger(position, receiver);
+            break;
+        case Kind::FLOATING:
+            outcome = scanFloating(position, receiver);
+            break;
+        case Kind::TEXT:
+            outcome = scanText(position, static_cast<char*>(receiver));
+            break;
+        case Kind::CHARACTERS:
+            outcome = scanCharacters(position, static_cast<char*>(receiver));
+            break;
+        case Kind::NOTHING:
+            outcome = Outcome::MISMATCHED;
+            break;
+        }
+    }
+    if (outcome == Outcome::END) {
+        return END_OF_INPUT;
+    }
+    return outcome == Outcome::MATCHED && m_isCounted ? static_cast<int>(position - text)
+                                                      : MISMATCH;
+}
+
+ScanProgram::Outcome ScanProgram::matchLiteral(const char*& position) const noexcept {
+    for (const char* literal = m_literal; literal != m_literalEnd; ++literal) {
+        if (isWhiteSpace(*literal)) {
+            position = skipWhiteSpace(position);
+            continue;
+        }
+        if (*literal == '%') {
+            position = skipWhiteSpace(position);
+            ++literal;
+        }
+        if (*position != *literal) {
+            return *position == '\0' ? Outcome::END : Outcome::MISMATCHED;
+        }
+        ++position;
+    }
+    return Outcome::MATCHED;
+}
+
+ScanProgram::Outcome ScanProgram::scanInteger(const char*& position, void* value) const noexcept {
+    const char* next = skipWhiteSpace(position);
+    if (*next == '\0') {
+        return Outcome::END;
+    }
+    unsigned left = m_width;
+    const bool isNegative = *next == '-';
+    if (isNegative || *next == '+') {
+        ++next;
+        --left;
+    }
+    unsigned base = m_base;
+    bool hasDigits = false;
+    if (base != 10 && left > 0 && *next == '0') {
+        hasDigits = true; // A prefix without digits behind it is the number 0.
+        ++next;
+        --left;
+        if (left > 0 && (*next == 'x' || *next == 'X')) {
+            base = base == 0 ? 16 : base;
+            if (base == 16) {
+                ++next;
+                --left;
+            }
+        } else if (base == 0) {
+            base = 8;
+        }
+    }
+    std::uint64_t magnitude = 0;
+    bool overflowed = false;
+    const char* const digits = next;
+    switch (base) {
+    case 8:
+        next = readDigits<8>(next, left, magnitude, overflowed);
+        break;
+    case 16:
+        next = readDigits<16>(next, left, magnitude, overflowed);
+        break;
+    default:
+        next = readDigits<10>(next, left, magnitude, overflowed);
+        break;
+    }
+    if (next == digits && !hasDigits) {
+        return Outcome::MISMATCHED;
+    }
+    position = next;
+    if (value != nullptr) {
+        storeInteger(magnitude, isNegative, overflowed, value);
+    }
+    return Outcome::MATCHED;
+}
+
+/// The C library reads every integer as a long, stops at the ends of its range, and cuts the result
+/// to the receiving variable.
+void ScanProgram::storeInteger(std::uint64_t magnitude, bool isNegative, bool overflowed,
+                               void* value) const noexcept {
+    std::uint64_t bits = isNegative ? 0 - magnitude : magnitude;
+    if (m_isSigned) {
+        constexpr std::uint64_t LARGEST = std::numeric_limits<std::int64_t>::max();
+        const std::uint64_t limit = isNegative ? LARGEST + 1 : LARGEST;
+        if (overflowed || magnitude > limit) {
+            bits = limit;
+        }
+    } else if (overflowed) {
+        bits = std::numeric_limits<std::uint64_t>::max();
+    }
+    if (m_receiver == Receiver::INTEGER2) {
+        store<std::int16_t>(bits, value);
+    } else if (m_receiver == Receiver::INTEGER4) {
+        store<std::int32_t>(bits, value);
+    } else {
+        store<std::int64_t>(bits, value);
+    }
+}
+
+ScanProgram::Outcome ScanProgram::scanFloating(const char*& position, void* value) const noexcept {
+    const char* const begin = skipWhiteSpace(position);
+    if (*begin == '\0') {
+        return Outcome::END;
+    }
+    const char* const end = FloatField::findEnd(begin, m_width, m_decimalPoint);
+    if (end == nullptr || !FloatField::convert(begin, end, m_receiver, value)) {
+        return Outcome::MISMATCHED;
+    }
+    position = end;
+    return Outcome::MATCHED;
+}
+
+ScanProgram::Outcome ScanProgram::scanText(const char*& position, char* value) const noexcept {
+    const char* const begin = m_skipsWhiteSpace ? skipWhiteSpace(position) : position;
+    if (*begin == '\0') {
+        return Outcome::END;
+    }
+    const char* end = begin;
+    for (unsigned left = m_width; left > 0 && m_accepted[byteOf(*end)]; --left) {
+        ++end;
+    }
+    if (end == begin) {
+        return Outcome::MISMATCHED;
+    }
+    if (value != nullptr) {
+        const auto length = static_cast<std::size_t>(end - begin);
+        std::memcpy(value, begin, length);
+        value[length] = '\0';
+    }
+    position = end;
+    return Outcome::MATCHED;
+}
+
+ScanProgram::Outcome ScanProgram::scanCharacters(const char*& position,
+                                                 char* value) const noexcept {
+    if (*position == '\0') {
+        return Outcome::END;
+    }
+    const char* end = position;
+    for (unsigned left = m_width; left > 0 && *end != '\0'; --left) {
+        ++end;
+    }
+    if (value != nullptr) {
+        const auto length = static_cast<std::size_t>(end - position);
+        std::memcpy(value, position, length);
+        if (m_width > 1) {
+            value[length] = '\0';
+        }
+    }
+    position = end;
+    return Outcome::MATCHED;
+}

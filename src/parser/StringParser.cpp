@@ -1,0 +1,134 @@
+#include "parser/StringParser.h"
+
+#include "agent/TraceScope.h"
+#include "parser/DirectiveRules.h"
+
+#include <cstdio>
+#include <cstring>
+#include <new>
+
+namespace {
+
+TRC1_Anchor anchor{"StringParser.cpp"};
+
+constexpr char START_PATTERN[] = " %*1[Aa] , \"%n";
+
+} // namespace
+
+StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* validFields) {
+    TraceScope trace(anchor);
+    initThis();
+    std::snprintf(FieldName, sizeof FieldName, "ANCHOR");
+    const char* const text = formatSpecifier != nullptr ? formatSpecifier : "";
+    int length = 0;
+    // Only the count tells: the pattern stores nothing.
+    static_cast<void>(std::sscanf(text, START_PATTERN, &length));
+    if (length == 0) {
+        trace.error()(
+            "Scan for start of format specifier failed; looking for \"%s\" but found:  %s",
+            START_PATTERN, text);
+        ObjectStatus = OBJECT_FAILED;
+        return;
+    }
+    ObjectStatus = learnLogFormat(text + length - 1, validFields);
+    if (ObjectStatus == OBJECT_FORMAT_LEARNED && trace.isOn(TRC1_DETAIL)) {
+        printChain();
+    }
+}
+
+StringParser::StringParser(const char** formatPosition) {
+    TraceScope trace(anchor);
+    initThis();
+    *formatPosition = formatNextDirective(*formatPosition);
+    if (ObjectStatus != OBJECT_LEARNED) {
+        return;
+    }
+    ScanOrder.reset(new (std::nothrow) StringParser(formatPosition));
+    if (!ScanOrder) {
+        trace.error()("Memory allocation for %d bytes failed.",
+                      static_cast<int>(sizeof(StringParser)));
+        ObjectStatus = OBJECT_FAILED;
+    } else if (ScanOrder->ObjectStatus != OBJECT_LEARNED) {
+        if (ScanOrder->ObjectStatus == OBJECT_FAILED) {
+            ObjectStatus = OBJECT_FAILED;
+        }
+        ScanOrder.reset();
+    }
+}
+
+StringParser::~StringParser() {
+    TraceScope trace(anchor);
+    ScanOrder.reset();
+    ScanDirective.reset();
+    PrintDirective.reset();
+    if (Value && findDataType(DataType) == nullptr) {
+        trace.error()("Invalid datatype %d detected.  Unable to delete m_value.",
+                      static_cast<int>(DataType));
+    }
+    trace.fine()("%s object destroyed.", FieldName);
+}
+
+void StringParser::initThis() {
+    TraceScope trace(anchor);
+    Suppressed = false;
+    FieldName[0] = '\0';
+    PrintDirective.reset();
+    ScanDirective.reset();
+    DataType = DATATYPE_BASE_NONE;
+    ObjectStatus = OBJECT_FAILED;
+    PrintIndex = -1;
+    ScanOrder.reset();
+    MaxFieldSize = MinFieldSize = Offset = Precision = 0;
+    HasColumn = false;
+    Value.reset();
+}
+
+_ObjectStatus StringParser::learnLogFormat(const char* format, const _KeywordFields* validFields) {
+    TraceScope trace(anchor);
+    const char* position = format;
+    ScanOrder.reset(new (std::nothrow) StringParser(&position));
+    if (!ScanOrder) {
+        trace.error()("Memory allocation for %d bytes failed.",
+                      static_cast<int>(sizeof(StringParser)));
+        return trace.result(OBJECT_FAILED);
+    }
+    if (ScanOrder->ObjectStatus == OBJECT_LEARNED && parseFieldNames(position, validFields) > 0) {
+        return trace.result(OBJECT_FORMAT_LEARNED);
+    }
+    ScanOrder.reset();
+    return trace.result(OBJECT_FAILED);
+}
+
+const char* StringParser::convertType2Char(_DataType type) noexcept {
+    const DataTypeInfo* info = findDataType(type);
+    return info != nullptr ? info->defaultDirective : "";
+}
+
+/// Characters of the scan directive without its "%n", for messages.
+int StringParser::scanDirectiveLength() const noexcept {
+    const std::string_view directive = scanDirective();
+    const bool isCounted = directive.ends_with(CONSUMED_COUNT);
+    return static_cast<int>(directive.size() - (isCounted ? CONSUMED_COUNT.size() : 0));
+}
+
+void StringParser::printChain() const {
+    TraceScope trace(anchor);
+    for (const StringParser* node = this; node != nullptr; node = node->next()) {
+        node->printSelf();
+    }
+}
+
+void StringParser::printSelf() const {
+    TraceScope trace(anchor);
+    trace.always()(
+        "\n\tFieldName\t\t= %s\n\tthis\t\t\t= %p\n\tPrintIndex\t\t= %d\n"
+        "\tScanOrder\t\t= %p\n\tOffset\t\t\t= %d\n\tMaxFieldSize\t\t= %d\n"
+        "\tMinFieldSize\t\t= %d\n\tPrecision\t\t= %d\n\tScanDirective\t\t= \"%.*s\"\n"
+        "\tPrintDirective\t\t= \"%s\"\n\tDataType\t\t= %d\n\tValue\t\t\t= %p\n"
+        "\tSuppressed\t\t= %d\n\tObjectStatus\t\t= %d\n",
+        FieldName, static_cast<const void*>(this), PrintIndex,
+        static_cast<const void*>(ScanOrder.get()), static_cast<int>(Offset),
+        static_cast<int>(MaxFieldSize), static_cast<int>(MinFieldSize), static_cast<int>(Precision),
+        scanDirectiveLength(), scanDirective(), printDirective(), static_cast<int>(DataType),
+        static_cast<const void*>(Value.get()), Suppressed ? 1 : 0, static_cast<int>(ObjectStatus));
+}

@@ -1,0 +1,252 @@
+#include "parser/StringParser.h"
+
+#include "agent/TraceScope.h"
+#include "parser/DirectiveRules.h"
+#include "parser/PrintOptions.h"
+
+#include <cstdio>
+#include <cstring>
+
+#include <langinfo.h>
+
+namespace {
+
+TRC1_Anchor anchor{"StringParserPrintDirective.cpp"};
+
+constexpr char OPENING_PATTERN[] = "= \"%n";
+constexpr int OPENING_LENGTH = 3; ///< characters of the pattern that the text must hold
+
+const char* skipWhiteSpace(const char* text) {
+    while (isWhiteSpace(*text)) {
+        ++text;
+    }
+    return text;
+}
+
+} // namespace
+
+const char* StringParser::getPrintDirective(const char* text) {
+    TraceScope trace(anchor);
+    _BuildArea area(skipWhiteSpace(text));
+    if (*area.position != '=') {
+        if (defaultPrintDirective(&area) != 0) {
+            return trace.result<const char*>(nullptr);
+        }
+    } else {
+        int length = 0;
+        static_cast<void>(std::sscanf(area.position, OPENING_PATTERN, &length));
+        if (length == 0) {
+            trace.error()("Error in print directive for field %s. Expected \"%.*s\"; found \"%s\"",
+                          FieldName, OPENING_LENGTH, OPENING_PATTERN, area.position);
+            return trace.result<const char*>(nullptr);
+        }
+        area.position += length - 1;
+        const int found = findDirective(&area);
+        if (found < 0 || (found == 0 && validatePrintDirective(&area) != 0)) {
+            return trace.result<const char*>(nullptr);
+        }
+        area.removeLast(); // the closing quote
+        area.position = skipWhiteSpace(area.position + 1);
+    }
+    if (!storeDirective(area, PrintDirective)) {
+        return trace.result<const char*>(nullptr);
+    }
+    m_print.compile(PrintDirective.get(), DataType);
+    return trace.result(area.position);
+}
+
+int StringParser::validatePrintDirective(_BuildArea* area) {
+    TraceScope trace(anchor);
+    if (validatePrintOptions(area) != 0 || extractMinFieldWidth(area) != 0) {
+        return trace.result(-1);
+    }
+    if (*area->position == '.' && extractPrecision(area) != 0) {
+        return trace.result(-1);
+    }
+    if (validatePrintConvcode(area, extractVariableSize(area)) != 0) {
+        return trace.result(-1);
+    }
+    const int found = findDirective(area);
+    if (found == 0) {
+        trace.error()("Error: multiple format specifiers found in print directive for field %s.",
+                      FieldName);
+    }
+    return trace.result(found == 1 ? 0 : -1);
+}
+
+int StringParser::validatePrintOptions(_BuildArea* area) {
+    TraceScope trace(anchor);
+    unsigned given = 0;
+    for (; *area->position != '\0'; ++area->position) {
+        const PrintOption* option = nullptr;
+        for (const PrintOption& candidate : printOptions) {
+            if (candidate.character == *area->position) {
+                option = &candidate;
+            }
+        }
+        if (option == nullptr) {
+            return trace.result(0);
+        }
+        if (isPrintOptionKept(*option, given, area->position)) {
+            if (!area->append(option->character)) {
+                return trace.result(-1);
+            }
+            given |= option->flag;
+        }
+    }
+    return trace.result(-1);
+}
+
+/// Decides on one option, of which `given` holds those kept before it; warns where it is dropped
+/// for another reason than having been given twice. `text` is the print text from the option on.
+bool StringParser::isPrintOptionKept(const PrintOption& option, unsigned given,
+                                     const char* text) const {
+    TraceScope trace(anchor);
+    const DataTypeInfo* scanned = findDataType(DataType);
+    if (scanned == nullptr || !isAllowed(option.types, *scanned)) {
+        warnOfRefusedOption(option, text);
+        return trace.result(false);
+    }
+    const bool meetsRival = (given & option.rival) != 0;
+    const bool isRepeated = (given & option.flag) != 0;
+    if (meetsRival && (option.isYielding || !isRepeated)) {
+        warnOfRivalOption(option);
+    }
+    if ((meetsRival && option.isYielding) || isRepeated) {
+        return trace.result(false);
+    }
+    if (option.flag == OPTION_GROUPING && trace.isOn(TRC1_FINE)) {
+        const char separator = *nl_langinfo(THOUSEP);
+        // A locale without grouping has none; a blank keeps the record whole.
+        trace.fine()("Integer \"thousands_sep\" is '%c'.", separator != '\0' ? separator : ' ');
+    }
+    return trace.result(true);
+}
+
+void StringParser::warnOfRefusedOption(const PrintOption& option, const char* text) const {
+    TraceScope trace(anchor);
+    const char* const type = convertType2Char(DataType);
+    switch (option.refusal) {
+    case OptionRefusal::OPTION:
+        trace.detail()("Warning: cannot use '%c' option character in the print directive for field "
+                       "%s which has a scan data type of \"%s\". Print directive is \"%s\".",
+                       option.character, FieldName, type, text);
+        break;
+    case OptionRefusal::THOUSANDS:
+        trace.detail()("Warning: cannot use '%c' option character in the print directive for field "
+                       "%s  which has a scan data type of \"%s\". Print directive is \"%s\".",
+                       option.character, FieldName, type, text);
+        break;
+    case OptionRefusal::ZERO:
+        trace.detail()("Warning: cannot use zero padding in the print directive for field %s which "
+                       "has a scan data type of \"%s\". Print directive is \"%s\".",
+                       FieldName, type, text);
+        break;
+    }
+}
+
+void StringParser::warnOfRivalOption(const PrintOption& option) const {
+    TraceScope trace(anchor);
+    if (option.flag == OPTION_BLANK) {
+        trace.detail()(
+            "Warning: '%c' option overrides '%c' option in print directive for field %s.", '+', ' ',
+            FieldName);
+    } else if (option.flag == OPTION_SIGN) {
+        trace.detail()("Warning: '%c' option overrides '%c'option in print directive for field %s.",
+                       '+', ' ', FieldName);
+    } else {
+        trace.detail()(
+            "Warning: left justification overrides zero padding in print directive for field %s.",
+            FieldName);
+    }
+}
+
+int StringParser::extractMinFieldWidth(_BuildArea* area) {
+    TraceScope trace(anchor);
+    if (!isDigit(*area->position)) {
+        return trace.result(0);
+    }
+    int width = 0;
+    int length = 0;
+    static_cast<void>(std::sscanf(area->position, "%d%n", &width, &length));
+    if (width < 1 || width > MAX_PRINT_WIDTH || length > MAX_PRINT_WIDTH_DIGITS) {
+        trace.error()("Invalid minimum field width specified: %.*s; ZERO < min width <= %d.",
+                      length, area->position, MAX_PRINT_WIDTH);
+        return trace.result(-1);
+    }
+    if (!area->append(area->position, static_cast<std::size_t>(length))) {
+        return trace.result(-1);
+    }
+    MinFieldSize = static_cast<unsigned>(width);
+    area->position += length;
+    return trace.result(0);
+}
+
+int StringParser::extractPrecision(_BuildArea* area) {
+    TraceScope trace(anchor);
+    const char* const text = area->position;
+    int precision = 0;
+    int length = 0;
+    static_cast<void>(std::sscanf(text, ".%d%n", &precision, &length));
+    if (length == 0) {
+        length = 1;
+    }
+    // The reading also takes a sign or white space before the digits, which no directive may hold.
+    const bool isWritten = length == 1 || isDigit(text[1]);
+    if (!isWritten || precision < 0 || precision > MAX_PRECISION ||
+        length > MAX_PRECISION_CHARACTERS) {
+        trace.error()("Invalid precision specified for field %s: %s; ZERO <= precision <= %d.",
+                      FieldName, text, MAX_PRECISION);
+        return trace.result(-1);
+    }
+    if (!area->append(text, static_cast<std::size_t>(length))) {
+        return trace.result(-1);
+    }
+    Precision = static_cast<unsigned>(precision);
+    area->position += length;
+    return trace.result(0);
+}
+
+int StringParser::validatePrintConvcode(_BuildArea* area, _DataType modifierBase) {
+    TraceScope trace(anchor);
+    const ConversionCode* conversion = nullptr;
+    for (const ConversionCode& candidate : conversionCodes) {
+        if (candidate.prints && candidate.code == *area->position &&
+            isAllowed(candidate.modifiers, modifierBase)) {
+            conversion = &candidate;
+        }
+    }
+    if (conversion == nullptr) {
+        trace.error()("Invalid convcode or variable size specified in print directive for field "
+                      "%s. Directive is %.*s",
+                      FieldName, area->length(), area->buffer);
+        return trace.result(-1);
+    }
+    const auto type = static_cast<_DataType>(modifierBase + conversion->number);
+    const DataTypeInfo* const printed = findDataType(type);
+    const DataTypeInfo* const scanned = findDataType(DataType);
+    if (printed == nullptr) {
+        trace.error()("Invalid datatype of %d computed from directive for field %s. Directive is "
+                      "%.*s",
+                      static_cast<int>(type), FieldName, area->length(), area->buffer);
+        return trace.result(-1);
+    }
+    const bool isFirstCharacter = type == DATATYPE_CHAR && DataType == DATATYPE_STRING;
+    if (!isFirstCharacter && (scanned == nullptr || printed->group != scanned->group)) {
+        trace.error()("Scan and print data types are not compatible for field %s. Scan type is "
+                      "%s; print type is %s.",
+                      FieldName, convertType2Char(DataType), printed->defaultDirective);
+        return trace.result(-1);
+    }
+    if (isFirstCharacter) {
+        DataType = DATATYPE_CHAR;
+    }
+    return trace.result(0);
+}
+
+int StringParser::defaultPrintDirective(_BuildArea* area) {
+    TraceScope trace(anchor);
+    const char* const directive = convertType2Char(DataType);
+    const bool isCopied = *directive != '\0' && area->append(directive, std::strlen(directive));
+    return trace.result(isCopied ? 0 : -1);
+}
