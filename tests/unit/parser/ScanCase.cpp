@@ -35,7 +35,7 @@ std::string CaseGenerator::literal() {
 }
 
 std::string CaseGenerator::scanSet() {
-    constexpr const char* members[] = {"a-f", "0-9", "^",  "-",  "]x", "z-a", "\t", " ",   ".",
+    constexpr const char* members[] = {"a-f", "0-9", "a^", "-",   "]x", "z-a", "\t", " ",        ".",
                                        "+--", "a",   "%", "--/", ":",  "A-",  "[",  "\xe0-\xff"};
     std::string set = oneIn(2) ? "^" : "";
     if (oneIn(4)) {
@@ -74,10 +74,46 @@ std::string CaseGenerator::scanDirective() {
 
 std::string CaseGenerator::number() {
     constexpr const char* pieces[] = {
-        "0",  "1",  "7",    "8",   "9",    "12",       "0x",      "0X", "f",  "A",   "e",
-        "E",  "p",  ".",    "-",   "+",    "nan",      "inf",     "i",  "n",  "NaN", "INFINITY",
-        "in", "00", "e+",   "e-3", "p-2",  "infinit",  "1e5",     "g",  "08", "0xg", ".5",
-        "5.", "99", "0x1p", "%",   "1e99", "9223372036854775807", "18446744073709551616",
+        "0",
+        "1",
+        "7",
+        "8",
+        "9",
+        "12",
+        "0x",
+        "0X",
+        "f",
+        "A",
+        "e",
+        "E",
+        "p",
+        ".",
+        "-",
+        "+",
+        "nan",
+        "inf",
+        "i",
+        "n",
+        "NaN",
+        "INFINITY",
+        "in",
+        "00",
+        "e+",
+        "e-3",
+        "p-2",
+        "infinit",
+        "1e5",
+        "g",
+        "08",
+        "0xg",
+        ".5",
+        "5.",
+        "99",
+        "0x1p",
+        "%",
+        "1e99",
+        "9223372036854775807",
+        "18446744073709551616",
     };
     std::string text = oneIn(3) ? (oneIn(2) ? "-" : "+") : "";
     if (oneIn(3)) {
@@ -91,7 +127,7 @@ std::string CaseGenerator::number() {
 
 std::string CaseGenerator::textFor(const std::string& directive) {
     constexpr const char* blanks[] = {"", "", " ", "  ", "\t", "\n", " \v\f\r"};
-    constexpr const char* words[] = {"abc",  "a b", "x",    "]x-", "fed.cba", "+,-./",
+    constexpr const char* words[] = {"abc",  "a b",      "x",  "]x-", "fed.cba", "+,-./",
                                      "A-[z", "\xe9\xe8", "%%", "^^",  "12ab",    ""};
     const std::string literalText = directive.substr(0, directive.find('%'));
     std::string text;

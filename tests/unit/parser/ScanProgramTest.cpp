@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <cstring>
@@ -19,6 +20,15 @@ struct Result {
     int consumed = 0;
     Storage value{};
 };
+
+/// Clears the bytes of a long double that hold no part of the number and may be anything.
+void clearPadding(const std::string& directive, Result& result) {
+    constexpr bool isPadded = std::numeric_limits<long double>::digits == 64;
+    if (isPadded && directive.find_first_of("efg", directive.rfind('L')) != std::string::npos) {
+        std::fill(result.value.begin() + 10, result.value.begin() + sizeof(long double),
+                  static_cast<unsigned char>(0));
+    }
+}
 
 unsigned textWidth(const std::string& directive) {
     return directive.find("%*") == std::string::npos ? 31 : 0;
@@ -82,15 +92,16 @@ TEST(ScanProgram, AgreesWithTheCLibrary) {
     for (int number = 0; number < generator.cases(); ++number) {
         const std::string directive = generator.scanDirective();
         const std::string line = generator.textFor(directive);
-        const Result ours = scanned(directive, line);
-        const Result theirs = scannedByLibrary(directive, line);
+        Result ours = scanned(directive, line);
+        Result theirs = scannedByLibrary(directive, line);
+        clearPadding(directive, ours);
+        clearPadding(directive, theirs);
         ASSERT_EQ(ours.consumed, theirs.consumed)
             << "case " << number << ": \"" << shown(directive) << "\" on \"" << shown(line) << '"';
         if (ours.consumed > 0) {
             ++matched;
-            ASSERT_EQ(ours.value, theirs.value)
-                << "case " << number << ": \"" << shown(directive) << "\" on \"" << shown(line)
-                << '"';
+            ASSERT_EQ(ours.value, theirs.value) << "case " << number << ": \"" << shown(directive)
+                                                << "\" on \"" << shown(line) << '"';
         }
     }
     EXPECT_GT(matched, generator.cases() / 5);
@@ -168,8 +179,7 @@ TEST(ScanProgram, ReadsFloatingPointNumbersOfAnyLength) {
               -std::numeric_limits<double>::infinity());
     EXPECT_EQ(value<long double>(scanned("%Lf%n", "1" + std::string(600, '0') + "1")),
               scannedByLibrary("%Lf%n", "1" + std::string(600, '0') + "1").consumed > 0
-                  ? value<long double>(
-                        scannedByLibrary("%Lf%n", "1" + std::string(600, '0') + "1"))
+                  ? value<long double>(scannedByLibrary("%Lf%n", "1" + std::string(600, '0') + "1"))
                   : 0.0L);
     EXPECT_EQ(scanned("%3f%n", "1.25").consumed, 3);
     EXPECT_EQ(scanned("%f%n", "0x").consumed, ScanProgram::MISMATCH);
@@ -184,7 +194,10 @@ TEST(ScanProgram, PercentSignsAndWhiteSpaceOfTheLiteral) {
     EXPECT_EQ(scanned(" %c%n", "   x").consumed, 4);
     EXPECT_EQ(scanned("%c%n", "   x").consumed, 1);
     // The "C" locale's scanner skips white space before any byte.
-    EXPECT_EQ(scanned(" \xe9%d%n", "  \xe9" "1").consumed, 4);
+    EXPECT_EQ(scanned(" \xe9%d%n", "  \xe9"
+                                   "1")
+                  .consumed,
+              4);
 }
 
 TEST(ScanProgram, ADirectiveWithoutItsCountMatchesNothing) {
