@@ -1,0 +1,116 @@
+#include "host/framework/TraceLevels.h"
+
+#include <algorithm>
+#include <charconv>
+#include <iterator>
+#include <optional>
+
+namespace {
+
+constexpr unsigned kAll = TRC1_ERROR | TRC1_FLOW | TRC1_DETAIL | TRC1_FINE;
+constexpr unsigned kMaxLevel = 0xff;
+
+struct ClassName {
+    std::string_view name;
+    unsigned level;
+};
+
+constexpr ClassName kClasses[] = {
+    {"error", TRC1_ERROR}, {"flow", TRC1_FLOW}, {"detail", TRC1_DETAIL},
+    {"fine", TRC1_FINE},   {"all", kAll},       {"none", 0},
+};
+
+std::string_view trimmed(std::string_view text) {
+    const std::size_t first = text.find_first_not_of(" \t");
+    if (first == std::string_view::npos) {
+        return {};
+    }
+    return text.substr(first, text.find_last_not_of(" \t") - first + 1);
+}
+
+/// Takes the part before the separator, trimmed, off the text.
+std::string_view takePart(std::string_view& text, char separator) {
+    const std::size_t end = std::min(text.find(separator), text.size());
+    const std::string_view part = trimmed(text.substr(0, end));
+    text.remove_prefix(std::min(end + 1, text.size()));
+    return part;
+}
+
+std::optional<unsigned> numberOf(std::string_view text) {
+    const bool isHexadecimal = text.starts_with("0x") || text.starts_with("0X");
+    text.remove_prefix(isHexadecimal ? 2 : 0);
+    unsigned value = 0;
+    const char* const end = text.data() + text.size();
+    const auto result = std::from_chars(text.data(), end, value, isHexadecimal ? 16 : 10);
+    if (result.ec != std::errc() || result.ptr != end || value > kMaxLevel) {
+        return std::nullopt;
+    }
+    return value;
+}
+
+std::optional<unsigned> classOf(std::string_view name) {
+    const auto* const found =
+        std::find_if(std::begin(kClasses), std::end(kClasses),
+                     [name](const ClassName& known) { return known.name == name; });
+    return found != std::end(kClasses) ? found->level : numberOf(name);
+}
+
+/// The unit's name without the ending of the source file.
+std::string_view stemOf(std::string_view unit) {
+    return unit.substr(0, unit.rfind('.'));
+}
+
+} // namespace
+
+std::string TraceLevels::parse(std::string_view text) {
+    TraceLevels parsed;
+    while (!text.empty()) {
+        const std::string_view word = takePart(text, ',');
+        if (word.empty()) {
+            continue;
+        }
+        const std::string error = parsed.parseWord(word);
+        if (!error.empty()) {
+            return error;
+        }
+    }
+    *this = std::move(parsed);
+    return {};
+}
+
+std::string TraceLevels::parseWord(std::string_view word) {
+    std::string_view classes = word;
+    std::optional<std::string_view> unit;
+    if (word.find('=') != std::string_view::npos) {
+        unit = takePart(classes, '=');
+        if (unit->empty()) {
+            return "no unit is named before '=' in \"" + std::string(word) + "\"";
+        }
+    }
+    unsigned level = 0;
+    do {
+        const std::string_view name = takePart(classes, '+');
+        const std::optional<unsigned> known = classOf(name);
+        if (!known) {
+            return "\"" + std::string(name) + "\" in \"" + std::string(word) +
+                   "\" is no trace class; the classes are error, flow, detail, fine, all, none, or "
+                   "a number from 0 to 255";
+        }
+        level |= *known;
+    } while (!classes.empty());
+    if (unit) {
+        m_units.push_back({std::string(*unit), level});
+    } else {
+        m_general = m_hasGeneral ? m_general | level : level;
+        m_hasGeneral = true;
+    }
+    return {};
+}
+
+unsigned TraceLevels::levelOf(std::string_view unit) const noexcept {
+    const std::string_view stem = stemOf(unit);
+    const auto found = std::find_if(m_units.rbegin(), m_units.rend(), [&](const Unit& known) {
+        return known.name == unit || known.name == stem;
+    });
+    return found != m_units.rend() ? found->level : m_general;
+}

@@ -1,0 +1,37 @@
+#ifndef ZRM_HOST_TRACE_LEVELS_H
+#define ZRM_HOST_TRACE_LEVELS_H
+
+#include "agent/framework/trace.h"
+
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Which classes of records are written, as text tells it: words separated by commas, each one
+/// `class` for every unit or `unit=class` for one source file, named with or without its ending.
+/// Several classes are joined with a plus. Classes are error, flow, detail, fine, all, none, or a
+/// number (decimal or 0x..). Classes for every unit add up; without any, the errors are written.
+/// The last word about a unit holds. Immutable once parsed.
+class TraceLevels {
+public:
+    /// Reads the text; returns an empty text, or what is wrong with it, and leaves the levels as
+    /// they were then.
+    std::string parse(std::string_view text);
+
+    /// The set of TRC1_Class bits of a unit. Neither locks nor allocates.
+    unsigned levelOf(std::string_view unit) const noexcept;
+
+private:
+    struct Unit {
+        std::string name;
+        unsigned level;
+    };
+
+    std::string parseWord(std::string_view word);
+
+    bool m_hasGeneral = false;
+    unsigned m_general = TRC1_ERROR;
+    std::vector<Unit> m_units;
+};
+
+#endif

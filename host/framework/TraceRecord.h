@@ -1,0 +1,31 @@
+#ifndef ZRM_HOST_TRACE_RECORD_H
+#define ZRM_HOST_TRACE_RECORD_H
+
+#include <cstdarg>
+#include <cstddef>
+#include <ctime>
+#include <string_view>
+
+/// One trace record: local time with microseconds, thread, unit and line, text, and one newline at
+/// its end. What does not fit is cut. Lives on the stack of one thread; neither locks nor
+/// allocates.
+class TraceRecord {
+public:
+    static constexpr std::size_t kMaxSize = 16384; ///< bytes, with the newline
+
+    TraceRecord(const std::timespec& moment, long thread, const char* unit, int line) noexcept;
+
+    /// Adds the text.
+    void add(const char* format, std::va_list arguments) noexcept
+        __attribute__((format(printf, 2, 0)));
+    void add(const char* format, ...) noexcept __attribute__((format(printf, 2, 3)));
+
+    /// Ends the record and returns it whole; it stays valid as long as the object lives.
+    std::string_view finish() noexcept;
+
+private:
+    std::size_t m_size = 0;
+    char m_text[kMaxSize];
+};
+
+#endif
