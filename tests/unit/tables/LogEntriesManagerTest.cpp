@@ -4,7 +4,7 @@
 #include "tables/zrm_rmlogent_manager.h"
 
 #include "TestRequest.h"
-#include "TestTables.h"
+#include "host/framework/Tables.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 
@@ -25,28 +25,28 @@ using testing::IsEmpty;
 
 bool registersOnce() {
     zrm_rmlogent_data_t row{};
-    const bool isSilentBefore = zrm_rmlogent_manager::EventArrived(&row, 1) == 0;
-    const bool isRegistered = zrm_rmlogent_init() == 0 && TestTables::registered().size() == 1;
-    TableManager* const manager = TestTables::registered().at(0);
+    if (zrm_rmlogent_manager::EventArrived(&row, 1) != 0 || zrm_rmlogent_init() != 0) {
+        return false;
+    }
+    TableManager* const manager = Tables::find("RMLOGENT");
     TestRequest test(SAMPLE_SITUATION);
     const std::unique_ptr<ctreq> request(manager->CreateCtreq(&test, nullptr));
     manager->requests().Add(request.get());
     test.dispatchStatus = 5;
-    return isSilentBefore && isRegistered && manager->application() == std::string("ZRM") &&
-           manager->table() == std::string("RMLOGENT") &&
+    return manager->application() == std::string("ZRM") &&
            zrm_rmlogent_manager::EventArrived(&row, 1) == 5 && test.dispatched.size() == 1;
 }
 
 bool reportsMissingMemory() {
     const Fault fault("new", ENOMEM);
     zrm_rmlogent_data_t row{};
-    return zrm_rmlogent_init() == 0x21060002 && TestTables::registered().empty() &&
+    return zrm_rmlogent_init() == 0x21060002 && Tables::find("RMLOGENT") == nullptr &&
            zrm_rmlogent_manager::EventArrived(&row, 1) == 0;
 }
 
 bool passesTheFrameworksStatus() {
-    TestTables::registerStatus() = 0x12345678;
-    return zrm_rmlogent_init() == 0x12345678 && TestTables::registered().size() == 1;
+    TestCalls::registrationStatus() = 0x12345678;
+    return zrm_rmlogent_init() == 0x12345678;
 }
 
 class LogEntriesRegistrationDeathTest : public testing::Test {

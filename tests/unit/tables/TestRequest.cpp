@@ -2,7 +2,6 @@
 
 #include "agent/TraceScope.h"
 #include "agent/framework/TableManager.h"
-#include "agent/framework/values.h"
 
 #include <cstring>
 #include <map>
@@ -28,6 +27,11 @@ void record(TestRequest& test, const std::string& call) {
 std::vector<std::string>& TestCalls::all() {
     static std::vector<std::string> calls;
     return calls;
+}
+
+unsigned& TestCalls::registrationStatus() {
+    static unsigned status = 0;
+    return status;
 }
 
 TestRequest::TestRequest(SampleType type, std::string requestName) {
@@ -179,6 +183,18 @@ ctreq* ctreq::UseHandle(unsigned handle) {
     return request;
 }
 
-void RSC1_Drop(unsigned handle) {
+// RSC1_Drop and TableManager::RegisterWithManager by their linker names: the first belongs to the
+// handles of the double, the second can be told to fail.
+
+extern "C" void __wrap__Z9RSC1_Dropj(unsigned handle);
+extern "C" void __wrap__Z9RSC1_Dropj(unsigned handle) {
     TestCalls::all().push_back(std::string(liveRequests().at(handle)->name()) + " drop");
+}
+
+extern "C" unsigned __real__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager);
+extern "C" unsigned __wrap__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager);
+extern "C" unsigned __wrap__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager) {
+    return TestCalls::registrationStatus() != 0
+               ? TestCalls::registrationStatus()
+               : __real__ZN12TableManager19RegisterWithManagerEPS_(manager);
 }

@@ -47,10 +47,13 @@ public:
     int stops = 0;
 };
 
-/// The calls to all requests, in order, as "NAME CALL".
+/// What concerns all requests.
 class TestCalls {
 public:
+    /// The calls to all requests, in order, as "NAME CALL".
     static std::vector<std::string>& all();
+    /// The status with which the framework refuses to register a table; 0: it does not.
+    static unsigned& registrationStatus();
 };
 
 #endif
