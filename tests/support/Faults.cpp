@@ -43,6 +43,9 @@ std::atomic<bool> g_fakeSleep{false};
 std::atomic<unsigned> g_slept{0};
 std::atomic<long> g_blockSize{-1}; // negative: the real one
 std::atomic<pid_t> g_waitedId{0};
+std::atomic<bool> g_fakeTimedWait{false};
+std::atomic<long> g_timedWaitSeconds{0};
+std::atomic<int> g_fakeSignal{0};
 std::string* g_unameSystem = nullptr;
 std::string* g_unameNode = nullptr;
 
@@ -126,6 +129,24 @@ FakeSleep::~FakeSleep() {
 }
 unsigned FakeSleep::requested() const {
     return g_slept;
+}
+
+FakeTimedWait::FakeTimedWait() {
+    g_timedWaitSeconds = 0;
+    g_fakeTimedWait = true;
+}
+FakeTimedWait::~FakeTimedWait() {
+    g_fakeTimedWait = false;
+}
+long FakeTimedWait::requested() const {
+    return g_timedWaitSeconds;
+}
+
+FakeSignal::FakeSignal(int number) {
+    g_fakeSignal = number;
+}
+FakeSignal::~FakeSignal() {
+    g_fakeSignal = 0;
 }
 
 FakeUname::FakeUname(std::string system, std::string node) {
@@ -229,9 +250,6 @@ WRAP_CODE(pthread_cond_destroy, (pthread_cond_t * condition), (condition))
 WRAP_CODE(pthread_cond_init, (pthread_cond_t * condition, const pthread_condattr_t* attributes),
           (condition, attributes))
 WRAP_CODE(pthread_cond_signal, (pthread_cond_t * condition), (condition))
-WRAP_CODE(pthread_cond_timedwait,
-          (pthread_cond_t * condition, pthread_mutex_t* mutex, const struct timespec* limit),
-          (condition, mutex, limit))
 WRAP_CODE(pthread_cond_wait, (pthread_cond_t * condition, pthread_mutex_t* mutex),
           (condition, mutex))
 WRAP_CODE(pthread_condattr_destroy, (pthread_condattr_t * attributes), (attributes))
@@ -253,7 +271,6 @@ WRAP_ERRNO(int, select, -1,
            (int count, fd_set* readable, fd_set* writable, fd_set* exceptional,
             struct timeval* limit),
            (count, readable, writable, exceptional, limit))
-WRAP_CODE(sigwait, (const sigset_t* set, int* signal), (set, signal))
 WRAP_ERRNO(long, sysconf, -1, (int name), (name))
 
 // The state's lock is held meanwhile, so that the child finds it free.
@@ -340,6 +357,40 @@ extern "C" int __wrap_fcntl(int fd, int command, ...) {
     const int argument = va_arg(arguments, int);
     va_end(arguments);
     return __real_fcntl(fd, command, argument);
+}
+
+extern "C" int __real_pthread_cond_timedwait(pthread_cond_t* condition, pthread_mutex_t* mutex,
+                                             const struct timespec* limit);
+extern "C" int __wrap_pthread_cond_timedwait(pthread_cond_t* condition, pthread_mutex_t* mutex,
+                                             const struct timespec* limit);
+extern "C" int __wrap_pthread_cond_timedwait(pthread_cond_t* condition, pthread_mutex_t* mutex,
+                                             const struct timespec* limit) {
+    if (const int error = fault("pthread_cond_timedwait")) {
+        return error;
+    }
+    if (g_fakeTimedWait) {
+        struct timespec now;
+        clock_gettime(CLOCK_REALTIME, &now);
+        // Rounded, since some of the time is already gone.
+        const long nanoseconds = limit->tv_nsec - now.tv_nsec;
+        g_timedWaitSeconds = limit->tv_sec - now.tv_sec +
+                             (nanoseconds > 500000000 ? 1 : (nanoseconds < -500000000 ? -1 : 0));
+        return ETIMEDOUT;
+    }
+    return __real_pthread_cond_timedwait(condition, mutex, limit);
+}
+
+extern "C" int __real_sigwait(const sigset_t* set, int* signal);
+extern "C" int __wrap_sigwait(const sigset_t* set, int* signal);
+extern "C" int __wrap_sigwait(const sigset_t* set, int* signal) {
+    if (const int error = fault("sigwait")) {
+        return error;
+    }
+    if (const int number = g_fakeSignal.exchange(0)) {
+        *signal = number;
+        return 0;
+    }
+    return __real_sigwait(set, signal);
 }
 
 extern "C" unsigned __real_sleep(unsigned seconds);

@@ -57,6 +57,26 @@ public:
     unsigned requested() const;
 };
 
+/// While it lives, a timed wait on a condition times out at once, with its mutex still held.
+class FakeTimedWait {
+public:
+    FakeTimedWait();
+    ~FakeTimedWait();
+    FakeTimedWait(const FakeTimedWait&) = delete;
+    FakeTimedWait& operator=(const FakeTimedWait&) = delete;
+    /// Seconds from the last wait's call to its limit, rounded.
+    long requested() const;
+};
+
+/// The next sigwait() gives this signal at once.
+class FakeSignal {
+public:
+    explicit FakeSignal(int number);
+    ~FakeSignal();
+    FakeSignal(const FakeSignal&) = delete;
+    FakeSignal& operator=(const FakeSignal&) = delete;
+};
+
 /// While it lives, uname() reports these names.
 class FakeUname {
 public:
