@@ -4,6 +4,7 @@
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/ErrLogFile.h"
 #include "logtypes/SysLogFile.h"
+#include "logtypes/UserLogFile.h"
 
 #include <new>
 
@@ -20,6 +21,7 @@ struct LogKind {
 
 constexpr LogKind logKinds[] = {
     {'S', create<SysLogFile>},
+    {'U', create<UserLogFile>},
     {'A', create<AdminLogFile>},
     {'E', create<ErrLogFile>},
 };

@@ -1,0 +1,137 @@
+#include "logtypes/UserLogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "agent/framework/locale.h"
+#include "logmgr/ValidLog.h"
+#include "logtypes/EntryTimeBuffers.h"
+#include "monitor/UTF8Conv.h"
+#include "parser/StringParser.h"
+#include "tables/zrm_rmlogent_data.h"
+
+#include <cerrno>
+#include <cstring>
+#include <iterator>
+#include <new>
+
+namespace {
+
+TRC1_Anchor anchor{"UserLogFile.cpp"};
+
+/// The fields of a user log. Their order is that of the format buffers in formatEntryAsRow.
+constexpr _KeywordFields validFields[] = {
+    {"year", 2},   {"month", 2},  {"day", 2},  {"hour", 2},  {"minute", 2},      {"second", 2},
+    {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2}, {"description", 2}, {nullptr, 0},
+};
+
+class ChainGuard {
+public:
+    explicit ChainGuard(SYS1_Lock& lock) : m_lock(lock) { SYS1_GetLock(&m_lock); }
+    ~ChainGuard() { SYS1_ReleaseLock(&m_lock); }
+    ChainGuard(const ChainGuard&) = delete;
+    ChainGuard& operator=(const ChainGuard&) = delete;
+
+private:
+    SYS1_Lock& m_lock;
+};
+
+} // namespace
+
+UserLogFile::UserLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        printSelf();
+    }
+    startThread();
+}
+
+UserLogFile::~UserLogFile() {
+    TraceScope trace(anchor);
+    stopThread();
+}
+
+void UserLogFile::printSelf() const {
+    TraceScope trace(anchor);
+    LogFile::printSelf();
+    const ChainGuard guard(m_chainLock);
+    trace.always()("\n\tSPAnchor\t\t= %p\n\tNumericMonth\t\t= %d\n",
+                   static_cast<const void*>(SPAnchor.get()), NumericMonth ? 1 : 0);
+}
+
+void UserLogFile::processLogData() {
+    TraceScope trace(anchor);
+    if (!hasFormat()) {
+        learnFormat();
+    }
+    if (!hasFormat()) {
+        return;
+    }
+    openLogAndSeek();
+    if (LogFileP != nullptr) {
+        waitForEventLoop({1, 0});
+        closeLog();
+    }
+}
+
+bool UserLogFile::hasFormat() const {
+    const ChainGuard guard(m_chainLock);
+    return SPAnchor != nullptr;
+}
+
+void UserLogFile::learnFormat() {
+    TraceScope trace(anchor);
+    std::unique_ptr<StringParser> format(new (std::nothrow) StringParser(procedure(), validFields));
+    if (!format) {
+        const ErrorText error(errno);
+        trace.error()("Error: memory allocation failed for %d bytes; monitoring not started for "
+                      "file %s. errno = %d; %s",
+                      static_cast<int>(sizeof(StringParser)), fileNameLocal(), error.number(),
+                      error.text());
+        setMonitorStatus(MONITOR_ERR_NO_MEMORY);
+        return;
+    }
+    if (format->status() != OBJECT_FORMAT_LEARNED) {
+        format.reset();
+        trace.error()("Error occurred while interpreting format command for file %s; monitoring "
+                      "not started. ",
+                      fileNameLocal());
+        setMonitorStatus(MONITOR_ERR_FORMAT);
+        return;
+    }
+    const ChainGuard guard(m_chainLock);
+    SPAnchor = std::move(format);
+}
+
+long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
+    TraceScope trace(anchor);
+    auto* const columns = static_cast<zrm_rmlogent_data_t*>(row);
+    std::memset(columns, ' ', sizeof *columns);
+    _EntryTimeBuffers times{};
+    _FormatBuffer buffers[] = {
+        {times.year, _EntryTimeBuffers::ROOM},
+        {times.month, _EntryTimeBuffers::ROOM},
+        {times.day, _EntryTimeBuffers::ROOM},
+        {times.hour, _EntryTimeBuffers::ROOM},
+        {times.minute, _EntryTimeBuffers::ROOM},
+        {times.second, _EntryTimeBuffers::ROOM},
+        {columns->entrysys, sizeof columns->entrysys},
+        {columns->entrysrc, sizeof columns->entrysrc},
+        {columns->entrytype, sizeof columns->entrytype},
+        {columns->entryclass, sizeof columns->entryclass},
+        {columns->entrydesc, sizeof columns->entrydesc},
+    };
+    static_assert(std::size(buffers) == std::size(validFields) - 1);
+    {
+        const ChainGuard guard(m_chainLock);
+        if (!SPAnchor || SPAnchor->formatLine(line, buffers) < 1 ||
+            formatEntryTime(columns->entrytime, &times, reportContext) != 0) {
+            return trace.result(-1L);
+        }
+    }
+    fillCommonColumns(columns);
+    UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
+                             sizeof columns->entrysrc, LOC2_NO_TERMINATOR);
+    UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc, columns->entrydesc,
+                             sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
+    return trace.result(0L);
+}

@@ -1,0 +1,230 @@
+#include "logtypes/UserLogFile.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "logtypes/EntryTime.h"
+#include "logtypes/EntryTimeBuffers.h"
+#include "logtypes/UserlogBufferInfo.h"
+
+#include <cerrno>
+#include <cstring>
+#include <iterator>
+
+namespace {
+
+TRC1_Anchor anchor{"UserLogFileTime.cpp"};
+
+constexpr const char* monthNames[] = {
+    "Jan", "Feb", "Mar", "Apr", "May", "Jun", "Jul", "Aug", "Sep", "Oct", "Nov", "Dec",
+    "JAN", "FEB", "MAR", "APR", "MAY", "JUN", "JUL", "AUG", "SEP", "OCT", "NOV", "DEC",
+};
+constexpr long monthsOfYear = 12;
+/// February always has its 29 days: the year may not be known.
+constexpr long daysOfMonth[] = {31, 29, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
+constexpr long mostDays = 31;
+
+bool isSpace(char character) {
+    return character == ' ' || (character >= '\t' && character <= '\r');
+}
+
+/// A text read as strtol reads it with base 10.
+struct Number {
+    explicit Number(const char* text) : end(text) {
+        const char* next = text;
+        while (isSpace(*next)) {
+            ++next;
+        }
+        const bool isNegative = *next == '-';
+        next += isNegative || *next == '+' ? 1 : 0;
+        for (; *next >= '0' && *next <= '9'; ++next) {
+            value = value * 10 + (*next - '0');
+            end = next + 1;
+        }
+        value = isNegative ? -value : value;
+        isWhole = end != text && *end == '\0';
+    }
+
+    long value = 0;
+    const char* end; ///< behind the number; the text's beginning when there is none
+    bool isWhole;    ///< the number fills the text
+};
+
+/// The month that the text begins with; 0: none.
+long monthByName(const char* text) {
+    for (std::size_t index = 0; index < std::size(monthNames); ++index) {
+        if (std::strncmp(text, monthNames[index], 3) == 0) {
+            return static_cast<long>(index) % monthsOfYear + 1;
+        }
+    }
+    return 0;
+}
+
+/// Dates an entry of a report without a year by the entry read before it, which is newer: a later
+/// day of the year means that a new year was crossed going backwards.
+void takeYearFromReport(EntryTime& time, UserlogBufferInfo& context) {
+    const bool isDateKnown = time.month != EntryTime::UNKNOWN && time.day != EntryTime::UNKNOWN;
+    if (isDateKnown) {
+        if (time.month > context.month || (time.month == context.month && time.day > context.day)) {
+            if (context.year >= 1) {
+                --context.year;
+            } else {
+                context.year = 99;
+                context.century = 0;
+            }
+        }
+        context.month = time.month;
+        context.day = time.day;
+    }
+    time.century = context.century;
+    time.year = context.year;
+}
+
+} // namespace
+
+long UserLogFile::formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, void* reportContext) {
+    TraceScope trace(anchor);
+    EntryTime time;
+    readYear(texts->year, time);
+    readMonth(texts->month, time);
+    readDay(texts->day, time);
+    readHour(texts->hour, time);
+    readMinute(texts->minute, time);
+    readSecond(texts->second, time);
+    if (reportContext != nullptr && time.year == EntryTime::UNKNOWN) {
+        takeYearFromReport(time, *static_cast<UserlogBufferInfo*>(reportContext));
+    }
+    if (!time.isComplete() && !time.completeFromClock()) {
+        const ErrorText error(errno);
+        trace.error()("Error: unable to determine current time to complete event entrytime. errno "
+                      "= %d; %s.",
+                      error.number(), error.text());
+        return trace.result(-1L);
+    }
+    const int length = time.write(entryTime);
+    if (length != EntryTime::TEXT_LENGTH) {
+        trace.error()("Error: formatting of entrytime into table row failed; expected to write %d "
+                      "characters but wrote %d.",
+                      EntryTime::TEXT_LENGTH, length);
+        return trace.result(-1L);
+    }
+    entryTime[EntryTime::TEXT_LENGTH] = '0';
+    return trace.result(0L);
+}
+
+void UserLogFile::readYear(const char* text, EntryTime& time) const {
+    if (*text == '\0') {
+        return;
+    }
+    const Number number(text);
+    if (!number.isWhole) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid year found in event entrytime; '%s'", text);
+        return;
+    }
+    time.year = number.value % 100;
+    time.century = time.year < 70 ? 1 : 0;
+}
+
+/// Reads the kind of month that worked last, number or name, and then the other one.
+void UserLogFile::readMonth(const char* text, EntryTime& time) {
+    if (*text == '\0') {
+        return;
+    }
+    for (;;) {
+        if (NumericMonth && readMonthNumber(text, time)) {
+            return;
+        }
+        const long month = monthByName(text);
+        if (month != 0) {
+            NumericMonth = false;
+            time.month = month;
+            return;
+        }
+        if (NumericMonth) {
+            TraceScope trace(anchor);
+            trace.error()("Error: invalid month found in event entrytime; '%s'", text);
+            return;
+        }
+        NumericMonth = true;
+    }
+}
+
+/// False when the text begins with no number and so may be a name.
+bool UserLogFile::readMonthNumber(const char* text, EntryTime& time) const {
+    const Number number(text);
+    if (number.isWhole && number.value >= 1 && number.value <= monthsOfYear) {
+        time.month = number.value;
+        return true;
+    }
+    if (number.isWhole || number.value != 0) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid month found in event entrytime; '%s'", text);
+        return true;
+    }
+    return false;
+}
+
+void UserLogFile::readDay(const char* text, EntryTime& time) const {
+    if (*text == '\0') {
+        return;
+    }
+    const Number number(text);
+    const long last = time.month == EntryTime::UNKNOWN ? mostDays : daysOfMonth[time.month - 1];
+    if (!number.isWhole || number.value < 1 || number.value > last) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid day found in event entrytime; '%s'", text);
+        return;
+    }
+    time.day = number.value;
+}
+
+/// A number of up to 24, or one of 1 to 12 with an "a" or "p" behind it, which makes 12pm hour 24.
+void UserLogFile::readHour(const char* text, EntryTime& time) const {
+    if (*text == '\0') {
+        return;
+    }
+    const Number number(text);
+    if (number.isWhole && number.value >= 0 && number.value <= 24) {
+        time.hour = number.value;
+        return;
+    }
+    const char* half = number.end;
+    while (isSpace(*half)) {
+        ++half;
+    }
+    const bool isMorning = *half == 'a' || *half == 'A';
+    const bool isAfternoon = *half == 'p' || *half == 'P';
+    if (number.isWhole || number.value < 1 || number.value > 12 || (!isMorning && !isAfternoon)) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid hour found in event entrytime; '%s'", text);
+        return;
+    }
+    time.hour = number.value + (isAfternoon ? 12 : 0);
+}
+
+void UserLogFile::readMinute(const char* text, EntryTime& time) const {
+    if (*text == '\0') {
+        return;
+    }
+    const Number number(text);
+    if (!number.isWhole || number.value < 0 || number.value > 59) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid minute found in event entrytime; '%s'", text);
+        return;
+    }
+    time.minute = number.value;
+}
+
+/// A bad second becomes 0: unlike the other parts it is never taken from the clock.
+void UserLogFile::readSecond(const char* text, EntryTime& time) const {
+    if (*text == '\0') {
+        return;
+    }
+    const Number number(text);
+    if (!number.isWhole || number.value < 0 || number.value > 59) {
+        TraceScope trace(anchor);
+        trace.error()("Error: invalid second found in event entrytime; '%s'", text);
+        return;
+    }
+    time.second = number.value;
+}

@@ -1,0 +1,18 @@
+#ifndef ZRM_USERLOG_BUFFER_INFO_H
+#define ZRM_USERLOG_BUFFER_INFO_H
+
+#include "monitor/LogBufferInfo.h"
+
+#include <memory>
+
+/// The state of one report on a user log: besides the reading state a date, at first today's, then
+/// that of the entry read last. It dates the entries of a log without years.
+struct UserlogBufferInfo : _LogBufferInfo {
+    long century; ///< 1 for the years 2000 to 2069, 0 for 1970 to 1999
+    long year;    ///< two digits
+    long month;
+    long day;
+    std::unique_ptr<char[]> block; ///< owns what pBuffer points to
+};
+
+#endif
