@@ -39,10 +39,10 @@ bool isInteger(Receiver receiver) {
 
 bool PrintProgram::compile(const char* directive, _DataType type) noexcept {
     const DataTypeInfo* info = findDataType(type);
+    m_directive = info != nullptr ? directive : nullptr;
     if (info == nullptr) {
         return false;
     }
-    m_directive = directive;
     m_receiver = info->receiver;
     const char* conversion = std::strchr(directive, '%');
     m_prefixLength = conversion != nullptr ? static_cast<std::size_t>(conversion - directive)

@@ -393,6 +393,20 @@ extern "C" int __wrap_sigwait(const sigset_t* set, int* signal) {
     return __real_sigwait(set, signal);
 }
 
+// Every caller's arguments reach the C library through its list form.
+extern "C" int __wrap_snprintf(char* out, size_t size, const char* format, ...);
+extern "C" int __wrap_snprintf(char* out, size_t size, const char* format, ...) {
+    if (const int error = fault("snprintf")) {
+        errno = error;
+        return -1;
+    }
+    std::va_list arguments;
+    va_start(arguments, format);
+    const int length = std::vsnprintf(out, size, format, arguments);
+    va_end(arguments);
+    return length;
+}
+
 extern "C" unsigned __real_sleep(unsigned seconds);
 extern "C" unsigned __wrap_sleep(unsigned seconds);
 extern "C" unsigned __wrap_sleep(unsigned seconds) {

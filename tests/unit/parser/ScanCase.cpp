@@ -35,8 +35,9 @@ std::string CaseGenerator::literal() {
 }
 
 std::string CaseGenerator::scanSet() {
-    constexpr const char* members[] = {"a-f", "0-9", "a^", "-",   "]x", "z-a", "\t", " ",        ".",
-                                       "+--", "a",   "%", "--/", ":",  "A-",  "[",  "\xe0-\xff"};
+    constexpr const char* members[] = {"a-f", "0-9", "a^", "-",   "]x",       "z-a",
+                                       "\t",  " ",   ".",  "+--", "a",        "%",
+                                       "--/", ":",   "A-", "[",   "\xe0-\xff"};
     std::string set = oneIn(2) ? "^" : "";
     if (oneIn(4)) {
         set += oneIn(2) ? "]" : "-";
