@@ -71,7 +71,6 @@ constexpr LOC2_Locale kCodeSets[] = {
     {"SJIS", 932, kMultiByte},
     {"Shift_JIS", 932, kMultiByte},
     {"GBK", 936, kMultiByte},
-    {"IBM943", 943, kMultiByte},
     {"BIG5", 950, kMultiByte},
     {"EUC-JP", 954, kMultiByte},
     {"EUC-TW", 964, kMultiByte},

@@ -93,27 +93,48 @@ std::size_t refusedLength(const LOC2_Locale& from, std::string_view source, int 
     return error == EINVAL ? source.size() : 1;
 }
 
+/// One call of iconv on the rest of the source, or, without a source, for what the converter still
+/// holds back. Returns 0, or errno.
+int step(iconv_t converter, Target& target, std::string_view* source) noexcept {
+    // A character that does not fit may have been begun: what it has overwritten is put back.
+    constexpr std::size_t kMaxCharacter = 8;
+    char saved[kMaxCharacter];
+    const std::size_t savedSize = std::min(target.room(), kMaxCharacter);
+    char* const limit = target.end() + target.room();
+    std::copy_n(limit - savedSize, savedSize, saved);
+
+    // iconv does not write to its source, whatever its declaration says.
+    char* in = source != nullptr ? const_cast<char*>(source->data()) : nullptr;
+    std::size_t inLeft = source != nullptr ? source->size() : 0;
+    char* out = target.end();
+    std::size_t outLeft = target.room();
+    const bool failed = iconv(converter, source != nullptr ? &in : nullptr, &inLeft, &out,
+                              &outLeft) == static_cast<std::size_t>(-1);
+    const int error = failed ? errno : 0;
+    target.advanceTo(out);
+    const std::size_t unused = std::min(outLeft, savedSize);
+    std::copy_n(saved + savedSize - unused, unused, limit - unused);
+    if (source != nullptr) {
+        source->remove_prefix(source->size() - inLeft);
+    }
+    return error;
+}
+
 bool convertWith(iconv_t converter, Target& target, const LOC2_Locale& from,
                  std::string_view source) noexcept {
-    while (!source.empty()) {
-        // iconv does not write to its source, whatever its declaration says.
-        char* in = const_cast<char*>(source.data());
-        std::size_t inLeft = source.size();
-        char* out = target.end();
-        std::size_t outLeft = target.room();
-        const std::size_t result = iconv(converter, &in, &inLeft, &out, &outLeft);
-        const int error = errno;
-        target.advanceTo(out);
-        source.remove_prefix(source.size() - inLeft);
-        if (result != static_cast<std::size_t>(-1)) {
+    for (;;) {
+        const int error = step(converter, target, &source);
+        if (error == E2BIG || step(converter, target, nullptr) != 0) {
+            return false;
+        }
+        if (error == 0) {
             return true;
         }
-        if (error == E2BIG || !target.putSubstitute()) {
+        if (!target.putSubstitute()) {
             return false;
         }
         source.remove_prefix(refusedLength(from, source, error));
     }
-    return true;
 }
 
 } // namespace

@@ -1,0 +1,121 @@
+#include "host/events/RowJson.h"
+
+#include "host/events/RowText.h"
+#include "host/framework/Utf8.h"
+
+#include <array>
+#include <charconv>
+#include <cstdint>
+#include <cstring>
+
+namespace {
+
+constexpr std::uint64_t kEach = 0x0101010101010101;
+constexpr std::uint64_t kHighBits = kEach * 0x80;
+
+/// True when a byte of the word is less than `limit`, which is at most 128.
+constexpr bool hasByteBelow(std::uint64_t word, unsigned limit) {
+    return ((word - kEach * limit) & ~word & kHighBits) != 0;
+}
+
+constexpr bool hasByte(std::uint64_t word, char c) {
+    return hasByteBelow(word ^ (kEach * static_cast<unsigned char>(c)), 1);
+}
+
+/// True for eight bytes of ASCII that stand in a JSON string as they are.
+bool isPlain(std::uint64_t word) {
+    return (word & kHighBits) == 0 && !hasByteBelow(word, ' ') && !hasByte(word, '"') &&
+           !hasByte(word, '\\');
+}
+
+bool isPlain(char c) {
+    const auto byte = static_cast<unsigned char>(c);
+    return byte >= ' ' && byte < 0x80 && c != '"' && c != '\\';
+}
+
+/// Length of the leading part that stands as it is.
+std::size_t plainPrefix(std::string_view text) {
+    std::size_t position = 0;
+    std::uint64_t word;
+    while (position + sizeof word <= text.size()) {
+        std::memcpy(&word, text.data() + position, sizeof word);
+        if (!isPlain(word)) {
+            break;
+        }
+        position += sizeof word;
+    }
+    while (position < text.size() && isPlain(text[position])) {
+        ++position;
+    }
+    return position;
+}
+
+/// The control characters, the quote and the backslash. Those without a letter of their own are
+/// written by number.
+void appendEscaped(std::string& out, char c) {
+    constexpr std::string_view kShort = "\"\\\b\f\n\r\t";
+    constexpr std::string_view kLetters = "\"\\bfnrt";
+    constexpr char kDigits[] = "0123456789abcdef";
+    const std::size_t index = kShort.find(c);
+    if (index != std::string_view::npos) {
+        out += '\\';
+        out += kLetters[index];
+    } else {
+        const auto byte = static_cast<unsigned char>(c);
+        out += "\\u00";
+        out += kDigits[byte >> 4];
+        out += kDigits[byte & 15];
+    }
+}
+
+/// Takes the first sequence, which does not stand as it is in ASCII, off the text.
+void appendSpecial(std::string& out, std::string_view& text) {
+    const Utf8::Sequence sequence = Utf8::firstSequence(text);
+    if (!sequence.valid) {
+        out += Utf8::kReplacement;
+    } else if (sequence.length > 1) {
+        out += text.substr(0, sequence.length);
+    } else {
+        appendEscaped(out, text.front());
+    }
+    text.remove_prefix(sequence.length);
+}
+
+void appendInteger(std::string& out, std::int32_t value) {
+    std::array<char, 12> digits;
+    const auto result = std::to_chars(digits.data(), digits.data() + digits.size(), value);
+    out.append(digits.data(), result.ptr);
+}
+
+} // namespace
+
+void RowJson::appendText(std::string& out, std::string_view text) {
+    out += '"';
+    while (!text.empty()) {
+        const std::size_t plain = plainPrefix(text);
+        out += text.substr(0, plain);
+        text.remove_prefix(plain);
+        if (!text.empty()) {
+            appendSpecial(out, text);
+        }
+    }
+    out += '"';
+}
+
+void RowJson::append(std::string& out, const RowLayout& layout, const char* row) {
+    std::string room;
+    char separator = '{';
+    for (const RowColumn& column : layout.columns()) {
+        out += separator;
+        out += '"';
+        out += column.name;
+        out += "\":";
+        if (column.isInteger()) {
+            appendInteger(out, column.integer(row));
+        } else {
+            appendText(out, RowText::of(column, row, room));
+        }
+        separator = ',';
+    }
+    out += layout.columns().empty() ? "{}" : "}";
+}

@@ -1,0 +1,33 @@
+#include "host/events/RowText.h"
+
+#include "host/framework/CodePages.h"
+#include "host/framework/Converter.h"
+#include "host/framework/Utf8.h"
+
+namespace {
+
+/// No character of one byte takes more bytes in UTF-8, and no longer one takes more for each.
+constexpr std::size_t kMaxGrowth = 3;
+
+const LOC2_Locale& codeSetOf(const RowColumn& column) {
+    const LOC2_Locale* const local = LOC2_GetLocale(0, 0, 0, nullptr);
+    return column.type == COLUMN_UTF8 || local->codePage == 0 ? *CodePages::byNumber(LOC2_UTF8)
+                                                              : *local;
+}
+
+} // namespace
+
+std::string_view RowText::of(const RowColumn& column, const char* row, std::string& room) {
+    const std::string_view text = column.text(row);
+    if (Utf8::validPrefix(text) == text.size()) {
+        return text;
+    }
+    const LOC2_Locale& utf8 = *CodePages::byNumber(LOC2_UTF8);
+    room.resize(text.size() * kMaxGrowth);
+    Converted converted =
+        Converter::convert(utf8, room.data(), room.size(), codeSetOf(column), text);
+    if (!converted.supported) {
+        converted = Converter::convert(utf8, room.data(), room.size(), utf8, text);
+    }
+    return {room.data(), converted.written};
+}
