@@ -9,7 +9,7 @@ class CreateLogFile : public SyslogTest {};
 TEST_F(CreateLogFile, KnowsTheKindsOfLogs) {
     for (int letter = 1; letter < 128; ++letter) {
         const char type = static_cast<char>(letter);
-        const bool isKind = std::string_view("SAE").find(type) != std::string_view::npos;
+        const bool isKind = std::string_view("USAE").find(type) != std::string_view::npos;
         EXPECT_EQ(isKnownLogType(type), isKind) << type;
     }
 }

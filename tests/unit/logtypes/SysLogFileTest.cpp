@@ -75,9 +75,9 @@ TEST_F(SyslogLine, KnowsTheTwelveMonths) {
     const char* const names[] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
                                  "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};
     for (int month = 1; month <= 12; ++month) {
-        char expected[17];
-        std::snprintf(expected, sizeof expected, "106%02d05070309000", month);
-        EXPECT_EQ(timeOf(std::string(names[month - 1]) + "  5 07:03:09 h s: d\n"), expected);
+        const std::string number = (month < 10 ? "0" : "") + std::to_string(month);
+        EXPECT_EQ(timeOf(std::string(names[month - 1]) + "  5 07:03:09 h s: d\n"),
+                  "106" + number + "05070309000");
     }
 }
 
