@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "agent/framework/TableManager.h"
 
+#include <algorithm>
 #include <cstring>
 #include <map>
 
@@ -107,7 +108,7 @@ unsigned ctreq::InsertRow(char* row) {
     }
     if (count == allocated) {
         auto room = std::make_unique<char[]>(std::size_t{allocated + allocSize} * rowSize);
-        std::memcpy(room.get(), m_rows.get(), std::size_t{count} * rowSize);
+        std::copy_n(m_rows.get(), std::size_t{count} * rowSize, room.get());
         m_rows = std::move(room);
         allocated += allocSize;
     }
