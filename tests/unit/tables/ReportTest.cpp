@@ -176,6 +176,13 @@ TEST_F(Report, TheFirstSpellingOfEachPartWins) {
     EXPECT_EQ(m_logs.calls.back(), "find /var/adm/messages");
 }
 
+TEST_F(Report, ConditionsAreReadUntilTheLogIsNamed) {
+    name("/var/adm/", "other");
+    m_test.text("ENTRYSRC", equal, "sshd").text("ENTRYTYPE", equal, "never reached");
+    sample(0);
+    EXPECT_EQ(m_test.fetched, 2);
+}
+
 TEST_F(Report, NamesAreCutAtTheirColumns) {
     const std::string path = "/" + std::string(300, 'p');
     const std::string file(200, 'n');

@@ -217,6 +217,11 @@ TEST_F(Situation, AnEventOutsideThePeriodDropsTheChain) {
     EXPECT_THAT(frequencies(), ElementsAre(1, 2));
     arrive(rowAt(now));
     EXPECT_THAT(frequencies(), ElementsAre(1, 2, 1)) << "the count starts afresh";
+    // Nor is the dropped event there when the clock is set back.
+    arrive(rowAt(now - 61));
+    m_clock.set(now - 61);
+    arrive(rowAt(now - 61));
+    EXPECT_THAT(frequencies(), ElementsAre(1, 2, 1, 1));
 }
 
 TEST_F(Situation, ACorruptedChainStopsIt) {

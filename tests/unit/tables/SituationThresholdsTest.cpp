@@ -205,6 +205,13 @@ TEST_F(SituationThresholds, TheFirstUsableOneHolds) {
     EXPECT_THAT(open(TRC1_ERROR), ElementsAre("Invalid FREQTHRESH threshold compare operator; "
                                               "value is 1. Threshold ignored."));
     EXPECT_EQ(columns(), std::pair(2, 60));
+    m_test.filters.clear();
+    m_test.number("PERIODTHRS", equal, 60)
+        .number("PERIODTHRS", equal, 90)
+        .raw("PERIODTHRS", less, 1, "") // nor is this
+        .number("FREQTHRESH", greaterOrEqual, 2);
+    EXPECT_THAT(open(TRC1_ERROR), IsEmpty());
+    EXPECT_EQ(columns(), std::pair(2, 60));
 }
 
 TEST_F(SituationThresholds, ConditionsAreReadUntilBothAreKnown) {
@@ -220,6 +227,7 @@ TEST_F(SituationThresholds, ConditionsAreReadUntilBothAreKnown) {
                 ElementsAre("Filter column name  = LOGNAME.", "Filter column name  = PERIODTHRS.",
                             "Filter column name  = ENTRYSRC.",
                             "Filter column name  = FREQTHRESH."));
+    EXPECT_EQ(m_test.fetched, 4);
     EXPECT_EQ(columns(), std::pair(3, 60));
 }
 

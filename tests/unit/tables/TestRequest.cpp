@@ -65,9 +65,11 @@ TestRequest& TestRequest::text(const std::string& column, int op, const std::str
 
 class ctreq::Framework {
 public:
-    explicit Framework(RequestDetail* detail) : test(*static_cast<TestRequest*>(detail)) {}
+    // A walk over the conditions that nobody reset finds none.
+    explicit Framework(RequestDetail* detail)
+        : test(*static_cast<TestRequest*>(detail)), nextFilter(test.filters.size()) {}
     TestRequest& test;
-    std::size_t nextFilter = 0;
+    std::size_t nextFilter;
 };
 
 ctreq::ctreq(RequestDetail* detail, ContextInfo* /*context*/, TableManager* manager)
@@ -127,6 +129,7 @@ unsigned ctreq::GetFilterInfo(SEL1_FILTERINFO** filter) {
     if (m_framework->nextFilter == test.filters.size()) {
         return 1;
     }
+    ++test.fetched;
     *filter = &test.filters[m_framework->nextFilter++].info;
     return 0;
 }

@@ -45,6 +45,7 @@ public:
     std::vector<std::string> dispatched; ///< the rows of all dispatches
     std::vector<unsigned> stopped;       ///< reasons
     int stops = 0;
+    int fetched = 0; ///< conditions that were handed out
 };
 
 /// What concerns all requests.
