@@ -70,7 +70,9 @@ void zrm_rmlogent_agent::TakeSampleDestructor() {
 
 unsigned zrm_rmlogent_agent::AddData(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
-    trace.fine()("Event passed to situation %s for evaluation.", name());
+    if (trace.isOn(TRC1_FINE)) {
+        trace.fine()("Event passed to situation %s for evaluation.", name());
+    }
     const bool inForce = hasThresholds();
     const auto frequency =
         static_cast<std::int32_t>(inForce ? std::abs(thresholds.freqThreshold) : 0);
