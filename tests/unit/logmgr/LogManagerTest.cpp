@@ -3,6 +3,7 @@
 #include "LogManagerFixture.h"
 
 #include "AgentDoubles.h"
+#include "logtypes/createLogFile.h"
 #include "monitor/LogFile.h"
 #include "support/Faults.h"
 
@@ -33,6 +34,12 @@ protected:
         std::ostringstream text;
         text << std::ifstream(path).rdbuf();
         return text.str();
+    }
+    /// A log that joins the chain behind the manager's back, and leaves it again.
+    std::unique_ptr<LogFile> strangerBehind(LogFile* head) {
+        std::string line = c;
+        const ValidLog log(CONFIG_USER, line.data(), nullptr);
+        return std::unique_ptr<LogFile>(createLogFile(log, head));
     }
     FakeSleep sleeps;
 };
@@ -267,13 +274,11 @@ TEST_F(LogManagerTest, AChainLongerThanItsCountEndsTheWalk) {
     trace.clear();
     trace.setLevel(TRC1_ERROR);
     LogFile* const first = manager->getNextLogObject(nullptr, 0);
-    LogBase stranger;
-    stranger.addToChain(first);
+    const auto stranger = strangerBehind(first);
     LogFile* const second = manager->getNextLogObject(first, 1);
     EXPECT_NE(second, nullptr);
     EXPECT_EQ(manager->getNextLogObject(second, 2), nullptr);
     EXPECT_THAT(trace.messages(), ElementsAre("Log object chain corrupted. Request terminating."));
-    stranger.removeFromChain();
 }
 
 TEST_F(LogManagerTest, FindsALogByItsExactLocalName) {
@@ -486,8 +491,7 @@ TEST_F(LogManagerDeathTest, AChainLongerThanItsCountEndsTheProcess) {
             trace.setLevel(TRC1_DETAIL);
             start();
             trace.setLevel(TRC1_ERROR);
-            LogBase stranger;
-            stranger.addToChain(manager->getNextLogObject(nullptr, 0));
+            const auto stranger = strangerBehind(manager->getNextLogObject(nullptr, 0));
             manager.reset();
             std::_Exit(0);
         },

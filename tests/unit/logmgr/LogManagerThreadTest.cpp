@@ -73,7 +73,7 @@ TEST_F(LogManagerThreadTest, SigchldIsIgnored) {
 TEST_F(LogManagerThreadTest, SigchldIsTracedInTheFineClassOnly) {
     start();
     trace.clear();
-    trace.setLevel(TRC1_DETAIL | TRC1_ERROR | TRC1_FLOW);
+    trace.setLevel(TRC1_DETAIL | TRC1_ERROR);
     kill(getpid(), SIGCHLD);
     kill(getpid(), SIGHUP);
     ASSERT_TRUE(trace.waitFor(waiting));
