@@ -1,0 +1,5 @@
+#include "agent/zrmmain.h"
+
+int main(int argc, char** argv) {
+    return zrmMain(argc, argv);
+}
