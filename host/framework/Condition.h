@@ -22,6 +22,7 @@ struct Condition {
     std::int64_t number = 0;         ///< value of an integer column
     bool isNumber = false;           ///< which of the two holds
     std::vector<std::string> values; ///< values of INTF_IN
+    bool operator==(const Condition&) const = default;
 };
 
 #endif

@@ -230,6 +230,7 @@ WRAP_ERRNO(std::FILE*, fdopen, nullptr, (int fd, const char* mode), (fd, mode))
 WRAP_ERRNO(std::FILE*, fopen, nullptr, (const char* path, const char* mode), (path, mode))
 WRAP_ERRNO(size_t, fread, 0, (void* data, size_t size, size_t count, std::FILE* stream),
            (data, size, count, stream))
+WRAP_ERRNO(int, ftruncate, -1, (int fd, off_t size), (fd, size))
 WRAP_ERRNO(size_t, fwrite, 0, (const void* data, size_t size, size_t count, std::FILE* stream),
            (data, size, count, stream))
 WRAP_ERRNO(char*, getcwd, nullptr, (char* buffer, size_t size), (buffer, size))
@@ -326,6 +327,7 @@ extern "C" pid_t __wrap_waitpid(pid_t pid, int* status, int options) {
     const pid_t waitedId = g_waitedId;
     return waitedId != 0 ? waitedId : result;
 }
+WRAP_ERRNO(ssize_t, write, -1, (int fd, const void* data, size_t size), (fd, data, size))
 
 extern "C" int __real_open(const char* path, int flags, ...);
 extern "C" int __wrap_open(const char* path, int flags, ...);

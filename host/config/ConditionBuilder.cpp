@@ -1,0 +1,248 @@
+#include "host/config/ConditionBuilder.h"
+
+#include "host/config/EntryTime.h"
+
+#include <algorithm>
+#include <array>
+#include <cctype>
+#include <limits>
+#include <optional>
+#include <utility>
+
+#include <re2/re2.h>
+
+namespace {
+
+constexpr std::size_t longestPattern = 4096; ///< bytes
+constexpr std::size_t mostValues = 1000;     ///< of a list
+constexpr std::size_t longestList = 16384;   ///< bytes of its values together
+
+std::string quoted(std::string_view text) {
+    return '\'' + std::string(text) + '\'';
+}
+
+std::string upperCase(std::string_view text) {
+    std::string upper(text);
+    std::transform(upper.begin(), upper.end(), upper.begin(), [](char c) {
+        return static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+    });
+    return upper;
+}
+
+ConditionProblem badValue(std::string what, std::string cure) {
+    return {ConditionProblem::VALUE, std::move(what), std::move(cure)};
+}
+
+/// A value of a character column that is compared as a whole; false: `value` says what is wrong.
+std::optional<ConditionProblem> checkWhole(const Column& column, std::string& value) {
+    if (column.isTime && !value.empty()) {
+        std::optional<std::string> stamp = EntryTime::toStamp(value);
+        if (!stamp) {
+            return badValue(quoted(value) + " is no time",
+                            "write it like '2026-11-20T07:03:09', with Z or +01:00 behind it where "
+                            "it is not local, or as a 16-digit time stamp");
+        }
+        value = std::move(*stamp);
+    }
+    const auto width = static_cast<std::size_t>(column.width);
+    if (value.size() > width) {
+        return badValue("the value has " + std::to_string(value.size()) + " bytes and " +
+                            std::string(column.name) + " holds " + std::to_string(width),
+                        "shorten the value, or use starts");
+    }
+    return std::nullopt;
+}
+
+std::optional<ConditionProblem> checkNumber(std::int64_t number) {
+    if (number < std::numeric_limits<std::int32_t>::min() ||
+        number > std::numeric_limits<std::int32_t>::max()) {
+        return badValue("the number does not fit the column",
+                        "write a number from -2147483648 to 2147483647");
+    }
+    return std::nullopt;
+}
+
+/// A value of contains, starts or matches.
+std::optional<ConditionProblem> checkPattern(_IntfOper op, const std::string& value) {
+    if (value.empty() || value.size() > longestPattern) {
+        return badValue("the value has " + std::to_string(value.size()) + " bytes",
+                        "write 1 to " + std::to_string(longestPattern) + " bytes");
+    }
+    if (op == INTF_MATCHES) {
+        const RE2 pattern(value, RE2::Quiet);
+        if (!pattern.ok()) {
+            return badValue(quoted(value) + " is no regular expression: " + pattern.error(),
+                            "correct it (RE2 syntax)");
+        }
+    }
+    return std::nullopt;
+}
+
+ConditionProblem notANumber(const Column& column) {
+    return badValue(std::string(column.name) + " holds numbers",
+                    "write the value as a whole number without quotes");
+}
+
+ConditionProblem notAText(const Column& column) {
+    return badValue(std::string(column.name) + " holds text", "write the value in quotes");
+}
+
+} // namespace
+
+struct ConditionBuilder::Operator {
+    std::string_view name;
+    _IntfOper code;
+    bool forNumbers; ///< for columns of both kinds; otherwise for character columns alone
+};
+
+const ConditionBuilder::Operator* ConditionBuilder::findOperator(std::string_view op) noexcept {
+    static constexpr std::array<Operator, 10> operators = {{
+        {"=", INTF_EQUAL, true},
+        {"!=", INTF_NOT_EQUAL, true},
+        {">=", INTF_GREATER_OR_EQUAL, true},
+        {"<=", INTF_LESS_OR_EQUAL, true},
+        {"<", INTF_LESS, true},
+        {">", INTF_GREATER, true},
+        {"contains", INTF_CONTAINS, false},
+        {"starts", INTF_STARTS, false},
+        {"matches", INTF_MATCHES, false},
+        {"in", INTF_IN, true},
+    }};
+    const auto found = std::find_if(operators.begin(), operators.end(),
+                                    [&](const Operator& known) { return known.name == op; });
+    return found == operators.end() ? nullptr : &*found;
+}
+
+ConditionBuilder::ConditionBuilder(std::string_view table) : m_columns(columnsOf(table)) {}
+
+std::variant<const Column*, ConditionProblem>
+ConditionBuilder::column(std::string_view name) const {
+    if (const Column* const column = findColumn(m_columns, name)) {
+        return column;
+    }
+    ConditionProblem problem{ConditionProblem::COLUMN, quoted(name) + " is no column", ""};
+    if (findColumn(m_columns, upperCase(name)) != nullptr) {
+        problem.cure = "write it in upper case: " + upperCase(name);
+        return problem;
+    }
+    problem.cure = "the columns are ";
+    for (const Column& column : m_columns) {
+        problem.cure += std::string(column.name) + (&column == &m_columns.back() ? "" : ", ");
+    }
+    return problem;
+}
+
+ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, std::string_view op,
+                                                 const ConditionValue& value) const {
+    const auto found = column(columnName);
+    if (const auto* const problem = std::get_if<ConditionProblem>(&found)) {
+        return *problem;
+    }
+    const Column& column = *std::get<const Column*>(found);
+    const Operator* const known = findOperator(op);
+    if (known == nullptr) {
+        return ConditionProblem{
+            ConditionProblem::OPERATOR, quoted(op) + " is no operator",
+            "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in"};
+    }
+    if (column.isNumber && !known->forNumbers) {
+        return ConditionProblem{ConditionProblem::OPERATOR,
+                                std::string(column.name) + " holds numbers and '" +
+                                    std::string(op) + "' compares text",
+                                "use =, !=, >=, <=, <, > or in"};
+    }
+    if (value.isList != (known->code == INTF_IN)) {
+        return value.isList ? badValue(quoted(op) + " takes one value", "use in for a list")
+                            : badValue("in takes a list", "write the values in brackets");
+    }
+    return known->code == INTF_IN ? several(column, value) : single(column, *known, value);
+}
+
+ConditionBuilder::Result ConditionBuilder::single(const Column& column, const Operator& op,
+                                                  const ConditionValue& value) {
+    Condition condition;
+    condition.column = column.name;
+    condition.op = op.code;
+    condition.isNumber = column.isNumber;
+    const ConditionValue::Item& item = value.items.front();
+    std::optional<ConditionProblem> problem;
+    if (column.isNumber) {
+        if (!std::holds_alternative<std::int64_t>(item)) {
+            return notANumber(column);
+        }
+        condition.number = std::get<std::int64_t>(item);
+        problem = checkNumber(condition.number);
+    } else {
+        if (!std::holds_alternative<std::string>(item)) {
+            return notAText(column);
+        }
+        condition.text = std::get<std::string>(item);
+        problem = op.forNumbers ? checkWhole(column, condition.text)
+                                : checkPattern(op.code, condition.text);
+    }
+    if (problem) {
+        return std::move(*problem);
+    }
+    return condition;
+}
+
+ConditionBuilder::Result ConditionBuilder::several(const Column& column,
+                                                   const ConditionValue& value) {
+    if (value.items.empty() || value.items.size() > mostValues) {
+        return badValue("the list has " + std::to_string(value.items.size()) + " values",
+                        "write 1 to " + std::to_string(mostValues) + " values");
+    }
+    Condition condition;
+    condition.column = column.name;
+    condition.op = INTF_IN;
+    condition.isNumber = column.isNumber;
+    constexpr Operator equal{"=", INTF_EQUAL, true};
+    std::size_t bytes = 0;
+    for (const ConditionValue::Item& item : value.items) {
+        Result one = single(column, equal, {{item}, false});
+        if (std::holds_alternative<ConditionProblem>(one)) {
+            return one;
+        }
+        Condition& checked = std::get<Condition>(one);
+        condition.values.push_back(column.isNumber ? std::to_string(checked.number)
+                                                   : std::move(checked.text));
+        bytes += condition.values.back().size() + 1;
+        if (condition.values.back().find('\n') != std::string::npos) {
+            return badValue("a value of the list has a line end", "no column holds one: remove it");
+        }
+    }
+    if (bytes > longestList) {
+        return badValue("the list has " + std::to_string(bytes) + " bytes",
+                        "write at most " + std::to_string(longestList));
+    }
+    return condition;
+}
+
+std::variant<std::vector<Condition>, ConditionProblem>
+ConditionBuilder::ofLog(std::string_view path) {
+    const std::size_t slash = path.rfind('/');
+    if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
+        return badValue(quoted(path) + " is no absolute path of a file",
+                        "write the log's path as its configuration has it, beginning with '/'");
+    }
+    const std::string_view directory = path.substr(0, slash + 1);
+    const std::string_view name = path.substr(slash + 1);
+    const bool isAscii = std::all_of(path.begin(), path.end(),
+                                     [](char c) { return static_cast<unsigned char>(c) < 0x80; });
+    const std::span<const Column> columns = columnsOf("RMLOGENT");
+    std::vector<Condition> conditions;
+    for (const auto& [part, local, utf8] :
+         {std::tuple{directory, "LOGPATH", "ULOGPATH"}, std::tuple{name, "LOGNAME", "ULOGNAME"}}) {
+        const auto holds = [&](const char* column) {
+            return part.size() <= static_cast<std::size_t>(findColumn(columns, column)->width);
+        };
+        if (!holds(utf8)) {
+            return badValue("the path is too long for a log's path", "shorten it");
+        }
+        Condition condition;
+        condition.column = isAscii && holds(local) ? local : utf8;
+        condition.text = part;
+        conditions.push_back(std::move(condition));
+    }
+    return conditions;
+}

@@ -1,0 +1,55 @@
+#ifndef ZRM_HOST_CONDITION_BUILDER_H
+#define ZRM_HOST_CONDITION_BUILDER_H
+
+#include "host/config/Columns.h"
+#include "host/framework/Condition.h"
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+/// What is wrong with a condition, and where.
+struct ConditionProblem {
+    enum Part { COLUMN, OPERATOR, VALUE };
+    Part part;
+    std::string what;
+    std::string cure;
+};
+
+/// A value as an operator gave it: one text or number, or a list of them.
+struct ConditionValue {
+    using Item = std::variant<std::string, std::int64_t>;
+    std::vector<Item> items;
+    bool isList = false;
+};
+
+/// Puts conditions on a table's columns together and checks them; the one place that knows which
+/// operators and values a column takes. Immutable.
+class ConditionBuilder {
+public:
+    using Result = std::variant<Condition, ConditionProblem>;
+
+    explicit ConditionBuilder(std::string_view table);
+
+    /// The condition COLUMN OP VALUE, or what is wrong with it. Values of time columns may be
+    /// ISO 8601 times; the condition holds them as 16-character time stamps.
+    Result build(std::string_view column, std::string_view op, const ConditionValue& value) const;
+
+    /// The conditions that hold for the entries of this log alone, or what is wrong with the path:
+    /// its directory and its name, in the columns that can hold them.
+    static std::variant<std::vector<Condition>, ConditionProblem> ofLog(std::string_view path);
+
+private:
+    struct Operator;
+    static const Operator* findOperator(std::string_view op) noexcept;
+    std::variant<const Column*, ConditionProblem> column(std::string_view name) const;
+    static Result single(const Column& column, const Operator& op, const ConditionValue& value);
+    static Result several(const Column& column, const ConditionValue& value);
+
+    std::span<const Column> m_columns;
+};
+
+#endif

@@ -1,0 +1,153 @@
+#include "host/config/ConditionParser.h"
+
+#include <algorithm>
+#include <charconv>
+#include <optional>
+#include <string>
+#include <utility>
+
+namespace {
+
+constexpr const char* form = "write COLUMN OP VALUE, for example ENTRYDESC contains 'failed'";
+
+/// Reads the text from its front.
+class Scanner {
+public:
+    explicit Scanner(std::string_view text) : m_rest(text) {}
+
+    void skipBlanks() {
+        m_rest.remove_prefix(std::min(m_rest.find_first_not_of(" \t"), m_rest.size()));
+    }
+    bool atEnd() const { return m_rest.empty(); }
+    std::string_view rest() const { return m_rest; }
+    bool take(char c) {
+        if (m_rest.empty() || m_rest.front() != c) {
+            return false;
+        }
+        m_rest.remove_prefix(1);
+        return true;
+    }
+    /// The longest front of characters of which `belongs` holds.
+    template <typename Predicate> std::string_view takeWhile(Predicate belongs) {
+        const auto end = std::find_if_not(m_rest.begin(), m_rest.end(), belongs);
+        const auto length = static_cast<std::size_t>(end - m_rest.begin());
+        const std::string_view taken = m_rest.substr(0, length);
+        m_rest.remove_prefix(length);
+        return taken;
+    }
+
+private:
+    std::string_view m_rest;
+};
+
+bool isWordCharacter(char c) {
+    return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '_';
+}
+bool isSign(char c) {
+    return c == '=' || c == '!' || c == '<' || c == '>' || c == '~';
+}
+
+ConditionProblem badValue(std::string what, std::string cure) {
+    return {ConditionProblem::VALUE, std::move(what), std::move(cure)};
+}
+
+std::variant<ConditionValue::Item, ConditionProblem> quotedText(Scanner& scanner) {
+    std::string text;
+    while (!scanner.atEnd()) {
+        text += scanner.takeWhile([](char c) { return c != '\''; });
+        if (!scanner.take('\'')) {
+            break;
+        }
+        if (!scanner.take('\'')) {
+            return ConditionValue::Item(std::move(text));
+        }
+        text += '\'';
+    }
+    return badValue("the text has no closing quote", "end it with '");
+}
+
+std::variant<ConditionValue::Item, ConditionProblem> item(Scanner& scanner) {
+    scanner.skipBlanks();
+    if (scanner.take('\'')) {
+        return quotedText(scanner);
+    }
+    const std::string_view word =
+        scanner.takeWhile([](char c) { return c != ',' && c != ']' && c != ' ' && c != '\t'; });
+    std::int64_t number = 0;
+    const auto [end, error] = std::from_chars(word.data(), word.data() + word.size(), number);
+    if (word.empty()) {
+        return badValue("the value is missing", form);
+    }
+    if (error != std::errc() || end != word.data() + word.size()) {
+        return badValue("'" + std::string(word) + "' is no value",
+                        "write text in single quotes and numbers without");
+    }
+    return ConditionValue::Item(number);
+}
+
+std::optional<ConditionProblem> list(Scanner& scanner, ConditionValue& value) {
+    value.isList = true;
+    scanner.skipBlanks();
+    if (scanner.take(']')) {
+        return std::nullopt;
+    }
+    do {
+        auto one = item(scanner);
+        if (auto* const problem = std::get_if<ConditionProblem>(&one)) {
+            return std::move(*problem);
+        }
+        value.items.push_back(std::move(std::get<ConditionValue::Item>(one)));
+        scanner.skipBlanks();
+    } while (scanner.take(','));
+    if (!scanner.take(']')) {
+        return badValue("the list has no end", "end it with ]");
+    }
+    return std::nullopt;
+}
+
+} // namespace
+
+ConditionBuilder::Result ConditionParser::parse(std::string_view text) const {
+    Scanner scanner(text);
+    scanner.skipBlanks();
+    const std::string_view column = scanner.takeWhile(isWordCharacter);
+    if (column.empty()) {
+        return ConditionProblem{ConditionProblem::COLUMN, "the column is missing", form};
+    }
+    scanner.skipBlanks();
+    std::string_view op = scanner.takeWhile(isSign);
+    if (op.empty()) {
+        op = scanner.takeWhile(isWordCharacter);
+    }
+    if (op.empty()) {
+        return ConditionProblem{ConditionProblem::OPERATOR, "the operator is missing", form};
+    }
+    scanner.skipBlanks();
+    ConditionValue value;
+    std::optional<ConditionProblem> problem;
+    if (scanner.take('[')) {
+        problem = list(scanner, value);
+    } else {
+        auto one = item(scanner);
+        if (auto* const bad = std::get_if<ConditionProblem>(&one)) {
+            problem = std::move(*bad);
+        } else {
+            value.items.push_back(std::move(std::get<ConditionValue::Item>(one)));
+        }
+    }
+    scanner.skipBlanks();
+    if (!problem && !scanner.atEnd()) {
+        problem = badValue("'" + std::string(scanner.rest()) + "' follows the value",
+                           "write one condition per text");
+    }
+    if (!problem) {
+        return m_builder.build(column, op, value);
+    }
+    // A wrong column or operator is the better thing to say than a value that it made unreadable.
+    ConditionBuilder::Result probe = m_builder.build(column, op, {{std::string("x")}, false});
+    if (const auto* const earlier = std::get_if<ConditionProblem>(&probe);
+        earlier != nullptr && earlier->part != ConditionProblem::VALUE) {
+        return *earlier;
+    }
+    return std::move(*problem);
+}

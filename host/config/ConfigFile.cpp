@@ -1,0 +1,192 @@
+#include "host/config/ConfigFile.h"
+
+#include "agent/ErrorText.h"
+#include "host/config/ConfigProblems.h"
+#include "host/config/ConfigSection.h"
+#include "host/config/SituationReader.h"
+#include "host/framework/TraceLevels.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <limits>
+#include <memory>
+#include <optional>
+#include <utility>
+
+#include <sys/stat.h>
+
+#include <toml++/toml.h>
+
+namespace {
+
+constexpr std::size_t largestFile = 4 * 1024 * 1024; ///< bytes
+
+void requireAbsolute(ConfigSection& section, std::string_view key, const std::string& path) {
+    if (path.empty() || path.front() != '/') {
+        section.problem(key, "'" + path + "' is no absolute path", "begin it with '/'");
+    }
+}
+
+void readAgent(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    struct Key {
+        const char* key;
+        const char* variable;
+    };
+    static constexpr std::array<Key, 3> paths = {{{"log_config", "ZRM_CONFIG_FILE"},
+                                                  {"syslog_conf", "ZRM_SYSLOG_CONF"},
+                                                  {"debug_log", "AGENT_DEBUG_LOG"}}};
+    ConfigSection section("agent", table, problems);
+    for (const auto& [key, variable] : paths) {
+        const std::optional<std::string> path = section.text(key);
+        if (path && !path->empty()) {
+            requireAbsolute(section, key, *path);
+            config.environment.push_back({variable, *path});
+        }
+    }
+    if (const std::optional<std::int64_t> rows = section.number("max_rows")) {
+        if (*rows < 1 || *rows > std::numeric_limits<std::int32_t>::max()) {
+            section.problem("max_rows", "is no usable number of rows",
+                            "write a number from 1 to 2147483647");
+        }
+        config.environment.push_back({"ZRM_MAX_ROWS", std::to_string(*rows)});
+    }
+    if (const std::optional<std::string> trace = section.text("trace")) {
+        if (const std::string problem = TraceLevels().parse(*trace); !problem.empty()) {
+            section.problem("trace", problem,
+                            "write classes of error, flow, detail, fine, all and none, for example "
+                            "\"error,LogManager=error+detail\"");
+        }
+        config.environment.push_back({"QFW_TRC1", *trace});
+    }
+    section.refuseUnknownKeys();
+}
+
+void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("http", table, problems);
+    const std::string listen = section.text("listen").value_or("127.0.0.1:7186");
+    if (!listen.empty()) {
+        config.http.listen = ListenAddress::parse(listen);
+        if (!config.http.listen) {
+            section.problem("listen", "'" + listen + "' is no address to listen at",
+                            "write ADDRESS:PORT, for example \"127.0.0.1:7186\", or \"\" for none");
+        } else if (!config.http.listen->isLoopback()) {
+            section.problem("listen", "'" + listen + "' can be reached from other machines",
+                            "write a loopback address: 127.0.0.1, [::1] or localhost");
+        }
+    }
+    if (const std::optional<std::string> file = section.text("token_file")) {
+        requireAbsolute(section, "token_file", *file);
+        config.http.tokenFile = *file;
+    }
+    section.refuseUnknownKeys();
+}
+
+void readSink(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("sink", table, problems);
+    const std::optional<std::string> type = section.text("type");
+    if (!section.has("type")) {
+        section.problem("type", "is missing", "write type = \"jsonl\"");
+    } else if (type && *type != "jsonl") {
+        section.problem("type", "'" + *type + "' is no type of sink", "write \"jsonl\"");
+    }
+    const std::optional<std::string> path = section.text("path");
+    if (!section.has("path")) {
+        section.problem("path", "is missing", "write a file's path, or \"-\" for standard output");
+    }
+    if (path) {
+        if (*path != "-") {
+            requireAbsolute(section, "path", *path);
+        }
+        const auto samePath = [&](const SinkConfig& other) { return other.path == *path; };
+        if (std::any_of(config.sinks.begin(), config.sinks.end(), samePath)) {
+            section.problem("path", "another sink has '" + *path + "' already",
+                            "give each sink a path of its own");
+        }
+        config.sinks.push_back({*path});
+    }
+    section.refuseUnknownKeys();
+}
+
+void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("", file, problems);
+    if (const std::optional<std::string> directory = section.text("state_directory")) {
+        requireAbsolute(section, "state_directory", *directory);
+        config.stateDirectory = *directory;
+    }
+    if (const toml::table* const agent = section.table("agent")) {
+        readAgent(*agent, problems, config);
+    }
+    if (const toml::table* const http = section.table("http")) {
+        readHttp(*http, problems, config);
+    }
+    if (const auto sinks = section.tables("sink")) {
+        config.sinks.clear();
+        for (const toml::table* const sink : *sinks) {
+            readSink(*sink, problems, config);
+        }
+    }
+    if (const auto situations = section.tables("situation")) {
+        SituationReader reader(problems);
+        for (const toml::table* const situation : *situations) {
+            config.situations.push_back(reader.read(*situation));
+        }
+    }
+    section.refuseUnknownKeys();
+}
+
+/// The content of a file, or the error number that says why there is none.
+std::variant<std::string, int> content(const std::string& path) {
+    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(std::fopen(path.c_str(), "re"),
+                                                                 &std::fclose);
+    struct stat status {};
+    if (stream == nullptr || fstat(fileno(stream.get()), &status) != 0) {
+        return errno;
+    }
+    if (S_ISDIR(status.st_mode)) {
+        return EISDIR;
+    }
+    std::string text;
+    char buffer[65536];
+    while (const std::size_t count = std::fread(buffer, 1, sizeof buffer, stream.get())) {
+        text.append(buffer, count);
+        if (text.size() > largestFile) {
+            return EFBIG;
+        }
+    }
+    if (std::ferror(stream.get()) != 0) {
+        return errno;
+    }
+    return text;
+}
+
+} // namespace
+
+ConfigFile::Result ConfigFile::parse(std::string_view text, const std::string& path) {
+    ConfigProblems problems(path);
+    try {
+        const toml::table file = toml::parse(text);
+        HostConfig config;
+        readFile(file, problems, config);
+        if (problems.none()) {
+            return config;
+        }
+    } catch (const toml::parse_error& error) {
+        problems.add(static_cast<unsigned>(error.source().begin.line), "",
+                     std::string(error.description()), "correct the TOML here");
+    }
+    return problems.texts();
+}
+
+ConfigFile::Result ConfigFile::load(const std::string& path) {
+    const auto text = content(path);
+    if (const auto* const number = std::get_if<int>(&text)) {
+        const ErrorText error(*number);
+        ConfigProblems problems(path);
+        problems.add(0, "", std::string("cannot be read: ") + error.text(),
+                     "make it a file that the agent may read, of at most 4 MiB");
+        return problems.texts();
+    }
+    return parse(std::get<std::string>(text), path);
+}

@@ -1,0 +1,24 @@
+#ifndef ZRM_HOST_CONFIG_FILE_H
+#define ZRM_HOST_CONFIG_FILE_H
+
+#include "host/config/HostConfig.h"
+
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+/// Reads host configuration files. Stateless.
+class ConfigFile {
+public:
+    /// A configuration, or every problem of its file.
+    using Result = std::variant<HostConfig, std::vector<std::string>>;
+
+    /// Reads a file.
+    static Result load(const std::string& path);
+
+    /// Reads the text of a file that is called `path` in messages.
+    static Result parse(std::string_view text, const std::string& path);
+};
+
+#endif

@@ -1,0 +1,32 @@
+#ifndef ZRM_HOST_CONFIG_PROBLEMS_H
+#define ZRM_HOST_CONFIG_PROBLEMS_H
+
+#include <string>
+#include <vector>
+
+/// What is wrong with a host configuration file: all of it, so that one look at the messages is
+/// enough to put the file right.
+class ConfigProblems {
+public:
+    explicit ConfigProblems(std::string file);
+
+    /// Adds a problem of a key. `what` says what is wrong and `cure` what to do about it; both
+    /// begin in lower case and have no full stop. Line 0: the file as a whole.
+    void add(unsigned line, const std::string& key, const std::string& what,
+             const std::string& cure);
+
+    bool none() const noexcept { return m_problems.empty(); }
+    /// "FILE:LINE: KEY: WHAT; CURE" for every problem, in the order of the lines.
+    std::vector<std::string> texts() const;
+
+private:
+    struct Problem {
+        unsigned line;
+        std::string text;
+    };
+
+    const std::string m_file;
+    std::vector<Problem> m_problems;
+};
+
+#endif

@@ -1,0 +1,58 @@
+#ifndef ZRM_HOST_CONFIG_SECTION_H
+#define ZRM_HOST_CONFIG_SECTION_H
+
+#include "host/config/ConfigProblems.h"
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include <toml++/toml.h>
+
+/// One table of a configuration file while it is read: gives values by key and type, notes every
+/// problem, and knows which keys nobody asked for.
+class ConfigSection {
+public:
+    /// A text and the line on which it stands.
+    using Text = std::pair<std::string, unsigned>;
+
+    /// `name` stands before the keys in messages; empty for the file's own table. Both references
+    /// outlive the object.
+    ConfigSection(std::string name, const toml::table& table, ConfigProblems& problems);
+
+    /// The value of a key; none when it is missing or of another type, which is a problem.
+    std::optional<std::string> text(std::string_view key);
+    std::optional<std::int64_t> number(std::string_view key);
+    /// A text or a list of texts; empty when the key is missing.
+    std::vector<Text> texts(std::string_view key);
+    /// A table, as in [key]; null when it is missing.
+    const toml::table* table(std::string_view key);
+    /// The tables of [[key]]; none when it is missing. An empty list is a list.
+    std::optional<std::vector<const toml::table*>> tables(std::string_view key);
+
+    bool has(std::string_view key) const { return m_table.contains(key); }
+    /// The line of a key's value, or of the table where the key is missing.
+    unsigned line(std::string_view key) const;
+
+    /// Notes a problem of a key.
+    void problem(std::string_view key, const std::string& what, const std::string& cure);
+    void problem(unsigned line, std::string_view key, const std::string& what,
+                 const std::string& cure);
+
+    /// Every key that was not asked for is a problem. To be called when all were.
+    void refuseUnknownKeys();
+
+private:
+    const toml::node* find(std::string_view key);
+    void wrongType(std::string_view key, const toml::node& node, const char* cure);
+
+    const std::string m_name;
+    const toml::table& m_table;
+    ConfigProblems& m_problems;
+    std::vector<std::string> m_known; ///< keys that were asked for, in that order
+};
+
+#endif

@@ -1,0 +1,18 @@
+#ifndef ZRM_HOST_ENTRY_TIME_H
+#define ZRM_HOST_ENTRY_TIME_H
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+/// Times as operators write them. Stateless.
+class EntryTime {
+public:
+    /// The 16-character time stamp of a time that is written as one already, or as ISO 8601: a
+    /// date, or a date and a time ("T" or a blank between them, seconds optional, a fraction is
+    /// dropped), local or with "Z" or an offset behind it. None when it is neither, or before
+    /// 1900 or after 2099. Any thread.
+    static std::optional<std::string> toStamp(std::string_view text);
+};
+
+#endif

@@ -1,0 +1,49 @@
+#ifndef ZRM_HOST_HOST_CONFIG_H
+#define ZRM_HOST_HOST_CONFIG_H
+
+#include "host/framework/Condition.h"
+#include "host/http/ListenAddress.h"
+
+#include <optional>
+#include <string>
+#include <vector>
+
+/// An environment variable of the agent that the configuration sets where it is unset.
+struct EnvironmentSetting {
+    std::string variable;
+    std::string value;
+    bool operator==(const EnvironmentSetting&) const = default;
+};
+
+/// [http]
+struct HttpConfig {
+    std::optional<ListenAddress> listen; ///< none: no HTTP
+    std::string tokenFile;               ///< empty: api-token in the state directory
+    bool operator==(const HttpConfig&) const = default;
+};
+
+/// [[sink]]
+struct SinkConfig {
+    std::string path; ///< "-" for standard output
+    bool operator==(const SinkConfig&) const = default;
+};
+
+/// [[situation]]
+struct SituationConfig {
+    std::string name;
+    std::string text;
+    std::string severity;
+    std::vector<Condition> conditions; ///< those of `log`, `frequency` and `period` among them
+    bool operator==(const SituationConfig&) const = default;
+};
+
+/// A host configuration file as it was read; the defaults where it says nothing.
+struct HostConfig {
+    std::string stateDirectory = "/var/lib/zrm";
+    std::vector<EnvironmentSetting> environment;
+    HttpConfig http;
+    std::vector<SinkConfig> sinks = {{"-"}};
+    std::vector<SituationConfig> situations;
+};
+
+#endif

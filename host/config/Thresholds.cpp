@@ -1,0 +1,76 @@
+#include "host/config/Thresholds.h"
+
+#include <array>
+#include <charconv>
+#include <cstdint>
+#include <limits>
+
+namespace {
+
+constexpr std::int64_t largest = std::numeric_limits<std::int32_t>::max();
+
+/// Reads a number from the text's front and takes it off.
+std::optional<std::int64_t> takeNumber(std::string_view& text) {
+    std::int64_t number = 0;
+    if (text.empty() || text.front() == '-') {
+        return std::nullopt;
+    }
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error != std::errc()) {
+        return std::nullopt;
+    }
+    text.remove_prefix(static_cast<std::size_t>(end - text.data()));
+    return number;
+}
+
+Condition condition(const char* column, _IntfOper op, std::int64_t number) {
+    Condition condition;
+    condition.column = column;
+    condition.op = op;
+    condition.number = number;
+    condition.isNumber = true;
+    return condition;
+}
+
+} // namespace
+
+std::optional<Condition> Thresholds::frequency(std::string_view text) {
+    struct Bound {
+        std::string_view sign;
+        _IntfOper op;
+        std::int64_t least; ///< the smallest number that leaves a bound of one entry or more
+    };
+    static constexpr std::array<Bound, 4> bounds = {{{">=", INTF_GREATER_OR_EQUAL, 1},
+                                                     {"<=", INTF_LESS_OR_EQUAL, 1},
+                                                     {">", INTF_GREATER, 0},
+                                                     {"<", INTF_LESS, 2}}};
+    for (const Bound& bound : bounds) {
+        if (text.starts_with(bound.sign)) {
+            text.remove_prefix(bound.sign.size());
+            while (text.starts_with(' ')) {
+                text.remove_prefix(1);
+            }
+            const std::optional<std::int64_t> number = takeNumber(text);
+            if (!number || !text.empty() || *number < bound.least || *number >= largest) {
+                return std::nullopt;
+            }
+            return condition("FREQTHRESH", bound.op, *number);
+        }
+    }
+    return std::nullopt;
+}
+
+std::optional<Condition> Thresholds::period(std::string_view text) {
+    struct Unit {
+        std::string_view name;
+        std::int64_t seconds;
+    };
+    static constexpr std::array<Unit, 4> units = {{{"s", 1}, {"m", 60}, {"h", 3600}, {"d", 86400}}};
+    const std::optional<std::int64_t> number = takeNumber(text);
+    for (const Unit& unit : units) {
+        if (number && text == unit.name && *number >= 1 && *number <= largest / unit.seconds) {
+            return condition("PERIODTHRS", INTF_EQUAL, *number * unit.seconds);
+        }
+    }
+    return std::nullopt;
+}

@@ -1,0 +1,20 @@
+#ifndef ZRM_HOST_THRESHOLDS_H
+#define ZRM_HOST_THRESHOLDS_H
+
+#include "host/framework/Condition.h"
+
+#include <optional>
+#include <string_view>
+
+/// The event-rate thresholds of a situation as operators write them. Stateless.
+class Thresholds {
+public:
+    /// The FREQTHRESH condition of ">= 5", "> 4", "<= 2" or "< 3"; none for any other text, and
+    /// for a bound that the agent would not put in force (at most none, at least none).
+    static std::optional<Condition> frequency(std::string_view text);
+
+    /// The PERIODTHRS condition of "60s", "5m", "1h" or "1d"; none for any other text.
+    static std::optional<Condition> period(std::string_view text);
+};
+
+#endif

@@ -1,0 +1,35 @@
+#ifndef ZRM_HOST_DELIVERY_H
+#define ZRM_HOST_DELIVERY_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/EventQueue.h"
+#include "host/events/SinkThread.h"
+#include "host/framework/RowLayout.h"
+
+#include <memory>
+#include <vector>
+
+/// The way of events out of the process: the queue and one thread per sink. start and finish are
+/// called by one thread at a time.
+class Delivery {
+public:
+    /// Room for events of rows of this layout; no thread runs yet.
+    Delivery(const std::vector<SinkConfig>& sinks, const RowLayout& layout, std::size_t rowSize);
+    Delivery(const Delivery&) = delete;
+    Delivery& operator=(const Delivery&) = delete;
+
+    /// Where events are put; lives as long as the object. Before finish, any thread.
+    EventQueue& queue() noexcept { return m_queue; }
+
+    void start();
+
+    /// Delivers what is queued, at the latest until the limit, and ends the threads. Says which
+    /// sink did not get everything. Any number of times.
+    void finish(EventQueue::Clock::time_point limit);
+
+private:
+    EventQueue m_queue;
+    std::vector<std::unique_ptr<SinkThread>> m_sinks;
+};
+
+#endif

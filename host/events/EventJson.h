@@ -1,0 +1,22 @@
+#ifndef ZRM_HOST_EVENT_JSON_H
+#define ZRM_HOST_EVENT_JSON_H
+
+#include "host/events/Event.h"
+#include "host/framework/RowLayout.h"
+
+#include <string>
+
+/// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}. Immutable, so
+/// any thread.
+class EventJson {
+public:
+    explicit EventJson(RowLayout layout);
+
+    /// Appends one event's object, without a newline.
+    void append(std::string& text, const Event& event) const;
+
+private:
+    RowLayout m_layout;
+};
+
+#endif

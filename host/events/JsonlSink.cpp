@@ -1,0 +1,155 @@
+#include "host/events/JsonlSink.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+#include <fcntl.h>
+#include <limits.h>
+#include <poll.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"JsonlSink.cpp"};
+
+constexpr std::chrono::seconds lookInterval{1};
+constexpr int pollSlice = 100; ///< milliseconds
+
+} // namespace
+
+JsonlSink::JsonlSink(std::string path, EventJson format)
+    : m_path(std::move(path)), m_isStandardOutput(m_path == "-"), m_format(std::move(format)) {}
+
+JsonlSink::~JsonlSink() {
+    close();
+}
+
+std::string JsonlSink::name() const {
+    return m_isStandardOutput ? "standard output" : m_path;
+}
+
+void JsonlSink::fail(const char* call, int number) {
+    const ErrorText error(number);
+    m_error = std::string(call) + " failed: " + error.text();
+}
+
+bool JsonlSink::open() {
+    TraceScope trace(anchor);
+    m_fd = m_isStandardOutput
+               ? STDOUT_FILENO
+               : ::open(m_path.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0640);
+    if (m_fd == -1) {
+        fail("open", errno);
+        return trace.result(false);
+    }
+    struct stat status {};
+    m_isRegular = fstat(m_fd, &status) == 0 && S_ISREG(status.st_mode);
+    const long pipeBuffer = fpathconf(m_fd, _PC_PIPE_BUF);
+    m_unblockedWrite = pipeBuffer > 0 ? static_cast<std::size_t>(pipeBuffer) : _POSIX_PIPE_BUF;
+    m_lookAgain = Clock::now() + lookInterval;
+    trace.detail()("Sink %s opened.", m_path.c_str());
+    return trace.result(true);
+}
+
+void JsonlSink::close() {
+    if (m_fd != -1 && !m_isStandardOutput) {
+        ::close(m_fd);
+    }
+    m_fd = -1;
+}
+
+bool JsonlSink::movedAway() {
+    if (m_isStandardOutput || Clock::now() < m_lookAgain) {
+        return false;
+    }
+    m_lookAgain = Clock::now() + lookInterval;
+    struct stat opened {};
+    struct stat named {};
+    return fstat(m_fd, &opened) != 0 || stat(m_path.c_str(), &named) != 0 ||
+           opened.st_dev != named.st_dev || opened.st_ino != named.st_ino;
+}
+
+bool JsonlSink::ready() {
+    // A torn line is completed where it began.
+    if (m_fd != -1 && m_torn == 0 && movedAway()) {
+        close();
+    }
+    return m_fd != -1 || open();
+}
+
+bool JsonlSink::waitWritable(const std::stop_token& giveUp) {
+    while (!giveUp.stop_requested()) {
+        struct pollfd descriptor = {m_fd, POLLOUT, 0};
+        const int ready = poll(&descriptor, 1, pollSlice);
+        // Whatever else poll reports, the write itself says it with its error number.
+        if (ready > 0 || (ready == -1 && errno != EINTR)) {
+            return true;
+        }
+    }
+    m_error = "the reader takes no data";
+    return false;
+}
+
+std::size_t JsonlSink::write(std::string_view text, const std::stop_token& giveUp) {
+    std::size_t done = 0;
+    while (done < text.size()) {
+        std::size_t most = text.size() - done;
+        if (!m_isRegular) {
+            if (!waitWritable(giveUp)) {
+                return done;
+            }
+            most = std::min(most, m_unblockedWrite);
+        }
+        const ssize_t written = ::write(m_fd, text.data() + done, most);
+        if (written > 0) {
+            done += static_cast<std::size_t>(written);
+        } else if (written == 0 || (errno != EINTR && errno != EAGAIN)) {
+            fail("write", written == 0 ? ENOSPC : errno);
+            return done;
+        }
+    }
+    return done;
+}
+
+void JsonlSink::takeBackTornLine() {
+    if (m_torn == 0 || m_isStandardOutput || !m_isRegular) {
+        return;
+    }
+    // The file is ours alone when it ends where this sink's last write ended.
+    const off_t end = lseek(m_fd, 0, SEEK_CUR);
+    struct stat status {};
+    if (end != -1 && fstat(m_fd, &status) == 0 && status.st_size == end &&
+        ftruncate(m_fd, end - static_cast<off_t>(m_torn)) == 0) {
+        m_torn = 0;
+    }
+}
+
+std::size_t JsonlSink::deliver(std::span<const Event> events, const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    m_text.clear();
+    m_lines.clear();
+    for (const Event& event : events) {
+        m_format.append(m_text, event);
+        m_text += '\n';
+        m_lines.push_back(m_text.size());
+    }
+    if (!ready()) {
+        return trace.result(std::size_t{0});
+    }
+    const std::size_t written = m_torn + write(std::string_view(m_text).substr(m_torn), giveUp);
+    const auto whole = std::upper_bound(m_lines.begin(), m_lines.end(), written);
+    const auto delivered = static_cast<std::size_t>(whole - m_lines.begin());
+    m_torn = written - (delivered == 0 ? 0 : m_lines[delivered - 1]);
+    if (delivered < events.size()) {
+        takeBackTornLine();
+        if (m_torn == 0) {
+            close(); // the next try begins with a fresh look at the path
+        }
+    }
+    return trace.result(delivered);
+}

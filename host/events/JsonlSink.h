@@ -1,0 +1,56 @@
+#ifndef ZRM_HOST_JSONL_SINK_H
+#define ZRM_HOST_JSONL_SINK_H
+
+#include "host/events/EventJson.h"
+#include "host/events/Sink.h"
+
+#include <chrono>
+#include <cstddef>
+#include <span>
+#include <stop_token>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Writes one JSON object per event, one per line, to standard output or to a file. The file is
+/// appended to, made when missing, and opened again when it was moved away or removed. A line is
+/// never torn or written twice: what a failed write left of a line is taken back, or, where that
+/// is not possible, completed before anything else is written. Used by one thread.
+class JsonlSink : public Sink {
+public:
+    /// `path` is "-" for standard output, or a file.
+    JsonlSink(std::string path, EventJson format);
+    ~JsonlSink() override;
+    JsonlSink(const JsonlSink&) = delete;
+    JsonlSink& operator=(const JsonlSink&) = delete;
+
+    std::string name() const override;
+    std::size_t deliver(std::span<const Event> events, const std::stop_token& giveUp) override;
+    std::string error() const override { return m_error; }
+
+private:
+    using Clock = std::chrono::steady_clock;
+
+    bool ready();
+    bool open();
+    void close();
+    bool movedAway();
+    bool waitWritable(const std::stop_token& giveUp);
+    std::size_t write(std::string_view text, const std::stop_token& giveUp);
+    void takeBackTornLine();
+    void fail(const char* call, int number);
+
+    const std::string m_path;
+    const bool m_isStandardOutput;
+    EventJson m_format;
+    int m_fd = -1;
+    bool m_isRegular = false;         ///< a regular file never makes a write wait for a reader
+    std::size_t m_unblockedWrite = 0; ///< bytes that a pipe with room takes without waiting
+    std::size_t m_torn = 0;           ///< bytes of the next event's line that are written already
+    Clock::time_point m_lookAgain{};  ///< when the path is compared with the open file next
+    std::string m_text;               ///< the lines of one delivery
+    std::vector<std::size_t> m_lines; ///< where each of them ends
+    std::string m_error;
+};
+
+#endif

@@ -1,0 +1,13 @@
+#ifndef ZRM_HOST_SITUATION_LABEL_H
+#define ZRM_HOST_SITUATION_LABEL_H
+
+#include <string>
+
+/// What a situation writes on its events. Immutable; shared by the situation and by its events that
+/// are still on their way.
+struct SituationLabel {
+    std::string name;
+    std::string severity; ///< info, minor, warning, major or critical
+};
+
+#endif

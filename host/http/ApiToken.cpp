@@ -1,0 +1,135 @@
+#include "host/http/ApiToken.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstddef>
+#include <cstdio>
+#include <memory>
+#include <optional>
+#include <utility>
+
+#include <stdlib.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"ApiToken.cpp"};
+
+constexpr std::size_t randomBytes = 32;
+constexpr std::size_t shortestToken = 32;
+constexpr std::size_t longestToken = 1024;
+
+struct CloseStream {
+    void operator()(std::FILE* stream) const { std::fclose(stream); }
+};
+using Stream = std::unique_ptr<std::FILE, CloseStream>;
+
+std::string because(const std::string& what, int number) {
+    const ErrorText error(number);
+    return what + ": " + error.text();
+}
+
+/// New random characters; none when the system has no random bytes.
+std::optional<std::string> newToken() {
+    const Stream random(std::fopen("/dev/urandom", "re"));
+    std::array<unsigned char, randomBytes> bytes{};
+    if (random == nullptr ||
+        std::fread(bytes.data(), 1, bytes.size(), random.get()) != bytes.size()) {
+        return std::nullopt;
+    }
+    std::string token;
+    for (const unsigned char byte : bytes) {
+        constexpr const char* digits = "0123456789abcdef";
+        token += digits[byte >> 4];
+        token += digits[byte & 0x0f];
+    }
+    return token;
+}
+
+/// Writes and syncs the whole text; false leaves errno.
+bool writeAll(int fd, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = write(fd, text.data(), text.size());
+        if (written == -1 && errno != EINTR) {
+            return false;
+        }
+        text.remove_prefix(static_cast<std::size_t>(std::max<ssize_t>(written, 0)));
+    }
+    return fsync(fd) == 0;
+}
+
+/// Makes the file appear with its whole content; one that has appeared meanwhile is left as it is.
+/// Returns what is wrong, empty when nothing is.
+std::string make(const std::string& path) {
+    const std::string directory = path.substr(0, path.rfind('/'));
+    if (!directory.empty() && mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
+        return because("cannot make the directory " + directory, errno);
+    }
+    const std::optional<std::string> token = newToken();
+    if (!token) {
+        return "cannot read /dev/urandom";
+    }
+    std::string temporary = path + ".XXXXXX";
+    const int fd = mkstemp(temporary.data()); // readable for the owner alone
+    if (fd == -1) {
+        return because("cannot make a file in " + directory, errno);
+    }
+    std::string problem;
+    if (!writeAll(fd, *token + '\n')) {
+        problem = because("cannot write " + temporary, errno);
+    } else if (link(temporary.c_str(), path.c_str()) == -1 && errno != EEXIST) {
+        problem = because("cannot make " + path, errno);
+    }
+    close(fd);
+    unlink(temporary.c_str());
+    return problem;
+}
+
+} // namespace
+
+ApiToken::ApiToken(std::string token) : m_token(std::move(token)) {}
+
+std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
+    TraceScope trace(anchor);
+    Stream stream(std::fopen(path.c_str(), "re"));
+    if (stream == nullptr && errno == ENOENT) {
+        if (std::string problem = make(path); !problem.empty()) {
+            return problem;
+        }
+        trace.detail()("New token in %s.", path.c_str());
+        stream.reset(std::fopen(path.c_str(), "re"));
+    }
+    struct stat status {};
+    if (stream == nullptr || fstat(fileno(stream.get()), &status) == -1) {
+        return because("cannot read " + path, errno);
+    }
+    if ((status.st_mode & S_IRWXO) != 0) {
+        return path +
+               " is open to every user: take the others' permissions away (chmod o= " + path +
+               ") or remove it, and a new one is made";
+    }
+    char text[longestToken + 2];
+    std::string token(text, std::fread(text, 1, sizeof text, stream.get()));
+    token.erase(token.find_last_not_of(" \t\r\n") + 1);
+    const bool isPrintable =
+        std::all_of(token.begin(), token.end(), [](char c) { return c > 0x20 && c < 0x7f; });
+    if (token.size() < shortestToken || token.size() > longestToken || !isPrintable) {
+        return path + " holds no token of 32 to 1024 visible characters: remove it, and a new one "
+                      "is made";
+    }
+    return ApiToken(std::move(token));
+}
+
+bool ApiToken::matches(std::string_view presented) const noexcept {
+    unsigned difference = presented.size() == m_token.size() ? 0 : 1;
+    for (std::size_t at = 0; at < m_token.size(); ++at) {
+        const char given = at < presented.size() ? presented[at] : '\0';
+        difference |= static_cast<unsigned>(given ^ m_token[at]) & 0xffu;
+    }
+    return difference == 0;
+}

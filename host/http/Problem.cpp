@@ -1,0 +1,41 @@
+#include "host/http/Problem.h"
+
+#include <algorithm>
+#include <array>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+constexpr std::array<std::pair<int, const char*>, 11> titles = {{
+    {400, "Bad Request"},
+    {401, "Unauthorized"},
+    {403, "Forbidden"},
+    {404, "Not Found"},
+    {405, "Method Not Allowed"},
+    {413, "Content Too Large"},
+    {415, "Unsupported Media Type"},
+    {421, "Misdirected Request"},
+    {422, "Unprocessable Content"},
+    {500, "Internal Server Error"},
+    {503, "Service Unavailable"},
+}};
+
+} // namespace
+
+std::string Problem::json() const {
+    const auto title = std::find_if(titles.begin(), titles.end(),
+                                    [&](const auto& known) { return known.first == status; });
+    nlohmann::ordered_json document = {
+        {"type", "about:blank"},
+        {"title", title == titles.end() ? "Error" : title->second},
+        {"status", status},
+        {"detail", detail},
+    };
+    if (!field.empty()) {
+        document["field"] = field;
+    }
+    // A detail may quote what the client sent: bytes that are no UTF-8 are replaced.
+    return document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+}

@@ -1,0 +1,27 @@
+#ifndef ZRM_HOST_SAMPLE_SOURCE_H
+#define ZRM_HOST_SAMPLE_SOURCE_H
+
+#include "host/framework/Condition.h"
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// The one entry through which a sample of a table is asked.
+class SampleSource {
+public:
+    /// The rows of one sample.
+    struct Rows {
+        std::string json; ///< a JSON list of one object per row
+        std::size_t count = 0;
+        bool truncated = false; ///< the row limit of reports ended the sample
+    };
+
+    virtual ~SampleSource() = default;
+
+    /// Takes one sample of a table of the agent. May wait for a refresh to end. Any thread.
+    virtual Rows take(std::string_view table, const std::vector<Condition>& conditions) = 0;
+};
+
+#endif

@@ -1,0 +1,31 @@
+#include "host/http/TableSampler.h"
+
+#include "agent/TraceScope.h"
+#include "agent/zrmmain.h"
+#include "host/events/RowJson.h"
+#include "host/framework/Sample.h"
+
+#include <optional>
+
+namespace {
+
+TRC1_Anchor anchor{"TableSampler.cpp"};
+
+} // namespace
+
+SampleSource::Rows TableSampler::take(std::string_view table,
+                                      const std::vector<Condition>& conditions) {
+    TraceScope trace(anchor);
+    const std::optional<Sample> sample = Sample::take(table, conditions, "HTTP");
+    Rows rows;
+    rows.json = "[";
+    if (sample) {
+        for (; rows.count < sample->size(); ++rows.count) {
+            rows.json += rows.count == 0 ? "" : ",";
+            RowJson::append(rows.json, sample->layout(), sample->row(rows.count));
+        }
+    }
+    rows.json += ']';
+    rows.truncated = table == "RMLOGENT" && rows.count >= static_cast<std::size_t>(gMaxRows);
+    return rows;
+}

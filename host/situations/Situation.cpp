@@ -1,0 +1,47 @@
+#include "host/situations/Situation.h"
+
+#include "agent/TraceScope.h"
+#include "agent/framework/ctreq.h"
+#include "host/framework/Status.h"
+
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"Situation.cpp"};
+
+RequestDetail detailOf(const SituationConfig& config) {
+    RequestDetail detail;
+    detail.name = config.name;
+    detail.sampleType = SAMPLE_SITUATION;
+    detail.conditions = config.conditions;
+    return detail;
+}
+
+} // namespace
+
+Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue)
+    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(
+                                       SituationLabel{m_config.name, m_config.severity})),
+      m_queue(queue), m_request(entries, detailOf(m_config), *this) {
+    TraceScope trace(anchor);
+    if (!isOpen()) {
+        trace.error()("Situation %s could not be opened.", m_config.name.c_str());
+    }
+}
+
+unsigned Situation::receive(const ctreq& request, const char* rows, unsigned count) {
+    TraceScope trace(anchor);
+    for (unsigned index = 0; index < count; ++index) {
+        if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {
+            return trace.result(static_cast<unsigned>(STATUS_END));
+        }
+    }
+    return trace.result(0u);
+}
+
+void Situation::stopped(const ctreq& /*request*/, unsigned reason) {
+    TraceScope trace(anchor);
+    trace.error()("The agent has stopped situation %s; reason = %u.", m_config.name.c_str(),
+                  reason);
+}

@@ -1,0 +1,35 @@
+#ifndef ZRM_HOST_SITUATION_H
+#define ZRM_HOST_SITUATION_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/EventQueue.h"
+#include "host/framework/ContextInfo.h"
+#include "host/framework/Request.h"
+
+#include <memory>
+
+class TableManager;
+
+/// One running situation: an open request on Log Entries whose rows become events. Opened and
+/// closed by one thread; rows arrive on the threads of the logs.
+class Situation : private RowReceiver {
+public:
+    /// Opens the situation on the table. The table's manager and the queue outlive the object.
+    Situation(SituationConfig config, TableManager& entries, EventQueue& queue);
+    Situation(const Situation&) = delete;
+    Situation& operator=(const Situation&) = delete;
+
+    bool isOpen() const noexcept { return m_request.isOpen(); }
+    const SituationConfig& config() const noexcept { return m_config; }
+
+private:
+    unsigned receive(const ctreq& request, const char* rows, unsigned count) override;
+    void stopped(const ctreq& request, unsigned reason) override;
+
+    const SituationConfig m_config;
+    const std::shared_ptr<const SituationLabel> m_label;
+    EventQueue& m_queue;
+    Request m_request; ///< last: rows may arrive while it is built
+};
+
+#endif

@@ -1,0 +1,31 @@
+#ifndef ZRM_HOST_COMMAND_LINE_H
+#define ZRM_HOST_COMMAND_LINE_H
+
+#include <span>
+#include <string>
+
+/// The command line of zrmagent, read.
+class CommandLine {
+public:
+    /// Reads the arguments behind the program's name.
+    explicit CommandLine(std::span<const char* const> arguments);
+
+    bool wantsHelp() const noexcept { return m_help; }
+    bool wantsVersion() const noexcept { return m_version; }
+    const std::string& config() const noexcept { return m_config; }       ///< empty: not given
+    const std::string& traceFile() const noexcept { return m_traceFile; } ///< empty: not given
+    /// What is wrong with the command line; empty when nothing is.
+    const std::string& error() const noexcept { return m_error; }
+
+    /// The text of --help.
+    static std::string help();
+
+private:
+    bool m_help = false;
+    bool m_version = false;
+    std::string m_config;
+    std::string m_traceFile;
+    std::string m_error;
+};
+
+#endif

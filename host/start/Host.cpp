@@ -1,0 +1,179 @@
+#include "host/start/Host.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "host/config/ConfigFile.h"
+#include "host/framework/Tables.h"
+#include "host/start/Say.h"
+
+#include <cerrno>
+#include <cstdlib>
+#include <utility>
+#include <variant>
+
+namespace {
+
+TRC1_Anchor anchor{"Host.cpp"};
+
+constexpr int failureStatus = 255;
+constexpr std::chrono::seconds tickInterval{1};
+/// For the delivery of what is queued, and for whatever else an end waits.
+constexpr std::chrono::seconds endLimit{5};
+
+/// The log manager's first refresh is done within the first of these.
+constexpr int ticksUntilNoLogs = 2;
+
+} // namespace
+
+Host& Host::instance() {
+    static Host* const theHost = new Host;
+    return *theHost;
+}
+
+void Host::configure(HostConfig config, WatchedFile file) {
+    m_config = std::move(config);
+    m_file = std::move(file);
+}
+
+void Host::setState(State state) {
+    {
+        const std::lock_guard guard(m_mutex);
+        m_state = state;
+    }
+    m_changed.notify_all();
+}
+
+int Host::run() {
+    TraceScope trace(anchor);
+    m_mainThread = std::this_thread::get_id();
+    // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
+    if (std::atexit([] { Host::instance().processEnds(); }) != 0) {
+        const ErrorText error(errno);
+        trace.error()("Error establishing the host's exit routine. errno = %d; %s", error.number(),
+                      error.text());
+    }
+    if (!begin()) {
+        return trace.result(failureStatus);
+    }
+    for (int number = 1; waitForTick(); ++number) {
+        tick(number);
+    }
+    stop();
+    return trace.result(0);
+}
+
+bool Host::begin() {
+    TraceScope trace(anchor);
+    if (m_loader != nullptr) {
+        m_loader();
+    }
+    TableManager* const entries = Tables::find("RMLOGENT");
+    if (entries == nullptr) {
+        trace.error()("The agent has not registered its Log Entries table.");
+        return false;
+    }
+    std::unique_ptr<Serving> serving = Serving::begin(m_config, *entries);
+    if (serving == nullptr) {
+        return false;
+    }
+    serving->startHttp(m_config);
+    const std::lock_guard guard(m_mutex);
+    m_serving = std::move(serving);
+    m_state = SERVING;
+    return true;
+}
+
+bool Host::waitForTick() {
+    std::unique_lock lock(m_mutex);
+    m_isBusy = false;
+    m_changed.notify_all();
+    m_changed.wait_for(lock, tickInterval, [&] { return m_stopRequested || m_processEnds; });
+    // Another thread takes what is served apart; this one must not come back to it.
+    m_changed.wait(lock, [&] { return !m_processEnds; });
+    m_isBusy = true;
+    if (m_stopRequested) {
+        m_state = STOPPING;
+    }
+    return !m_stopRequested;
+}
+
+void Host::tick(int number) {
+    if (number <= ticksUntilNoLogs && Serving::countLogs() == 0 && number == ticksUntilNoLogs) {
+        const char* const file = std::getenv("ZRM_CONFIG_FILE");
+        if (file == nullptr || *file == '\0') {
+            say("no log to monitor: set log_config in %s, or ZRM_CONFIG_FILE in the environment, "
+                "to a file that names one log per line; ending in a minute",
+                m_file.path().empty() ? "/etc/zrm/zrm.toml" : m_file.path().c_str());
+        } else {
+            say("no log to monitor: %s names none that can be monitored; ending in a minute", file);
+        }
+    }
+    if (m_file.hasChanged()) {
+        reload();
+    }
+}
+
+void Host::reload() {
+    TraceScope trace(anchor);
+    ConfigFile::Result result = ConfigFile::load(m_file.path());
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        for (const std::string& problem : *problems) {
+            say("%s", problem.c_str());
+        }
+        say("%s was not taken over; the situations go on as they were", m_file.path().c_str());
+        return;
+    }
+    HostConfig& config = std::get<HostConfig>(result);
+    trace.detail()("%s taken over.", m_file.path().c_str());
+    m_serving->apply(config.situations);
+    if (config.environment != m_config.environment || config.http != m_config.http ||
+        config.sinks != m_config.sinks || config.stateDirectory != m_config.stateDirectory) {
+        say("%s: the situations are taken over, every other change at the next start",
+            m_file.path().c_str());
+    }
+    m_config = std::move(config);
+}
+
+void Host::stop() {
+    TraceScope trace(anchor);
+    m_serving->stop(Clock::now() + endLimit);
+    setState(ENDED);
+}
+
+void Host::requestStop() {
+    TraceScope trace(anchor);
+    {
+        const std::lock_guard guard(m_mutex);
+        m_stopRequested = true;
+        // The main thread may itself wait for a log thread that waits for room.
+        if (m_serving != nullptr) {
+            m_serving->limitWaits(Clock::now() + endLimit);
+        }
+    }
+    m_changed.notify_all();
+}
+
+void Host::processEnds() {
+    const Clock::time_point limit = Clock::now() + endLimit;
+    const bool isMain = std::this_thread::get_id() == m_mainThread;
+    std::unique_lock lock(m_mutex);
+    m_processEnds = true;
+    if (m_state == SERVING) {
+        m_serving->limitWaits(limit);
+        m_changed.wait_until(lock, limit, [&] { return isMain || !m_isBusy; });
+        lock.unlock();
+        m_serving->abandonHttp(limit);
+    } else if (!isMain) {
+        m_changed.wait_until(lock, limit, [&] { return m_state != STOPPING; });
+    }
+}
+
+void Host::shutdown() {
+    TraceScope trace(anchor);
+    std::unique_lock lock(m_mutex);
+    if (m_state == SERVING) {
+        m_state = ENDED;
+        lock.unlock();
+        m_serving->deliverRest(Clock::now() + endLimit);
+    }
+}

@@ -1,0 +1,72 @@
+#ifndef ZRM_HOST_HOST_H
+#define ZRM_HOST_HOST_H
+
+#include "host/config/HostConfig.h"
+#include "host/config/WatchedFile.h"
+#include "host/start/Serving.h"
+
+#include <condition_variable>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+/// The standalone host of this process, behind the framework calls of the agent's start-up and
+/// end. One per process, never destroyed, so that threads which outlive main may use it.
+///
+/// The orderly end: a stop is requested, run ends everything that serves, and returns. When a
+/// thread ends the process otherwise (exit), run is still under way: processEnds, which exit calls
+/// before the agent's own exit routine, releases the agent's threads from the host, and shutdown
+/// delivers what is queued.
+class Host {
+public:
+    static Host& instance();
+
+    Host(const Host&) = delete;
+    Host& operator=(const Host&) = delete;
+
+    /// Takes the configuration that was read at start-up from this file. Main thread, first.
+    void configure(HostConfig config, WatchedFile file);
+    void setLoader(int (*loader)()) noexcept { m_loader = loader; }
+
+    /// The main loop: loads the agent, serves until a stop is requested, ends the serving. Returns
+    /// the process's status. Main thread.
+    int run();
+
+    /// Makes run return soon. Any thread.
+    void requestStop();
+
+    /// Before the agent's exit routine, on any thread; any number of times. Bounded.
+    void processEnds();
+
+    /// At the end of the agent's exit routine, on any thread; any number of times. Bounded.
+    void shutdown();
+
+private:
+    using Clock = Serving::Clock;
+    enum State { BEFORE, SERVING, STOPPING, ENDED };
+
+    Host() = default;
+    bool begin();
+    bool waitForTick();
+    void tick(int number);
+    void reload();
+    void stop();
+    void setState(State state);
+
+    HostConfig m_config;
+    WatchedFile m_file{""};
+    int (*m_loader)() = nullptr;
+
+    std::mutex m_mutex; ///< guards what follows
+    std::condition_variable m_changed;
+    std::unique_ptr<Serving> m_serving; ///< set once; what it points to guards itself
+    State m_state = BEFORE;
+    bool m_stopRequested = false;
+    bool m_isBusy = false;      ///< the main thread is within a tick
+    bool m_processEnds = false; ///< the process ends without the main thread
+    std::thread::id m_mainThread;
+};
+
+#endif

@@ -1,0 +1,83 @@
+#include "agent/framework/agent_calls.h"
+#include "host/config/ConfigFile.h"
+#include "host/config/WatchedFile.h"
+#include "host/framework/TraceControl.h"
+#include "host/start/CommandLine.h"
+#include "host/start/Host.h"
+#include "host/start/Say.h"
+
+#include <cstddef>
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include <unistd.h>
+
+namespace {
+
+constexpr const char* defaultConfig = "/etc/zrm/zrm.toml";
+constexpr int unusableStatus = 2;
+
+CommandLine readCommandLine(int argc, char** argv) {
+    const auto count = static_cast<std::size_t>(argc > 0 ? argc - 1 : 0);
+    CommandLine commandLine({argv + (argc > 0 ? 1 : 0), count});
+    if (!commandLine.error().empty()) {
+        say("%s; zrmagent --help lists the arguments", commandLine.error().c_str());
+        std::exit(unusableStatus);
+    }
+    if (commandLine.wantsHelp() || commandLine.wantsVersion()) {
+        std::fputs(commandLine.wantsHelp() ? CommandLine::help().c_str()
+                                           : "zrmagent " ZRM_VERSION "\n",
+                   stdout);
+        std::exit(0);
+    }
+    return commandLine;
+}
+
+HostConfig readConfig(const std::string& path) {
+    if (path.empty()) {
+        return {};
+    }
+    ConfigFile::Result result = ConfigFile::load(path);
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        for (const std::string& problem : *problems) {
+            say("%s", problem.c_str());
+        }
+        std::exit(unusableStatus);
+    }
+    return std::get<HostConfig>(std::move(result));
+}
+
+/// The trace goes where the command line says, at the level that the environment says.
+void setTrace(const std::string& file) {
+    if (const std::string problem = TraceControl::openFile(file); !problem.empty()) {
+        say("%s", problem.c_str());
+        std::exit(unusableStatus);
+    }
+    const char* const levels = std::getenv("QFW_TRC1");
+    if (const std::string problem = TraceControl::configure(levels == nullptr ? "" : levels);
+        !problem.empty()) {
+        say("QFW_TRC1: %s; only errors are traced", problem.c_str());
+    }
+}
+
+} // namespace
+
+void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
+    const CommandLine commandLine = readCommandLine(*argc, argv);
+    std::string path = commandLine.config();
+    if (path.empty() && access(defaultConfig, F_OK) == 0) {
+        path = defaultConfig;
+    }
+    WatchedFile file(path); // before it is read, so that no change is missed
+    HostConfig config = readConfig(path);
+    for (const EnvironmentSetting& setting : config.environment) {
+        constexpr int keepWhatIsSet = 0;
+        setenv(setting.variable.c_str(), setting.value.c_str(), keepWhatIsSet);
+    }
+    setTrace(commandLine.traceFile());
+    Host::instance().configure(std::move(config), std::move(file));
+}

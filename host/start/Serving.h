@@ -1,0 +1,62 @@
+#ifndef ZRM_HOST_SERVING_H
+#define ZRM_HOST_SERVING_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/Delivery.h"
+#include "host/http/HttpServer.h"
+#include "host/http/TableSampler.h"
+#include "host/situations/SituationSet.h"
+
+#include <chrono>
+#include <memory>
+#include <vector>
+
+class TableManager;
+
+/// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
+/// Begun and stopped by the main thread.
+class Serving {
+public:
+    using Clock = std::chrono::steady_clock;
+
+    /// Begins to deliver events, opens the situations on the Log Entries table, and lets the log
+    /// manager know that requests are served. Null when the table opens no request.
+    static std::unique_ptr<Serving> begin(const HostConfig& config, TableManager& entries);
+
+    Serving(const Serving&) = delete;
+    Serving& operator=(const Serving&) = delete;
+
+    /// Begins to serve HTTP where the configuration asks for it. Where it cannot, it says why, and
+    /// everything else goes on.
+    void startHttp(const HostConfig& config);
+
+    /// Exchanges the situations.
+    void apply(const std::vector<SituationConfig>& situations) { m_situations.apply(situations); }
+
+    /// The number of monitored logs.
+    static std::size_t countLogs();
+
+    /// Ends everything in order: no more requests over HTTP, no more events, then the delivery of
+    /// what is queued, at the latest at the limit.
+    void stop(Clock::time_point limit);
+
+    // For an end of the process of which the main thread does not know. Any thread.
+
+    /// Lets no log thread wait for a full queue beyond the limit.
+    void limitWaits(Clock::time_point limit) { m_delivery.queue().limitWaits(limit); }
+    /// Begins no further samples and waits for those under way, at most until the limit.
+    void abandonHttp(Clock::time_point limit) { m_http.abandon(limit); }
+    /// Delivers what is queued, at the latest until the limit.
+    void deliverRest(Clock::time_point limit) { m_delivery.finish(limit); }
+
+private:
+    Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
+            const RowLayout& layout);
+
+    Delivery m_delivery;
+    SituationSet m_situations;
+    TableSampler m_sampler;
+    HttpServer m_http;
+};
+
+#endif

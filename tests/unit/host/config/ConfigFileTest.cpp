@@ -1,0 +1,337 @@
+#include "host/config/ConfigFile.h"
+
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+HostConfig accepted(const std::string& text) {
+    ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        ADD_FAILURE() << problems->front();
+        return {};
+    }
+    return std::get<HostConfig>(std::move(result));
+}
+
+std::vector<std::string> refused(const std::string& text) {
+    const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
+    const auto* const problems = std::get_if<std::vector<std::string>>(&result);
+    return problems == nullptr ? std::vector<std::string>{} : *problems;
+}
+
+TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
+    const HostConfig config = accepted("");
+    EXPECT_EQ(config.stateDirectory, "/var/lib/zrm");
+    EXPECT_THAT(config.environment, IsEmpty());
+    EXPECT_FALSE(config.http.listen);
+    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig{"-"}));
+    EXPECT_THAT(config.situations, IsEmpty());
+}
+
+TEST(ConfigFile, ReadsEverythingThatAFileMaySay) {
+    const HostConfig config = accepted(R"(
+state_directory = "/srv/zrm"
+
+[agent]
+log_config  = "/etc/zrm/logs.conf"
+syslog_conf = "/etc/syslog.conf"
+debug_log   = ""
+max_rows    = 1_000
+trace       = "error,LogManager=detail"
+
+[http]
+listen = "[::1]:0"
+token_file = "/srv/token"
+
+[[sink]]
+type = "jsonl"
+path = "/var/log/events.jsonl"
+
+[[situation]]
+name      = "ssh-bruteforce"
+text      = "Repeated failed SSH logins"
+severity  = "critical"
+log       = "/var/log/auth.log"
+when      = ["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"]
+frequency = ">= 5"
+period    = "60s"
+)");
+    EXPECT_EQ(config.stateDirectory, "/srv/zrm");
+    EXPECT_THAT(config.environment,
+                ElementsAre(EnvironmentSetting{"ZRM_CONFIG_FILE", "/etc/zrm/logs.conf"},
+                            EnvironmentSetting{"ZRM_SYSLOG_CONF", "/etc/syslog.conf"},
+                            EnvironmentSetting{"ZRM_MAX_ROWS", "1000"},
+                            EnvironmentSetting{"QFW_TRC1", "error,LogManager=detail"}));
+    EXPECT_EQ(config.http.listen, (ListenAddress{"::1", 0}));
+    EXPECT_EQ(config.http.tokenFile, "/srv/token");
+    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig{"/var/log/events.jsonl"}));
+    ASSERT_EQ(config.situations.size(), 1u);
+    const SituationConfig& situation = config.situations[0];
+    EXPECT_EQ(situation.name, "ssh-bruteforce");
+    EXPECT_EQ(situation.text, "Repeated failed SSH logins");
+    EXPECT_EQ(situation.severity, "critical");
+    std::vector<std::string> conditions;
+    for (const Condition& condition : situation.conditions) {
+        conditions.push_back(
+            condition.column + " " + std::to_string(condition.op) + " " +
+            (condition.isNumber ? std::to_string(condition.number) : condition.text));
+    }
+    EXPECT_THAT(conditions,
+                ElementsAre("LOGPATH 1 /var/log/", "LOGNAME 1 auth.log", "ENTRYSRC 102 sshd",
+                            "ENTRYDESC 101 Failed password", "FREQTHRESH 3 5", "PERIODTHRS 1 60"));
+}
+
+TEST(ConfigFile, ASituationNeedsOnlyAName) {
+    const HostConfig config = accepted("[[situation]]\nname = 'all'\n");
+    EXPECT_EQ(config.situations.at(0).severity, "warning");
+    EXPECT_EQ(config.situations.at(0).text, "");
+    EXPECT_THAT(config.situations.at(0).conditions, IsEmpty());
+}
+
+TEST(ConfigFile, WhenMayBeASingleText) {
+    const HostConfig config = accepted("[[situation]]\nname = 'a'\nwhen = \"ENTRYSRC = 'x'\"\n");
+    EXPECT_EQ(config.situations.at(0).conditions.at(0).text, "x");
+}
+
+TEST(ConfigFile, SwitchesHttpAndSinksOff) {
+    EXPECT_EQ(accepted("[http]").http.listen, (ListenAddress{"127.0.0.1", 7186}));
+    EXPECT_FALSE(accepted("http.listen = ''").http.listen);
+    EXPECT_THAT(accepted("sink = []").sinks, IsEmpty());
+}
+
+TEST(ConfigFile, RefusesUnknownKeysEverywhere) {
+    EXPECT_THAT(
+        refused(R"(colour = "red"
+[agent]
+log_confg = "/etc/zrm/logs.conf"
+[http]
+port = 7186
+[[sink]]
+type = "jsonl"
+path = "-"
+rotate = true
+[[situation]]
+name = "a"
+threshold = 5
+[history]
+keep_days = 30
+)"),
+        ElementsAre(
+            "zrm.toml:1: colour: unknown key; the keys here are state_directory, agent, http, "
+            "sink, situation",
+            "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
+            "syslog_conf, debug_log, max_rows, trace",
+            "zrm.toml:5: http.port: unknown key; the keys here are listen, token_file",
+            "zrm.toml:9: sink.rotate: unknown key; the keys here are type, path",
+            "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
+            "severity, log, when, frequency, period",
+            "zrm.toml:13: history: unknown key; the keys here are state_directory, agent, http, "
+            "sink, situation"));
+}
+
+TEST(ConfigFile, RefusesValuesOfAnotherType) {
+    EXPECT_THAT(
+        refused(R"([agent]
+log_config = 5
+max_rows = "many"
+trace = true
+[http]
+listen = 7186
+[[situation]]
+name = ["a"]
+when = 5
+[[situation]]
+name = "b"
+when = ["ENTRYSRC = 'a'", 1.5]
+text = 2026-11-20
+severity = { a = 1 }
+)"),
+        ElementsAre("zrm.toml:2: agent.log_config: is a whole number; write a text in quotes",
+                    "zrm.toml:3: agent.max_rows: is a text; write a whole number",
+                    "zrm.toml:4: agent.trace: is a truth value; write a text in quotes",
+                    "zrm.toml:6: http.listen: is a whole number; write a text in quotes",
+                    "zrm.toml:8: situation.name: is a list; write a text in quotes",
+                    "zrm.toml:9: situation.when: is a whole number; write a list of texts in "
+                    "quotes",
+                    "zrm.toml:12: situation.when: is a number with a fraction; write a list of "
+                    "texts in quotes",
+                    "zrm.toml:13: situation.text: is a date or time; write a text in quotes",
+                    "zrm.toml:14: situation.severity: is a table; write a text in quotes"));
+}
+
+TEST(ConfigFile, RefusesTablesOfAnotherKind) {
+    EXPECT_THAT(refused("agent = 5\nsink = 'x'\nsituation = [1]\n"),
+                ElementsAre("zrm.toml:1: agent: is a whole number; write it as [agent]",
+                            "zrm.toml:2: sink: is a text; write it as [[sink]]",
+                            "zrm.toml:3: situation: is a whole number; write it as "
+                            "[[situation]]"));
+    EXPECT_THAT(refused("[situation]\nname = 'a'\n"),
+                ElementsAre("zrm.toml:1: situation: is a table; write it as [[situation]]"));
+}
+
+TEST(ConfigFile, RefusesUnusableValues) {
+    EXPECT_THAT(
+        refused(R"(state_directory = "zrm"
+[agent]
+log_config = "logs.conf"
+syslog_conf = "a\u0000b"
+max_rows = 0
+[http]
+listen = "7186"
+token_file = "token"
+)"),
+        ElementsAre(
+            "zrm.toml:1: state_directory: 'zrm' is no absolute path; begin it with '/'",
+            "zrm.toml:3: agent.log_config: 'logs.conf' is no absolute path; begin it with '/'",
+            "zrm.toml:4: agent.syslog_conf: holds a zero byte; leave it out",
+            "zrm.toml:5: agent.max_rows: is no usable number of rows; write a number from 1 to "
+            "2147483647",
+            "zrm.toml:7: http.listen: '7186' is no address to listen at; write ADDRESS:PORT, for "
+            "example \"127.0.0.1:7186\", or \"\" for none",
+            "zrm.toml:8: http.token_file: 'token' is no absolute path; begin it with '/'"));
+}
+
+TEST(ConfigFile, RefusesToListenForOtherMachines) {
+    for (const std::string& address :
+         {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
+        EXPECT_THAT(refused("http.listen = \"" + address + "\""),
+                    ElementsAre("zrm.toml:1: http.listen: '" + address +
+                                "' can be reached from other machines; write a loopback address: "
+                                "127.0.0.1, [::1] or localhost"));
+    }
+}
+
+TEST(ConfigFile, RefusesIncompleteAndDoubleSinks) {
+    EXPECT_THAT(
+        refused(R"([[sink]]
+[[sink]]
+type = "kafka"
+path = "events.jsonl"
+[[sink]]
+type = "jsonl"
+path = "-"
+[[sink]]
+type = "jsonl"
+path = "-"
+)"),
+        ElementsAre("zrm.toml:1: sink.type: is missing; write type = \"jsonl\"",
+                    "zrm.toml:1: sink.path: is missing; write a file's path, or \"-\" for "
+                    "standard output",
+                    "zrm.toml:3: sink.type: 'kafka' is no type of sink; write \"jsonl\"",
+                    "zrm.toml:4: sink.path: 'events.jsonl' is no absolute path; begin it with '/'",
+                    "zrm.toml:10: sink.path: another sink has '-' already; give each sink a path "
+                    "of its own"));
+}
+
+TEST(ConfigFile, RefusesSituationsWithoutANameOfTheirOwn) {
+    EXPECT_THAT(
+        refused(R"([[situation]]
+text = "a"
+[[situation]]
+name = ""
+[[situation]]
+name = "disk"
+[[situation]]
+name = "disk"
+[[situation]]
+name = "a\nb"
+)"),
+        ElementsAre("zrm.toml:1: situation.name: is missing; give the situation a name",
+                    "zrm.toml:4: situation.name: is no usable name; write 1 to 128 bytes without "
+                    "control characters",
+                    "zrm.toml:8: situation.name: 'disk' is the name of the situation at line 6 "
+                    "too; give each situation a name of its own",
+                    "zrm.toml:10: situation.name: is no usable name; write 1 to 128 bytes without "
+                    "control characters"));
+}
+
+TEST(ConfigFile, RefusesWhatIsWrongWithASituation) {
+    EXPECT_THAT(
+        refused(R"([[situation]]
+name = "a"
+severity = "fatal"
+log = "auth.log"
+when = ["ENTRYSOURCE = 'x'",
+        "ENTRYSRC is 'x'",
+        "ENTRYSRC = 5"]
+frequency = "often"
+period = "60"
+)"),
+        ElementsAre(
+            "zrm.toml:3: situation.severity: 'fatal' is no severity; write info, minor, warning, "
+            "major or critical",
+            "zrm.toml:4: situation.log: 'auth.log' is no absolute path of a file; write the log's "
+            "path as its configuration has it, beginning with '/'",
+            "zrm.toml:5: situation.when: in \"ENTRYSOURCE = 'x'\": 'ENTRYSOURCE' is no column; "
+            "the columns are ORIGINNODE, LOGPATH, LOGNAME, ENTRYTIME, ENTRYSYS, ENTRYSRC, "
+            "ENTRYTYPE, ENTRYCLASS, ENTRYDESC, FREQTHRESH, PERIODTHRS, TIMESTAMP, SAMPLENO, "
+            "ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, UENTRYDESC",
+            "zrm.toml:6: situation.when: in \"ENTRYSRC is 'x'\": 'is' is no operator; the "
+            "operators are =, !=, >=, <=, <, >, contains, starts, matches, in",
+            "zrm.toml:7: situation.when: in \"ENTRYSRC = 5\": ENTRYSRC holds text; write the "
+            "value in quotes",
+            "zrm.toml:8: situation.frequency: 'often' is no frequency that can be reached; write "
+            ">=, >, <= or < and a number of entries, for example \">= 5\"",
+            "zrm.toml:9: situation.period: '60' is no period; write a number and s, m, h or d, "
+            "for example \"60s\""));
+}
+
+TEST(ConfigFile, FrequencyAndPeriodGoTogether) {
+    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nfrequency = '>= 5'\n"),
+                ElementsAre("zrm.toml:3: situation.frequency: has no period beside it; add period "
+                            "= \"60s\""));
+    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nperiod = '60s'\n"),
+                ElementsAre("zrm.toml:3: situation.period: has no frequency beside it; add "
+                            "frequency = \">= 5\""));
+    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nfrequency = '>= 5'\nperiod = '60s'\n"
+                        "when = ['PERIODTHRS = 5']\n"),
+                ElementsAre("zrm.toml:3: situation.frequency: the conditions name FREQTHRESH or "
+                            "PERIODTHRS as well; leave those conditions out"));
+}
+
+TEST(ConfigFile, ThresholdsMayStandAmongTheConditions) {
+    const HostConfig config =
+        accepted("[[situation]]\nname = 'a'\nwhen = ['FREQTHRESH >= 5', 'PERIODTHRS = 60']\n");
+    EXPECT_EQ(config.situations.at(0).conditions.size(), 2u);
+}
+
+TEST(ConfigFile, NamesThePlaceWhereTheSyntaxBreaks) {
+    const std::vector<std::string> problems = refused("[agent]\nlog_config = /etc/logs.conf\n");
+    ASSERT_EQ(problems.size(), 1u);
+    EXPECT_THAT(problems[0], testing::MatchesRegex("zrm.toml:2: .*; correct the TOML here"));
+}
+
+TEST(ConfigFile, LoadsFiles) {
+    const TemporaryDirectory directory;
+    const std::string path = directory.write("zrm.toml", "state_directory = \"/srv\"\n");
+    const ConfigFile::Result result = ConfigFile::load(path);
+    ASSERT_TRUE(std::holds_alternative<HostConfig>(result));
+    EXPECT_EQ(std::get<HostConfig>(result).stateDirectory, "/srv");
+}
+
+TEST(ConfigFile, SaysWhyAFileCannotBeRead) {
+    const TemporaryDirectory directory;
+    const auto problemsOf = [](const std::string& path) {
+        return std::get<std::vector<std::string>>(ConfigFile::load(path));
+    };
+    const std::string cure = "; make it a file that the agent may read, of at most 4 MiB";
+    const std::string missing = directory.file("missing.toml");
+    EXPECT_THAT(problemsOf(missing),
+                ElementsAre(missing + ": cannot be read: No such file or directory" + cure));
+    const std::string folder = directory.path();
+    EXPECT_THAT(problemsOf(folder),
+                ElementsAre(folder + ": cannot be read: Is a directory" + cure));
+    const std::string huge = directory.write("huge.toml", std::string(5 << 20, '\n'));
+    EXPECT_THAT(problemsOf(huge), ElementsAre(huge + ": cannot be read: File too large" + cure));
+}
+
+} // namespace

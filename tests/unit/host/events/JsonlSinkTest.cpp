@@ -1,0 +1,251 @@
+#include "host/events/JsonlSink.h"
+
+#include "TestEvents.h"
+#include "support/Faults.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <thread>
+
+#include <fcntl.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+std::string content(const std::string& path) {
+    std::ifstream stream(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(stream), {}};
+}
+
+/// While it lives, no file of this process grows beyond this size.
+class FileSizeLimit {
+public:
+    explicit FileSizeLimit(rlim_t bytes) {
+        std::signal(SIGXFSZ, SIG_IGN);
+        getrlimit(RLIMIT_FSIZE, &m_before);
+        rlimit limit = m_before;
+        limit.rlim_cur = bytes;
+        setrlimit(RLIMIT_FSIZE, &limit);
+    }
+    ~FileSizeLimit() { setrlimit(RLIMIT_FSIZE, &m_before); }
+
+private:
+    rlimit m_before{};
+};
+
+class JsonlSinkTest : public testing::Test {
+protected:
+    JsonlSinkTest() {
+        for (const char* const text : {"one", "two", "three"}) {
+            events.add(text);
+            lines += TestEvents::line(static_cast<int>(events.all().size()), text);
+        }
+    }
+    std::span<const Event> from(std::size_t first) {
+        return std::span(events.all()).subspan(first);
+    }
+
+    TemporaryDirectory directory;
+    std::string path = directory.file("events.jsonl");
+    TestEvents events;
+    std::string lines; ///< of all three events
+    std::stop_source giveUp;
+    const EventJson format{testLayout()};
+};
+
+TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
+    JsonlSink sink(path, format);
+    EXPECT_EQ(sink.name(), path);
+    EXPECT_EQ(sink.deliver(from(0).first(1), giveUp.get_token()), 1u);
+    EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 2u);
+    EXPECT_EQ(content(path), lines);
+    struct stat status {};
+    stat(path.c_str(), &status);
+    EXPECT_EQ(status.st_mode & 0007, 0u) << "events are not for every user";
+}
+
+TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
+    directory.write("events.jsonl", "earlier\n");
+    JsonlSink(path, format).deliver(from(0), giveUp.get_token());
+    EXPECT_EQ(content(path), "earlier\n" + lines);
+}
+
+TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
+    const std::string removed = directory.file("removed.jsonl");
+    JsonlSink movedSink(path, format);
+    JsonlSink removedSink(removed, format);
+    movedSink.deliver(from(0).first(1), giveUp.get_token());
+    removedSink.deliver(from(0).first(1), giveUp.get_token());
+    std::filesystem::rename(path, directory.file("events.jsonl.1"));
+    std::filesystem::remove(removed);
+    // The path is looked at once a second; until then the open file is written.
+    std::string expected = TestEvents::line(1, "one");
+    std::string added;
+    const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    while (!(std::filesystem::exists(path) && std::filesystem::exists(removed)) &&
+           std::chrono::steady_clock::now() < limit) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(20));
+        EXPECT_EQ(movedSink.deliver(from(1).first(1), giveUp.get_token()), 1u);
+        EXPECT_EQ(removedSink.deliver(from(1).first(1), giveUp.get_token()), 1u);
+        added += TestEvents::line(2, "two");
+    }
+    EXPECT_EQ(content(directory.file("events.jsonl.1")) + content(path), expected + added);
+    EXPECT_EQ(content(path), TestEvents::line(2, "two"));
+    EXPECT_THAT(content(removed), testing::StartsWith(TestEvents::line(2, "two")));
+}
+
+TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
+    const std::string inside = directory.file("later/events.jsonl");
+    JsonlSink sink(inside, format);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), "open failed: No such file or directory");
+    std::filesystem::create_directory(directory.file("later"));
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(content(inside), lines);
+}
+
+TEST_F(JsonlSinkTest, AFullDeviceIsAFailure) {
+    JsonlSink sink("/dev/full", format);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), "write failed: No space left on device");
+}
+
+TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
+    JsonlSink sink(path, format);
+    {
+        Fault fault("write", EIO);
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+        EXPECT_EQ(sink.error(), "write failed: Input/output error");
+    }
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(content(path), lines);
+}
+
+TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
+    JsonlSink sink(path, format);
+    Fault fault("write", EINTR, {.times = 3});
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(fault.failed(), 3);
+    EXPECT_EQ(content(path), lines);
+}
+
+TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
+    const std::size_t first = TestEvents::line(1, "one").size();
+    JsonlSink sink(path, format);
+    {
+        const FileSizeLimit limit(first + 10);
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 1u);
+        EXPECT_EQ(sink.error(), "write failed: File too large");
+        EXPECT_EQ(content(path), TestEvents::line(1, "one"));
+    }
+    EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 2u);
+    EXPECT_EQ(content(path), lines);
+}
+
+TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
+    const std::size_t first = TestEvents::line(1, "one").size();
+    JsonlSink sink(path, format);
+    Fault fault("ftruncate", EPERM, {.times = -1});
+    {
+        const FileSizeLimit limit(first + 10);
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 1u);
+        EXPECT_EQ(content(path), lines.substr(0, first + 10));
+        // Nothing fits: nothing changes.
+        EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 0u);
+    }
+    std::filesystem::rename(path, directory.file("moved"));
+    EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 2u);
+    EXPECT_EQ(content(directory.file("moved")), lines);
+}
+
+/// Standard output is a pipe while the test runs.
+class JsonlSinkPipeTest : public JsonlSinkTest {
+protected:
+    JsonlSinkPipeTest() {
+        std::signal(SIGPIPE, SIG_IGN); // the agent blocks it
+        std::fflush(stdout);
+        m_output = dup(STDOUT_FILENO);
+        int ends[2];
+        EXPECT_EQ(pipe(ends), 0);
+        reader = ends[0];
+        dup2(ends[1], STDOUT_FILENO);
+        close(ends[1]);
+    }
+    ~JsonlSinkPipeTest() override {
+        dup2(m_output, STDOUT_FILENO);
+        close(m_output);
+        if (reader != -1) {
+            close(reader);
+        }
+    }
+    std::string readAll() const {
+        const int flags = fcntl(reader, F_GETFL);
+        fcntl(reader, F_SETFL, flags | O_NONBLOCK);
+        std::string text;
+        char buffer[4096];
+        ssize_t count = 0;
+        while ((count = read(reader, buffer, sizeof buffer)) > 0) {
+            text.append(buffer, static_cast<std::size_t>(count));
+        }
+        return text;
+    }
+
+    int reader = -1;
+
+private:
+    int m_output = -1;
+};
+
+TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
+    JsonlSink sink("-", format);
+    EXPECT_EQ(sink.name(), "standard output");
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(readAll(), lines);
+}
+
+TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
+    JsonlSink sink("-", format);
+    std::string expected;
+    std::string written;
+    std::jthread stopper;
+    // The pipe takes a certain number of lines before it is full.
+    std::size_t delivered = 3;
+    while (delivered == 3) {
+        if (!stopper.joinable() && expected.size() > 32768) {
+            stopper = std::jthread([this] {
+                std::this_thread::sleep_for(std::chrono::milliseconds(200));
+                giveUp.request_stop();
+            });
+        }
+        delivered = sink.deliver(from(0), giveUp.get_token());
+        expected += lines;
+    }
+    EXPECT_EQ(sink.error(), "the reader takes no data");
+    written = readAll();
+    EXPECT_TRUE(expected.starts_with(written));
+    // Offered again, the rest follows where the stream broke off.
+    const std::stop_source anew;
+    EXPECT_EQ(sink.deliver(from(delivered), anew.get_token()), 3 - delivered);
+    EXPECT_EQ(written + readAll(), expected);
+}
+
+TEST_F(JsonlSinkPipeTest, AReaderThatHasGoneIsAFailure) {
+    close(reader);
+    reader = -1;
+    JsonlSink sink("-", format);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), "write failed: Broken pipe");
+}
+
+} // namespace

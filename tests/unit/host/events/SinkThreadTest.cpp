@@ -1,0 +1,181 @@
+#include "host/events/SinkThread.h"
+
+#include "support/RecordingTrace.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = EventQueue::Clock;
+using testing::ElementsAre;
+
+/// What a test sink does and has seen; shared with the sink, which its thread owns.
+struct SinkState {
+    std::atomic<int> failures{0};         ///< deliveries that still fail; -1: all
+    std::atomic<std::size_t> taken{1000}; ///< events that a failing delivery takes
+    std::mutex mutex;
+    std::vector<std::uint64_t> ids;
+    std::vector<Clock::time_point> tries;
+
+    std::vector<std::uint64_t> seen() {
+        const std::lock_guard guard(mutex);
+        return ids;
+    }
+};
+
+class TestSink : public Sink {
+public:
+    explicit TestSink(std::shared_ptr<SinkState> state) : m_state(std::move(state)) {}
+    std::string name() const override { return "test"; }
+    std::string error() const override { return "no room"; }
+    std::size_t deliver(std::span<const Event> events, const std::stop_token&) override {
+        const std::lock_guard guard(m_state->mutex);
+        m_state->tries.push_back(Clock::now());
+        std::size_t count = events.size();
+        if (m_state->failures != 0) {
+            m_state->failures -= m_state->failures > 0 ? 1 : 0;
+            count = std::min(count - 1, m_state->taken.load());
+        }
+        for (const Event& event : events.first(count)) {
+            m_state->ids.push_back(event.id);
+        }
+        return count;
+    }
+
+private:
+    std::shared_ptr<SinkState> m_state;
+};
+
+class SinkThreadTest : public testing::Test {
+protected:
+    void push(int count) {
+        const char row[8] = {};
+        for (int number = 0; number < count; ++number) {
+            EXPECT_TRUE(queue.push(label, row));
+        }
+    }
+    static std::vector<std::uint64_t> upTo(std::uint64_t last) {
+        std::vector<std::uint64_t> ids;
+        for (std::uint64_t id = 1; id <= last; ++id) {
+            ids.push_back(id);
+        }
+        return ids;
+    }
+
+    RecordingTrace trace{TRC1_ERROR};
+    EventQueue queue{100, 8};
+    std::shared_ptr<const SituationLabel> label = std::make_shared<const SituationLabel>();
+    std::shared_ptr<SinkState> state = std::make_shared<SinkState>();
+    SinkThread thread{queue, std::make_unique<TestSink>(state)};
+};
+
+TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
+    thread.start();
+    push(250); // more than the queue holds
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
+    EXPECT_EQ(state->seen(), upTo(250));
+    EXPECT_THAT(trace.messages(), ElementsAre());
+}
+
+TEST_F(SinkThreadTest, DeliversAtOnce) {
+    thread.start();
+    const auto pushed = Clock::now();
+    push(1);
+    while (state->seen().empty()) {
+        ASSERT_LT(Clock::now() - pushed, 10s);
+        std::this_thread::yield();
+    }
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
+}
+
+TEST_F(SinkThreadTest, TriesAgainAfterGrowingPausesWhereItBrokeOff) {
+    state->failures = 3;
+    state->taken = 2;
+    thread.start();
+    push(20);
+    EXPECT_TRUE(trace.waitFor("Sink test takes events again."));
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
+    EXPECT_EQ(state->seen(), upTo(20));
+    EXPECT_THAT(trace.messages(),
+                ElementsAre("Error delivering events to test: no room. Trying again.",
+                            "Sink test takes events again."));
+}
+
+TEST_F(SinkThreadTest, ThePausesGrowWhileNothingIsDelivered) {
+    state->failures = 3;
+    state->taken = 0;
+    push(2); // two, so that a failing delivery takes none
+    thread.start();
+    EXPECT_TRUE(trace.waitFor("Sink test takes events again."));
+    thread.finish(Clock::now() + 10s);
+    ASSERT_GE(state->tries.size(), 4u);
+    EXPECT_GE(state->tries[1] - state->tries[0], 100ms);
+    EXPECT_GE(state->tries[2] - state->tries[1], 200ms);
+    EXPECT_GE(state->tries[3] - state->tries[2], 400ms);
+}
+
+TEST_F(SinkThreadTest, FinishGivesUpAtTheLimitAndCountsWhatIsLeft) {
+    state->failures = -1;
+    state->taken = 0;
+    thread.start();
+    push(5);
+    EXPECT_TRUE(trace.waitFor("Error delivering events to test: no room. Trying again."));
+    EXPECT_EQ(thread.finish(Clock::now() + 50ms), 5u);
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 5u) << "once is enough";
+    EXPECT_FALSE(queue.push(label, "1234567"));
+}
+
+TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
+    state->failures = -1;
+    state->taken = 0;
+    push(2);
+    thread.start();
+    const auto tries = [&] {
+        const std::lock_guard guard(state->mutex);
+        return state->tries.size();
+    };
+    while (tries() < 3) {
+        std::this_thread::sleep_for(1ms);
+    }
+    // A pause of 400 ms runs; the end does not wait for it.
+    state->failures = 0;
+    const auto begin = Clock::now();
+    EXPECT_EQ(thread.finish(begin + 10s), 0u);
+    EXPECT_LT(Clock::now() - begin, 350ms);
+    EXPECT_EQ(state->seen(), upTo(2));
+}
+
+TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
+    auto otherState = std::make_shared<SinkState>();
+    SinkThread other(queue, std::make_unique<TestSink>(otherState));
+    state->failures = -1;
+    state->taken = 0;
+    thread.start();
+    other.start();
+    push(100); // all that the queue holds
+    const auto limit = Clock::now() + 10s;
+    while (otherState->seen().size() < 100 && Clock::now() < limit) {
+        std::this_thread::sleep_for(1ms);
+    }
+    EXPECT_EQ(otherState->seen(), upTo(100));
+    EXPECT_EQ(thread.finish(Clock::now()), 100u);
+    EXPECT_EQ(other.finish(Clock::now() + 10s), 0u);
+}
+
+TEST_F(SinkThreadTest, EndsWithoutHavingBeenFinished) {
+    thread.start();
+    push(1);
+}
+
+} // namespace

@@ -1,0 +1,132 @@
+#include "host/http/ApiToken.h"
+
+#include "support/Faults.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+
+#include <sys/stat.h>
+
+namespace {
+
+const std::string secret = "0123456789abcdef0123456789abcdef";
+
+class ApiTokenTest : public testing::Test {
+protected:
+    static std::string problem(const std::string& path) {
+        const auto token = ApiToken::load(path);
+        const auto* const text = std::get_if<std::string>(&token);
+        return text == nullptr ? "" : *text;
+    }
+    std::string content() const {
+        std::ifstream stream(path);
+        return {std::istreambuf_iterator<char>(stream), {}};
+    }
+    mode_t mode(const std::string& of) const {
+        struct stat status {};
+        EXPECT_EQ(stat(of.c_str(), &status), 0);
+        return status.st_mode & 0777u;
+    }
+    std::string withContent(const std::string& text, mode_t mode = 0600) const {
+        directory.write("api-token", text);
+        chmod(path.c_str(), mode);
+        return path;
+    }
+
+    TemporaryDirectory directory;
+    std::string path = directory.file("api-token");
+};
+
+TEST_F(ApiTokenTest, MakesTheFileForTheOwnerAlone) {
+    EXPECT_EQ(problem(path), "");
+    EXPECT_EQ(mode(path), 0600u);
+    EXPECT_THAT(content(), testing::MatchesRegex("[0-9a-f]+\n"));
+    EXPECT_EQ(content().size(), 65u);
+    const std::string first = content();
+    EXPECT_EQ(problem(path), "");
+    EXPECT_EQ(content(), first) << "a token stays";
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(directory.path()), {}), 1)
+        << "nothing else is left behind";
+}
+
+TEST_F(ApiTokenTest, EveryTokenIsAnother) {
+    problem(path);
+    const std::string first = content();
+    std::filesystem::remove(path);
+    problem(path);
+    EXPECT_NE(content(), first);
+}
+
+TEST_F(ApiTokenTest, MakesTheDirectory) {
+    const std::string inside = directory.file("state/api-token");
+    EXPECT_EQ(problem(inside), "");
+    EXPECT_EQ(mode(inside), 0600u);
+    EXPECT_EQ(mode(directory.file("state")) & 0007u, 0u);
+}
+
+TEST_F(ApiTokenTest, TakesAnOperatorsOwnToken) {
+    const auto loaded = ApiToken::load(withContent(secret + "\r\n", 0640));
+    ASSERT_TRUE(std::holds_alternative<ApiToken>(loaded));
+    EXPECT_TRUE(std::get<ApiToken>(loaded).matches(secret));
+}
+
+TEST_F(ApiTokenTest, RefusesAFileThatEveryoneReads) {
+    EXPECT_EQ(problem(withContent(secret, 0644)),
+              path + " is open to every user: take the others' permissions away (chmod o= " + path +
+                  ") or remove it, and a new one is made");
+}
+
+TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
+    const std::string expected = path + " holds no token of 32 to 1024 visible characters: remove "
+                                        "it, and a new one is made";
+    for (const std::string& text :
+         {std::string(), std::string("\n"), secret.substr(1), secret + " " + secret,
+          std::string(1025, 'x'), std::string(5000, 'x'), secret + "\x01"}) {
+        EXPECT_EQ(problem(withContent(text)), expected);
+    }
+    EXPECT_EQ(problem(withContent(std::string(1024, 'x'))), "");
+}
+
+TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
+    const std::string deep = directory.file("no/such/api-token");
+    EXPECT_EQ(problem(deep), "cannot make the directory " + directory.file("no/such") +
+                                 ": No such file or directory");
+    directory.write("file", "");
+    EXPECT_EQ(problem(directory.file("file/api-token")),
+              "cannot read " + directory.file("file/api-token") + ": Not a directory");
+    EXPECT_EQ(problem("/proc/api-token"), "cannot make a file in /proc: No such file or directory");
+    {
+        Fault fault("fopen", EACCES);
+        EXPECT_EQ(problem(path), "cannot read " + path + ": Permission denied");
+    }
+    {
+        Fault fault("fopen", EMFILE, {.skip = 1});
+        EXPECT_EQ(problem(path), "cannot read /dev/urandom");
+    }
+    {
+        Fault fault("write", ENOSPC);
+        EXPECT_THAT(problem(path), testing::MatchesRegex("cannot write " + path +
+                                                         "\\.......: No space left on device"));
+        std::filesystem::remove(directory.file("file"));
+        EXPECT_TRUE(std::filesystem::is_empty(directory.path())) << "no half of a token stays";
+    }
+}
+
+TEST(ApiToken, MatchesTheWholeTokenAlone) {
+    const ApiToken token(secret);
+    EXPECT_TRUE(token.matches(secret));
+    for (const std::string& wrong :
+         {std::string(), secret.substr(1), secret + "0", "1" + secret.substr(1),
+          secret.substr(0, 31) + "0", std::string(32, '\0')}) {
+        EXPECT_FALSE(token.matches(wrong)) << wrong;
+    }
+}
+
+} // namespace

@@ -1,0 +1,333 @@
+#include "host/http/HttpServer.h"
+
+#include "support/RecordingTrace.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <chrono>
+#include <condition_variable>
+#include <functional>
+#include <future>
+#include <mutex>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <httplib.h>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = std::chrono::steady_clock;
+using nlohmann::json;
+
+const std::string secret(64, 'a');
+const std::string tables = "/api/v1/tables/";
+
+/// Samples of a test: what `onTake` gives.
+class TestSource : public SampleSource {
+public:
+    Rows take(std::string_view table, const std::vector<Condition>& conditions) override {
+        return onTake(std::string(table), conditions);
+    }
+    std::function<Rows(std::string, std::vector<Condition>)> onTake = [](auto, auto) {
+        return Rows{R"([{"LOGNAME":"auth.log"}])", 1, false};
+    };
+};
+
+class HttpServerTest : public testing::Test {
+protected:
+    void SetUp() override { ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), ""); }
+
+    httplib::Client client() const {
+        httplib::Client result("127.0.0.1", server.port());
+        result.set_bearer_token_auth(secret);
+        return result;
+    }
+    httplib::Result sample(const std::string& table, const std::string& body) const {
+        return client().Post(tables + table + "/sample", body, "application/json");
+    }
+    static std::string report() {
+        return R"({"filters":[{"column":"LOGPATH","op":"=","value":"/var/log/"},)"
+               R"({"column":"LOGNAME","op":"=","value":"auth.log"},)"
+               R"({"column":"ENTRYTIME","op":">=","value":"2026-11-20"},)"
+               R"({"column":"ENTRYTIME","op":"<=","value":"2026-11-21"}]})";
+    }
+    static void expectProblem(const httplib::Result& result, int status, const std::string& detail,
+                              const std::string& field) {
+        ASSERT_TRUE(result) << httplib::to_string(result.error());
+        EXPECT_EQ(result->status, status);
+        EXPECT_EQ(result->get_header_value("Content-Type"), "application/problem+json");
+        const json document = json::parse(result->body);
+        EXPECT_EQ(document["type"], "about:blank");
+        EXPECT_EQ(document["status"], status);
+        EXPECT_EQ(document["detail"], detail);
+        EXPECT_EQ(document.value("field", ""), field);
+    }
+    /// Sends bytes as they are and gives the answer up to the end of its first line.
+    std::string raw(const std::string& bytes) const;
+
+    RecordingTrace trace{0};
+    TestSource source;
+    HttpServer server{source};
+};
+
+std::string HttpServerTest::raw(const std::string& bytes) const {
+    const int fd = socket(AF_INET, SOCK_STREAM, 0);
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(server.port());
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    EXPECT_EQ(connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+    EXPECT_EQ(send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL),
+              static_cast<ssize_t>(bytes.size()));
+    std::string answer;
+    char c = 0;
+    while (recv(fd, &c, 1, 0) == 1 && c != '\r') {
+        answer += c;
+    }
+    close(fd);
+    return answer;
+}
+
+TEST_F(HttpServerTest, HealthNeedsNoToken) {
+    httplib::Client anonymous("127.0.0.1", server.port());
+    const auto result = anonymous.Get("/healthz");
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->status, 200);
+    EXPECT_EQ(result->body, R"({"status":"ok"})");
+    EXPECT_EQ(result->get_header_value("Content-Type"), "application/json");
+}
+
+TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
+    source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
+        EXPECT_EQ(table, "RMMONLOG");
+        EXPECT_EQ(conditions.size(), 1u);
+        EXPECT_EQ(conditions.at(0).column, "LOGTYPE");
+        return SampleSource::Rows{R"([{"LOGTYPE":"S"},{"LOGTYPE":"S"}])", 2, false};
+    };
+    const auto result =
+        sample("RMMONLOG", R"({"filters":[{"column":"LOGTYPE","op":"=","value":"S"}]})");
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->status, 200);
+    EXPECT_EQ(
+        result->body,
+        R"({"table":"RMMONLOG","rows":[{"LOGTYPE":"S"},{"LOGTYPE":"S"}],"count":2,"truncated":false})");
+    EXPECT_EQ(result->get_header_value("Content-Type"), "application/json");
+    EXPECT_EQ(result->get_header_value("Cache-Control"), "no-store");
+}
+
+TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
+    source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
+        EXPECT_EQ(table, "RMLOGENT");
+        EXPECT_EQ(conditions.size(), 4u);
+        return SampleSource::Rows{"[{}]", 1, true};
+    };
+    const auto result = sample("RMLOGENT", report());
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[{}],"count":1,"truncated":true})");
+}
+
+TEST_F(HttpServerTest, AnEmptyReportOnALogThatIsNotMonitoredIsAProblem) {
+    std::vector<std::string> asked;
+    std::size_t monitored = 0;
+    source.onTake = [&](const std::string& table, const std::vector<Condition>& conditions) {
+        asked.push_back(table + " " + std::to_string(conditions.size()));
+        return SampleSource::Rows{"[]", table == "RMMONLOG" ? monitored : 0, false};
+    };
+    expectProblem(sample("RMLOGENT", report()), 404, "the agent does not monitor this log",
+                  "filters");
+    EXPECT_THAT(asked, testing::ElementsAre("RMLOGENT 4", "RMMONLOG 2"));
+    monitored = 1;
+    const auto result = sample("RMLOGENT", report());
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[],"count":0,"truncated":false})");
+}
+
+TEST_F(HttpServerTest, RefusesRequestsWithoutTheToken) {
+    httplib::Client anonymous("127.0.0.1", server.port());
+    const auto result = anonymous.Post(tables + "RMMONLOG/sample", "{}", "application/json");
+    expectProblem(result, 401, "send the API token: Authorization: Bearer TOKEN", "Authorization");
+    EXPECT_EQ(result->get_header_value("WWW-Authenticate"), "Bearer");
+    anonymous.set_bearer_token_auth(std::string(64, 'b'));
+    expectProblem(anonymous.Post(tables + "RMMONLOG/sample", "{}", "application/json"), 401,
+                  "the token is not the one in the agent's token file", "Authorization");
+    expectProblem(anonymous.Get("/nothing"), 401,
+                  "the token is not the one in the agent's token file", "Authorization");
+}
+
+TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
+    expectProblem(client().Get("/healthz", {{"Host", "evil.example"}}), 421,
+                  "the Host header must be the address at which the agent listens", "Host");
+    EXPECT_EQ(raw("GET /healthz HTTP/1.1\r\n\r\n"), "HTTP/1.1 421 Misdirected Request");
+    expectProblem(client().Get("/healthz", {{"Origin", "http://evil.example"}}), 403,
+                  "requests of other origins are refused", "Origin");
+}
+
+TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
+    expectProblem(sample("NOTABLE", "{}"), 404,
+                  "no such table; the tables are RMLOGENT and RMMONLOG", "table");
+    const std::string nothing = "there is nothing at this path for this method";
+    expectProblem(client().Get("/nothing"), 404, nothing, "");
+    expectProblem(client().Get(tables + "RMMONLOG/sample"), 404, nothing, "");
+    expectProblem(client().Delete("/healthz"), 404, nothing, "");
+}
+
+TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
+    expectProblem(sample("RMMONLOG", "{"), 400, "the body is no JSON", "body");
+    expectProblem(sample("RMMONLOG", R"({"filters":[{}]})"), 400, "write a text",
+                  "filters[0].column");
+    expectProblem(
+        client().Post(tables + "RMMONLOG/sample", "a=1", "application/x-www-form-urlencoded"), 415,
+        "send the filters as application/json", "Content-Type");
+}
+
+TEST_F(HttpServerTest, RefusesLongBodies) {
+    const std::string tooLong = "the body has more than 65536 bytes";
+    expectProblem(sample("RMMONLOG", std::string(65537, ' ')), 413, tooLong, "body");
+    expectProblem(sample("RMMONLOG", std::string(65536, ' ')), 400, "the body is no JSON", "body");
+    // A body that does not tell its length is cut off too.
+    const auto chunked = client().Post(
+        tables + "RMMONLOG/sample",
+        [](std::size_t offset, httplib::DataSink& sink) {
+            const std::string piece(8192, ' ');
+            if (offset > 1'000'000) {
+                sink.done();
+            } else {
+                sink.write(piece.data(), piece.size());
+            }
+            return true;
+        },
+        "application/json");
+    if (chunked) {
+        expectProblem(chunked, 413, tooLong, "body");
+    } // otherwise the server has ended the connection while the body was sent
+    EXPECT_EQ(client().Get("/healthz")->status, 200);
+}
+
+TEST_F(HttpServerTest, ASampleThatFailsIsAnInternalError) {
+    source.onTake = [](auto, auto) -> SampleSource::Rows { throw std::runtime_error("secret"); };
+    expectProblem(sample("RMMONLOG", "{}"), 500, "the request failed", "");
+}
+
+TEST_F(HttpServerTest, SamplesWaitSideBySide) {
+    std::mutex mutex;
+    std::condition_variable changed;
+    int waiting = 0;
+    bool go = false;
+    source.onTake = [&](auto, auto) {
+        std::unique_lock lock(mutex);
+        ++waiting;
+        changed.notify_all();
+        changed.wait(lock, [&] { return go; }); // as while a refresh runs
+        return SampleSource::Rows{"[]", 0, false};
+    };
+    std::vector<std::future<int>> results;
+    for (int count = 0; count < 3; ++count) {
+        results.push_back(std::async(std::launch::async, [this] {
+            const auto result = sample("RMMONLOG", "{}");
+            return result ? result->status : 0;
+        }));
+    }
+    {
+        std::unique_lock lock(mutex);
+        EXPECT_TRUE(changed.wait_for(lock, 10s, [&] { return waiting == 3; }));
+    }
+    EXPECT_EQ(client().Get("/healthz")->status, 200) << "others are served meanwhile";
+    {
+        const std::lock_guard guard(mutex);
+        go = true;
+    }
+    changed.notify_all();
+    for (auto& result : results) {
+        EXPECT_EQ(result.get(), 200);
+    }
+}
+
+TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
+    HttpServer second(source);
+    EXPECT_EQ(second.start({"127.0.0.1", server.port()}, ApiToken(secret)),
+              "cannot listen at 127.0.0.1:" + std::to_string(server.port()) +
+                  ": is another agent running?");
+    HttpServer elsewhere(source);
+    EXPECT_EQ(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret)),
+              "cannot listen at 203.0.113.1:0");
+}
+
+TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
+    httplib::Client idle("127.0.0.1", server.port());
+    idle.set_keep_alive(true);
+    EXPECT_EQ(idle.Get("/healthz")->status, 200);
+    std::promise<void> begun;
+    source.onTake = [&](auto, auto) {
+        begun.set_value();
+        std::this_thread::sleep_for(50ms);
+        return SampleSource::Rows{"[]", 0, false};
+    };
+    auto answer = std::async(std::launch::async, [this] {
+        const auto result = sample("RMMONLOG", "{}");
+        return result ? result->status : 0;
+    });
+    begun.get_future().wait();
+    const auto begin = Clock::now();
+    server.stop();
+    EXPECT_LT(Clock::now() - begin, 10s);
+    EXPECT_EQ(answer.get(), 200);
+    EXPECT_FALSE(client().Get("/healthz"));
+    server.stop();
+}
+
+TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
+    std::promise<void> begun;
+    std::promise<void> go;
+    std::shared_future<void> mayGo = go.get_future().share();
+    source.onTake = [&](auto, auto) {
+        begun.set_value();
+        mayGo.wait();
+        return SampleSource::Rows{"[]", 0, false};
+    };
+    auto answer = std::async(std::launch::async, [this] {
+        const auto result = sample("RMMONLOG", "{}");
+        return result ? result->status : 0;
+    });
+    begun.get_future().wait();
+    const auto begin = Clock::now();
+    server.abandon(begin + 30ms);
+    EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is under way";
+    expectProblem(sample("RMMONLOG", "{}"), 503, "the agent is ending", "");
+    go.set_value();
+    EXPECT_EQ(answer.get(), 200);
+    server.abandon(Clock::now() + 10s); // nothing is under way: returns at once
+}
+
+TEST_F(HttpServerTest, ASampleMayEndTheProcess) {
+    bool hasReturned = false;
+    source.onTake = [&](auto, auto) {
+        const auto begin = Clock::now();
+        server.abandon(begin + 10s); // as the process's exit routine does, on this thread
+        hasReturned = Clock::now() - begin < 5s;
+        return SampleSource::Rows{"[]", 0, false};
+    };
+    EXPECT_EQ(sample("RMMONLOG", "{}")->status, 200);
+    EXPECT_TRUE(hasReturned);
+}
+
+TEST(HttpServerLife, ListensOnIpv6AndByName) {
+    TestSource source;
+    RecordingTrace trace(0);
+    for (const char* const host : {"::1", "localhost"}) {
+        HttpServer server(source);
+        ASSERT_EQ(server.start({host, 0}, ApiToken(secret)), "");
+        httplib::Client client(host, server.port());
+        const auto result =
+            client.Get("/healthz", {{"Host", ListenAddress{host, server.port()}.text()}});
+        ASSERT_TRUE(result) << host;
+        EXPECT_EQ(result->status, 200) << host;
+    }
+}
+
+} // namespace

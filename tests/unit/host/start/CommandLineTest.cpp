@@ -1,0 +1,68 @@
+#include "host/start/CommandLine.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+CommandLine read(const std::vector<const char*>& arguments) {
+    return CommandLine(arguments);
+}
+
+TEST(CommandLine, MayBeEmpty) {
+    const CommandLine line = read({});
+    EXPECT_EQ(line.error(), "");
+    EXPECT_EQ(line.config(), "");
+    EXPECT_EQ(line.traceFile(), "");
+    EXPECT_FALSE(line.wantsHelp());
+    EXPECT_FALSE(line.wantsVersion());
+}
+
+TEST(CommandLine, ReadsFilesInBothForms) {
+    const CommandLine apart = read({"--config", "/etc/a.toml", "--trace-file", "/tmp/trace"});
+    EXPECT_EQ(apart.error(), "");
+    EXPECT_EQ(apart.config(), "/etc/a.toml");
+    EXPECT_EQ(apart.traceFile(), "/tmp/trace");
+    const CommandLine joined = read({"--trace-file=a=b", "--config=c"});
+    EXPECT_EQ(joined.error(), "");
+    EXPECT_EQ(joined.config(), "c");
+    EXPECT_EQ(joined.traceFile(), "a=b");
+}
+
+TEST(CommandLine, ReadsHelpAndVersion) {
+    EXPECT_TRUE(read({"--help"}).wantsHelp());
+    EXPECT_TRUE(read({"--version"}).wantsVersion());
+}
+
+TEST(CommandLine, RefusesEverythingElse) {
+    EXPECT_EQ(read({"--frobnicate"}).error(), "unknown argument '--frobnicate'");
+    EXPECT_EQ(read({"--conf=x"}).error(), "unknown argument '--conf=x'");
+    EXPECT_EQ(read({"file"}).error(), "unknown argument 'file'");
+    EXPECT_EQ(read({""}).error(), "unknown argument ''");
+    EXPECT_EQ(read({"--config"}).error(), "--config needs a file name");
+    EXPECT_EQ(read({"--config", ""}).error(), "--config needs a file name");
+    EXPECT_EQ(read({"--trace-file="}).error(), "--trace-file needs a file name");
+    EXPECT_EQ(read({"--help=yes"}).error(), "--help takes no value");
+    EXPECT_EQ(read({"--version", "--frobnicate"}).error(), "unknown argument '--frobnicate'");
+}
+
+TEST(CommandLine, TheHelpNamesEveryOption) {
+    EXPECT_EQ(
+        CommandLine::help(),
+        "Usage: zrmagent [OPTION]...\n"
+        "Watches log files and reports their new entries as events.\n"
+        "\n"
+        "  --config FILE       host configuration (default /etc/zrm/zrm.toml when it exists)\n"
+        "  --trace-file FILE   append the trace to FILE instead of standard error\n"
+        "  --version           print the version and end\n"
+        "  --help              print this help and end\n"
+        "\n"
+        "Signals: HUP re-reads the configuration of the logs, INT and TERM end the agent.\n"
+        "Exit status: 0 after an orderly end, 2 for an unusable command line or "
+        "configuration,\n"
+        "255 after a failure.\n");
+}
+
+} // namespace

@@ -1,0 +1,235 @@
+#include "agent/framework/agent_calls.h"
+#include "host/framework/Tables.h"
+#include "support/RecordingTrace.h"
+#include "support/TemporaryDirectory.h"
+#include "unit/host_framework/TestTable.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <thread>
+#include <vector>
+
+namespace {
+
+using namespace std::chrono_literals;
+
+TestManager& entries() {
+    static auto* const table = new TestManager("RMLOGENT");
+    return *table;
+}
+
+/// Two tables, one log.
+int loadTables() {
+    static auto* const logs = new TestManager("RMMONLOG");
+    logs->onCreate = [](TestRequest& created) {
+        created.onSample = [](TestRequest& request) {
+            TestRow row("/var/log/", "app.log", "Running", 0);
+            request.InsertRow(row.bytes());
+        };
+    };
+    TableManager::RegisterWithManager(logs);
+    return static_cast<int>(TableManager::RegisterWithManager(&entries()));
+}
+
+int loadNothing() {
+    return 0;
+}
+
+/// Waits until there are situations, and hands each of them a row.
+void arrive(std::size_t situations = 1) {
+    while (entries().linked().size() != situations) {
+        std::this_thread::sleep_for(1ms);
+    }
+    SYS1_GetLock(entries().lock());
+    LinkedListIter walk(entries().requests());
+    while (void* const element = walk.Next()) {
+        TestRow row("/var/log/", "app.log", "text", 7);
+        auto* const request = static_cast<ctreq*>(element);
+        request->InsertRow(row.bytes());
+        request->Dispatch();
+        request->count = 0;
+    }
+    SYS1_ReleaseLock(entries().lock());
+}
+
+class HostTest : public testing::Test {
+protected:
+    HostTest() {
+        GTEST_FLAG_SET(death_test_style, "threadsafe");
+        for (const char* const variable : {"ZRM_CONFIG_FILE", "ZRM_MAX_ROWS", "QFW_TRC1"}) {
+            unsetenv(variable);
+        }
+        // The child of a death test runs the test from its beginning, in the parent's directory.
+        if (!testing::internal::InDeathTestChild()) {
+            setenv("HOST_TEST_DIRECTORY", own.path().c_str(), 1);
+        }
+        directory = std::getenv("HOST_TEST_DIRECTORY");
+    }
+
+    /// What SYS1_Main does with these arguments.
+    static void start(std::vector<std::string> arguments) {
+        arguments.insert(arguments.begin(), "zrmagent");
+        std::vector<char*> pointers;
+        for (std::string& argument : arguments) {
+            pointers.push_back(argument.data());
+        }
+        pointers.push_back(nullptr);
+        int count = static_cast<int>(arguments.size());
+        SYS1_Main(&count, pointers.data(), "zrmagent");
+    }
+    /// Starts with a configuration that writes events to output(), and runs the main loop.
+    int run(const std::string& situations = "[[situation]]\nname = 'every'\n",
+            int (*loader)() = loadTables) {
+        start({"--config", write(sink() + situations)});
+        AGF_RegisterAgentLoader(loader);
+        return agfmain(0, nullptr);
+    }
+    static void stop() {
+        unsigned status = 1;
+        RPC1_Shutdown(&status);
+        if (status != 0) {
+            std::_Exit(99);
+        }
+    }
+    int lines() const {
+        std::ifstream stream(output());
+        return static_cast<int>(std::count(std::istreambuf_iterator<char>(stream), {}, '\n'));
+    }
+
+    RecordingTrace trace{TRC1_ERROR};
+    TemporaryDirectory own;
+    std::string directory;
+    /// Writes the configuration file and returns its path.
+    std::string write(const std::string& text) const {
+        std::ofstream(directory + "/zrm.toml") << text;
+        return directory + "/zrm.toml";
+    }
+    std::string sink() const { return "[[sink]]\ntype = 'jsonl'\npath = '" + output() + "'\n"; }
+    std::string output() const { return directory + "/events.jsonl"; }
+};
+
+TEST_F(HostTest, HelpAndVersionEndTheProcess) {
+    EXPECT_EXIT(start({"--help"}), testing::ExitedWithCode(0), "");
+    EXPECT_EXIT(start({"--version"}), testing::ExitedWithCode(0), "");
+}
+
+TEST_F(HostTest, AnUnusableCommandLineEndsTheProcess) {
+    EXPECT_EXIT(start({"--frob"}), testing::ExitedWithCode(2),
+                "^zrmagent: unknown argument '--frob'; zrmagent --help lists the arguments\n$");
+    EXPECT_EXIT(start({"--trace-file", "/no/such/trace"}), testing::ExitedWithCode(2),
+                "^zrmagent: cannot open /no/such/trace: No such file or directory\n$");
+}
+
+TEST_F(HostTest, AnUnusableConfigurationEndsTheProcessWithEveryProblem) {
+    const std::string file = write("a = 1\nb = 2\n");
+    const std::string keys = "unknown key; the keys here are state_directory, agent, http, sink, "
+                             "situation\n";
+    EXPECT_EXIT(start({"--config", file}), testing::ExitedWithCode(2),
+                "^zrmagent: " + file + ":1: a: " + keys + "zrmagent: " + file + ":2: b: " + keys +
+                    "$");
+    EXPECT_EXIT(start({"--config", "/no/such.toml"}), testing::ExitedWithCode(2),
+                "^zrmagent: /no/such.toml: cannot be read: No such file or directory; make it a "
+                "file that the agent may read, of at most 4 MiB\n$");
+}
+
+TEST_F(HostTest, TheConfigurationSetsWhatTheEnvironmentLeavesOpen) {
+    setenv("ZRM_MAX_ROWS", "25", 1);
+    start({"--config", write("[agent]\nlog_config = '/etc/logs.conf'\n"
+                             "max_rows = 50\ntrace = 'detail'\n")});
+    EXPECT_STREQ(std::getenv("ZRM_CONFIG_FILE"), "/etc/logs.conf");
+    EXPECT_STREQ(std::getenv("ZRM_MAX_ROWS"), "25");
+    EXPECT_STREQ(std::getenv("QFW_TRC1"), "detail");
+}
+
+TEST_F(HostTest, UnusableTraceLevelsOfTheEnvironmentAreSaid) {
+    setenv("QFW_TRC1", "loud", 1);
+    testing::internal::CaptureStderr();
+    start({});
+    EXPECT_THAT(testing::internal::GetCapturedStderr(),
+                testing::MatchesRegex("zrmagent: QFW_TRC1: .*; only errors are traced\n"));
+}
+
+TEST_F(HostTest, TheVersionIsWritten) {
+    char version[9] = {};
+    AGF_SetVersionUsingProduct("RM", version, sizeof version);
+    EXPECT_THAT(version, testing::MatchesRegex("[0-9]+\\.[0-9]+\\.[0-9]+"));
+    AGF_SetAffinity("product");
+}
+
+TEST_F(HostTest, RunsUntilAStopIsRequestedAndDeliversEverything) {
+    std::thread log([] {
+        arrive();
+        arrive();
+        stop();
+    });
+    EXPECT_EQ(run(), 0);
+    log.join();
+    EXPECT_EQ(lines(), 2);
+    EXPECT_THAT(trace.messages(), testing::ElementsAre());
+    AGF_Shutdown(1);
+    AGF_Shutdown(1);
+    Tables::clear();
+}
+
+TEST_F(HostTest, WithoutTheTableItFails) {
+    EXPECT_EXIT(std::exit(run("", loadNothing)), testing::ExitedWithCode(255),
+                "The agent has not registered its Log Entries table.");
+}
+
+TEST_F(HostTest, AnEndOfTheProcessOnAnotherThreadDeliversWhatIsQueued) {
+    EXPECT_EXIT(
+        {
+            std::atexit([] { AGF_Shutdown(1); });
+            std::thread([] {
+                for (int count = 0; count < 100; ++count) {
+                    arrive();
+                }
+                std::exit(3);
+            }).detach();
+            run();
+            std::_Exit(98); // the main loop must not come back
+        },
+        testing::ExitedWithCode(3), "");
+    EXPECT_EQ(lines(), 100);
+}
+
+TEST_F(HostTest, AnEndBeforeTheMainLoopNeedsNothing) {
+    EXPECT_EXIT(
+        {
+            std::atexit([] { AGF_Shutdown(1); });
+            start({});
+            std::exit(4);
+        },
+        testing::ExitedWithCode(4), "");
+}
+
+TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
+    EXPECT_EXIT(
+        {
+            std::thread([this] {
+                arrive(1);
+                write(sink() + "[[situation]]\nname = 'a'\n"
+                               "[[situation]]\nname = 'b'\n[http]\n");
+                arrive(2);
+                write("broken");
+                std::this_thread::sleep_for(2500ms);
+                arrive(2);
+                stop();
+            }).detach();
+            std::exit(run());
+        },
+        testing::ExitedWithCode(0),
+        "zrm.toml: the situations are taken over, every other change at the next start\n"
+        "zrmagent: .*zrm.toml:1: .*; correct the TOML here\n"
+        "zrmagent: .*zrm.toml was not taken over; the situations go on as they were\n");
+    EXPECT_EQ(lines(), 5);
+}
+
+} // namespace

@@ -1,0 +1,173 @@
+#include "host/start/Serving.h"
+
+#include "agent/framework/locks.h"
+#include "host/framework/Tables.h"
+#include "support/RecordingTrace.h"
+#include "support/TemporaryDirectory.h"
+#include "unit/host_framework/TestTable.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <thread>
+
+#include <unistd.h>
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = Serving::Clock;
+
+class ServingTest : public testing::Test {
+protected:
+    ServingTest() {
+        TableManager::RegisterWithManager(&logs);
+        logs.onCreate = [this](TestRequest&) { ++logSamples; };
+        config.stateDirectory = directory.file("state");
+        config.sinks = {{output}};
+        config.situations = {{"every", "", "info", {}}};
+    }
+    ~ServingTest() override { Tables::clear(); }
+
+    /// A log's thread that hands rows over until one is not taken.
+    unsigned arrive() {
+        unsigned status = 0;
+        SYS1_GetLock(entries.lock());
+        LinkedListIter walk(entries.requests());
+        while (void* const element = walk.Next()) {
+            TestRow row("/var/log/", "app.log", "text", 7);
+            auto* const request = static_cast<ctreq*>(element);
+            request->InsertRow(row.bytes());
+            status = request->Dispatch();
+            request->count = 0;
+        }
+        SYS1_ReleaseLock(entries.lock());
+        return status;
+    }
+    int lines() const {
+        std::ifstream stream(output);
+        return static_cast<int>(std::count(std::istreambuf_iterator<char>(stream), {}, '\n'));
+    }
+
+    RecordingTrace trace{0};
+    TemporaryDirectory directory;
+    std::string output = directory.file("events.jsonl");
+    HostConfig config;
+    TestManager entries{"RMLOGENT"};
+    TestManager logs{"RMMONLOG"};
+    int logSamples = 0;
+};
+
+TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
+    const auto serving = Serving::begin(config, entries);
+    ASSERT_NE(serving, nullptr);
+    EXPECT_EQ(arrive(), 0u);
+    EXPECT_EQ(arrive(), 0u);
+    serving->stop(Clock::now() + 10s);
+    EXPECT_EQ(lines(), 2);
+    arrive(); // nobody listens any more
+    EXPECT_EQ(lines(), 2);
+}
+
+TEST_F(ServingTest, TakesASampleOfTheLogsAtOnce) {
+    const auto serving = Serving::begin(config, entries);
+    EXPECT_EQ(logSamples, 1);
+    serving->stop(Clock::now() + 10s);
+}
+
+TEST_F(ServingTest, ATableThatOpensNoRequestIsAFailure) {
+    trace.setLevel(TRC1_ERROR);
+    entries.gives = false;
+    EXPECT_EQ(Serving::begin(config, entries), nullptr);
+    EXPECT_THAT(trace.messages(), testing::ElementsAre("The Log Entries table opens no request."));
+}
+
+TEST_F(ServingTest, CountsTheMonitoredLogs) {
+    logs.onCreate = [](TestRequest& created) {
+        created.onSample = [](TestRequest& request) {
+            TestRow row("/var/log/", "app.log", "Running", 0);
+            request.InsertRow(row.bytes());
+            request.InsertRow(row.bytes());
+        };
+    };
+    EXPECT_EQ(Serving::countLogs(), 2u);
+    Tables::clear();
+    EXPECT_EQ(Serving::countLogs(), 0u);
+}
+
+TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
+    config.sinks = {{"/dev/full"}};
+    const auto serving = Serving::begin(config, entries);
+    std::atomic<int> taken{0};
+    std::thread log([&] {
+        while (arrive() == 0) {
+            ++taken;
+        }
+    });
+    // The queue is full when the log stands still.
+    for (int before = -1; before != taken || taken == 0;) {
+        before = taken;
+        std::this_thread::sleep_for(20ms);
+    }
+    testing::internal::CaptureStderr();
+    const auto begin = Clock::now();
+    serving->stop(begin + 200ms);
+    EXPECT_LT(Clock::now() - begin, 5s);
+    log.join();
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "zrmagent: " + std::to_string(taken) + " events were not delivered to /dev/full\n");
+}
+
+TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
+    const auto serving = Serving::begin(config, entries);
+    arrive();
+    serving->limitWaits(Clock::now());
+    serving->abandonHttp(Clock::now() + 10s);
+    EXPECT_EQ(arrive(), 0u) << "there is room";
+    serving->deliverRest(Clock::now() + 10s);
+    EXPECT_EQ(lines(), 2);
+    EXPECT_NE(arrive(), 0u);
+}
+
+TEST_F(ServingTest, SaysWhereHttpIs) {
+    config.http.listen = ListenAddress{"127.0.0.1", 0};
+    const auto serving = Serving::begin(config, entries);
+    testing::internal::CaptureStderr();
+    serving->startHttp(config);
+    EXPECT_THAT(testing::internal::GetCapturedStderr(),
+                testing::MatchesRegex("zrmagent: HTTP at http://127.0.0.1:[0-9]+/, token in " +
+                                      directory.file("state/api-token") + "\n"));
+    EXPECT_TRUE(std::filesystem::exists(directory.file("state/api-token")));
+    serving->stop(Clock::now() + 10s);
+}
+
+TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
+    config.http.listen = ListenAddress{"127.0.0.1", 0};
+    config.http.tokenFile = directory.file("no/such/token");
+    const auto serving = Serving::begin(config, entries);
+    testing::internal::CaptureStderr();
+    serving->startHttp(config);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "zrmagent: HTTP is off: cannot make the directory " + directory.file("no/such") +
+                  ": No such file or directory\n");
+    EXPECT_EQ(arrive(), 0u);
+    serving->stop(Clock::now() + 10s);
+    EXPECT_EQ(lines(), 1);
+}
+
+TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
+    const auto serving = Serving::begin(config, entries);
+    testing::internal::CaptureStderr();
+    serving->startHttp(config);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+    EXPECT_FALSE(std::filesystem::exists(directory.file("state")));
+    serving->stop(Clock::now() + 10s);
+}
+
+} // namespace
