@@ -10,6 +10,7 @@ struct Recorder {
     std::mutex mutex;
     std::condition_variable changed;
     std::vector<zrm_rmlogent_data_t> rows;
+    std::function<void(std::size_t)> action;
 };
 
 Recorder& recorder() {
@@ -22,6 +23,12 @@ Recorder& recorder() {
 void EventRecorder::clear() {
     const std::lock_guard guard(recorder().mutex);
     recorder().rows.clear();
+    recorder().action = nullptr;
+}
+
+void EventRecorder::onRow(std::function<void(std::size_t)> action) {
+    const std::lock_guard guard(recorder().mutex);
+    recorder().action = std::move(action);
 }
 
 std::vector<zrm_rmlogent_data_t> EventRecorder::rows() {
@@ -43,10 +50,17 @@ __wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlog
 extern "C" unsigned
 __wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlogent_data_t* rows,
                                                                        int count) {
+    std::function<void(std::size_t)> action;
+    std::size_t rowCount = 0;
     {
         const std::lock_guard guard(recorder().mutex);
         recorder().rows.insert(recorder().rows.end(), rows, rows + count);
+        rowCount = recorder().rows.size();
+        action = recorder().action;
     }
     recorder().changed.notify_all();
+    if (action) {
+        action(rowCount);
+    }
     return 0;
 }

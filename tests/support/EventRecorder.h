@@ -4,6 +4,7 @@
 #include "tables/zrm_rmlogent_data.h"
 
 #include <cstddef>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -16,6 +17,10 @@ void clear();
 std::vector<zrm_rmlogent_data_t> rows();
 /// Waits until at least so many rows have arrived and returns them; fewer after the time limit.
 std::vector<zrm_rmlogent_data_t> waitForRows(std::size_t count, int seconds = 10);
+
+/// Runs `action` for every row, on the thread that hands it over, with the number of rows so far;
+/// clear() forgets it.
+void onRow(std::function<void(std::size_t)> action);
 
 } // namespace EventRecorder
 

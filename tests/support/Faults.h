@@ -95,6 +95,24 @@ public:
     FakeBlockSize& operator=(const FakeBlockSize&) = delete;
 };
 
+/// While it lives, reading a stream that fdopen() opens fails with EISDIR.
+class UnreadableStreams {
+public:
+    UnreadableStreams();
+    ~UnreadableStreams();
+    UnreadableStreams(const UnreadableStreams&) = delete;
+    UnreadableStreams& operator=(const UnreadableStreams&) = delete;
+};
+
+/// While it lives, select() waits for two milliseconds at most.
+class ShortSelect {
+public:
+    ShortSelect();
+    ~ShortSelect();
+    ShortSelect(const ShortSelect&) = delete;
+    ShortSelect& operator=(const ShortSelect&) = delete;
+};
+
 /// While it lives, waitpid() waits for the child that it is asked for and then gives this id.
 class FakeWaitedId {
 public:
