@@ -233,7 +233,7 @@ ConditionBuilder::ofLog(std::string_view path) {
     std::vector<Condition> conditions;
     for (const auto& [part, local, utf8] :
          {std::tuple{directory, "LOGPATH", "ULOGPATH"}, std::tuple{name, "LOGNAME", "ULOGNAME"}}) {
-        const auto holds = [&](const char* column) {
+        const auto holds = [&columns, &part = part](const char* column) {
             return part.size() <= static_cast<std::size_t>(findColumn(columns, column)->width);
         };
         if (!holds(utf8)) {

@@ -201,7 +201,7 @@ token_file = "token"
 }
 
 TEST(ConfigFile, RefusesToListenForOtherMachines) {
-    for (const std::string& address :
+    for (const std::string address :
          {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(refused("http.listen = \"" + address + "\""),
                     ElementsAre("zrm.toml:1: http.listen: '" + address +
