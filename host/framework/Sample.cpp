@@ -25,8 +25,9 @@ private:
 
 } // namespace
 
-Sample::Sample(RowLayout layout, std::size_t rowSize, std::vector<char> rows)
-    : m_layout(std::move(layout)), m_rowSize(rowSize), m_rows(std::move(rows)) {}
+Sample::Sample(RowLayout layout, std::size_t rowSize, std::vector<char> rows, std::uint64_t offered)
+    : m_layout(std::move(layout)), m_rowSize(rowSize), m_rows(std::move(rows)), m_offered(offered) {
+}
 
 std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition> conditions,
                                    std::string label) {
@@ -47,5 +48,5 @@ std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition
     sampled.TakeSample();
     // The table leaves its rows with the request.
     sampled.Dispatch();
-    return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows());
+    return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows(), sampled.judged());
 }

@@ -4,6 +4,8 @@
 #include "host/framework/Condition.h"
 #include "host/framework/RowLayout.h"
 
+#include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -20,15 +22,18 @@ public:
 
     const RowLayout& layout() const noexcept { return m_layout; }
     std::size_t size() const noexcept { return m_rowSize == 0 ? 0 : m_rows.size() / m_rowSize; }
+    /// Number of rows that the table offered, before the conditions.
+    std::uint64_t offered() const noexcept { return m_offered; }
     /// The row of this index, less than size().
     const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }
 
 private:
-    Sample(RowLayout layout, std::size_t rowSize, std::vector<char> rows);
+    Sample(RowLayout layout, std::size_t rowSize, std::vector<char> rows, std::uint64_t offered);
 
     RowLayout m_layout;
     std::size_t m_rowSize;
     std::vector<char> m_rows;
+    std::uint64_t m_offered;
 };
 
 #endif

@@ -11,6 +11,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cstdint>
 #include <cstring>
 #include <new>
 #include <optional>
@@ -33,6 +34,7 @@ public:
     std::optional<ConditionSet> conditions;
     RowReceiver& receiver;
     std::atomic<bool> stopped{false};
+    std::uint64_t judged = 0; ///< rows that were judged
     std::size_t capacity = 0; ///< rows that fit into the memory of the data array
 };
 
@@ -92,6 +94,7 @@ unsigned ctreq::InsertRow(char* row) {
 }
 
 unsigned ctreq::CheckForException(char* row) {
+    ++m_framework->judged;
     if (m_framework->stopped.load(std::memory_order_relaxed)) {
         return 0;
     }
@@ -99,6 +102,10 @@ unsigned ctreq::CheckForException(char* row) {
         m_framework->conditions.emplace(m_framework->filters, *this);
     }
     return m_framework->conditions->holds(row) ? 1 : 0;
+}
+
+std::uint64_t ctreq::judged() const noexcept {
+    return m_framework->judged;
 }
 
 unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,

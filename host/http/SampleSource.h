@@ -15,7 +15,7 @@ public:
     struct Rows {
         std::string json; ///< a JSON list of one object per row
         std::size_t count = 0;
-        bool truncated = false; ///< the row limit of reports ended the sample
+        bool truncated = false; ///< as many rows were read as a report may read: there may be more
     };
 
     virtual ~SampleSource() = default;

@@ -5,6 +5,7 @@
 #include "host/events/RowJson.h"
 #include "host/framework/Sample.h"
 
+#include <cstdint>
 #include <optional>
 
 namespace {
@@ -26,6 +27,8 @@ SampleSource::Rows TableSampler::take(std::string_view table,
         }
     }
     rows.json += ']';
-    rows.truncated = table == "RMLOGENT" && rows.count >= static_cast<std::size_t>(gMaxRows);
+    // The agent counts the rows that it reads, before the conditions.
+    rows.truncated =
+        sample && table == "RMLOGENT" && sample->offered() >= static_cast<std::uint64_t>(gMaxRows);
     return rows;
 }

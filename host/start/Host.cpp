@@ -1,12 +1,10 @@
 #include "host/start/Host.h"
 
-#include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 #include "host/config/ConfigFile.h"
 #include "host/framework/Tables.h"
 #include "host/start/Say.h"
 
-#include <cerrno>
 #include <cstdlib>
 #include <utility>
 #include <variant>
@@ -48,9 +46,7 @@ int Host::run() {
     m_mainThread = std::this_thread::get_id();
     // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
     if (std::atexit([] { Host::instance().processEnds(); }) != 0) {
-        const ErrorText error(errno);
-        trace.error()("Error establishing the host's exit routine. errno = %d; %s", error.number(),
-                      error.text());
+        trace.error()("Error establishing the host's exit routine.");
     }
     if (!begin()) {
         return trace.result(failureStatus);

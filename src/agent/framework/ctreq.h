@@ -3,6 +3,7 @@
 
 #include "agent/framework/filters.h"
 
+#include <cstdint>
 #include <memory>
 
 class ContextInfo;
@@ -57,6 +58,8 @@ public:
     int IsException(_IntfOper op, int column, const char* value);
     /// Dumps the conditions to the trace.
     void DumpThresholds();
+    /// Number of rows that CheckForException has judged.
+    std::uint64_t judged() const noexcept;
     /// Sends the rows collected so far (`count` of them).
     unsigned Dispatch();
     /// Ends the situation.

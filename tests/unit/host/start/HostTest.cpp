@@ -1,5 +1,6 @@
 #include "agent/framework/agent_calls.h"
 #include "host/framework/Tables.h"
+#include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "unit/host_framework/TestTable.h"
@@ -7,6 +8,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cerrno>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -15,6 +17,9 @@
 #include <string>
 #include <thread>
 #include <vector>
+
+#include <fcntl.h>
+#include <unistd.h>
 
 namespace {
 
@@ -25,13 +30,17 @@ TestManager& entries() {
     return *table;
 }
 
-/// Two tables, one log.
+bool hasLogs = true;
+
+/// Two tables, and one log unless a test has none.
 int loadTables() {
     static auto* const logs = new TestManager("RMMONLOG");
     logs->onCreate = [](TestRequest& created) {
         created.onSample = [](TestRequest& request) {
             TestRow row("/var/log/", "app.log", "Running", 0);
-            request.InsertRow(row.bytes());
+            if (hasLogs) {
+                request.InsertRow(row.bytes());
+            }
         };
     };
     TableManager::RegisterWithManager(logs);
@@ -112,6 +121,21 @@ protected:
         return directory + "/zrm.toml";
     }
     std::string sink() const { return "[[sink]]\ntype = 'jsonl'\npath = '" + output() + "'\n"; }
+    /// From here on standard error goes to a file, where this process and its parent can read it.
+    void errorsToFile() const {
+        const int fd = open((directory + "/errors").c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
+        dup2(fd, STDERR_FILENO);
+        close(fd);
+    }
+    std::string errors() const {
+        std::ifstream stream(directory + "/errors");
+        return {std::istreambuf_iterator<char>(stream), {}};
+    }
+    void waitForError(const std::string& text) const {
+        while (errors().find(text) == std::string::npos) {
+            std::this_thread::sleep_for(5ms);
+        }
+    }
     std::string output() const { return directory + "/events.jsonl"; }
 };
 
@@ -213,23 +237,75 @@ TEST_F(HostTest, AnEndBeforeTheMainLoopNeedsNothing) {
 TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
     EXPECT_EXIT(
         {
+            errorsToFile();
             std::thread([this] {
                 arrive(1);
-                write(sink() + "[[situation]]\nname = 'a'\n"
-                               "[[situation]]\nname = 'b'\n[http]\n");
+                write(sink() + "[[situation]]\nname = 'a'\n[[situation]]\nname = 'b'\n[http]\n");
                 arrive(2);
                 write("broken");
-                std::this_thread::sleep_for(2500ms);
+                waitForError("not taken over");
                 arrive(2);
                 stop();
             }).detach();
             std::exit(run());
         },
-        testing::ExitedWithCode(0),
-        "zrm.toml: the situations are taken over, every other change at the next start\n"
-        "zrmagent: .*zrm.toml:1: .*; correct the TOML here\n"
-        "zrmagent: .*zrm.toml was not taken over; the situations go on as they were\n");
+        testing::ExitedWithCode(0), "");
     EXPECT_EQ(lines(), 5);
+    const std::string file = directory + "/zrm.toml";
+    EXPECT_THAT(errors(), testing::MatchesRegex(
+                              "zrmagent: " + file +
+                              ": the situations are taken over, every other change at the next "
+                              "start\nzrmagent: " +
+                              file + ":1: .*; correct the TOML here\nzrmagent: " + file +
+                              " was not taken over; the situations go on as they were\n"));
+}
+
+TEST_F(HostTest, SaysOnceThatThereIsNoLogToMonitor) {
+    hasLogs = false;
+    EXPECT_EXIT(
+        {
+            errorsToFile();
+            std::thread([this] {
+                waitForError("no log");
+                std::this_thread::sleep_for(1100ms); // one more look at the logs
+                stop();
+            }).detach();
+            std::exit(run());
+        },
+        testing::ExitedWithCode(0), "");
+    EXPECT_EQ(errors(), "zrmagent: no log to monitor: set log_config in " + directory +
+                            "/zrm.toml, or ZRM_CONFIG_FILE in the environment, to a file that "
+                            "names one log per line; ending in a minute\n");
+}
+
+TEST_F(HostTest, SaysWhichFileNamesNoLog) {
+    hasLogs = false;
+    EXPECT_EXIT(
+        {
+            errorsToFile();
+            std::thread([this] {
+                waitForError("no log");
+                stop();
+            }).detach();
+            std::exit(run("[agent]\nlog_config = '/etc/zrm/logs.conf'\n"));
+        },
+        testing::ExitedWithCode(0), "");
+    EXPECT_EQ(errors(), "zrmagent: no log to monitor: /etc/zrm/logs.conf names none that can be "
+                        "monitored; ending in a minute\n");
+}
+
+TEST_F(HostTest, GoesOnWithoutItsExitRoutine) {
+    EXPECT_EXIT(
+        {
+            Fault fault("atexit", ENOMEM);
+            std::thread([] {
+                arrive();
+                stop();
+            }).detach();
+            std::_Exit(run());
+        },
+        testing::ExitedWithCode(0), "^Error establishing the host's exit routine.\n$");
+    EXPECT_EQ(lines(), 1);
 }
 
 } // namespace
