@@ -1,0 +1,59 @@
+#include "host/config/ConditionParser.h"
+
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+#include <string_view>
+#include <variant>
+
+// Any text gives a condition or a problem with its cure; the text of a condition, written anew from
+// what was read, gives the same condition.
+
+namespace {
+
+std::string quoted(std::string_view text) {
+    std::string result = "'";
+    for (const char c : text) {
+        result += c == '\'' ? "''" : std::string(1, c);
+    }
+    return result + "'";
+}
+
+std::string written(const Condition& condition) {
+    const char* const names[] = {"", "=", "!=", ">=", "<=", "<", ">"};
+    const char* const own[] = {"contains", "starts", "matches", "in"};
+    std::string text = condition.column + ' ';
+    text += condition.op < INTF_CONTAINS ? names[condition.op] : own[condition.op - INTF_CONTAINS];
+    if (condition.op != INTF_IN) {
+        return text + (condition.isNumber ? ' ' + std::to_string(condition.number)
+                                          : quoted(condition.text));
+    }
+    char separator = '[';
+    for (const std::string& value : condition.values) {
+        text += separator + (condition.isNumber ? value : quoted(value));
+        separator = ',';
+    }
+    return text + ']';
+}
+
+} // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    const std::string_view text(reinterpret_cast<const char*>(data), size);
+    for (const char* const table : {"RMLOGENT", "RMMONLOG"}) {
+        const ConditionParser parser(table);
+        const ConditionBuilder::Result result = parser.parse(text);
+        if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
+            if (problem->what.empty() || problem->cure.empty()) {
+                std::abort();
+            }
+            continue;
+        }
+        const Condition& condition = std::get<Condition>(result);
+        const ConditionBuilder::Result again = parser.parse(written(condition));
+        if (!std::holds_alternative<Condition>(again) || std::get<Condition>(again) != condition) {
+            std::abort();
+        }
+    }
+    return 0;
+}
