@@ -1,6 +1,6 @@
 #include "host/config/ConditionBuilder.h"
 
-#include "host/config/EntryTime.h"
+#include "host/config/TimeText.h"
 
 #include <algorithm>
 #include <array>
@@ -36,7 +36,7 @@ ConditionProblem badValue(std::string what, std::string cure) {
 /// A value of a character column that is compared as a whole; false: `value` says what is wrong.
 std::optional<ConditionProblem> checkWhole(const Column& column, std::string& value) {
     if (column.isTime && !value.empty()) {
-        std::optional<std::string> stamp = EntryTime::toStamp(value);
+        std::optional<std::string> stamp = TimeText::toStamp(value);
         if (!stamp) {
             return badValue(quoted(value) + " is no time",
                             "write it like '2026-11-20T07:03:09', with Z or +01:00 behind it where "

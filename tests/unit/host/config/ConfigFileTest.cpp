@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <fstream>
 #include <string>
 #include <vector>
 
@@ -201,8 +202,7 @@ token_file = "token"
 }
 
 TEST(ConfigFile, RefusesToListenForOtherMachines) {
-    for (const std::string address :
-         {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
+    for (const std::string address : {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(refused("http.listen = \"" + address + "\""),
                     ElementsAre("zrm.toml:1: http.listen: '" + address +
                                 "' can be reached from other machines; write a loopback address: "
@@ -332,6 +332,33 @@ TEST(ConfigFile, SaysWhyAFileCannotBeRead) {
                 ElementsAre(folder + ": cannot be read: Is a directory" + cure));
     const std::string huge = directory.write("huge.toml", std::string(5 << 20, '\n'));
     EXPECT_THAT(problemsOf(huge), ElementsAre(huge + ": cannot be read: File too large" + cure));
+}
+
+/// The blocks of a page that are indented as code and have a table of a configuration file.
+std::vector<std::string> examples(const std::string& page) {
+    std::ifstream stream(page);
+    std::vector<std::string> blocks = {""};
+    for (std::string line; std::getline(stream, line);) {
+        if (line.starts_with("    ")) {
+            blocks.back() += line.substr(4) + "\n";
+        } else if (!line.empty()) {
+            blocks.emplace_back();
+        } else if (!blocks.back().empty()) {
+            blocks.back() += "\n";
+        }
+    }
+    std::erase_if(blocks, [](const std::string& block) {
+        return !block.starts_with("[[") && block.find("\n[[") == std::string::npos;
+    });
+    return blocks;
+}
+
+TEST(ConfigFile, TheExamplesOfTheDocumentationAreAccepted) {
+    const std::vector<std::string> blocks = examples(ZRM_DOCS "/configuration.md");
+    EXPECT_EQ(blocks.size(), 3u);
+    for (const std::string& block : blocks) {
+        EXPECT_THAT(refused(block), IsEmpty()) << block;
+    }
 }
 
 } // namespace

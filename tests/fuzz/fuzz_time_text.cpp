@@ -1,4 +1,4 @@
-#include "host/config/EntryTime.h"
+#include "host/config/TimeText.h"
 
 #include <cstdint>
 #include <cstdlib>
@@ -10,10 +10,10 @@
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const std::string_view text(reinterpret_cast<const char*>(data), size);
-    const std::optional<std::string> stamp = EntryTime::toStamp(text);
+    const std::optional<std::string> stamp = TimeText::toStamp(text);
     if (stamp &&
         (stamp->size() != 16 || stamp->find_first_not_of("0123456789") != std::string::npos ||
-         EntryTime::toStamp(*stamp) != stamp)) {
+         TimeText::toStamp(*stamp) != stamp)) {
         std::abort();
     }
     return 0;

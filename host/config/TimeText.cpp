@@ -1,4 +1,4 @@
-#include "host/config/EntryTime.h"
+#include "host/config/TimeText.h"
 
 #include <array>
 #include <cstdio>
@@ -144,7 +144,7 @@ std::optional<std::string> checkedStamp(std::string_view text) {
 
 } // namespace
 
-std::optional<std::string> EntryTime::toStamp(std::string_view text) {
+std::optional<std::string> TimeText::toStamp(std::string_view text) {
     if (text.size() == 16 && text.find_first_not_of("0123456789") == std::string_view::npos) {
         return checkedStamp(text);
     }

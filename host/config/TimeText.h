@@ -1,12 +1,12 @@
-#ifndef ZRM_HOST_ENTRY_TIME_H
-#define ZRM_HOST_ENTRY_TIME_H
+#ifndef ZRM_HOST_TIME_TEXT_H
+#define ZRM_HOST_TIME_TEXT_H
 
 #include <optional>
 #include <string>
 #include <string_view>
 
 /// Times as operators write them. Stateless.
-class EntryTime {
+class TimeText {
 public:
     /// The 16-character time stamp of a time that is written as one already, or as ISO 8601: a
     /// date, or a date and a time ("T" or a blank between them, seconds optional, a fraction is

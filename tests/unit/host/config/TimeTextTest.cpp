@@ -1,4 +1,4 @@
-#include "host/config/EntryTime.h"
+#include "host/config/TimeText.h"
 
 #include <gtest/gtest.h>
 
@@ -9,7 +9,7 @@
 namespace {
 
 std::string stampOf(const std::string& text) {
-    return EntryTime::toStamp(text).value_or("none");
+    return TimeText::toStamp(text).value_or("none");
 }
 
 /// Sets the time zone while it lives.
@@ -34,7 +34,7 @@ private:
     std::string m_before;
 };
 
-TEST(EntryTime, TakesLocalTimesAsTheyStand) {
+TEST(TimeText, TakesLocalTimesAsTheyStand) {
     EXPECT_EQ(stampOf("2026-11-20T07:03:09"), "1261120070309000");
     EXPECT_EQ(stampOf("2026-11-20 07:03:09"), "1261120070309000");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09.412"), "1261120070309000");
@@ -44,7 +44,7 @@ TEST(EntryTime, TakesLocalTimesAsTheyStand) {
     EXPECT_EQ(stampOf("2024-02-29"), "1240229000000000");
 }
 
-TEST(EntryTime, TurnsTimesWithAZoneIntoLocalOnes) {
+TEST(TimeText, TurnsTimesWithAZoneIntoLocalOnes) {
     const TimeZone zone("CET-1");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09Z"), "1261120080309000");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09.5Z"), "1261120080309000");
@@ -55,13 +55,13 @@ TEST(EntryTime, TurnsTimesWithAZoneIntoLocalOnes) {
     EXPECT_EQ(stampOf("2024-02-28T23:30:00Z"), "1240229003000000");
 }
 
-TEST(EntryTime, TakesTimeStamps) {
+TEST(TimeText, TakesTimeStamps) {
     EXPECT_EQ(stampOf("1261120070309000"), "1261120070309000");
     EXPECT_EQ(stampOf("0991231235959999"), "0991231235959999");
     EXPECT_EQ(stampOf("0000000000000000"), "0000000000000000");
 }
 
-TEST(EntryTime, RefusesEverythingElse) {
+TEST(TimeText, RefusesEverythingElse) {
     for (const char* const text : {"",
                                    "now",
                                    "2026",
