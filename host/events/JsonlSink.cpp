@@ -40,9 +40,9 @@ void JsonlSink::fail(const char* call, int number) {
 
 bool JsonlSink::open() {
     TraceScope trace(anchor);
-    m_fd = m_isStandardOutput
-               ? STDOUT_FILENO
-               : ::open(m_path.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0640);
+    // Without waiting: a pipe in the file system that nobody reads must not hold the thread.
+    constexpr int flags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK;
+    m_fd = m_isStandardOutput ? STDOUT_FILENO : ::open(m_path.c_str(), flags, 0640);
     if (m_fd == -1) {
         fail("open", errno);
         return trace.result(false);

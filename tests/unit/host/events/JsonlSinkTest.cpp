@@ -169,6 +169,19 @@ TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
     EXPECT_EQ(content(directory.file("moved")), lines);
 }
 
+TEST_F(JsonlSinkTest, APipeThatNobodyReadsIsAFailureUntilSomebodyDoes) {
+    ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
+    JsonlSink sink(path, format);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), "open failed: No such device or address");
+    const int reader = open(path.c_str(), O_RDONLY | O_NONBLOCK);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    std::string text(lines.size() + 1, '\0');
+    text.resize(static_cast<std::size_t>(read(reader, text.data(), text.size())));
+    EXPECT_EQ(text, lines);
+    close(reader);
+}
+
 /// Standard output is a pipe while the test runs.
 class JsonlSinkPipeTest : public JsonlSinkTest {
 protected:
