@@ -23,32 +23,32 @@ constexpr const char* constantDisplayed = ">> constant displayed <<";
 /// One line of the system's limits: a constant or the value of a selector. Formats of constants
 /// take an int, the others a long and a text.
 struct Limit {
-    enum Source { CONSTANT, SYSCONF } source;
     const char* format;
+    enum Source { CONSTANT, SYSCONF } source;
     int value; ///< the constant or the selector
 };
 
-constexpr Limit posixVersion{Limit::SYSCONF, "\nPOSIX_VERSION\t\t= %ld\tPOSIX version. %s",
+constexpr Limit posixVersion{"\nPOSIX_VERSION\t\t= %ld\tPOSIX version. %s", Limit::SYSCONF,
                              _SC_VERSION};
 
 constexpr Limit systemLimits[] = {
-    {Limit::CONSTANT, "\nCHAR_BIT\t\t= %d\tNo. of bits per char.", 8},
-    {Limit::CONSTANT, "\nINT_MAX\t\t\t= %d\tMax. value of int.", 2147483647},
+    {"\nCHAR_BIT\t\t= %d\tNo. of bits per char.", Limit::CONSTANT, 8},
+    {"\nINT_MAX\t\t\t= %d\tMax. value of int.", Limit::CONSTANT, 2147483647},
     // The format shows the low half of the number.
-    {Limit::CONSTANT, "\nLONG_MAX\t\t= %d\tMax. value of long.",
+    {"\nLONG_MAX\t\t= %d\tMax. value of long.", Limit::CONSTANT,
      static_cast<int>(9223372036854775807LL)},
-    {Limit::SYSCONF, "\nTHREADS\t\t\t= %ld\tThread support provided. %s", _SC_THREADS},
-    {Limit::SYSCONF, "\nTHREAD_THREADS_MAX\t= %ld\tMax. no. threads per process. %s",
+    {"\nTHREADS\t\t\t= %ld\tThread support provided. %s", Limit::SYSCONF, _SC_THREADS},
+    {"\nTHREAD_THREADS_MAX\t= %ld\tMax. no. threads per process. %s", Limit::SYSCONF,
      _SC_THREAD_THREADS_MAX},
-    {Limit::CONSTANT, "\nSYS1_PTHREAD_DRAFT\t= %d\tPOSIX thread draft.", 199506},
-    {Limit::SYSCONF, "\nARG_MAX\t\t\t= %ld\tMax. length of args to exec(). %s", _SC_ARG_MAX},
-    {Limit::SYSCONF, "\nCHILD_MAX\t\t= %ld\tMax. no. processes per real uid. %s", _SC_CHILD_MAX},
-    {Limit::SYSCONF, "\nOPEN_MAX\t\t= %ld\tMax. no. open files per process. %s", _SC_OPEN_MAX},
-    {Limit::SYSCONF, "\nSTREAM_MAX\t\t= %ld\tMax. no. std. i/o streams per process. %s",
+    {"\nSYS1_PTHREAD_DRAFT\t= %d\tPOSIX thread draft.", Limit::CONSTANT, 199506},
+    {"\nARG_MAX\t\t\t= %ld\tMax. length of args to exec(). %s", Limit::SYSCONF, _SC_ARG_MAX},
+    {"\nCHILD_MAX\t\t= %ld\tMax. no. processes per real uid. %s", Limit::SYSCONF, _SC_CHILD_MAX},
+    {"\nOPEN_MAX\t\t= %ld\tMax. no. open files per process. %s", Limit::SYSCONF, _SC_OPEN_MAX},
+    {"\nSTREAM_MAX\t\t= %ld\tMax. no. std. i/o streams per process. %s", Limit::SYSCONF,
      _SC_STREAM_MAX},
-    {Limit::SYSCONF, "\nSAVED_IDS\t\t= %ld\tImplementation support for saved set-id's. %s",
+    {"\nSAVED_IDS\t\t= %ld\tImplementation support for saved set-id's. %s", Limit::SYSCONF,
      _SC_SAVED_IDS},
-    {Limit::SYSCONF, "\nCLK_TCK\t\t\t= %ld\tNo. of clock ticks per second. %s", _SC_CLK_TCK},
+    {"\nCLK_TCK\t\t\t= %ld\tNo. of clock ticks per second. %s", Limit::SYSCONF, _SC_CLK_TCK},
 };
 
 /// One line of the limits of the current directory's file system.

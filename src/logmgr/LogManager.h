@@ -75,6 +75,8 @@ private:
     void buildLogObjects(unsigned validCount);
     void buildLogObject(const ValidLog& log);
     void deleteMarkedLogs();
+    /// Deletes the chain from its tail to `log`, which is its member number `depth`; the manager
+    /// gives the head and 1.
     void deleteNextLog(LogFile* log, unsigned depth);
     void deleteLogObject(LogFile* log);
 

@@ -134,24 +134,32 @@ void LogManager::discardValidLogs() {
     if (first == nullptr) {
         return;
     }
-    while (first->prev() != first) {
-        delete first->prev();
+    for (ValidLog* log = first->prev(); log != first;) {
+        ValidLog* const previous = log->prev();
+        delete log;
+        log = previous;
     }
     delete first;
 }
 
 void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
     TraceScope trace(anchor);
+    // Down to the tail, counting, before anything is deleted.
+    const unsigned firstDepth = depth;
+    for (; depth <= NumLogs && log->next() != FirstLogObject; ++depth) {
+        log = log->next();
+    }
     if (depth > NumLogs) {
         trace.error()("Log object chain corrupted. Expected number of logs = %d; actual number = "
                       "%d. Agent is terminating.",
                       static_cast<int>(NumLogs.load()), static_cast<int>(depth));
         std::exit(-1);
     }
-    if (log->next() != FirstLogObject) {
-        deleteNextLog(log->next(), depth + 1);
+    for (; depth >= firstDepth; --depth) {
+        auto* const previous = static_cast<LogFile*>(log->prev());
+        deleteLogObject(log);
+        log = previous;
     }
-    deleteLogObject(log);
 }
 
 void LogManager::deleteLogObject(LogFile* log) {

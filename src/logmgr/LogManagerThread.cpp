@@ -19,23 +19,25 @@ TRC1_Anchor anchor{"LogManagerThread.cpp"};
 constexpr int serverUpSeconds = 10; ///< how long a stop waits for the framework's server
 
 /// Ends the process when a step of the manager's start failed.
-void require(const TraceScope& trace, int code, const char* failure) {
+void require(const TraceScope& trace, int code, const char* failure, int line = __builtin_LINE()) {
     if (code != 0) {
         const ErrorText error(code);
-        trace.error()("%s Return code = %d; %s.  Use the return code and message to investigate "
-                      "the failure.  Agent is terminating.",
-                      failure, error.number(), error.text());
+        trace.error(line)(
+            "%s Return code = %d; %s.  Use the return code and message to investigate "
+            "the failure.  Agent is terminating.",
+            failure, error.number(), error.text());
         std::exit(-1);
     }
 }
 
 /// Traces a step of the manager's stop, which goes on in any case.
-void report(const TraceScope& trace, int code, const char* failure, const char* success) {
+void report(const TraceScope& trace, int code, const char* failure, const char* success,
+            int line = __builtin_LINE()) {
     if (code != 0) {
         const ErrorText error(code);
-        trace.error()("%s Return code = %d; %s", failure, error.number(), error.text());
+        trace.error(line)("%s Return code = %d; %s", failure, error.number(), error.text());
     } else {
-        trace.detail()("%s", success);
+        trace.detail(line)("%s", success);
     }
 }
 

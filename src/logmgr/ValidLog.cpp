@@ -19,8 +19,7 @@ TRC1_Anchor anchor{"ValidLog.cpp"};
 
 constexpr std::string_view logTypes = "SEAU";
 constexpr std::string_view typesWithProcedure = "EU";
-constexpr const char* nameToken = "${@}"; ///< stands for the log's name in a procedure
-constexpr std::size_t nameTokenLength = 4;
+constexpr std::string_view nameToken = "${@}"; ///< stands for the log's name in a procedure
 
 /// The fields of a configuration line, numbered from 1.
 enum Field : int {
@@ -248,18 +247,18 @@ void ValidLog::checkForDups(const ValidLog* head) {
 void ValidLog::setLogProcedure(const char* procedure) {
     TraceScope trace(anchor);
     std::size_t occurrences = 0;
-    for (const char* at = procedure; (at = std::strstr(at, nameToken)) != nullptr;
-         at += nameTokenLength) {
+    for (std::string_view rest = procedure; rest.find(nameToken) != std::string_view::npos;
+         rest.remove_prefix(rest.find(nameToken) + nameToken.size())) {
         ++occurrences;
     }
     if (occurrences == 0) {
         LogBase::setLogProcedure(procedure);
         return;
     }
-    const char* const logName = fileNameLocal();
-    const std::size_t size = std::strlen(procedure) + occurrences * std::strlen(logName) -
-                             occurrences * nameTokenLength + 1;
-    const std::unique_ptr<char[]> substituted(new (std::nothrow) char[size]);
+    const std::string_view logName = fileNameLocal();
+    const std::size_t size =
+        std::strlen(procedure) + occurrences * logName.size() - occurrences * nameToken.size() + 1;
+    const std::unique_ptr<char[]> substituted(new (std::nothrow) char[size]());
     if (!substituted) {
         trace.error()("Memory allocation of %d bytes failed. Agent is terminating.",
                       static_cast<int>(size));
@@ -267,18 +266,16 @@ void ValidLog::setLogProcedure(const char* procedure) {
     }
     char* pDest = substituted.get();
     [[maybe_unused]] const char* const pLastByte = pDest + size - 1;
-    const char* from = procedure;
-    while (const char* const at = std::strstr(from, nameToken)) {
-        const auto numChars = static_cast<std::size_t>(at - from);
+    std::string_view rest = procedure;
+    for (std::size_t numChars = rest.find(nameToken); numChars != std::string_view::npos;
+         numChars = rest.find(nameToken)) {
         assert((pDest + numChars - 1) < pLastByte);
-        std::memcpy(pDest, from, numChars);
-        pDest += numChars;
-        assert((pDest + std::strlen(logName) - 1) < pLastByte);
-        std::memcpy(pDest, logName, std::strlen(logName));
-        pDest += std::strlen(logName);
-        from = at + nameTokenLength;
+        pDest += rest.copy(pDest, numChars);
+        assert((pDest + logName.size() - 1) < pLastByte);
+        pDest += logName.copy(pDest, logName.size());
+        rest.remove_prefix(numChars + nameToken.size());
     }
-    std::strcpy(pDest, from);
+    rest.copy(pDest, rest.size());
     LogBase::setLogProcedure(substituted.get());
 }
 

@@ -160,8 +160,9 @@ TEST_F(LogManagerTest, DumpsAllFieldsWhateverTheLevel) {
         "\tAgentServerUp\t\t\t= 0\n\tAgentServerNotUp\t\t= \n\tDebugLog\t\t\t= \"%s\"\n"
         "\tDebugLogP\t\t\t= %p\n",
         static_cast<void*>(manager.get()), config.c_str(), std::ctime(&epoch), syslogConfig.c_str(),
-        std::ctime(&epoch), static_cast<void*>(manager->getNextLogObject(nullptr, 0)), nullptr,
-        directory.file("debug.log").c_str(), static_cast<void*>(manager->debugLogStream()));
+        std::ctime(&epoch), static_cast<void*>(manager->getNextLogObject(nullptr, 0)),
+        static_cast<void*>(nullptr), directory.file("debug.log").c_str(),
+        static_cast<void*>(manager->debugLogStream()));
     EXPECT_THAT(trace.messages(), ElementsAre(expected));
     manager->endRequest();
 }
