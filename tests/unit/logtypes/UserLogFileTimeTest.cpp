@@ -75,7 +75,7 @@ TEST_F(UserLogTime, MonthsAreNumbersOrNames) {
     constexpr const char* names[] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
                                      "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};
     for (int month = 1; month <= 12; ++month) {
-        char stamp[20];
+        char stamp[64];
         std::snprintf(stamp, sizeof stamp, "106%02d03040506000", month);
         _EntryTimeBuffers texts{"06", "", "3", "4", "5", "6"};
         put(texts.month, std::to_string(month));
@@ -121,7 +121,7 @@ TEST_F(UserLogTime, DaysDependOnTheMonth) {
     for (int month = 1; month <= 12; ++month) {
         _EntryTimeBuffers texts{"01", "", "", "4", "5", "6"};
         put(texts.month, std::to_string(month));
-        char stamp[20];
+        char stamp[64];
         put(texts.day, std::to_string(lengths[month - 1]));
         std::snprintf(stamp, sizeof stamp, "101%02d%02d040506000", month, lengths[month - 1]);
         EXPECT_EQ(timeOf(texts), stamp);
