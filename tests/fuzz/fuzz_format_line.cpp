@@ -21,7 +21,7 @@ namespace {
 constexpr const char* formats[] = {
     R"(A,"%4d-%2d-%2dT%2d:%2d:%2d%*[^ ] %s %[^:]: %[^\n]",)"
     "year month day hour minute second type source description",
-    R"(A,"%s %d %[^:]:%d:%f %5c %(30)%s %hd %x %lf %Lg",)"
+    R"(A,"%s %d %[^:]:%d:%f %5c %(30)s %hd %x %lf %Lg",)"
     "month day hour minute second class system type = \"%05hd\" source = \"%#X\" "
     "description = \"%'12.3lf\" description = \" %Lg\"",
     R"(A,"%[^\n]",description)",
