@@ -50,9 +50,11 @@ protected:
     ~UserLogTest() override { gSystemName = nullptr; }
 
     /// Makes the log with this format anew.
-    void makeLog(const std::string& format) {
+    void makeLog(const std::string& format) { makeLogOfLine(" ;N ;U ;" + format); }
+    /// Makes it of a configuration line's fields behind the file's name.
+    void makeLogOfLine(const std::string& fields) {
         m_log.reset();
-        m_line = validLog(m_path, " ;N ;U ;" + format);
+        m_line = validLog(m_path, fields);
         const Fault fault("fopen", EACCES);
         m_log = std::make_unique<UserLogFile>(*m_line, nullptr);
         waitForEnd(*m_log);
