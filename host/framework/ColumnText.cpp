@@ -8,7 +8,14 @@
 
 namespace {
 
+/// Most columns are mostly padding, so eight blanks are taken at a time.
 constexpr std::uint64_t kBlanks = 0x2020202020202020;
+
+std::uint64_t wordAt(const char* bytes) noexcept {
+    std::uint64_t word;
+    std::memcpy(&word, bytes, sizeof word);
+    return word;
+}
 
 /// Difference of the text's first byte that is not a blank from a blank; 0 when there is none.
 int compareWithBlanks(std::string_view text) noexcept {
@@ -21,14 +28,8 @@ int compareWithBlanks(std::string_view text) noexcept {
 
 std::string_view ColumnText::withoutTrailingBlanks(std::string_view text) noexcept {
     std::size_t size = text.size();
-    // Most columns are mostly padding, so eight blanks are taken at a time.
-    while (size >= sizeof kBlanks) {
-        std::uint64_t word;
-        std::memcpy(&word, text.data() + size - sizeof word, sizeof word);
-        if (word != kBlanks) {
-            break;
-        }
-        size -= sizeof word;
+    while (size >= sizeof kBlanks && wordAt(text.data() + size - sizeof kBlanks) == kBlanks) {
+        size -= sizeof kBlanks;
     }
     while (size > 0 && text[size - 1] == ' ') {
         --size;
@@ -42,6 +43,9 @@ std::string_view ColumnText::unpadded(const char* field, std::size_t width) noex
 
 bool ColumnText::isPadding(const char* rest, std::size_t width) noexcept {
     std::size_t position = 0;
+    while (position + sizeof kBlanks <= width && wordAt(rest + position) == kBlanks) {
+        position += sizeof kBlanks;
+    }
     while (position < width && rest[position] == ' ') {
         ++position;
     }

@@ -196,10 +196,7 @@ bool CompiledCondition::startsWith(const char* field) const noexcept {
 }
 
 bool CompiledCondition::contains(const char* field) const noexcept {
-    std::string_view text(field, strnlen(field, m_width));
-    if (m_value.ends_with(' ')) {
-        text = ColumnText::withoutTrailingBlanks(text);
-    }
+    const std::string_view text = ColumnText::unpadded(field, m_width);
     return memmem(text.data(), text.size(), m_value.data(), m_value.size()) != nullptr;
 }
 

@@ -23,6 +23,10 @@ TEST(ColumnText, FindsTheEndOfTheTextBehindAnyAmountOfPadding) {
             const std::string text = std::string(size, 'x');
             const std::string field = text + std::string(padding, ' ');
             EXPECT_EQ(ColumnText::unpadded(field.data(), field.size()), text);
+            EXPECT_EQ(ColumnText::isPadding(field.data(), field.size()), size == 0);
+            const std::string reversed(field.rbegin(), field.rend());
+            EXPECT_EQ(ColumnText::isPadding(reversed.data(), padding), true);
+            EXPECT_EQ(ColumnText::isPadding((reversed + "!").data(), padding + 1), false);
         }
     }
 }
