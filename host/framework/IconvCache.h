@@ -11,7 +11,7 @@ namespace IconvCache {
 
 /// What iconv_open returns when it fails.
 inline iconv_t none() noexcept {
-    return reinterpret_cast<iconv_t>(-1); // NOLINT: the value that POSIX gives
+    return reinterpret_cast<iconv_t>(-1);
 }
 
 /// The converter of this pair in its initial state; none() when the system has no such converter.

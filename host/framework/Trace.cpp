@@ -36,7 +36,7 @@ void TRC1_VPrintf(const TRC1_Anchor& anchor, int line, const char* format,
         std::timespec now{};
         clock_gettime(CLOCK_REALTIME, &now);
         TraceRecord record(now, gettid(), anchor.unit, line);
-        record.add(format, arguments);
+        record.addList(format, arguments);
         TraceOutput::write(record.finish(), now.tv_sec);
     }
     errno = savedErrno;

@@ -69,7 +69,7 @@ std::string TraceLevels::parse(std::string_view text) {
         if (word.empty()) {
             continue;
         }
-        const std::string error = parsed.parseWord(word);
+        std::string error = parsed.parseWord(word);
         if (!error.empty()) {
             return error;
         }

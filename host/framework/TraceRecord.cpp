@@ -15,11 +15,11 @@ TraceRecord::TraceRecord(const std::timespec& moment, long thread, const char* u
 void TraceRecord::add(const char* format, ...) noexcept {
     std::va_list arguments;
     va_start(arguments, format);
-    add(format, arguments);
+    addList(format, arguments);
     va_end(arguments);
 }
 
-void TraceRecord::add(const char* format, std::va_list arguments) noexcept {
+void TraceRecord::addList(const char* format, std::va_list arguments) noexcept {
     const std::size_t room = kMaxSize - m_size;
     const int length = std::vsnprintf(m_text + m_size, room, format, arguments);
     // The place of the terminator is the newline's at last.

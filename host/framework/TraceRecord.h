@@ -16,7 +16,7 @@ public:
     TraceRecord(const std::timespec& moment, long thread, const char* unit, int line) noexcept;
 
     /// Adds the text.
-    void add(const char* format, std::va_list arguments) noexcept
+    void addList(const char* format, std::va_list arguments) noexcept
         __attribute__((format(printf, 2, 0)));
     void add(const char* format, ...) noexcept __attribute__((format(printf, 2, 3)));
 
