@@ -2,7 +2,7 @@
 
 #include "AgentDoubles.h"
 #include "LocaleDouble.h"
-#include "monitor/LogFile.h"
+#include "logtypes/createLogFile.h"
 
 #include <algorithm>
 #include <chrono>
@@ -83,6 +83,12 @@ std::vector<std::string> LogManagerFixture::logs() {
     }
     manager->endRequest();
     return names;
+}
+
+std::unique_ptr<LogFile> LogManagerFixture::strangerBehind(LogFile* head) {
+    std::string line = c;
+    const ValidLog log(CONFIG_USER, line.data(), nullptr);
+    return std::unique_ptr<LogFile>(createLogFile(log, head));
 }
 
 std::vector<std::string>

@@ -4,6 +4,7 @@
 #include "logmgr/LogManager.h"
 
 #include "agent/framework/trace.h"
+#include "monitor/LogFile.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -39,6 +40,8 @@ protected:
     void refresh();
     /// The names of the manager's logs, in the order of the chain.
     std::vector<std::string> logs();
+    /// A log that joins the chain behind the manager's back, and leaves it again.
+    std::unique_ptr<LogFile> strangerBehind(LogFile* head);
     /// The recorded messages that begin with one of these texts.
     std::vector<std::string> messagesThatBegin(const std::vector<std::string>& beginnings) const;
     /// The recorded messages but for state dumps, which begin with a newline.
