@@ -58,6 +58,20 @@ bool namesLog(const Condition& condition) {
     return std::find(columns.begin(), columns.end(), condition.column) != columns.end();
 }
 
+/// The answer to a request whose handler threw.
+void failed(const httplib::Request& request, httplib::Response& response,
+            const std::exception_ptr& failure) {
+    TraceScope trace(anchor);
+    try {
+        std::rethrow_exception(failure);
+    } catch (const std::exception& exception) {
+        trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
+    } catch (...) {
+        trace.error()("Request for %s failed.", request.path.c_str());
+    }
+    answer(response, {500, "the request failed", ""});
+}
+
 /// Two servers on one port would share its clients: an address in use is refused.
 void setSocketOptions(socket_t socket) {
     const int on = 1;
@@ -122,10 +136,7 @@ void HttpServer::Implementation::addRoutes() {
                     ""});
         }
     });
-    m_server.set_exception_handler(
-        [](const httplib::Request&, httplib::Response& response, std::exception_ptr) {
-            answer(response, {500, "the request failed", ""});
-        });
+    m_server.set_exception_handler(failed);
 }
 
 HttpServer::Implementation::Handled

@@ -68,7 +68,8 @@ std::optional<Problem> checkForm(const json& filter, const std::string& field) {
     }
     for (const auto& [key, value] : filter.items()) {
         if (key != "column" && key != "op" && key != "value") {
-            return bad("unknown member; a filter has column, op and value", field + "." + key);
+            return bad("unknown member; a filter has column, op and value",
+                       std::string(field).append(".").append(key));
         }
     }
     for (const char* const key : {"column", "op"}) {

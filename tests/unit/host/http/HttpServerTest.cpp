@@ -210,8 +210,11 @@ TEST_F(HttpServerTest, RefusesLongBodies) {
 }
 
 TEST_F(HttpServerTest, ASampleThatFailsIsAnInternalError) {
+    trace.setLevel(TRC1_ERROR);
     source.onTake = [](auto, auto) -> SampleSource::Rows { throw std::runtime_error("secret"); };
     expectProblem(sample("RMMONLOG", "{}"), 500, "the request failed", "");
+    EXPECT_THAT(trace.messages(),
+                testing::ElementsAre("Request for /api/v1/tables/RMMONLOG/sample failed: secret"));
 }
 
 TEST_F(HttpServerTest, SamplesWaitSideBySide) {
