@@ -57,7 +57,8 @@ TEST_F(LogManagerTest, HasDefaultsForAnUnsetEnvironment) {
                             "No \"AGENT_DEBUG_LOG\" environment variable specified. Agent debug "
                             "mode is OFF."));
     manager->printSelf();
-    EXPECT_THAT(trace.messages().back(), HasSubstr("SyslogConfFile\t\t\t= \"/etc/syslog.conf\""));
+    EXPECT_THAT(trace.messages(),
+                Contains(HasSubstr("SyslogConfFile\t\t\t= \"/etc/syslog.conf\"")));
 }
 
 TEST_F(LogManagerTest, TakesEmptyEnvironmentVariablesForUnset) {
