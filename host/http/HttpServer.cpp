@@ -9,20 +9,24 @@
 
 #include <algorithm>
 #include <array>
-#include <atomic>
+#include <condition_variable>
 #include <exception>
 #include <iterator>
+#include <mutex>
 #include <optional>
 #include <string_view>
 #include <thread>
 #include <utility>
 
 #include <httplib.h>
+#include <signal.h>
 #include <sys/socket.h>
 
 namespace {
 
 TRC1_Anchor anchor{"HttpServer.cpp"};
+
+using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t largestBody = 64 * 1024;    ///< bytes
 constexpr std::chrono::seconds networkTimeout{5}; ///< for a client that sends or reads slowly
@@ -58,6 +62,17 @@ bool namesLog(const Condition& condition) {
     return std::find(columns.begin(), columns.end(), condition.column) != columns.end();
 }
 
+/// The action of SIGPIPE as it was: the library sets it for the process, and children would
+/// inherit that. The threads of the process block the signal anyway.
+class BrokenPipeAction {
+public:
+    BrokenPipeAction() { sigaction(SIGPIPE, nullptr, &m_action); }
+    void restore() const { sigaction(SIGPIPE, &m_action, nullptr); }
+
+private:
+    struct sigaction m_action {};
+};
+
 /// The answer to a request whose handler threw.
 void failed(const httplib::Request& request, httplib::Response& response,
             const std::exception_ptr& failure) {
@@ -82,16 +97,20 @@ void setSocketOptions(socket_t socket) {
 
 class HttpServer::Implementation {
 public:
-    explicit Implementation(SampleSource& source) : m_source(source) { addRoutes(); }
+    explicit Implementation(SampleSource& source);
+    ~Implementation();
+    Implementation(const Implementation&) = delete;
+    Implementation& operator=(const Implementation&) = delete;
 
     std::string start(ListenAddress address, ApiToken token);
-    void stop();
-    void abandon(std::chrono::steady_clock::time_point limit) { m_active.close(limit); }
+    void stop(Clock::time_point limit);
+    void abandon(Clock::time_point limit) { m_active.close(limit); }
     std::uint16_t port() const noexcept { return m_port; }
 
 private:
     using Handled = httplib::Server::HandlerResponse;
 
+    void serve();
     void addRoutes();
     Handled guard(const httplib::Request& request, httplib::Response& response) const;
     void sample(const httplib::Request& request, httplib::Response& response,
@@ -102,12 +121,36 @@ private:
 
     SampleSource& m_source;
     ActiveSamples m_active;
+    const BrokenPipeAction m_brokenPipe; ///< before the server, which changes the action
     httplib::Server m_server;
     std::optional<RequestGuard> m_guard; ///< set before the server's threads exist
     std::uint16_t m_port = 0;
     std::thread m_thread;
-    std::atomic<bool> m_hasEnded{false};
+    std::mutex m_mutex;
+    std::condition_variable m_changed;
+    bool m_hasEnded = false; ///< the server's threads have nothing more to do
 };
+
+HttpServer::Implementation::Implementation(SampleSource& source) : m_source(source) {
+    m_brokenPipe.restore();
+    addRoutes();
+}
+
+HttpServer::Implementation::~Implementation() {
+    if (m_thread.joinable()) {
+        m_server.stop();
+        m_thread.join();
+    }
+}
+
+void HttpServer::Implementation::serve() {
+    m_server.listen_after_bind();
+    {
+        const std::lock_guard guard(m_mutex);
+        m_hasEnded = true;
+    }
+    m_changed.notify_all();
+}
 
 void HttpServer::Implementation::addRoutes() {
     m_server.set_socket_options(setSocketOptions);
@@ -215,31 +258,36 @@ std::string HttpServer::Implementation::start(ListenAddress address, ApiToken to
     }
     m_port = address.port;
     m_guard.emplace(address, std::move(token));
-    m_thread = std::thread([this] {
-        m_server.listen_after_bind();
-        m_hasEnded = true;
-    });
+    m_thread = std::thread([this] { serve(); });
     // A stop before the server runs would be lost.
+    std::unique_lock lock(m_mutex);
     while (!m_server.is_running() && !m_hasEnded) {
-        std::this_thread::yield();
+        m_changed.wait_for(lock, std::chrono::milliseconds(1));
     }
     trace.detail()("Listening at %s.", address.text().c_str());
     return "";
 }
 
-void HttpServer::Implementation::stop() {
-    if (m_thread.joinable()) {
-        m_server.stop();
+void HttpServer::Implementation::stop(Clock::time_point limit) {
+    TraceScope trace(anchor);
+    if (!m_thread.joinable()) {
+        return;
+    }
+    m_server.stop();
+    std::unique_lock lock(m_mutex);
+    if (m_changed.wait_until(lock, limit, [&] { return m_hasEnded; })) {
+        lock.unlock();
         m_thread.join();
+    } else {
+        trace.detail()("Clients are still being served.");
+        m_active.close(limit);
     }
 }
 
 HttpServer::HttpServer(SampleSource& source)
     : m_implementation(std::make_unique<Implementation>(source)) {}
 
-HttpServer::~HttpServer() {
-    m_implementation->stop();
-}
+HttpServer::~HttpServer() = default;
 
 std::string HttpServer::start(const ListenAddress& address, ApiToken token) {
     return m_implementation->start(address, std::move(token));
@@ -249,10 +297,10 @@ std::uint16_t HttpServer::port() const noexcept {
     return m_implementation->port();
 }
 
-void HttpServer::stop() {
-    m_implementation->stop();
+void HttpServer::stop(Clock::time_point limit) {
+    m_implementation->stop(limit);
 }
 
-void HttpServer::abandon(std::chrono::steady_clock::time_point limit) {
+void HttpServer::abandon(Clock::time_point limit) {
     m_implementation->abandon(limit);
 }

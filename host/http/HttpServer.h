@@ -18,7 +18,7 @@ public:
     explicit HttpServer(SampleSource& source);
     HttpServer(const HttpServer&) = delete;
     HttpServer& operator=(const HttpServer&) = delete;
-    /// Stops the server.
+    /// Stops the server and waits for its threads.
     ~HttpServer();
 
     /// Begins to listen and to serve, on threads of its own. Returns what is wrong, empty when
@@ -28,9 +28,10 @@ public:
     /// The port at which it listens.
     std::uint16_t port() const noexcept;
 
-    /// Ends the serving: requests under way are answered first. Any number of times; not on a
-    /// thread of the server.
-    void stop();
+    /// Ends the serving: requests under way are answered first. At the limit it returns although
+    /// a client is still being served; no sample begins from then on. Any number of times; not on
+    /// a thread of the server.
+    void stop(std::chrono::steady_clock::time_point limit);
 
     /// For the end of the process on any thread, also on one of the server's: begins no further
     /// samples and waits for those under way, at most until the limit.

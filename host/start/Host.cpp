@@ -43,7 +43,10 @@ void Host::setState(State state) {
 
 int Host::run() {
     TraceScope trace(anchor);
-    m_mainThread = std::this_thread::get_id();
+    {
+        const std::lock_guard guard(m_mutex);
+        m_mainThread = std::this_thread::get_id();
+    }
     // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
     if (std::atexit([] { Host::instance().processEnds(); }) != 0) {
         trace.error()("Error establishing the host's exit routine.");
@@ -72,10 +75,13 @@ bool Host::begin() {
     if (serving == nullptr) {
         return false;
     }
-    serving->startHttp(m_config);
-    const std::lock_guard guard(m_mutex);
-    m_serving = std::move(serving);
-    m_state = SERVING;
+    {
+        const std::lock_guard guard(m_mutex);
+        m_serving = std::move(serving);
+        m_state = SERVING;
+        m_isBusy = true;
+    }
+    m_serving->startHttp(m_config);
     return true;
 }
 
@@ -151,8 +157,8 @@ void Host::requestStop() {
 
 void Host::processEnds() {
     const Clock::time_point limit = Clock::now() + endLimit;
-    const bool isMain = std::this_thread::get_id() == m_mainThread;
     std::unique_lock lock(m_mutex);
+    const bool isMain = std::this_thread::get_id() == m_mainThread;
     m_processEnds = true;
     if (m_state == SERVING) {
         m_serving->limitWaits(limit);

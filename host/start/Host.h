@@ -64,7 +64,7 @@ private:
     std::unique_ptr<Serving> m_serving; ///< set once; what it points to guards itself
     State m_state = BEFORE;
     bool m_stopRequested = false;
-    bool m_isBusy = false;      ///< the main thread is within a tick
+    bool m_isBusy = false;      ///< the main thread works on what is served
     bool m_processEnds = false; ///< the process ends without the main thread
     std::thread::id m_mainThread;
 };

@@ -79,7 +79,7 @@ void Serving::stop(Clock::time_point limit) {
     TraceScope trace(anchor);
     // Released first, so that none holds the table's lock when the situations are closed.
     limitWaits(limit);
-    m_http.stop();
+    m_http.stop(limit);
     m_situations.close();
     m_delivery.finish(limit);
 }

@@ -8,6 +8,7 @@
 #include <atomic>
 #include <chrono>
 #include <condition_variable>
+#include <csignal>
 #include <functional>
 #include <future>
 #include <mutex>
@@ -41,7 +42,10 @@ public:
 
 class HttpServerTest : public testing::Test {
 protected:
-    void SetUp() override { ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), ""); }
+    void SetUp() override {
+        std::signal(SIGPIPE, SIG_IGN); // the agent's threads block it
+        ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+    }
 
     httplib::Client client() const {
         httplib::Client result("127.0.0.1", server.port());
@@ -68,6 +72,8 @@ protected:
         EXPECT_EQ(document["detail"], detail);
         EXPECT_EQ(document.value("field", ""), field);
     }
+    /// A connection of its own.
+    int connected() const;
     /// Sends bytes as they are and gives the answer up to the end of its first line.
     std::string raw(const std::string& bytes) const;
 
@@ -76,13 +82,18 @@ protected:
     HttpServer server{source};
 };
 
-std::string HttpServerTest::raw(const std::string& bytes) const {
+int HttpServerTest::connected() const {
     const int fd = socket(AF_INET, SOCK_STREAM, 0);
     sockaddr_in address{};
     address.sin_family = AF_INET;
     address.sin_port = htons(server.port());
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
     EXPECT_EQ(connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+    return fd;
+}
+
+std::string HttpServerTest::raw(const std::string& bytes) const {
+    const int fd = connected();
     EXPECT_EQ(send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL),
               static_cast<ssize_t>(bytes.size()));
     std::string answer;
@@ -277,11 +288,39 @@ TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
     });
     begun.get_future().wait();
     const auto begin = Clock::now();
-    server.stop();
+    server.stop(begin + 30s);
     EXPECT_LT(Clock::now() - begin, 10s);
     EXPECT_EQ(answer.get(), 200);
     EXPECT_FALSE(client().Get("/healthz"));
-    server.stop();
+    server.stop(Clock::now());
+}
+
+TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
+    const int fd = connected();
+    std::atomic<bool> isOver{false};
+    std::thread slow([&] {
+        const std::string request = "GET /healthz HTTP/1.1\r\nX-Slow: ";
+        send(fd, request.data(), request.size(), MSG_NOSIGNAL);
+        while (!isOver) {
+            send(fd, "x", 1, MSG_NOSIGNAL);
+            std::this_thread::sleep_for(10ms);
+        }
+        close(fd);
+    });
+    // Another request, so that the slow one is being served by now.
+    EXPECT_EQ(client().Get("/healthz")->status, 200);
+    const auto begin = Clock::now();
+    server.stop(begin + 100ms);
+    EXPECT_GE(Clock::now() - begin, 100ms);
+    EXPECT_LT(Clock::now() - begin, 5s);
+    isOver = true;
+    slow.join();
+}
+
+TEST_F(HttpServerTest, LeavesTheActionOfSignalsAsItWas) {
+    std::signal(SIGPIPE, SIG_DFL);
+    { HttpServer another(source); }
+    EXPECT_EQ(std::signal(SIGPIPE, SIG_IGN), SIG_DFL);
 }
 
 TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
