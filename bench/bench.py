@@ -10,6 +10,7 @@ a baseline in plain C over the same bytes (bench/baseline.c).
 import argparse
 import json
 import os
+import random
 import re
 import shutil
 import statistics
@@ -71,7 +72,8 @@ class Workplace:
 
 def append(source, log):
     """Grows the log by the bytes of the source, as fast as the system copies."""
-    with open(source, "rb") as data, open(log, "ab") as stream:
+    with open(source, "rb") as data, open(log, "r+b") as stream:
+        stream.seek(0, os.SEEK_END)
         while os.sendfile(stream.fileno(), data.fileno(), None, 1 << 26):
             pass
 
@@ -147,13 +149,12 @@ def idle_logs(options):
 
 def latency(options):
     """From the write of a line to its event on standard output."""
-    delays = []
+    delays, pauses = [], random.Random(1)
     with Workplace(options) as place:
         log = place.log("app.log")
         with place.agent([log], [{"name": "all", "log": str(log)}]) as agent:
             for number in range(options.latency_lines):
-                # Out of step with the poll, so that the writes fall all over its second.
-                time.sleep(0.137)
+                time.sleep(pauses.random())  # the writes fall all over the second of a poll
                 line = time.strftime(f"%b %e %H:%M:%S web1 app[1]: number {number}\n")
                 with open(log, "a", encoding="ascii") as stream:
                     stream.write(line)

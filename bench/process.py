@@ -35,7 +35,8 @@ class AgentProcess:
         self.reader.start()
 
     def _configuration(self, situations):
-        text = f'[agent]\nlog_config = "{self.directory}/logs.conf"\n'
+        text = f'state_directory = "{self.directory}/state"\n'
+        text += f'[agent]\nlog_config = "{self.directory}/logs.conf"\n[http]\nlisten = ""\n'
         text += '[[sink]]\ntype = "jsonl"\npath = "-"\n'
         for situation in situations:
             keys = {"text": "benchmark", "severity": "info", **situation}

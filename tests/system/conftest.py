@@ -37,7 +37,9 @@ AGENT_VARIABLES = (
 )
 
 # Errors of every unit, and what the log manager says of its decisions.
-DEFAULT_TRACE = "error,LogManager=error+detail"
+DEFAULT_TRACE = "error," + ",".join(
+    f"{path.stem}=error+detail" for path in sorted((ROOT / "src/logmgr").glob("LogManager*.cpp"))
+)
 
 
 def wait_until(condition, what, seconds=PATIENCE):
@@ -108,7 +110,8 @@ class Agent:
         self.environment = {}
         self.situations = []
         self.sink = "-"
-        self.extra_toml = ""
+        self.listen = ""
+        self.extra_toml = ""  # further tables
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -143,8 +146,10 @@ class Agent:
     def _write_toml(self):
         keys = {"log_config": str(self.logs_conf), "syslog_conf": str(self.syslog_conf)}
         keys.update(self.agent_keys)
-        text = "[agent]\n"
+        text = f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
+        if "[http]" not in self.extra_toml:
+            text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         text += self.extra_toml
         if self.sink is not None:
             text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
@@ -298,6 +303,14 @@ class Agent:
     def resident_kilobytes(self):
         status = Path(f"/proc/{self.process.pid}/status").read_text()
         return int(re.search(r"^VmRSS:\s*(\d+)", status, re.M).group(1))
+
+
+def pytest_configure(config):
+    config.addinivalue_line("markers", "slow: waits for real; begun first, beside the others")
+
+
+def pytest_collection_modifyitems(items):
+    items.sort(key=lambda item: item.get_closest_marker("slow") is None)
 
 
 def descriptions(events):

@@ -1,182 +1,310 @@
-"""The HTTP API of the running agent."""
+"""The HTTP API from outside: reports, Monitored Logs, refusals."""
 
 import http.client
-import json
+import os
 import re
+import stat
 import threading
 import time
-from signal import SIGHUP
+from signal import SIGTERM
 
 import pytest
 
-from conftest import syslog_line, wait_until
+from api import Api, refuses_connections, stamp
+from conftest import syslog_line
 
-
-class Api:
-    """A client of one agent's API."""
-
-    def __init__(self, agent):
-        line = agent.wait_trace("HTTP at http://")[0]
-        self.port = int(re.search(r"http://127\.0\.0\.1:(\d+)/", line).group(1))
-        self.token = (agent.directory / "state/api-token").read_text().strip()
-
-    def ask(self, method, path, body=None, headers=None):
-        connection = http.client.HTTPConnection("127.0.0.1", self.port, timeout=60)
-        headers = {"Authorization": f"Bearer {self.token}", **(headers or {})}
-        if body is not None:
-            body = body if isinstance(body, (bytes, str)) else json.dumps(body)
-            headers.setdefault("Content-Type", "application/json")
-        connection.request(method, path, body, headers)
-        response = connection.getresponse()
-        text = response.read()
-        connection.close()
-        return response.status, json.loads(text)
-
-    def sample(self, table, *filters):
-        body = {"filters": [dict(zip(("column", "op", "value"), each)) for each in filters]}
-        return self.ask("POST", f"/api/v1/tables/{table}/sample", body)
-
-
-def window(log):
-    return (
-        ("LOGPATH", "=", f"{log.path.parent}/"),
-        ("LOGNAME", "=", log.path.name),
-        ("ENTRYTIME", ">=", time.strftime("%Y-%m-%dT00:00:00", time.localtime(time.time() - 86400))),
-        ("ENTRYTIME", "<=", time.strftime("%Y-%m-%dT%H:%M:%SZ", time.gmtime(time.time() + 3600))),
-    )
+EVER = ("0700101000000000", "1991231235959000")
 
 
 @pytest.fixture
-def served(agent):
-    token = agent.directory / "state/api-token"
-    agent.extra_toml = f'\n[http]\nlisten = "127.0.0.1:0"\ntoken_file = "{token}"\n'
-    return agent
+def serving(agent):
+    """Starts the agent with HTTP on a free port and a log with this content."""
+
+    def start(content=b"", **keys):
+        log = agent.log(content=content.encode() if isinstance(content, str) else content, **keys)
+        agent.listen = "127.0.0.1:0"
+        agent.start()
+        return log, Api(agent)
+
+    return start
 
 
-def test_health_needs_no_token(served):
-    served.log()
-    served.start()
-    assert Api(served).ask("GET", "/healthz", headers={"Authorization": ""}) == (
-        200,
-        {"status": "ok"},
+def lines_of_the_last_hour(count):
+    """One line for each second up to now, oldest first, and the time of the first."""
+    begin = int(time.time()) - count
+    return begin, "".join(
+        syslog_line(f"number {i}", source="app" if i % 2 else "sshd[7]", when=time.localtime(begin + i))
+        for i in range(count)
     )
-    assert served.stop() == 0
 
 
-def test_monitored_logs_are_sampled(served):
-    first, second = served.log("first.log"), served.log("second.log")
-    served.start()
-    api = Api(served)
-    first.append(syslog_line("one") + syslog_line("two"))
-    wait_until(lambda: api.sample("RMMONLOG", ("NUMEVENTS", "=", 2))[1]["count"], "two lines read")
-    status, sample = api.sample("RMMONLOG")
+def described(answer):
+    return [row["ENTRYDESC"] for row in answer["rows"]]
+
+
+def test_health_needs_no_token(serving):
+    _, api = serving()
+    status, kind, answer = api.request("GET", "/healthz", headers={"Authorization": None})
+    assert (status, kind, answer) == (200, "application/json", {"status": "ok"})
+
+
+def test_the_token_file_is_the_owners_alone(serving):
+    _, api = serving()
+    assert stat.S_IMODE(os.stat(api.token_file).st_mode) == 0o600
+    assert re.fullmatch("[0-9a-f]{64}", api.token)
+
+
+def test_a_report_gives_the_entries_of_its_window_newest_first(serving):
+    begin, text = lines_of_the_last_hour(600)
+    log, api = serving(text)
+    answer = api.report(log, stamp(begin + 100), stamp(begin + 149))
+    assert described(answer) == [f"number {i}" for i in range(149, 99, -1)]
+    assert (answer["table"], answer["count"], answer["truncated"]) == ("RMLOGENT", 50, False)
+    row = answer["rows"][0]
+    assert row["ENTRYTIME"] == stamp(begin + 149)
+    assert (row["ENTRYSYS"], row["ENTRYSRC"]) == ("web1", "app")
+    assert (row["LOGPATH"], row["LOGNAME"]) == (f"{log.path.parent}/", "app.log")
+
+
+def test_a_report_takes_iso_times_and_further_conditions(serving):
+    begin, text = lines_of_the_last_hour(600)
+    log, api = serving(text)
+    as_iso = lambda when: time.strftime("%Y-%m-%dT%H:%M:%SZ", time.gmtime(when))
+    answer = api.report(
+        log, as_iso(begin), as_iso(begin + 19), ("ENTRYSRC", "starts", "sshd"),
+        ("ENTRYDESC", "in", ["number 4", "number 8", "number 9"]),
+    )  # fmt: skip
+    assert described(answer) == ["number 8", "number 4"]
+
+
+def test_a_report_ends_at_the_row_limit(agent, serving):
+    _, text = lines_of_the_last_hour(300)
+    agent.agent_keys["max_rows"] = 25
+    log, api = serving(text)
+    answer = api.report(log, *EVER)
+    assert described(answer) == [f"number {i}" for i in range(299, 274, -1)]
+    assert (answer["count"], answer["truncated"]) == (25, True)
+    # 25 entries were read, whatever a further filter leaves of them.
+    answer = api.report(log, *EVER, ("ENTRYSRC", "=", "app"))
+    assert described(answer) == [f"number {i}" for i in range(299, 274, -2)]
+    assert answer["truncated"]
+
+
+def test_reports_on_empty_and_shrinking_logs_end_with_what_there_is(serving):
+    log, api = serving(b"")
+    assert api.report(log, *EVER)["rows"] == []
+    log.append(syslog_line("one"))
+    assert described(api.report(log, *EVER)) == ["one"]
+    os.truncate(log.path, 0)
+    assert api.report(log, *EVER)["rows"] == []
+    log.path.unlink()
+    assert api.report(log, *EVER)["rows"] == []
+
+
+def test_a_report_sees_the_whole_log_also_what_was_there_before_the_start(serving):
+    _, text = lines_of_the_last_hour(3000)
+    log, api = serving(text)
+    log.append(syslog_line("the newest"))
+    answer = api.report(log, *EVER)
+    assert answer["count"] == 1000 and answer["truncated"]
+    assert described(answer)[:2] == ["the newest", "number 2999"]
+
+
+def test_monitored_logs_tell_state_counts_size_and_time(agent, serving):
+    log, api = serving("x\n", fields=";Y")
+    agent.wait_open(log)
+    log.append(syslog_line("one") + syslog_line("two"))
+
+    def counted():
+        row = api.logs()["app.log"]
+        return row if row["NUMEVENTS"] == 2 else None
+
+    row = None
+    deadline = time.monotonic() + 30
+    while row is None and time.monotonic() < deadline:
+        row = counted()
+        time.sleep(0.05)
+    assert row is not None
+    status = os.stat(log.path)
+    assert row["LOGPATH"] == row["ULOGPATH"] == f"{log.path.parent}/"
+    assert row["ULOGNAME"] == "app.log"
+    assert (row["LOGTYPE"], row["MONSTATUS"], row["DEBUGMODE"]) == ("S", "Running", "Y")
+    assert (row["NUMERRORS"], row["LOGSIZE"]) == (0, status.st_size)
+    assert row["LOGMODDATE"] == stamp(status.st_mtime)
+    assert row["FORMATTER"] == ""
+    assert len(row["MONTIME"]) == len(row["TIMESTAMP"]) == 16
+    log.path.unlink()
+    row = api.logs()["app.log"]
+    assert (row["LOGSIZE"], row["LOGMODDATE"]) == (-1, "0" * 16)
+
+
+def test_monitored_logs_can_be_filtered(agent, serving):
+    for name in ("b.log", "c.log"):
+        agent.log(name)
+    _, api = serving()
+    assert set(api.logs()) == {"app.log", "b.log", "c.log"}
+    status, _, answer = api.sample("RMMONLOG", ("LOGNAME", "!=", "b.log"), ("LOGSIZE", ">", 0))
     assert status == 200
-    assert sample["count"] == 2 and not sample["truncated"]
-    rows = {row["LOGNAME"]: row for row in sample["rows"]}
-    assert rows["first.log"]["NUMEVENTS"] == 2
-    assert rows["first.log"]["LOGSIZE"] == first.path.stat().st_size
-    assert rows["second.log"]["MONSTATUS"] == "Running"
-    assert rows["second.log"]["LOGPATH"] == f"{second.path.parent}/"
-    assert served.stop() == 0
+    assert [row["LOGNAME"] for row in answer["rows"]] == ["c.log"]
 
 
-def test_a_report_gives_entries_newest_first_up_to_the_row_limit(served):
-    log = served.log()
-    served.agent_keys["max_rows"] = 25
-    served.start()
-    api = Api(served)
-    log.append("".join(syslog_line(f"entry {n}", source=f"app[{n % 2}]") for n in range(30)))
-    status, report = api.sample("RMLOGENT", *window(log))
-    assert status == 200
-    assert [row["ENTRYDESC"] for row in report["rows"]] == [f"entry {n}" for n in range(29, 4, -1)]
-    assert report["count"] == 25 and report["truncated"]
-    status, report = api.sample(
-        "RMLOGENT", *window(log), ("ENTRYSRC", "=", "app[1]"), ("ENTRYDESC", "matches", "y 2[0-9]$")
-    )
-    assert [row["ENTRYDESC"] for row in report["rows"]] == [f"entry {n}" for n in range(29, 19, -2)]
-    assert report["truncated"], "25 entries were read, whatever the filters left over"
-    assert served.stop() == 0
-
-
-def test_a_report_on_an_unknown_log_is_a_problem(served):
-    log = served.log()
-    served.start()
-    api = Api(served)
-    log.path = log.path.with_name("other.log")
-    status, problem = api.sample("RMLOGENT", *window(log))
-    assert status == 404
-    assert problem["detail"] == "the agent does not monitor this log"
-    assert served.stop() == 0
-
-
-def test_refused_requests_name_what_is_wrong(served):
-    served.log()
-    served.start()
-    api = Api(served)
-    path = "/api/v1/tables/RMMONLOG/sample"
-    for status, field, arguments in (
-        (401, "Authorization", dict(path=path, body={}, headers={"Authorization": "Bearer x"})),
-        (421, "Host", dict(path=path, body={}, headers={"Host": "evil.example"})),
-        (403, "Origin", dict(path=path, body={}, headers={"Origin": "http://evil.example"})),
-        (404, "table", dict(path="/api/v1/tables/NONE/sample", body={})),
-        (413, "body", dict(path=path, body=" " * 70000)),
-        (415, "Content-Type", dict(path=path, body="x", headers={"Content-Type": "text/plain"})),
-        (400, "body", dict(path=path, body="{")),
-        (400, "filters[0].column", dict(path=path, body={"filters": [{"op": "="}]})),
-    ):
-        got, problem = api.ask("POST", **arguments)
-        assert (got, problem.get("field")) == (status, field)
-    assert api.ask("GET", "/healthz")[0] == 200
-    assert served.stop() == 0
-
-
-def test_requests_during_refreshes_wait_and_succeed(served):
-    log = served.log()
-    served.start()
-    api = Api(served)
-    log.append("".join(syslog_line(f"entry {n}") for n in range(200)))
-    failures, over = [], threading.Event()
+def test_requests_during_refreshes_succeed(agent, serving):
+    begin, text = lines_of_the_last_hour(2000)
+    log, api = serving(text)
+    agent.wait_open(log)
+    other = agent.directory / "other.log"
+    other.write_bytes(b"old\n")
+    failures, done = [], threading.Event()
 
     def ask():
-        while not over.is_set():
-            status, report = api.sample("RMLOGENT", *window(log))
-            if status != 200 or report["count"] != 200:
-                failures.append((status, report))
+        while not done.is_set():
+            try:
+                answer = api.report(log, stamp(begin + 10), stamp(begin + 1000))
+                assert answer["count"] == 991, answer["count"]
+                assert "app.log" in api.logs()
+            except BaseException as error:  # noqa: BLE001 - told by the test's thread
+                failures.append(error)
+                return
 
-    clients = [threading.Thread(target=ask) for _ in range(3)]
-    for client in clients:
-        client.start()
-    for _ in range(10):
-        served.configure(str(log))  # the same log, in a file that has changed
-        served.send(SIGHUP)
-        time.sleep(0.1)
-    over.set()
-    for client in clients:
-        client.join()
-    assert not failures
-    assert served.stop() == 0
-
-
-def test_the_token_is_the_owners_and_stays(served):
-    served.log()
-    served.start()
-    token = served.directory / "state/api-token"
-    assert token.stat().st_mode & 0o777 == 0o600
-    text = token.read_text()
-    assert re.fullmatch(r"[0-9a-f]{64}\n", text)
-    assert served.stop() == 0
-    served.start()
-    Api(served)
-    assert token.read_text() == text
-    assert served.stop() == 0
+    threads = [threading.Thread(target=ask) for _ in range(4)]
+    for thread in threads:
+        thread.start()
+    for change in range(12):
+        agent.configure(str(log), *([str(other)] if change % 2 == 0 else []))
+        agent.refresh()
+        agent.wait_trace("Manager thread waiting for a signal.", count=change + 2)
+    done.set()
+    for thread in threads:
+        thread.join(60)
+    assert failures == []
+    assert len(agent.trace(f"Deleting log object for file {other}.")) == 6
+    assert agent.stop() == 0
 
 
-def test_without_a_place_for_the_token_monitoring_goes_on(served):
-    log = served.log()
-    (served.directory / "state").write_text("a file, no directory")
-    served.situation()
-    served.start()
-    served.wait_trace("zrmagent: HTTP is off: cannot read ")
-    log.append(syslog_line("seen"))
-    served.wait_events(1)
-    assert served.stop() == 0
+LOG = [("LOGPATH", "=", "/x/"), ("LOGNAME", "=", "y")]
+WINDOW = [("ENTRYTIME", ">=", EVER[0]), ("ENTRYTIME", "<=", EVER[1])]
+
+# Filters on a table, and the member of the body that the answer names.
+REFUSED = {
+    "unknown column": ("RMLOGENT", [*LOG, *WINDOW, ("COLOUR", "=", "x")], "filters[4].column"),
+    "lower-case column": ("RMMONLOG", [("logname", "=", "x")], "filters[0].column"),
+    "column of the other table": ("RMMONLOG", [("ENTRYSRC", "=", "x")], "filters[0].column"),
+    "unknown operator": ("RMMONLOG", [("LOGNAME", "~", "x")], "filters[0].op"),
+    "pattern that is none": ("RMMONLOG", [("LOGNAME", "matches", "(")], "filters[0].value"),
+    "text for a number": ("RMMONLOG", [("LOGSIZE", ">", "big")], "filters[0].value"),
+    "malformed time": (
+        "RMLOGENT",
+        [*LOG, ("ENTRYTIME", ">=", "yesterday"), WINDOW[1]],
+        "filters[2].value",
+    ),
+    "no such day": (
+        "RMLOGENT",
+        [*LOG, ("ENTRYTIME", ">=", "2026-02-30"), WINDOW[1]],
+        "filters[2].value",
+    ),
+    "report without a log": ("RMLOGENT", WINDOW, "filters"),
+    "report without a window": ("RMLOGENT", LOG, "filters"),
+    "report on a log that is not monitored": ("RMLOGENT", [*LOG, *WINDOW], "filters"),
+}
+
+
+@pytest.mark.parametrize("case", REFUSED)
+def test_filters_that_make_no_sense_are_a_problem_that_names_the_field(serving, case):
+    table, filters, field = REFUSED[case]
+    _, api = serving()
+    status, kind, problem = api.sample(table, *filters)
+    assert kind == "application/problem+json"
+    assert status == problem["status"] == (404 if "not monitored" in case else 400)
+    assert problem["field"] == field
+    assert problem["detail"]
+
+
+def test_bodies_that_are_no_request_are_refused(serving):
+    _, api = serving()
+    path = "/api/v1/tables/RMMONLOG/sample"
+    for body, status, field in (
+        ("{", 400, "body"),
+        ("[]", 400, "body"),
+        ('{"filter": []}', 400, "filter"),
+        ('{"filters": {}}', 400, "filters"),
+        ('{"filters": [7]}', 400, "filters[0]"),
+        ('{"filters": [{"column": "LOGNAME"}]}', 400, "filters[0].op"),
+        (b"\xff\xfe", 400, "body"),
+        ('{"filters": "' + "x" * 70_000 + '"}', 413, None),
+        ("[" * 60_000, 400, "body"),
+    ):
+        got, kind, problem = api.request("POST", path, body)
+        assert (got, kind) == (status, "application/problem+json"), body[:50]
+        if field is not None:
+            assert problem["field"] == field, body[:50]
+
+
+def test_strangers_are_refused(serving):
+    _, api = serving()
+    path = "/api/v1/tables/RMMONLOG/sample"
+    for headers, status, field in (
+        ({"Authorization": None}, 401, "Authorization"),
+        ({"Authorization": "Bearer wrong"}, 401, "Authorization"),
+        ({"Authorization": f"Bearer {api.token}x"}, 401, "Authorization"),
+        ({"Host": "evil.example"}, 421, "Host"),
+        ({"Origin": "http://evil.example"}, 403, "Origin"),
+    ):
+        got, kind, problem = api.request("POST", path, {}, headers=headers)
+        assert (got, kind) == (status, "application/problem+json"), headers
+        assert problem["field"] == field
+    got, _, problem = api.request("POST", path, "{}", content_type="text/plain")
+    assert (got, problem["field"]) == (415, "Content-Type")
+
+
+def test_what_is_not_there_is_not_found(serving):
+    _, api = serving()
+    got, kind, problem = api.sample("RMNONE")
+    assert (got, kind, problem["field"]) == (404, "application/problem+json", "table")
+    for method, path in (("GET", "/"), ("GET", "/api/v1/tables/RMMONLOG/sample"), ("POST", "/x")):
+        got, kind, _ = api.request(method, path, "" if method == "POST" else None)
+        assert got in (404, 405) and kind == "application/problem+json", path
+
+
+def test_without_a_place_for_the_token_monitoring_goes_on(agent):
+    log = agent.log()
+    (agent.directory / "state").write_text("a file, no directory")
+    agent.listen = "127.0.0.1:0"
+    agent.situation(log=log)
+    agent.start()
+    agent.wait_trace("zrmagent: HTTP is off: ")
+    log.append(syslog_line("read all the same"))
+    agent.wait_events(1)
+    assert agent.stop() == 0
+
+
+def test_a_port_in_use_does_not_keep_the_agent_from_its_logs(agents):
+    first = agents()
+    first.log()
+    first.listen = "127.0.0.1:0"
+    first.start()
+    second = agents()
+    log = second.log()
+    second.situation(log=log)
+    second.listen = f"127.0.0.1:{Api(first).port}"
+    second.start()
+    second.wait_trace("HTTP is off: ")
+    log.append(syslog_line("read all the same"))
+    second.wait_events(1)
+    assert second.stop() == 0
+
+
+def test_a_stop_ends_the_server_with_idle_connections_open(agent, serving):
+    _, api = serving()
+    idle = http.client.HTTPConnection("127.0.0.1", api.port)
+    idle.request("GET", "/healthz")
+    idle.getresponse().read()
+    assert agent.stop(SIGTERM) == 0
+    assert refuses_connections(api.port)
+    idle.close()
+
+
+def test_the_token_survives_a_restart(agent, serving):
+    _, api = serving()
+    assert agent.stop() == 0
+    agent.start()
+    assert Api(agent).token == api.token

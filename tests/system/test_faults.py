@@ -1,0 +1,103 @@
+"""What goes wrong around the agent: logs it may not read, sinks it cannot write."""
+
+import json
+import os
+import time
+from pathlib import Path
+
+from conftest import descriptions, syslog_line, wait_until
+
+# Root reads everything; without these two capabilities it reads what others do.
+AS_ORDINARY_READER = [
+    "setpriv", "--bounding-set", "-dac_override,-dac_read_search", "--inh-caps",
+    "-dac_override,-dac_read_search",
+]  # fmt: skip
+
+
+def test_an_unreadable_log_is_traced_and_cured_by_the_next_configuration(agent):
+    readable, secret = agent.log("readable.log"), agent.log("secret.log")
+    for log in (readable, secret):
+        agent.situation(log.path.stem, log=log)
+    secret.path.chmod(0)
+    agent.start(wait=False, wrapper=AS_ORDINARY_READER if os.geteuid() == 0 else [])
+    agent.wait_trace(f"Error opening file {secret}.  errno = 13; Permission denied")
+    agent.wait_trace("Agent server is listening; signal sent.")
+    agent.wait_open(readable)
+    readable.append(syslog_line("goes on"))
+    assert descriptions(agent.wait_events(1)) == ["goes on"]
+    secret.path.chmod(0o600)
+    agent.configure(str(secret), str(readable))
+    agent.refresh()
+    agent.wait_open(secret)
+    secret.append(syslog_line("no secret any more"))
+    assert descriptions(agent.wait_events(2))[1] == "no secret any more"
+    assert agent.stop() == 0
+
+
+def test_a_sink_that_cannot_be_written_is_retried_and_nothing_is_dropped(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "not-yet" / "events.jsonl"
+    agent.start()
+    log.append("".join(syslog_line(f"number {i}") for i in range(5000)))  # more than the queue holds
+    agent.wait_trace(
+        f"Error delivering events to {agent.sink}: open failed: No such file or directory. "
+        "Trying again."
+    )
+    log.append("".join(syslog_line(f"number {i}") for i in range(5000, 5100)))
+    agent.sink.parent.mkdir()
+    agent.wait_trace(f"Sink {agent.sink} takes events again.")
+    assert descriptions(agent.wait_events(5100)) == [f"number {i}" for i in range(5100)]
+    assert agent.stop() == 0
+    assert len(agent.events()) == 5100
+
+
+def test_a_sink_that_is_full_all_along_does_not_hold_up_the_stop(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = Path("/dev/full")
+    agent.start()
+    log.append("".join(syslog_line(f"number {i}") for i in range(5000)))
+    agent.wait_trace("Error delivering events to /dev/full: write failed: No space left on device.")
+    assert agent.stop() == 0
+    # The queue was full, and a log waited for room.
+    assert agent.trace("zrmagent: 2048 events were not delivered to /dev/full")
+
+
+def test_a_sink_file_that_is_moved_away_is_opened_anew(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "events.jsonl"
+    agent.start()
+    log.append(syslog_line("first"))
+    assert descriptions(agent.wait_events(1)) == ["first"]
+    moved = agent.directory / "events.1"
+    agent.sink.rename(moved)
+    count = 0
+
+    def made_anew():  # the path is looked at once a second, before a delivery
+        nonlocal count
+        count += 1
+        log.append(syslog_line(f"later {count}"))
+        time.sleep(0.2)
+        return agent.sink.exists()
+
+    wait_until(made_anew, "a new file")
+    assert agent.stop() == 0
+    everything = moved.read_bytes() + agent.sink.read_bytes()
+    assert descriptions(map(json.loads, everything.splitlines())) == [
+        "first",
+        *(f"later {i}" for i in range(1, count + 1)),
+    ]
+
+
+def test_a_reader_of_standard_output_that_goes_away_does_not_end_the_agent(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    reading, writing = os.pipe()
+    agent.start(stdout=writing)
+    os.close(writing)
+    os.close(reading)
+    log.append(syslog_line("nobody listens"))
+    agent.wait_trace("Broken pipe")
+    assert agent.stop() == 0
