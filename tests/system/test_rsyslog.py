@@ -1,13 +1,15 @@
 """A real system logger writes what real programs send."""
 
 import os
+import re
 import subprocess
 import tempfile
+import time
 from pathlib import Path
 
 import pytest
 
-from conftest import PATIENCE, wait_until
+from conftest import PATIENCE, ROOT, wait_until
 
 CONFIGURATION = """\
 module(load="imuxsock" SysSock.Use="off")
@@ -15,6 +17,7 @@ input(type="imuxsock" Socket="{socket}")
 global(workDirectory="{directory}")
 auth,authpriv.* action(type="omfile" file="{auth}" template="RSYSLOG_TraditionalFileFormat")
 *.* action(type="omfile" file="{all}" template="RSYSLOG_TraditionalFileFormat")
+*.* action(type="omfile" file="{iso}" template="RSYSLOG_FileFormat")
 """
 
 
@@ -26,7 +29,8 @@ class SystemLogger:
         self.socket = self.directory / "log"
         self.auth = self.directory / "auth.log"
         self.all = self.directory / "syslog"
-        for path in (self.auth, self.all):
+        self.iso = self.directory / "iso"
+        for path in (self.auth, self.all, self.iso):
             path.write_text("Jan  1 00:00:00 web1 old: before the start\n")
         configuration = self.directory / "rsyslog.conf"
         configuration.write_text(CONFIGURATION.format(**vars(self)))
@@ -86,3 +90,23 @@ def test_what_programs_log_becomes_events(agent, system_logger):
     ]
     assert all(len(row["ENTRYTIME"]) == 16 and row["ENTRYSYS"] for row in every)
     assert len(events) == 4
+
+
+def test_the_form_with_iso_times_is_read_with_the_layout_that_dev_run_writes(agent, system_logger):
+    text = (ROOT / "dev").read_text()
+    layout = re.search(r"local iso='([^']+)'", text).group(1)
+    rest = re.search(r'echo "\$1 ;N ;U ;\$iso ([a-z ]+)"', text).group(1)
+    agent.configure(f"{system_logger.iso} ;N ;U ;{layout} {rest}")
+    agent.situation(log=system_logger.iso)
+    agent.start()
+    before = time.strftime("%m%d%H%M%S")
+    system_logger.send("sshd[77]", "auth.info", "Failed password for root from 203.0.113.7")
+    (event,) = agent.wait_events(1)
+    row = event["row"]
+    assert (row["ENTRYSRC"], row["ENTRYDESC"]) == (
+        "sshd[77]",
+        "Failed password for root from 203.0.113.7",
+    )
+    assert row["ENTRYSYS"]
+    assert before <= row["ENTRYTIME"][3:13] <= time.strftime("%m%d%H%M%S")
+    assert agent.stop() == 0
