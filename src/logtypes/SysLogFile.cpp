@@ -5,10 +5,12 @@
 #include "logmgr/ValidLog.h"
 #include "logtypes/SyslogBufferInfo.h"
 #include "monitor/BrevanTime.h"
+#include "monitor/RowBytes.h"
 #include "monitor/UTF8Conv.h"
 #include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -23,6 +25,11 @@ constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::size_t timeLength = 15; // Mmm dd hh:mm:ss
 constexpr std::size_t yearLength = 3;
 constexpr std::size_t stampLength = 16;
+
+/// Host and source of a line whose description begins within so many characters do not run past
+/// ENTRYDESC into the common columns.
+constexpr std::ptrdiff_t longestHeader =
+    offsetof(zrm_rmlogent_data_t, freqthresh) - offsetof(zrm_rmlogent_data_t, entrysrc);
 
 /// The month's number, 1 to 12; 0 when the text begins with none.
 unsigned monthNumber(const char* text) {
@@ -101,7 +108,7 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     auto& entry = *static_cast<zrm_rmlogent_data_t*>(row);
     char* const columns = static_cast<char*>(row); // host and source may run over their columns
     const char* const limit = columns + sizeof entry;
-    std::memset(columns, ' ', sizeof entry);
+    prepareRow(&entry);
     char* text = formatEntryTime(entry.entrytime, line, reportState);
     if (text == nullptr) {
         return trace.result(-1L);
@@ -114,10 +121,12 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
                              sizeof entry.entrysrc, LOC2_NO_TERMINATOR);
     const std::size_t rest = std::strlen(text);
     const std::size_t length = std::min(rest > 0 ? rest - 1 : 0, sizeof entry.entrydesc);
-    std::memcpy(entry.entrydesc, text, length);
+    RowBytes::copy(entry.entrydesc, text, length);
     UTF8Conv::Convert_toUTF8(entry.uentrydesc, sizeof entry.uentrydesc, text, length,
                              LOC2_NO_TERMINATOR);
-    fillCommonColumns(&entry);
+    if (text - line > longestHeader) {
+        repairRow(&entry);
+    }
     return trace.result(0L);
 }
 
@@ -128,22 +137,19 @@ char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     if (month == 0) {
         return trace.result(line + std::strlen(line));
     }
-    char stamp[stampLength];
-    BrevanTime::generateCurrentTimestamp(stamp); // its year counts while monitoring
-    const auto place = [&](std::size_t at, char tens, char units) {
-        stamp[at] = tens;
-        stamp[at + 1] = units;
+    const auto place = [out](std::size_t at, char tens, char units) {
+        out[at] = tens;
+        out[at + 1] = units;
     };
+    BrevanTime::generateCurrentTimestamp(out); // its year counts while monitoring
     place(3, static_cast<char>('0' + month / 10), static_cast<char>('0' + month % 10));
     place(5, line[4] == ' ' ? '0' : line[4], line[5]);
     place(7, line[7], line[8]);
     place(9, line[10], line[11]);
     place(11, line[13], line[14]);
-    std::memcpy(stamp + 13, "000", 3);
     if (reportState != nullptr) {
-        followYear(stamp, static_cast<SyslogBufferInfo*>(reportState)->timestamp);
+        followYear(out, static_cast<SyslogBufferInfo*>(reportState)->timestamp);
     }
-    std::memcpy(out, stamp, stampLength);
     return trace.result(line + timeLength + (line[timeLength] != '\0' ? 1 : 0));
 }
 
@@ -161,7 +167,8 @@ char* SysLogFile::extractSystem(char* out, char* text, unsigned int max, const c
 
 char* SysLogFile::extractSource(char* out, char* text, unsigned int max, const char* limit) {
     TraceScope trace(anchor);
-    if (std::strncmp(text, repeatNotice.data(), repeatNotice.size()) == 0) {
+    if (*text == repeatNotice.front() &&
+        std::strncmp(text, repeatNotice.data(), repeatNotice.size()) == 0) {
         return trace.result(text);
     }
     FieldCopy field(out, max, limit);

@@ -6,7 +6,7 @@
 #include "logmgr/LogManagerUtil.h"
 #include "logmgr/ValidLog.h"
 #include "monitor/BrevanTime.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "monitor/RowBytes.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -211,11 +211,43 @@ void LogFile::fillCommonColumns(zrm_rmlogent_data_t* row) const {
     fillColumn(row->logpath, path);
     fillColumn(row->logname, file);
     fillColumn(row->ulogname, file);
+    fillChangingColumns(row);
+}
+
+/// The common columns that are not the same in every row of a log, or that the table writes.
+void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) const {
     row->freqthresh = 0;
     row->periodthrs = 0;
     row->sampleno = 0;
     row->rowno = 0;
     BrevanTime::generateCurrentTimestamp(row->timestamp);
+}
+
+void LogFile::prepareRow(zrm_rmlogent_data_t* row) {
+    TraceScope trace(anchor);
+    char* const columns = reinterpret_cast<char*>(row);
+    if (row == &m_row && m_isRowPrepared) {
+        constexpr std::size_t entry = offsetof(zrm_rmlogent_data_t, entrytime);
+        constexpr std::size_t entryEnd = offsetof(zrm_rmlogent_data_t, freqthresh);
+        constexpr std::size_t entryInUTF8 = offsetof(zrm_rmlogent_data_t, uentrysrc);
+        RowBytes::blank(columns + entry, entryEnd - entry);
+        RowBytes::blank(columns + entryInUTF8, sizeof *row - entryInUTF8);
+        fillChangingColumns(row);
+        return;
+    }
+    RowBytes::blank(columns, sizeof *row);
+    fillCommonColumns(row);
+    if (row == &m_row) {
+        m_isRowPrepared = true;
+    }
+}
+
+void LogFile::repairRow(zrm_rmlogent_data_t* row) {
+    TraceScope trace(anchor);
+    fillCommonColumns(row);
+    if (row == &m_row) {
+        m_isRowPrepared = false; // the field's rest stands where the next row has to be blank
+    }
 }
 
 void LogFile::printSelf() const {

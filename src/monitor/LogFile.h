@@ -5,6 +5,7 @@
 #include "monitor/LineReader.h"
 #include "monitor/LogBufferInfo.h"
 #include "monitor/MonitorStatus.h"
+#include "tables/zrm_rmlogent_data.h"
 
 #include <atomic>
 #include <cstdint>
@@ -15,7 +16,6 @@
 #include <sys/time.h>
 
 class ValidLog;
-struct zrm_rmlogent_data_t;
 
 /// One monitored log with one thread of its own, which tails it and turns new entries into Log
 /// Entries rows; reports read it backwards on the threads of their requests. The log manager's
@@ -74,7 +74,13 @@ protected:
     void openLogAndSeek();
     void closeLog();
     void waitForEventLoop(timeval interval);
+    /// Fills the columns that all kinds of logs share, in a row that is blank there.
     void fillCommonColumns(zrm_rmlogent_data_t* row) const;
+    /// Makes `row` blank but for the common columns. The log's own row, the one that readLog
+    /// offers, has kept its common columns from the line before and costs less.
+    void prepareRow(zrm_rmlogent_data_t* row);
+    /// Puts the common columns into a prepared row again, over a field that has run into them.
+    void repairRow(zrm_rmlogent_data_t* row);
 
     // The debug log, shared by all logs.
     static void lockDebugFile(const char* who);
@@ -107,12 +113,19 @@ private:
     friend void* logThread(void* logFile);
 
     void initializeLock();
+    void fillChangingColumns(zrm_rmlogent_data_t* row) const;
     bool checkForChange();
     bool readGrowth();
     void pushBack(_LogBufferInfo* info);
+    std::FILE* debugLogStream() const;
+    void writeRecord(std::FILE* stream, const void* data1, unsigned long length1, const void* data2,
+                     unsigned long length2);
 
-    LineReader m_lineReader;  ///< the thread's
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
+    // The thread's.
+    LineReader m_lineReader;
+    zrm_rmlogent_data_t m_row;
+    bool m_isRowPrepared = false; ///< m_row's common columns stand
 };
 
 /// The monitoring thread's start routine; its argument is the LogFile.

@@ -53,14 +53,26 @@ void LogFile::unlockDebugFile() {
     trace.detail()("Debug file mutex unlocked.");
 }
 
+/// The open debug log when this log's entries are to be copied to it, else null.
+std::FILE* LogFile::debugLogStream() const {
+    if (debugMode() != 'Y') {
+        return nullptr;
+    }
+    const LogManager* const logManager = pTheLogManager;
+    return logManager != nullptr ? logManager->debugLogStream() : nullptr;
+}
+
 void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const void* data2,
                               unsigned long length2) {
+    writeRecord(debugLogStream(), data1, length1, data2, length2);
+}
+
+/// Without a stream only traces that the log has an entry.
+void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long length1,
+                          const void* data2, unsigned long length2) {
     TraceScope trace(anchor);
     int result = 0;
     int cause = 0;
-    const LogManager* const logManager = pTheLogManager;
-    std::FILE* const stream =
-        debugMode() == 'Y' && logManager != nullptr ? logManager->debugLogStream() : nullptr;
     if (stream != nullptr) {
         lockDebugFile(fileNameLocal());
         std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
@@ -86,7 +98,7 @@ void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const vo
                       error.number(), error.text());
     } else if (result > 0) {
         trace.detail()("Record written to debug log for log %s.", fileNameLocal());
-    } else {
+    } else if (trace.isOn(TRC1_DETAIL)) { // the usual case
         trace.detail()("%s monitor detected event.", fileNameLocal());
     }
 }

@@ -2,7 +2,6 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
-#include "tables/zrm_rmlogent_data.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
@@ -131,14 +130,15 @@ long LogFile::readLog() {
     m_lineReader.start(LogFD);
     while (char* const line = m_lineReader.next()) {
         count(NumEvents);
-        zrm_rmlogent_data_t row{};
-        if (formatEntryAsRow(line, &row, nullptr) == 0) {
-            zrm_rmlogent_manager::EventArrived(&row, 1);
-            writeToDebugLog(line, std::strlen(line), &row, sizeof row);
+        const bool isRow = formatEntryAsRow(line, &m_row, nullptr) == 0;
+        if (isRow) {
+            zrm_rmlogent_manager::EventArrived(&m_row, 1);
         } else {
             count(NumFormatErrors);
-            writeToDebugLog(line, std::strlen(line), nullptr, 0);
         }
+        std::FILE* const debugLog = debugLogStream();
+        writeRecord(debugLog, line, debugLog != nullptr ? std::strlen(line) : 0,
+                    isRow ? &m_row : nullptr, isRow ? sizeof m_row : 0);
     }
     if (m_lineReader.error() != 0) {
         const ErrorText error(m_lineReader.error());

@@ -51,7 +51,9 @@ std::int32_t translate(const TraceScope& trace, std::uint32_t targetCodePage, ch
     const std::int32_t bytesCopied = LOC2_TranslateString(
         targetCodePage, out, static_cast<std::uint32_t>(outSize), sourceCodePage, in,
         static_cast<std::uint32_t>(inLength), &resultLength, flags, &status);
-    trace.detail()("bytesCopied = %d", bytesCopied);
+    if (trace.isOn(TRC1_DETAIL)) { // twice per line of a log
+        trace.detail()("bytesCopied = %d", bytesCopied);
+    }
     return bytesCopied;
 }
 

@@ -11,6 +11,7 @@ struct Recorder {
     std::condition_variable changed;
     std::vector<zrm_rmlogent_data_t> rows;
     std::function<void(std::size_t)> action;
+    bool writesThresholds = false;
 };
 
 Recorder& recorder() {
@@ -24,6 +25,12 @@ void EventRecorder::clear() {
     const std::lock_guard guard(recorder().mutex);
     recorder().rows.clear();
     recorder().action = nullptr;
+    recorder().writesThresholds = false;
+}
+
+void EventRecorder::writeThresholds() {
+    const std::lock_guard guard(recorder().mutex);
+    recorder().writesThresholds = true;
 }
 
 void EventRecorder::onRow(std::function<void(std::size_t)> action) {
@@ -52,11 +59,17 @@ __wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlog
                                                                        int count) {
     std::function<void(std::size_t)> action;
     std::size_t rowCount = 0;
+    bool writesThresholds = false;
     {
         const std::lock_guard guard(recorder().mutex);
         recorder().rows.insert(recorder().rows.end(), rows, rows + count);
         rowCount = recorder().rows.size();
         action = recorder().action;
+        writesThresholds = recorder().writesThresholds;
+    }
+    for (int i = 0; i < count && writesThresholds; ++i) {
+        rows[i].freqthresh = 5;
+        rows[i].periodthrs = 60;
     }
     recorder().changed.notify_all();
     if (action) {

@@ -22,6 +22,10 @@ std::vector<zrm_rmlogent_data_t> waitForRows(std::size_t count, int seconds = 10
 /// clear() forgets it.
 void onRow(std::function<void(std::size_t)> action);
 
+/// Writes the columns of the thresholds of every row behind its copy, in place, as a situation
+/// with thresholds does; clear() forgets it.
+void writeThresholds();
+
 } // namespace EventRecorder
 
 /// A character column without its blank padding.

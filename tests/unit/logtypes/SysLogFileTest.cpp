@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <chrono>
 #include <cstring>
+#include <random>
+#include <vector>
 
 namespace {
 
@@ -289,6 +291,60 @@ TEST(SysLogFileMonitor, RunsFromConstructionToDestruction) {
     }
     EXPECT_EQ(trace.count("Thread for log file " + path + " terminating."), 1);
     EXPECT_EQ(trace.count("Mutex destroyed for " + path + "."), 1);
+}
+
+class SysLogFileRows : public SyslogTest {
+protected:
+    /// Appends lines until the monitor has seen one: then it follows the file.
+    void awaitMonitor() {
+        for (int i = 0; i < 100 && EventRecorder::rows().empty(); ++i) {
+            m_directory.append("followed", "no month\n");
+            EventRecorder::waitForRows(1, 2);
+        }
+        ASSERT_FALSE(EventRecorder::rows().empty());
+        EventRecorder::clear();
+    }
+    std::string field(std::size_t longest) {
+        return std::string(m_random() % longest, static_cast<char>('a' + m_random() % 26));
+    }
+    std::string someLine() {
+        switch (m_random() % 6) {
+        case 0:
+            return field(40) + "\n";
+        case 1:
+            return "Oct  5 07:03:09 " + field(600) + " " + field(100) + ": text\n";
+        case 2:
+            return "Oct  5 07:03:09 " + field(20) + " " + field(600) + ": " + field(300) + "\n";
+        default:
+            return "Oct  5 07:03:09 " + field(20) + " " + field(20) + ": " + field(300) + "\n";
+        }
+    }
+
+    const unsigned m_seed = std::random_device{}();
+    std::mt19937 m_random{m_seed};
+};
+
+TEST_F(SysLogFileRows, OfAMonitorAreAsIfEachWereMadeAlone) {
+    SCOPED_TRACE("seed " + std::to_string(m_seed));
+    m_directory.write("followed", "");
+    SysLogFile log(*validLog(m_directory.file("followed")), nullptr);
+    awaitMonitor();
+    EventRecorder::writeThresholds();
+    std::vector<std::string> lines(3000);
+    std::string content;
+    for (std::string& line : lines) {
+        content += line = someLine();
+    }
+    m_directory.append("followed", content);
+    const auto rows = EventRecorder::waitForRows(lines.size());
+    log.stopThread();
+    ASSERT_THAT(rows, SizeIs(lines.size()));
+    for (std::size_t i = 0; i < lines.size(); ++i) {
+        zrm_rmlogent_data_t alone;
+        std::memset(&alone, '#', sizeof alone);
+        log.formatEntryAsRow(lines[i].data(), &alone, nullptr);
+        ASSERT_EQ(std::memcmp(&rows[i], &alone, sizeof alone), 0) << lines[i];
+    }
 }
 
 TEST(SysLogFileMonitor, ALogThatCannotBeOpenedEndsTheThread) {
