@@ -16,9 +16,13 @@ struct _FormatBuffer {
             const std::size_t written =
                 length < static_cast<std::size_t>(room) ? length : static_cast<std::size_t>(room);
             std::memcpy(position, text, written);
-            position += written;
-            room -= static_cast<long>(written);
+            advance(written);
         }
+    }
+    /// Takes over so many characters that were written at the position, within its room.
+    void advance(std::size_t length) noexcept {
+        position += length;
+        room -= static_cast<long>(length);
     }
 };
 

@@ -2,6 +2,7 @@
 
 #include "parser/DirectiveRules.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
@@ -117,26 +118,34 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
     if (isNegative) {
         magnitude = 0 - magnitude;
     }
-    // Digits, sign and padding, from the right end of a text as wide as any directive asks for.
-    char text[MAX_PRINT_WIDTH + 32];
-    char* const end = text + sizeof text;
-    char* begin = end;
+    std::size_t length = isNegative ? 2 : 1;
+    for (std::uint64_t rest = magnitude; rest >= 10; rest /= 10) {
+        ++length;
+    }
+    length = std::max(length, m_width);
+    // Written from its right end, at its place when it fits there; else cut afterwards.
+    char cut[MAX_PRINT_WIDTH + 1];
+    const bool fits = buffer.room >= static_cast<long>(length);
+    char* const begin = fits ? buffer.position : cut;
+    char* next = begin + length;
     do {
-        *--begin = static_cast<char>('0' + magnitude % 10);
+        *--next = static_cast<char>('0' + magnitude % 10);
         magnitude /= 10;
     } while (magnitude != 0);
-    const std::size_t length = static_cast<std::size_t>(end - begin) + (isNegative ? 1U : 0U);
-    const std::size_t padding = m_width > length ? m_width - length : 0;
-    const bool isZeroFilled = m_fill == '0'; // Zeros go behind the sign, blanks before it.
-    if (isNegative && !isZeroFilled) {
-        *--begin = '-';
+    if (isNegative && m_fill == ' ') {
+        *--next = '-';
     }
-    begin -= padding;
-    std::memset(begin, m_fill, padding);
-    if (isNegative && isZeroFilled) {
-        *--begin = '-';
+    while (next != begin) {
+        *--next = m_fill;
     }
-    buffer.append(begin, static_cast<std::size_t>(end - begin));
+    if (isNegative && m_fill == '0') {
+        *begin = '-'; // zeros go behind the sign
+    }
+    if (fits) {
+        buffer.advance(length);
+    } else {
+        buffer.append(cut, length);
+    }
 }
 
 bool PrintProgram::printByLibrary(const void* value, _FormatBuffer& buffer) const noexcept {

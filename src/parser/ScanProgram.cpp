@@ -63,14 +63,21 @@ template <unsigned Base>
 const char* readDigits(const char* position, unsigned width, std::uint64_t& magnitude,
                        bool& overflowed) {
     constexpr std::uint64_t MAX = std::numeric_limits<std::uint64_t>::max();
-    for (; width > 0; --width, ++position) {
-        const unsigned digit = digitValues[byteOf(*position)];
-        if (digit >= Base) {
-            break;
-        }
+    constexpr unsigned SAFE_DIGITS = 16; // so few digits never overflow
+    unsigned safe = width < SAFE_DIGITS ? width : SAFE_DIGITS;
+    unsigned left = width - safe;
+    unsigned digit = 0;
+    while (safe > 0 && (digit = digitValues[byteOf(*position)]) < Base) {
+        magnitude = magnitude * Base + digit;
+        ++position;
+        --safe;
+    }
+    while (safe == 0 && left > 0 && (digit = digitValues[byteOf(*position)]) < Base) {
         overflowed =
             overflowed || magnitude > MAX / Base || (magnitude == MAX / Base && digit > MAX % Base);
         magnitude = magnitude * Base + digit;
+        ++position;
+        --left;
     }
     return position;
 }
@@ -177,9 +184,15 @@ const char* ScanProgram::compileSet(const char* set) noexcept {
             named[byteOf(*set)] = true;
         }
     }
+    int refused = 0;
     for (std::size_t member = 1; member < named.size(); ++member) {
         m_set[member] = named[member] != isInverted;
+        if (!m_set[member]) {
+            ++refused;
+            m_stop = static_cast<char>(member);
+        }
     }
+    m_isUntil = refused == 1;
     return *set == ']' ? set + 1 : set;
 }
 
@@ -318,15 +331,28 @@ ScanProgram::Outcome ScanProgram::scanFloating(const char*& position, void* valu
     return Outcome::MATCHED;
 }
 
+/// The end of a text that reaches up to one character, which is searched for many bytes at once.
+const char* ScanProgram::findStop(const char* begin) const noexcept {
+    const std::size_t limit = strnlen(begin, m_width);
+    const void* const stop = std::memchr(begin, m_stop, limit);
+    return stop != nullptr ? static_cast<const char*>(stop) : begin + limit;
+}
+
+/// The end of a text of accepted characters.
+const char* ScanProgram::findRefused(const char* begin) const noexcept {
+    const char* end = begin;
+    for (unsigned left = m_width; left > 0 && m_accepted[byteOf(*end)]; --left) {
+        ++end;
+    }
+    return end;
+}
+
 ScanProgram::Outcome ScanProgram::scanText(const char*& position, char* value) const noexcept {
     const char* const begin = m_skipsWhiteSpace ? skipWhiteSpace(position) : position;
     if (*begin == '\0') {
         return Outcome::END;
     }
-    const char* end = begin;
-    for (unsigned left = m_width; left > 0 && m_accepted[byteOf(*end)]; --left) {
-        ++end;
-    }
+    const char* const end = m_isUntil ? findStop(begin) : findRefused(begin);
     if (end == begin) {
         return Outcome::MISMATCHED;
     }

@@ -41,6 +41,8 @@ private:
     Outcome scanInteger(const char*& position, void* value) const noexcept;
     Outcome scanFloating(const char*& position, void* value) const noexcept;
     Outcome scanText(const char*& position, char* value) const noexcept;
+    const char* findStop(const char* begin) const noexcept;
+    const char* findRefused(const char* begin) const noexcept;
     Outcome scanCharacters(const char*& position, char* value) const noexcept;
     void storeInteger(std::uint64_t magnitude, bool isNegative, bool overflowed,
                       void* value) const noexcept;
@@ -57,6 +59,8 @@ private:
     unsigned m_width = 0;             ///< most characters taken
     const bool* m_accepted = nullptr; ///< characters of a text, by their codes
     CharacterSet m_set{};             ///< the characters of a scan set
+    bool m_isUntil = false;           ///< the set lacks one character alone, m_stop
+    char m_stop = '\0';
     char m_decimalPoint[8] = ".";
 };
 
