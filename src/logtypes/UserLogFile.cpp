@@ -10,7 +10,6 @@
 #include "tables/zrm_rmlogent_data.h"
 
 #include <cerrno>
-#include <cstring>
 #include <iterator>
 #include <new>
 
@@ -105,7 +104,7 @@ void UserLogFile::learnFormat() {
 long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     TraceScope trace(anchor);
     auto* const columns = static_cast<zrm_rmlogent_data_t*>(row);
-    std::memset(columns, ' ', sizeof *columns);
+    prepareRow(columns);
     _EntryTimeBuffers times{};
     _FormatBuffer buffers[] = {
         {times.year, _EntryTimeBuffers::ROOM},
@@ -125,10 +124,10 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
         const ChainGuard guard(m_chainLock);
         if (!SPAnchor || SPAnchor->formatLine(line, buffers) < 1 ||
             formatEntryTime(columns->entrytime, &times, reportContext) != 0) {
+            dropRow(columns);
             return trace.result(-1L);
         }
     }
-    fillCommonColumns(columns);
     UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
                              sizeof columns->entrysrc, LOC2_NO_TERMINATOR);
     UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc, columns->entrydesc,

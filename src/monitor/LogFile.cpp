@@ -250,6 +250,14 @@ void LogFile::repairRow(zrm_rmlogent_data_t* row) {
     }
 }
 
+void LogFile::dropRow(zrm_rmlogent_data_t* row) {
+    TraceScope trace(anchor);
+    RowBytes::blank(reinterpret_cast<char*>(row), sizeof *row);
+    if (row == &m_row) {
+        m_isRowPrepared = false;
+    }
+}
+
 void LogFile::printSelf() const {
     TraceScope trace(anchor);
     LogBase::printSelf();

@@ -81,6 +81,8 @@ protected:
     void prepareRow(zrm_rmlogent_data_t* row);
     /// Puts the common columns into a prepared row again, over a field that has run into them.
     void repairRow(zrm_rmlogent_data_t* row);
+    /// Makes a prepared row all blank: its entry is rejected.
+    void dropRow(zrm_rmlogent_data_t* row);
 
     // The debug log, shared by all logs.
     static void lockDebugFile(const char* who);
