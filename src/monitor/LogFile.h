@@ -126,7 +126,7 @@ private:
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
     // The thread's.
     LineReader m_lineReader;
-    zrm_rmlogent_data_t m_row;
+    zrm_rmlogent_data_t m_row{};
     bool m_isRowPrepared = false; ///< m_row's common columns stand
 };
 
