@@ -2,23 +2,19 @@
 
 #include <cerrno>
 #include <csignal>
-#include <mutex>
 
 #include <fcntl.h>
 #include <unistd.h>
 
 namespace {
 
-// Held while a pipe exists without its close-on-exec flags and during a fork. A child that
-// inherited another pipe's write end would keep that pipe's reader waiting for as long as it runs.
-std::mutex forkLock;
-
 constexpr int standardOutput = 1;
+constexpr int firstOther = 3;    // behind the standard descriptors
+constexpr int otherLimit = 4096; // more than an agent of a thousand logs has open
 
 } // namespace
 
 int ChildProcess::openPipe(int fds[2]) {
-    const std::lock_guard guard(forkLock);
     if (pipe(fds) != 0) {
         return -1;
     }
@@ -28,11 +24,6 @@ int ChildProcess::openPipe(int fds[2]) {
     return 0;
 }
 
-pid_t ChildProcess::start() {
-    const std::lock_guard guard(forkLock);
-    return fork();
-}
-
 void ChildProcess::redirectOutput(const int fds[2]) {
     close(fds[0]);
     if (fds[1] == standardOutput) {
@@ -40,6 +31,13 @@ void ChildProcess::redirectOutput(const int fds[2]) {
     } else {
         dup2(fds[1], standardOutput);
         close(fds[1]);
+    }
+    // The agent's descriptors close on exec, but for the moment between their making and the call
+    // that says so, in which another thread may have forked. A command that kept the write end of
+    // another one's pipe would keep its reader waiting. They stay open until the exec, since the
+    // trace needs its own when that fails.
+    for (int fd = firstOther; fd < otherLimit; ++fd) {
+        fcntl(fd, F_SETFD, FD_CLOEXEC);
     }
 }
 

@@ -3,23 +3,19 @@
 
 #include "agent/ErrorText.h"
 
-#include <sys/types.h>
-
 /// The system's side of running a command whose standard output the agent reads through a pipe.
 ///
 /// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
-/// the blocked signals, and locks that nobody will release. So the descriptors of the agent close
-/// on exec, whatever a child needs is prepared before the fork, and between fork and exec a child
-/// makes only calls that are safe in a signal handler.
+/// the blocked signals, and locks that nobody will release. So whatever a child needs is prepared
+/// before the fork, and between fork and exec a child makes only calls that are safe in a signal
+/// handler.
 namespace ChildProcess {
 
-/// Makes a pipe whose ends do not reach other children. As pipe(): 0, or -1 and errno. Any thread.
+/// Makes a pipe whose ends close on exec. As pipe(): 0, or -1 and errno. Any thread.
 int openPipe(int fds[2]);
 
-/// Forks: 0 in the child, its id in the parent, -1 and errno on failure. Any thread.
-pid_t start();
-
-/// In the child: makes the pipe's write end its standard output and closes both ends.
+/// In the child: makes the pipe's write end its standard output and closes both ends. The command
+/// will find nothing else of the agent's open than standard input and error.
 void redirectOutput(const int fds[2]);
 
 /// In the child: undoes what the agent's threads do with signals, so that the command can be ended

@@ -45,7 +45,7 @@ void ErrLogFile::createChild(const int fds[2]) {
     TraceScope trace(anchor);
     const StartDate date = startDate();
     const ExecErrorTexts errorTexts;
-    const pid_t pid = ChildProcess::start();
+    const pid_t pid = fork();
     if (pid == 0) {
         runCommand(trace, fds, date, errorTexts);
     }

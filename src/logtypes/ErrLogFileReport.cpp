@@ -54,7 +54,7 @@ void ErrLogFile::createChildForReport(ErrlogBufferInfo* info,
     char* argv[] = {program, startArgument, endArgument, nullptr};
     buildReportCommand(argv, thresholds);
     const ExecErrorTexts errorTexts;
-    info->pid = ChildProcess::start();
+    info->pid = fork();
     if (info->pid == 0) {
         runReportCommand(trace, info, argv, errorTexts);
     }
