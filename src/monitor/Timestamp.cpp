@@ -66,7 +66,6 @@ Timestamp::Timestamp(Timestamp** pHeadOfChain, const char* pNewTime) {
     errno = 0;
     std::tm parts = partsOf(stamp);
     int cause = errno;
-    errno = 0;
     m_eventTime = std::mktime(&parts);
     if (m_eventTime >= 0) {
         addToChain(*pHeadOfChain);
