@@ -156,6 +156,19 @@ TEST_F(DebugLog, EveryPieceOfALineIsCopiedWithItsRowOrWithoutOne) {
                           "bad\n\n" + header(number + 2) + "nul\n" + bytes(rows[1]) + "\n");
 }
 
+TEST_F(DebugLog, ARowIsHandedOverBeforeItIsCopied) {
+    // The situations write the thresholds' columns into the row; the copy shows them.
+    TestLog log(*m_debugged);
+    log.openLogAndSeek();
+    append("one\n");
+    EventRecorder::onRow([this](std::size_t) { EXPECT_EQ(content(), ""); });
+    EXPECT_EQ(log.readLog(), 0);
+    log.closeLog();
+    EXPECT_EQ(EventRecorder::rows().size(), 1U);
+    EXPECT_NE(content(), "");
+    EventRecorder::clear();
+}
+
 TEST_F(DebugLog, AReconfigurationTakesEffectWithTheNextEntry) {
     TestLog log(*m_line);
     log.startThread();

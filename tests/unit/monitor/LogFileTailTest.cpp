@@ -153,6 +153,27 @@ TEST_F(Tail, WhatIsAppendedWhileReadingIsReadInTheSamePass) {
     EXPECT_EQ(passes.calls(), 1);
 }
 
+TEST_F(Tail, WhatIsAppendedBehindTheReadingIsLeftToTheNextPass) {
+    open();
+    append("one\n");
+    m_log.afterReading = [this] {
+        m_log.afterReading = nullptr;
+        append("two\n");
+    };
+    stopAfter(2);
+    m_log.follow();
+    EXPECT_THAT(m_log.lines, ElementsAre("one\n", "two\n"));
+    EXPECT_EQ(m_log.eof(), 8);
+}
+
+TEST_F(Tail, EachLineGetsAClearedRow) {
+    open();
+    append("one\nbad\ntwo\n");
+    EXPECT_EQ(m_log.readLog(), 0);
+    EXPECT_EQ(m_log.unclearedRows, 0);
+    EXPECT_THAT(m_log.lines, SizeIs(3));
+}
+
 TEST_F(Tail, ATruncatedLogIsFollowedFromItsNewEnd) {
     append("something long\n");
     open();

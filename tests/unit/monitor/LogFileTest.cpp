@@ -196,6 +196,9 @@ TEST_F(LogFileTest, RunsFromStartToStop) {
     EXPECT_EQ(log.statusText(), "Running");
     EXPECT_EQ(log.monitorStartStopTime(), 2000);
     EXPECT_TRUE(trace.waitFor("Thread successfully started for log file " + m_path + "."));
+    EXPECT_TRUE(waitUntil([&] { return log.eof() == 0; }));
+    // By startThread and by the thread, which waits for it until the status is Running.
+    EXPECT_EQ(trace.count("Mutex locked for " + m_path + "."), 2);
     clock.set(3000);
     log.stopThread();
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
@@ -246,6 +249,7 @@ TEST_F(LogFileTest, AThreadThatCannotBeStartedLeavesTheStatus) {
 
 TEST_F(LogFileTest, ARestartThatFailsCanBeStoppedAndTriedAgain) {
     TestLog log(*m_line);
+    const Fault joins("pthread_join", 0, {.times = 0});
     log.startThread();
     log.stopThread();
     {
@@ -255,6 +259,7 @@ TEST_F(LogFileTest, ARestartThatFailsCanBeStoppedAndTriedAgain) {
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
     log = *m_line;
     EXPECT_EQ(log.monitorStatus(), MONITOR_RUNNING);
+    EXPECT_EQ(joins.calls(), 1);
 }
 
 TEST_F(LogFileTest, AStreamLeftOpenIsDumpedAtTheThreadsEnd) {
@@ -307,12 +312,24 @@ TEST_F(LogFileTest, ReconfigurationRestartsAMonitorThatFailed) {
     log.startThread();
     EXPECT_TRUE(trace.waitFor("Error opening file " + m_directory.file("later") +
                               ".  errno = 2; No such file or directory"));
-    log.stopThread();
-    EXPECT_EQ(log.monitorStatus(), MONITOR_ERR_OPEN); // not Stopped
+    ASSERT_TRUE(waitUntil([&] { return log.monitorStatus() != MONITOR_RUNNING; }));
     EXPECT_EQ(log.statusText(), "Error: log open failed");
     m_directory.write("later", "");
+    const Fault joins("pthread_join", 0, {.times = 0});
     log = *line;
     EXPECT_EQ(log.monitorStatus(), MONITOR_RUNNING);
+    EXPECT_EQ(joins.calls(), 1); // of the thread that failed
+}
+
+TEST_F(LogFileTest, StoppingAFailedMonitorLeavesItsStatus) {
+    TestLog log(*m_line);
+    {
+        const Fault fault("fopen", EACCES);
+        log.startThread();
+        ASSERT_TRUE(waitUntil([&] { return log.monitorStatus() != MONITOR_RUNNING; }));
+    }
+    log.stopThread();
+    EXPECT_EQ(log.monitorStatus(), MONITOR_ERR_OPEN);
 }
 
 TEST_F(LogFileTest, ReconfigurationDumpsBeforeAndAfterInDetail) {

@@ -2,6 +2,7 @@
 
 #include "agent/zrmmain.h"
 
+#include <algorithm>
 #include <chrono>
 #include <cstring>
 #include <thread>
@@ -14,6 +15,11 @@ char systemName[65] = "web1:ZRM";
 
 long TestLog::formatEntryAsRow(char* entry, void* row, void* /*context*/) {
     lines.emplace_back(entry);
+    const auto* const bytes = static_cast<const char*>(row);
+    if (std::any_of(bytes, bytes + sizeof(zrm_rmlogent_data_t),
+                    [](char byte) { return byte != 0; })) {
+        ++unclearedRows;
+    }
     if (onLine) {
         onLine(lines.back());
     }
@@ -35,6 +41,14 @@ void TestLog::processLogData() {
             closeLog();
         }
     }
+}
+
+long TestLog::readLog() {
+    const long result = LogFile::readLog();
+    if (afterReading) {
+        afterReading();
+    }
+    return result;
 }
 
 void TestLog::follow() {

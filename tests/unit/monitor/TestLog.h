@@ -33,6 +33,7 @@ public:
     void* startReportRequest(void* /*thresholds*/) override { return nullptr; }
     long formatEntryAsRow(char* entry, void* row, void* context) override;
     void processLogData() override;
+    long readLog() override;
 
     using LogFile::closeLog;
     using LogFile::closeLogForReport;
@@ -60,7 +61,9 @@ public:
     std::string statusText() const;
 
     std::function<void(const std::string&)> onLine; ///< called with every line, on its thread
+    std::function<void()> afterReading;             ///< called with the thread's reading done
     std::vector<std::string> lines;                 ///< of the thread that reads
+    int unclearedRows = 0;                          ///< rows that were not given cleared
     std::atomic<bool> closes{true};                 ///< false: the log stays open at the end
 };
 

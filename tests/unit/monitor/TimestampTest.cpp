@@ -178,6 +178,18 @@ TEST_F(TimestampText, IsReadAsLocalTime) {
     EXPECT_THAT(times(), ElementsAre(946684800 + 5 * 3600));
 }
 
+TEST_F(TimestampText, TheSystemDecidesOnDaylightSaving) {
+    const TimeZone zone("XYZ5XDT,M3.2.0,M11.1.0");
+    addText("1060105070309000");
+    addText("1060705070309000");
+    EXPECT_THAT(times(), ElementsAre(1152097389, 1136462589));
+}
+
+TEST_F(TimestampText, TheEpochIsATime) {
+    addText("0700101000000000");
+    EXPECT_THAT(times(), ElementsAre(0));
+}
+
 TEST_F(TimestampText, NeedsNoTerminator) {
     const std::unique_ptr<char[]> column(new char[16]); // a read of a 17th byte shows under ASan
     std::copy_n("1000101000000000", 16, column.get());
