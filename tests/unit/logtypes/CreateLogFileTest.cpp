@@ -1,10 +1,26 @@
 #include "logtypes/createLogFile.h"
 
 #include "SyslogTest.h"
+#include "logtypes/AdminLogFile.h"
+#include "logtypes/ErrLogFile.h"
+#include "logtypes/UserLogFile.h"
 
 namespace {
 
-class CreateLogFile : public SyslogTest {};
+class CreateLogFile : public SyslogTest {
+protected:
+    /// Creates the object of a line with these fields, whose monitor ends at once, and tells
+    /// whether it is of the kind.
+    template <typename Kind> bool makes(const std::string& fields) {
+        const FakeUname aix("AIX");
+        const auto line = validLog(m_path, fields);
+        const Fault noFile("fopen", EACCES);
+        const Fault noDescriptor("open", EACCES);
+        const Fault noPipe("pipe", EMFILE);
+        const std::unique_ptr<LogFile> log(createLogFile(*line, nullptr));
+        return dynamic_cast<Kind*>(log.get()) != nullptr && log->type() == line->type();
+    }
+};
 
 TEST_F(CreateLogFile, KnowsTheKindsOfLogs) {
     for (int letter = 1; letter < 128; ++letter) {
@@ -20,6 +36,13 @@ TEST_F(CreateLogFile, MakesARunningObjectOfTheLinesKindOnTheChain) {
     EXPECT_NE(dynamic_cast<SysLogFile*>(log.get()), nullptr);
     EXPECT_EQ(m_log->next(), log.get());
     EXPECT_NE(log->monitorStatus(), MONITOR_NOT_STARTED);
+}
+
+TEST_F(CreateLogFile, MakesEachKindByItsLetter) {
+    EXPECT_TRUE(makes<SysLogFile>(" ;N ;S"));
+    EXPECT_TRUE(makes<UserLogFile>(" ;N ;U ;%s DESCRIPTION"));
+    EXPECT_TRUE(makes<AdminLogFile>(" ;N ;A"));
+    EXPECT_TRUE(makes<ErrLogFile>(" ;N ;E ;errpt -c"));
 }
 
 TEST_F(CreateLogFile, GivesNothingWhenMemoryRunsOut) {

@@ -263,15 +263,16 @@ TEST(SysLogFileMonitor, RunsFromConstructionToDestruction) {
     const TemporaryDirectory directory;
     const std::string path = directory.write("messages", "Oct  5 07:03:09 h s: before\n");
     RecordingTrace trace(TRC1_DETAIL);
+    const auto dumps = [&] {
+        const auto messages = trace.messages();
+        return std::count_if(messages.begin(), messages.end(), [](const std::string& text) {
+            return text.compare(0, 14, "\n\tRefreshMode\t") == 0;
+        });
+    };
     {
         SysLogFile log(*validLog(path), nullptr);
         EXPECT_EQ(log.monitorStatus(), MONITOR_RUNNING);
-        const auto messages = trace.messages();
-        EXPECT_EQ(std::count_if(messages.begin(), messages.end(),
-                                [](const std::string& text) {
-                                    return text.compare(0, 14, "\n\tRefreshMode\t") == 0;
-                                }),
-                  1);
+        EXPECT_EQ(dumps(), 1);
         EXPECT_TRUE(trace.waitFor("Thread successfully started for log file " + path + "."));
         // An appended line may be counted as present at the start until the log was opened.
         std::size_t appended = 0;
@@ -289,6 +290,7 @@ TEST(SysLogFileMonitor, RunsFromConstructionToDestruction) {
         EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1900));
         EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
     }
+    EXPECT_EQ(dumps(), 1); // a log left open would be dumped at its thread's end
     EXPECT_EQ(trace.count("Thread for log file " + path + " terminating."), 1);
     EXPECT_EQ(trace.count("Mutex destroyed for " + path + "."), 1);
 }
