@@ -261,6 +261,23 @@ TEST_F(Report, ALaterTimeReplacesAnEarlierOneUntilBothAreKnown) {
     EXPECT_STREQ(m_log.seen.endTime, endStamp.c_str());
 }
 
+TEST_F(Report, TimesAreReadUntilBothAreKnown) {
+    name("/var/adm/", "messages");
+    window();
+    m_test.text("ENTRYTIME", lessOrEqual, "9999999999999999").text("ENTRYTIME", equal, startStamp);
+    EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
+    EXPECT_STREQ(m_log.seen.endTime, endStamp.c_str());
+}
+
+TEST_F(Report, ATimeIsTakenAsSixteenBytesWhateverItsLength) {
+    name("/var/adm/", "messages");
+    m_test.raw("ENTRYTIME", greaterOrEqual, 452, startStamp, 0)
+        .raw("ENTRYTIME", lessOrEqual, 452, endStamp, 13);
+    EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
+    EXPECT_STREQ(m_log.seen.startTime, startStamp.c_str());
+    EXPECT_STREQ(m_log.seen.endTime, endStamp.c_str());
+}
+
 TEST_F(Report, HasNoEventRateThresholds) {
     m_test.number("FREQTHRESH", greaterOrEqual, 5).number("PERIODTHRS", equal, 60);
     nameAndWindow();
@@ -280,6 +297,13 @@ TEST_F(Report, ReturnsTheLogsEntries) {
     EXPECT_EQ(rows(), upTo(7));
     EXPECT_EQ(m_log.asked, 8);
     EXPECT_EQ(m_log.ends, 1);
+}
+
+TEST_F(Report, PassesItsRowsToTheFilterAsNoEvent) {
+    nameAndWindow();
+    m_log.entries = 2;
+    EXPECT_THAT(sample(TRC1_FINE),
+                ElementsAre("Passing row 0 to InsertRow().", "Passing row 1 to InsertRow()."));
 }
 
 TEST_F(Report, AnEmptyLogGivesNoRows) {
