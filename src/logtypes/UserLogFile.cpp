@@ -12,6 +12,7 @@
 #include <cerrno>
 #include <iterator>
 #include <new>
+#include <utility>
 
 namespace {
 

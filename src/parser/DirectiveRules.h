@@ -82,6 +82,13 @@ inline constexpr std::string_view CONSUMED_COUNT = "%n"; ///< ends each scan dir
 constexpr bool isWhiteSpace(char character) noexcept {
     return character == ' ' || (character >= '\t' && character <= '\r');
 }
+/// The first character of the text that is no white space.
+constexpr const char* skipWhiteSpace(const char* text) noexcept {
+    while (isWhiteSpace(*text)) {
+        ++text;
+    }
+    return text;
+}
 constexpr bool isDigit(char character) noexcept {
     return character >= '0' && character <= '9';
 }

@@ -4,7 +4,6 @@
 #include "parser/FloatField.h"
 
 #include <climits>
-#include <cstdlib>
 #include <cstring>
 #include <limits>
 
@@ -50,13 +49,6 @@ struct IntegerCode {
 constexpr IntegerCode integerCodes[] = {
     {'d', 10, true}, {'i', 0, true}, {'o', 8, false}, {'u', 10, false}, {'x', 16, false},
 };
-
-const char* skipWhiteSpace(const char* position) {
-    while (isWhiteSpace(*position)) {
-        ++position;
-    }
-    return position;
-}
 
 /// Reads digits of a base, at most `width` of them. Returns the position behind them.
 template <unsigned Base>

@@ -4,8 +4,8 @@
 #include "parser/DirectiveRules.h"
 
 #include <cstdio>
-#include <cstring>
 #include <new>
+#include <string_view>
 
 namespace {
 

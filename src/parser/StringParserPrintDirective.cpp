@@ -16,13 +16,6 @@ TRC1_Anchor anchor{"StringParserPrintDirective.cpp"};
 constexpr char OPENING_PATTERN[] = "= \"%n";
 constexpr int OPENING_LENGTH = 3; ///< characters of the pattern that the text must hold
 
-const char* skipWhiteSpace(const char* text) {
-    while (isWhiteSpace(*text)) {
-        ++text;
-    }
-    return text;
-}
-
 } // namespace
 
 const char* StringParser::getPrintDirective(const char* text) {

@@ -6,6 +6,8 @@
 
 #include <atomic>
 
+#include <fcntl.h>
+
 // Reports on user logs: the file read backwards, block by block.
 
 namespace {
@@ -265,7 +267,9 @@ TEST_F(UserLogReport, NeedsTheDate) {
     RecordingTrace trace(TRC1_ERROR);
     _RequestThresholds thresholds = window("0", "9");
     const Fault fault("time", EFAULT);
+    const Fault closed("close", EBADF, {.times = 0});
     EXPECT_EQ(m_log->startReportRequest(&thresholds), nullptr);
+    EXPECT_EQ(closed.calls(), 1) << "the descriptor of a report that does not start";
     EXPECT_THAT(trace.messages(),
                 ElementsAre("Error: unable to determine current time to complete event entrytime. "
                             "errno = 14; Bad address."));
@@ -278,6 +282,19 @@ TEST_F(UserLogReport, TellsItsBufferInDetail) {
     RecordingTrace trace(TRC1_DETAIL);
     report();
     EXPECT_EQ(trace.count("Read buffer of size 512 allocated for file " + m_path + "."), 1);
+}
+
+TEST_F(UserLogReport, ClosesItsDescriptor) {
+    makeLog(wholeLine);
+    write("one\n");
+    _RequestThresholds thresholds = window("0700101000000000", "1991231235959000");
+    void* state = m_log->startReportRequest(&thresholds);
+    ASSERT_NE(state, nullptr);
+    const int fd = static_cast<UserlogBufferInfo*>(state)->fd;
+    EXPECT_NE(fcntl(fd, F_GETFD), -1);
+    m_log->endReportRequest(&state);
+    EXPECT_EQ(fcntl(fd, F_GETFD), -1);
+    EXPECT_EQ(errno, EBADF);
 }
 
 TEST_F(UserLogReport, AReadErrorEndsItWithWhatItHas) {
