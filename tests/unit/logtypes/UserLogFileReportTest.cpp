@@ -163,6 +163,8 @@ TEST_F(UserLogReport, DatesALogWithoutYearsOverNewYear) {
     write("0105 last year's, as it is still to come\n");
     EXPECT_THAT(times(report()), ElementsAre("1050105120000000"));
     EXPECT_THAT(times(report()), ElementsAre("1050105120000000")) << "each report begins today";
+    m_clock.set(883612799); // 31 December 1997, 23:59:59
+    EXPECT_THAT(times(report()), ElementsAre("0970105235900000"));
 }
 
 TEST_F(UserLogReport, BadLinesAreDroppedUpToTenInARow) {

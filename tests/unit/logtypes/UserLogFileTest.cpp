@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <chrono>
 
 // User logs: learning the format, lines to rows, the monitor.
 
@@ -188,6 +189,8 @@ TEST_F(UserLog, TheMonitorReportsAppendedLines) {
     RecordingTrace trace(TRC1_ERROR);
     write("5 before the start\n");
     m_line = validLog(m_path, R"( ;N ;U ;A,"%d %[^\n]",day description)");
+    const Fault waits("select", EINTR, {.times = 0});
+    const auto start = std::chrono::steady_clock::now();
     m_log = std::make_unique<UserLogFile>(*m_line, nullptr);
     // The present end is found before the first look; wait until reports can be made, then append.
     _RequestThresholds thresholds = window("0", "9");
@@ -205,7 +208,12 @@ TEST_F(UserLog, TheMonitorReportsAppendedLines) {
     EXPECT_EQ(columnText(rows[0].entrydesc), "appended");
     EXPECT_EQ(columnText(rows[0].entrytime), "1061007123400000");
     m_log->stopThread();
+    const auto waited = std::chrono::steady_clock::now() - start;
+    EXPECT_GE(waits.calls(), 1);
+    EXPECT_GE(waited, std::chrono::seconds(waits.calls()) - std::chrono::milliseconds(100))
+        << "each look is followed by a second's wait";
     EXPECT_EQ(m_log->monitorStatus(), MONITOR_STOPPED);
+    EXPECT_EQ(((*m_log).*(&UserLogMembers::LogFileP)).load(), nullptr) << "the log is closed";
     EXPECT_EQ(m_log->numEvents(), 3 * static_cast<std::int64_t>(EventRecorder::rows().size()));
     EXPECT_EQ(m_log->numFormatErrors(), m_log->numEvents() / 3 * 2) << "words and blank lines";
 }

@@ -28,8 +28,8 @@
 /// Names the protected members of user logs, for pointers to them.
 class UserLogMembers : public UserLogFile {
 public:
-    using UserLogFile::deallocateReportBuffers;
     using UserLogFile::formatEntryTime;
+    using UserLogFile::LogFileP;
     using UserLogFile::NumericMonth;
     using UserLogFile::OptimumBlockSize;
     using UserLogFile::SPAnchor;

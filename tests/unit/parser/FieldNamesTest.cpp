@@ -47,7 +47,9 @@ TEST(FieldNames, AreAcceptedFromTheMinimumToTheWholeKeyword) {
     EXPECT_EQ(fieldNamed("Month"), "");
     EXPECT_EQ(fieldNamed("mo=\"%d\""), "month");
     EXPECT_EQ(fieldNamed("m=\"%d\""), "");
-    EXPECT_EQ(fieldNamed("mo\n = \"%d\""), "month");
+    for (const char* space : {" ", "\t", "\n", "\v", "\f", "\r"}) {
+        EXPECT_EQ(fieldNamed("mo" + std::string(space) + "= \"%d\""), "month");
+    }
 }
 
 TEST(FieldNames, TheFirstEntryThatMatchesWins) {

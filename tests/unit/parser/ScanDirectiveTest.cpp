@@ -86,6 +86,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Learned{R"(\"\'\?\\\a\b\n\r\t\v%d)", "\"'?\\\a\b\n\r\t\v%d%n", 1, 0},
                     Learned{R"(%[^\"\\])", "%31[^\"\\]%n", 8, 31},
                     Learned{"%[]a]", "%31[]a]%n", 8, 31}, Learned{"%[^]a]", "%31[^]a]%n", 8, 31},
+                    Learned{"%[^^]", "%31[^^]%n", 8, 31},
                     Learned{R"(%[\t^])", "%31[\t^]%n", 8, 31}));
 
 TEST(ScanDirective, SuppressedOnesNeedNoFieldNameAndHaveNoStorage) {
@@ -142,6 +143,8 @@ TEST(ScanDirective, RefusesWidthsByValueAndByLength) {
                 ElementsAre("Invalid field width specified: 0; ZERO < width <= 1023."));
     EXPECT_THAT(errorsOf("%10000s"),
                 ElementsAre("Invalid field width specified: 10000; ZERO < width <= 1023."));
+    EXPECT_THAT(errorsOf("%4294967297d"), // 1 in 32 bits
+                ElementsAre("Invalid field width specified: 4294967297; ZERO < width <= 1023."));
     EXPECT_THAT(errorsOf("%99999999999999999999d"),
                 ElementsAre("Invalid field width specified: 99999999999999999999; ZERO < width <= "
                             "1023."));
