@@ -244,8 +244,8 @@ void LogManager::printSelf() const {
     TraceScope trace(anchor);
     // Both times show the syslog configuration's.
     const std::time_t changed = SyslogConfFileLastChanged;
-    char changedText[26] = "";
-    const char* const lastChanged = ctime_r(&changed, changedText);
+    char lastChanged[26] = ""; // stays empty for a year that has no text
+    ctime_r(&changed, lastChanged);
     const pthread_t thread = ManagerThread;
     trace.always()(
         "\n\tthis\t\t\t\t= %p\n\tConfigFile\t\t\t= \"%s\"\n"

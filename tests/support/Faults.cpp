@@ -144,6 +144,7 @@ void* operator new[](std::size_t size, const std::nothrow_t&) noexcept {
 
 WRAP_CODE(atexit, (void (*routine)()), (routine))
 WRAP_ERRNO(int, close, -1, (int fd), (fd))
+WRAP_ERRNO(char*, ctime_r, nullptr, (const time_t* time, char* text), (time, text))
 WRAP_ERRNO(int, fclose, EOF, (std::FILE * stream), (stream))
 WRAP_ERRNO(std::FILE*, fopen, nullptr, (const char* path, const char* mode), (path, mode))
 WRAP_ERRNO(size_t, fread, 0, (void* data, size_t size, size_t count, std::FILE* stream),

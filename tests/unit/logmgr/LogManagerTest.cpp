@@ -172,6 +172,15 @@ TEST_F(LogManagerTest, BothTimesOfTheDumpAreTheSyslogConfigurations) {
     EXPECT_THAT(trace.messages().back(), HasSubstr("\tSyslogConfFileLastChanged\t= " + text));
 }
 
+TEST_F(LogManagerTest, ATimeThatHasNoTextIsEmptyInTheDump) {
+    configure(a + "\n");
+    start();
+    const Fault fault("ctime_r", EOVERFLOW);
+    manager->printSelf();
+    EXPECT_THAT(trace.messages().back(), HasSubstr("LastChanged\t\t= \tSyslogConfFile\t"));
+    EXPECT_THAT(trace.messages().back(), HasSubstr("SyslogConfFileLastChanged\t= \tNumLogs\t"));
+}
+
 TEST_F(LogManagerTest, CountsRequests) {
     configure(a + "\n");
     start();
