@@ -111,7 +111,6 @@ class Agent:
         self.situations = []
         self.sink = "-"
         self.listen = ""
-        self.extra_toml = ""  # further tables
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -148,9 +147,7 @@ class Agent:
         keys.update(self.agent_keys)
         text = f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
-        if "[http]" not in self.extra_toml:
-            text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
-        text += self.extra_toml
+        text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         if self.sink is not None:
             text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
         for situation in self.situations:
@@ -266,6 +263,15 @@ class Agent:
             return events if len(events) >= count else None
 
         return self._alive_until(arrived, f"{count} events", seconds)
+
+    def wait_debug_records(self, count):
+        """Waits until the debug log has that many records: so many lines were read and offered."""
+        path = Path(self.environment["AGENT_DEBUG_LOG"])
+
+        def written():
+            return path.read_bytes().count(b">>>>>>>>> RECORD ") >= count
+
+        self._alive_until(written, f"{count} records in the debug log", PATIENCE)
 
     def wait_open(self, path):
         """Waits until the agent has the file open and stands at its end: it monitors from here."""

@@ -5,8 +5,8 @@ import sys
 import time
 
 import pytest
+from api import Api
 from conftest import ROOT, wait_until
-from reports import report, serve_reports
 
 sys.path.insert(0, str(ROOT / "tests/tools"))
 from accounting import record  # noqa: E402
@@ -114,10 +114,10 @@ def test_many_records_in_one_go_all_arrive_in_order(agent, log):
 
 
 def test_a_report_reads_the_log_backwards_within_its_window(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     log.path.write_bytes(b"".join(record(f"u{i}", when=NINE + 60 * i) for i in range(1000)))
     agent.start()
-    answer = report(agent, log, "2006-10-05T09:05:00Z", "2006-10-05T09:08:00Z")
+    answer = Api(agent).report(log, "2006-10-05T09:05:00Z", "2006-10-05T09:08:00Z")
     users = [row["ENTRYDESC"].split(";")[0] for row in answer["rows"]]
     assert users == ["user = u5", "user = u4", "user = u3", "user = u2"]
     assert agent.stop() == 0

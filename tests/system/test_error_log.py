@@ -9,8 +9,8 @@ from pathlib import Path
 from signal import SIGKILL, SIGTERM
 
 import pytest
+from api import Api
 from conftest import descriptions, wait_until
-from reports import monitored, report, serve_reports
 
 HEADER = "IDENTIFIER TIMESTAMP  T C RESOURCE_NAME  DESCRIPTION"
 ENTRY = "A924A5FC   1005090306 P S SYSPROC        SOFTWARE PROGRAM ABNORMALLY TERMINATED"
@@ -139,7 +139,7 @@ def children(agent):
 
 
 def test_the_lines_of_the_command_become_events_as_they_come(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     start(agent)
     log.append(ENTRY)
     assert descriptions(agent.wait_events(1)) == [
@@ -156,7 +156,7 @@ def test_the_lines_of_the_command_become_events_as_they_come(agent, log):
         "sysplanar0",
         "BFE4C025: UNDETERMINED ERROR",
     ]
-    state = monitored(agent, log)
+    state = Api(agent).logs()[log.path.name]
     assert (state["MONSTATUS"], state["NUMEVENTS"], state["NUMERRORS"]) == ("Running", 4, 1)
     assert agent.stop() == 0
 
@@ -187,9 +187,9 @@ def test_stopping_does_not_hang_while_the_command_writes_for_ever(agent, log):
     log.errpt(ENDLESS)
     agent.situations.clear()
     agent.situation(log=log, when=["ENTRYDESC contains 'no such text'"])
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     start(agent)
-    wait_until(lambda: monitored(agent, log)["NUMEVENTS"] > 10000, "10000 entries")
+    wait_until(lambda: Api(agent).logs()[log.path.name]["NUMEVENTS"] > 10000, "10000 entries")
     assert agent.stop() == 0
     wait_until(lambda: all(has_ended(pid) for pid, _ in log.calls()), "the command's end")
 
@@ -209,13 +209,13 @@ def test_stopping_waits_for_a_command_that_ignores_the_signal_for_a_while(agent,
 
 
 def test_a_command_that_ends_ends_the_monitor_and_a_refresh_starts_it_again(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     log.errpt(f"echo '{ENTRY}'; exit 3")
     start(agent)
     agent.wait_events(1)
     agent.wait_trace("EOF detected during fgets() system call on pipe")
     agent.wait_trace("has terminated normally; exit status = 3")
-    assert monitored(agent, log)["MONSTATUS"] == "Error: log read failed"
+    assert Api(agent).logs()[log.path.name]["MONSTATUS"] == "Error: log read failed"
     assert children(agent) == []
 
     log.errpt()
@@ -223,7 +223,7 @@ def test_a_command_that_ends_ends_the_monitor_and_a_refresh_starts_it_again(agen
     log.configure()
     agent.refresh()
     assert descriptions(agent.wait_events(2))[1] == "BFE4C025: UNDETERMINED ERROR"
-    assert monitored(agent, log)["MONSTATUS"] == "Running"
+    assert Api(agent).logs()[log.path.name]["MONSTATUS"] == "Running"
     assert agent.stop() == 0
 
 
@@ -281,7 +281,7 @@ def test_refreshes_leave_neither_zombies_nor_descriptors(agent, log):
 
 def test_the_command_finds_nothing_of_the_agents_open(agent, log):
     agent.log("app.log")
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     agent.environment["AGENT_DEBUG_LOG"] = str(agent.directory / "debug.log")
     log.errpt("readlink /proc/self/fd/* > open; ls /proc/self/fd > numbers; exec sleep 1000")
     start(agent)
@@ -295,11 +295,11 @@ def test_the_command_finds_nothing_of_the_agents_open(agent, log):
 
 
 def test_a_report_runs_a_command_of_its_own_over_its_window(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     log.errpt(reporting=f"echo '{HEADER}'; echo '{OTHER}'; echo '{ENTRY}'")
     start(agent)
     log.wait_calls(1)
-    answer = report(agent, log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
+    answer = Api(agent).report(log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
     assert descriptions([{"row": row} for row in answer["rows"]]) == [
         "BFE4C025: UNDETERMINED ERROR",
         "A924A5FC: SOFTWARE PROGRAM ABNORMALLY TERMINATED",
@@ -312,11 +312,11 @@ def test_a_report_runs_a_command_of_its_own_over_its_window(agent, log):
 
 
 def test_a_report_that_has_enough_ends_a_command_that_writes_for_ever(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     agent.agent_keys["max_rows"] = 50
     log.errpt(reporting=f"echo '{HEADER}'; {ENDLESS}")
     start(agent)
-    answer = report(agent, log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
+    answer = Api(agent).report(log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
     assert len(answer["rows"]) == 50
     pid = log.calls("report-calls")[0][0]
     assert has_ended(pid)
@@ -326,12 +326,12 @@ def test_a_report_that_has_enough_ends_a_command_that_writes_for_ever(agent, log
 
 
 def test_a_report_without_the_program_is_empty_and_hurts_nothing_else(agent, log):
-    serve_reports(agent)
+    agent.listen = "127.0.0.1:0"
     start(agent)
     log.append(ENTRY)
     agent.wait_events(1)
     (log.bin / "errpt").unlink()
-    answer = report(agent, log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
+    answer = Api(agent).report(log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
     assert answer["rows"] == []
     message = (
         "Error executing command errpt -s1005070306 -e1031235906 for report on file  "

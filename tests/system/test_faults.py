@@ -53,14 +53,15 @@ def test_a_sink_that_cannot_be_written_is_retried_and_nothing_is_dropped(agent):
 
 
 def test_a_sink_that_is_full_all_along_does_not_hold_up_the_stop(agent):
-    log = agent.log()
+    log = agent.log(fields=";Y ;S")
     agent.situation(log=log)
     agent.sink = Path("/dev/full")
+    agent.environment["AGENT_DEBUG_LOG"] = str(agent.directory / "debug.log")
     agent.start()
     log.append("".join(syslog_line(f"number {i}") for i in range(5000)))
     agent.wait_trace("Error delivering events to /dev/full: write failed: No space left on device.")
+    agent.wait_debug_records(2048)  # the queue is full, and the log waits for room
     assert agent.stop() == 0
-    # The queue was full, and a log waited for room.
     assert agent.trace("zrmagent: 2048 events were not delivered to /dev/full")
 
 

@@ -1,5 +1,7 @@
 """Command line, host configuration, start and stop."""
 
+import json
+import os
 import subprocess
 from signal import SIGINT, SIGQUIT, SIGABRT, SIGTERM
 
@@ -132,13 +134,20 @@ def test_quit_aborts(agent):
 
 
 def test_events_read_before_the_stop_are_delivered(agent):
-    log = agent.log()
+    log = agent.log(fields=";Y ;S")
     agent.situation(log=log)
-    agent.start()
+    agent.environment["AGENT_DEBUG_LOG"] = str(agent.directory / "debug.log")
+    reading, writing = os.pipe()
+    agent.start(stdout=writing)
+    os.close(writing)
+    # More than the pipe holds: most events still wait for their reader when the agent is stopped.
     log.append("".join(syslog_line(f"number {i}") for i in range(500)))
-    agent.wait_events(1)
-    assert agent.stop() == 0
-    assert descriptions(agent.events()) == [f"number {i}" for i in range(500)]
+    agent.wait_debug_records(500)
+    agent.send(SIGTERM)
+    with open(reading, "rb") as stream:
+        events = [json.loads(line) for line in stream]
+    assert agent.wait_end() == 0
+    assert descriptions(events) == [f"number {i}" for i in range(500)]
 
 
 @pytest.mark.slow
