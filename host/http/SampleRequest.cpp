@@ -97,7 +97,7 @@ std::variant<Condition, Problem> readFilter(const ConditionBuilder& builder, con
     if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
         return bad(problem->what + "; " + problem->cure, fieldOf(problem->part, field));
     }
-    return std::move(std::get<Condition>(result));
+    return std::get<Condition>(std::move(result));
 }
 
 /// What a report on Log Entries lacks; none when it is complete.

@@ -175,7 +175,7 @@ TEST_F(HostTest, TheConfigurationSetsWhatTheEnvironmentLeavesOpen) {
 TEST_F(HostTest, UnusableTraceLevelsOfTheEnvironmentAreSaid) {
     setenv("QFW_TRC1", "loud", 1);
     testing::internal::CaptureStderr();
-    start({});
+    start({"--config", write("")});
     EXPECT_THAT(testing::internal::GetCapturedStderr(),
                 testing::MatchesRegex("zrmagent: QFW_TRC1: .*; only errors are traced\n"));
 }
@@ -228,7 +228,7 @@ TEST_F(HostTest, AnEndBeforeTheMainLoopNeedsNothing) {
     EXPECT_EXIT(
         {
             std::atexit([] { AGF_Shutdown(1); });
-            start({});
+            start({"--config", write("")});
             std::exit(4);
         },
         testing::ExitedWithCode(4), "");
