@@ -171,16 +171,15 @@ TEST_F(ErrLogFileChildTest, WorksWhenItsPipeTakesTheStandardDescriptors) {
     close(0);
     close(1); // the pipe's write end takes its place
     const std::string command = printing(entry);
-    {
-        const auto monitor = start(command);
-        const auto rows = EventRecorder::waitForRows(1);
-        dup2(savedInput, 0);
-        waitForStatus(*monitor, MONITOR_ERR_READ);
-        dup2(savedOutput, 1);
-        EXPECT_EQ(rows.size(), 1U);
-    }
+    auto monitor = start(command);
+    const bool isRead = waitForStatus(*monitor, MONITOR_ERR_READ);
+    monitor.reset();
+    dup2(savedInput, 0);
+    dup2(savedOutput, 1);
     close(savedInput);
     close(savedOutput);
+    EXPECT_TRUE(isRead);
+    EXPECT_EQ(EventRecorder::rows().size(), 1U);
     EXPECT_THAT(errors(), Contains(endOfOutput(command)));
 }
 
