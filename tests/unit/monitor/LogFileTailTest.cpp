@@ -166,14 +166,6 @@ TEST_F(Tail, WhatIsAppendedBehindTheReadingIsLeftToTheNextPass) {
     EXPECT_EQ(m_log.eof(), 8);
 }
 
-TEST_F(Tail, EachLineGetsAClearedRow) {
-    open();
-    append("one\nbad\ntwo\n");
-    EXPECT_EQ(m_log.readLog(), 0);
-    EXPECT_EQ(m_log.unclearedRows, 0);
-    EXPECT_THAT(m_log.lines, SizeIs(3));
-}
-
 TEST_F(Tail, ATruncatedLogIsFollowedFromItsNewEnd) {
     append("something long\n");
     open();

@@ -15,11 +15,6 @@ char systemName[65] = "web1:ZRM";
 
 long TestLog::formatEntryAsRow(char* entry, void* row, void* /*context*/) {
     lines.emplace_back(entry);
-    const auto* const bytes = static_cast<const char*>(row);
-    if (std::any_of(bytes, bytes + sizeof(zrm_rmlogent_data_t),
-                    [](char byte) { return byte != 0; })) {
-        ++unclearedRows;
-    }
     if (onLine) {
         onLine(lines.back());
     }

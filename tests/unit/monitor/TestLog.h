@@ -63,7 +63,6 @@ public:
     std::function<void(const std::string&)> onLine; ///< called with every line, on its thread
     std::function<void()> afterReading;             ///< called with the thread's reading done
     std::vector<std::string> lines;                 ///< of the thread that reads
-    int unclearedRows = 0;                          ///< rows that were not given cleared
     std::atomic<bool> closes{true};                 ///< false: the log stays open at the end
 };
 
