@@ -42,6 +42,7 @@ public:
     virtual void* startReportRequest(void* thresholds) = 0;
     /// Fills one row from one entry, a terminated line or one record; `context` is the report's
     /// state, null while monitoring. 0 when the row is built, non-zero when the entry is rejected.
+    /// Every byte of the row is written: it may still hold the entry before.
     virtual long formatEntryAsRow(char* entry, void* row, void* context) = 0;
     /// The body of the monitoring thread: open, seek to the end, wait loop, close.
     virtual void processLogData() = 0;

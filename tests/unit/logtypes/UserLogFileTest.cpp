@@ -6,6 +6,12 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include <fcntl.h>
+#include <unistd.h>
 
 // User logs: learning the format, lines to rows, the monitor.
 
@@ -183,6 +189,39 @@ TEST_F(UserLog, DumpsItselfInDetailBeforeItsThreadStarts) {
     std::snprintf(expected, sizeof expected, "\n\tSPAnchor\t\t= %p\n\tNumericMonth\t\t= 1\n",
                   static_cast<void*>(((*m_log).*(&UserLogMembers::SPAnchor)).get()));
     EXPECT_EQ(trace.messages().back(), expected);
+}
+
+TEST_F(UserLog, RowsOfAMonitorAreAsIfEachWereMadeAlone) {
+    makeLog(R"(A,"%d %40s %300[^\n]",day source description)");
+    std::vector<std::string> lines;
+    std::string content;
+    for (std::size_t i = 0; i < 200; ++i) {
+        const bool isBad = i % 7 == 6;
+        lines.push_back((isBad ? "word " : "7 ") + std::string(1 + i * 11 % 38, 's') + " " +
+                        std::string(1 + i * 29 % 290, 'd') + "\n");
+        content += lines.back();
+    }
+    write(content);
+    const int fd = open(m_path.c_str(), O_RDONLY);
+    (*m_log).*(&UserLogMembers::LogFD) = fd;
+    EventRecorder::writeThresholds();
+    EXPECT_EQ(m_log->readLog(), 0);
+    close(fd);
+    (*m_log).*(&UserLogMembers::LogFD) = -1;
+
+    const std::vector<zrm_rmlogent_data_t> rows = EventRecorder::rows();
+    std::size_t row = 0;
+    for (std::string& line : lines) {
+        zrm_rmlogent_data_t alone;
+        std::memset(&alone, '#', sizeof alone);
+        if (m_log->formatEntryAsRow(line.data(), &alone, nullptr) == 0) {
+            ASSERT_LT(row, rows.size());
+            ASSERT_EQ(std::memcmp(&rows[row], &alone, sizeof alone), 0) << line;
+            ++row;
+        }
+    }
+    EXPECT_EQ(row, 172U);
+    EXPECT_EQ(rows.size(), row);
 }
 
 TEST_F(UserLog, TheMonitorReportsAppendedLines) {

@@ -29,6 +29,7 @@
 class UserLogMembers : public UserLogFile {
 public:
     using UserLogFile::formatEntryTime;
+    using UserLogFile::LogFD;
     using UserLogFile::LogFileP;
     using UserLogFile::NumericMonth;
     using UserLogFile::OptimumBlockSize;
