@@ -4,9 +4,9 @@
 #include "logtypes/SyslogBufferInfo.h"
 #include "monitor/BrevanTime.h"
 #include "tables/RequestThresholds.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
+#include <cstdint>
 #include <cstring>
 #include <ctime>
 #include <new>
@@ -17,10 +17,22 @@ namespace {
 
 TRC1_Anchor anchor{"SysLogFileReport.cpp"};
 
+constexpr std::size_t stampLength = 16;
 constexpr std::int64_t longestLine = 999; ///< bytes; of a longer line only so many are given
+
+bool hasNewline(const char* eightBytes) {
+    constexpr std::uint64_t ones = 0x0101010101010101;
+    std::uint64_t word;
+    std::memcpy(&word, eightBytes, sizeof word);
+    word ^= ones * '\n'; // a newline becomes a zero byte
+    return ((word - ones) & ~word & ones << 7U) != 0;
+}
 
 /// The last newline at or behind `from` and before `to`; -1 when there is none.
 std::int64_t lastNewline(const char* text, std::int64_t from, std::int64_t to) {
+    while (to - from >= 8 && !hasNewline(text + to - 8)) {
+        to -= 8;
+    }
     while (to > from) {
         if (text[--to] == '\n') {
             return to;
@@ -68,16 +80,17 @@ void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds
     TraceScope trace(anchor);
     auto& state = *static_cast<SyslogBufferInfo*>(reportState);
     const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
-    const auto& entry = *static_cast<const zrm_rmlogent_data_t*>(row);
     while (char* const line = previousLine(state)) {
-        if (formatEntryAsRow(line, row, reportState) != 0) {
-            break;
-        }
-        if (std::memcmp(entry.entrytime, window.endTime, sizeof entry.entrytime) > 0) {
+        // The time alone tells whether a row is wanted. It does not change by being made again.
+        char time[stampLength];
+        std::memset(time, ' ', stampLength);
+        formatEntryTime(time, line, reportState);
+        if (std::memcmp(time, window.endTime, stampLength) > 0) {
             continue;
         }
-        if (std::memcmp(entry.entrytime, window.startTime, sizeof entry.entrytime) < 0) {
-            break; // what stands before it is older still
+        const bool isOlder = std::memcmp(time, window.startTime, stampLength) < 0;
+        if (isOlder || formatEntryAsRow(line, row, reportState) != 0) {
+            break; // what stands before an older entry is older still
         }
         return trace.result(row);
     }
