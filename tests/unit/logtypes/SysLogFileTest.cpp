@@ -215,6 +215,18 @@ TEST_F(SyslogLine, AFieldThatRunsOnIsOverwrittenByTheCommonColumns) {
     EXPECT_EQ(std::string(row.ulogpath, path.size() + 1), path + "h");
 }
 
+TEST_F(SyslogLine, AFieldThatReachesTheCommonColumnsLeavesThemWhole) {
+    for (std::size_t length = 300; length < 400; ++length) {
+        const std::string field(length, 'x');
+        for (const std::string& header : {field + " ", " " + field + ": ", "h " + field + ": "}) {
+            const auto row = rowOf("Oct  5 07:03:09 " + header + "text\n");
+            ASSERT_EQ(row.freqthresh, 0) << header;
+            ASSERT_EQ(row.periodthrs, 0) << header;
+            ASSERT_EQ(columnText(row.timestamp), "1061005120000000") << header;
+        }
+    }
+}
+
 TEST_F(SyslogLine, NoFieldRunsPastTheRow) {
     for (const char* line : {"Oct  5 07:03:09 ", "Oct  5 07:03:09 h "}) {
         const auto room = std::make_unique<char[]>(sizeof(zrm_rmlogent_data_t) + 64);
