@@ -16,8 +16,8 @@ Delivery::Delivery(const std::vector<SinkConfig>& sinks, const RowLayout& layout
                    std::size_t rowSize)
     : m_queue(queuedEvents, rowSize) {
     for (const SinkConfig& sink : sinks) {
-        m_sinks.push_back(std::make_unique<SinkThread>(
-            m_queue, std::make_unique<JsonlSink>(sink.path, EventJson(layout))));
+        m_sinks.push_back(std::make_unique<SinkThread>(m_queue, EventJson(layout),
+                                                       std::make_unique<JsonlSink>(sink.path)));
     }
 }
 

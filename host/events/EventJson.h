@@ -5,6 +5,7 @@
 #include "host/framework/RowLayout.h"
 
 #include <string>
+#include <string_view>
 
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}. Immutable, so
 /// any thread.
@@ -15,7 +16,13 @@ public:
     /// Appends one event's object, without a newline.
     void append(std::string& text, const Event& event) const;
 
+    /// Appends the whole path of the event's log: the directory and the name, as UTF-8; the
+    /// columns that keep their own code page serve where the UTF-8 ones are empty.
+    void appendLog(std::string& text, const Event& event) const;
+
 private:
+    void appendColumn(std::string& text, const Event& event, std::string_view name) const;
+
     RowLayout m_layout;
 };
 

@@ -22,8 +22,8 @@ constexpr int pollSlice = 100; ///< milliseconds
 
 } // namespace
 
-JsonlSink::JsonlSink(std::string path, EventJson format)
-    : m_path(std::move(path)), m_isStandardOutput(m_path == "-"), m_format(std::move(format)) {}
+JsonlSink::JsonlSink(std::string path)
+    : m_path(std::move(path)), m_isStandardOutput(m_path == "-") {}
 
 JsonlSink::~JsonlSink() {
     close();
@@ -129,12 +129,12 @@ void JsonlSink::takeBackTornLine() {
     }
 }
 
-std::size_t JsonlSink::deliver(std::span<const Event> events, const std::stop_token& giveUp) {
+std::size_t JsonlSink::deliver(std::span<const EventRecord> events, const std::stop_token& giveUp) {
     TraceScope trace(anchor);
     m_text.clear();
     m_lines.clear();
-    for (const Event& event : events) {
-        m_format.append(m_text, event);
+    for (const EventRecord& event : events) {
+        m_text += event.json;
         m_text += '\n';
         m_lines.push_back(m_text.size());
     }

@@ -1,7 +1,6 @@
 #ifndef ZRM_HOST_JSONL_SINK_H
 #define ZRM_HOST_JSONL_SINK_H
 
-#include "host/events/EventJson.h"
 #include "host/events/Sink.h"
 
 #include <chrono>
@@ -19,13 +18,14 @@
 class JsonlSink : public Sink {
 public:
     /// `path` is "-" for standard output, or a file.
-    JsonlSink(std::string path, EventJson format);
+    explicit JsonlSink(std::string path);
     ~JsonlSink() override;
     JsonlSink(const JsonlSink&) = delete;
     JsonlSink& operator=(const JsonlSink&) = delete;
 
     std::string name() const override;
-    std::size_t deliver(std::span<const Event> events, const std::stop_token& giveUp) override;
+    std::size_t deliver(std::span<const EventRecord> events,
+                        const std::stop_token& giveUp) override;
     std::string error() const override { return m_error; }
 
 private:
@@ -42,7 +42,6 @@ private:
 
     const std::string m_path;
     const bool m_isStandardOutput;
-    EventJson m_format;
     int m_fd = -1;
     bool m_isRegular = false;         ///< a regular file never makes a write wait for a reader
     std::size_t m_unblockedWrite = 0; ///< bytes that a pipe with room takes without waiting

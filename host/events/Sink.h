@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_SINK_H
 #define ZRM_HOST_SINK_H
 
-#include "host/events/Event.h"
+#include "host/events/EventRecord.h"
 
 #include <cstddef>
 #include <span>
@@ -19,7 +19,8 @@ public:
     /// Delivers events in order and returns how many were delivered; fewer than all is a failure
     /// that error() explains, and the caller offers the rest again, beginning with the first that
     /// was not delivered. May wait for the receiver; ends a wait when `giveUp` is requested.
-    virtual std::size_t deliver(std::span<const Event> events, const std::stop_token& giveUp) = 0;
+    virtual std::size_t deliver(std::span<const EventRecord> events,
+                                const std::stop_token& giveUp) = 0;
 
     /// Why the last delivery failed.
     virtual std::string error() const = 0;

@@ -15,8 +15,9 @@ constexpr std::chrono::milliseconds longestPause{30'000};
 
 } // namespace
 
-SinkThread::SinkThread(EventQueue& queue, std::unique_ptr<Sink> sink)
-    : m_queue(queue), m_reader(queue.addReader()), m_sink(std::move(sink)), m_pause(firstPause) {}
+SinkThread::SinkThread(EventQueue& queue, EventJson format, std::unique_ptr<Sink> sink)
+    : m_queue(queue), m_reader(queue.addReader()), m_format(std::move(format)),
+      m_sink(std::move(sink)), m_texts(batch), m_logs(batch), m_pause(firstPause) {}
 
 SinkThread::~SinkThread() {
     finish(Clock::now());
@@ -49,8 +50,23 @@ void SinkThread::run() {
     m_changed.notify_all();
 }
 
+std::span<const EventRecord> SinkThread::recordsOf(std::span<const Event> events) {
+    m_records.clear();
+    for (const Event& event : events) {
+        std::string& text = m_texts[m_records.size()];
+        std::string& log = m_logs[m_records.size()];
+        text.clear();
+        m_format.append(text, event);
+        log.clear();
+        m_format.appendLog(log, event);
+        m_records.push_back(
+            {event.id, event.raised, event.situation->name, event.situation->severity, log, text});
+    }
+    return m_records;
+}
+
 std::size_t SinkThread::deliver(std::span<const Event> events) {
-    const std::size_t delivered = m_sink->deliver(events, m_giveUp.get_token());
+    const std::size_t delivered = m_sink->deliver(recordsOf(events), m_giveUp.get_token());
     if (delivered < events.size()) {
         failed();
     } else if (m_failing) {

@@ -1,7 +1,9 @@
 #ifndef ZRM_HOST_SINK_THREAD_H
 #define ZRM_HOST_SINK_THREAD_H
 
+#include "host/events/EventJson.h"
 #include "host/events/EventQueue.h"
+#include "host/events/EventRecord.h"
 #include "host/events/Sink.h"
 
 #include <condition_variable>
@@ -9,7 +11,9 @@
 #include <memory>
 #include <mutex>
 #include <stop_token>
+#include <string>
 #include <thread>
+#include <vector>
 
 /// Carries events from the queue to one sink, on a thread and with a cursor of its own. A delivery
 /// that fails is tried again after growing pauses, and nothing is passed over: while a sink is
@@ -19,7 +23,7 @@ public:
     using Clock = EventQueue::Clock;
 
     /// Takes a place among the queue's readers; the queue outlives the object.
-    SinkThread(EventQueue& queue, std::unique_ptr<Sink> sink);
+    SinkThread(EventQueue& queue, EventJson format, std::unique_ptr<Sink> sink);
     SinkThread(const SinkThread&) = delete;
     SinkThread& operator=(const SinkThread&) = delete;
     /// Ends the thread at once when finish was not called.
@@ -38,12 +42,17 @@ public:
 private:
     void run();
     std::size_t deliver(std::span<const Event> events);
+    std::span<const EventRecord> recordsOf(std::span<const Event> events);
     void failed();
     void pause();
 
     EventQueue& m_queue;
     const EventQueue::Reader m_reader;
+    const EventJson m_format;
     std::unique_ptr<Sink> m_sink;
+    std::vector<std::string> m_texts;    ///< of one delivery: the events as JSON
+    std::vector<std::string> m_logs;     ///< of one delivery: the logs
+    std::vector<EventRecord> m_records;  ///< of one delivery; views into the texts
     bool m_failing = false;              ///< the last delivery failed
     std::chrono::milliseconds m_pause{}; ///< before the next try
 

@@ -30,4 +30,12 @@ TEST(EventJson, QuotesTheSituation) {
                     R"("LOGNAME":"app.log","TEXT":"","NUMBER":7}})");
 }
 
+TEST(EventJson, NamesTheLogByItsWholePath) {
+    TestEvents events;
+    events.add("");
+    std::string text = "log ";
+    EventJson(testLayout()).appendLog(text, events.all()[0]);
+    EXPECT_EQ(text, "log /var/log/app.log");
+}
+
 } // namespace

@@ -52,8 +52,8 @@ protected:
             lines += TestEvents::line(static_cast<int>(events.all().size()), text);
         }
     }
-    std::span<const Event> from(std::size_t first) {
-        return std::span(events.all()).subspan(first);
+    std::span<const EventRecord> from(std::size_t first) {
+        return std::span(events.records()).subspan(first);
     }
 
     TemporaryDirectory directory;
@@ -61,11 +61,10 @@ protected:
     TestEvents events;
     std::string lines; ///< of all three events
     std::stop_source giveUp;
-    const EventJson format{testLayout()};
 };
 
 TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     EXPECT_EQ(sink.name(), path);
     EXPECT_EQ(sink.deliver(from(0).first(1), giveUp.get_token()), 1u);
     EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 2u);
@@ -77,14 +76,14 @@ TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
 
 TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
     directory.write("events.jsonl", "earlier\n");
-    JsonlSink(path, format).deliver(from(0), giveUp.get_token());
+    JsonlSink(path).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n" + lines);
 }
 
 TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     const std::string removed = directory.file("removed.jsonl");
-    JsonlSink movedSink(path, format);
-    JsonlSink removedSink(removed, format);
+    JsonlSink movedSink(path);
+    JsonlSink removedSink(removed);
     movedSink.deliver(from(0).first(1), giveUp.get_token());
     removedSink.deliver(from(0).first(1), giveUp.get_token());
     std::filesystem::rename(path, directory.file("events.jsonl.1"));
@@ -107,7 +106,7 @@ TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
 
 TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
     const std::string inside = directory.file("later/events.jsonl");
-    JsonlSink sink(inside, format);
+    JsonlSink sink(inside);
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "open failed: No such file or directory");
     std::filesystem::create_directory(directory.file("later"));
@@ -116,13 +115,13 @@ TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
 }
 
 TEST_F(JsonlSinkTest, AFullDeviceIsAFailure) {
-    JsonlSink sink("/dev/full", format);
+    JsonlSink sink("/dev/full");
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "write failed: No space left on device");
 }
 
 TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     {
         Fault fault("write", EIO);
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
@@ -133,7 +132,7 @@ TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
 }
 
 TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     Fault fault("write", EINTR, {.times = 3});
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     EXPECT_EQ(fault.failed(), 3);
@@ -142,7 +141,7 @@ TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
 
 TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
     const std::size_t first = TestEvents::line(1, "one").size();
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     {
         const FileSizeLimit limit(first + 10);
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 1u);
@@ -155,7 +154,7 @@ TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
 
 TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
     const std::size_t first = TestEvents::line(1, "one").size();
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     Fault fault("ftruncate", EPERM, {.times = -1});
     {
         const FileSizeLimit limit(first + 10);
@@ -171,7 +170,7 @@ TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
 
 TEST_F(JsonlSinkTest, APipeThatNobodyReadsIsAFailureUntilSomebodyDoes) {
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
-    JsonlSink sink(path, format);
+    JsonlSink sink(path);
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "open failed: No such device or address");
     const int reader = open(path.c_str(), O_RDONLY | O_NONBLOCK);
@@ -221,14 +220,14 @@ private:
 };
 
 TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
-    JsonlSink sink("-", format);
+    JsonlSink sink("-");
     EXPECT_EQ(sink.name(), "standard output");
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     EXPECT_EQ(readAll(), lines);
 }
 
 TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
-    JsonlSink sink("-", format);
+    JsonlSink sink("-");
     std::string expected;
     std::string written;
     std::jthread stopper;
@@ -256,7 +255,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
 TEST_F(JsonlSinkPipeTest, AReaderThatHasGoneIsAFailure) {
     close(reader);
     reader = -1;
-    JsonlSink sink("-", format);
+    JsonlSink sink("-");
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "write failed: Broken pipe");
 }

@@ -1,5 +1,6 @@
 #include "host/events/SinkThread.h"
 
+#include "TestEvents.h"
 #include "support/RecordingTrace.h"
 
 #include <gmock/gmock.h>
@@ -39,7 +40,7 @@ public:
     explicit TestSink(std::shared_ptr<SinkState> state) : m_state(std::move(state)) {}
     std::string name() const override { return "test"; }
     std::string error() const override { return "no room"; }
-    std::size_t deliver(std::span<const Event> events, const std::stop_token&) override {
+    std::size_t deliver(std::span<const EventRecord> events, const std::stop_token&) override {
         const std::lock_guard guard(m_state->mutex);
         m_state->tries.push_back(Clock::now());
         std::size_t count = events.size();
@@ -47,7 +48,7 @@ public:
             m_state->failures -= m_state->failures > 0 ? 1 : 0;
             count = std::min(count - 1, m_state->taken.load());
         }
-        for (const Event& event : events.first(count)) {
+        for (const EventRecord& event : events.first(count)) {
             m_state->ids.push_back(event.id);
         }
         return count;
@@ -60,9 +61,8 @@ private:
 class SinkThreadTest : public testing::Test {
 protected:
     void push(int count) {
-        const char row[8] = {};
         for (int number = 0; number < count; ++number) {
-            EXPECT_TRUE(queue.push(label, row));
+            EXPECT_TRUE(queue.push(label, row.bytes()));
         }
     }
     static std::vector<std::uint64_t> upTo(std::uint64_t last) {
@@ -74,10 +74,11 @@ protected:
     }
 
     RecordingTrace trace{TRC1_ERROR};
-    EventQueue queue{100, 8};
+    TestRow row{"/var/log/", "app.log", "text", 7};
+    EventQueue queue{100, sizeof(TestRow)};
     std::shared_ptr<const SituationLabel> label = std::make_shared<const SituationLabel>();
     std::shared_ptr<SinkState> state = std::make_shared<SinkState>();
-    SinkThread thread{queue, std::make_unique<TestSink>(state)};
+    SinkThread thread{queue, EventJson(testLayout()), std::make_unique<TestSink>(state)};
 };
 
 TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
@@ -158,7 +159,7 @@ TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
 
 TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
     auto otherState = std::make_shared<SinkState>();
-    SinkThread other(queue, std::make_unique<TestSink>(otherState));
+    SinkThread other(queue, EventJson(testLayout()), std::make_unique<TestSink>(otherState));
     state->failures = -1;
     state->taken = 0;
     thread.start();

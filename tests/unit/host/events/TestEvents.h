@@ -2,6 +2,7 @@
 #define ZRM_TESTS_TEST_EVENTS_H
 
 #include "host/events/EventJson.h"
+#include "host/events/EventRecord.h"
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "unit/host_framework/TestTable.h"
@@ -37,6 +38,19 @@ public:
     }
     const std::vector<Event>& all() const { return m_events; }
 
+    /// The same events as records.
+    const std::vector<EventRecord>& records() {
+        const EventJson json(testLayout());
+        m_records.clear();
+        m_texts.clear();
+        for (const Event& event : m_events) {
+            json.append(m_texts.emplace_back(), event);
+            m_records.push_back(
+                {event.id, event.raised, "watch", "minor", "/var/log/app.log", m_texts.back()});
+        }
+        return m_records;
+    }
+
     /// The line that belongs to the event with this id and text.
     static std::string line(int id, const std::string& text) {
         return R"({"id":)" + std::to_string(id) +
@@ -50,6 +64,8 @@ private:
         std::make_shared<const SituationLabel>(SituationLabel{"watch", "minor"});
     std::deque<TestRow> m_rows;
     std::vector<Event> m_events;
+    std::deque<std::string> m_texts;
+    std::vector<EventRecord> m_records;
 };
 
 #endif

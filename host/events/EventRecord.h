@@ -1,0 +1,18 @@
+#ifndef ZRM_HOST_EVENT_RECORD_H
+#define ZRM_HOST_EVENT_RECORD_H
+
+#include <cstdint>
+#include <string_view>
+
+/// One event in the form in which it leaves the process. The texts belong to whoever gave the
+/// record, and stay as they are for as long as that says.
+struct EventRecord {
+    std::uint64_t id = 0;       ///< grows from event to event
+    std::int64_t raised = 0;    ///< milliseconds since 1970-01-01, UTC
+    std::string_view situation; ///< its name
+    std::string_view severity;  ///< info, minor, warning, major or critical
+    std::string_view log;       ///< the monitored log's whole path
+    std::string_view json;      ///< the event as one JSON object, on one line, without a newline
+};
+
+#endif
