@@ -2,7 +2,10 @@
 
 #include "agent/TraceScope.h"
 #include "host/events/JsonlSink.h"
+#include "host/events/QueueSource.h"
 #include "host/start/Say.h"
+
+#include <cinttypes>
 
 namespace {
 
@@ -16,8 +19,9 @@ Delivery::Delivery(const std::vector<SinkConfig>& sinks, const RowLayout& layout
                    std::size_t rowSize)
     : m_queue(queuedEvents, rowSize) {
     for (const SinkConfig& sink : sinks) {
-        m_sinks.push_back(std::make_unique<SinkThread>(m_queue, EventJson(layout),
-                                                       std::make_unique<JsonlSink>(sink.path)));
+        m_sinks.push_back(
+            std::make_unique<SinkThread>(std::make_unique<QueueSource>(m_queue, EventJson(layout)),
+                                         std::make_unique<JsonlSink>(sink.path), "jsonl"));
     }
 }
 
@@ -32,8 +36,16 @@ void Delivery::finish(EventQueue::Clock::time_point limit) {
     TraceScope trace(anchor);
     m_queue.close();
     for (const auto& sink : m_sinks) {
-        if (const std::size_t left = sink->finish(limit); left > 0) {
-            say("%zu events were not delivered to %s", left, sink->name().c_str());
+        if (const std::uint64_t left = sink->finish(limit); left > 0) {
+            say("%" PRIu64 " events were not delivered to %s", left, sink->name().c_str());
         }
     }
+}
+
+std::vector<SinkState> Delivery::sinkStates() const {
+    std::vector<SinkState> states;
+    for (const auto& sink : m_sinks) {
+        states.push_back(sink->state());
+    }
+    return states;
 }

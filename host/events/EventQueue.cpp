@@ -24,6 +24,17 @@ std::uint64_t EventQueue::slowest() const {
 }
 
 bool EventQueue::waitForRoom(std::unique_lock<std::mutex>& lock) {
+    if (m_closed || !full()) {
+        return !m_closed;
+    }
+    ++m_waits;
+    const Clock::time_point begin = Clock::now();
+    const bool hasRoom = waitWhileFull(lock);
+    m_waited += Clock::now() - begin;
+    return hasRoom;
+}
+
+bool EventQueue::waitWhileFull(std::unique_lock<std::mutex>& lock) {
     while (!m_closed && full()) {
         if (m_waitLimit == Clock::time_point::max()) {
             m_roomMade.wait(lock);
@@ -78,6 +89,11 @@ void EventQueue::release(Reader reader, std::size_t count) {
 std::size_t EventQueue::backlog(Reader reader) const {
     const std::lock_guard guard(m_mutex);
     return static_cast<std::size_t>(m_next - m_cursor[reader]);
+}
+
+QueueState EventQueue::state() const {
+    const std::lock_guard guard(m_mutex);
+    return {static_cast<std::size_t>(m_next - slowest()), m_events.size(), m_waits, m_waited};
 }
 
 void EventQueue::limitWaits(Clock::time_point limit) {

@@ -2,6 +2,7 @@
 #define ZRM_HOST_EVENT_QUEUE_H
 
 #include "host/events/Event.h"
+#include "host/events/QueueState.h"
 
 #include <chrono>
 #include <condition_variable>
@@ -18,7 +19,7 @@
 /// dropped. Nothing is allocated per event.
 ///
 /// Readers are added before the first push. Afterwards push may be called on any thread, and
-/// read, release and backlog of one reader on that reader's thread alone.
+/// read and release of one reader on that reader's thread alone; the rest on any.
 class EventQueue {
 public:
     using Clock = std::chrono::steady_clock;
@@ -47,6 +48,9 @@ public:
     /// Number of events that the reader has not released.
     std::size_t backlog(Reader reader) const;
 
+    /// How the queue stands. Any thread.
+    QueueState state() const;
+
     /// From now on nobody waits for room beyond this time; a waiting push gives up then. The
     /// earliest limit that was set holds.
     void limitWaits(Clock::time_point limit);
@@ -56,6 +60,7 @@ public:
 
 private:
     std::uint64_t slowest() const;
+    bool waitWhileFull(std::unique_lock<std::mutex>& lock);
     bool full() const { return m_next - slowest() >= m_events.size(); }
     bool waitForRoom(std::unique_lock<std::mutex>& lock);
 
@@ -69,6 +74,8 @@ private:
     std::vector<std::uint64_t> m_cursor; ///< per reader: the next event it will release
     std::uint64_t m_next = 0;            ///< the next event to be pushed
     Clock::time_point m_waitLimit = Clock::time_point::max();
+    std::uint64_t m_waits = 0;           ///< pushes that had to wait
+    std::chrono::nanoseconds m_waited{}; ///< for how long, those under way excepted
     bool m_closed = false;
 };
 

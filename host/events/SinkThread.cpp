@@ -15,9 +15,10 @@ constexpr std::chrono::milliseconds longestPause{30'000};
 
 } // namespace
 
-SinkThread::SinkThread(EventQueue& queue, EventJson format, std::unique_ptr<Sink> sink)
-    : m_queue(queue), m_reader(queue.addReader()), m_format(std::move(format)),
-      m_sink(std::move(sink)), m_texts(batch), m_logs(batch), m_pause(firstPause) {}
+SinkThread::SinkThread(std::unique_ptr<EventSource> source, std::unique_ptr<Sink> sink,
+                       std::string type)
+    : m_source(std::move(source)), m_sink(std::move(sink)), m_type(std::move(type)),
+      m_pause(firstPause) {}
 
 SinkThread::~SinkThread() {
     finish(Clock::now());
@@ -29,17 +30,14 @@ void SinkThread::start() {
 
 void SinkThread::run() {
     TraceScope trace(anchor);
-    for (;;) {
-        const std::span<const Event> events = m_queue.read(m_reader, batch);
+    while (!m_giveUp.stop_requested()) {
+        const std::span<const EventRecord> events = m_source->read(batch);
         if (events.empty()) {
             break;
         }
         const std::size_t delivered = deliver(events);
-        m_queue.release(m_reader, delivered);
-        if (delivered < events.size()) {
-            if (m_giveUp.stop_requested()) {
-                break;
-            }
+        m_source->release(delivered);
+        if (delivered < events.size() && !m_giveUp.stop_requested()) {
             pause();
         }
     }
@@ -50,45 +48,37 @@ void SinkThread::run() {
     m_changed.notify_all();
 }
 
-std::span<const EventRecord> SinkThread::recordsOf(std::span<const Event> events) {
-    m_records.clear();
-    for (const Event& event : events) {
-        std::string& text = m_texts[m_records.size()];
-        std::string& log = m_logs[m_records.size()];
-        text.clear();
-        m_format.append(text, event);
-        log.clear();
-        m_format.appendLog(log, event);
-        m_records.push_back(
-            {event.id, event.raised, event.situation->name, event.situation->severity, log, text});
-    }
-    return m_records;
-}
-
-std::size_t SinkThread::deliver(std::span<const Event> events) {
-    const std::size_t delivered = m_sink->deliver(recordsOf(events), m_giveUp.get_token());
-    if (delivered < events.size()) {
-        failed();
-    } else if (m_failing) {
+std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
+    const std::size_t delivered = m_sink->deliver(events, m_giveUp.get_token());
+    const bool failed = delivered < events.size();
+    if (failed) {
+        tellOfFailure();
+    } else if (m_state.condition == SinkState::Condition::FAILING) {
         TraceScope trace(anchor);
-        m_failing = false;
         trace.error()("Sink %s takes events again.", name().c_str());
     }
     if (delivered > 0) {
         m_pause = firstPause;
     }
+    note(delivered, failed);
     return delivered;
 }
 
-void SinkThread::failed() {
+void SinkThread::note(std::size_t delivered, bool failed) {
+    const std::lock_guard guard(m_mutex);
+    m_state.delivered += delivered;
+    m_state.condition = failed ? SinkState::Condition::FAILING : SinkState::Condition::UP;
+    m_state.error = failed ? m_sink->error() : std::string();
+}
+
+void SinkThread::tellOfFailure() {
     TraceScope trace(anchor);
-    if (!m_failing) {
+    if (m_state.condition != SinkState::Condition::FAILING) {
         trace.error()("Error delivering events to %s: %s. Trying again.", name().c_str(),
                       m_sink->error().c_str());
     } else {
         trace.detail()("Still no delivery to %s: %s.", name().c_str(), m_sink->error().c_str());
     }
-    m_failing = true;
 }
 
 void SinkThread::pause() {
@@ -98,14 +88,16 @@ void SinkThread::pause() {
         m_changed.wait_for(lock, firstPause, wakeUp);
         return;
     }
-    m_changed.wait_for(lock, m_pause, [&] { return m_finishing || wakeUp(); });
+    m_nextTry = Clock::now() + m_pause;
+    m_changed.wait_until(lock, m_nextTry, [&] { return m_finishing || wakeUp(); });
+    m_nextTry = {};
     m_pause = std::min(2 * m_pause, longestPause);
 }
 
-std::size_t SinkThread::finish(Clock::time_point limit) {
+std::uint64_t SinkThread::finish(Clock::time_point limit) {
     TraceScope trace(anchor);
     if (m_thread.joinable()) {
-        m_queue.close();
+        m_source->end();
         {
             std::unique_lock lock(m_mutex);
             m_finishing = true;
@@ -116,5 +108,20 @@ std::size_t SinkThread::finish(Clock::time_point limit) {
         m_changed.notify_all();
         m_thread.join();
     }
-    return trace.result(m_queue.backlog(m_reader));
+    return trace.result(m_source->backlog());
+}
+
+SinkState SinkThread::state() const {
+    std::unique_lock lock(m_mutex);
+    SinkState state = m_state;
+    const Clock::time_point nextTry = m_nextTry;
+    lock.unlock();
+    if (nextTry != Clock::time_point{}) {
+        const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextTry - Clock::now());
+        state.retryIn = std::max(left, std::chrono::milliseconds{0});
+    }
+    state.name = name();
+    state.type = m_type;
+    state.lag = m_source->backlog();
+    return state;
 }

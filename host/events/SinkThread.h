@@ -1,29 +1,31 @@
 #ifndef ZRM_HOST_SINK_THREAD_H
 #define ZRM_HOST_SINK_THREAD_H
 
-#include "host/events/EventJson.h"
-#include "host/events/EventQueue.h"
 #include "host/events/EventRecord.h"
+#include "host/events/EventSource.h"
 #include "host/events/Sink.h"
+#include "host/events/SinkState.h"
 
+#include <chrono>
 #include <condition_variable>
 #include <cstddef>
+#include <cstdint>
 #include <memory>
 #include <mutex>
+#include <span>
 #include <stop_token>
 #include <string>
 #include <thread>
-#include <vector>
 
-/// Carries events from the queue to one sink, on a thread and with a cursor of its own. A delivery
-/// that fails is tried again after growing pauses, and nothing is passed over: while a sink is
-/// down its events stay in the queue.
+/// Carries events from their source to one sink, on a thread of its own. A delivery that fails is
+/// tried again after growing pauses, and nothing is passed over: while a sink is down its events
+/// stay where they are.
 class SinkThread {
 public:
-    using Clock = EventQueue::Clock;
+    using Clock = std::chrono::steady_clock;
 
-    /// Takes a place among the queue's readers; the queue outlives the object.
-    SinkThread(EventQueue& queue, EventJson format, std::unique_ptr<Sink> sink);
+    /// `type` is the sink's in the configuration.
+    SinkThread(std::unique_ptr<EventSource> source, std::unique_ptr<Sink> sink, std::string type);
     SinkThread(const SinkThread&) = delete;
     SinkThread& operator=(const SinkThread&) = delete;
     /// Ends the thread at once when finish was not called.
@@ -32,34 +34,34 @@ public:
     /// Starts the thread.
     void start();
 
-    /// Ends the thread when it has delivered everything, at the latest at the limit; the queue is
-    /// closed by then. Returns the number of events that were not delivered. Not on the sink's own
-    /// thread; any number of times.
-    std::size_t finish(Clock::time_point limit);
+    /// Ends the source, and the thread when it has delivered everything, at the latest at the
+    /// limit. Returns the number of events that were not delivered. Not on the sink's own thread;
+    /// any number of times.
+    std::uint64_t finish(Clock::time_point limit);
 
     std::string name() const { return m_sink->name(); }
 
+    /// How the delivery stands. Any thread.
+    SinkState state() const;
+
 private:
     void run();
-    std::size_t deliver(std::span<const Event> events);
-    std::span<const EventRecord> recordsOf(std::span<const Event> events);
-    void failed();
+    std::size_t deliver(std::span<const EventRecord> events);
+    void note(std::size_t delivered, bool failed);
+    void tellOfFailure();
     void pause();
 
-    EventQueue& m_queue;
-    const EventQueue::Reader m_reader;
-    const EventJson m_format;
-    std::unique_ptr<Sink> m_sink;
-    std::vector<std::string> m_texts;    ///< of one delivery: the events as JSON
-    std::vector<std::string> m_logs;     ///< of one delivery: the logs
-    std::vector<EventRecord> m_records;  ///< of one delivery; views into the texts
-    bool m_failing = false;              ///< the last delivery failed
-    std::chrono::milliseconds m_pause{}; ///< before the next try
+    const std::unique_ptr<EventSource> m_source;
+    const std::unique_ptr<Sink> m_sink;
+    const std::string m_type;
+    std::chrono::milliseconds m_pause; ///< before the next try
 
-    std::mutex m_mutex;
+    mutable std::mutex m_mutex; ///< guards what follows
     std::condition_variable m_changed;
-    bool m_finishing = false; ///< finish was called: pauses stay short
-    bool m_ended = false;     ///< the thread's work is done
+    SinkState m_state;             ///< without what belongs to the source or to the moment
+    Clock::time_point m_nextTry{}; ///< while a pause runs; else the beginning of time
+    bool m_finishing = false;      ///< finish was called: pauses stay short
+    bool m_ended = false;          ///< the thread's work is done
     std::stop_source m_giveUp;
     std::thread m_thread;
 };

@@ -189,6 +189,29 @@ TEST(EventQueue, ALimitEndsAWaitUnderWayAndLaterOnes) {
     EXPECT_EQ(text(queue.read(reader, 1)[0]), "e");
 }
 
+TEST(EventQueue, CountsTheWaitsForRoom) {
+    EventQueue queue(2, rowSize);
+    const EventQueue::Reader reader = queue.addReader();
+    push(queue, "a");
+    push(queue, "b");
+    EXPECT_EQ(queue.state().size, 2u);
+    EXPECT_EQ(queue.state().capacity, 2u);
+    EXPECT_EQ(queue.state().waits, 0u);
+    EXPECT_EQ(queue.state().waited, 0ns);
+    auto third = std::async(std::launch::async, [&] { return push(queue, "c"); });
+    while (queue.state().waits == 0) {
+        std::this_thread::yield();
+    }
+    std::this_thread::sleep_for(20ms);
+    queue.release(reader, 1);
+    EXPECT_TRUE(third.get());
+    EXPECT_EQ(queue.state().waits, 1u);
+    EXPECT_GE(queue.state().waited, 20ms);
+    EXPECT_LT(queue.state().waited, 10s);
+    queue.release(reader, 1);
+    EXPECT_EQ(queue.state().size, 1u);
+}
+
 TEST(EventQueue, ManyThreadsKeepTheOrderOfEach) {
     constexpr int producers = 4;
     constexpr int each = 300;

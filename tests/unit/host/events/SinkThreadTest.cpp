@@ -1,6 +1,7 @@
 #include "host/events/SinkThread.h"
 
 #include "TestEvents.h"
+#include "host/events/QueueSource.h"
 #include "support/RecordingTrace.h"
 
 #include <gmock/gmock.h>
@@ -22,7 +23,7 @@ using Clock = EventQueue::Clock;
 using testing::ElementsAre;
 
 /// What a test sink does and has seen; shared with the sink, which its thread owns.
-struct SinkState {
+struct TestState {
     std::atomic<int> failures{0};         ///< deliveries that still fail; -1: all
     std::atomic<std::size_t> taken{1000}; ///< events that a failing delivery takes
     std::mutex mutex;
@@ -37,7 +38,7 @@ struct SinkState {
 
 class TestSink : public Sink {
 public:
-    explicit TestSink(std::shared_ptr<SinkState> state) : m_state(std::move(state)) {}
+    explicit TestSink(std::shared_ptr<TestState> state) : m_state(std::move(state)) {}
     std::string name() const override { return "test"; }
     std::string error() const override { return "no room"; }
     std::size_t deliver(std::span<const EventRecord> events, const std::stop_token&) override {
@@ -55,7 +56,7 @@ public:
     }
 
 private:
-    std::shared_ptr<SinkState> m_state;
+    std::shared_ptr<TestState> m_state;
 };
 
 class SinkThreadTest : public testing::Test {
@@ -64,6 +65,9 @@ protected:
         for (int number = 0; number < count; ++number) {
             EXPECT_TRUE(queue.push(label, row.bytes()));
         }
+    }
+    std::unique_ptr<EventSource> source() {
+        return std::make_unique<QueueSource>(queue, EventJson(testLayout()));
     }
     static std::vector<std::uint64_t> upTo(std::uint64_t last) {
         std::vector<std::uint64_t> ids;
@@ -77,8 +81,8 @@ protected:
     TestRow row{"/var/log/", "app.log", "text", 7};
     EventQueue queue{100, sizeof(TestRow)};
     std::shared_ptr<const SituationLabel> label = std::make_shared<const SituationLabel>();
-    std::shared_ptr<SinkState> state = std::make_shared<SinkState>();
-    SinkThread thread{queue, EventJson(testLayout()), std::make_unique<TestSink>(state)};
+    std::shared_ptr<TestState> state = std::make_shared<TestState>();
+    SinkThread thread{source(), std::make_unique<TestSink>(state), "jsonl"};
 };
 
 TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
@@ -158,8 +162,8 @@ TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
 }
 
 TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
-    auto otherState = std::make_shared<SinkState>();
-    SinkThread other(queue, EventJson(testLayout()), std::make_unique<TestSink>(otherState));
+    auto otherState = std::make_shared<TestState>();
+    SinkThread other(source(), std::make_unique<TestSink>(otherState), "jsonl");
     state->failures = -1;
     state->taken = 0;
     thread.start();
@@ -172,6 +176,39 @@ TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
     EXPECT_EQ(otherState->seen(), upTo(100));
     EXPECT_EQ(thread.finish(Clock::now()), 100u);
     EXPECT_EQ(other.finish(Clock::now() + 10s), 0u);
+}
+
+TEST_F(SinkThreadTest, TellsHowItStands) {
+    EXPECT_STREQ(thread.state().conditionName(), "starting");
+    EXPECT_EQ(thread.state().name, "test");
+    EXPECT_EQ(thread.state().type, "jsonl");
+    push(5);
+    EXPECT_EQ(thread.state().lag, 5u);
+    EXPECT_EQ(thread.state().retryIn, std::nullopt);
+    state->failures = -1;
+    state->taken = 2;
+    thread.start();
+    const auto limit = Clock::now() + 10s;
+    // Two of five, then two of three; the last is one of one, of which a failing delivery takes
+    // none.
+    while ((thread.state().delivered < 4 || !thread.state().retryIn) && Clock::now() < limit) {
+        std::this_thread::sleep_for(1ms);
+    }
+    const SinkState failing = thread.state();
+    EXPECT_STREQ(failing.conditionName(), "failing");
+    EXPECT_EQ(failing.delivered, 4u);
+    EXPECT_EQ(failing.lag, 1u);
+    EXPECT_EQ(failing.error, "no room");
+    ASSERT_TRUE(failing.retryIn);
+    EXPECT_LE(*failing.retryIn, 30s);
+    state->failures = 0;
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
+    const SinkState up = thread.state();
+    EXPECT_STREQ(up.conditionName(), "up");
+    EXPECT_EQ(up.delivered, 5u);
+    EXPECT_EQ(up.lag, 0u);
+    EXPECT_EQ(up.error, "");
+    EXPECT_EQ(up.retryIn, std::nullopt);
 }
 
 TEST_F(SinkThreadTest, EndsWithoutHavingBeenFinished) {

@@ -1,0 +1,32 @@
+#ifndef ZRM_HOST_QUEUE_SOURCE_H
+#define ZRM_HOST_QUEUE_SOURCE_H
+
+#include "host/events/EventJson.h"
+#include "host/events/EventQueue.h"
+#include "host/events/EventSource.h"
+
+#include <string>
+#include <vector>
+
+/// Events straight from the queue, for a sink without a history: what the sink has not taken stays
+/// in the queue.
+class QueueSource : public EventSource {
+public:
+    /// Takes a place among the queue's readers; the queue outlives the object.
+    QueueSource(EventQueue& queue, EventJson format);
+
+    std::span<const EventRecord> read(std::size_t most) override;
+    void release(std::size_t count) override { m_queue.release(m_reader, count); }
+    std::uint64_t backlog() const override { return m_queue.backlog(m_reader); }
+    void end() override { m_queue.close(); }
+
+private:
+    EventQueue& m_queue;
+    const EventQueue::Reader m_reader;
+    const EventJson m_format;
+    std::vector<std::string> m_texts; ///< of one read: the events as JSON
+    std::vector<std::string> m_logs;  ///< of one read: the logs
+    std::vector<EventRecord> m_records;
+};
+
+#endif
