@@ -3,10 +3,10 @@
 #include "agent/ErrorText.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
+#include "host/config/SinkReader.h"
 #include "host/config/SituationReader.h"
 #include "host/framework/TraceLevels.h"
 
-#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
@@ -83,32 +83,6 @@ void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& co
     section.refuseUnknownKeys();
 }
 
-void readSink(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
-    ConfigSection section("sink", table, problems);
-    const std::optional<std::string> type = section.text("type");
-    if (!section.has("type")) {
-        section.problem("type", "is missing", "write type = \"jsonl\"");
-    } else if (type && *type != "jsonl") {
-        section.problem("type", "'" + *type + "' is no type of sink", "write \"jsonl\"");
-    }
-    const std::optional<std::string> path = section.text("path");
-    if (!section.has("path")) {
-        section.problem("path", "is missing", "write a file's path, or \"-\" for standard output");
-    }
-    if (path) {
-        if (*path != "-") {
-            requireAbsolute(section, "path", *path);
-        }
-        const auto samePath = [&](const SinkConfig& other) { return other.path == *path; };
-        if (std::any_of(config.sinks.begin(), config.sinks.end(), samePath)) {
-            section.problem("path", "another sink has '" + *path + "' already",
-                            "give each sink a path of its own");
-        }
-        config.sinks.push_back({*path});
-    }
-    section.refuseUnknownKeys();
-}
-
 void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
     ConfigSection section("", file, problems);
     if (const std::optional<std::string> directory = section.text("state_directory")) {
@@ -122,9 +96,10 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
         readHttp(*http, problems, config);
     }
     if (const auto sinks = section.tables("sink")) {
+        SinkReader reader(problems);
         config.sinks.clear();
         for (const toml::table* const sink : *sinks) {
-            readSink(*sink, problems, config);
+            config.sinks.push_back(reader.read(*sink));
         }
     }
     if (const auto situations = section.tables("situation")) {

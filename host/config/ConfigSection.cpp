@@ -114,7 +114,8 @@ std::vector<ConfigSection::Text> ConfigSection::texts(std::string_view key) {
 const toml::table* ConfigSection::table(std::string_view key) {
     const toml::node* const node = find(key);
     if (node != nullptr && !node->is_table()) {
-        wrongType(key, *node, ("write it as [" + std::string(key) + "]").c_str());
+        const std::string path = (m_name.empty() ? "" : m_name + '.') + std::string(key);
+        wrongType(key, *node, ("write it as [" + path + "]").c_str());
         return nullptr;
     }
     return node == nullptr ? nullptr : node->as_table();

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_HOST_CONFIG_H
 #define ZRM_HOST_HOST_CONFIG_H
 
+#include "host/config/SinkConfig.h"
 #include "host/framework/Condition.h"
 #include "host/http/ListenAddress.h"
 
@@ -22,12 +23,6 @@ struct HttpConfig {
     bool operator==(const HttpConfig&) const = default;
 };
 
-/// [[sink]]
-struct SinkConfig {
-    std::string path; ///< "-" for standard output
-    bool operator==(const SinkConfig&) const = default;
-};
-
 /// [[situation]]
 struct SituationConfig {
     std::string name;
@@ -42,7 +37,7 @@ struct HostConfig {
     std::string stateDirectory = "/var/lib/zrm";
     std::vector<EnvironmentSetting> environment;
     HttpConfig http;
-    std::vector<SinkConfig> sinks = {{"-"}};
+    std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
     std::vector<SituationConfig> situations;
 };
 

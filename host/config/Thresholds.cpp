@@ -1,5 +1,7 @@
 #include "host/config/Thresholds.h"
 
+#include "host/config/DurationText.h"
+
 #include <array>
 #include <charconv>
 #include <cstdint>
@@ -61,16 +63,7 @@ std::optional<Condition> Thresholds::frequency(std::string_view text) {
 }
 
 std::optional<Condition> Thresholds::period(std::string_view text) {
-    struct Unit {
-        std::string_view name;
-        std::int64_t seconds;
-    };
-    static constexpr std::array<Unit, 4> units = {{{"s", 1}, {"m", 60}, {"h", 3600}, {"d", 86400}}};
-    const std::optional<std::int64_t> number = takeNumber(text);
-    for (const Unit& unit : units) {
-        if (number && text == unit.name && *number >= 1 && *number <= largest / unit.seconds) {
-            return condition("PERIODTHRS", INTF_EQUAL, *number * unit.seconds);
-        }
-    }
-    return std::nullopt;
+    const std::optional<std::chrono::seconds> length = DurationText::parse(text);
+    return length ? std::optional(condition("PERIODTHRS", INTF_EQUAL, length->count()))
+                  : std::nullopt;
 }

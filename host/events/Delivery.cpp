@@ -1,8 +1,8 @@
 #include "host/events/Delivery.h"
 
 #include "agent/TraceScope.h"
-#include "host/events/JsonlSink.h"
 #include "host/events/QueueSource.h"
+#include "host/sinks/SinkFactory.h"
 #include "host/start/Say.h"
 
 #include <cinttypes>
@@ -21,7 +21,7 @@ Delivery::Delivery(const std::vector<SinkConfig>& sinks, const RowLayout& layout
     for (const SinkConfig& sink : sinks) {
         m_sinks.push_back(
             std::make_unique<SinkThread>(std::make_unique<QueueSource>(m_queue, EventJson(layout)),
-                                         std::make_unique<JsonlSink>(sink.path), "jsonl"));
+                                         SinkFactory::make(sink), sink.type));
     }
 }
 

@@ -34,7 +34,7 @@ TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
     EXPECT_EQ(config.stateDirectory, "/var/lib/zrm");
     EXPECT_THAT(config.environment, IsEmpty());
     EXPECT_FALSE(config.http.listen);
-    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig{"-"}));
+    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig::jsonl("-")));
     EXPECT_THAT(config.situations, IsEmpty());
 }
 
@@ -74,7 +74,7 @@ period    = "60s"
                             EnvironmentSetting{"QFW_TRC1", "error,LogManager=detail"}));
     EXPECT_EQ(config.http.listen, (ListenAddress{"::1", 0}));
     EXPECT_EQ(config.http.tokenFile, "/srv/token");
-    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig{"/var/log/events.jsonl"}));
+    EXPECT_THAT(config.sinks, ElementsAre(SinkConfig::jsonl("/var/log/events.jsonl")));
     ASSERT_EQ(config.situations.size(), 1u);
     const SituationConfig& situation = config.situations[0];
     EXPECT_EQ(situation.name, "ssh-bruteforce");
@@ -132,7 +132,7 @@ keep_days = 30
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, token_file",
-            "zrm.toml:9: sink.rotate: unknown key; the keys here are type, path",
+            "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period",
             "zrm.toml:13: history: unknown key; the keys here are state_directory, agent, http, "
@@ -208,28 +208,6 @@ TEST(ConfigFile, RefusesToListenForOtherMachines) {
                                 "' can be reached from other machines; write a loopback address: "
                                 "127.0.0.1, [::1] or localhost"));
     }
-}
-
-TEST(ConfigFile, RefusesIncompleteAndDoubleSinks) {
-    EXPECT_THAT(
-        refused(R"([[sink]]
-[[sink]]
-type = "kafka"
-path = "events.jsonl"
-[[sink]]
-type = "jsonl"
-path = "-"
-[[sink]]
-type = "jsonl"
-path = "-"
-)"),
-        ElementsAre("zrm.toml:1: sink.type: is missing; write type = \"jsonl\"",
-                    "zrm.toml:1: sink.path: is missing; write a file's path, or \"-\" for "
-                    "standard output",
-                    "zrm.toml:3: sink.type: 'kafka' is no type of sink; write \"jsonl\"",
-                    "zrm.toml:4: sink.path: 'events.jsonl' is no absolute path; begin it with '/'",
-                    "zrm.toml:10: sink.path: another sink has '-' already; give each sink a path "
-                    "of its own"));
 }
 
 TEST(ConfigFile, RefusesSituationsWithoutANameOfTheirOwn) {

@@ -36,7 +36,8 @@ protected:
 TEST_F(DeliveryTest, EverySinkGetsEveryEvent) {
     const std::string first = directory.file("a.jsonl");
     const std::string second = directory.file("b.jsonl");
-    Delivery delivery({{first}, {second}}, testLayout(), sizeof(TestRow));
+    Delivery delivery({SinkConfig::jsonl(first), SinkConfig::jsonl(second)}, testLayout(),
+                      sizeof(TestRow));
     delivery.start();
     for (int number = 0; number < 100; ++number) {
         push(delivery, std::to_string(number));
@@ -51,7 +52,8 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEvent) {
 
 TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
     const std::string good = directory.file("good.jsonl");
-    Delivery delivery({{"/dev/full"}, {good}}, testLayout(), sizeof(TestRow));
+    Delivery delivery({SinkConfig::jsonl("/dev/full"), SinkConfig::jsonl(good)}, testLayout(),
+                      sizeof(TestRow));
     delivery.start();
     push(delivery, "a");
     push(delivery, "b");

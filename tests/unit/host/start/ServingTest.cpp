@@ -30,7 +30,7 @@ protected:
         TableManager::RegisterWithManager(&logs);
         logs.onCreate = [this](TestRequest&) { ++logSamples; };
         config.stateDirectory = directory.file("state");
-        config.sinks = {{output}};
+        config.sinks = {SinkConfig::jsonl(output)};
         config.situations = {{"every", "", "info", {}}};
     }
     ~ServingTest() override { Tables::clear(); }
@@ -102,7 +102,7 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
 }
 
 TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
-    config.sinks = {{"/dev/full"}};
+    config.sinks = {SinkConfig::jsonl("/dev/full")};
     const auto serving = Serving::begin(config, entries);
     std::atomic<int> taken{0};
     std::thread log([&] {

@@ -1,11 +1,10 @@
-#include "host/events/JsonlSink.h"
+#include "host/sinks/JsonlSink.h"
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 
 #include <algorithm>
 #include <cerrno>
-#include <utility>
 
 #include <fcntl.h>
 #include <limits.h>
@@ -22,15 +21,11 @@ constexpr int pollSlice = 100; ///< milliseconds
 
 } // namespace
 
-JsonlSink::JsonlSink(std::string path)
-    : m_path(std::move(path)), m_isStandardOutput(m_path == "-") {}
+JsonlSink::JsonlSink(const SinkConfig& config)
+    : m_name(config.name), m_path(config.text("path")), m_isStandardOutput(m_path == "-") {}
 
 JsonlSink::~JsonlSink() {
     close();
-}
-
-std::string JsonlSink::name() const {
-    return m_isStandardOutput ? "standard output" : m_path;
 }
 
 void JsonlSink::fail(const char* call, int number) {

@@ -1,8 +1,8 @@
-#include "host/events/JsonlSink.h"
+#include "host/sinks/JsonlSink.h"
 
-#include "TestEvents.h"
 #include "support/Faults.h"
 #include "support/TemporaryDirectory.h"
+#include "unit/host/events/TestEvents.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -64,7 +64,7 @@ protected:
 };
 
 TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.name(), path);
     EXPECT_EQ(sink.deliver(from(0).first(1), giveUp.get_token()), 1u);
     EXPECT_EQ(sink.deliver(from(1), giveUp.get_token()), 2u);
@@ -76,14 +76,14 @@ TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
 
 TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
     directory.write("events.jsonl", "earlier\n");
-    JsonlSink(path).deliver(from(0), giveUp.get_token());
+    JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n" + lines);
 }
 
 TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     const std::string removed = directory.file("removed.jsonl");
-    JsonlSink movedSink(path);
-    JsonlSink removedSink(removed);
+    JsonlSink movedSink(SinkConfig::jsonl(path));
+    JsonlSink removedSink(SinkConfig::jsonl(removed));
     movedSink.deliver(from(0).first(1), giveUp.get_token());
     removedSink.deliver(from(0).first(1), giveUp.get_token());
     std::filesystem::rename(path, directory.file("events.jsonl.1"));
@@ -106,7 +106,7 @@ TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
 
 TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
     const std::string inside = directory.file("later/events.jsonl");
-    JsonlSink sink(inside);
+    JsonlSink sink(SinkConfig::jsonl(inside));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "open failed: No such file or directory");
     std::filesystem::create_directory(directory.file("later"));
@@ -115,13 +115,13 @@ TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
 }
 
 TEST_F(JsonlSinkTest, AFullDeviceIsAFailure) {
-    JsonlSink sink("/dev/full");
+    JsonlSink sink(SinkConfig::jsonl("/dev/full"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "write failed: No space left on device");
 }
 
 TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     {
         Fault fault("write", EIO);
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
@@ -132,7 +132,7 @@ TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
 }
 
 TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     Fault fault("write", EINTR, {.times = 3});
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     EXPECT_EQ(fault.failed(), 3);
@@ -141,7 +141,7 @@ TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
 
 TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
     const std::size_t first = TestEvents::line(1, "one").size();
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     {
         const FileSizeLimit limit(first + 10);
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 1u);
@@ -154,7 +154,7 @@ TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
 
 TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
     const std::size_t first = TestEvents::line(1, "one").size();
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     Fault fault("ftruncate", EPERM, {.times = -1});
     {
         const FileSizeLimit limit(first + 10);
@@ -170,7 +170,7 @@ TEST_F(JsonlSinkTest, ATornLineThatStaysIsCompletedInItsFile) {
 
 TEST_F(JsonlSinkTest, APipeThatNobodyReadsIsAFailureUntilSomebodyDoes) {
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
-    JsonlSink sink(path);
+    JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "open failed: No such device or address");
     const int reader = open(path.c_str(), O_RDONLY | O_NONBLOCK);
@@ -220,14 +220,14 @@ private:
 };
 
 TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
-    JsonlSink sink("-");
+    JsonlSink sink(SinkConfig::jsonl("-"));
     EXPECT_EQ(sink.name(), "standard output");
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     EXPECT_EQ(readAll(), lines);
 }
 
 TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
-    JsonlSink sink("-");
+    JsonlSink sink(SinkConfig::jsonl("-"));
     std::string expected;
     std::string written;
     std::jthread stopper;
@@ -255,7 +255,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
 TEST_F(JsonlSinkPipeTest, AReaderThatHasGoneIsAFailure) {
     close(reader);
     reader = -1;
-    JsonlSink sink("-");
+    JsonlSink sink(SinkConfig::jsonl("-"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "write failed: Broken pipe");
 }

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_JSONL_SINK_H
 #define ZRM_HOST_JSONL_SINK_H
 
+#include "host/config/SinkConfig.h"
 #include "host/events/Sink.h"
 
 #include <chrono>
@@ -17,13 +18,12 @@
 /// is not possible, completed before anything else is written. Used by one thread.
 class JsonlSink : public Sink {
 public:
-    /// `path` is "-" for standard output, or a file.
-    explicit JsonlSink(std::string path);
+    explicit JsonlSink(const SinkConfig& config);
     ~JsonlSink() override;
     JsonlSink(const JsonlSink&) = delete;
     JsonlSink& operator=(const JsonlSink&) = delete;
 
-    std::string name() const override;
+    std::string name() const override { return m_name; }
     std::size_t deliver(std::span<const EventRecord> events,
                         const std::stop_token& giveUp) override;
     std::string error() const override { return m_error; }
@@ -40,7 +40,8 @@ private:
     void takeBackTornLine();
     void fail(const char* call, int number);
 
-    const std::string m_path;
+    const std::string m_name;
+    const std::string m_path; ///< "-" for standard output
     const bool m_isStandardOutput;
     int m_fd = -1;
     bool m_isRegular = false;         ///< a regular file never makes a write wait for a reader

@@ -1,0 +1,30 @@
+#include "host/sinks/SinkFactory.h"
+
+#include "host/sinks/JsonlSink.h"
+
+#include <algorithm>
+#include <array>
+#include <string_view>
+
+namespace {
+
+struct Maker {
+    std::string_view type;
+    std::unique_ptr<Sink> (*make)(const SinkConfig& config);
+};
+
+template <typename Type> std::unique_ptr<Sink> made(const SinkConfig& config) {
+    return std::make_unique<Type>(config);
+}
+
+constexpr std::array makers = {
+    Maker{"jsonl", made<JsonlSink>},
+};
+
+} // namespace
+
+std::unique_ptr<Sink> SinkFactory::make(const SinkConfig& config) {
+    const auto maker = std::find_if(makers.begin(), makers.end(),
+                                    [&](const Maker& known) { return known.type == config.type; });
+    return maker == makers.end() ? nullptr : maker->make(config);
+}
