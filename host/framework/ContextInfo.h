@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_CONTEXT_INFO_H
 #define ZRM_HOST_CONTEXT_INFO_H
 
+class RequestCounts;
 class ctreq;
 
 /// Receives what a request dispatches. For a situation this is called on a log's thread under the
@@ -16,14 +17,18 @@ public:
     virtual void stopped(const ctreq& request, unsigned reason) = 0;
 };
 
-/// The surroundings of a request: where its rows go. Outlives the request.
+/// The surroundings of a request: where its rows go and where it counts. Outlives the request.
 class ContextInfo {
 public:
-    explicit ContextInfo(RowReceiver& receiver) : m_receiver(receiver) {}
+    /// Without counts of its opener's, which outlive it, the request keeps its own.
+    explicit ContextInfo(RowReceiver& receiver, RequestCounts* counts = nullptr)
+        : m_receiver(receiver), m_counts(counts) {}
     RowReceiver& receiver() const noexcept { return m_receiver; }
+    RequestCounts* counts() const noexcept { return m_counts; }
 
 private:
     RowReceiver& m_receiver;
+    RequestCounts* m_counts;
 };
 
 #endif

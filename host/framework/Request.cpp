@@ -6,8 +6,9 @@
 
 #include <utility>
 
-Request::Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver)
-    : m_manager(manager), m_detail(std::move(detail)), m_context(receiver),
+Request::Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver,
+                 RequestCounts* counts)
+    : m_manager(manager), m_detail(std::move(detail)), m_context(receiver, counts),
       m_request(manager.CreateCtreq(&m_detail, &m_context)) {
     if (m_request != nullptr && m_request->handle() == 0) {
         m_request.reset();

@@ -20,8 +20,10 @@ class ctreq;
 class Request {
 public:
     /// Opens the request; isOpen() tells whether the table gave one. The receiver outlives the
-    /// request; a situation's may be called before the constructor returns.
-    Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver);
+    /// request; a situation's may be called before the constructor returns. So do the counts, into
+    /// which the request counts where there are any.
+    Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver,
+            RequestCounts* counts = nullptr);
     /// Closes the request: no row reaches the receiver any more. Waits until no other thread works
     /// on it.
     ~Request();

@@ -6,6 +6,7 @@
 #include "host/framework/ContextInfo.h"
 #include "host/framework/FilterList.h"
 #include "host/framework/HandleTable.h"
+#include "host/framework/RequestCounts.h"
 #include "host/framework/RequestDetail.h"
 #include "host/framework/Status.h"
 
@@ -27,14 +28,16 @@ std::atomic<unsigned> g_lastIdentifier{0};
 class ctreq::Framework {
 public:
     Framework(const RequestDetail& detail, ContextInfo& context)
-        : filters(detail.conditions), receiver(context.receiver()) {}
+        : filters(detail.conditions), receiver(context.receiver()),
+          counts(context.counts() != nullptr ? *context.counts() : ownCounts) {}
 
     FilterList filters;
     /// Built when the first row is judged: only then the table's columns can be asked for.
     std::optional<ConditionSet> conditions;
     RowReceiver& receiver;
     std::atomic<bool> stopped{false};
-    std::uint64_t judged = 0; ///< rows that were judged
+    RequestCounts ownCounts;
+    RequestCounts& counts;
     std::size_t capacity = 0; ///< rows that fit into the memory of the data array
 };
 
@@ -94,18 +97,22 @@ unsigned ctreq::InsertRow(char* row) {
 }
 
 unsigned ctreq::CheckForException(char* row) {
-    ++m_framework->judged;
     if (m_framework->stopped.load(std::memory_order_relaxed)) {
         return 0;
     }
+    m_framework->counts.countJudged();
     if (!m_framework->conditions) {
         m_framework->conditions.emplace(m_framework->filters, *this);
     }
-    return m_framework->conditions->holds(row) ? 1 : 0;
+    if (!m_framework->conditions->holds(row)) {
+        return 0;
+    }
+    m_framework->counts.countMatched();
+    return 1;
 }
 
 std::uint64_t ctreq::judged() const noexcept {
-    return m_framework->judged;
+    return m_framework->counts.judged();
 }
 
 unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,

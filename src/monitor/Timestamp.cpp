@@ -111,12 +111,16 @@ void Timestamp::addToChain(Timestamp* head) {
 }
 
 long Timestamp::countEvents(long period) {
+    return countEvents(period, std::time(nullptr));
+}
+
+long Timestamp::countEvents(long period, std::int64_t now) {
     TraceScope trace(anchor);
     if (!m_isHeadOfChain) {
         trace.error()("Error: Function not invoked from head-of-chain");
         return trace.result(-1L);
     }
-    long cutOff = static_cast<long>(std::time(nullptr)) - period;
+    long cutOff = static_cast<long>(now) - period;
     if (cutOff < 0) {
         cutOff = 0;
     }

@@ -23,6 +23,8 @@ public:
     /// On the head: number of events later than `period` seconds ago; the others are deleted, but
     /// never the head. -1 on any other element.
     long countEvents(long period);
+    /// The same as of `now`, seconds since the epoch.
+    long countEvents(long period, std::int64_t now);
 
     std::int64_t eventTime() const noexcept { return m_eventTime; }
     bool isHeadOfChain() const noexcept { return m_isHeadOfChain; }

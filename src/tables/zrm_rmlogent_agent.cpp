@@ -96,8 +96,8 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     if (!addEventTime(entry->entrytime)) {
         return trace.result(0U);
     }
-    const long frequency =
-        timestampChain->countEvents(static_cast<long>(thresholds.periodThreshold));
+    const long frequency = timestampChain->countEvents(
+        static_cast<long>(thresholds.periodThreshold), endOfPeriod(timestampChain->eventTime()));
     if (frequency == -1) {
         trace.error()("Timestamp chain corrupted.  Stopping situation.");
         Stopped(stoppedCorruptedChain);
@@ -121,6 +121,10 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
                    frequency, isUpperBound ? "<=" : ">=", bound, name());
     entry->freqthresh = static_cast<std::int32_t>(frequency);
     return trace.result(ctreq::InsertRow(row));
+}
+
+std::int64_t zrm_rmlogent_agent::endOfPeriod(std::int64_t /*entryTime*/) const {
+    return std::time(nullptr);
 }
 
 /// Adds the entry's time to the chain; false when the time does not convert or memory runs out.

@@ -5,6 +5,7 @@
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_base.h"
 
+#include <cstdint>
 #include <memory>
 
 class LogFile;
@@ -32,6 +33,13 @@ public:
     unsigned InsertRow(char* row) override;
     /// Writes the thresholds' columns of the rows in place and offers the rows.
     unsigned AddData(zrm_rmlogent_data_t* rows, int count) override;
+
+protected:
+    const _RequestThresholds& thresholdsInForce() const noexcept { return thresholds; }
+
+    /// The end of the period in which an entry is counted, seconds since the epoch: while logs are
+    /// monitored, now. Entries that are replayed tell their own.
+    virtual std::int64_t endOfPeriod(std::int64_t entryTime) const;
 
 private:
     void TakeSampleDestructor();

@@ -2,6 +2,7 @@
 
 #include "agent/framework/values.h"
 #include "host/framework/LockGuard.h"
+#include "host/framework/RequestCounts.h"
 #include "host/framework/Sample.h"
 #include "host/framework/Tables.h"
 #include "unit/host_framework/TestTable.h"
@@ -58,6 +59,35 @@ TEST(Request, NeverLinksAReport) {
     const Request report(manager, detailOf(SAMPLE_REPORT), receiver);
     EXPECT_TRUE(report.isOpen());
     EXPECT_THAT(manager.linked(), IsEmpty());
+}
+
+TEST(Request, CountsWhatItJudgesAndWhatMatches) {
+    TestManager manager;
+    TestReceiver receiver;
+    RequestCounts counts;
+    const auto judge = [&](Request& request, int number) {
+        TestRow row("", "", "", number);
+        request.get()->CheckForException(row.bytes());
+    };
+    {
+        Request request(manager,
+                        detailOf(SAMPLE_SITUATION, {numberCondition("NUMBER", INTF_GREATER, 5)}),
+                        receiver, &counts);
+        for (int number = 0; number < 10; ++number) {
+            judge(request, number);
+        }
+        EXPECT_EQ(counts.judged(), 10u);
+        EXPECT_EQ(counts.matched(), 4u);
+        EXPECT_EQ(request.get()->judged(), 10u);
+        request.get()->Stop();
+        judge(request, 9);
+        EXPECT_EQ(counts.judged(), 10u) << "a stopped request judges nothing";
+    }
+    Request again(manager, detailOf(SAMPLE_SITUATION), receiver, &counts);
+    judge(again, 1);
+    EXPECT_EQ(counts.judged(), 11u) << "the counts outlive the request";
+    Request other(manager, detailOf(SAMPLE_SITUATION), receiver);
+    EXPECT_EQ(other.get()->judged(), 0u);
 }
 
 TEST(Request, IsNotOpenWhenTheTableGivesNone) {

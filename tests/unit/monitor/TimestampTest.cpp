@@ -95,6 +95,15 @@ TEST_F(TimestampChain, TheWalkStopsAtTheFirstElementThatIsOut) {
     EXPECT_THAT(times(), ElementsAre(now - 2));
 }
 
+TEST_F(TimestampChain, APeriodMayEndAtAnotherTimeThanNow) {
+    for (const long time : {now - 1000, now - 995, now - 990}) {
+        add(time);
+    }
+    EXPECT_EQ(m_head->countEvents(10, now - 990), 2);
+    EXPECT_THAT(times(), ElementsAre(now - 990, now - 995));
+    EXPECT_EQ(m_head->countEvents(10), 0);
+}
+
 TEST_F(TimestampChain, APeriodBeyondTheEpochCountsEveryEventAfterIt) {
     for (const long time : {0L, 1L, now}) {
         add(time);
