@@ -28,7 +28,12 @@ struct SituationConfig {
     std::string name;
     std::string text;
     std::string severity;
-    std::vector<Condition> conditions; ///< those of `log`, `frequency` and `period` among them
+    std::vector<Condition> conditions; ///< those of `log`, `when`, `frequency` and `period`
+    // As they were written.
+    std::optional<std::string> log = std::nullopt; ///< none: every log
+    std::vector<std::string> when = {};
+    std::optional<std::string> frequency = std::nullopt;
+    std::optional<std::string> period = std::nullopt;
     bool operator==(const SituationConfig&) const = default;
 };
 

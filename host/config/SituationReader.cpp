@@ -1,134 +1,80 @@
 #include "host/config/SituationReader.h"
 
-#include "host/config/Thresholds.h"
+#include "host/config/SituationValidator.h"
 
 #include <algorithm>
-#include <array>
 #include <optional>
 #include <string_view>
 #include <utility>
-#include <variant>
+#include <vector>
 
 namespace {
 
-constexpr std::array<std::string_view, 5> severities = {"info", "minor", "warning", "major",
-                                                        "critical"};
-constexpr std::size_t longestName = 128; ///< bytes
+/// Takes the fields of a situation out of its table.
+class Fields {
+public:
+    explicit Fields(ConfigSection& section) : m_section(section) {}
 
-bool isControl(char c) {
-    return static_cast<unsigned char>(c) < 0x20 || c == 0x7f;
-}
+    /// A value of another type is a problem that the section has noted: an empty text stands for
+    /// it, and whatever is wrong with that is not worth saying.
+    std::optional<std::string> text(std::string_view key) {
+        std::optional<std::string> value = m_section.text(key);
+        if (!value && m_section.has(key)) {
+            m_noted.push_back(key);
+            value = "";
+        }
+        return value;
+    }
+    bool isNoted(std::string_view key) const {
+        return std::find(m_noted.begin(), m_noted.end(), key) != m_noted.end();
+    }
 
-bool isOn(const Condition& condition, std::string_view column) {
-    return condition.column == column;
-}
+private:
+    ConfigSection& m_section;
+    std::vector<std::string_view> m_noted;
+};
 
 } // namespace
 
-SituationReader::SituationReader(ConfigProblems& problems)
-    : m_problems(problems), m_parser("RMLOGENT") {}
-
 SituationConfig SituationReader::read(const toml::table& table) {
-    SituationConfig situation;
     ConfigSection section("situation", table, m_problems);
-    readName(section, situation);
-    situation.text = section.text("text").value_or("");
-    readSeverity(section, situation);
-    readLog(section, situation);
-    readConditions(section, situation);
-    readThresholds(section, situation);
+    Fields fields(section);
+    SituationText text;
+    text.name = fields.text("name");
+    text.text = fields.text("text");
+    text.severity = fields.text("severity");
+    text.log = fields.text("log");
+    const std::vector<ConfigSection::Text> conditions = section.texts("when");
+    for (const auto& [condition, line] : conditions) {
+        text.when.push_back(condition);
+    }
+    text.frequency = fields.text("frequency");
+    text.period = fields.text("period");
+
+    SituationConfig situation;
+    bool isNamed = true;
+    for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+        isNamed = isNamed && problem.field != "name";
+        if (problem.condition) {
+            section.problem(conditions[*problem.condition].second, problem.field, problem.what,
+                            problem.cure);
+        } else if (!fields.isNoted(problem.field)) {
+            section.problem(problem.field, problem.what, problem.cure);
+        }
+    }
+    if (isNamed) {
+        noteName(section, situation.name);
+    }
     section.refuseUnknownKeys();
     return situation;
 }
 
-void SituationReader::readName(ConfigSection& section, SituationConfig& situation) {
-    const std::optional<std::string> name = section.text("name");
-    if (!name) {
-        if (!section.has("name")) {
-            section.problem("name", "is missing", "give the situation a name");
-        }
-        return;
-    }
-    situation.name = *name;
-    if (name->empty() || name->size() > longestName ||
-        std::any_of(name->begin(), name->end(), isControl)) {
-        section.problem("name", "is no usable name",
-                        "write 1 to " + std::to_string(longestName) +
-                            " bytes without control characters");
-        return;
-    }
-    const auto [first, isNew] = m_names.emplace(*name, section.line("name"));
+void SituationReader::noteName(ConfigSection& section, const std::string& name) {
+    const auto [first, isNew] = m_names.emplace(name, section.line("name"));
     if (!isNew) {
         section.problem("name",
-                        "'" + *name + "' is the name of the situation at line " +
+                        "'" + name + "' is the name of the situation at line " +
                             std::to_string(first->second) + " too",
                         "give each situation a name of its own");
-    }
-}
-
-void SituationReader::readSeverity(ConfigSection& section, SituationConfig& situation) {
-    situation.severity = section.text("severity").value_or("warning");
-    if (std::find(severities.begin(), severities.end(), situation.severity) == severities.end()) {
-        section.problem("severity", "'" + situation.severity + "' is no severity",
-                        "write info, minor, warning, major or critical");
-    }
-}
-
-void SituationReader::readLog(ConfigSection& section, SituationConfig& situation) {
-    const std::optional<std::string> log = section.text("log");
-    if (!log) {
-        return;
-    }
-    auto conditions = ConditionBuilder::ofLog(*log);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
-        section.problem("log", problem->what, problem->cure);
-        return;
-    }
-    situation.conditions = std::move(std::get<std::vector<Condition>>(conditions));
-}
-
-void SituationReader::readConditions(ConfigSection& section, SituationConfig& situation) {
-    for (const auto& [text, line] : section.texts("when")) {
-        ConditionBuilder::Result result = m_parser.parse(text);
-        if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-            section.problem(line, "when", "in \"" + text + "\": " + problem->what, problem->cure);
-        } else {
-            situation.conditions.push_back(std::move(std::get<Condition>(result)));
-        }
-    }
-}
-
-void SituationReader::readThresholds(ConfigSection& section, SituationConfig& situation) {
-    const std::optional<std::string> frequency = section.text("frequency");
-    const std::optional<std::string> period = section.text("period");
-    const bool inConditions = std::any_of(
-        situation.conditions.begin(), situation.conditions.end(), [](const Condition& condition) {
-            return isOn(condition, "FREQTHRESH") || isOn(condition, "PERIODTHRS");
-        });
-    if (inConditions && (section.has("frequency") || section.has("period"))) {
-        section.problem("frequency", "the conditions name FREQTHRESH or PERIODTHRS as well",
-                        "leave those conditions out");
-    }
-    if (section.has("frequency") && !section.has("period")) {
-        section.problem("frequency", "has no period beside it", "add period = \"60s\"");
-    }
-    if (section.has("period") && !section.has("frequency")) {
-        section.problem("period", "has no frequency beside it", "add frequency = \">= 5\"");
-    }
-    if (frequency) {
-        if (const auto condition = Thresholds::frequency(*frequency)) {
-            situation.conditions.push_back(*condition);
-        } else {
-            section.problem("frequency", "'" + *frequency + "' is no frequency that can be reached",
-                            "write >=, >, <= or < and a number of entries, for example \">= 5\"");
-        }
-    }
-    if (period) {
-        if (const auto condition = Thresholds::period(*period)) {
-            situation.conditions.push_back(*condition);
-        } else {
-            section.problem("period", "'" + *period + "' is no period",
-                            "write a number and s, m, h or d, for example \"60s\"");
-        }
     }
 }

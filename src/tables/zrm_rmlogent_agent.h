@@ -5,7 +5,6 @@
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_base.h"
 
-#include <cstdint>
 #include <memory>
 
 class LogFile;
@@ -37,9 +36,9 @@ public:
 protected:
     const _RequestThresholds& thresholdsInForce() const noexcept { return thresholds; }
 
-    /// The end of the period in which an entry is counted, seconds since the epoch: while logs are
-    /// monitored, now. Entries that are replayed tell their own.
-    virtual std::int64_t endOfPeriod(std::int64_t entryTime) const;
+    /// Counts the chain's entries within the period, which ends now while logs are monitored. For
+    /// entries that are replayed it ends with the newest of them.
+    virtual long countEvents(Timestamp& newest, long period) const;
 
 private:
     void TakeSampleDestructor();

@@ -225,11 +225,11 @@ name = "a\nb"
 )"),
         ElementsAre("zrm.toml:1: situation.name: is missing; give the situation a name",
                     "zrm.toml:4: situation.name: is no usable name; write 1 to 128 bytes without "
-                    "control characters",
+                    "control characters, and not . or ..",
                     "zrm.toml:8: situation.name: 'disk' is the name of the situation at line 6 "
                     "too; give each situation a name of its own",
                     "zrm.toml:10: situation.name: is no usable name; write 1 to 128 bytes without "
-                    "control characters"));
+                    "control characters, and not . or .."));
 }
 
 TEST(ConfigFile, RefusesWhatIsWrongWithASituation) {

@@ -1,0 +1,159 @@
+#include "host/config/SituationValidator.h"
+
+#include "host/config/ConditionParser.h"
+#include "host/config/Thresholds.h"
+
+#include <algorithm>
+#include <array>
+#include <utility>
+#include <variant>
+
+namespace {
+
+using Problems = std::vector<SituationProblem>;
+
+constexpr std::array<std::string_view, 5> severities = {"info", "minor", "warning", "major",
+                                                        "critical"};
+constexpr const char* defaultSeverity = "warning";
+
+bool isControl(char c) {
+    return static_cast<unsigned char>(c) < 0x20 || c == 0x7f;
+}
+
+std::string atMost(std::size_t bytes) {
+    return std::to_string(bytes) + " bytes";
+}
+
+void checkName(const std::optional<std::string>& name, Problems& problems) {
+    if (!name) {
+        problems.push_back({"name", {}, "is missing", "give the situation a name"});
+        return;
+    }
+    // Clients take "." and ".." for directories, so no request could name such a situation.
+    if (name->empty() || name->size() > SituationValidator::longestName || *name == "." ||
+        *name == ".." || std::any_of(name->begin(), name->end(), isControl)) {
+        problems.push_back({"name",
+                            {},
+                            "is no usable name",
+                            "write 1 to " + atMost(SituationValidator::longestName) +
+                                " without control characters, and not . or .."});
+    }
+}
+
+void checkText(const std::string& text, Problems& problems) {
+    if (text.size() > SituationValidator::longestText) {
+        problems.push_back({"text",
+                            {},
+                            "has " + atMost(text.size()),
+                            "write at most " + atMost(SituationValidator::longestText)});
+    }
+}
+
+void checkSeverity(const std::string& severity, Problems& problems) {
+    if (std::find(severities.begin(), severities.end(), severity) == severities.end()) {
+        problems.push_back({"severity",
+                            {},
+                            "'" + severity + "' is no severity",
+                            "write info, minor, warning, major or critical"});
+    }
+}
+
+void addLog(const std::string& log, SituationConfig& situation, Problems& problems) {
+    auto conditions = ConditionBuilder::ofLog(log);
+    if (auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
+        problems.push_back({"log", {}, std::move(problem->what), std::move(problem->cure)});
+        return;
+    }
+    situation.conditions = std::move(std::get<std::vector<Condition>>(conditions));
+}
+
+void addConditions(const std::vector<std::string>& texts, SituationConfig& situation,
+                   Problems& problems) {
+    if (texts.size() > SituationValidator::mostConditions) {
+        problems.push_back({"when",
+                            {},
+                            "has " + std::to_string(texts.size()) + " conditions",
+                            "write at most " + std::to_string(SituationValidator::mostConditions)});
+        return;
+    }
+    const ConditionParser parser("RMLOGENT");
+    for (std::size_t index = 0; index < texts.size(); ++index) {
+        ConditionBuilder::Result result = parser.parse(texts[index]);
+        if (auto* const problem = std::get_if<ConditionProblem>(&result)) {
+            problems.push_back({"when", index, "in \"" + texts[index] + "\": " + problem->what,
+                                std::move(problem->cure)});
+        } else {
+            situation.conditions.push_back(std::move(std::get<Condition>(result)));
+        }
+    }
+}
+
+/// Whether the conditions that were written state a threshold themselves.
+bool haveThreshold(const std::vector<Condition>& conditions) {
+    return std::any_of(conditions.begin(), conditions.end(), [](const Condition& condition) {
+        return condition.column == "FREQTHRESH" || condition.column == "PERIODTHRS";
+    });
+}
+
+void addThresholds(const SituationText& text, SituationConfig& situation, Problems& problems) {
+    if ((text.frequency || text.period) && haveThreshold(situation.conditions)) {
+        problems.push_back({"frequency",
+                            {},
+                            "the conditions name FREQTHRESH or PERIODTHRS as well",
+                            "leave those conditions out"});
+    }
+    if (text.frequency && !text.period) {
+        problems.push_back({"frequency", {}, "has no period beside it", "add period = \"60s\""});
+    }
+    if (text.period && !text.frequency) {
+        problems.push_back(
+            {"period", {}, "has no frequency beside it", "add frequency = \">= 5\""});
+    }
+    const auto add = [&](std::string_view field, const std::optional<std::string>& value,
+                         const std::optional<Condition>& condition, const char* what,
+                         const char* cure) {
+        if (condition) {
+            situation.conditions.push_back(*condition);
+        } else if (value) {
+            problems.push_back({field, {}, "'" + *value + "' is " + what, cure});
+        }
+    };
+    add("frequency", text.frequency,
+        text.frequency ? Thresholds::frequency(*text.frequency) : std::nullopt,
+        "no frequency that can be reached",
+        "write >=, >, <= or < and a number of entries, for example \">= 5\"");
+    add("period", text.period, text.period ? Thresholds::period(*text.period) : std::nullopt,
+        "no period", "write a number and s, m, h or d, for example \"60s\"");
+}
+
+} // namespace
+
+std::string SituationProblem::fieldText() const {
+    std::string text(field);
+    if (condition) {
+        text += '[' + std::to_string(*condition) + ']';
+    }
+    return text;
+}
+
+std::vector<SituationProblem> SituationValidator::check(const SituationText& text,
+                                                        SituationConfig& situation) {
+    Problems problems;
+    situation = {};
+    situation.name = text.name.value_or("");
+    situation.text = text.text.value_or("");
+    situation.severity = text.severity.value_or(defaultSeverity);
+    situation.log = text.log;
+    situation.when = text.when;
+    situation.frequency = text.frequency;
+    situation.period = text.period;
+    checkName(text.name, problems);
+    checkText(situation.text, problems);
+    checkSeverity(situation.severity, problems);
+    if (text.log) {
+        addLog(*text.log, situation, problems);
+    }
+    addConditions(text.when, situation, problems);
+    addThresholds(text, situation, problems);
+    return problems;
+}

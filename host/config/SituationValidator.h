@@ -1,0 +1,47 @@
+#ifndef ZRM_HOST_SITUATION_VALIDATOR_H
+#define ZRM_HOST_SITUATION_VALIDATOR_H
+
+#include "host/config/HostConfig.h"
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// A situation as somebody wrote it; none where a field was left out.
+struct SituationText {
+    std::optional<std::string> name;
+    std::optional<std::string> text;
+    std::optional<std::string> severity;
+    std::optional<std::string> log;
+    std::vector<std::string> when;
+    std::optional<std::string> frequency;
+    std::optional<std::string> period;
+};
+
+/// What is wrong with a situation. Both texts begin in lower case and have no full stop.
+struct SituationProblem {
+    std::string_view field;               ///< static text
+    std::optional<std::size_t> condition; ///< index, in the field "when"
+    std::string what;
+    std::string cure;
+
+    /// "when[0]"
+    std::string fieldText() const;
+};
+
+/// The one place that knows what makes a situation, wherever it comes from. Stateless.
+class SituationValidator {
+public:
+    static constexpr std::size_t longestName = 128;  ///< bytes
+    static constexpr std::size_t longestText = 1024; ///< bytes
+    static constexpr std::size_t mostConditions = 100;
+
+    /// Makes the situation of the text and returns everything that is wrong with it. The situation
+    /// is meaningless when there is something.
+    static std::vector<SituationProblem> check(const SituationText& text,
+                                               SituationConfig& situation);
+};
+
+#endif
