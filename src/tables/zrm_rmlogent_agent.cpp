@@ -96,8 +96,8 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     if (!addEventTime(entry->entrytime)) {
         return trace.result(0U);
     }
-    const long frequency = timestampChain->countEvents(
-        static_cast<long>(thresholds.periodThreshold), endOfPeriod(timestampChain->eventTime()));
+    const long frequency =
+        countEvents(*timestampChain, static_cast<long>(thresholds.periodThreshold));
     if (frequency == -1) {
         trace.error()("Timestamp chain corrupted.  Stopping situation.");
         Stopped(stoppedCorruptedChain);
@@ -123,8 +123,8 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     return trace.result(ctreq::InsertRow(row));
 }
 
-std::int64_t zrm_rmlogent_agent::endOfPeriod(std::int64_t /*entryTime*/) const {
-    return std::time(nullptr);
+long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) const {
+    return newest.countEvents(period);
 }
 
 /// Adds the entry's time to the chain; false when the time does not convert or memory runs out.
