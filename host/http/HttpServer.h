@@ -2,20 +2,29 @@
 #define ZRM_HOST_HTTP_SERVER_H
 
 #include "host/http/ApiToken.h"
+#include "host/http/ConnectionThreads.h"
+#include "host/http/HttpExchange.h"
 #include "host/http/ListenAddress.h"
-#include "host/http/SampleSource.h"
+#include "host/http/ListenSocket.h"
+#include "host/http/RequestDispatcher.h"
+#include "host/http/Router.h"
+#include "host/http/StopSignal.h"
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
-#include <memory>
+#include <stop_token>
 #include <string>
+#include <thread>
 
-/// The HTTP API: `GET /healthz` and `POST /api/v1/tables/TABLE/sample`. start, stop and abandon
-/// are called by one thread at a time.
+/// Serves the routes of a router over HTTP: connections with their threads and limits. start, stop
+/// and abandon are called by one thread at a time.
 class HttpServer {
 public:
-    /// `source` outlives the object.
-    explicit HttpServer(SampleSource& source);
+    using Clock = std::chrono::steady_clock;
+
+    /// `router` outlives the object.
+    explicit HttpServer(const Router& router);
     HttpServer(const HttpServer&) = delete;
     HttpServer& operator=(const HttpServer&) = delete;
     /// Stops the server and waits for its threads.
@@ -26,20 +35,32 @@ public:
     std::string start(const ListenAddress& address, ApiToken token);
 
     /// The port at which it listens.
-    std::uint16_t port() const noexcept;
+    std::uint16_t port() const noexcept { return m_listen.port(); }
 
-    /// Ends the serving: requests under way are answered first. At the limit it returns although
-    /// a client is still being served; no sample begins from then on. Any number of times; not on
-    /// a thread of the server.
-    void stop(std::chrono::steady_clock::time_point limit);
+    /// Ends the serving: requests under way are answered first, streams end. At the limit it
+    /// returns although a client is still being served; no request is answered from then on. Any
+    /// number of times; not on a thread of the server.
+    void stop(Clock::time_point limit);
 
-    /// For the end of the process on any thread, also on one of the server's: begins no further
-    /// samples and waits for those under way, at most until the limit.
-    void abandon(std::chrono::steady_clock::time_point limit);
+    /// For the end of the process on any thread, also on one of the server's: answers no further
+    /// requests and waits for those under way, at most until the limit.
+    void abandon(Clock::time_point limit);
 
 private:
-    class Implementation;
-    std::unique_ptr<Implementation> m_implementation;
+    void acceptClients();
+    void accept(int fd);
+    void serve(int fd);
+    std::chrono::milliseconds idleTime() const;
+
+    RequestDispatcher m_dispatcher;
+    StopSignal m_stop;
+    std::stop_source m_streams; ///< asked to stop with the signal
+    HttpExchange m_exchange;
+    ListenSocket m_listen;
+    std::size_t m_mostConnections = 0;
+    int m_lowestDescriptor = 0; ///< of connections
+    std::thread m_acceptor;
+    ConnectionThreads m_threads; ///< last: the threads use what stands above
 };
 
 #endif

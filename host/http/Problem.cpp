@@ -8,16 +8,20 @@
 
 namespace {
 
-constexpr std::array<std::pair<int, const char*>, 11> titles = {{
+constexpr std::array<std::pair<int, const char*>, 15> titles = {{
     {400, "Bad Request"},
     {401, "Unauthorized"},
     {403, "Forbidden"},
     {404, "Not Found"},
     {405, "Method Not Allowed"},
+    {408, "Request Timeout"},
+    {409, "Conflict"},
     {413, "Content Too Large"},
     {415, "Unsupported Media Type"},
     {421, "Misdirected Request"},
     {422, "Unprocessable Content"},
+    {429, "Too Many Requests"},
+    {431, "Request Header Fields Too Large"},
     {500, "Internal Server Error"},
     {503, "Service Unavailable"},
 }};

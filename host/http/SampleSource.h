@@ -22,6 +22,9 @@ public:
 
     /// Takes one sample of a table of the agent. May wait for a refresh to end. Any thread.
     virtual Rows take(std::string_view table, const std::vector<Condition>& conditions) = 0;
+
+    /// True when the log that a report's conditions name is monitored now.
+    bool isMonitored(const std::vector<Condition>& report);
 };
 
 #endif

@@ -5,6 +5,8 @@
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/http/ApiToken.h"
+#include "host/http/HealthResource.h"
+#include "host/http/SampleResource.h"
 #include "host/start/Say.h"
 
 #include <string>
@@ -46,7 +48,19 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
                  const RowLayout& layout)
     : m_delivery(config.sinks, layout, request.rowSize), m_situations(entries, m_delivery.queue()),
-      m_http(m_sampler) {}
+      m_http(m_router) {
+    addResources();
+}
+
+void Serving::addResources() {
+    addResource(std::make_unique<HealthResource>());
+    addResource(std::make_unique<SampleResource>(m_sampler));
+}
+
+void Serving::addResource(std::unique_ptr<Resource> resource) {
+    resource->addRoutes(m_router);
+    m_resources.push_back(std::move(resource));
+}
 
 std::size_t Serving::countLogs() {
     const std::optional<Sample> logs = Sample::take("RMMONLOG", {}, "monitored logs");

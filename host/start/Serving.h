@@ -4,6 +4,8 @@
 #include "host/config/HostConfig.h"
 #include "host/events/Delivery.h"
 #include "host/http/HttpServer.h"
+#include "host/http/Resource.h"
+#include "host/http/Router.h"
 #include "host/http/TableSampler.h"
 #include "host/situations/SituationSet.h"
 
@@ -53,9 +55,14 @@ private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
             const RowLayout& layout);
 
+    void addResources();
+    void addResource(std::unique_ptr<Resource> resource);
+
     Delivery m_delivery;
     SituationSet m_situations;
     TableSampler m_sampler;
+    Router m_router;
+    std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP
     HttpServer m_http;
 };
 

@@ -1,5 +1,7 @@
 #include "host/http/HttpServer.h"
 
+#include "host/http/HealthResource.h"
+#include "host/http/SampleResource.h"
 #include "support/RecordingTrace.h"
 
 #include <gmock/gmock.h>
@@ -43,6 +45,8 @@ public:
 class HttpServerTest : public testing::Test {
 protected:
     void SetUp() override {
+        HealthResource().addRoutes(router);
+        samples.addRoutes(router);
         std::signal(SIGPIPE, SIG_IGN); // the agent's threads block it
         ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
     }
@@ -79,7 +83,9 @@ protected:
 
     RecordingTrace trace{0};
     TestSource source;
-    HttpServer server{source};
+    SampleResource samples{source};
+    Router router;
+    HttpServer server{router};
 };
 
 int HttpServerTest::connected() const {
@@ -182,10 +188,14 @@ TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
 TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
     expectProblem(sample("NOTABLE", "{}"), 404,
                   "no such table; the tables are RMLOGENT and RMMONLOG", "table");
-    const std::string nothing = "there is nothing at this path for this method";
-    expectProblem(client().Get("/nothing"), 404, nothing, "");
-    expectProblem(client().Get(tables + "RMMONLOG/sample"), 404, nothing, "");
-    expectProblem(client().Delete("/healthz"), 404, nothing, "");
+    expectProblem(client().Get("/nothing"), 404, "there is nothing at this path", "");
+    const auto result = client().Get(tables + "RMMONLOG/sample");
+    expectProblem(result, 405, "this path answers POST, not this method", "");
+    EXPECT_EQ(result->get_header_value("Allow"), "POST");
+    expectProblem(client().Delete("/healthz"), 405, "this path answers GET, HEAD, not this method",
+                  "");
+    expectProblem(client().Options("/healthz"), 405, "this path answers GET, HEAD, not this method",
+                  "");
 }
 
 TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
@@ -194,19 +204,20 @@ TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
                   "filters[0].column");
     expectProblem(
         client().Post(tables + "RMMONLOG/sample", "a=1", "application/x-www-form-urlencoded"), 415,
-        "send the filters as application/json", "Content-Type");
+        "send the body as application/json", "Content-Type");
 }
 
 TEST_F(HttpServerTest, RefusesLongBodies) {
-    const std::string tooLong = "the body has more than 65536 bytes";
-    expectProblem(sample("RMMONLOG", std::string(65537, ' ')), 413, tooLong, "body");
-    expectProblem(sample("RMMONLOG", std::string(65536, ' ')), 400, "the body is no JSON", "body");
+    const std::string tooLong = "the body has more than 1048576 bytes, or did not come whole";
+    expectProblem(sample("RMMONLOG", std::string(1048577, ' ')), 413, tooLong, "body");
+    expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is no JSON",
+                  "body");
     // A body that does not tell its length is cut off too.
     const auto chunked = client().Post(
         tables + "RMMONLOG/sample",
         [](std::size_t offset, httplib::DataSink& sink) {
             const std::string piece(8192, ' ');
-            if (offset > 1'000'000) {
+            if (offset > 4'000'000) {
                 sink.done();
             } else {
                 sink.write(piece.data(), piece.size());
@@ -263,11 +274,11 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
 }
 
 TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
-    HttpServer second(source);
+    HttpServer second(router);
     EXPECT_EQ(second.start({"127.0.0.1", server.port()}, ApiToken(secret)),
               "cannot listen at 127.0.0.1:" + std::to_string(server.port()) +
                   ": is another agent running?");
-    HttpServer elsewhere(source);
+    HttpServer elsewhere(router);
     EXPECT_EQ(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret)),
               "cannot listen at 203.0.113.1:0");
 }
@@ -310,16 +321,15 @@ TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
     // Another request, so that the slow one is being served by now.
     EXPECT_EQ(client().Get("/healthz")->status, 200);
     const auto begin = Clock::now();
-    server.stop(begin + 100ms);
-    EXPECT_GE(Clock::now() - begin, 100ms);
-    EXPECT_LT(Clock::now() - begin, 5s);
+    server.stop(begin + 30s);
+    EXPECT_LT(Clock::now() - begin, 10s);
     isOver = true;
     slow.join();
 }
 
 TEST_F(HttpServerTest, LeavesTheActionOfSignalsAsItWas) {
     std::signal(SIGPIPE, SIG_DFL);
-    { HttpServer another(source); }
+    { HttpServer another(router); }
     EXPECT_EQ(std::signal(SIGPIPE, SIG_IGN), SIG_DFL);
 }
 
@@ -359,10 +369,11 @@ TEST_F(HttpServerTest, ASampleMayEndTheProcess) {
 }
 
 TEST(HttpServerLife, ListensOnIpv6AndByName) {
-    TestSource source;
+    Router router;
+    HealthResource().addRoutes(router);
     RecordingTrace trace(0);
     for (const char* const host : {"::1", "localhost"}) {
-        HttpServer server(source);
+        HttpServer server(router);
         ASSERT_EQ(server.start({host, 0}, ApiToken(secret)), "");
         httplib::Client client(host, server.port());
         const auto result =

@@ -1,28 +1,28 @@
-#ifndef ZRM_HOST_ACTIVE_SAMPLES_H
-#define ZRM_HOST_ACTIVE_SAMPLES_H
+#ifndef ZRM_HOST_ACTIVE_REQUESTS_H
+#define ZRM_HOST_ACTIVE_REQUESTS_H
 
 #include <chrono>
 #include <condition_variable>
 #include <mutex>
 
-/// Counts the samples under way, so that the end of the process can wait for them. Any thread.
-class ActiveSamples {
+/// Counts the requests under way, so that the end of the process can wait for them. Any thread.
+class ActiveRequests {
 public:
-    /// One sample, while it lives; false when no more samples are begun.
+    /// One request, while it lives; false when no more requests are begun.
     class Guard {
     public:
-        explicit Guard(ActiveSamples& samples);
+        explicit Guard(ActiveRequests& requests);
         ~Guard();
         Guard(const Guard&) = delete;
         Guard& operator=(const Guard&) = delete;
         explicit operator bool() const noexcept { return m_isCounted; }
 
     private:
-        ActiveSamples& m_samples;
+        ActiveRequests& m_requests;
         bool m_isCounted;
     };
 
-    /// Lets no more samples begin and waits for those of other threads, at most until the limit.
+    /// Lets no more requests begin and waits for those of other threads, at most until the limit.
     void close(std::chrono::steady_clock::time_point limit);
 
 private:

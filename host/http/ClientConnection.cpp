@@ -1,0 +1,76 @@
+#include "host/http/ClientConnection.h"
+
+#include <algorithm>
+
+#include <strings.h>
+
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr auto requestTime = 10s; ///< for head and body together
+constexpr auto answerTime = 60s;  ///< for an answer that is no stream
+constexpr std::string_view headEnd = "\r\n\r\n";
+
+} // namespace
+
+ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle) {
+    m_in.erase(0, m_at);
+    m_at = 0;
+    m_requestDeadline = Clock::now() + (m_in.empty() ? idle : requestTime);
+    for (bool hasBegun = !m_in.empty();;) {
+        while (m_in.starts_with("\r\n")) {
+            m_in.erase(0, 2); // as some clients send behind a body
+        }
+        const std::size_t end = m_in.find(headEnd);
+        if (end != std::string::npos && end <= largestHead) {
+            dropRanges(end);
+            m_answerDeadline = m_requestDeadline + answerTime;
+            return COMPLETE;
+        }
+        if (m_in.size() > largestHead) {
+            return TOO_LONG;
+        }
+        char bytes[4096];
+        ClientSocket::Outcome outcome{};
+        const std::size_t count = m_socket.receive(bytes, sizeof bytes, m_requestDeadline, outcome);
+        if (count == 0) {
+            return hasBegun && outcome == ClientSocket::TIMEOUT ? TOO_SLOW : NONE;
+        }
+        if (!hasBegun) {
+            hasBegun = true;
+            m_requestDeadline = Clock::now() + requestTime;
+        }
+        m_in.append(bytes, count);
+    }
+}
+
+// Answers are given whole. The library would examine the header with a recursion as deep as its
+// value is long.
+void ClientConnection::dropRanges(std::size_t headSize) {
+    constexpr std::string_view name = "range:";
+    for (std::size_t line = m_in.find("\r\n"); line < headSize;) {
+        const std::size_t next = m_in.find("\r\n", line + 2);
+        if (strncasecmp(m_in.data() + line + 2, name.data(), name.size()) == 0) {
+            m_in.erase(line, next - line);
+            headSize -= next - line;
+        } else {
+            line = next;
+        }
+    }
+}
+
+std::size_t ClientConnection::read(char* bytes, std::size_t size) {
+    if (m_at == m_in.size()) {
+        ClientSocket::Outcome outcome{};
+        return m_socket.receive(bytes, size, m_requestDeadline, outcome);
+    }
+    const std::size_t count = std::min(size, m_in.size() - m_at);
+    std::copy_n(m_in.data() + m_at, count, bytes);
+    m_at += count;
+    return count;
+}
+
+bool ClientConnection::write(std::string_view bytes) {
+    return m_socket.send(bytes, m_answerDeadline);
+}

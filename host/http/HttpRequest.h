@@ -1,0 +1,19 @@
+#ifndef ZRM_HOST_HTTP_REQUEST_H
+#define ZRM_HOST_HTTP_REQUEST_H
+
+#include <map>
+#include <string>
+#include <vector>
+
+/// What a resource sees of a request, which has passed every rule of access by then.
+struct HttpRequest {
+    std::string method;                ///< GET stands for HEAD too
+    std::string path;                  ///< as it was sent, without the query
+    std::vector<std::string> captures; ///< the pattern's {names} in order, decoded, valid UTF-8
+    std::multimap<std::string, std::string> query; ///< decoded, valid UTF-8
+    std::string body;                              ///< empty, or sent as application/json
+    std::string lastEventId;                       ///< header Last-Event-ID, empty without
+    std::string accept;                            ///< header Accept, empty without
+};
+
+#endif

@@ -1,0 +1,26 @@
+#ifndef ZRM_HOST_INCOMING_REQUEST_H
+#define ZRM_HOST_INCOMING_REQUEST_H
+
+#include "host/http/HttpRequest.h"
+#include "host/http/RequestGuard.h"
+
+#include <cstddef>
+#include <functional>
+#include <optional>
+#include <string>
+
+/// A request as it came, before any rule was held against it.
+struct IncomingRequest {
+    HttpRequest request;  ///< without captures, query and body
+    std::string rawQuery; ///< what stands behind '?', as it was sent
+    RequestGuard::Headers headers;
+    std::string contentType;
+    bool hasBody = false;
+    std::optional<std::size_t> length; ///< of the body, where the client tells it
+    std::string problem;               ///< what makes the request ambiguous; empty when nothing
+};
+
+/// Reads the body of a request, at most so many bytes; none when it is longer, or breaks off.
+using BodyReader = std::function<std::optional<std::string>(std::size_t most)>;
+
+#endif
