@@ -24,6 +24,16 @@ TRC1_Anchor anchor{"CompiledCondition.cpp"};
 constexpr std::pair<std::string_view, int> kLogColumns[] = {
     {"LOGNAME", 1}, {"ULOGNAME", 1}, {"LOGPATH", 2}, {"ULOGPATH", 2}};
 
+/// 0 for columns that do not name a log.
+int logRank(std::string_view column) {
+    for (const auto& [name, rank] : kLogColumns) {
+        if (column == name) {
+            return rank;
+        }
+    }
+    return 0;
+}
+
 std::string_view textOf(const SEL1_FILTERINFO& filter) {
     return {filter.value, static_cast<std::size_t>(std::max<int>(filter.valueLength, 0))};
 }
@@ -67,6 +77,7 @@ CompiledCondition::CompiledCondition(const SEL1_FILTERINFO& filter, const RowCol
             compileText(*column);
         }
     }
+    m_isOnLog = column != nullptr && !column->isInteger() && logRank(column->name) != 0;
     m_rank = rankOf(column);
 }
 
@@ -137,10 +148,8 @@ void CompiledCondition::compilePattern(const RowColumn& column) {
 
 int CompiledCondition::rankOf(const RowColumn* column) const noexcept {
     if (m_kind == Kind::TEXT_EQUAL) {
-        for (const auto& [name, rank] : kLogColumns) {
-            if (column->name == name) {
-                return rank;
-            }
+        if (const int rank = logRank(column->name)) {
+            return rank;
         }
     }
     // The kinds stand in the order of their cost; one that never holds spares all others.
@@ -176,6 +185,40 @@ bool CompiledCondition::holds(ctreq* request, char* row) const {
                                           const_cast<char*>(m_filter->value)) != 0;
     }
     return false;
+}
+
+bool CompiledCondition::isOnText() const noexcept {
+    switch (m_kind) {
+    case Kind::TEXT_EQUAL:
+    case Kind::TEXT_ORDER:
+    case Kind::TEXT_IN:
+    case Kind::STARTS:
+    case Kind::CONTAINS:
+        return true;
+    default:
+        return false;
+    }
+}
+
+std::string_view CompiledCondition::prefix() const noexcept {
+    return m_kind == Kind::TEXT_EQUAL || m_kind == Kind::STARTS ? m_value : std::string_view();
+}
+
+bool CompiledCondition::holdsFor(const char* row, std::string_view text) const noexcept {
+    switch (m_kind) {
+    case Kind::TEXT_EQUAL:
+        return text == m_value;
+    case Kind::TEXT_ORDER:
+        return Comparison::holds(m_op, ColumnText::compare(row + m_offset, m_width, m_value));
+    case Kind::TEXT_IN:
+        return std::find(m_values.begin(), m_values.end(), text) != m_values.end();
+    case Kind::STARTS:
+        return startsWith(row + m_offset);
+    case Kind::CONTAINS:
+        return memmem(text.data(), text.size(), m_value.data(), m_value.size()) != nullptr;
+    default:
+        return true;
+    }
 }
 
 bool CompiledCondition::isEqual(const char* field) const noexcept {

@@ -32,6 +32,23 @@ public:
     /// Whether the row meets the condition. `request` is asked about columns unknown here.
     bool holds(ctreq* request, char* row) const;
 
+    /// The same for a condition of which isOnText() tells, with the text of its column in that row
+    /// (ColumnText::unpadded).
+    bool holdsFor(const char* row, std::string_view text) const noexcept;
+
+    /// True for a condition on a column that names a log: what it says of a row is the same for all
+    /// rows of that log.
+    bool isOnLog() const noexcept { return m_isOnLog; }
+    bool neverHolds() const noexcept { return m_kind == Kind::NEVER; }
+    /// True for a condition on a character column that is cheap to evaluate.
+    bool isOnText() const noexcept;
+    /// What the column must begin with, as far as it is wide, for the condition to hold; of one on
+    /// a character column. Empty when that cannot be said.
+    std::string_view prefix() const noexcept;
+    /// Place of the column in the row, bytes.
+    std::size_t offset() const noexcept { return m_offset; }
+    std::size_t width() const noexcept { return m_width; }
+
     /// Rank in the order of evaluation: what is cheap and refuses most comes first.
     int rank() const noexcept { return m_rank; }
 
@@ -61,6 +78,7 @@ private:
     bool matches(const char* field) const;
 
     Kind m_kind = Kind::NEVER;
+    bool m_isOnLog = false;
     _IntfOper m_op;
     int m_rank;
     std::size_t m_offset = 0;

@@ -17,6 +17,9 @@ public:
     /// True when every condition holds; so also when there is none.
     bool holds(char* row) const;
 
+    /// In the order of evaluation.
+    const std::vector<CompiledCondition>& all() const noexcept { return m_conditions; }
+
 private:
     ctreq& m_request;
     std::vector<CompiledCondition> m_conditions;

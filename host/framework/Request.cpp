@@ -3,6 +3,7 @@
 #include "agent/framework/TableManager.h"
 #include "host/framework/HandleTable.h"
 #include "host/framework/LockGuard.h"
+#include "host/framework/RequestCounts.h"
 
 #include <utility>
 
@@ -27,6 +28,9 @@ Request::~Request() {
     if (isSituation()) {
         const LockGuard guard(m_manager.lock());
         m_manager.requests().Remove(m_request.get());
+        if (m_context.counts() != nullptr) {
+            m_context.counts()->leaveAudience();
+        }
     }
     // Waits for the pins while the object is still whole.
     HandleTable::close(m_request->handle());

@@ -1,10 +1,12 @@
 #include "agent/framework/TableManager.h"
 
+#include "host/framework/Audience.h"
 #include "host/framework/Status.h"
 #include "host/framework/Tables.h"
 
 TableManager::TableManager(const char* application, const char* table)
-    : m_application(application), m_table(table) {}
+    : m_application(application), m_table(table),
+      m_audience(std::make_unique<Audience>(m_requests)) {}
 
 TableManager::~TableManager() {
     Tables::remove(this);
@@ -12,6 +14,10 @@ TableManager::~TableManager() {
 
 unsigned TableManager::Shutdown(unsigned /*reason*/) {
     return STATUS_OK;
+}
+
+LinkedList& TableManager::requestsFor(char* row, unsigned rowSize) {
+    return m_audience->of(row, rowSize);
 }
 
 unsigned TableManager::RegisterWithManager(TableManager* manager) {

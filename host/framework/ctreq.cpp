@@ -101,14 +101,22 @@ unsigned ctreq::CheckForException(char* row) {
         return 0;
     }
     m_framework->counts.countJudged();
-    if (!m_framework->conditions) {
-        m_framework->conditions.emplace(m_framework->filters, *this);
-    }
-    if (!m_framework->conditions->holds(row)) {
+    if (!conditions().holds(row)) {
         return 0;
     }
     m_framework->counts.countMatched();
     return 1;
+}
+
+const ConditionSet& ctreq::conditions() {
+    if (!m_framework->conditions) {
+        m_framework->conditions.emplace(m_framework->filters, *this);
+    }
+    return *m_framework->conditions;
+}
+
+RequestCounts& ctreq::counts() noexcept {
+    return m_framework->counts;
 }
 
 std::uint64_t ctreq::judged() const noexcept {

@@ -36,15 +36,13 @@ ctreq* createRequest(RequestDetail* detail, ContextInfo* context, TableManager* 
     return agent;
 }
 
-/// Offers `count` rows, back to back, to every open request of the table and dispatches what each
-/// one accepts. Returns the last non-zero status of a dispatch, else 0. Any thread; one array of
-/// rows at a time.
+/// Offers `count` rows, back to back, to these requests of a table and dispatches what each one
+/// accepts. Returns the last non-zero status of a dispatch, else 0. The caller holds the lock.
 template <typename RowHolder, typename Row>
-unsigned offerRows(TableManager& manager, Row* rows, int count) {
+unsigned offerRowsTo(LinkedList& requests, Row* rows, int count) {
     unsigned status = 0;
-    const TableLock lock(manager);
-    CtreqListIter requests(manager.requests());
-    while (void* const element = requests.Next()) {
+    CtreqListIter next(requests);
+    while (void* const element = next.Next()) {
         auto* const request = static_cast<RowHolder*>(static_cast<ctreq*>(element));
         const unsigned handle = request->handle();
         ctreq::UseHandle(handle);
@@ -57,6 +55,14 @@ unsigned offerRows(TableManager& manager, Row* rows, int count) {
         RSC1_Drop(handle);
     }
     return status;
+}
+
+/// Offers the rows to every open request of the table, as above. Any thread; one array of rows at
+/// a time.
+template <typename RowHolder, typename Row>
+unsigned offerRows(TableManager& manager, Row* rows, int count) {
+    const TableLock lock(manager);
+    return offerRowsTo<RowHolder>(manager.requests(), rows, count);
 }
 
 #endif

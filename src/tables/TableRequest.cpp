@@ -82,6 +82,15 @@ unsigned TableRequest::ColumnIsException(char* row, char* columnName, _IntfOper 
     return trace.result(static_cast<unsigned>(holds));
 }
 
+bool TableRequest::isTraced() {
+    return tracesRows(anchor);
+}
+
+bool TableRequest::tracesRows(TRC1_Anchor& anchorOfFile) {
+    const TraceScope trace(anchorOfFile);
+    return trace.isOn(TRC1_FLOW) || trace.isOn(TRC1_FINE);
+}
+
 unsigned TableRequest::addRows(char* rows, int count) {
     TraceScope trace(anchor);
     unsigned status = 0;

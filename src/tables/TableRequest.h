@@ -2,6 +2,7 @@
 #define ZRM_TABLE_REQUEST_H
 
 #include "agent/framework/ctreq.h"
+#include "agent/framework/trace.h"
 #include "tables/TableDescription.h"
 
 /// What the row holders of both tables share: everything that follows from the description of the
@@ -26,6 +27,11 @@ protected:
     /// Passes each of `count` rows, back to back, that meets the request's conditions to
     /// InsertRow, up to the first non-zero status, which it returns; otherwise 0.
     unsigned addRows(char* rows, int count);
+
+    /// True when it shows in this file's trace, or in that of a derived class with `anchor`, that
+    /// rows are offered.
+    static bool isTraced();
+    static bool tracesRows(TRC1_Anchor& anchor);
 
 private:
     const TableDescription& m_table;

@@ -73,6 +73,11 @@ unsigned zrm_rmlogent_agent::AddData(zrm_rmlogent_data_t* rows, int count) {
     if (trace.isOn(TRC1_FINE)) {
         trace.fine()("Event passed to situation %s for evaluation.", name());
     }
+    writeThresholds(rows, count);
+    return trace.result(zrm_rmlogent_base::AddData(rows, count));
+}
+
+void zrm_rmlogent_agent::writeThresholds(zrm_rmlogent_data_t* rows, int count) const {
     const bool inForce = hasThresholds();
     const auto frequency =
         static_cast<std::int32_t>(inForce ? std::abs(thresholds.freqThreshold) : 0);
@@ -81,7 +86,10 @@ unsigned zrm_rmlogent_agent::AddData(zrm_rmlogent_data_t* rows, int count) {
         rows[i].freqthresh = frequency;
         rows[i].periodthrs = period;
     }
-    return trace.result(zrm_rmlogent_base::AddData(rows, count));
+}
+
+bool zrm_rmlogent_agent::isTraced() {
+    return zrm_rmlogent_base::isTraced() || tracesRows(anchor);
 }
 
 unsigned zrm_rmlogent_agent::InsertRow(char* row) {

@@ -32,6 +32,10 @@ public:
     unsigned InsertRow(char* row) override;
     /// Writes the thresholds' columns of the rows in place and offers the rows.
     unsigned AddData(zrm_rmlogent_data_t* rows, int count) override;
+    /// Writes the thresholds' columns alone: 0 unless both thresholds are in force.
+    void writeThresholds(zrm_rmlogent_data_t* rows, int count) const;
+    /// True when it shows in the trace to which requests a row is offered.
+    static bool isTraced();
 
 protected:
     const _RequestThresholds& thresholdsInForce() const noexcept { return thresholds; }

@@ -43,6 +43,10 @@ zrm_rmlogent_base::zrm_rmlogent_base(RequestDetail* detail, ContextInfo* context
                                      TableManager* manager)
     : TableRequest(detail, context, manager, table) {}
 
+bool zrm_rmlogent_base::isTraced() {
+    return TableRequest::isTraced() || tracesRows(anchor);
+}
+
 unsigned zrm_rmlogent_base::AddData(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
     return trace.result(addRows(reinterpret_cast<char*>(rows), count));

@@ -14,6 +14,10 @@ public:
     /// Offers `count` rows, back to back: those that meet the request's conditions are inserted.
     /// Returns the last status of an insertion, 0 when there was none.
     virtual unsigned AddData(zrm_rmlogent_data_t* rows, int count);
+
+protected:
+    /// See zrm_rmlogent_agent.
+    static bool isTraced();
 };
 
 #endif

@@ -36,5 +36,16 @@ unsigned zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t* rows, int count
 
 unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
-    return trace.result(offerRows<zrm_rmlogent_base>(*this, rows, count));
+    const TableLock lock(*this);
+    if (count != 1 || zrm_rmlogent_agent::isTraced()) {
+        return trace.result(offerRowsTo<zrm_rmlogent_base>(requests(), rows, count));
+    }
+    LinkedList& concerned = requestsFor(reinterpret_cast<char*>(rows), sizeof *rows);
+    const unsigned status = offerRowsTo<zrm_rmlogent_base>(concerned, rows, count);
+    // The row keeps the thresholds of the last request, whether that was passed over or not.
+    void* const last = requests().Last();
+    if (last != concerned.Last()) {
+        static_cast<zrm_rmlogent_agent*>(static_cast<ctreq*>(last))->writeThresholds(rows, count);
+    }
+    return trace.result(status);
 }

@@ -2,6 +2,7 @@
 #define ZRM_FRAMEWORK_LINKED_LIST_H
 
 #include <cstddef>
+#include <cstdint>
 #include <vector>
 
 /// A list of elements that it does not own. Not locked: its user guards it.
@@ -11,10 +12,17 @@ public:
     void Add(void* element);
     /// Removes the first occurrence of the element; nothing happens when there is none.
     void Remove(void* element);
+    /// Removes all elements and keeps their room.
+    void Clear() noexcept;
+    /// The last element; null when there is none.
+    void* Last() const noexcept;
+    /// Another number after every change of the list; never 0.
+    std::uint64_t generation() const noexcept { return m_generation; }
 
 private:
     friend class LinkedListIter;
     std::vector<void*> m_elements;
+    std::uint64_t m_generation = 1;
 };
 
 /// Walks a list from its first element. The list must not change while an iterator walks it.

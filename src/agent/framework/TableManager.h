@@ -4,6 +4,9 @@
 #include "agent/framework/LinkedList.h"
 #include "agent/framework/locks.h"
 
+#include <memory>
+
+class Audience; ///< the framework's
 class ContextInfo;
 class RequestDetail;
 class ctreq;
@@ -34,12 +37,17 @@ public:
     SYS1_Lock* lock() noexcept { return &m_lock; }
     /// The open situations (ctreq*); only while lock() is held.
     LinkedList& requests() noexcept { return m_requests; }
+    /// Those of requests() that one fresh row of `rowSize` bytes may concern, in the same order:
+    /// each request that is left out would refuse the row for a condition on one of its character
+    /// columns. Only while lock() is held, and valid until the next call.
+    LinkedList& requestsFor(char* row, unsigned rowSize);
 
 private:
     const char* m_application;
     const char* m_table;
     SYS1_Lock m_lock;
     LinkedList m_requests;
+    std::unique_ptr<Audience> m_audience;
 };
 
 #endif

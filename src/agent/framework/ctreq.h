@@ -6,6 +6,9 @@
 #include <cstdint>
 #include <memory>
 
+class Audience;     ///< the framework's, as are
+class ConditionSet; ///< the conditions and
+class RequestCounts;
 class ContextInfo;
 class CtreqAutomationCapsule;
 class RequestDetail;
@@ -84,6 +87,11 @@ public:
     unsigned rowSize = 0;   ///< bytes; set by the table
 
 private:
+    friend class Audience;
+    /// The conditions, ready for evaluation. The table's columns must be known by now.
+    const ConditionSet& conditions();
+    RequestCounts& counts() noexcept;
+
     class Framework; ///< what the framework keeps with a request
 
     TableManager* m_manager;

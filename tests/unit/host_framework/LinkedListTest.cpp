@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <utility>
 #include <vector>
 
 namespace {
@@ -40,6 +41,34 @@ TEST(LinkedList, RemovesTheFirstOccurrenceOnly) {
     EXPECT_THAT(walk(list), ElementsAre(&b, &a));
     list.Remove(&unknown);
     EXPECT_THAT(walk(list), ElementsAre(&b, &a));
+}
+
+TEST(LinkedList, TellsItsLastElement) {
+    int a, b;
+    LinkedList list;
+    EXPECT_EQ(list.Last(), nullptr);
+    list.Add(&a);
+    list.Add(&b);
+    EXPECT_EQ(list.Last(), &b);
+    list.Clear();
+    EXPECT_EQ(list.Last(), nullptr);
+    EXPECT_THAT(walk(list), IsEmpty());
+}
+
+TEST(LinkedList, HasANewGenerationAfterEachChange) {
+    int a, unknown;
+    LinkedList list;
+    std::uint64_t before = 0;
+    const auto hasChanged = [&] { return std::exchange(before, list.generation()) != before; };
+    EXPECT_TRUE(hasChanged());
+    list.Add(&a);
+    EXPECT_TRUE(hasChanged());
+    list.Remove(&unknown);
+    EXPECT_FALSE(hasChanged());
+    list.Remove(&a);
+    EXPECT_TRUE(hasChanged());
+    list.Clear();
+    EXPECT_TRUE(hasChanged());
 }
 
 } // namespace

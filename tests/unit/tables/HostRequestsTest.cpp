@@ -203,6 +203,40 @@ TEST_F(HostRequests, RefusedRowsCostNoAllocation) {
     EXPECT_THAT(m_receiver.received, IsEmpty());
 }
 
+TEST_F(HostRequests, ARowKeepsTheThresholdsOfTheLastRequestThoughThatIsPassedOver) {
+    const Request first(logEntries(), situation({}), m_receiver);
+    const auto conditions = [](std::string log, int frequency, int period) {
+        return situation({text("LOGNAME", INTF_EQUAL, std::move(log)),
+                          number("FREQTHRESH", INTF_GREATER_OR_EQUAL, frequency),
+                          number("PERIODTHRS", INTF_EQUAL, period)});
+    };
+    const Request second(logEntries(), conditions("syslog", 5, 60), m_receiver);
+    zrm_rmlogent_data_t row = rowOf("auth.log", 1);
+    EXPECT_EQ(zrm_rmlogent_manager::EventArrived(&row, 1), 0U);
+    EXPECT_EQ(row.freqthresh, 5);
+    EXPECT_EQ(row.periodthrs, 60);
+    EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
+    // One that takes the row leaves the number of entries that it has counted.
+    const Request third(logEntries(), conditions("auth.log", 1, 50), m_receiver);
+    EXPECT_EQ(zrm_rmlogent_manager::EventArrived(&row, 1), 0U);
+    EXPECT_EQ(row.freqthresh, 1);
+    EXPECT_EQ(row.periodthrs, 50);
+}
+
+TEST_F(HostRequests, NobodyIsPassedOverWhereTheTraceWouldShowIt) {
+    const Request mine(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "auth.log")}),
+                       m_receiver);
+    const Request other(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "syslog")}),
+                        m_receiver);
+    m_trace.setLevel(TRC1_FINE);
+    arrive(rowOf("auth.log", 1));
+    m_trace.setLevel(TRC1_ERROR);
+    EXPECT_EQ(m_trace.count("Event passed to situation alpha for evaluation."), 2);
+    EXPECT_EQ(m_trace.count("Passing row 0 to InsertRow()."), 1);
+    EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
+    m_trace.clear();
+}
+
 TEST_F(HostRequests, SituationsComeAndGoWhileRowsArrive) {
     Receiver lasting;
     const Request request(logEntries(), situation({}), lasting);

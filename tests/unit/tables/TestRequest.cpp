@@ -2,6 +2,9 @@
 
 #include "agent/TraceScope.h"
 #include "agent/framework/TableManager.h"
+#include "host/framework/ConditionSet.h"
+#include "host/framework/FilterList.h"
+#include "host/framework/RequestCounts.h"
 
 #include <algorithm>
 #include <cstring>
@@ -117,6 +120,18 @@ unsigned ctreq::InsertRow(char* row) {
     std::memcpy(m_rows.get() + std::size_t{count} * rowSize, row, rowSize);
     ++count;
     return 0;
+}
+
+const ConditionSet& ctreq::conditions() {
+    // None that the framework could judge by itself: every request is offered every row.
+    static const FilterList noFilters({});
+    static const ConditionSet none(noFilters, *this);
+    return none;
+}
+
+RequestCounts& ctreq::counts() noexcept {
+    static RequestCounts counts;
+    return counts;
 }
 
 unsigned ctreq::CheckForException(char* row) {

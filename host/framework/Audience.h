@@ -1,0 +1,96 @@
+#ifndef ZRM_HOST_AUDIENCE_H
+#define ZRM_HOST_AUDIENCE_H
+
+#include "agent/framework/LinkedList.h"
+
+#include <array>
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+class CompiledCondition;
+class ctreq;
+
+/// Finds the open situations that a fresh row may concern, at a small part of what it costs to
+/// offer it to each. Two things are used. The columns that name a log are the same in all rows of
+/// a log, so what the conditions on them say is found once per log and kept until the list of
+/// situations changes. And most other conditions are refused by the first bytes of a column, which
+/// are compared here side by side for all situations of the log.
+///
+/// Only conditions on character columns are looked at, since the table writes its integer columns
+/// for each situation anew. A situation that is left out would have refused the row; it counts the
+/// row as judged all the same. Used under the table manager's lock; allocates when the list has
+/// changed and when a log is seen for the first time, else not.
+class Audience {
+public:
+    /// The list outlives the object.
+    explicit Audience(LinkedList& requests) : m_requests(requests) {}
+    Audience(const Audience&) = delete;
+    Audience& operator=(const Audience&) = delete;
+
+    /// The situations that the row of `rowSize` bytes may concern, in their order in the list.
+    /// Valid until the next call.
+    LinkedList& of(char* row, std::size_t rowSize);
+
+private:
+    /// A condition that decides when the first bytes do not.
+    struct Check {
+        const CompiledCondition* condition;
+        std::size_t text; ///< index of its column in m_texts
+    };
+    /// An open situation. It does not meet its conditions where the eight bytes at the offset,
+    /// masked, are not those of the prefix.
+    struct Member {
+        std::uint64_t mask = 0;
+        std::uint64_t prefix = 0;
+        std::size_t offset = 0;
+        std::uint32_t firstCheck = 0; ///< in m_checks
+        std::uint32_t checks = 0;
+        ctreq* request = nullptr;
+    };
+    /// The text of a character column, found once per row whichever situations look at it.
+    struct Text {
+        std::size_t offset;
+        std::size_t width;
+        std::uint64_t row; ///< the row whose text is held, as m_row counts
+        std::string_view text;
+    };
+    /// Some bytes of a row.
+    struct Span {
+        std::size_t begin;
+        std::size_t end;
+    };
+    using Members = std::vector<std::uint32_t>; ///< indexes of m_members
+    using Logs = std::unordered_map<std::string, Members>;
+
+    void learnRequests(std::size_t rowSize);
+    void learnMember(ctreq& request, std::size_t rowSize);
+    void addCheck(const CompiledCondition& condition, Member& member, std::size_t rowSize);
+    std::size_t textOf(const CompiledCondition& condition);
+    void learnLogColumns();
+    const Members& membersOf(char* row);
+    bool isOf(const char* row, const std::string& log) const noexcept;
+    const Logs::value_type& findLog(char* row);
+    bool meetsChecks(const Member& member, char* row);
+
+    LinkedList& m_requests;
+    LinkedList m_chosen;
+    std::uint64_t m_generation = 0; ///< of the list when it was learnt; 0: never
+    std::vector<Member> m_members;
+    std::vector<Check> m_checks;
+    std::vector<Text> m_texts;
+    /// Conditions on the columns that name a log, with the member that states each.
+    std::vector<std::pair<std::uint32_t, const CompiledCondition*>> m_logConditions;
+    std::vector<Span> m_logColumns; ///< those that conditions are on
+    Logs m_logs;                    ///< by the bytes of these columns
+    /// The log whose row was seen at an address last: each log offers its rows at one address.
+    std::array<const Logs::value_type*, 256> m_recent{};
+    std::uint64_t m_row = 0; ///< rows seen
+    std::atomic<std::uint64_t> m_offered{0};
+};
+
+#endif
