@@ -53,3 +53,12 @@ std::optional<HttpUrl> HttpUrl::parse(std::string_view text) {
 std::string HttpUrl::authority() const {
     return ListenAddress{host, port}.text();
 }
+
+std::string HttpUrl::withPath(std::string_view path) const {
+    std::string whole = target;
+    std::size_t end = std::min(whole.find('?'), whole.size());
+    if (path.starts_with('/') && end > 0 && whole[end - 1] == '/') {
+        whole.erase(--end, 1);
+    }
+    return whole.insert(end, path);
+}

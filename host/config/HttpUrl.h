@@ -20,6 +20,9 @@ struct HttpUrl {
     /// "HOST:PORT" as in a URL.
     std::string authority() const;
 
+    /// The target with this path behind its own and before its query.
+    std::string withPath(std::string_view path) const;
+
     bool operator==(const HttpUrl&) const = default;
 };
 

@@ -151,7 +151,9 @@ std::optional<SinkConfig::Value> SinkOptionReader::read(const SinkOption& option
 void SinkOptionReader::checkText(const SinkOption& option, const std::string& text) {
     const TextKind& kind = rowOf(textKinds, option.kind);
     if (!kind.accepts(option, text)) {
-        const bool isShown = std::none_of(text.begin(), text.end(), isControl);
+        // A free text may be a secret, and the line says which it is.
+        const bool isShown =
+            option.kind != SinkOption::TEXT && std::none_of(text.begin(), text.end(), isControl);
         m_section.problem(option.name, (isShown ? "'" + text + "' " : "") + kind.what,
                           *kind.cure == '\0' ? cureOf(option) : kind.cure);
     }

@@ -7,7 +7,7 @@ namespace {
 
 using Option = SinkOption;
 
-constexpr std::array<std::string_view, 1> typeNames = {"jsonl"};
+constexpr std::array<std::string_view, 2> typeNames = {"jsonl", "webhook"};
 
 constexpr std::array commonOptions = {
     Option{.name = "type",
@@ -25,6 +25,58 @@ constexpr std::array commonOptions = {
            .most = 128},
 };
 
+// Options that every sink over HTTP has.
+constexpr Option timeoutOption{
+    .name = "timeout",
+    .kind = Option::DURATION,
+    .need = Option::OPTIONAL,
+    .value = "10s",
+    .meaning = "how long one request may take, from connecting to the end of the answer",
+    .least = 1,
+    .most = 300};
+constexpr Option headersOption{
+    .name = "headers",
+    .kind = Option::HEADERS,
+    .need = Option::OPTIONAL,
+    .value = "",
+    .meaning = "headers that are sent with each request, such as `Authorization`"};
+constexpr Option caFileOption{
+    .name = "ca_file",
+    .kind = Option::PATH,
+    .need = Option::OPTIONAL,
+    .value = "",
+    .meaning = "certificates (PEM) of the authorities that are trusted, instead of the system's"};
+
+constexpr std::array webhookOptions = {
+    Option{.name = "url",
+           .kind = Option::URL,
+           .need = Option::REQUIRED,
+           .value = "https://hooks.example.com/zrm",
+           .meaning = "where events are posted"},
+    Option{.name = "batch",
+           .kind = Option::NUMBER,
+           .need = Option::OPTIONAL,
+           .value = "64",
+           .meaning = "how many events one request has at most",
+           .least = 1,
+           .most = 1000},
+    Option{.name = "secret",
+           .kind = Option::TEXT,
+           .need = Option::OPTIONAL,
+           .value = "",
+           .meaning = "signs each request",
+           .most = 4096,
+           .instead = "secret_file"},
+    Option{.name = "secret_file",
+           .kind = Option::PATH,
+           .need = Option::OPTIONAL,
+           .value = "",
+           .meaning = "the file with the secret, which is read for each request"},
+    timeoutOption,
+    headersOption,
+    caFileOption,
+};
+
 constexpr std::array jsonlOptions = {
     Option{.name = "path",
            .kind = Option::OUTPUT,
@@ -35,6 +87,7 @@ constexpr std::array jsonlOptions = {
 
 constexpr std::array<SinkType, typeNames.size()> types = {{
     {"jsonl", "one JSON object per event, one event per line", "path", jsonlOptions},
+    {"webhook", "JSON in batches to a URL, by HTTP POST", "url", webhookOptions},
 }};
 
 } // namespace

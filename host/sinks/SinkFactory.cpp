@@ -1,6 +1,7 @@
 #include "host/sinks/SinkFactory.h"
 
 #include "host/sinks/JsonlSink.h"
+#include "host/sinks/WebhookSink.h"
 
 #include <algorithm>
 #include <array>
@@ -19,6 +20,7 @@ template <typename Type> std::unique_ptr<Sink> made(const SinkConfig& config) {
 
 constexpr std::array makers = {
     Maker{"jsonl", made<JsonlSink>},
+    Maker{"webhook", made<WebhookSink>},
 };
 
 } // namespace

@@ -99,6 +99,14 @@ def syslog_line(message, source="app[1]", host="web1", when=None):
     return f"{stamp} {host} {source}: {message}\n"
 
 
+def toml_value(value):
+    """A text, a number or a table of texts, as TOML has it."""
+    if isinstance(value, dict):
+        inside = ", ".join(f"{json.dumps(k)} = {json.dumps(v)}" for k, v in value.items())
+        return "{ " + inside + " }"
+    return json.dumps(value)
+
+
 class Agent:
     """One zrmagent in a directory of its own: configuration, process, outputs."""
 
@@ -110,6 +118,7 @@ class Agent:
         self.environment = {}
         self.situations = []
         self.sink = "-"
+        self.more_sinks = []
         self.listen = ""
         self.agent_keys = {}
         self.process = None
@@ -150,6 +159,9 @@ class Agent:
         text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         if self.sink is not None:
             text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
+        for sink in self.more_sinks:
+            text += "\n[[sink]]\n"
+            text += "".join(f"{k} = {toml_value(v)}\n" for k, v in sink.items())
         for situation in self.situations:
             text += "\n[[situation]]\n"
             text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in situation.items())

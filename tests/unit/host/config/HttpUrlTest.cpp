@@ -47,4 +47,16 @@ TEST(HttpUrl, TellsTheAuthority) {
     EXPECT_EQ(HttpUrl::parse("http://[::1]:8080/")->authority(), "[::1]:8080");
 }
 
+TEST(HttpUrl, AddsAPathToItsOwn) {
+    const auto with = [](const char* url, const char* path) {
+        return HttpUrl::parse(url)->withPath(path);
+    };
+    EXPECT_EQ(with("http://web1", "/api/v2/alerts"), "/api/v2/alerts");
+    EXPECT_EQ(with("http://web1/", "/api/v2/alerts"), "/api/v2/alerts");
+    EXPECT_EQ(with("http://web1/alerts/", "/api/v2/alerts"), "/alerts/api/v2/alerts");
+    EXPECT_EQ(with("http://web1/alerts?key=/a/", "/v1"), "/alerts/v1?key=/a/");
+    EXPECT_EQ(with("http://web1/hook?key=a", ""), "/hook?key=a");
+    EXPECT_EQ(with("http://web1/hook/", ""), "/hook/");
+}
+
 } // namespace

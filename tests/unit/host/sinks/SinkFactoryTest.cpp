@@ -1,5 +1,6 @@
 #include "host/sinks/SinkFactory.h"
 
+#include "SinkTest.h"
 #include "host/config/SinkTypes.h"
 
 #include <gtest/gtest.h>
@@ -10,15 +11,17 @@ namespace {
 
 TEST(SinkFactory, MakesEveryTypeUnderItsName) {
     for (const SinkType& type : SinkTypes::all()) {
-        SinkConfig config;
-        config.type = type.name;
-        config.name = "the " + config.type;
+        const std::string name(type.name);
+        std::string keys = "type = '" + name + "'\nname = 'the " + name + "'\n";
         for (const SinkOption& option : type.options) {
-            config.options.emplace(option.name, std::string(option.value));
+            if (option.need == SinkOption::REQUIRED) {
+                keys += std::string(option.name) + " = '" + std::string(option.value) + "'\n";
+            }
         }
+        const SinkConfig config = sinkConfig(keys);
         const std::unique_ptr<Sink> sink = SinkFactory::make(config);
         ASSERT_NE(sink, nullptr) << type.name;
-        EXPECT_EQ(sink->name(), config.name);
+        EXPECT_EQ(sink->name(), "the " + name);
     }
 }
 

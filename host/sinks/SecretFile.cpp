@@ -1,0 +1,49 @@
+#include "host/sinks/SecretFile.h"
+
+#include "agent/ErrorText.h"
+
+#include <cerrno>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+constexpr std::size_t longestSecret = 4096; ///< bytes
+
+/// The whole content of an open file, or as much as tells that it is too long.
+std::optional<std::string> content(int fd) {
+    std::string text;
+    char buffer[1024];
+    ssize_t count = 0;
+    while (text.size() <= longestSecret && (count = ::read(fd, buffer, sizeof buffer)) > 0) {
+        text.append(buffer, static_cast<std::size_t>(count));
+    }
+    return count == -1 ? std::nullopt : std::optional(std::move(text));
+}
+
+} // namespace
+
+std::optional<std::string> SecretFile::read(const std::string& path, std::string& problem) {
+    // Without waiting: a pipe in the file system is told from a file only when it is open.
+    const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+    struct stat status {};
+    std::optional<std::string> text;
+    if (fd == -1 || fstat(fd, &status) != 0 || (S_ISREG(status.st_mode) && !(text = content(fd)))) {
+        problem = "cannot read " + path + ": " + ErrorText(errno).text();
+    }
+    if (fd == -1) {
+        return std::nullopt;
+    }
+    ::close(fd);
+    if (text && text->ends_with('\n')) {
+        text->pop_back();
+    }
+    if (problem.empty() && (!text || text->empty() || text->size() > longestSecret)) {
+        problem =
+            path + " is no file with a secret of 1 to " + std::to_string(longestSecret) + " bytes";
+        return std::nullopt;
+    }
+    return text;
+}

@@ -1,0 +1,82 @@
+#include "host/sinks/WebhookSink.h"
+
+#include "agent/TraceScope.h"
+#include "host/sinks/HmacSha256.h"
+#include "host/sinks/SecretFile.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"WebhookSink.cpp"};
+
+std::string bodyOf(std::span<const EventRecord> events) {
+    std::string body;
+    for (const EventRecord& event : events) {
+        body += body.empty() ? "{\"events\":[" : ",";
+        body += event.json;
+    }
+    return body + "]}";
+}
+
+/// Tells a request from every other one of this agent. Identifiers alone would not: without a
+/// history they begin anew at every start.
+std::string keyOf(std::span<const EventRecord> events) {
+    return std::to_string(events.front().id) + '-' + std::to_string(events.back().id) + '-' +
+           std::to_string(events.front().raised);
+}
+
+} // namespace
+
+WebhookSink::WebhookSink(const SinkConfig& config)
+    : m_name(config.name), m_batch(static_cast<std::size_t>(config.number("batch"))),
+      m_secret(config.text("secret")), m_secretFile(config.text("secret_file")),
+      m_http(config, "") {}
+
+bool WebhookSink::sign(const std::string& body, HttpPost::Headers& headers) {
+    std::string secret = m_secret;
+    if (!m_secretFile.empty()) {
+        // Read anew each time, so that a secret can be changed while the agent runs.
+        std::string problem;
+        std::optional<std::string> text = SecretFile::read(m_secretFile, problem);
+        if (!text) {
+            m_error = std::move(problem);
+            return false;
+        }
+        secret = std::move(*text);
+    }
+    if (!secret.empty()) {
+        headers.emplace("X-Zrm-Signature", "sha256=" + HmacSha256::hex(secret, body));
+    }
+    return true;
+}
+
+bool WebhookSink::post(std::span<const EventRecord> events, const std::stop_token& giveUp) {
+    const std::string body = bodyOf(events);
+    HttpPost::Headers headers = {{"Idempotency-Key", keyOf(events)}};
+    if (!sign(body, headers)) {
+        return false;
+    }
+    if (!m_http.send(body, headers, giveUp)) {
+        m_error = m_http.error();
+        return false;
+    }
+    return true;
+}
+
+std::size_t WebhookSink::deliver(std::span<const EventRecord> events,
+                                 const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    std::size_t delivered = 0;
+    while (delivered < events.size()) {
+        const std::size_t most = m_again == 0 ? m_batch : m_again;
+        const auto batch = events.subspan(delivered, std::min(most, events.size() - delivered));
+        m_again = post(batch, giveUp) ? 0 : batch.size();
+        if (m_again != 0) {
+            break;
+        }
+        delivered += batch.size();
+    }
+    return trace.result(delivered);
+}

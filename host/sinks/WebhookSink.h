@@ -1,0 +1,37 @@
+#ifndef ZRM_HOST_WEBHOOK_SINK_H
+#define ZRM_HOST_WEBHOOK_SINK_H
+
+#include "host/events/Sink.h"
+#include "host/sinks/HttpPost.h"
+
+#include <cstddef>
+#include <optional>
+#include <span>
+#include <stop_token>
+#include <string>
+
+/// Posts events as {"events": [...]} to a URL, signed when there is a secret. A request that
+/// failed is repeated as it was, so that its receiver can tell that it has it already.
+class WebhookSink : public Sink {
+public:
+    explicit WebhookSink(const SinkConfig& config);
+
+    std::string name() const override { return m_name; }
+    std::size_t deliver(std::span<const EventRecord> events,
+                        const std::stop_token& giveUp) override;
+    std::string error() const override { return m_error; }
+
+private:
+    bool post(std::span<const EventRecord> events, const std::stop_token& giveUp);
+    bool sign(const std::string& body, HttpPost::Headers& headers);
+
+    const std::string m_name;
+    const std::size_t m_batch;
+    const std::string m_secret;
+    const std::string m_secretFile;
+    HttpPost m_http;
+    std::size_t m_again = 0; ///< events of the request that failed and is to be repeated
+    std::string m_error;
+};
+
+#endif

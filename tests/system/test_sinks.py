@@ -1,0 +1,208 @@
+"""Events on their way to other systems: batches, signatures, TLS, receivers that fail."""
+
+import hashlib
+import hmac
+import socket
+import subprocess
+import time
+
+import pytest
+
+from conftest import PATIENCE, descriptions, syslog_line, wait_until
+from receiver import Receiver, slowly
+
+
+def free_port():
+    with socket.socket() as probe:
+        probe.bind(("127.0.0.1", 0))
+        return probe.getsockname()[1]
+
+
+def wait_for(receiver, count, agent):
+    return wait_until(
+        lambda: receiver.events() if len(receiver.events()) >= count else None,
+        lambda: f"{count} events; there are {len(receiver.events())}: {agent.stderr.text()[-2000:]}",
+    )
+
+
+@pytest.fixture
+def log(agent):
+    log = agent.log()
+    agent.situation("watch", log=log, severity="major")
+    return log
+
+
+def append(log, first, last):
+    log.append("".join(syslog_line(f"entry {number}") for number in range(first, last + 1)))
+
+
+def entries(first, last):
+    return [f"entry {number}" for number in range(first, last + 1)]
+
+
+def test_a_webhook_gets_signed_batches_in_order(agent, log):
+    with Receiver() as receiver:
+        agent.more_sinks.append(
+            {
+                "type": "webhook",
+                "url": receiver.url + "/hook",
+                "secret": "key",
+                "batch": 10,
+                "headers": {"Authorization": "Bearer abc"},
+            }
+        )
+        agent.start()
+        append(log, 1, 100)
+        events = wait_for(receiver, 100, agent)
+        assert agent.stop() == 0
+    assert descriptions(events) == entries(1, 100)
+    assert events == agent.events()
+    for request in receiver.taken:
+        assert request.path == "/hook"
+        assert len(request.json["events"]) <= 10
+        assert list(request.json) == ["events"]
+        signature = hmac.new(b"key", request.body, hashlib.sha256).hexdigest()
+        assert request.headers["X-Zrm-Signature"] == "sha256=" + signature
+        assert request.headers["Authorization"] == "Bearer abc"
+        assert request.headers["Content-Type"] == "application/json"
+        ids = [event["id"] for event in request.json["events"]]
+        assert request.headers["Idempotency-Key"].startswith(f"{ids[0]}-{ids[-1]}-")
+
+
+def test_a_receiver_that_comes_late_gets_everything(agent, log):
+    port = free_port()
+    agent.more_sinks.append({"type": "webhook", "url": f"http://127.0.0.1:{port}", "name": "late"})
+    agent.start()
+    append(log, 1, 100)
+    agent.wait_events(100)  # standard output does not wait for the other sink
+    agent.wait_trace("Error delivering events to late: no connection")
+    with Receiver(port) as receiver:
+        assert descriptions(wait_for(receiver, 100, agent)) == entries(1, 100)
+        agent.wait_trace("Sink late takes events again.")
+    assert agent.stop() == 0
+
+
+def test_nothing_is_lost_or_out_of_order_while_a_receiver_fails_in_every_way(agent, log):
+    turns = [200, 500, ConnectionResetError(), 400, 200, 503, 302]
+    count = 0
+
+    def answer(request):
+        nonlocal count
+        count += 1
+        turn = turns[count % len(turns)]
+        if isinstance(turn, Exception):
+            raise turn
+        return turn, b"{}"
+
+    with Receiver() as receiver:
+        receiver.answer = answer
+        agent.more_sinks.append({"type": "webhook", "url": receiver.url, "batch": 5})
+        agent.start()
+        append(log, 1, 50)
+        events = wait_for(receiver, 50, agent)
+        assert descriptions(events) == entries(1, 50)
+        assert agent.stop() == 0
+        assert receiver.refused
+
+
+def test_a_slow_receiver_holds_nobody_up(agent, log):
+    with Receiver() as receiver:
+        receiver.answer = slowly(2)
+        agent.more_sinks.append({"type": "webhook", "url": receiver.url, "batch": 1})
+        agent.start()
+        append(log, 1, 200)
+        began = time.monotonic()
+        agent.wait_events(200)
+        assert len(receiver.events()) < 200
+        receiver.answer = lambda request: 200
+        assert descriptions(wait_for(receiver, 200, agent)) == entries(1, 200)
+        assert agent.stop() == 0
+        assert time.monotonic() - began < PATIENCE
+
+
+def test_a_receiver_that_never_answers_does_not_hold_up_the_end(agent, log):
+    listener = socket.create_server(("127.0.0.1", 0))
+    agent.more_sinks.append(
+        {"type": "webhook", "url": f"http://127.0.0.1:{listener.getsockname()[1]}", "timeout": "60s"}
+    )
+    agent.start()
+    append(log, 1, 3)
+    agent.wait_events(3)
+    began = time.monotonic()
+    assert agent.stop() == 0
+    assert time.monotonic() - began < 20
+    agent.wait_trace("3 events were not delivered to webhook")
+    listener.close()
+
+
+# ------------------------------------------------------------------------------------ TLS
+
+
+@pytest.fixture(scope="module")
+def authority(tmp_path_factory):
+    """Makes certificates: for a host, signed by an authority of its own."""
+    directory = tmp_path_factory.mktemp("certificates")
+
+    def openssl(*arguments):
+        subprocess.run(["openssl", *arguments], cwd=directory, check=True, capture_output=True)
+
+    new = ["-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:prime256v1", "-nodes", "-days", "2"]
+    openssl("req", "-x509", *new, "-keyout", "ca.key", "-out", "ca.pem", "-subj", "/CN=Test CA")
+    for name, host in (("right", "IP:127.0.0.1"), ("wrong", "DNS:other.example.com")):
+        openssl(
+            "req", "-x509", *new, "-keyout", f"{name}.key", "-out", f"{name}.pem",
+            "-subj", f"/CN={name}", "-addext", f"subjectAltName={host}",
+            "-CA", "ca.pem", "-CAkey", "ca.key",
+        )  # fmt: skip
+    return directory
+
+
+def certificate(authority, name):
+    return authority / f"{name}.pem", authority / f"{name}.key"
+
+
+def test_events_go_to_a_trusted_server_over_tls(agent, log, authority):
+    with Receiver(certificate=certificate(authority, "right")) as receiver:
+        agent.more_sinks.append(
+            {"type": "webhook", "url": receiver.url, "ca_file": str(authority / "ca.pem")}
+        )
+        agent.start()
+        append(log, 1, 3)
+        wait_for(receiver, 3, agent)
+        append(log, 4, 5)
+        assert descriptions(wait_for(receiver, 5, agent)) == entries(1, 5)
+        assert agent.stop() == 0
+
+
+def test_nothing_goes_to_a_server_that_is_not_trusted(agent, log, authority):
+    """Neither to one of an unknown authority nor to one whose certificate is for another host."""
+    with (
+        Receiver(certificate=certificate(authority, "right")) as right,
+        Receiver(certificate=certificate(authority, "wrong")) as wrong,
+    ):
+        trusted = str(authority / "ca.pem")
+        agent.more_sinks += [
+            {"type": "webhook", "url": right.url, "name": "unknown"},
+            {"type": "webhook", "url": wrong.url, "name": "other", "ca_file": trusted},
+        ]
+        agent.start()
+        append(log, 1, 3)
+        why = "the server's certificate is not trusted for this host"
+        agent.wait_trace(f"Error delivering events to unknown: {why} ({right.url[8:]})")
+        agent.wait_trace(f"Error delivering events to other: {why} ({wrong.url[8:]})")
+        assert agent.stop() == 0
+        assert right.taken == wrong.taken == []
+
+
+def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, authority, tmp_path):
+    trusted = tmp_path / "trusted.pem"
+    with Receiver(certificate=certificate(authority, "right")) as receiver:
+        agent.more_sinks.append(
+            {"type": "webhook", "url": receiver.url, "name": "hook", "ca_file": str(trusted)}
+        )
+        agent.start()
+        append(log, 1, 3)
+        agent.wait_trace("Error delivering events to hook: ca_file cannot be read")
+        trusted.write_bytes((authority / "ca.pem").read_bytes())
+        assert descriptions(wait_for(receiver, 3, agent)) == entries(1, 3)
+        assert agent.stop() == 0

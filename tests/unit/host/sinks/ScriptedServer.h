@@ -1,0 +1,62 @@
+#ifndef ZRM_TESTS_SCRIPTED_SERVER_H
+#define ZRM_TESTS_SCRIPTED_SERVER_H
+
+#include <cstdint>
+#include <functional>
+#include <list>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+/// An HTTP server on a free port of this machine that says byte by byte what a test wants.
+class ScriptedServer {
+public:
+    struct Request {
+        std::string line;    ///< the first line
+        std::string headers; ///< the lines behind it, in lower case
+        std::string body;
+        int connection = 0; ///< counted from 1
+
+        /// The value of a header (its name in lower case); empty when it is missing.
+        std::string header(const std::string& name) const;
+    };
+    struct Reply {
+        std::string bytes;
+        enum Then { KEEP, CLOSE, HOLD } then = KEEP; ///< HOLD: nothing more happens
+    };
+    /// Called for each request, one at a time.
+    using Script = std::function<Reply(const Request& request)>;
+
+    explicit ScriptedServer(Script script);
+    ~ScriptedServer();
+    ScriptedServer(const ScriptedServer&) = delete;
+    ScriptedServer& operator=(const ScriptedServer&) = delete;
+
+    /// Answers with this status.
+    static Reply status(int status, const std::string& body = "", const std::string& headers = "");
+
+    std::string url(const std::string& path = "") const;
+    std::uint16_t port() const { return m_port; }
+
+    /// The requests so far.
+    std::vector<Request> requests() const;
+    /// The bodies of the requests so far.
+    std::vector<std::string> bodies() const;
+
+private:
+    void accept();
+    void serve(int socket, int number);
+
+    const Script m_script;
+    int m_listener = -1;
+    std::uint16_t m_port = 0;
+    mutable std::mutex m_mutex;
+    bool m_ending = false;
+    std::vector<Request> m_requests;
+    std::vector<int> m_sockets;
+    std::list<std::jthread> m_threads;
+    std::jthread m_acceptor;
+};
+
+#endif

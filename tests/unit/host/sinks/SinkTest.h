@@ -1,0 +1,64 @@
+#ifndef ZRM_TESTS_SINK_TEST_H
+#define ZRM_TESTS_SINK_TEST_H
+
+#include "host/config/ConfigFile.h"
+#include "host/events/EventRecord.h"
+#include "host/framework/UtcTime.h"
+
+#include <gtest/gtest.h>
+
+#include <deque>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+/// The sink that this text, behind [[sink]], configures.
+inline SinkConfig sinkConfig(const std::string& text) {
+    const ConfigFile::Result result = ConfigFile::parse("[[sink]]\n" + text, "zrm.toml");
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        ADD_FAILURE() << problems->front();
+        return {};
+    }
+    return std::get<HostConfig>(result).sinks.front();
+}
+
+/// Events of the Log Entries table as records, one second after the other.
+class EntryEvents {
+public:
+    struct Entry {
+        std::string description = "Failed password for root";
+        std::string situation = "ssh-bruteforce";
+        std::string severity = "critical";
+        std::string log = "/var/log/auth.log";
+    };
+    static constexpr std::int64_t kRaised = 1'795'158'189'412; ///< of the first event
+
+    /// Adds an event; its texts are valid in JSON as they are.
+    void add(const Entry& entry) {
+        m_entries.push_back(entry);
+        const Entry& kept = m_entries.back();
+        const std::uint64_t id = m_records.size() + 1;
+        const std::int64_t raised = kRaised + 1000 * static_cast<std::int64_t>(id - 1);
+        m_texts.push_back(
+            R"({"id":)" + std::to_string(id) + R"(,"situation":")" + kept.situation +
+            R"(","severity":")" + kept.severity + R"(","raised":")" + UtcTime::text(raised) +
+            R"(","row":{"ORIGINNODE":"web1:ZRM","ENTRYSRC":"sshd","ENTRYDESC":"short",)" +
+            R"("SAMPLENO":3,"UENTRYSRC":"","UENTRYDESC":")" + kept.description + R"("}})");
+        m_records.push_back({id, raised, kept.situation, kept.severity, kept.log, m_texts.back()});
+    }
+    const std::vector<EventRecord>& records() const { return m_records; }
+
+private:
+    std::deque<Entry> m_entries;
+    std::deque<std::string> m_texts;
+    std::vector<EventRecord> m_records;
+};
+
+/// A config whose requests take no longer than this.
+inline SinkConfig within(std::chrono::milliseconds limit, SinkConfig config) {
+    config.options.insert_or_assign("timeout", limit);
+    return config;
+}
+
+#endif
