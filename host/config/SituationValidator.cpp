@@ -20,7 +20,7 @@ bool isControl(char c) {
     return static_cast<unsigned char>(c) < 0x20 || c == 0x7f;
 }
 
-std::string atMost(std::size_t bytes) {
+std::string inBytes(std::size_t bytes) {
     return std::to_string(bytes) + " bytes";
 }
 
@@ -35,7 +35,7 @@ void checkName(const std::optional<std::string>& name, Problems& problems) {
         problems.push_back({"name",
                             {},
                             "is no usable name",
-                            "write 1 to " + atMost(SituationValidator::longestName) +
+                            "write 1 to " + inBytes(SituationValidator::longestName) +
                                 " without control characters, and not . or .."});
     }
 }
@@ -44,8 +44,8 @@ void checkText(const std::string& text, Problems& problems) {
     if (text.size() > SituationValidator::longestText) {
         problems.push_back({"text",
                             {},
-                            "has " + atMost(text.size()),
-                            "write at most " + atMost(SituationValidator::longestText)});
+                            "has " + inBytes(text.size()),
+                            "write at most " + inBytes(SituationValidator::longestText)});
     }
 }
 
@@ -74,6 +74,17 @@ void addConditions(const std::vector<std::string>& texts, SituationConfig& situa
                             {},
                             "has " + std::to_string(texts.size()) + " conditions",
                             "write at most " + std::to_string(SituationValidator::mostConditions)});
+        return;
+    }
+    std::size_t bytes = 0;
+    for (const std::string& text : texts) {
+        bytes += text.size();
+    }
+    if (bytes > SituationValidator::longestConditions) {
+        problems.push_back({"when",
+                            {},
+                            "has conditions of " + inBytes(bytes) + " together",
+                            "write at most " + inBytes(SituationValidator::longestConditions)});
         return;
     }
     const ConditionParser parser("RMLOGENT");

@@ -37,6 +37,7 @@ public:
     static constexpr std::size_t longestName = 128;  ///< bytes
     static constexpr std::size_t longestText = 1024; ///< bytes
     static constexpr std::size_t mostConditions = 100;
+    static constexpr std::size_t longestConditions = 65536; ///< bytes of all of them
 
     /// Makes the situation of the text and returns everything that is wrong with it. The situation
     /// is meaningless when there is something.

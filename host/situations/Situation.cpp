@@ -4,6 +4,7 @@
 #include "agent/framework/ctreq.h"
 #include "host/framework/Status.h"
 
+#include <chrono>
 #include <utility>
 
 namespace {
@@ -18,20 +19,37 @@ RequestDetail detailOf(const SituationConfig& config) {
     return detail;
 }
 
+std::int64_t now() {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(
+               std::chrono::system_clock::now().time_since_epoch())
+        .count();
+}
+
 } // namespace
 
-Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue)
+Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
+                     std::shared_ptr<SituationCounts> counts)
     : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(
                                        SituationLabel{m_config.name, m_config.severity})),
-      m_queue(queue), m_request(entries, detailOf(m_config), *this) {
+      m_queue(queue), m_counts(std::move(counts)),
+      m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
     TraceScope trace(anchor);
     if (!isOpen()) {
         trace.error()("Situation %s could not be opened.", m_config.name.c_str());
     }
 }
 
+void Situation::silence() {
+    TraceScope trace(anchor);
+    if (isOpen()) {
+        m_request.get()->Stop();
+    }
+}
+
 unsigned Situation::receive(const ctreq& request, const char* rows, unsigned count) {
     TraceScope trace(anchor);
+    // Before the wait for room: the events are raised, whenever they come to be delivered.
+    m_counts->countRaised(count, now());
     for (unsigned index = 0; index < count; ++index) {
         if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {
             return trace.result(static_cast<unsigned>(STATUS_END));
@@ -42,6 +60,7 @@ unsigned Situation::receive(const ctreq& request, const char* rows, unsigned cou
 
 void Situation::stopped(const ctreq& /*request*/, unsigned reason) {
     TraceScope trace(anchor);
+    m_stopReason = reason;
     trace.error()("The agent has stopped situation %s; reason = %u.", m_config.name.c_str(),
                   reason);
 }

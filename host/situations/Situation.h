@@ -5,8 +5,11 @@
 #include "host/events/EventQueue.h"
 #include "host/framework/ContextInfo.h"
 #include "host/framework/Request.h"
+#include "host/situations/SituationCounts.h"
 
+#include <atomic>
 #include <memory>
+#include <string>
 
 class TableManager;
 
@@ -15,12 +18,20 @@ class TableManager;
 class Situation : private RowReceiver {
 public:
     /// Opens the situation on the table. The table's manager and the queue outlive the object.
-    Situation(SituationConfig config, TableManager& entries, EventQueue& queue);
+    Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
+              std::shared_ptr<SituationCounts> counts);
     Situation(const Situation&) = delete;
     Situation& operator=(const Situation&) = delete;
 
     bool isOpen() const noexcept { return m_request.isOpen(); }
-    const SituationConfig& config() const noexcept { return m_config; }
+    const std::string& name() const noexcept { return m_config.name; }
+
+    /// Why the agent has stopped it (a reason of ctreq::Stopped); 0: it has not. Any thread.
+    unsigned stopReason() const noexcept { return m_stopReason.load(); }
+
+    /// Lets no further entry pass from now on, although the situation is still open. Unlike its
+    /// end this waits for nobody. Any thread.
+    void silence();
 
 private:
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override;
@@ -29,6 +40,8 @@ private:
     const SituationConfig m_config;
     const std::shared_ptr<const SituationLabel> m_label;
     EventQueue& m_queue;
+    const std::shared_ptr<SituationCounts> m_counts;
+    std::atomic<unsigned> m_stopReason{0};
     Request m_request; ///< last: rows may arrive while it is built
 };
 

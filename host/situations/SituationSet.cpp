@@ -8,30 +8,343 @@ namespace {
 
 TRC1_Anchor anchor{"SituationSet.cpp"};
 
+constexpr auto FILE_SOURCE = SituationStatus::FILE;
+constexpr auto API_SOURCE = SituationStatus::API;
+
+SituationRefusal unknown(const std::string& name) {
+    return {SituationRefusal::UNKNOWN, "there is no situation '" + name + "'"};
+}
+
+SituationRefusal fromFile(const std::string& name) {
+    return {SituationRefusal::FROM_FILE,
+            "the situation '" + name +
+                "' belongs to the configuration file: change it there, which takes effect at once, "
+                "or stop it"};
+}
+
+SituationRefusal missing(bool isInFile, const std::string& name) {
+    return isInFile ? fromFile(name) : unknown(name);
+}
+
+/// The key under which the runner has a situation.
+std::string runnerKey(SituationStatus::Source source, const std::string& name) {
+    return (source == FILE_SOURCE ? "file " : "API ") + name;
+}
+
 } // namespace
 
-SituationSet::SituationSet(TableManager& entries, EventQueue& queue)
-    : m_entries(entries), m_queue(queue) {}
+SituationSet::SituationSet(TableManager& entries, EventQueue& queue, std::string storePath)
+    : m_store(std::move(storePath)), m_runner(entries, queue) {}
+
+std::string SituationSet::load() {
+    TraceScope trace(anchor);
+    std::string message;
+    const std::lock_guard changing(m_changing);
+    SituationStore::Content content = m_store.load(message);
+    const std::lock_guard guard(m_mutex);
+    for (SituationStore::Made& made : content.made) {
+        const Key key{API_SOURCE, made.config.name};
+        Record& record = m_records[key];
+        record.config = std::move(made.config);
+        record.isStopped = made.isStopped;
+        record.problem = std::move(made.problem);
+    }
+    m_stoppedFiles.insert(content.stoppedFiles.begin(), content.stoppedFiles.end());
+    return message;
+}
 
 void SituationSet::apply(const std::vector<SituationConfig>& configs) {
     TraceScope trace(anchor);
-    std::erase_if(m_situations, [&](const auto& running) {
-        const auto same = std::find(configs.begin(), configs.end(), running.second->config());
-        if (same == configs.end()) {
-            trace.detail()("Closing situation %s.", running.first.c_str());
+    {
+        const std::lock_guard guard(m_mutex);
+        std::set<std::string> names;
+        for (const SituationConfig& config : configs) {
+            names.insert(config.name);
         }
-        return same == configs.end();
+        for (auto record = m_records.begin(); record != m_records.end();) {
+            const auto& [source, name] = record->first;
+            if (source == FILE_SOURCE && !names.contains(name)) {
+                m_runner.stop(runnerKey(source, name));
+                m_stoppedFiles.erase(name);
+                record = m_records.erase(record);
+            } else {
+                ++record;
+            }
+        }
+        for (const SituationConfig& config : configs) {
+            const Key key{FILE_SOURCE, config.name};
+            const auto found = m_records.find(key);
+            if (found == m_records.end() || found->second.config != config) {
+                Record record{config};
+                record.isStopped = m_stoppedFiles.contains(config.name);
+                m_records.insert_or_assign(key, record);
+                run(key, record);
+            }
+        }
+        // What the file has come to name, or names no more, shadows others or does not.
+        for (const auto& [key, record] : m_records) {
+            if (key.first == API_SOURCE) {
+                runAgain(key, record);
+            }
+        }
+    }
+    m_runner.settle(patience);
+}
+
+std::vector<SituationStatus> SituationSet::list() const {
+    const std::lock_guard guard(m_mutex);
+    std::vector<SituationStatus> all;
+    all.reserve(m_records.size());
+    for (const auto& [key, record] : m_records) {
+        all.push_back(statusOf(key, record));
+    }
+    return all;
+}
+
+std::optional<SituationStatus> SituationSet::find(const std::string& name) const {
+    const std::lock_guard guard(m_mutex);
+    const auto* const found = named(m_records, name);
+    return found == nullptr ? std::nullopt : std::optional(statusOf(found->first, found->second));
+}
+
+SituationSet::Change SituationSet::add(const SituationConfig& config) {
+    return statusAfter(change([&](Draft& draft) -> Changed {
+        if (named(draft.records, config.name) != nullptr) {
+            return SituationRefusal{SituationRefusal::EXISTS,
+                                    "there is a situation '" + config.name +
+                                        "' already: choose another name, or change that one"};
+        }
+        const auto made =
+            std::count_if(draft.records.begin(), draft.records.end(),
+                          [](const auto& one) { return one.first.first == API_SOURCE; });
+        if (static_cast<std::size_t>(made) >= mostMade) {
+            return SituationRefusal{SituationRefusal::TOO_MANY,
+                                    "there are " + std::to_string(mostMade) +
+                                        " situations made through the API: remove one first"};
+        }
+        const Key key{API_SOURCE, config.name};
+        draft.records.emplace(key, Record{config});
+        return key;
+    }));
+}
+
+SituationSet::Change SituationSet::replace(const SituationConfig& config) {
+    return statusAfter(change([&](Draft& draft) -> Changed {
+        const Key key{API_SOURCE, config.name};
+        const auto found = draft.records.find(key);
+        if (found == draft.records.end()) {
+            return missing(named(draft.records, config.name) != nullptr, config.name);
+        }
+        Record& record = found->second;
+        if (record.config != config || !record.problem.empty()) {
+            Record exchanged{config};
+            exchanged.isStopped = record.isStopped;
+            record = std::move(exchanged);
+        }
+        return key;
+    }));
+}
+
+std::optional<SituationRefusal> SituationSet::remove(const std::string& name) {
+    Changed changed = change([&](Draft& draft) -> Changed {
+        const Key key{API_SOURCE, name};
+        if (draft.records.erase(key) == 0) {
+            return missing(named(draft.records, name) != nullptr, name);
+        }
+        return key;
     });
-    for (const SituationConfig& config : configs) {
-        auto& situation = m_situations[config.name];
-        if (situation == nullptr) {
-            trace.detail()("Opening situation %s.", config.name.c_str());
-            situation = std::make_unique<Situation>(config, m_entries, m_queue);
+    auto* const refusal = std::get_if<SituationRefusal>(&changed);
+    return refusal == nullptr ? std::nullopt : std::optional(std::move(*refusal));
+}
+
+SituationSet::Change SituationSet::start(const std::string& name) {
+    return setStopped(name, false);
+}
+
+SituationSet::Change SituationSet::stop(const std::string& name) {
+    return setStopped(name, true);
+}
+
+SituationSet::Change SituationSet::setStopped(const std::string& name, bool isStopped) {
+    return statusAfter(change([&](Draft& draft) -> Changed {
+        const auto* const found = named(draft.records, name);
+        if (found == nullptr) {
+            return unknown(name);
         }
+        const Key key = found->first;
+        draft.records[key].isStopped = isStopped;
+        if (key.first == FILE_SOURCE && isStopped) {
+            draft.stoppedFiles.insert(name);
+        } else if (key.first == FILE_SOURCE) {
+            draft.stoppedFiles.erase(name);
+        }
+        return key;
+    }));
+}
+
+/// Makes the change that `plan` makes to the draft, of the record whose key it returns.
+SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>& plan) {
+    TraceScope trace(anchor);
+    std::unique_lock changing(m_changing, patience);
+    if (!changing) {
+        return SituationRefusal{SituationRefusal::BUSY,
+                                "other changes of the situations are under way: try again"};
+    }
+    Draft draft;
+    {
+        const std::lock_guard guard(m_mutex);
+        draft = {m_records, m_stoppedFiles};
+    }
+    Changed changed = plan(draft);
+    if (std::holds_alternative<SituationRefusal>(changed)) {
+        return changed;
+    }
+    if (auto refusal = save(draft)) {
+        return std::move(*refusal);
+    }
+    {
+        const std::lock_guard guard(m_mutex);
+        publish(std::get<Key>(changed), draft);
+    }
+    changing.unlock();
+    m_runner.settle(patience);
+    return changed;
+}
+
+/// Takes one record over from the draft. The file's may have changed since it was made.
+void SituationSet::publish(const Key& key, const Draft& draft) {
+    const auto drafted = draft.records.find(key);
+    const auto found = m_records.find(key);
+    if (drafted == draft.records.end()) {
+        m_records.erase(key);
+        m_runner.stop(runnerKey(key.first, key.second));
+        return;
+    }
+    m_stoppedFiles = draft.stoppedFiles;
+    if (key.first == FILE_SOURCE) {
+        if (found != m_records.end()) {
+            found->second.isStopped = drafted->second.isStopped;
+            runAgain(key, found->second);
+        }
+        return;
+    }
+    const bool isAsItWas =
+        found != m_records.end() && found->second.counts == drafted->second.counts;
+    const Record& record = m_records.insert_or_assign(key, drafted->second).first->second;
+    if (isAsItWas) {
+        runAgain(key, record);
+    } else {
+        run(key, record);
     }
 }
 
-void SituationSet::close() {
-    TraceScope trace(anchor);
-    m_situations.clear();
+SituationSet::Change SituationSet::statusAfter(const Changed& changed) const {
+    if (const auto* const refusal = std::get_if<SituationRefusal>(&changed)) {
+        return *refusal;
+    }
+    const std::lock_guard guard(m_mutex);
+    const auto found = m_records.find(std::get<Key>(changed));
+    if (found == m_records.end()) {
+        return unknown(std::get<Key>(changed).second); // gone again, or the file has lost it
+    }
+    return statusOf(found->first, found->second);
+}
+
+/// The one that a name stands for in the API: the file's situation hides one made through it.
+const SituationSet::Records::value_type* SituationSet::named(const Records& records,
+                                                             const std::string& name) {
+    for (const auto source : {FILE_SOURCE, API_SOURCE}) {
+        const auto found = records.find({source, name});
+        if (found != records.end()) {
+            return &*found;
+        }
+    }
+    return nullptr;
+}
+
+bool SituationSet::isShadowed(const Key& key) const {
+    return key.first == API_SOURCE && m_records.contains({FILE_SOURCE, key.second});
+}
+
+/// Lets a record that is new or has changed run, or not.
+void SituationSet::run(const Key& key, const Record& record) {
+    const std::string name = runnerKey(key.first, key.second);
+    if (record.isStopped || !record.problem.empty() || isShadowed(key)) {
+        m_runner.stop(name);
+    } else {
+        m_runner.start(name, record.config, record.counts);
+    }
+}
+
+/// The same for one that may run already, and then goes on undisturbed.
+void SituationSet::runAgain(const Key& key, const Record& record) {
+    const SituationRunner::State state = m_runner.state(runnerKey(key.first, key.second));
+    const bool isUp =
+        state == SituationRunner::State::OPEN || state == SituationRunner::State::OPENING;
+    const bool isToRun = !record.isStopped && record.problem.empty() && !isShadowed(key);
+    if (isUp != isToRun) {
+        run(key, record);
+    }
+}
+
+std::optional<SituationRefusal> SituationSet::save(const Draft& draft) {
+    SituationStore::Content content;
+    for (const auto& [key, record] : draft.records) {
+        if (key.first == API_SOURCE) {
+            content.made.push_back({record.config, record.isStopped});
+        }
+    }
+    content.stoppedFiles.assign(draft.stoppedFiles.begin(), draft.stoppedFiles.end());
+    const std::string problem = m_store.save(content);
+    if (problem.empty()) {
+        return std::nullopt;
+    }
+    return SituationRefusal{SituationRefusal::NOT_SAVED,
+                            "the change cannot be saved and was not made: " + problem};
+}
+
+SituationStatus SituationSet::statusOf(const Key& key, const Record& record) const {
+    SituationStatus status;
+    status.config = record.config;
+    status.source = key.first;
+    // In this order the counts agree although log threads go on counting.
+    status.lastRaised = record.counts->lastRaised();
+    status.raised = record.counts->raised();
+    status.matched = std::max(record.counts->requests.matched(), status.raised);
+    status.offered = std::max(record.counts->requests.judged(), status.matched);
+    status.discarded = status.matched - status.raised;
+    const auto fail = [&](std::string problem) {
+        status.state = SituationStatus::FAILED;
+        status.problem = std::move(problem);
+    };
+    if (isShadowed(key)) {
+        fail("the configuration file has a situation of this name, which runs in its place: "
+             "remove or rename one of them");
+    } else if (!record.problem.empty()) {
+        fail(record.problem);
+    } else if (record.isStopped) {
+        status.state = SituationStatus::STOPPED;
+    } else {
+        switch (m_runner.state(runnerKey(key.first, key.second))) {
+        case SituationRunner::State::REFUSED:
+            fail("the agent's Log Entries table opened no request: start it again");
+            break;
+        case SituationRunner::State::ENDED:
+            fail("the agent has stopped it, since its entry times cannot be counted: start it "
+                 "again");
+            break;
+        case SituationRunner::State::OPENING:
+            status.problem = "is still to be opened: a log waits for room in the queue of events";
+            break;
+        case SituationRunner::State::ABSENT: // the agent is ending
+        case SituationRunner::State::OPEN:
+            break;
+        }
+    }
+    return status;
+}
+
+std::size_t SituationSet::size() const {
+    const std::lock_guard guard(m_mutex);
+    return m_records.size();
 }

@@ -2,36 +2,123 @@
 #define ZRM_HOST_SITUATION_SET_H
 
 #include "host/config/HostConfig.h"
-#include "host/situations/Situation.h"
+#include "host/situations/SituationCounts.h"
+#include "host/situations/SituationRunner.h"
+#include "host/situations/SituationStatus.h"
+#include "host/situations/SituationStore.h"
 
+#include <chrono>
 #include <cstddef>
+#include <functional>
 #include <map>
 #include <memory>
+#include <mutex>
+#include <optional>
+#include <set>
 #include <string>
+#include <utility>
+#include <variant>
 #include <vector>
 
-/// The running situations by name. Used by one thread.
+/// Why the situations were not changed.
+struct SituationRefusal {
+    enum Reason {
+        UNKNOWN,   ///< there is none of this name
+        EXISTS,    ///< the name is taken
+        FROM_FILE, ///< the situation belongs to the configuration file
+        TOO_MANY,
+        NOT_SAVED, ///< the change could not be made to last
+        BUSY,      ///< other changes take too long
+    };
+    Reason reason;
+    std::string detail; ///< what is wrong and what to do about it
+};
+
+/// The situations by name: those of the configuration file and those made through the API. A name
+/// may be in both when the file came to have it later; then the file's runs, and the other one
+/// waits, as failed. Any thread.
+///
+/// A change is saved before it is made. It is in force when the call returns, except that opening
+/// and closing wait for log threads which wait for room in the queue of events: a call waits for
+/// them for `patience` at most. A situation that is stopped or removed raises nothing more either
+/// way.
 class SituationSet {
 public:
-    /// The table's manager and the queue outlive the object.
-    SituationSet(TableManager& entries, EventQueue& queue);
+    static constexpr std::size_t mostMade = 1000; ///< situations made through the API
+    static constexpr std::chrono::seconds patience{5};
+
+    using Change = std::variant<SituationStatus, SituationRefusal>;
+
+    /// The table's manager and the queue outlive the object. An empty path: nothing is kept.
+    SituationSet(TableManager& entries, EventQueue& queue, std::string storePath = "");
     SituationSet(const SituationSet&) = delete;
     SituationSet& operator=(const SituationSet&) = delete;
 
-    /// Makes these the running situations: closes those that are gone, opens the new ones, and
-    /// opens anew those that changed. One that is as it was goes on undisturbed, with the entry
-    /// times that it has counted.
+    /// Takes over what was kept: the situations made through the API, and which are stopped.
+    /// Returns what is to be said about it, if anything. Once, before the first apply.
+    std::string load();
+
+    /// Makes these the situations of the file. One that is as it was goes on undisturbed, with the
+    /// entry times that it has counted; one that has changed begins anew.
     void apply(const std::vector<SituationConfig>& configs);
 
-    /// Closes all of them.
-    void close();
+    /// Those of the file first, each by name.
+    std::vector<SituationStatus> list() const;
+    /// The one of this name that can run.
+    std::optional<SituationStatus> find(const std::string& name) const;
 
-    std::size_t size() const noexcept { return m_situations.size(); }
+    // Changes through the API.
+
+    Change add(const SituationConfig& config);
+    /// Exchanges the one of this name, which begins anew when it is not as it was.
+    Change replace(const SituationConfig& config);
+    std::optional<SituationRefusal> remove(const std::string& name);
+    /// Of either source. Starting one that has failed tries again.
+    Change start(const std::string& name);
+    Change stop(const std::string& name);
+
+    /// Closes all of them for good; waits for log threads as long as they wait.
+    void close() { m_runner.close(); }
+
+    std::size_t size() const;
 
 private:
-    TableManager& m_entries;
-    EventQueue& m_queue;
-    std::map<std::string, std::unique_ptr<Situation>> m_situations;
+    using Key = std::pair<SituationStatus::Source, std::string>;
+    struct Record {
+        SituationConfig config;
+        std::shared_ptr<SituationCounts> counts = std::make_shared<SituationCounts>();
+        bool isStopped = false;
+        std::string problem = {}; ///< why it cannot run; empty: it can
+    };
+    using Records = std::map<Key, Record>;
+    /// The situations as a change wants them.
+    struct Draft {
+        Records records;
+        std::set<std::string> stoppedFiles;
+    };
+    using Changed = std::variant<Key, SituationRefusal>;
+
+    Changed change(const std::function<Changed(Draft&)>& plan);
+    std::optional<SituationRefusal> save(const Draft& draft);
+    Change statusAfter(const Changed& changed) const;
+    Change setStopped(const std::string& name, bool isStopped);
+    static const Records::value_type* named(const Records& records, const std::string& name);
+
+    // With m_mutex held.
+    void publish(const Key& key, const Draft& draft);
+    bool isShadowed(const Key& key) const;
+    void run(const Key& key, const Record& record);
+    void runAgain(const Key& key, const Record& record);
+    SituationStatus statusOf(const Key& key, const Record& record) const;
+
+    std::timed_mutex m_changing; ///< held through a change by the API, saving included
+    SituationStore m_store;      ///< guarded by m_changing
+
+    mutable std::mutex m_mutex; ///< guards what follows; held for moments
+    Records m_records;
+    std::set<std::string> m_stoppedFiles; ///< names of the file's situations that are stopped
+
+    SituationRunner m_runner; ///< guards itself
 };
 
 #endif

@@ -7,6 +7,7 @@
 #include "host/http/ApiToken.h"
 #include "host/http/HealthResource.h"
 #include "host/http/SampleResource.h"
+#include "host/situations/SituationsResource.h"
 #include "host/start/Say.h"
 
 #include <string>
@@ -40,6 +41,9 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
     std::unique_ptr<Serving> serving(
         new Serving(config, entries, *request.get(), RowLayout(*request.get())));
     serving->m_delivery.start();
+    if (const std::string message = serving->m_situations.load(); !message.empty()) {
+        say("%s", message.c_str());
+    }
     serving->m_situations.apply(config.situations);
     countLogs(); // the first sample tells the log manager that requests are served
     return serving;
@@ -47,7 +51,8 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
                  const RowLayout& layout)
-    : m_delivery(config.sinks, layout, request.rowSize), m_situations(entries, m_delivery.queue()),
+    : m_delivery(config.sinks, layout, request.rowSize),
+      m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
     addResources();
 }
@@ -55,6 +60,7 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
 void Serving::addResources() {
     addResource(std::make_unique<HealthResource>());
     addResource(std::make_unique<SampleResource>(m_sampler));
+    addResource(std::make_unique<SituationsResource>(m_situations));
 }
 
 void Serving::addResource(std::unique_ptr<Resource> resource) {

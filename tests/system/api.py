@@ -21,7 +21,7 @@ class Api:
             self.token = stream.read().strip()
 
     def request(self, method, path, body=None, headers=None, content_type="application/json"):
-        """(status, content type, parsed body); a header of None is left out."""
+        """(status, content type, parsed body or None); a header of None is left out."""
         send = {"Authorization": f"Bearer {self.token}", "Content-Type": content_type}
         send.update(headers or {})
         if body is not None and not isinstance(body, (bytes, str)):
@@ -32,7 +32,9 @@ class Api:
                 method, path, body, {name: value for name, value in send.items() if value is not None}
             )
             response = connection.getresponse()
-            return response.status, response.getheader("Content-Type"), json.load(response)
+            text = response.read()
+            answer = json.loads(text) if text else None
+            return response.status, response.getheader("Content-Type"), answer
         finally:
             connection.close()
 

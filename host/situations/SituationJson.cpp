@@ -1,0 +1,47 @@
+#include "host/situations/SituationJson.h"
+
+#include "host/framework/UtcTime.h"
+#include "host/situations/SituationStatus.h"
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr const char* sources[] = {"file", "api"};
+constexpr const char* states[] = {"running", "stopped", "failed"};
+
+Json orNull(const std::optional<std::string>& text) {
+    return text ? Json(*text) : Json();
+}
+
+} // namespace
+
+Json SituationJson::definition(const SituationConfig& situation) {
+    return {{"name", situation.name},
+            {"text", situation.text},
+            {"severity", situation.severity},
+            {"log", orNull(situation.log)},
+            {"when", situation.when},
+            {"frequency", orNull(situation.frequency)},
+            {"period", orNull(situation.period)}};
+}
+
+Json SituationJson::status(const SituationStatus& status) {
+    Json object = definition(status.config);
+    object["source"] = sources[status.source];
+    object["state"] = states[status.state];
+    object["problem"] = status.problem.empty() ? Json() : Json(status.problem);
+    object["counts"] = {{"offered", status.offered},
+                        {"matched", status.matched},
+                        {"discarded", status.discarded},
+                        {"raised", status.raised}};
+    object["last_raised"] =
+        status.lastRaised == 0 ? Json() : Json(UtcTime::text(status.lastRaised));
+    return object;
+}
+
+std::string SituationJson::text(const Json& value) {
+    return value.dump(-1, ' ', false, Json::error_handler_t::replace);
+}

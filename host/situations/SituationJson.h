@@ -1,0 +1,25 @@
+#ifndef ZRM_HOST_SITUATION_JSON_H
+#define ZRM_HOST_SITUATION_JSON_H
+
+#include "host/config/HostConfig.h"
+
+#include <string>
+
+#include <nlohmann/json_fwd.hpp>
+
+struct SituationStatus;
+
+/// Situations as JSON objects. Stateless.
+class SituationJson {
+public:
+    /// The fields of a situation as they were written; null for one that was left out.
+    static nlohmann::ordered_json definition(const SituationConfig& situation);
+
+    /// The same with how the situation stands.
+    static nlohmann::ordered_json status(const SituationStatus& status);
+
+    /// A value as text; bytes that are not UTF-8 are replaced.
+    static std::string text(const nlohmann::ordered_json& value);
+};
+
+#endif

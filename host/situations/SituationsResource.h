@@ -1,0 +1,28 @@
+#ifndef ZRM_HOST_SITUATIONS_RESOURCE_H
+#define ZRM_HOST_SITUATIONS_RESOURCE_H
+
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
+#include "host/http/Resource.h"
+#include "host/situations/SituationSet.h"
+
+/// `/api/v1/situations` and what lies under it: shows the situations and changes them.
+class SituationsResource : public Resource {
+public:
+    /// `situations` outlives the object.
+    explicit SituationsResource(SituationSet& situations) : m_situations(situations) {}
+
+    void addRoutes(Router& router) override;
+
+private:
+    HttpAnswer list() const;
+    HttpAnswer show(const HttpRequest& request) const;
+    HttpAnswer add(const HttpRequest& request);
+    HttpAnswer replace(const HttpRequest& request);
+    HttpAnswer remove(const HttpRequest& request);
+    static HttpAnswer validate(const HttpRequest& request);
+
+    SituationSet& m_situations;
+};
+
+#endif
