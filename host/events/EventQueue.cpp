@@ -3,6 +3,13 @@
 #include <algorithm>
 #include <cstring>
 
+namespace {
+
+/// How long a reader that was woken lets more events gather, unless many have come before.
+constexpr std::chrono::milliseconds gatherTime{5};
+
+} // namespace
+
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize)
     // The rows are left uninitialised: pages that no event has reached cost no memory.
     : m_rowSize(rowSize), m_events(capacity),
@@ -15,6 +22,7 @@ EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize)
 EventQueue::Reader EventQueue::addReader() {
     const std::lock_guard guard(m_mutex);
     m_cursor.push_back(m_next);
+    m_awaited.push_back(nobody);
     return m_cursor.size() - 1;
 }
 
@@ -29,7 +37,9 @@ bool EventQueue::waitForRoom(std::unique_lock<std::mutex>& lock) {
     }
     ++m_waits;
     const Clock::time_point begin = Clock::now();
+    ++m_pushesWaiting;
     const bool hasRoom = waitWhileFull(lock);
+    --m_pushesWaiting;
     m_waited += Clock::now() - begin;
     return hasRoom;
 }
@@ -49,6 +59,7 @@ bool EventQueue::waitWhileFull(std::unique_lock<std::mutex>& lock) {
 
 bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row) {
     using std::chrono::system_clock;
+    bool isAwaited = false;
     {
         std::unique_lock lock(m_mutex);
         if (!waitForRoom(lock)) {
@@ -63,14 +74,30 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
         event.situation = situation;
         std::memcpy(m_rows.get() + slot * m_rowSize, row, m_rowSize);
         ++m_next;
+        isAwaited = std::any_of(m_awaited.begin(), m_awaited.end(),
+                                [this](std::uint64_t awaited) { return m_next >= awaited; });
     }
-    m_changed.notify_all();
+    if (isAwaited) {
+        m_changed.notify_all();
+    }
     return true;
+}
+
+void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader) {
+    if (m_closed || m_cursor[reader] != m_next) {
+        return;
+    }
+    m_awaited[reader] = m_cursor[reader] + 1;
+    m_changed.wait(lock, [&] { return m_closed || m_next >= m_awaited[reader]; });
+    // Waking a thread costs more than an event does, so one wake-up is to serve many.
+    m_awaited[reader] = m_cursor[reader] + quarter();
+    m_changed.wait_for(lock, gatherTime, [&] { return m_closed || m_next >= m_awaited[reader]; });
+    m_awaited[reader] = nobody;
 }
 
 std::span<const Event> EventQueue::read(Reader reader, std::size_t most) {
     std::unique_lock lock(m_mutex);
-    m_changed.wait(lock, [&] { return m_closed || m_cursor[reader] != m_next; });
+    waitForEvents(lock, reader);
     const std::size_t first = m_cursor[reader] % m_events.size();
     const auto waiting = static_cast<std::size_t>(m_next - m_cursor[reader]);
     // A run ends at the ring's end, so that it is one span.
@@ -82,6 +109,10 @@ void EventQueue::release(Reader reader, std::size_t count) {
     {
         const std::lock_guard guard(m_mutex);
         m_cursor[reader] += count;
+        // A thread that waits for room is woken when there is room for many.
+        if (m_pushesWaiting == 0 || m_next - slowest() > m_events.size() - quarter()) {
+            return;
+        }
     }
     m_roomMade.notify_all();
 }

@@ -250,4 +250,49 @@ TEST(EventQueue, ManyThreadsKeepTheOrderOfEach) {
     }
 }
 
+TEST(EventQueue, WakesAThreadThatWaitsForRoomWhenAQuarterIsFree) {
+    EventQueue queue(8, rowSize);
+    const EventQueue::Reader reader = queue.addReader();
+    for (int number = 0; number < 8; ++number) {
+        push(queue, std::to_string(number));
+    }
+    auto ninth = std::async(std::launch::async, [&] { return push(queue, "8"); });
+    while (queue.state().waits == 0) {
+        std::this_thread::yield();
+    }
+    queue.read(reader, 1);
+    queue.release(reader, 1);
+    EXPECT_EQ(ninth.wait_for(20ms), std::future_status::timeout);
+    queue.read(reader, 1);
+    queue.release(reader, 1);
+    EXPECT_TRUE(ninth.get());
+    EXPECT_EQ(queue.backlog(reader), 7u);
+}
+
+TEST(EventQueue, LetsEventsGatherForAReaderThatItWakes) {
+    EventQueue queue(400, rowSize);
+    const EventQueue::Reader reader = queue.addReader();
+    // A hundred events, a quarter of the room, end the gathering; the first alone does not. A
+    // machine that is busy elsewhere may let the time of gathering pass, but not every time.
+    bool gathered = false;
+    for (int attempt = 0; attempt < 50 && !gathered; ++attempt) {
+        auto woken = std::async(std::launch::async, [&] { return queue.read(reader, 400).size(); });
+        std::this_thread::sleep_for(2ms);
+        for (int number = 0; number < 100; ++number) {
+            push(queue, std::to_string(number));
+        }
+        gathered = woken.get() >= 100;
+        queue.release(reader, 100);
+    }
+    EXPECT_TRUE(gathered);
+}
+
+TEST(EventQueue, GivesASingleEventSoon) {
+    EventQueue queue(400, rowSize);
+    const EventQueue::Reader reader = queue.addReader();
+    auto woken = std::async(std::launch::async, [&] { return queue.read(reader, 400).size(); });
+    push(queue, "alone");
+    EXPECT_EQ(woken.get(), 1u);
+}
+
 } // namespace
