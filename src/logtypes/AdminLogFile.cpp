@@ -133,13 +133,13 @@ long AdminLogFile::readLog() {
 }
 
 void AdminLogFile::deliverRecord(char* record) {
-    ++NumEvents;
-    zrm_rmlogent_data_t row;
-    if (formatEntryAsRow(record, &row, nullptr) == 0) {
-        zrm_rmlogent_manager::EventArrived(&row, 1);
-        writeToDebugLog(record, recordLength, &row, sizeof row);
+    count(NumEvents);
+    zrm_rmlogent_data_t* const row = ownRow();
+    if (formatEntryAsRow(record, row, nullptr) == 0) {
+        zrm_rmlogent_manager::EventArrived(row, 1);
+        writeToDebugLog(record, recordLength, row, sizeof *row);
     } else {
-        ++NumFormatErrors;
+        count(NumFormatErrors);
         writeToDebugLog(record, recordLength, nullptr, 0);
     }
 }

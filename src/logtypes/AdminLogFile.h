@@ -1,6 +1,7 @@
 #ifndef ZRM_ADMIN_LOG_FILE_H
 #define ZRM_ADMIN_LOG_FILE_H
 
+#include "logtypes/QuarterHour.h"
 #include "monitor/LogFile.h"
 
 #include <cstddef>
@@ -53,6 +54,8 @@ private:
     void deliverRecord(char* record);
     bool allocateReportBuffers(_LogBufferInfo** reportState);
     static void deallocateReportBuffers(_LogBufferInfo** reportState);
+
+    QuarterHour m_quarterHour; ///< the thread's
 };
 
 static_assert(sizeof(AdminLogFile::utmp) == AdminLogFile::recordLength);

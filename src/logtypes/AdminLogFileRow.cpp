@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "agent/framework/locale.h"
 #include "monitor/BrevanTime.h"
+#include "monitor/RowBytes.h"
 #include "monitor/UTF8Conv.h"
 #include "tables/zrm_rmlogent_data.h"
 
@@ -29,14 +30,15 @@ template <std::size_t size> std::string_view fieldText(const char (&field)[size]
 }
 
 /// Builds a description without the cost of a format string. The buffer holds the longest one: two
-/// short names, three numbers of up to six characters, and the words between them.
+/// short names, three numbers of up to six characters, and the words between them. What is appended
+/// has a length that the compiler knows, so that it is copied in place.
 class Description {
 public:
     explicit Description(const AdminLogFile::utmp& record) {
         append("user = ");
-        append(fieldText(record.ut_user));
+        append(record.ut_user, fieldText(record.ut_user).size());
         append("; id = ");
-        append(fieldText(record.ut_id));
+        append(record.ut_id, fieldText(record.ut_id).size());
         append("; pid = ");
         append(record.ut_pid);
         append("; term status = ");
@@ -44,17 +46,25 @@ public:
         append("; exit status = ");
         append(record.e_exit);
     }
-    const char* text() const { return m_text; }
-    std::size_t length() const { return m_length; }
+    /// Writes at most `room` bytes, without a terminator.
+    void write(char* dest, std::size_t room, bool toUTF8) const {
+        if (toUTF8) {
+            UTF8Conv::Convert_toUTF8(dest, room, m_text, m_length, LOC2_NO_TERMINATOR);
+        } else {
+            RowBytes::copy(dest, m_text, std::min(room, m_length));
+        }
+    }
 
 private:
-    void append(std::string_view text) {
-        std::memcpy(m_text + m_length, text.data(), text.size());
-        m_length += text.size();
+    /// Copies all of the field; its first `length` characters count.
+    template <std::size_t size> void append(const char (&field)[size], std::size_t length) {
+        std::memcpy(m_text + m_length, field, size);
+        m_length += length;
     }
+    template <std::size_t size> void append(const char (&words)[size]) { append(words, size - 1); }
     void append(std::int16_t number) {
-        char digits[6];
-        append({digits, std::to_chars(digits, digits + sizeof digits, number).ptr});
+        char* const place = m_text + m_length;
+        m_length += static_cast<std::size_t>(std::to_chars(place, place + 6, number).ptr - place);
     }
 
     char m_text[100];
@@ -68,17 +78,21 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
     utmp entry;
     std::memcpy(&entry, record, sizeof entry);
     auto& columns = *static_cast<zrm_rmlogent_data_t*>(row);
-    std::memset(&columns, ' ', sizeof columns);
+    prepareRow(&columns);
 
-    BrevanTime::generateTimestamp(entry.ut_time, columns.entrytime);
+    if (row == ownRow()) {
+        m_quarterHour.generateTimestamp(entry.ut_time, columns.entrytime);
+    } else {
+        BrevanTime::generateTimestamp(entry.ut_time, columns.entrytime);
+    }
     const std::string_view line = fieldText(entry.ut_line);
     std::memcpy(columns.entrysrc, line.data(), line.size());
     UTF8Conv::Convert_toUTF8(columns.uentrysrc, sizeof columns.uentrysrc, line.data(), line.size(),
                              LOC2_NO_TERMINATOR);
     fillEntryType(columns.entrytype, sizeof columns.entrytype, entry.ut_type);
-    formatEntryDesc(columns.entrydesc, sizeof columns.entrydesc, &entry, 0);
-    formatEntryDesc(columns.uentrydesc, sizeof columns.uentrydesc, &entry, 1);
-    fillCommonColumns(&columns);
+    const Description description(entry);
+    description.write(columns.entrydesc, sizeof columns.entrydesc, false);
+    description.write(columns.uentrydesc, sizeof columns.uentrydesc, true);
     return trace.result(0L);
 }
 
@@ -91,11 +105,5 @@ void AdminLogFile::fillEntryType(char* dest, unsigned long room, int type) {
 
 void AdminLogFile::formatEntryDesc(char* dest, unsigned long room, const utmp* record, int toUTF8) {
     TraceScope trace(anchor);
-    const Description description(*record);
-    if (toUTF8 == 0) {
-        std::memcpy(dest, description.text(), std::min(room, description.length()));
-    } else {
-        UTF8Conv::Convert_toUTF8(dest, room, description.text(), description.length(),
-                                 LOC2_NO_TERMINATOR);
-    }
+    Description(*record).write(dest, room, toUTF8 != 0);
 }

@@ -7,8 +7,7 @@
 ///
 /// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
 /// the blocked signals, and locks that nobody will release. So whatever a child needs is prepared
-/// before the fork, and between fork and exec a child makes only calls that are safe in a signal
-/// handler.
+/// before the fork, and between fork and exec a child makes no call that takes a lock or memory.
 namespace ChildProcess {
 
 /// Makes a pipe whose ends close on exec. As pipe(): 0, or -1 and errno. Any thread.

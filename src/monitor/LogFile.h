@@ -75,10 +75,14 @@ protected:
     void openLogAndSeek();
     void closeLog();
     void waitForEventLoop(timeval interval);
+    /// Counts one more; the log's thread alone.
+    static void count(std::atomic<std::int64_t>& counter) noexcept;
     /// Fills the columns that all kinds of logs share, in a row that is blank there.
     void fillCommonColumns(zrm_rmlogent_data_t* row) const;
-    /// Makes `row` blank but for the common columns. The log's own row, the one that readLog
-    /// offers, has kept its common columns from the line before and costs less.
+    /// The row in which the log's thread offers its entries.
+    zrm_rmlogent_data_t* ownRow() noexcept { return &m_row; }
+    /// Makes `row` blank but for the common columns. The log's own row has kept its common columns
+    /// from the line before and costs less.
     void prepareRow(zrm_rmlogent_data_t* row);
     /// Puts the common columns into a prepared row again, over a field that has run into them.
     void repairRow(zrm_rmlogent_data_t* row);

@@ -17,12 +17,12 @@ namespace {
 
 TRC1_Anchor anchor{"LogFileTail.cpp"};
 
+} // namespace
+
 /// Counts without a locked instruction: only the log's thread writes the counter.
-void count(std::atomic<std::int64_t>& counter) {
+void LogFile::count(std::atomic<std::int64_t>& counter) noexcept {
     counter.store(counter.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
 }
-
-} // namespace
 
 void LogFile::openLogAndSeek() {
     TraceScope trace(anchor);
