@@ -99,8 +99,11 @@ bool isHeaderName(std::string_view name) {
            });
 }
 
+/// True for what may be the name of a label that an operator adds to those that an alert has.
 bool isLabelName(std::string_view name) {
-    return !name.empty() && !isDigit(name.front()) && !name.starts_with("__") &&
+    constexpr std::array<std::string_view, 4> own = {"alertname", "severity", "log", "node"};
+    return !name.empty() && std::find(own.begin(), own.end(), name) == own.end() &&
+           !isDigit(name.front()) && !name.starts_with("__") &&
            std::all_of(name.begin(), name.end(),
                        [](char c) { return isLetter(c) || isDigit(c) || c == '_'; });
 }
@@ -120,8 +123,9 @@ struct TableKind {
 constexpr std::array tableKinds = {
     TableKind{SinkOption::HEADERS, isHeaderName, "is no name of a header that can be set",
               "use letters, digits and dashes; what describes the body is set already"},
-    TableKind{SinkOption::LABELS, isLabelName, "is no name of a label",
-              "use letters, digits and underscores, a letter first"},
+    TableKind{SinkOption::LABELS, isLabelName, "is no name of a label that can be added",
+              "use letters, digits and underscores, a letter first; alertname, severity, log and "
+              "node are set already"},
     TableKind{SinkOption::ATTRIBUTES, isAttributeName, "is no name of an attribute",
               "write at least one character and no control characters"},
 };

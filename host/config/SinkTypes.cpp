@@ -1,5 +1,7 @@
 #include "host/config/SinkTypes.h"
 
+#include "host/config/SyslogFacilities.h"
+
 #include <algorithm>
 #include <array>
 
@@ -7,7 +9,8 @@ namespace {
 
 using Option = SinkOption;
 
-constexpr std::array<std::string_view, 2> typeNames = {"jsonl", "webhook"};
+constexpr std::array<std::string_view, 5> typeNames = {"jsonl", "webhook", "alertmanager", "syslog",
+                                                       "otlp"};
 
 constexpr std::array commonOptions = {
     Option{.name = "type",
@@ -77,6 +80,85 @@ constexpr std::array webhookOptions = {
     caFileOption,
 };
 
+constexpr std::array alertmanagerOptions = {
+    Option{.name = "url",
+           .kind = Option::URL,
+           .need = Option::REQUIRED,
+           .value = "http://127.0.0.1:9093",
+           .meaning = "the Alertmanager's own URL; `/api/v2/alerts` is added"},
+    Option{.name = "resolve_after",
+           .kind = Option::DURATION,
+           .need = Option::OPTIONAL,
+           .value = "5m",
+           .meaning = "how long after its event an alert ends",
+           .least = 1,
+           .most = 31'536'000},
+    Option{.name = "labels",
+           .kind = Option::LABELS,
+           .need = Option::OPTIONAL,
+           .value = "",
+           .meaning = "labels that are added to each alert"},
+    Option{.name = "generator_url",
+           .kind = Option::URL,
+           .need = Option::OPTIONAL,
+           .value = "",
+           .meaning = "the link from an alert to where it comes from"},
+    timeoutOption,
+    headersOption,
+    caFileOption,
+};
+
+constexpr std::array<std::string_view, 2> transports = {"tcp", "udp"};
+
+constexpr std::array syslogOptions = {
+    Option{.name = "address",
+           .kind = Option::ADDRESS,
+           .need = Option::REQUIRED,
+           .value = "logs.example.com:514",
+           .meaning = "host and port of the receiver"},
+    Option{.name = "transport",
+           .kind = Option::CHOICE,
+           .need = Option::OPTIONAL,
+           .value = "tcp",
+           .meaning = "frames that tell their length over TCP, or datagrams over UDP",
+           .choices = transports},
+    Option{.name = "facility",
+           .kind = Option::CHOICE,
+           .need = Option::OPTIONAL,
+           .value = "daemon",
+           .meaning = "the facility of the messages",
+           .choices = syslogFacilities},
+    Option{.name = "timeout",
+           .kind = Option::DURATION,
+           .need = Option::OPTIONAL,
+           .value = "10s",
+           .meaning = "how long the receiver may keep a connection or a write waiting",
+           .least = 1,
+           .most = 300},
+};
+
+constexpr std::array otlpOptions = {
+    Option{.name = "url",
+           .kind = Option::URL,
+           .need = Option::REQUIRED,
+           .value = "http://127.0.0.1:4318",
+           .meaning = "the receiver's own URL; `/v1/logs` is added"},
+    Option{.name = "service_name",
+           .kind = Option::TEXT,
+           .need = Option::OPTIONAL,
+           .value = "zrmagent",
+           .meaning = "the resource attribute `service.name`",
+           .most = 255},
+    Option{.name = "attributes",
+           .kind = Option::ATTRIBUTES,
+           .need = Option::OPTIONAL,
+           .value = "",
+           .meaning = "resource attributes that are added"},
+    timeoutOption,
+    headersOption,
+    caFileOption,
+};
+
 constexpr std::array jsonlOptions = {
     Option{.name = "path",
            .kind = Option::OUTPUT,
@@ -88,6 +170,9 @@ constexpr std::array jsonlOptions = {
 constexpr std::array<SinkType, typeNames.size()> types = {{
     {"jsonl", "one JSON object per event, one event per line", "path", jsonlOptions},
     {"webhook", "JSON in batches to a URL, by HTTP POST", "url", webhookOptions},
+    {"alertmanager", "an alert for each event, to an Alertmanager", "url", alertmanagerOptions},
+    {"syslog", "syslog messages (RFC 5424) over TCP or UDP", "address", syslogOptions},
+    {"otlp", "log records of OpenTelemetry over HTTP, in JSON", "url", otlpOptions},
 }};
 
 } // namespace

@@ -1,6 +1,9 @@
 #include "host/sinks/SinkFactory.h"
 
+#include "host/sinks/AlertmanagerSink.h"
 #include "host/sinks/JsonlSink.h"
+#include "host/sinks/OtlpSink.h"
+#include "host/sinks/SyslogSink.h"
 #include "host/sinks/WebhookSink.h"
 
 #include <algorithm>
@@ -21,6 +24,9 @@ template <typename Type> std::unique_ptr<Sink> made(const SinkConfig& config) {
 constexpr std::array makers = {
     Maker{"jsonl", made<JsonlSink>},
     Maker{"webhook", made<WebhookSink>},
+    Maker{"alertmanager", made<AlertmanagerSink>},
+    Maker{"syslog", made<SyslogSink>},
+    Maker{"otlp", made<OtlpSink>},
 };
 
 } // namespace

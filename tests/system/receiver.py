@@ -1,10 +1,18 @@
 """An HTTP server that takes what sinks send."""
 
 import json
+import socket
 import ssl
 import threading
 import time
 from http.server import BaseHTTPRequestHandler, ThreadingHTTPServer
+
+
+def free_port():
+    """A port of this machine on which nobody listens; for programs that cannot choose one."""
+    with socket.socket() as probe:
+        probe.bind(("127.0.0.1", 0))
+        return probe.getsockname()[1]
 
 
 class Request:

@@ -9,13 +9,7 @@ import time
 import pytest
 
 from conftest import PATIENCE, descriptions, syslog_line, wait_until
-from receiver import Receiver, slowly
-
-
-def free_port():
-    with socket.socket() as probe:
-        probe.bind(("127.0.0.1", 0))
-        return probe.getsockname()[1]
+from receiver import Receiver, free_port, slowly
 
 
 def wait_for(receiver, count, agent):

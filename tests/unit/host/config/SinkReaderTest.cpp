@@ -62,7 +62,8 @@ type = "jsonl"
 type = 5
 )"),
         ElementsAre("zrm.toml:1: sink.type: is missing; write type = \"jsonl\"",
-                    "zrm.toml:3: sink.type: 'kafka' is none of the choices; write jsonl or webhook",
+                    "zrm.toml:3: sink.type: 'kafka' is none of the choices; write jsonl, webhook, "
+                    "alertmanager, syslog or otlp",
                     "zrm.toml:5: sink.path: is missing; write path = "
                     "\"/var/log/zrm/events.jsonl\"",
                     "zrm.toml:8: sink.type: is a whole number; write a text in quotes"));
@@ -203,6 +204,105 @@ TEST(SinkReader, TwoSinksAtOneHostNeedNames) {
                                           "'webhook web1:80' too; give each sink a name of its "
                                           "own"));
     EXPECT_EQ(accepted(two + "name = 'b'\n").size(), 2u);
+}
+
+TEST(SinkReader, ReadsTheOptionsOfTheOtherTypes) {
+    const auto sinks = accepted(R"(
+[[sink]]
+type = "alertmanager"
+url = "http://web1:9093"
+[[sink]]
+type = "alertmanager"
+url = "https://web2/alerts"
+resolve_after = "1h"
+generator_url = "https://web1/console"
+labels = { team = "ops" }
+[[sink]]
+type = "syslog"
+address = "[::1]:514"
+[[sink]]
+type = "syslog"
+address = "web1:601"
+transport = "udp"
+facility = "authpriv"
+timeout = "3s"
+[[sink]]
+type = "otlp"
+url = "http://web1:4318"
+[[sink]]
+type = "otlp"
+url = "http://web2:4318"
+service_name = "logs"
+[sink.attributes]
+"deployment.environment" = "test"
+)");
+    ASSERT_EQ(sinks.size(), 6u);
+    EXPECT_EQ(sinks[0].name, "alertmanager web1:9093");
+    EXPECT_EQ(sinks[0].duration("resolve_after"), std::chrono::minutes(5));
+    EXPECT_EQ(sinks[1].duration("resolve_after"), std::chrono::hours(1));
+    EXPECT_EQ(sinks[1].text("generator_url"), "https://web1/console");
+    EXPECT_EQ(sinks[1].texts("labels"), (SinkConfig::Texts{{"team", "ops"}}));
+    EXPECT_EQ(sinks[2].name, "syslog [::1]:514");
+    EXPECT_EQ(sinks[2].text("transport"), "tcp");
+    EXPECT_EQ(sinks[2].text("facility"), "daemon");
+    EXPECT_EQ(sinks[2].duration("timeout"), std::chrono::seconds(10));
+    EXPECT_EQ(sinks[3].text("transport"), "udp");
+    EXPECT_EQ(sinks[3].text("facility"), "authpriv");
+    EXPECT_EQ(sinks[4].name, "otlp web1:4318");
+    EXPECT_EQ(sinks[4].text("service_name"), "zrmagent");
+    EXPECT_EQ(sinks[5].text("service_name"), "logs");
+    EXPECT_EQ(sinks[5].texts("attributes"),
+              (SinkConfig::Texts{{"deployment.environment", "test"}}));
+}
+
+TEST(SinkReader, RefusesUnusableOptionsOfTheOtherTypes) {
+    const std::string label = "is no name of a label that can be added; use letters, digits and "
+                              "underscores, a letter first; alertname, severity, log and node are "
+                              "set already";
+    EXPECT_THAT(
+        refused(R"([[sink]]
+type = "alertmanager"
+url = "web1:9093"
+resolve_after = "0s"
+generator_url = "console"
+labels = { 1a = "x", "a-b" = "x", __a = "x", node = "x", "" = "x" }
+[[sink]]
+type = "syslog"
+address = "web1"
+transport = "tls"
+facility = "local8"
+[[sink]]
+type = "syslog"
+address = "web1:0"
+[[sink]]
+type = "otlp"
+service_name = ""
+attributes = { "" = "x", a = 5 }
+)"),
+        ElementsAre(
+            "zrm.toml:3: sink.url: 'web1:9093' is no URL to send events to; write http:// or "
+            "https://, a host, and a port and a path where they are needed",
+            "zrm.toml:4: sink.resolve_after: '0s' is no usable length of time; write a number and "
+            "s, m, h or d, from 1s to 31536000s",
+            "zrm.toml:5: sink.generator_url: 'console' is no URL to send events to; write http:// "
+            "or https://, a host, and a port and a path where they are needed",
+            "zrm.toml:6: sink.labels.: " + label, "zrm.toml:6: sink.labels.1a: " + label,
+            "zrm.toml:6: sink.labels.__a: " + label, "zrm.toml:6: sink.labels.a-b: " + label,
+            "zrm.toml:6: sink.labels.node: " + label,
+            "zrm.toml:9: sink.address: 'web1' is no address to send events to; write HOST:PORT, "
+            "an IPv6 address in brackets",
+            "zrm.toml:10: sink.transport: 'tls' is none of the choices; write tcp or udp",
+            "zrm.toml:11: sink.facility: 'local8' is none of the choices; write kern, user, mail, "
+            "daemon, auth, syslog, lpr, news, uucp, cron, authpriv, ftp, ntp, audit, alert, clock, "
+            "local0, local1, local2, local3, local4, local5, local6 or local7",
+            "zrm.toml:14: sink.address: 'web1:0' is no address to send events to; write "
+            "HOST:PORT, an IPv6 address in brackets",
+            "zrm.toml:15: sink.url: is missing; write url = \"http://127.0.0.1:4318\"",
+            "zrm.toml:17: sink.service_name: is no usable text; write 1 to 255 bytes without "
+            "control characters",
+            "zrm.toml:18: sink.attributes.: is no name of an attribute; write at least one "
+            "character and no control characters",
+            "zrm.toml:18: sink.attributes.a: is a whole number; write a text in quotes"));
 }
 
 } // namespace

@@ -1,0 +1,54 @@
+#include "host/sinks/AlertmanagerSink.h"
+
+#include "agent/TraceScope.h"
+#include "host/framework/UtcTime.h"
+#include "host/sinks/EventRow.h"
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+TRC1_Anchor anchor{"AlertmanagerSink.cpp"};
+
+using Json = nlohmann::ordered_json;
+
+Json annotationsOf(const EventRecord& event, const EventRow& row) {
+    return {{"summary", std::string(event.situation) + " in " + std::string(event.log)},
+            {"description", row.description()},
+            {"source", row.source()},
+            {"event", std::to_string(event.id)}};
+}
+
+} // namespace
+
+AlertmanagerSink::AlertmanagerSink(const SinkConfig& config)
+    : m_name(config.name), m_resolveAfter(config.duration("resolve_after")),
+      m_labels(config.texts("labels")), m_generatorUrl(config.text("generator_url")),
+      m_http(config, "/api/v2/alerts") {}
+
+std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const {
+    Json alerts = Json::array();
+    for (const EventRecord& event : events) {
+        const EventRow row(event);
+        Json labels = {{"alertname", event.situation},
+                       {"severity", event.severity},
+                       {"log", event.log},
+                       {"node", row.node()}};
+        labels.update(m_labels);
+        Json alert = {{"labels", std::move(labels)},
+                      {"annotations", annotationsOf(event, row)},
+                      {"startsAt", UtcTime::text(event.raised)},
+                      {"endsAt", UtcTime::text(event.raised + m_resolveAfter.count())}};
+        if (!m_generatorUrl.empty()) {
+            alert["generatorURL"] = m_generatorUrl;
+        }
+        alerts.push_back(std::move(alert));
+    }
+    return alerts.dump(-1, ' ', false, Json::error_handler_t::replace);
+}
+
+std::size_t AlertmanagerSink::deliver(std::span<const EventRecord> events,
+                                      const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    return trace.result(m_http.send(bodyOf(events), {}, giveUp) ? events.size() : 0);
+}

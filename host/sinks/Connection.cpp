@@ -1,0 +1,150 @@
+#include "host/sinks/Connection.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <memory>
+#include <utility>
+
+#include <fcntl.h>
+#include <netdb.h>
+#include <poll.h>
+#include <sys/ioctl.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"Connection.cpp"};
+
+using Clock = std::chrono::steady_clock;
+
+constexpr int pollSlice = 100; ///< milliseconds
+
+} // namespace
+
+Connection::Connection(ListenAddress receiver, Transport transport,
+                       std::chrono::milliseconds timeout)
+    : m_receiver(std::move(receiver)), m_transport(transport), m_timeout(timeout) {}
+
+Connection::~Connection() {
+    close();
+}
+
+void Connection::close() {
+    if (m_socket != -1) {
+        ::close(m_socket);
+        m_socket = -1;
+    }
+}
+
+bool Connection::fail(const char* call, int number) {
+    const ErrorText error(number);
+    m_error = std::string(call) + " failed: " + error.text() + " (" + m_receiver.text() + ')';
+    return false;
+}
+
+bool Connection::wait(short events, const std::stop_token& giveUp) {
+    const Clock::time_point end = Clock::now() + m_timeout;
+    while (!giveUp.stop_requested()) {
+        struct pollfd descriptor = {m_socket, events, 0};
+        const auto left =
+            std::chrono::duration_cast<std::chrono::milliseconds>(end - Clock::now()).count();
+        const int ready =
+            poll(&descriptor, 1, static_cast<int>(std::clamp<long>(left, 0, pollSlice)));
+        if (ready > 0) {
+            return true; // whatever poll reports, the next call says it with its error number
+        }
+        if (ready == -1 && errno != EINTR) {
+            return fail("poll", errno);
+        }
+        if (left <= 0) {
+            m_error = m_receiver.text() + " takes nothing";
+            return false;
+        }
+    }
+    m_error = "the agent is ending (" + m_receiver.text() + ')';
+    return false;
+}
+
+bool Connection::connect(const addrinfo& address, const std::stop_token& giveUp) {
+    m_socket = socket(address.ai_family, address.ai_socktype | SOCK_CLOEXEC | SOCK_NONBLOCK,
+                      address.ai_protocol);
+    if (m_socket == -1) {
+        return fail("socket", errno);
+    }
+    if (::connect(m_socket, address.ai_addr, address.ai_addrlen) == 0) {
+        return true;
+    }
+    if (errno != EINPROGRESS) {
+        return fail("connect", errno);
+    }
+    int number = 0;
+    socklen_t size = sizeof number;
+    if (!wait(POLLOUT, giveUp)) {
+        return false;
+    }
+    getsockopt(m_socket, SOL_SOCKET, SO_ERROR, &number, &size);
+    return number == 0 || fail("connect", number);
+}
+
+bool Connection::open(const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    if (isOpen()) {
+        return trace.result(true);
+    }
+    addrinfo wanted{};
+    wanted.ai_socktype = m_transport == TCP ? SOCK_STREAM : SOCK_DGRAM;
+    addrinfo* list = nullptr;
+    const int unknown = getaddrinfo(m_receiver.host.c_str(),
+                                    std::to_string(m_receiver.port).c_str(), &wanted, &list);
+    if (unknown != 0) {
+        m_error = m_receiver.text() + " is not known: " + gai_strerror(unknown);
+        return trace.result(false);
+    }
+    const std::unique_ptr<addrinfo, void (*)(addrinfo*)> addresses(list, &freeaddrinfo);
+    for (const addrinfo* address = list; address != nullptr; address = address->ai_next) {
+        if (connect(*address, giveUp)) {
+            return trace.result(true);
+        }
+        close();
+    }
+    return trace.result(false);
+}
+
+void Connection::closeIfBroken() {
+    char byte;
+    while (isOpen() && m_transport == TCP) {
+        const ssize_t count = recv(m_socket, &byte, 1, MSG_DONTWAIT);
+        if (count == 0 || (count == -1 && errno != EAGAIN && errno != EINTR)) {
+            close();
+        } else if (count == -1) {
+            return; // nothing to read: the connection stands
+        }
+    }
+}
+
+bool Connection::send(std::string_view bytes, const std::stop_token& giveUp) {
+    while (!bytes.empty()) {
+        const ssize_t count = ::send(m_socket, bytes.data(), bytes.size(), MSG_NOSIGNAL);
+        if (count >= 0) {
+            bytes.remove_prefix(static_cast<std::size_t>(count));
+        } else if (errno != EINTR &&
+                   (errno == EAGAIN ? !wait(POLLOUT, giveUp) : !fail("send", errno))) {
+            if (m_transport == TCP) {
+                close(); // a message may have gone out in part
+            }
+            return false;
+        }
+    }
+    return true;
+}
+
+std::size_t Connection::unacknowledged() const {
+    int count = 0;
+    return isOpen() && ioctl(m_socket, TIOCOUTQ, &count) == 0 && count > 0
+               ? static_cast<std::size_t>(count)
+               : 0;
+}

@@ -1,0 +1,55 @@
+#ifndef ZRM_HOST_CONNECTION_H
+#define ZRM_HOST_CONNECTION_H
+
+#include "host/http/ListenAddress.h"
+
+#include <chrono>
+#include <cstddef>
+#include <stop_token>
+#include <string>
+#include <string_view>
+
+/// A connection to a receiver that answers nothing, over TCP or UDP. Every wait ends when its time
+/// is over or when giving up is requested; looking a name up takes as long as the system takes.
+/// Used by one thread.
+class Connection {
+public:
+    enum Transport { TCP, UDP };
+
+    /// Not open yet. `timeout` is for each wait.
+    Connection(ListenAddress receiver, Transport transport, std::chrono::milliseconds timeout);
+    ~Connection();
+    Connection(const Connection&) = delete;
+    Connection& operator=(const Connection&) = delete;
+
+    /// Opens the connection when it is closed. False when it could not be opened.
+    bool open(const std::stop_token& giveUp);
+    bool isOpen() const noexcept { return m_socket != -1; }
+
+    /// Closes the connection when the other side has closed it or it has failed meanwhile.
+    void closeIfBroken();
+
+    /// Sends all bytes, over UDP as one message. After a failure a TCP connection is closed.
+    bool send(std::string_view bytes, const std::stop_token& giveUp);
+
+    /// How many of the bytes that were sent the receiver's system has not acknowledged; 0 where
+    /// that is unknown.
+    std::size_t unacknowledged() const;
+
+    /// Why the last operation failed.
+    const std::string& error() const noexcept { return m_error; }
+
+private:
+    bool connect(const struct addrinfo& address, const std::stop_token& giveUp);
+    bool wait(short events, const std::stop_token& giveUp);
+    bool fail(const char* call, int number);
+    void close();
+
+    const ListenAddress m_receiver;
+    const Transport m_transport;
+    const std::chrono::milliseconds m_timeout;
+    int m_socket = -1;
+    std::string m_error;
+};
+
+#endif

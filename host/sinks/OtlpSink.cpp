@@ -1,0 +1,113 @@
+#include "host/sinks/OtlpSink.h"
+
+#include "agent/TraceScope.h"
+#include "host/sinks/EventRow.h"
+#include "host/sinks/SeverityCodes.h"
+
+#include <cstdint>
+#include <string_view>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+TRC1_Anchor anchor{"OtlpSink.cpp"};
+
+using Json = nlohmann::ordered_json;
+
+/// In the JSON encoding 64-bit integers are texts.
+Json attribute(std::string_view key, std::int64_t value) {
+    return {{"key", key}, {"value", {{"intValue", std::to_string(value)}}}};
+}
+
+Json attribute(std::string_view key, std::string_view value) {
+    return {{"key", key}, {"value", {{"stringValue", value}}}};
+}
+
+Json attributesOf(const EventRecord& event, const EventRow& row) {
+    Json attributes = Json::array();
+    attributes.push_back(attribute("zrm.id", static_cast<std::int64_t>(event.id)));
+    attributes.push_back(attribute("zrm.situation", event.situation));
+    attributes.push_back(attribute("log.file.path", event.log));
+    for (const EventRow::Column& column : row.columns()) {
+        const std::string key = "zrm.column." + column.name;
+        if (const auto* const number = std::get_if<std::int64_t>(&column.value)) {
+            attributes.push_back(attribute(key, *number));
+        } else if (const auto& text = std::get<std::string>(column.value); !text.empty()) {
+            attributes.push_back(attribute(key, text));
+        }
+    }
+    return attributes;
+}
+
+Json recordOf(const EventRecord& event, const EventRow& row) {
+    const std::string nanoseconds = std::to_string(event.raised) + "000000";
+    return {{"timeUnixNano", nanoseconds},
+            {"observedTimeUnixNano", nanoseconds},
+            {"severityNumber", SeverityCodes::of(event.severity).otel},
+            {"severityText", event.severity},
+            {"body", {{"stringValue", row.description()}}},
+            {"attributes", attributesOf(event, row)}};
+}
+
+/// A 64-bit integer in the JSON encoding, where it may be a text or a number.
+std::string integerText(const Json& value) {
+    return value.is_string() ? value.get<std::string>() : value.dump();
+}
+
+} // namespace
+
+OtlpSink::OtlpSink(const SinkConfig& config)
+    : m_name(config.name), m_serviceName(config.text("service_name")),
+      m_attributes(config.texts("attributes")), m_http(config, "/v1/logs") {}
+
+std::string OtlpSink::bodyOf(std::span<const EventRecord> events) const {
+    Json resource = Json::array({attribute("service.name", m_serviceName)});
+    Json records = Json::array();
+    for (const EventRecord& event : events) {
+        const EventRow row(event);
+        if (records.empty()) {
+            resource.push_back(attribute("host.name", row.node()));
+        }
+        records.push_back(recordOf(event, row));
+    }
+    for (const auto& [key, value] : m_attributes) {
+        resource.push_back(attribute(key, std::string_view(value)));
+    }
+    const Json body = {
+        {"resourceLogs",
+         Json::array({{{"resource", {{"attributes", std::move(resource)}}},
+                       {"scopeLogs", Json::array({{{"scope", {{"name", "zrmagent"}}},
+                                                   {"logRecords", std::move(records)}}})}}})}};
+    return body.dump(-1, ' ', false, Json::error_handler_t::replace);
+}
+
+void OtlpSink::tellOfRejected(std::size_t sent) const {
+    TraceScope trace(anchor);
+    const Json answer = Json::parse(m_http.answer(), nullptr, false);
+    const auto partial = answer.is_object() ? answer.find("partialSuccess") : answer.end();
+    if (partial == answer.end() || !partial->is_object()) {
+        return;
+    }
+    const auto rejected = partial->find("rejectedLogRecords");
+    const auto message = partial->find("errorMessage");
+    const std::string count = rejected == partial->end() ? "0" : integerText(*rejected);
+    const std::string why =
+        message == partial->end() || !message->is_string() ? "" : message->get<std::string>();
+    if (count != "0") {
+        trace.error()("%s has rejected %s of %zu events for good: %s", m_name.c_str(),
+                      count.c_str(), sent, why.c_str());
+    } else if (!why.empty()) {
+        trace.detail()("%s says: %s", m_name.c_str(), why.c_str());
+    }
+}
+
+std::size_t OtlpSink::deliver(std::span<const EventRecord> events, const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    if (!m_http.send(bodyOf(events), {}, giveUp)) {
+        return trace.result(std::size_t{0});
+    }
+    tellOfRejected(events.size());
+    return trace.result(events.size());
+}

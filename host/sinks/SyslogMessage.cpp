@@ -1,0 +1,83 @@
+#include "host/sinks/SyslogMessage.h"
+
+#include "host/config/SyslogFacilities.h"
+#include "host/framework/UtcTime.h"
+#include "host/sinks/EventRow.h"
+#include "host/sinks/SeverityCodes.h"
+
+#include <algorithm>
+
+#include <unistd.h>
+
+namespace {
+
+constexpr std::size_t longestHostName = 255; ///< bytes
+constexpr std::string_view byteOrderMark = "\xef\xbb\xbf";
+
+bool isControl(char c) {
+    return static_cast<unsigned char>(c) < ' ' || c == 0x7f;
+}
+
+bool isAscii(std::string_view text) {
+    return std::all_of(text.begin(), text.end(),
+                       [](char c) { return static_cast<unsigned char>(c) < 0x80; });
+}
+
+/// A field of the header has no blanks and nothing but ASCII; a lone dash says that it is unknown.
+std::string headerField(std::string_view text) {
+    std::string field(text.substr(0, longestHostName));
+    std::replace_if(
+        field.begin(), field.end(), [](char c) { return c <= ' ' || c > '~'; }, '?');
+    return field.empty() ? "-" : field;
+}
+
+void appendParameter(std::string& data, const char* name, std::string_view value) {
+    data += ' ';
+    data += name;
+    data += "=\"";
+    for (const char c : value) {
+        if (c == '"' || c == '\\' || c == ']') {
+            data += '\\';
+        }
+        data += isControl(c) ? ' ' : c;
+    }
+    data += '"';
+}
+
+/// The text on one line, with the mark that tells UTF-8 where it is not ASCII, in at most this
+/// many bytes.
+std::string messageText(std::string_view description, std::size_t most) {
+    std::string text(isAscii(description) ? "" : byteOrderMark);
+    text += description;
+    std::replace_if(text.begin(), text.end(), isControl, ' ');
+    if (text.size() > most) {
+        // Not within a character: those behind its first byte begin with the bits 10.
+        while (most > 0 && (static_cast<unsigned char>(text[most]) & 0xc0) == 0x80) {
+            --most;
+        }
+        text.resize(most);
+    }
+    return text;
+}
+
+} // namespace
+
+SyslogMessage::SyslogMessage(std::string_view facility)
+    : m_facility(static_cast<std::size_t>(
+          std::find(syslogFacilities.begin(), syslogFacilities.end(), facility) -
+          syslogFacilities.begin())),
+      m_process(std::to_string(getpid())) {}
+
+std::string SyslogMessage::text(const EventRecord& event) const {
+    const EventRow row(event);
+    const auto severity = static_cast<std::size_t>(SeverityCodes::of(event.severity).syslog);
+    std::string text = '<' + std::to_string(m_facility * 8 + severity) + ">1 ";
+    UtcTime::append(text, event.raised);
+    text += ' ' + headerField(row.node()) + " zrmagent " + m_process + " event [zrm@32473";
+    appendParameter(text, "id", std::to_string(event.id));
+    appendParameter(text, "situation", event.situation);
+    appendParameter(text, "severity", event.severity);
+    appendParameter(text, "log", event.log);
+    text += "] ";
+    return text + messageText(row.description(), kLongest - std::min(text.size(), kLongest));
+}

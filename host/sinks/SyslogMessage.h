@@ -1,0 +1,27 @@
+#ifndef ZRM_HOST_SYSLOG_MESSAGE_H
+#define ZRM_HOST_SYSLOG_MESSAGE_H
+
+#include "host/events/EventRecord.h"
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+/// Writes events as syslog messages (RFC 5424). Immutable, so any thread.
+class SyslogMessage {
+public:
+    /// The size that every receiver should take, and beyond which a text is cut.
+    static constexpr std::size_t kLongest = 2048;
+
+    /// `facility` is one of syslogFacilities.
+    explicit SyslogMessage(std::string_view facility);
+
+    /// The message, without a frame: header, structured data and the entry's text.
+    std::string text(const EventRecord& event) const;
+
+private:
+    std::size_t m_facility; ///< its code
+    std::string m_process;  ///< this one's number
+};
+
+#endif

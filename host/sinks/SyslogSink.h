@@ -1,0 +1,42 @@
+#ifndef ZRM_HOST_SYSLOG_SINK_H
+#define ZRM_HOST_SYSLOG_SINK_H
+
+#include "host/config/SinkConfig.h"
+#include "host/events/Sink.h"
+#include "host/sinks/Connection.h"
+#include "host/sinks/SyslogMessage.h"
+
+#include <cstddef>
+#include <deque>
+#include <span>
+#include <stop_token>
+#include <string>
+
+/// Sends events as syslog messages: over TCP in frames that tell their length (RFC 6587), over
+/// UDP one in each datagram. The receiver of syslog acknowledges nothing. Over TCP, what its
+/// system had not acknowledged when the connection broke, and at the least the last delivery, is
+/// therefore sent once more; over UDP nobody knows what arrived.
+class SyslogSink : public Sink {
+public:
+    explicit SyslogSink(const SinkConfig& config);
+
+    std::string name() const override { return m_name; }
+    std::size_t deliver(std::span<const EventRecord> events,
+                        const std::stop_token& giveUp) override;
+    std::string error() const override { return m_connection.error(); }
+
+private:
+    std::size_t deliverFrames(std::span<const EventRecord> events, const std::stop_token& giveUp);
+    std::size_t deliverDatagrams(std::span<const EventRecord> events,
+                                 const std::stop_token& giveUp);
+    bool reconnect(const std::stop_token& giveUp);
+    void forgetAcknowledged();
+
+    const std::string m_name;
+    const SyslogMessage m_format;
+    const bool m_isTcp;
+    Connection m_connection;
+    std::deque<std::string> m_unsure; ///< deliveries that may be lost with the connection
+};
+
+#endif

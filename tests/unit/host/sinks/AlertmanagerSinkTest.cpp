@@ -1,0 +1,83 @@
+#include "host/sinks/AlertmanagerSink.h"
+
+#include "ScriptedServer.h"
+#include "SinkTest.h"
+#include "support/RecordingTrace.h"
+
+#include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::json;
+using Request = ScriptedServer::Request;
+
+class AlertmanagerSinkTest : public testing::Test {
+protected:
+    SinkConfig config(const std::string& keys = "") const {
+        return sinkConfig("type = 'alertmanager'\nurl = '" + server.url("/prefix/") + "'\n" + keys);
+    }
+    std::size_t deliver(AlertmanagerSink& sink) {
+        return sink.deliver(events.records(), giveUp.get_token());
+    }
+    Json sent() const { return Json::parse(server.requests().back().body); }
+
+    RecordingTrace trace{0};
+    EntryEvents events;
+    int status = 200;
+    ScriptedServer server{[this](const Request&) { return ScriptedServer::status(status); }};
+    std::stop_source giveUp;
+};
+
+TEST_F(AlertmanagerSinkTest, RaisesAnAlertForEachEvent) {
+    events.add({});
+    events.add({.description = "caf\xc3\xa9", .situation = "watch", .severity = "info"});
+    AlertmanagerSink sink(config());
+    EXPECT_EQ(deliver(sink), 2u);
+    EXPECT_EQ(server.requests()[0].line, "POST /prefix/api/v2/alerts HTTP/1.1");
+    EXPECT_EQ(sent(), Json::parse(R"([
+        {"labels": {"alertname": "ssh-bruteforce", "severity": "critical",
+                    "log": "/var/log/auth.log", "node": "web1"},
+         "annotations": {"summary": "ssh-bruteforce in /var/log/auth.log",
+                         "description": "Failed password for root", "source": "sshd",
+                         "event": "1"},
+         "startsAt": "2026-11-20T07:03:09.412Z", "endsAt": "2026-11-20T07:08:09.412Z"},
+        {"labels": {"alertname": "watch", "severity": "info",
+                    "log": "/var/log/auth.log", "node": "web1"},
+         "annotations": {"summary": "watch in /var/log/auth.log",
+                         "description": "caf\u00e9", "source": "sshd", "event": "2"},
+         "startsAt": "2026-11-20T07:03:10.412Z", "endsAt": "2026-11-20T07:08:10.412Z"}])"));
+}
+
+TEST_F(AlertmanagerSinkTest, AddsWhatTheFileSays) {
+    events.add({});
+    AlertmanagerSink sink(config("resolve_after = '1d'\nlabels = { team = 'ops', _x1 = 'y' }\n"
+                                 "generator_url = 'https://web1/console'\n"));
+    EXPECT_EQ(deliver(sink), 1u);
+    const Json alert = sent().at(0);
+    EXPECT_EQ(alert.at("labels").size(), 6u);
+    EXPECT_EQ(alert.at("labels").at("team"), "ops");
+    EXPECT_EQ(alert.at("labels").at("_x1"), "y");
+    EXPECT_EQ(alert.at("generatorURL"), "https://web1/console");
+    EXPECT_EQ(alert.at("endsAt"), "2026-11-21T07:03:09.412Z");
+}
+
+TEST_F(AlertmanagerSinkTest, ARefusalIsAFailureOfAll) {
+    events.add({});
+    events.add({});
+    AlertmanagerSink sink(config());
+    status = 400;
+    EXPECT_EQ(deliver(sink), 0u);
+    EXPECT_EQ(sink.error(),
+              "127.0.0.1:" + std::to_string(server.port()) + " answered with status 400");
+    status = 200;
+    EXPECT_EQ(deliver(sink), 2u);
+}
+
+TEST_F(AlertmanagerSinkTest, IsCalledByItsHost) {
+    const AlertmanagerSink sink(config());
+    EXPECT_EQ(sink.name(), "alertmanager 127.0.0.1:" + std::to_string(server.port()));
+}
+
+} // namespace

@@ -1,0 +1,123 @@
+#include "host/sinks/OtlpSink.h"
+
+#include "ScriptedServer.h"
+#include "SinkTest.h"
+#include "support/RecordingTrace.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::json;
+using Request = ScriptedServer::Request;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+class OtlpSinkTest : public testing::Test {
+protected:
+    OtlpSinkTest() { events.add({}); }
+    SinkConfig config(const std::string& keys = "") const {
+        return sinkConfig("type = 'otlp'\nurl = '" + server.url() + "'\nname = 'collector'\n" +
+                          keys);
+    }
+    std::size_t deliver(OtlpSink& sink) {
+        return sink.deliver(events.records(), giveUp.get_token());
+    }
+
+    RecordingTrace trace{TRC1_ERROR};
+    EntryEvents events;
+    int status = 200;
+    std::string answer = "{}";
+    ScriptedServer server{
+        [this](const Request&) { return ScriptedServer::status(status, answer); }};
+    std::stop_source giveUp;
+};
+
+TEST_F(OtlpSinkTest, SendsLogRecords) {
+    events.add({.description = "caf\xc3\xa9", .severity = "minor"});
+    OtlpSink sink(
+        config("service_name = 'logs'\nattributes = { 'deployment.environment' = 'test' }"));
+    EXPECT_EQ(deliver(sink), 2u);
+    EXPECT_EQ(server.requests()[0].line, "POST /v1/logs HTTP/1.1");
+    EXPECT_EQ(server.requests()[0].header("content-type"), "application/json");
+    const auto record = [](const char* id, const char* time, int number, const char* severity,
+                           const char* text) {
+        const auto attribute = [](const char* key, const char* type, const char* value) {
+            return Json{{"key", key}, {"value", {{type, value}}}};
+        };
+        return Json{{"timeUnixNano", time},
+                    {"observedTimeUnixNano", time},
+                    {"severityNumber", number},
+                    {"severityText", severity},
+                    {"body", {{"stringValue", text}}},
+                    {"attributes",
+                     Json::array({attribute("zrm.id", "intValue", id),
+                                  attribute("zrm.situation", "stringValue", "ssh-bruteforce"),
+                                  attribute("log.file.path", "stringValue", "/var/log/auth.log"),
+                                  attribute("zrm.column.ORIGINNODE", "stringValue", "web1:ZRM"),
+                                  attribute("zrm.column.ENTRYSRC", "stringValue", "sshd"),
+                                  attribute("zrm.column.ENTRYDESC", "stringValue", "short"),
+                                  attribute("zrm.column.SAMPLENO", "intValue", "3"),
+                                  attribute("zrm.column.UENTRYDESC", "stringValue", text)})}};
+    };
+    Json expected = Json::parse(R"({"resourceLogs": [{
+        "resource": {"attributes": [
+            {"key": "service.name", "value": {"stringValue": "logs"}},
+            {"key": "host.name", "value": {"stringValue": "web1"}},
+            {"key": "deployment.environment", "value": {"stringValue": "test"}}]},
+        "scopeLogs": [{"scope": {"name": "zrmagent"}, "logRecords": []}]}]})");
+    Json& records = expected["resourceLogs"][0]["scopeLogs"][0]["logRecords"];
+    records.push_back(
+        record("1", "1795158189412000000", 21, "critical", "Failed password for root"));
+    records.push_back(record("2", "1795158190412000000", 10, "minor", "caf\xc3\xa9"));
+    EXPECT_EQ(Json::parse(server.requests()[0].body), expected);
+}
+
+TEST_F(OtlpSinkTest, TellsOfRecordsThatTheReceiverRejected) {
+    OtlpSink sink(config());
+    for (const char* const count : {"\"1\"", "1"}) {
+        trace.clear();
+        answer = std::string(R"({"partialSuccess":{"rejectedLogRecords":)") + count +
+                 R"(,"errorMessage":"too old"}})";
+        EXPECT_EQ(deliver(sink), 1u) << "they are not to be sent again";
+        EXPECT_THAT(trace.messages(),
+                    ElementsAre("collector has rejected 1 of 1 events for good: too old"));
+    }
+}
+
+TEST_F(OtlpSinkTest, ARemarkWithoutRejectionIsADetail) {
+    answer = R"({"partialSuccess":{"errorMessage":"be gentle"}})";
+    OtlpSink sink(config());
+    EXPECT_EQ(deliver(sink), 1u);
+    EXPECT_THAT(trace.messages(), IsEmpty());
+    trace.setLevel(TRC1_DETAIL);
+    answer = R"({"partialSuccess":{"rejectedLogRecords":"0","errorMessage":"be gentle"}})";
+    EXPECT_EQ(deliver(sink), 1u);
+    EXPECT_THAT(trace.messages(), ElementsAre("collector says: be gentle"));
+}
+
+TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
+    OtlpSink sink(config());
+    for (const char* const body :
+         {"", "ok", "[]", "null", R"({"partialSuccess":null})", R"({"partialSuccess":{}})",
+          R"({"partialSuccess":{"rejectedLogRecords":"0","errorMessage":5}})"}) {
+        answer = body;
+        EXPECT_EQ(deliver(sink), 1u) << body;
+    }
+    EXPECT_THAT(trace.messages(), IsEmpty());
+}
+
+TEST_F(OtlpSinkTest, ARefusalIsAFailure) {
+    OtlpSink sink(config());
+    status = 503;
+    answer = "";
+    EXPECT_EQ(deliver(sink), 0u);
+    EXPECT_EQ(sink.error(),
+              "127.0.0.1:" + std::to_string(server.port()) + " answered with status 503");
+    EXPECT_EQ(sink.name(), "collector");
+}
+
+} // namespace

@@ -1,0 +1,115 @@
+#include "host/sinks/SyslogMessage.h"
+
+#include "SinkTest.h"
+#include "host/config/SyslogFacilities.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include <unistd.h>
+
+namespace {
+
+std::string messageOf(const EntryEvents::Entry& entry, std::string_view facility = "daemon") {
+    EntryEvents events;
+    events.add(entry);
+    return SyslogMessage(facility).text(events.records().front());
+}
+
+std::string processId() {
+    return std::to_string(getpid());
+}
+
+/// The message of the first event with this priority, structured data and text.
+std::string expected(int priority, const std::string& data, const std::string& text) {
+    return "<" + std::to_string(priority) + ">1 2026-11-20T07:03:09.412Z web1 zrmagent " +
+           processId() + " event [zrm@32473 id=\"1\"" + data + "] " + text;
+}
+
+constexpr const char* usualData =
+    R"( situation="ssh-bruteforce" severity="critical" log="/var/log/auth.log")";
+
+TEST(SyslogMessage, HasHeaderDataAndText) {
+    EXPECT_EQ(messageOf({}), expected(26, usualData, "Failed password for root"));
+}
+
+TEST(SyslogMessage, ThePriorityIsOfFacilityAndSeverity) {
+    const auto priority = [](std::string_view facility, const std::string& severity) {
+        const std::string message = messageOf({.severity = severity}, facility);
+        return message.substr(0, message.find('>') + 1);
+    };
+    EXPECT_EQ(priority("kern", "critical"), "<2>");
+    EXPECT_EQ(priority("user", "info"), "<14>");
+    EXPECT_EQ(priority("daemon", "minor"), "<29>");
+    EXPECT_EQ(priority("daemon", "warning"), "<28>");
+    EXPECT_EQ(priority("auth", "major"), "<35>");
+    EXPECT_EQ(priority("authpriv", "info"), "<86>");
+    EXPECT_EQ(priority("local0", "info"), "<134>");
+    EXPECT_EQ(priority("local7", "info"), "<190>");
+    EXPECT_EQ(syslogFacilities.size(), 24u);
+}
+
+TEST(SyslogMessage, EscapesWhatWouldEndAValue) {
+    EXPECT_EQ(messageOf({.situation = R"(a\"b]c\\d)", .log = R"(/var/[x]"\y)"}),
+              expected(26,
+                       R"( situation="a\\\"b\]c\\\\d" severity="critical" log="/var/[x\]\"\\y")",
+                       "Failed password for root"));
+}
+
+TEST(SyslogMessage, TextThatIsNotAsciiHasTheMarkOfUtf8) {
+    EXPECT_EQ(messageOf({.description = "caf\xc3\xa9", .log = "/var/log/\xc3\xa4"}),
+              expected(26,
+                       " situation=\"ssh-bruteforce\" severity=\"critical\" "
+                       "log=\"/var/log/\xc3\xa4\"",
+                       "\xef\xbb\xbf"
+                       "caf\xc3\xa9"));
+}
+
+TEST(SyslogMessage, HasNoControlCharacters) {
+    EXPECT_EQ(messageOf({.description = R"(a\tb\nc\u0000d\u007fe)", .log = "/var/\x01\n"}),
+              expected(26, " situation=\"ssh-bruteforce\" severity=\"critical\" log=\"/var/  \"",
+                       "a b c d e"));
+}
+
+TEST(SyslogMessage, IsCutAtTheEndOfACharacter) {
+    const std::size_t front = messageOf({.description = "x"}).size() - 1;
+    const std::size_t room = SyslogMessage::kLongest - front;
+    const std::string whole(room, 'x');
+    EXPECT_EQ(messageOf({.description = whole}), expected(26, usualData, whole));
+    EXPECT_EQ(messageOf({.description = whole + "y"}), expected(26, usualData, whole));
+    // The mark takes three bytes; the character at the end has two, of which one has room.
+    const std::string cut(room - 4, 'x');
+    EXPECT_EQ(messageOf({.description = cut + "\xc3\xa9"}),
+              expected(26, usualData, "\xef\xbb\xbf" + cut));
+    EXPECT_EQ(messageOf({.description = cut.substr(1) + "\xc3\xa9"}),
+              expected(26, usualData, "\xef\xbb\xbf" + cut.substr(1) + "\xc3\xa9"));
+}
+
+TEST(SyslogMessage, TheDataIsNeverCut) {
+    const std::string log = "/" + std::string(3000, ']');
+    std::string escaped = "/";
+    for (int count = 0; count < 3000; ++count) {
+        escaped += "\\]";
+    }
+    EXPECT_EQ(
+        messageOf({.log = log}),
+        expected(26, " situation=\"ssh-bruteforce\" severity=\"critical\" log=\"" + escaped + "\"",
+                 ""));
+}
+
+TEST(SyslogMessage, AnUnknownHostIsADashAndAnOddOneHasQuestionMarks) {
+    const auto host = [](const std::string& node) {
+        const std::string json = R"({"row":{"ORIGINNODE":")" + node + R"("}})";
+        const std::string message =
+            SyslogMessage("daemon").text({1, EntryEvents::kRaised, "a", "info", "/a", json});
+        const std::size_t begin = message.find("Z ") + 2;
+        return message.substr(begin, message.find(" zrmagent") - begin);
+    };
+    EXPECT_EQ(host(""), "-");
+    EXPECT_EQ(host(":ZRM"), "-");
+    EXPECT_EQ(host("web 1\xc3\xa9:ZRM"), "web?1??");
+    EXPECT_EQ(host(std::string(300, 'a') + ":ZRM"), std::string(255, 'a'));
+}
+
+} // namespace
