@@ -95,7 +95,7 @@ struct ConditionBuilder::Operator {
     bool forNumbers; ///< for columns of both kinds; otherwise for character columns alone
 };
 
-const ConditionBuilder::Operator* ConditionBuilder::findOperator(std::string_view op) noexcept {
+const std::array<ConditionBuilder::Operator, 10>& ConditionBuilder::operators() noexcept {
     static constexpr std::array<Operator, 10> operators = {{
         {"=", INTF_EQUAL, true},
         {"!=", INTF_NOT_EQUAL, true},
@@ -108,9 +108,19 @@ const ConditionBuilder::Operator* ConditionBuilder::findOperator(std::string_vie
         {"matches", INTF_MATCHES, false},
         {"in", INTF_IN, true},
     }};
-    const auto found = std::find_if(operators.begin(), operators.end(),
-                                    [&](const Operator& known) { return known.name == op; });
-    return found == operators.end() ? nullptr : &*found;
+    return operators;
+}
+
+const ConditionBuilder::Operator* ConditionBuilder::findOperator(std::string_view op) noexcept {
+    const auto* const found = std::find_if(operators().begin(), operators().end(),
+                                           [&](const Operator& known) { return known.name == op; });
+    return found == operators().end() ? nullptr : found;
+}
+
+std::string_view ConditionBuilder::nameOf(_IntfOper op) noexcept {
+    const auto* const found = std::find_if(operators().begin(), operators().end(),
+                                           [&](const Operator& known) { return known.code == op; });
+    return found == operators().end() ? std::string_view() : found->name;
 }
 
 ConditionBuilder::ConditionBuilder(std::string_view table) : m_columns(columnsOf(table)) {}

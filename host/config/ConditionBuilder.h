@@ -4,6 +4,7 @@
 #include "host/config/Columns.h"
 #include "host/framework/Condition.h"
 
+#include <array>
 #include <cstdint>
 #include <span>
 #include <string>
@@ -42,8 +43,12 @@ public:
     /// its directory and its name, in the columns that can hold them.
     static std::variant<std::vector<Condition>, ConditionProblem> ofLog(std::string_view path);
 
+    /// The operator as conditions write it; empty for a code that none has.
+    static std::string_view nameOf(_IntfOper op) noexcept;
+
 private:
     struct Operator;
+    static const std::array<Operator, 10>& operators() noexcept;
     static const Operator* findOperator(std::string_view op) noexcept;
     std::variant<const Column*, ConditionProblem> column(std::string_view name) const;
     static Result single(const Column& column, const Operator& op, const ConditionValue& value);

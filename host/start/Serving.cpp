@@ -2,6 +2,7 @@
 
 #include "agent/TraceScope.h"
 #include "agent/framework/ctreq.h"
+#include "host/analysis/AnalysisResource.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/http/ApiToken.h"
@@ -54,13 +55,16 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
     : m_delivery(config.sinks, layout, request.rowSize),
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
-    addResources();
+    addResources(entries);
 }
 
-void Serving::addResources() {
+void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<HealthResource>());
     addResource(std::make_unique<SampleResource>(m_sampler));
     addResource(std::make_unique<SituationsResource>(m_situations));
+    auto analysis = std::make_unique<AnalysisResource>(m_situations, entries, nullptr);
+    m_analysis = analysis.get();
+    addResource(std::move(analysis));
 }
 
 void Serving::addResource(std::unique_ptr<Resource> resource) {
@@ -95,10 +99,16 @@ void Serving::startHttp(const HostConfig& config) {
     say("HTTP at http://%s/, token in %s", address.text().c_str(), path.c_str());
 }
 
+void Serving::abandonHttp(Clock::time_point limit) {
+    m_analysis->cancel();
+    m_http.abandon(limit);
+}
+
 void Serving::stop(Clock::time_point limit) {
     TraceScope trace(anchor);
     // Released first, so that none holds the table's lock when the situations are closed.
     limitWaits(limit);
+    m_analysis->cancel();
     m_http.stop(limit);
     m_situations.close();
     m_delivery.finish(limit);

@@ -13,6 +13,7 @@
 #include <memory>
 #include <vector>
 
+class AnalysisResource;
 class TableManager;
 
 /// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
@@ -47,7 +48,7 @@ public:
     /// Lets no log thread wait for a full queue beyond the limit.
     void limitWaits(Clock::time_point limit) { m_delivery.queue().limitWaits(limit); }
     /// Begins no further samples and waits for those under way, at most until the limit.
-    void abandonHttp(Clock::time_point limit) { m_http.abandon(limit); }
+    void abandonHttp(Clock::time_point limit);
     /// Delivers what is queued, at the latest until the limit.
     void deliverRest(Clock::time_point limit) { m_delivery.finish(limit); }
 
@@ -55,7 +56,7 @@ private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
             const RowLayout& layout);
 
-    void addResources();
+    void addResources(TableManager& entries);
     void addResource(std::unique_ptr<Resource> resource);
 
     Delivery m_delivery;
@@ -63,6 +64,7 @@ private:
     TableSampler m_sampler;
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP
+    AnalysisResource* m_analysis = nullptr;             ///< one of these
     HttpServer m_http;
 };
 

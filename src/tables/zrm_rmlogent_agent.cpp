@@ -131,7 +131,7 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     return trace.result(ctreq::InsertRow(row));
 }
 
-long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) const {
+long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) {
     return newest.countEvents(period);
 }
 

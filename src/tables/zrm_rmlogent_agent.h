@@ -42,7 +42,7 @@ protected:
 
     /// Counts the chain's entries within the period, which ends now while logs are monitored. For
     /// entries that are replayed it ends with the newest of them.
-    virtual long countEvents(Timestamp& newest, long period) const;
+    virtual long countEvents(Timestamp& newest, long period);
 
 private:
     void TakeSampleDestructor();

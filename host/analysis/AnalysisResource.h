@@ -1,0 +1,52 @@
+#ifndef ZRM_HOST_ANALYSIS_RESOURCE_H
+#define ZRM_HOST_ANALYSIS_RESOURCE_H
+
+#include "host/analysis/Explanation.h"
+#include "host/config/HostConfig.h"
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
+#include "host/http/Resource.h"
+#include "host/situations/SituationSet.h"
+
+#include <atomic>
+#include <semaphore>
+#include <string>
+#include <vector>
+
+class HistoryReader;
+class JsonFields;
+class TableManager;
+
+/// `POST /api/v1/explain` and `POST /api/v1/backtest`.
+class AnalysisResource : public Resource {
+public:
+    /// All outlive the object; the history is null when it is off.
+    AnalysisResource(SituationSet& situations, TableManager& entries, HistoryReader* history)
+        : m_situations(situations), m_entries(entries), m_history(history) {}
+
+    void addRoutes(Router& router) override;
+
+    /// Ends what is under way soon. Any thread.
+    void cancel() noexcept { m_isCancelled = true; }
+
+private:
+    struct Subject {
+        SituationConfig situation;
+        bool isStopped = false;
+    };
+
+    HttpAnswer explain(const HttpRequest& request);
+    HttpAnswer backtest(const HttpRequest& request);
+    Subject subject(JsonFields& fields, const std::string& otherwise = "");
+    std::vector<Explanation> explainLine(JsonFields& fields);
+    std::vector<Explanation> explainLast(JsonFields& fields);
+    std::vector<Explanation> explainEvent(JsonFields& fields);
+
+    SituationSet& m_situations;
+    TableManager& m_entries;
+    HistoryReader* const m_history;
+    std::counting_semaphore<2> m_room{2}; ///< of backtests at a time
+    std::atomic<bool> m_isCancelled{false};
+};
+
+#endif

@@ -1,0 +1,126 @@
+#include "host/analysis/Backtest.h"
+
+#include "agent/TraceScope.h"
+#include "monitor/LogFile.h"
+#include "tables/RequestThresholds.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+
+namespace {
+
+TRC1_Anchor anchor{"Backtest.cpp"};
+
+constexpr std::uint64_t entriesPerLook = 1024; ///< at the clock
+
+std::string times(std::uint64_t number) {
+    return number == 1 ? "once" : std::to_string(number) + " times";
+}
+
+std::string entriesText(std::uint64_t number) {
+    return std::to_string(number) + (number == 1 ? " entry" : " entries");
+}
+
+/// "2026-11-20 07:03:09" of a 16-character time.
+std::string readable(const std::string& stamp) {
+    return (stamp[0] == '0' ? "19" : "20") + stamp.substr(1, 2) + '-' + stamp.substr(3, 2) + '-' +
+           stamp.substr(5, 2) + ' ' + stamp.substr(7, 2) + ':' + stamp.substr(9, 2) + ':' +
+           stamp.substr(11, 2);
+}
+
+} // namespace
+
+/// What ends the reading early.
+struct Backtest::Limits {
+    const std::function<bool()>& isCancelled;
+    std::chrono::steady_clock::time_point deadline = std::chrono::steady_clock::now() + patience;
+
+    bool areReached(const Result& result) const {
+        if (result.entries >= mostEntries || result.matched >= mostMatched) {
+            return true;
+        }
+        return result.entries % entriesPerLook == 0 &&
+               (isCancelled() || std::chrono::steady_clock::now() >= deadline);
+    }
+};
+
+Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::string& from,
+                               const std::string& to, const std::function<bool()>& isCancelled) {
+    TraceScope trace(anchor);
+    Result result;
+    Limits limits{isCancelled};
+    m_matched.clear();
+    for (LogFile* const log : logs) {
+        read(*log, from, to, limits, result);
+        if (result.isTruncated) {
+            break;
+        }
+    }
+    replay(result);
+    result.decision = decisionOf(result);
+    return result;
+}
+
+void Backtest::read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
+                    Result& result) {
+    TraceScope trace(anchor);
+    _RequestThresholds window{};
+    from.copy(window.startTime, sizeof window.startTime - 1);
+    to.copy(window.endTime, sizeof window.endTime - 1);
+    void* report = log.startReportRequest(&window);
+    if (report == nullptr) {
+        return; // the log is empty or cannot be read
+    }
+    const auto row = std::make_unique<zrm_rmlogent_data_t>();
+    while (log.getNextLogEntry(row.get(), report, &window) != nullptr) {
+        if (limits.areReached(result)) {
+            result.isTruncated = true;
+            break;
+        }
+        ++result.entries;
+        if (m_replay.matches(*row)) {
+            ++result.matched;
+            Stamp& stamp = m_matched.emplace_back();
+            std::memcpy(stamp.data(), row->entrytime, stamp.size());
+        }
+    }
+    log.endReportRequest(&report);
+}
+
+void Backtest::replay(Result& result) {
+    TraceScope trace(anchor);
+    // Entries of one second stay as the log has them, which is newest first here.
+    std::reverse(m_matched.begin(), m_matched.end());
+    std::stable_sort(m_matched.begin(), m_matched.end());
+    for (const Stamp& stamp : m_matched) {
+        if (m_replay.count(stamp.data()).isRaised) {
+            ++result.raised;
+            if (result.raisedAt.size() < mostTimes) {
+                result.raisedAt.emplace_back(stamp.data(), stamp.size());
+            }
+        }
+    }
+}
+
+std::string Backtest::decisionOf(const Result& result) const {
+    const std::string of = entriesText(result.entries);
+    std::string text;
+    if (result.raised > 0) {
+        text = "Would have been raised " + times(result.raised) + ", first at " +
+               readable(result.raisedAt.front()) + ": " + std::to_string(result.matched) + " of " +
+               of + (result.matched == 1 ? " meets" : " meet") + " every condition";
+    } else if (result.entries == 0) {
+        text = "Would not have been raised: there are no entries between these times";
+    } else if (result.matched == 0) {
+        text = "Would not have been raised: none of " + of + " meets every condition";
+    } else {
+        text = "Would not have been raised: " + std::to_string(result.matched) + " of " + of +
+               (result.matched == 1 ? " meets" : " meet") + " every condition, but never " +
+               (m_replay.frequency() < 0 ? "<= " : ">= ") +
+               std::to_string(std::abs(m_replay.frequency())) + " in " +
+               std::to_string(m_replay.periodSeconds()) + " s";
+    }
+    return text + (result.isTruncated ? "; older entries were not looked at." : ".");
+}

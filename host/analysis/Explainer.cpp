@@ -1,0 +1,211 @@
+#include "host/analysis/Explainer.h"
+
+#include "agent/TraceScope.h"
+#include "host/analysis/LogTail.h"
+#include "host/analysis/StoredRow.h"
+#include "host/events/RowJson.h"
+
+#include <cstdlib>
+#include <deque>
+#include <optional>
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"Explainer.cpp"};
+
+std::string stampOf(const zrm_rmlogent_data_t& row) {
+    return {row.entrytime, sizeof row.entrytime};
+}
+
+bool isThreshold(const Condition& condition) {
+    return condition.column == "FREQTHRESH" || condition.column == "PERIODTHRS";
+}
+
+std::string numberOf(long count, const char* one, const char* several) {
+    return std::to_string(count) + ' ' + (count == 1 ? one : several);
+}
+
+std::string boundOf(const Replay& replay) {
+    return (replay.frequency() < 0 ? "<= " : ">= ") + std::to_string(std::abs(replay.frequency()));
+}
+
+} // namespace
+
+struct Explainer::Seen {
+    std::optional<std::string> line;
+    std::optional<std::uint64_t> event;
+    bool isRow = false;
+    zrm_rmlogent_data_t row{};
+    Replay::Verdict verdict;
+};
+
+Explainer::Explainer(SituationConfig situation, bool isStopped, TableManager& entries)
+    : m_situation(std::move(situation)), m_isStopped(isStopped), m_entries(entries),
+      m_replay(m_situation, entries) {}
+
+Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view> line,
+                                 zrm_rmlogent_data_t* row) {
+    Seen seen;
+    seen.line = line;
+    if (row != nullptr) {
+        seen.isRow = true;
+        seen.row = *row; // judging writes into the row
+        seen.verdict = replay.judge(*row);
+    }
+    return seen;
+}
+
+std::vector<Explanation> Explainer::last(LogFile& log, std::size_t number) {
+    TraceScope trace(anchor);
+    std::deque<Seen> seen;
+    m_problem = LogTail(log).read([&](auto line, zrm_rmlogent_data_t* row) {
+        seen.push_back(judge(m_replay, line, row));
+        if (seen.size() > number) {
+            seen.pop_front();
+        }
+    });
+    std::vector<Explanation> explanations;
+    for (Seen& entry : seen) {
+        explanations.push_back(describe(entry));
+    }
+    return explanations;
+}
+
+std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
+    TraceScope trace(anchor);
+    std::optional<Seen> found;
+    Stamps matched;
+    // A log that cannot be read has nothing before the line.
+    LogTail(log).read([&](auto text, zrm_rmlogent_data_t* row) {
+        Seen seen = judge(m_replay, text, row);
+        if (seen.verdict.matches && m_replay.hasThresholds()) {
+            matched.push_back(stampOf(seen.row));
+        }
+        if (text == line) {
+            found = std::move(seen);
+        }
+    });
+    if (found) {
+        return {describe(*found)};
+    }
+    return nextLine(log, line, matched);
+}
+
+/// The line as if it came behind those of its time and before.
+std::vector<Explanation> Explainer::nextLine(LogFile& log, std::string_view line,
+                                             const Stamps& before) {
+    TraceScope trace(anchor);
+    Replay replay(m_situation, m_entries);
+    bool isFirst = true;
+    std::vector<Explanation> explanations;
+    if (!replay.isOpen()) {
+        m_problem = "there are too many requests";
+        return explanations;
+    }
+    m_problem = LogTail(log).readLine(line, [&](auto text, zrm_rmlogent_data_t* row) {
+        if (row != nullptr && std::exchange(isFirst, false)) {
+            for (const std::string& stamp : before) {
+                if (stamp <= stampOf(*row)) {
+                    replay.count(stamp.data());
+                }
+            }
+        }
+        Seen seen = judge(replay, text, row);
+        explanations.push_back(describe(seen));
+    });
+    return explanations;
+}
+
+Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
+    TraceScope trace(anchor);
+    std::optional<Seen> found;
+    bool isExact = false;
+    if (log != nullptr) {
+        LogTail(*log).read([&](auto line, zrm_rmlogent_data_t* row) {
+            const bool isEntry =
+                row != nullptr && StoredRow::isSameEntry(layout(), *row, entry.row);
+            Seen seen = judge(m_replay, line, row);
+            // Of several that are the same, the one that was counted like the event.
+            if (isEntry && !isExact) {
+                isExact = entry.isOwn && seen.verdict.frequency == entry.row.freqthresh;
+                found = std::move(seen);
+            }
+        });
+    }
+    if (!found) {
+        found.emplace();
+        found->isRow = true;
+        found->row = entry.row;
+        zrm_rmlogent_data_t row = entry.row;
+        found->verdict.matches = m_replay.matches(row);
+        if (!m_replay.hasThresholds()) {
+            found->verdict.isRaised = found->verdict.matches;
+        } else if (entry.isOwn && found->verdict.matches) {
+            found->verdict.isRaised = true;
+            found->verdict.frequency = entry.row.freqthresh;
+        }
+    }
+    found->event = entry.id;
+    return describe(*found);
+}
+
+Explanation Explainer::describe(Seen& seen) {
+    Explanation explanation;
+    explanation.line = std::move(seen.line);
+    explanation.event = seen.event;
+    if (m_replay.hasThresholds()) {
+        explanation.window = {
+            m_situation.frequency.value_or(boundOf(m_replay)),
+            m_situation.period.value_or(std::to_string(m_replay.periodSeconds()) + "s"),
+            seen.verdict.frequency};
+    }
+    if (!seen.isRow) {
+        explanation.reason = "the line does not fit the log's format, or its time cannot be told";
+    } else {
+        char* const row = reinterpret_cast<char*>(&seen.row);
+        RowJson::append(explanation.row, layout(), row);
+        m_replay.matches(seen.row); // gives the row the situation's thresholds
+        for (const Condition& condition : m_situation.conditions) {
+            if (!m_situation.frequency || !isThreshold(condition)) {
+                explanation.conditions.push_back(ConditionVerdict::of(condition, layout(), row));
+            }
+        }
+    }
+    explanation.matches = seen.verdict.matches;
+    explanation.isRaised = seen.verdict.isRaised;
+    decide(explanation, seen);
+    return explanation;
+}
+
+void Explainer::decide(Explanation& explanation, const Seen& seen) const {
+    const std::string would = explanation.isRaised ? "Would be raised" : "Would not be raised";
+    std::string because;
+    if (!seen.isRow) {
+        because = "the line gives no entry";
+    } else if (!explanation.matches) {
+        because = "a condition does not hold";
+        for (const ConditionVerdict& verdict : explanation.conditions) {
+            if (!verdict.holds) {
+                because = verdict.refusal;
+                break;
+            }
+        }
+    } else if (!explanation.window) {
+        because = explanation.conditions.empty() ? "the situation has no conditions"
+                                                 : "every condition holds";
+    } else if (seen.verdict.frequency) {
+        because = numberOf(*seen.verdict.frequency, "entry", "entries") + " in " +
+                  std::to_string(m_replay.periodSeconds()) + " s, the threshold is " +
+                  boundOf(m_replay);
+    } else if (seen.event) {
+        explanation.decision = "Cannot be told: every condition holds, but the log holds the entry "
+                               "no more, so that those before it cannot be counted.";
+        return;
+    } else {
+        because = "the time of the entry cannot be counted";
+    }
+    explanation.decision =
+        would + (explanation.isRaised && m_isStopped ? " if the situation were started" : "") +
+        ": " + because + '.';
+}

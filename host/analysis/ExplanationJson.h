@@ -1,0 +1,14 @@
+#ifndef ZRM_HOST_EXPLANATION_JSON_H
+#define ZRM_HOST_EXPLANATION_JSON_H
+
+#include "host/analysis/Explanation.h"
+
+#include <nlohmann/json_fwd.hpp>
+
+/// Explanations as JSON objects. Stateless.
+class ExplanationJson {
+public:
+    static nlohmann::ordered_json of(const Explanation& explanation);
+};
+
+#endif

@@ -1,0 +1,139 @@
+#include "host/analysis/LogTail.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "monitor/LineReader.h"
+#include "monitor/LogFile.h"
+#include "tables/RequestThresholds.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <vector>
+
+#include <fcntl.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"LogTail.cpp"};
+
+/// A descriptor that is closed at the end of its scope.
+class Descriptor {
+public:
+    explicit Descriptor(int fd) : m_fd(fd) {}
+    ~Descriptor() { close(); }
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    int get() const noexcept { return m_fd; }
+    void close() {
+        if (m_fd != -1) {
+            ::close(m_fd);
+            m_fd = -1;
+        }
+    }
+
+private:
+    int m_fd;
+};
+
+std::string because(const std::string& what, int number) {
+    const ErrorText error(number);
+    return what + ": " + error.text();
+}
+
+/// Goes to the first whole line among the file's last bytes; false leaves errno.
+bool seekTail(int fd) {
+    const off_t end = lseek(fd, 0, SEEK_END);
+    if (end == -1) {
+        return false;
+    }
+    const auto room = static_cast<off_t>(LogTail::longest);
+    if (end <= room) {
+        return lseek(fd, 0, SEEK_SET) != -1;
+    }
+    // A line may begin right there, which the newline before it tells.
+    off_t at = lseek(fd, end - room - 1, SEEK_SET);
+    char block[4096];
+    ssize_t count = 0;
+    while (at != -1 && (count = read(fd, block, sizeof block)) > 0) {
+        if (const void* const newline = std::memchr(block, '\n', static_cast<std::size_t>(count))) {
+            return lseek(fd, at + (static_cast<const char*>(newline) - block) + 1, SEEK_SET) != -1;
+        }
+        at += count;
+    }
+    return at != -1 && count != -1;
+}
+
+} // namespace
+
+bool LogTail::hasLines() const noexcept {
+    return m_log.type() == 'U' || m_log.type() == 'S';
+}
+
+std::string LogTail::read(const Entry& entry) {
+    TraceScope trace(anchor);
+    if (!hasLines()) {
+        entries(entry);
+        return "";
+    }
+    const Descriptor file(open(m_log.fileNameLocal(), O_RDONLY | O_CLOEXEC));
+    if (file.get() == -1 || !seekTail(file.get())) {
+        return because("the log cannot be read", errno);
+    }
+    pieces(file.get(), entry);
+    return "";
+}
+
+std::string LogTail::readLine(std::string_view line, const Entry& entry) {
+    TraceScope trace(anchor);
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC | O_NONBLOCK) == -1) {
+        return because("no pipe", errno);
+    }
+    const Descriptor readEnd(ends[0]);
+    Descriptor writeEnd(ends[1]);
+    const std::string text = std::string(line) + '\n';
+    // A pipe that is empty takes as much at once.
+    if (write(writeEnd.get(), text.data(), text.size()) != static_cast<ssize_t>(text.size())) {
+        return because("the line cannot be read", errno);
+    }
+    writeEnd.close();
+    pieces(readEnd.get(), entry);
+    return "";
+}
+
+void LogTail::pieces(int fd, const Entry& entry) {
+    LineReader reader;
+    reader.start(fd);
+    zrm_rmlogent_data_t row;
+    std::string line;
+    while (char* const piece = reader.next()) {
+        line = piece; // making the row may change it
+        const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
+        if (line.ends_with('\n')) {
+            line.pop_back();
+        }
+        entry(line, isRow ? &row : nullptr);
+    }
+}
+
+/// The entries of a report over all times, which comes newest first.
+void LogTail::entries(const Entry& entry) {
+    _RequestThresholds always{};
+    std::strcpy(always.startTime, "0000000000000000");
+    std::strcpy(always.endTime, "1991231235959000");
+    void* report = m_log.startReportRequest(&always);
+    if (report == nullptr) {
+        return;
+    }
+    std::vector<zrm_rmlogent_data_t> rows(1);
+    while (rows.size() <= mostEntries &&
+           m_log.getNextLogEntry(&rows.back(), report, &always) != nullptr) {
+        rows.emplace_back();
+    }
+    m_log.endReportRequest(&report);
+    rows.pop_back();
+    std::for_each(rows.rbegin(), rows.rend(),
+                  [&](zrm_rmlogent_data_t& row) { entry(std::nullopt, &row); });
+}

@@ -1,0 +1,48 @@
+#ifndef ZRM_HOST_LOG_TAIL_H
+#define ZRM_HOST_LOG_TAIL_H
+
+#include "tables/zrm_rmlogent_data.h"
+
+#include <cstddef>
+#include <functional>
+#include <optional>
+#include <string>
+#include <string_view>
+
+class LogFile;
+
+/// Reads what a log holds last, and lines that it might hold, as its monitor would: in the same
+/// pieces and by the log's own operation that makes rows. The monitor goes on undisturbed: rows
+/// are made as reports make them, beside it, and its counters count nothing of this.
+class LogTail {
+public:
+    static constexpr std::size_t longest = 4 * 1024 * 1024; ///< bytes of a text log
+    static constexpr std::size_t mostEntries = 10000;       ///< of another log
+    static constexpr std::size_t longestLine = 16 * 1024;   ///< bytes of a line that is given
+
+    /// One entry, oldest first. `line` is none where the log has no lines, `row` null where the
+    /// line gives none; both may be changed and last until the function returns.
+    using Entry =
+        std::function<void(std::optional<std::string_view> line, zrm_rmlogent_data_t* row)>;
+
+    /// The log outlives the object.
+    explicit LogTail(LogFile& log) : m_log(log) {}
+
+    /// Whether the log is a file of lines; otherwise its entries come from its reports, and no
+    /// line can be given.
+    bool hasLines() const noexcept;
+
+    /// Reads the log's end. Returns what is wrong, empty when nothing is.
+    std::string read(const Entry& entry);
+
+    /// Reads one line, of at most `longestLine` bytes without a newline, in its pieces.
+    std::string readLine(std::string_view line, const Entry& entry);
+
+private:
+    void pieces(int fd, const Entry& entry);
+    void entries(const Entry& entry);
+
+    LogFile& m_log;
+};
+
+#endif

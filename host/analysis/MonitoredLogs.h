@@ -1,0 +1,28 @@
+#ifndef ZRM_HOST_MONITORED_LOGS_H
+#define ZRM_HOST_MONITORED_LOGS_H
+
+#include <string_view>
+#include <vector>
+
+class LogFile;
+class LogManager;
+
+/// The monitored logs, held as they are while the object lives: a refresh waits for its end. To be
+/// constructed may itself wait for a refresh. Any thread, which holds no lock that a log's thread
+/// wants.
+class MonitoredLogs {
+public:
+    MonitoredLogs();
+    ~MonitoredLogs();
+    MonitoredLogs(const MonitoredLogs&) = delete;
+    MonitoredLogs& operator=(const MonitoredLogs&) = delete;
+
+    std::vector<LogFile*> all() const;
+    /// The log of this whole path, in UTF-8; null when it is not monitored.
+    LogFile* find(std::string_view path) const;
+
+private:
+    LogManager* const m_manager; ///< null while the process ends
+};
+
+#endif

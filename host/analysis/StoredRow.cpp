@@ -1,0 +1,55 @@
+#include "host/analysis/StoredRow.h"
+
+#include "host/events/RowText.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+#include <string>
+
+#include <nlohmann/json.hpp>
+
+bool StoredRow::fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::string_view event) {
+    constexpr bool throwsErrors = false;
+    const auto document = nlohmann::json::parse(event, nullptr, throwsErrors);
+    if (!document.is_object() || !document.contains("row") || !document["row"].is_object()) {
+        return false;
+    }
+    const auto& columns = document["row"];
+    char* const bytes = reinterpret_cast<char*>(&row);
+    std::memset(bytes, 0, sizeof row);
+    for (const RowColumn& column : layout.columns()) {
+        const auto found = columns.find(column.name);
+        char* const field = bytes + column.offset;
+        if (column.isInteger()) {
+            const std::int32_t number = found != columns.end() && found->is_number_integer()
+                                            ? found->get<std::int32_t>()
+                                            : 0;
+            std::memcpy(field, &number, sizeof number);
+        } else {
+            std::memset(field, ' ', column.width);
+            if (found != columns.end() && found->is_string()) {
+                const auto& text = found->get_ref<const std::string&>();
+                std::memcpy(field, text.data(), std::min(text.size(), column.width));
+            }
+        }
+    }
+    return true;
+}
+
+bool StoredRow::isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
+                            const zrm_rmlogent_data_t& right) {
+    const auto* const leftBytes = reinterpret_cast<const char*>(&left);
+    const auto* const rightBytes = reinterpret_cast<const char*>(&right);
+    return std::all_of(layout.columns().begin(), layout.columns().end(),
+                       [&](const RowColumn& column) {
+                           if (column.isInteger() || column.name == "TIMESTAMP") {
+                               return true; // not of the entry
+                           }
+                           // As the event's JSON has it.
+                           std::string leftRoom;
+                           std::string rightRoom;
+                           return RowText::of(column, leftBytes, leftRoom) ==
+                                  RowText::of(column, rightBytes, rightRoom);
+                       });
+}

@@ -1,0 +1,21 @@
+#ifndef ZRM_HOST_STORED_ROW_H
+#define ZRM_HOST_STORED_ROW_H
+
+#include "host/framework/RowLayout.h"
+#include "tables/zrm_rmlogent_data.h"
+
+#include <string_view>
+
+/// Log Entries rows from the JSON of events. Stateless.
+class StoredRow {
+public:
+    /// Fills a row with the columns of an event's object; false when the text holds none. Columns
+    /// that are missing are blank or 0.
+    static bool fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::string_view event);
+
+    /// Whether two rows are of the same entry, as far as the entry's own columns tell.
+    static bool isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
+                            const zrm_rmlogent_data_t& right);
+};
+
+#endif
