@@ -123,6 +123,14 @@ std::string_view ConditionBuilder::nameOf(_IntfOper op) noexcept {
     return found == operators().end() ? std::string_view() : found->name;
 }
 
+std::vector<std::string_view> ConditionBuilder::operatorNames() {
+    std::vector<std::string_view> names;
+    for (const Operator& known : operators()) {
+        names.push_back(known.name);
+    }
+    return names;
+}
+
 ConditionBuilder::ConditionBuilder(std::string_view table) : m_columns(columnsOf(table)) {}
 
 std::variant<const Column*, ConditionProblem>

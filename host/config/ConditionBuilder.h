@@ -46,6 +46,9 @@ public:
     /// The operator as conditions write it; empty for a code that none has.
     static std::string_view nameOf(_IntfOper op) noexcept;
 
+    /// The operators as conditions write them.
+    static std::vector<std::string_view> operatorNames();
+
 private:
     struct Operator;
     static const std::array<Operator, 10>& operators() noexcept;

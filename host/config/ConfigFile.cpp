@@ -71,10 +71,22 @@ void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& co
         if (!config.http.listen) {
             section.problem("listen", "'" + listen + "' is no address to listen at",
                             "write ADDRESS:PORT, for example \"127.0.0.1:7186\", or \"\" for none");
-        } else if (!config.http.listen->isLoopback()) {
+        } else if (!config.http.listen->isLoopback() && !section.has("certificate")) {
             section.problem("listen", "'" + listen + "' can be reached from other machines",
-                            "write a loopback address: 127.0.0.1, [::1] or localhost");
+                            "write a loopback address (127.0.0.1, [::1] or localhost), or add "
+                            "certificate and key, so that TLS is spoken");
         }
+    }
+    for (const auto& [key, path] :
+         {std::pair{"certificate", &config.http.certificate}, std::pair{"key", &config.http.key}}) {
+        if (const std::optional<std::string> file = section.text(key)) {
+            requireAbsolute(section, key, *file);
+            *path = *file;
+        }
+    }
+    if (section.has("certificate") != section.has("key")) {
+        section.problem(section.has("key") ? "key" : "certificate", "stands alone",
+                        "give both certificate and key, or neither");
     }
     if (const std::optional<std::string> file = section.text("token_file")) {
         requireAbsolute(section, "token_file", *file);

@@ -20,6 +20,8 @@ struct EnvironmentSetting {
 struct HttpConfig {
     std::optional<ListenAddress> listen; ///< none: no HTTP
     std::string tokenFile;               ///< empty: api-token in the state directory
+    std::string certificate;             ///< empty: without TLS
+    std::string key;                     ///< of the certificate
     bool operator==(const HttpConfig&) const = default;
 };
 

@@ -113,9 +113,13 @@ long daysSinceEpoch(int year, int month, int day) {
     return era * 146097 + yearOfEra * 365 + yearOfEra / 4 - yearOfEra / 100 + dayOfYear - 719468;
 }
 
+std::time_t secondsOf(const Moment& at, long east) {
+    return daysSinceEpoch(at.year, at.month, at.day) * 86400L + at.hour * 3600L + at.minute * 60L +
+           at.second - east;
+}
+
 std::optional<Moment> toLocal(const Moment& at, long east) {
-    const std::time_t time = daysSinceEpoch(at.year, at.month, at.day) * 86400L + at.hour * 3600L +
-                             at.minute * 60L + at.second - east;
+    const std::time_t time = secondsOf(at, east);
     std::tm local{};
     if (localtime_r(&time, &local) == nullptr) {
         return std::nullopt;
@@ -124,40 +128,44 @@ std::optional<Moment> toLocal(const Moment& at, long east) {
                   local.tm_hour,        local.tm_min,     local.tm_sec};
 }
 
-std::optional<std::string> checkedStamp(std::string_view text) {
-    if (text == "0000000000000000") {
-        return std::string(text); // an unknown time
-    }
-    std::string_view rest = text;
-    Moment at;
-    int century = 0;
-    int thousandths = 0;
-    if (!takeNumber(rest, 1, century) || century > 1 || !takeNumber(rest, 2, at.year) ||
-        !takeNumber(rest, 2, at.month) || !takeNumber(rest, 2, at.day) ||
-        !takeNumber(rest, 2, at.hour) || !takeNumber(rest, 2, at.minute) ||
-        !takeNumber(rest, 2, at.second) || !takeNumber(rest, 3, thousandths)) {
-        return std::nullopt;
-    }
-    at.year += 1900 + 100 * century;
-    return isValid(at) ? std::optional(std::string(text)) : std::nullopt;
+std::time_t localSecondsOf(const Moment& at) {
+    std::tm local{};
+    local.tm_year = at.year - 1900;
+    local.tm_mon = at.month - 1;
+    local.tm_mday = at.day;
+    local.tm_hour = at.hour;
+    local.tm_min = at.minute;
+    local.tm_sec = at.second;
+    local.tm_isdst = -1;
+    return std::mktime(&local);
 }
 
-} // namespace
-
-std::optional<std::string> TimeText::toStamp(std::string_view text) {
-    if (text.size() == 16 && text.find_first_not_of("0123456789") == std::string_view::npos) {
-        return checkedStamp(text);
+/// The milliseconds that a fraction of the second stands for; 0 without one.
+int fractionOf(std::string_view text) {
+    const std::size_t point = text.find('.');
+    int milliseconds = 0;
+    for (std::size_t digit = 1; point != std::string_view::npos && digit <= 3; ++digit) {
+        const bool has = point + digit < text.size() && isDigit(text[point + digit]);
+        milliseconds = milliseconds * 10 + (has ? text[point + digit] - '0' : 0);
     }
+    return milliseconds;
+}
+
+/// A time in ISO 8601 with the seconds of its zone east of UTC, where it has one.
+struct Iso {
     Moment at;
-    if (!takeDate(text, at)) {
+    std::optional<long> east = std::nullopt;
+};
+
+std::optional<Iso> parseIso(std::string_view text) {
+    Iso iso;
+    if (!takeDate(text, iso.at)) {
         return std::nullopt;
     }
-    if (!text.empty()) {
-        if ((!take(text, 'T') && !take(text, ' ')) || !takeTime(text, at)) {
-            return std::nullopt;
-        }
+    if (!text.empty() && ((!take(text, 'T') && !take(text, ' ')) || !takeTime(text, iso.at))) {
+        return std::nullopt;
     }
-    if (!isValid(at)) {
+    if (!isValid(iso.at)) {
         return std::nullopt;
     }
     if (!text.empty()) {
@@ -165,11 +173,59 @@ std::optional<std::string> TimeText::toStamp(std::string_view text) {
         if (!takeZone(text, east) || !text.empty()) {
             return std::nullopt;
         }
-        const std::optional<Moment> local = toLocal(at, east);
-        if (!local || !isValid(*local)) {
-            return std::nullopt;
-        }
-        at = *local;
+        iso.east = east;
     }
-    return stamp(at);
+    return iso;
+}
+
+bool isStamp(std::string_view text) {
+    return text.size() == 16 && text.find_first_not_of("0123456789") == std::string_view::npos;
+}
+
+/// The moment of a time stamp; none when it is no time.
+std::optional<Moment> momentOf(std::string_view text) {
+    Moment at;
+    int century = 0;
+    int thousandths = 0;
+    if (!takeNumber(text, 1, century) || century > 1 || !takeNumber(text, 2, at.year) ||
+        !takeNumber(text, 2, at.month) || !takeNumber(text, 2, at.day) ||
+        !takeNumber(text, 2, at.hour) || !takeNumber(text, 2, at.minute) ||
+        !takeNumber(text, 2, at.second) || !takeNumber(text, 3, thousandths)) {
+        return std::nullopt;
+    }
+    at.year += 1900 + 100 * century;
+    return isValid(at) ? std::optional(at) : std::nullopt;
+}
+
+} // namespace
+
+std::optional<std::string> TimeText::toStamp(std::string_view text) {
+    if (isStamp(text)) {
+        const bool isUnknownTime = text == "0000000000000000";
+        return isUnknownTime || momentOf(text) ? std::optional(std::string(text)) : std::nullopt;
+    }
+    const std::optional<Iso> iso = parseIso(text);
+    if (!iso) {
+        return std::nullopt;
+    }
+    if (!iso->east) {
+        return stamp(iso->at);
+    }
+    const std::optional<Moment> local = toLocal(iso->at, *iso->east);
+    return local && isValid(*local) ? std::optional(stamp(*local)) : std::nullopt;
+}
+
+std::optional<std::int64_t> TimeText::toMilliseconds(std::string_view text) {
+    constexpr std::int64_t second = 1000;
+    if (isStamp(text)) {
+        const std::optional<Moment> at = momentOf(text);
+        return at ? std::optional(localSecondsOf(*at) * second) : std::nullopt;
+    }
+    const std::optional<Iso> iso = parseIso(text);
+    if (!iso) {
+        return std::nullopt;
+    }
+    const std::time_t seconds =
+        iso->east ? secondsOf(iso->at, *iso->east) : localSecondsOf(iso->at);
+    return seconds * second + fractionOf(text);
 }

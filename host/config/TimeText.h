@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_TIME_TEXT_H
 #define ZRM_HOST_TIME_TEXT_H
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -13,6 +14,9 @@ public:
     /// dropped), local or with "Z" or an offset behind it. None when it is neither, or before
     /// 1900 or after 2099. Any thread.
     static std::optional<std::string> toStamp(std::string_view text);
+
+    /// The same time in milliseconds since 1970-01-01 UTC, with its fraction. Any thread.
+    static std::optional<std::int64_t> toMilliseconds(std::string_view text);
 };
 
 #endif

@@ -1,7 +1,7 @@
 #include "host/events/EventJson.h"
 
+#include "host/events/LogPath.h"
 #include "host/events/RowJson.h"
-#include "host/events/RowText.h"
 #include "host/framework/UtcTime.h"
 
 #include <charconv>
@@ -33,19 +33,6 @@ void EventJson::append(std::string& text, const Event& event) const {
     text += '}';
 }
 
-void EventJson::appendColumn(std::string& text, const Event& event, std::string_view name) const {
-    if (const RowColumn* const column = m_layout.find(name)) {
-        std::string room;
-        text += RowText::of(*column, event.row, room);
-    }
-}
-
 void EventJson::appendLog(std::string& text, const Event& event) const {
-    const std::size_t before = text.size();
-    appendColumn(text, event, "ULOGPATH");
-    appendColumn(text, event, "ULOGNAME");
-    if (text.size() == before) {
-        appendColumn(text, event, "LOGPATH");
-        appendColumn(text, event, "LOGNAME");
-    }
+    LogPath::append(text, m_layout, event.row);
 }

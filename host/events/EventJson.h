@@ -5,7 +5,6 @@
 #include "host/framework/RowLayout.h"
 
 #include <string>
-#include <string_view>
 
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}. Immutable, so
 /// any thread.
@@ -21,8 +20,6 @@ public:
     void appendLog(std::string& text, const Event& event) const;
 
 private:
-    void appendColumn(std::string& text, const Event& event, std::string_view name) const;
-
     RowLayout m_layout;
 };
 

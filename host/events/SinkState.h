@@ -19,6 +19,7 @@ struct SinkState {
     Condition condition = Condition::STARTING;
     std::uint64_t lag = 0;       ///< events that it has still to get
     std::uint64_t delivered = 0; ///< events that it got since the agent's start
+    std::uint64_t failures = 0;  ///< deliveries that were not whole
     std::string error;           ///< why the last delivery failed; empty when it did not
     std::optional<std::chrono::milliseconds> retryIn; ///< until the next try, while it waits
 

@@ -67,6 +67,7 @@ std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
 void SinkThread::note(std::size_t delivered, bool failed) {
     const std::lock_guard guard(m_mutex);
     m_state.delivered += delivered;
+    m_state.failures += failed ? 1 : 0;
     m_state.condition = failed ? SinkState::Condition::FAILING : SinkState::Condition::UP;
     m_state.error = failed ? m_sink->error() : std::string();
 }

@@ -10,8 +10,11 @@
 
 namespace {
 
+constexpr const char* defaultLevels = "error";
+
 /// Levels that were set. Never destroyed, since a thread may be reading them.
 struct Setting {
+    std::string text;
     TraceLevels levels;
     const Setting* earlier = nullptr;
 };
@@ -32,11 +35,17 @@ std::string TraceControl::configure(const std::string& text) {
     if (std::string error = setting->levels.parse(text); !error.empty()) {
         return error;
     }
+    setting->text = text.empty() ? defaultLevels : text;
     const std::lock_guard guard(g_mutex);
     setting->earlier = g_setting.load();
     g_setting.store(setting.release());
     bumpGeneration();
     return {};
+}
+
+std::string TraceControl::levels() {
+    const Setting* const setting = g_setting.load();
+    return setting != nullptr ? setting->text : defaultLevels;
 }
 
 std::string TraceControl::openFile(const std::string& path) {

@@ -11,6 +11,9 @@ namespace TraceControl {
 /// the given one: then the levels stay as they were, which at start is the errors alone.
 std::string configure(const std::string& text);
 
+/// The text that was given to configure last and holds; "error" at the start.
+std::string levels();
+
 /// Writes the trace to this file from now on, to standard error when the path is empty. The file is
 /// appended to, and made anew when it was moved away. Returns an empty text, or why the file cannot
 /// be opened: then everything stays as it was.

@@ -29,6 +29,9 @@ public:
     /// Reads on in the request. The number of bytes; 0 when the client sends no more in time.
     std::size_t read(char* bytes, std::size_t size);
 
+    /// True when the time for head and body is over.
+    bool isLate() const { return Clock::now() >= m_requestDeadline; }
+
     /// Sends a part of an answer. False when the client is gone or takes too long.
     bool write(std::string_view bytes);
 

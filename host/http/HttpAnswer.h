@@ -14,13 +14,15 @@ using BodyWriter = std::function<bool(std::string_view)>;
 
 /// The answer to a request.
 struct HttpAnswer {
+    using Stream = std::function<void(const BodyWriter&, const std::stop_token&)>;
+
     int status = 200;
     std::string contentType = "application/json";
     std::string body;
     std::vector<std::pair<std::string, std::string>> headers = {}; ///< further ones
     /// In place of `body`, writes one that goes on until the function returns. It returns soon
     /// after the token asks for it, and runs on the connection's own thread.
-    std::function<void(const BodyWriter&, std::stop_token)> stream = {};
+    Stream stream = {};
 
     /// An answer of status 200 with a JSON text.
     static HttpAnswer json(std::string text) { return {200, "application/json", std::move(text)}; }

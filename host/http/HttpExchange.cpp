@@ -65,7 +65,8 @@ void readFraming(const httplib::Request& request, IncomingRequest& incoming) {
     const std::string coding = request.get_header_value("Transfer-Encoding");
     std::size_t size = 0;
     const char* const end = length.data() + length.size();
-    const bool isNumber = std::from_chars(length.data(), end, size).ptr == end;
+    const auto [stop, error] = std::from_chars(length.data(), end, size);
+    const bool isNumber = error == std::errc() && stop == end;
     if (request.get_header_value_count("Host") > 1) {
         incoming.problem = "the Host header comes more than once";
     } else if (!coding.empty() && (!length.empty() || coding != "chunked")) {
@@ -128,6 +129,8 @@ HttpExchange::Engine::Engine(RequestDispatcher& dispatcher, std::stop_token stop
     : m_dispatcher(dispatcher), m_stop(std::move(stop)) {
     svr_sock_ = 0; // the library takes no socket for a server that is stopping
     set_payload_max_length(RequestDispatcher::largestBody + 1);
+    set_keep_alive_timeout(15); // for the header that tells the client
+    set_keep_alive_max_count(HttpExchange::requestsPerConnection);
     set_default_headers({{"Cache-Control", "no-store"}, {"X-Content-Type-Options", "nosniff"}});
     set_pre_routing_handler([this](const auto& request, auto& response) {
         if (mayHaveBody(request.method)) {
@@ -155,13 +158,23 @@ bool HttpExchange::Engine::mayHaveBody(const std::string& method) {
 }
 
 BodyReader HttpExchange::Engine::readerOf(const httplib::ContentReader& reader) {
-    return [&reader](std::size_t most) -> std::optional<std::string> {
+    return [&reader](std::size_t most) {
         std::string text;
-        current->isBodyRead = reader([&](const char* data, std::size_t size) {
+        Exchange& exchange = *current;
+        exchange.isBodyRead = reader([&](const char* data, std::size_t size) {
             text.append(data, size);
             return text.size() <= most;
         });
-        return current->isBodyRead ? std::optional(std::move(text)) : std::nullopt;
+        if (text.size() > most) {
+            throw RequestDispatcher::tooLong();
+        }
+        if (!exchange.isBodyRead && exchange.connection.isLate()) {
+            throw RequestRefused(408, "the request did not come within 10 s", "body");
+        }
+        if (!exchange.isBodyRead) {
+            throw RequestRefused(400, "the body did not come whole", "body");
+        }
+        return text;
     };
 }
 
@@ -202,9 +215,7 @@ void HttpExchange::Engine::writeStream(HttpAnswer answer, httplib::Response& res
             const BodyWriter writer = [&](std::string_view text) {
                 return text.empty() ? !connection.isGone() : sink.write(text.data(), text.size());
             };
-            if (const ActiveRequests::Guard active(m_dispatcher.active()); active) {
-                stream(writer, m_stop);
-            }
+            m_dispatcher.stream(stream, writer, m_stop);
             sink.done();
             return true;
         });

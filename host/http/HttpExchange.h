@@ -4,6 +4,7 @@
 #include "host/http/ClientConnection.h"
 #include "host/http/RequestDispatcher.h"
 
+#include <cstddef>
 #include <memory>
 #include <stop_token>
 
@@ -11,6 +12,9 @@
 /// which speaks HTTP. Any thread, one per connection.
 class HttpExchange {
 public:
+    /// So many requests are served over one connection.
+    static constexpr std::size_t requestsPerConnection = 1000;
+
     /// `dispatcher` outlives the object. Streams end when `stop` asks for it.
     HttpExchange(RequestDispatcher& dispatcher, std::stop_token stop);
     ~HttpExchange();

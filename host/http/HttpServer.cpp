@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "host/http/ClientConnection.h"
 #include "host/http/DescriptorRoom.h"
+#include "host/http/TlsSocket.h"
 
 #include <system_error>
 #include <utility>
@@ -17,7 +18,6 @@ using namespace std::chrono_literals;
 TRC1_Anchor anchor{"HttpServer.cpp"};
 
 constexpr std::size_t mostConnections = 2048;
-constexpr std::size_t requestsPerConnection = 1000;
 constexpr auto openTime = 10s; ///< for what goes before the first request
 
 } // namespace
@@ -29,7 +29,8 @@ HttpServer::~HttpServer() {
     stop(Clock::time_point::max());
 }
 
-std::string HttpServer::start(const ListenAddress& address, ApiToken token) {
+std::string HttpServer::start(const ListenAddress& address, ApiToken token,
+                              std::shared_ptr<const TlsContext> tls) {
     TraceScope trace(anchor);
     if (!m_stop.isUsable()) {
         return "cannot make a pipe";
@@ -41,7 +42,8 @@ std::string HttpServer::start(const ListenAddress& address, ApiToken token) {
     const DescriptorRoom room = DescriptorRoom::make(mostConnections);
     m_mostConnections = room.count;
     m_lowestDescriptor = room.lowest;
-    m_dispatcher.setGuard(RequestGuard({address.host, port()}, std::move(token)));
+    m_tls = std::move(tls);
+    m_dispatcher.setGuard(RequestGuard({address.host, port()}, std::move(token), m_tls));
     try {
         m_acceptor = std::thread([this] { acceptClients(); });
     } catch (const std::system_error& error) {
@@ -78,13 +80,20 @@ std::chrono::milliseconds HttpServer::idleTime() const {
     return m_threads.count() * 4 > m_mostConnections * 3 ? 1s : 15s;
 }
 
+std::unique_ptr<ClientSocket> HttpServer::socketFor(int fd) const {
+    if (m_tls != nullptr) {
+        return std::make_unique<TlsSocket>(fd, m_stop, m_tls);
+    }
+    return std::make_unique<ClientSocket>(fd, m_stop);
+}
+
 void HttpServer::serve(int fd) {
-    ClientSocket socket(fd, m_stop);
-    if (!socket.open(Clock::now() + openTime)) {
+    const std::unique_ptr<ClientSocket> socket = socketFor(fd);
+    if (!socket->open(Clock::now() + openTime)) {
         return;
     }
-    ClientConnection connection(socket);
-    for (std::size_t number = 0; number < requestsPerConnection; ++number) {
+    ClientConnection connection(*socket);
+    for (std::size_t number = 0; number < HttpExchange::requestsPerConnection; ++number) {
         const ClientConnection::Head head = connection.readHead(idleTime());
         if (head == ClientConnection::NONE) {
             return;
@@ -101,7 +110,7 @@ void HttpServer::serve(int fd) {
             break;
         }
     }
-    socket.linger();
+    socket->linger();
 }
 
 void HttpServer::stop(Clock::time_point limit) {

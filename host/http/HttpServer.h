@@ -9,10 +9,12 @@
 #include "host/http/RequestDispatcher.h"
 #include "host/http/Router.h"
 #include "host/http/StopSignal.h"
+#include "host/http/TlsContext.h"
 
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <stop_token>
 #include <string>
 #include <thread>
@@ -30,12 +32,17 @@ public:
     /// Stops the server and waits for its threads.
     ~HttpServer();
 
-    /// Begins to listen and to serve, on threads of its own. Returns what is wrong, empty when
-    /// nothing is.
-    std::string start(const ListenAddress& address, ApiToken token);
+    /// Begins to listen and to serve, on threads of its own; under TLS when there is a certificate.
+    /// Returns what is wrong, empty when nothing is.
+    std::string start(const ListenAddress& address, ApiToken token,
+                      std::shared_ptr<const TlsContext> tls = nullptr);
 
     /// The port at which it listens.
     std::uint16_t port() const noexcept { return m_listen.port(); }
+
+    /// What was answered so far, and how many connections are open. Any thread.
+    const RequestStatistics& statistics() const noexcept { return m_dispatcher.statistics(); }
+    std::size_t connections() const { return m_threads.count(); }
 
     /// Ends the serving: requests under way are answered first, streams end. At the limit it
     /// returns although a client is still being served; no request is answered from then on. Any
@@ -49,6 +56,7 @@ public:
 private:
     void acceptClients();
     void accept(int fd);
+    std::unique_ptr<ClientSocket> socketFor(int fd) const;
     void serve(int fd);
     std::chrono::milliseconds idleTime() const;
 
@@ -57,6 +65,7 @@ private:
     std::stop_source m_streams; ///< asked to stop with the signal
     HttpExchange m_exchange;
     ListenSocket m_listen;
+    std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
     std::size_t m_mostConnections = 0;
     int m_lowestDescriptor = 0; ///< of connections
     std::thread m_acceptor;

@@ -20,7 +20,8 @@ struct IncomingRequest {
     std::string problem;               ///< what makes the request ambiguous; empty when nothing
 };
 
-/// Reads the body of a request, at most so many bytes; none when it is longer, or breaks off.
-using BodyReader = std::function<std::optional<std::string>(std::size_t most)>;
+/// Reads the body of a request, at most so many bytes. Throws RequestRefused when it is longer, or
+/// does not come whole.
+using BodyReader = std::function<std::string(std::size_t most)>;
 
 #endif

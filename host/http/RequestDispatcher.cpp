@@ -30,35 +30,35 @@ void decodeQuery(IncomingRequest& incoming) {
 }
 
 void readBodyOf(IncomingRequest& incoming, const BodyReader& readBody) {
+    constexpr std::size_t most = RequestDispatcher::largestBody;
     if (!incoming.hasBody) {
         return;
     }
-    constexpr std::size_t most = RequestDispatcher::largestBody;
-    std::optional<std::string> body =
-        incoming.length.value_or(0) > most ? std::nullopt : readBody(most);
-    if (!body) {
-        throw RequestRefused(
-            413, "the body has more than " + std::to_string(most) + " bytes, or did not come whole",
-            "body");
+    if (incoming.length.value_or(0) > most) {
+        throw RequestDispatcher::tooLong();
     }
-    if (!body->empty() && !incoming.contentType.starts_with("application/json")) {
+    if (!incoming.contentType.starts_with("application/json")) {
         throw RequestRefused(415, "send the body as application/json", "Content-Type");
     }
-    incoming.request.body = std::move(*body);
+    incoming.request.body = readBody(most);
 }
 
-/// Why no handler answers.
-void refuseUnrouted(const Router::Match& match, HttpAnswer& answer) {
+/// The answer to a request that has no handler.
+HttpAnswer unrouted(const Router::Match& match) {
     if (match.pattern.empty()) {
-        answer = RequestDispatcher::answerOf({404, "there is nothing at this path", ""});
-        return;
+        throw RequestRefused(404, "there is nothing at this path", "");
     }
-    answer = RequestDispatcher::answerOf(
+    HttpAnswer answer = RequestDispatcher::answerOf(
         {405, "this path answers " + match.allow + ", not this method", ""});
     answer.headers.emplace_back("Allow", match.allow);
+    return answer;
 }
 
 } // namespace
+
+RequestRefused RequestDispatcher::tooLong() {
+    return {413, "the body has more than " + std::to_string(largestBody) + " bytes", "body"};
+}
 
 HttpAnswer RequestDispatcher::answerOf(const Problem& problem) {
     HttpAnswer answer{problem.status, "application/problem+json", problem.json()};
@@ -70,8 +70,19 @@ HttpAnswer RequestDispatcher::answerOf(const Problem& problem) {
 
 HttpAnswer RequestDispatcher::answer(IncomingRequest incoming, const BodyReader& readBody) {
     TraceScope trace(anchor);
+    const auto begin = std::chrono::steady_clock::now();
+    const std::string method = incoming.request.method;
+    std::string route;
+    HttpAnswer answer = answerOrProblem(incoming, readBody, route);
+    m_statistics.count(method, route, answer.status, std::chrono::steady_clock::now() - begin);
+    return answer;
+}
+
+HttpAnswer RequestDispatcher::answerOrProblem(IncomingRequest& incoming, const BodyReader& readBody,
+                                              std::string& route) {
+    TraceScope trace(anchor);
     try {
-        return tryAnswer(incoming, readBody);
+        return tryAnswer(incoming, readBody, route);
     } catch (const RequestRefused& refused) {
         const Problem& problem = refused.problem();
         trace.detail()("Request for %s refused: %s.", incoming.request.path.c_str(),
@@ -83,20 +94,20 @@ HttpAnswer RequestDispatcher::answer(IncomingRequest incoming, const BodyReader&
     return answerOf({500, "the request failed", ""});
 }
 
-HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyReader& readBody) {
+HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyReader& readBody,
+                                        std::string& route) {
     HttpRequest& request = incoming.request;
     if (!incoming.problem.empty()) {
         throw RequestRefused(400, incoming.problem, "");
     }
     const Router::Match match = m_router.match(request.method, request.path);
+    route = match.pattern;
     const bool isPublic = match.handler != nullptr && match.access == Router::PUBLIC;
     if (std::optional<Problem> problem = m_guard->refuse(incoming.headers, isPublic)) {
         throw RequestRefused(std::move(*problem));
     }
     if (match.handler == nullptr) {
-        HttpAnswer answer;
-        refuseUnrouted(match, answer);
-        return answer;
+        return unrouted(match);
     }
     decodeCaptures(match, request);
     decodeQuery(incoming);
@@ -109,4 +120,18 @@ HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyRea
         request.method = "GET";
     }
     return (*match.handler)(request);
+}
+
+void RequestDispatcher::stream(const HttpAnswer::Stream& stream, const BodyWriter& write,
+                               const std::stop_token& stop) {
+    TraceScope trace(anchor);
+    const ActiveRequests::Guard active(m_active);
+    if (!active) {
+        return;
+    }
+    try {
+        stream(write, stop);
+    } catch (const std::exception& exception) {
+        trace.error()("A stream broke off: %s", exception.what());
+    }
 }

@@ -5,11 +5,14 @@
 #include "host/http/HttpAnswer.h"
 #include "host/http/IncomingRequest.h"
 #include "host/http/RequestGuard.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
 
 #include <chrono>
 #include <cstddef>
 #include <optional>
+#include <stop_token>
 #include <string>
 #include <utility>
 
@@ -30,21 +33,31 @@ public:
     /// Throws nothing.
     HttpAnswer answer(IncomingRequest incoming, const BodyReader& readBody);
 
+    /// What refuses a body that is too long.
+    static RequestRefused tooLong();
+
     /// The answer that is a problem document.
     static HttpAnswer answerOf(const Problem& problem);
 
-    /// For streams: while it lives, the end of the process waits.
-    ActiveRequests& active() noexcept { return m_active; }
+    /// Lets the stream of an answer write until its end. Throws nothing.
+    void stream(const HttpAnswer::Stream& stream, const BodyWriter& write,
+                const std::stop_token& stop);
 
     /// Lets no more requests be answered and waits for those under way, at most until the limit.
     void close(std::chrono::steady_clock::time_point limit) { m_active.close(limit); }
 
+    /// What was answered so far.
+    const RequestStatistics& statistics() const noexcept { return m_statistics; }
+
 private:
-    HttpAnswer tryAnswer(IncomingRequest& incoming, const BodyReader& readBody);
+    HttpAnswer answerOrProblem(IncomingRequest& incoming, const BodyReader& readBody,
+                               std::string& route);
+    HttpAnswer tryAnswer(IncomingRequest& incoming, const BodyReader& readBody, std::string& route);
 
     const Router& m_router;
     std::optional<RequestGuard> m_guard;
     ActiveRequests m_active;
+    RequestStatistics m_statistics;
 };
 
 #endif

@@ -5,7 +5,9 @@
 
 namespace {
 
-constexpr std::uint16_t httpPort = 80; ///< the port that an authority may leave out
+// The ports that an authority may leave out.
+constexpr std::uint16_t httpPort = 80;
+constexpr std::uint16_t httpsPort = 443;
 
 std::string lowerCase(std::string_view text) {
     std::string lower(text);
@@ -19,8 +21,9 @@ std::string lowerCase(std::string_view text) {
 
 } // namespace
 
-RequestGuard::RequestGuard(const ListenAddress& address, ApiToken token)
-    : m_token(std::move(token)) {
+RequestGuard::RequestGuard(const ListenAddress& address, ApiToken token,
+                           std::shared_ptr<const TlsContext> tls)
+    : m_token(std::move(token)), m_tls(std::move(tls)), m_port(address.port) {
     std::vector<std::string> hosts = {address.host, "localhost"};
     if (address.isLoopback()) {
         hosts.insert(hosts.end(), {"127.0.0.1", "::1"});
@@ -28,7 +31,7 @@ RequestGuard::RequestGuard(const ListenAddress& address, ApiToken token)
     for (const std::string& host : hosts) {
         const std::string authority = lowerCase(ListenAddress{host, address.port}.text());
         m_authorities.push_back(authority);
-        if (address.port == httpPort) {
+        if (address.port == (m_tls == nullptr ? httpPort : httpsPort)) {
             m_authorities.push_back(authority.substr(0, authority.rfind(':')));
         }
     }
@@ -36,7 +39,19 @@ RequestGuard::RequestGuard(const ListenAddress& address, ApiToken token)
 
 bool RequestGuard::isOurs(std::string_view authority) const {
     return std::find(m_authorities.begin(), m_authorities.end(), lowerCase(authority)) !=
-           m_authorities.end();
+               m_authorities.end() ||
+           isInCertificate(authority);
+}
+
+bool RequestGuard::isInCertificate(std::string_view authority) const {
+    if (m_tls == nullptr) {
+        return false;
+    }
+    std::optional<ListenAddress> named = ListenAddress::parse(authority);
+    if (!named && m_port == httpsPort) {
+        named = ListenAddress::parse(std::string(authority) + ":443");
+    }
+    return named && named->port == m_port && m_tls->isFor(named->host);
 }
 
 std::optional<Problem> RequestGuard::refuse(const Headers& headers, bool isPublic) const {
@@ -44,7 +59,7 @@ std::optional<Problem> RequestGuard::refuse(const Headers& headers, bool isPubli
         return Problem{421, "the Host header must be the address at which the agent listens",
                        "Host"};
     }
-    constexpr std::string_view scheme = "http://";
+    const std::string_view scheme = m_tls == nullptr ? "http://" : "https://";
     if (headers.origin && (!headers.origin->starts_with(scheme) ||
                            !isOurs(std::string_view(*headers.origin).substr(scheme.size())))) {
         return Problem{403, "requests of other origins are refused", "Origin"};

@@ -4,7 +4,10 @@
 #include "host/http/ApiToken.h"
 #include "host/http/ListenAddress.h"
 #include "host/http/Problem.h"
+#include "host/http/TlsContext.h"
 
+#include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -22,18 +25,23 @@ public:
         std::optional<std::string> authorization;
     };
 
-    /// `address` is where the server listens, with the port that it really has.
-    RequestGuard(const ListenAddress& address, ApiToken token);
+    /// `address` is where the server listens, with the port that it really has. Under TLS the
+    /// names of the certificate are names of the server too.
+    RequestGuard(const ListenAddress& address, ApiToken token,
+                 std::shared_ptr<const TlsContext> tls = nullptr);
 
     /// Why the request is refused; none when it may pass. `isPublic`: needs no token.
     std::optional<Problem> refuse(const Headers& headers, bool isPublic) const;
 
 private:
     bool isOurs(std::string_view authority) const;
+    bool isInCertificate(std::string_view authority) const;
 
     std::vector<std::string>
         m_authorities; ///< HOST:PORT as the Host header may have it, lower case
     ApiToken m_token;
+    std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
+    std::uint16_t m_port;
 };
 
 #endif

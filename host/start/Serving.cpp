@@ -5,9 +5,20 @@
 #include "host/analysis/AnalysisResource.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
+#include "host/http/AgentResource.h"
 #include "host/http/ApiToken.h"
+#include "host/http/EventStream.h"
+#include "host/http/EventsResource.h"
 #include "host/http/HealthResource.h"
+#include "host/http/LogsResource.h"
+#include "host/http/ReportResource.h"
 #include "host/http/SampleResource.h"
+#include "host/metrics/DeliveryMetrics.h"
+#include "host/metrics/HttpMetrics.h"
+#include "host/metrics/LogMetrics.h"
+#include "host/metrics/MetricsResource.h"
+#include "host/metrics/ProcessMetrics.h"
+#include "host/metrics/SituationMetrics.h"
 #include "host/situations/SituationsResource.h"
 #include "host/start/Say.h"
 
@@ -60,11 +71,28 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
 
 void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<HealthResource>());
+    addResource(std::make_unique<AgentResource>(m_delivery));
+    addResource(std::make_unique<LogsResource>());
     addResource(std::make_unique<SampleResource>(m_sampler));
+    addResource(std::make_unique<ReportResource>(m_sampler));
+    addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
-    auto analysis = std::make_unique<AnalysisResource>(m_situations, entries, nullptr);
+    auto analysis = std::make_unique<AnalysisResource>(m_situations, entries, m_delivery.history());
     m_analysis = analysis.get();
     addResource(std::move(analysis));
+    auto stream = std::make_unique<EventStream>(m_delivery.history());
+    addMetrics(*stream);
+    addResource(std::move(stream));
+}
+
+void Serving::addMetrics(const EventStream& stream) {
+    auto metrics = std::make_unique<MetricsResource>();
+    metrics->add(std::make_unique<ProcessMetrics>());
+    metrics->add(std::make_unique<LogMetrics>());
+    metrics->add(std::make_unique<SituationMetrics>(m_situations));
+    metrics->add(std::make_unique<DeliveryMetrics>(m_delivery));
+    metrics->add(std::make_unique<HttpMetrics>(m_http, stream));
+    addResource(std::move(metrics));
 }
 
 void Serving::addResource(std::unique_ptr<Resource> resource) {
@@ -89,14 +117,27 @@ void Serving::startHttp(const HostConfig& config) {
     if (const auto* const noToken = std::get_if<std::string>(&token)) {
         problem = *noToken;
     } else {
-        problem = m_http.start(*config.http.listen, std::move(std::get<ApiToken>(token)));
+        problem = startHttp(config.http, std::move(std::get<ApiToken>(token)));
     }
     if (!problem.empty()) {
         say("HTTP is off: %s", problem.c_str());
         return;
     }
     const ListenAddress address{config.http.listen->host, m_http.port()};
-    say("HTTP at http://%s/, token in %s", address.text().c_str(), path.c_str());
+    say("HTTP at %s://%s/, token in %s", config.http.certificate.empty() ? "http" : "https",
+        address.text().c_str(), path.c_str());
+}
+
+std::string Serving::startHttp(const HttpConfig& config, ApiToken token) {
+    std::shared_ptr<const TlsContext> tls;
+    if (!config.certificate.empty()) {
+        auto loaded = TlsContext::load(config.certificate, config.key);
+        if (std::string* const problem = std::get_if<std::string>(&loaded)) {
+            return std::move(*problem);
+        }
+        tls = std::get<std::shared_ptr<const TlsContext>>(std::move(loaded));
+    }
+    return m_http.start(*config.listen, std::move(token), std::move(tls));
 }
 
 void Serving::abandonHttp(Clock::time_point limit) {

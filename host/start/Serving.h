@@ -14,6 +14,7 @@
 #include <vector>
 
 class AnalysisResource;
+class EventStream;
 class TableManager;
 
 /// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
@@ -56,7 +57,9 @@ private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
             const RowLayout& layout);
 
+    std::string startHttp(const HttpConfig& config, ApiToken token);
     void addResources(TableManager& entries);
+    void addMetrics(const EventStream& stream);
     void addResource(std::unique_ptr<Resource> resource);
 
     Delivery m_delivery;

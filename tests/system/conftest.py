@@ -120,6 +120,7 @@ class Agent:
         self.sink = "-"
         self.more_sinks = []
         self.listen = ""
+        self.http_keys = {}
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -157,6 +158,7 @@ class Agent:
         text = f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
         text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
+        text += "".join(f"{k} = {json.dumps(str(v))}\n" for k, v in self.http_keys.items())
         if self.sink is not None:
             text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
         for sink in self.more_sinks:

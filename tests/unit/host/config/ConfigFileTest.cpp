@@ -131,7 +131,8 @@ keep_days = 30
             "sink, situation",
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
-            "zrm.toml:5: http.port: unknown key; the keys here are listen, token_file",
+            "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
+            "key, token_file",
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period",
@@ -205,9 +206,35 @@ TEST(ConfigFile, RefusesToListenForOtherMachines) {
     for (const std::string address : {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(refused("http.listen = \"" + address + "\""),
                     ElementsAre("zrm.toml:1: http.listen: '" + address +
-                                "' can be reached from other machines; write a loopback address: "
-                                "127.0.0.1, [::1] or localhost"));
+                                "' can be reached from other machines; write a loopback address "
+                                "(127.0.0.1, [::1] or localhost), or add certificate and key, so "
+                                "that TLS is spoken"));
     }
+}
+
+TEST(ConfigFile, ListensForOtherMachinesUnderTls) {
+    const auto result = ConfigFile::parse("[http]\nlisten = \"0.0.0.0:7186\"\n"
+                                          "certificate = \"/etc/zrm/cert.pem\"\n"
+                                          "key = \"/etc/zrm/key.pem\"\n",
+                                          "zrm.toml");
+    ASSERT_TRUE(std::holds_alternative<HostConfig>(result));
+    const HttpConfig& http = std::get<HostConfig>(result).http;
+    EXPECT_EQ(http.listen->text(), "0.0.0.0:7186");
+    EXPECT_EQ(http.certificate, "/etc/zrm/cert.pem");
+    EXPECT_EQ(http.key, "/etc/zrm/key.pem");
+}
+
+TEST(ConfigFile, RefusesHalfOfACertificate) {
+    EXPECT_THAT(refused("http.certificate = \"/c\""),
+                ElementsAre("zrm.toml:1: http.certificate: stands alone; give both certificate "
+                            "and key, or neither"));
+    EXPECT_THAT(refused("http.key = \"/k\""),
+                ElementsAre("zrm.toml:1: http.key: stands alone; give both certificate and key, or "
+                            "neither"));
+    EXPECT_THAT(refused("http = {certificate = \"c\", key = \"k\"}"),
+                ElementsAre("zrm.toml:1: http.certificate: 'c' is no absolute path; begin it with "
+                            "'/'",
+                            "zrm.toml:1: http.key: 'k' is no absolute path; begin it with '/'"));
 }
 
 TEST(ConfigFile, RefusesSituationsWithoutANameOfTheirOwn) {

@@ -100,4 +100,22 @@ TEST(TimeText, RefusesEverythingElse) {
     }
 }
 
+TEST(TimeText, GivesMilliseconds) {
+    const TimeZone zone("CET-1CEST");
+    EXPECT_EQ(TimeText::toMilliseconds("1970-01-01T00:00:00Z"), 0);
+    EXPECT_EQ(TimeText::toMilliseconds("2026-11-20T07:03:09.412Z"), 1795158189412);
+    EXPECT_EQ(TimeText::toMilliseconds("2026-11-20T08:03:09.4"), 1795158189400);
+    EXPECT_EQ(TimeText::toMilliseconds("2026-11-20T08:03:09.41299+01:00"), 1795158189412);
+    EXPECT_EQ(TimeText::toMilliseconds("1261120080309000"), 1795158189000);
+    EXPECT_EQ(TimeText::toMilliseconds("2026-07-01"), 1782856800000) << "summer time";
+    // An hour that comes twice is told apart by its zone.
+    EXPECT_EQ(TimeText::toMilliseconds("2026-10-25T01:30:00Z").value() -
+                  TimeText::toMilliseconds("2026-10-25T00:30:00Z").value(),
+              3'600'000);
+    for (const char* const none : {"", "soon", "0000000000000000", "1261320080309000",
+                                   "2026-02-30", "2026-11-20T07:03:09.412Zx"}) {
+        EXPECT_EQ(TimeText::toMilliseconds(none), std::nullopt) << none;
+    }
+}
+
 } // namespace

@@ -1,0 +1,141 @@
+#include "host/http/AgentResource.h"
+
+#include "agent/TraceScope.h"
+#include "agent/framework/agent_calls.h"
+#include "host/config/Columns.h"
+#include "host/config/ConditionBuilder.h"
+#include "host/events/Delivery.h"
+#include "host/framework/TraceControl.h"
+#include "host/framework/UtcTime.h"
+#include "host/history/HistoryReader.h"
+#include "host/http/JsonFields.h"
+#include "host/http/QueryFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <chrono>
+#include <string>
+
+#include <nlohmann/json.hpp>
+#include <signal.h>
+#include <unistd.h>
+
+namespace {
+
+using nlohmann::ordered_json;
+
+TRC1_Anchor anchor{"AgentResource.cpp"};
+
+std::int64_t now() {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(
+               std::chrono::system_clock::now().time_since_epoch())
+        .count();
+}
+
+std::string node() {
+    char name[128] = "";
+    DetermineLocalHost(name, sizeof name);
+    return name;
+}
+
+ordered_json textOrNull(const std::string& text) {
+    return text.empty() ? ordered_json() : ordered_json(text);
+}
+
+/// Texts may quote what the system or a log said: bytes that are no UTF-8 are replaced.
+HttpAnswer answerWith(const ordered_json& document) {
+    return HttpAnswer::json(document.dump(-1, ' ', false, ordered_json::error_handler_t::replace));
+}
+
+ordered_json historyOf(Delivery& delivery) {
+    HistoryReader* const reader = delivery.history();
+    const HistoryState state = reader == nullptr ? HistoryState() : reader->state();
+    return {{"enabled", reader != nullptr}, {"events", state.events},
+            {"oldest", state.oldest},       {"newest", state.newest},
+            {"bytes", state.bytes},         {"problem", textOrNull(state.problem)}};
+}
+
+ordered_json queueOf(const Delivery& delivery) {
+    const QueueState state = delivery.queueState();
+    return {{"size", state.size},
+            {"capacity", state.capacity},
+            {"waits", state.waits},
+            {"waited_seconds", std::chrono::duration<double>(state.waited).count()}};
+}
+
+ordered_json sinksOf(const Delivery& delivery) {
+    ordered_json sinks = ordered_json::array();
+    for (const SinkState& state : delivery.sinkStates()) {
+        ordered_json sink = {{"name", state.name},
+                             {"type", state.type},
+                             {"state", state.conditionName()},
+                             {"lag", state.lag},
+                             {"delivered", state.delivered},
+                             {"error", textOrNull(state.error)}};
+        sink["retry_in_seconds"] = nullptr;
+        if (state.retryIn) {
+            sink["retry_in_seconds"] = std::chrono::duration<double>(*state.retryIn).count();
+        }
+        sinks.push_back(std::move(sink));
+    }
+    return sinks;
+}
+
+HttpAnswer setTrace(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields fields(request.body);
+    const std::string levels = fields.text("levels");
+    fields.refuseUnknown();
+    if (const std::string problem = TraceControl::configure(levels); !problem.empty()) {
+        fields.refuse("levels", problem);
+    }
+    trace.always()("Trace levels are now \"%s\".", TraceControl::levels().c_str());
+    return answerWith({{"levels", TraceControl::levels()}});
+}
+
+HttpAnswer columns(const HttpRequest& request) {
+    QueryFields(request).refuseUnknown();
+    ordered_json list = ordered_json::array();
+    for (const Column& column : columnsOf("RMLOGENT")) {
+        const char* const type = column.isNumber ? "number" : column.isTime ? "time" : "text";
+        list.push_back({{"name", column.name}, {"type", type}, {"width", column.width}});
+    }
+    return answerWith(
+        {{"columns", std::move(list)}, {"operators", ConditionBuilder::operatorNames()}});
+}
+
+/// The agent's log manager waits for this signal, which every thread blocks.
+HttpAnswer refresh(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields(request.body).refuseUnknown();
+    if (kill(getpid(), SIGHUP) != 0) {
+        throw RequestRefused(500, "the agent cannot be asked", "");
+    }
+    HttpAnswer answer = answerWith({{"status", "asked"}});
+    answer.status = 202;
+    return answer;
+}
+
+} // namespace
+
+AgentResource::AgentResource(Delivery& delivery) : m_delivery(delivery), m_started(now()) {}
+
+void AgentResource::addRoutes(Router& router) {
+    router.add("GET", "/api/v1/status",
+               [this](const HttpRequest& request) { return status(request); });
+    router.add("PUT", "/api/v1/trace", setTrace);
+    router.add("GET", "/api/v1/columns", columns);
+    router.add("POST", "/api/v1/refresh", refresh);
+}
+
+HttpAnswer AgentResource::status(const HttpRequest& request) {
+    QueryFields(request).refuseUnknown();
+    return answerWith({{"version", ZRM_VERSION},
+                       {"node", node()},
+                       {"started", UtcTime::text(m_started)},
+                       {"time", UtcTime::text(now())},
+                       {"history", historyOf(m_delivery)},
+                       {"queue", queueOf(m_delivery)},
+                       {"sinks", sinksOf(m_delivery)},
+                       {"trace", TraceControl::levels()}});
+}

@@ -1,0 +1,28 @@
+#ifndef ZRM_HOST_AGENT_RESOURCE_H
+#define ZRM_HOST_AGENT_RESOURCE_H
+
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
+#include "host/http/Resource.h"
+
+#include <cstdint>
+
+class Delivery;
+
+/// The agent as a whole: `GET /api/v1/status`, `PUT /api/v1/trace`, `GET /api/v1/columns` and
+/// `POST /api/v1/refresh`.
+class AgentResource : public Resource {
+public:
+    /// `delivery` outlives the object.
+    explicit AgentResource(Delivery& delivery);
+
+    void addRoutes(Router& router) override;
+
+private:
+    HttpAnswer status(const HttpRequest& request);
+
+    Delivery& m_delivery;
+    const std::int64_t m_started; ///< milliseconds since 1970-01-01 UTC
+};
+
+#endif

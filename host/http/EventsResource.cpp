@@ -1,0 +1,168 @@
+#include "host/http/EventsResource.h"
+
+#include "agent/TraceScope.h"
+#include "host/events/RowJson.h"
+#include "host/framework/UtcTime.h"
+#include "host/history/HistoryReader.h"
+#include "host/http/EventQuery.h"
+#include "host/http/QueryFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <algorithm>
+#include <charconv>
+#include <chrono>
+#include <limits>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace {
+
+TRC1_Anchor anchor{"EventsResource.cpp"};
+
+/// The largest id that the history can hold.
+constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max();
+constexpr std::uint64_t defaultEvents = 100;
+constexpr std::uint64_t mostEvents = 1000;
+constexpr std::int64_t minute = 60'000; ///< milliseconds
+constexpr std::int64_t day = 24 * 60 * minute;
+constexpr std::int64_t mostSteps = 2 * 24 * 60;
+
+/// Does what reads the history; what the history says when it cannot be read is the answer.
+template <typename Read> auto reading(const Read& read) {
+    try {
+        return read();
+    } catch (const HistoryError& error) {
+        throw RequestRefused(503, std::string("the history cannot be read: ") + error.what(), "");
+    }
+}
+
+bool isNewestFirst(QueryFields& query) {
+    const std::string order = query.text("order").value_or("desc");
+    if (order != "asc" && order != "desc") {
+        throw RequestRefused(400, "write asc or desc", "order");
+    }
+    return order == "desc";
+}
+
+EventFilter filterOf(const HttpRequest& request) {
+    QueryFields query(request);
+    EventFilter filter;
+    filter.after = query.number("after", 0, mostId).value_or(0);
+    filter.before = query.number("before", 0, mostId);
+    filter.from = query.time("from");
+    filter.to = query.time("to");
+    EventQuery::readKinds(query, filter);
+    filter.limit = query.number("limit", 1, mostEvents).value_or(defaultEvents);
+    filter.newestFirst = isNewestFirst(query);
+    query.refuseUnknown();
+    return filter;
+}
+
+void append(std::string& text, const LogRates::Counts& counts) {
+    text += '[';
+    for (std::size_t at = 0; at < counts.size(); ++at) {
+        text += at == 0 ? "" : ",";
+        text += counts[at] ? std::to_string(*counts[at]) : "null";
+    }
+    text += ']';
+}
+
+/// The window of rates and its steps: milliseconds.
+struct Window {
+    std::int64_t from;
+    std::int64_t to;
+    std::int64_t step;
+};
+
+Window windowOf(const HttpRequest& request) {
+    const auto now = std::chrono::duration_cast<std::chrono::milliseconds>(
+                         std::chrono::system_clock::now().time_since_epoch())
+                         .count();
+    QueryFields query(request);
+    Window window{};
+    window.to = query.time("to").value_or(now);
+    window.from = query.time("from").value_or(window.to - day);
+    window.step = static_cast<std::int64_t>(query.number("step", 60, 86'400).value_or(60)) * 1000;
+    query.refuseUnknown();
+    if (window.step % minute != 0) {
+        throw RequestRefused(400, "write a multiple of 60 seconds", "step");
+    }
+    if (window.from > window.to) {
+        throw RequestRefused(400, "lies before from", "to");
+    }
+    if ((window.to - window.from) / window.step > mostSteps) {
+        throw RequestRefused(400, "the window has more than 2880 steps", "step");
+    }
+    return window;
+}
+
+} // namespace
+
+void EventsResource::addRoutes(Router& router) {
+    router.add("GET", "/api/v1/events",
+               [this](const HttpRequest& request) { return events(request); });
+    router.add("GET", "/api/v1/events/{id}",
+               [this](const HttpRequest& request) { return event(request); });
+    router.add("GET", "/api/v1/rates",
+               [this](const HttpRequest& request) { return rates(request); });
+}
+
+HttpAnswer EventsResource::events(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    EventFilter filter = filterOf(request);
+    const std::size_t limit = filter.limit++; // one more tells whether there are more
+    const std::vector<StoredEvent> found = reading([&] { return history.query(filter); });
+    const HistoryState state = reading([&] { return history.state(); });
+    const std::size_t count = std::min(limit, found.size());
+    std::string text = "{\"events\":[";
+    for (std::size_t at = 0; at < count; ++at) {
+        text += at == 0 ? "" : ",";
+        text += found[at].json;
+    }
+    const std::string next =
+        found.size() > limit ? std::to_string(found[count - 1].id) : std::string("null");
+    return HttpAnswer::json(text + "],\"next\":" + next +
+                            ",\"oldest\":" + std::to_string(state.oldest) +
+                            ",\"newest\":" + std::to_string(state.newest) + "}");
+}
+
+HttpAnswer EventsResource::event(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    QueryFields(request).refuseUnknown();
+    const std::string& text = request.captures.front();
+    std::uint64_t id = 0;
+    const char* const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, id);
+    if (error != std::errc() || stop != end || id > mostId) {
+        throw RequestRefused(404, "an event's id is a whole number", "id");
+    }
+    const std::optional<StoredEvent> event = reading([&] { return history.event(id); });
+    if (!event) {
+        throw RequestRefused(404, "the history does not hold this event", "id");
+    }
+    return HttpAnswer::json(event->json);
+}
+
+HttpAnswer EventsResource::rates(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    const Window window = windowOf(request);
+    const Rates rates = reading([&] { return history.rates(window.from, window.to, window.step); });
+    std::string text = "{\"start\":\"" + UtcTime::text(rates.start) +
+                       "\",\"step\":" + std::to_string(rates.step / 1000) + ",\"logs\":[";
+    for (const LogRates& log : rates.logs) {
+        text += &log == &rates.logs.front() ? "{\"log\":" : ",{\"log\":";
+        RowJson::appendText(text, log.log);
+        text += ",\"entries\":";
+        append(text, log.entries);
+        text += ",\"events\":";
+        append(text, log.events);
+        text += '}';
+    }
+    return HttpAnswer::json(text + "]}");
+}

@@ -1,0 +1,27 @@
+#ifndef ZRM_HOST_EVENTS_RESOURCE_H
+#define ZRM_HOST_EVENTS_RESOURCE_H
+
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
+#include "host/http/Resource.h"
+
+class HistoryReader;
+
+/// What the history holds: `GET /api/v1/events`, `GET /api/v1/events/{id}` and
+/// `GET /api/v1/rates`.
+class EventsResource : public Resource {
+public:
+    /// `history` outlives the object; null when the history is off.
+    explicit EventsResource(HistoryReader* history) : m_history(history) {}
+
+    void addRoutes(Router& router) override;
+
+private:
+    HttpAnswer events(const HttpRequest& request);
+    HttpAnswer event(const HttpRequest& request);
+    HttpAnswer rates(const HttpRequest& request);
+
+    HistoryReader* const m_history;
+};
+
+#endif

@@ -1,0 +1,66 @@
+#include "host/http/LogsResource.h"
+
+#include "agent/TraceScope.h"
+#include "host/config/ConditionBuilder.h"
+#include "host/events/LogPath.h"
+#include "host/events/RowJson.h"
+#include "host/framework/Sample.h"
+#include "host/framework/UtcTime.h"
+#include "host/http/QueryFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <chrono>
+#include <optional>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+namespace {
+
+TRC1_Anchor anchor{"LogsResource.cpp"};
+
+std::string now() {
+    return UtcTime::text(std::chrono::duration_cast<std::chrono::milliseconds>(
+                             std::chrono::system_clock::now().time_since_epoch())
+                             .count());
+}
+
+std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
+    if (!log) {
+        return {};
+    }
+    auto conditions = ConditionBuilder::ofLog(*log);
+    if (const auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
+        throw RequestRefused(400, problem->what + "; " + problem->cure, "log");
+    }
+    return std::get<std::vector<Condition>>(std::move(conditions));
+}
+
+HttpAnswer logs(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    QueryFields query(request);
+    const std::optional<std::string> log = query.text("log");
+    query.refuseUnknown();
+    const std::optional<Sample> sample = Sample::take("RMMONLOG", conditionsOf(log), "HTTP");
+    const std::size_t count = sample ? sample->size() : 0;
+    if (log && count == 0) {
+        throw RequestRefused(404, "the agent does not monitor this log", "log");
+    }
+    std::string text = "{\"logs\":[";
+    for (std::size_t index = 0; index < count; ++index) {
+        text += index == 0 ? "{\"log\":" : ",{\"log\":";
+        RowJson::appendText(text, LogPath::of(sample->layout(), sample->row(index)));
+        text += ",\"row\":";
+        RowJson::append(text, sample->layout(), sample->row(index));
+        text += '}';
+    }
+    return HttpAnswer::json(text + "],\"time\":\"" + now() + "\"}");
+}
+
+} // namespace
+
+void LogsResource::addRoutes(Router& router) {
+    router.add("GET", "/api/v1/logs", logs);
+}

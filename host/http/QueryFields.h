@@ -1,0 +1,40 @@
+#ifndef ZRM_HOST_QUERY_FIELDS_H
+#define ZRM_HOST_QUERY_FIELDS_H
+
+#include "host/http/HttpRequest.h"
+
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <string>
+#include <vector>
+
+/// The parameters of a request's query while they are read. Whatever is wrong is thrown as
+/// RequestRefused, with status 400 and the parameter's name as its field.
+class QueryFields {
+public:
+    /// `request` outlives the object.
+    explicit QueryFields(const HttpRequest& request) : m_query(request.query) {}
+
+    /// The value of a parameter that comes at most once.
+    std::optional<std::string> text(const std::string& name);
+
+    /// Every value of a parameter.
+    std::vector<std::string> texts(const std::string& name);
+
+    /// A whole number within the limits.
+    std::optional<std::uint64_t> number(const std::string& name, std::uint64_t least,
+                                        std::uint64_t most);
+
+    /// A time: milliseconds since 1970-01-01 UTC.
+    std::optional<std::int64_t> time(const std::string& name);
+
+    /// Every parameter that was not asked for is refused. To be called when all were.
+    void refuseUnknown() const;
+
+private:
+    const std::multimap<std::string, std::string>& m_query;
+    std::vector<std::string> m_known; ///< names that were asked for, in that order
+};
+
+#endif

@@ -1,0 +1,52 @@
+#include "host/http/TlsContext.h"
+
+#include <openssl/err.h>
+#include <openssl/ssl.h>
+#include <openssl/x509v3.h>
+
+namespace {
+
+/// What the library says of its last failure.
+std::string because(const std::string& what) {
+    const unsigned long code = ERR_get_error();
+    ERR_clear_error();
+    const char* const reason = ERR_reason_error_string(code);
+    return what + ": " + (reason == nullptr ? "unknown reason" : reason);
+}
+
+} // namespace
+
+TlsContext::~TlsContext() {
+    SSL_CTX_free(m_context);
+}
+
+std::variant<std::shared_ptr<const TlsContext>, std::string>
+TlsContext::load(const std::string& certificate, const std::string& key) {
+    ERR_clear_error();
+    SSL_CTX* const context = SSL_CTX_new(TLS_server_method());
+    if (context == nullptr) {
+        return because("TLS cannot be used");
+    }
+    const std::shared_ptr<const TlsContext> result(new TlsContext(context));
+    SSL_CTX_set_min_proto_version(context, TLS1_2_VERSION);
+    SSL_CTX_set_options(context, SSL_OP_NO_RENEGOTIATION | SSL_OP_CIPHER_SERVER_PREFERENCE);
+    SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
+    // A send that could not go on may be repeated from where its bytes have moved.
+    SSL_CTX_set_mode(context, SSL_MODE_ENABLE_PARTIAL_WRITE | SSL_MODE_ACCEPT_MOVING_WRITE_BUFFER);
+    if (SSL_CTX_use_certificate_chain_file(context, certificate.c_str()) != 1) {
+        return because("cannot use the certificate " + certificate);
+    }
+    if (SSL_CTX_use_PrivateKey_file(context, key.c_str(), SSL_FILETYPE_PEM) != 1) {
+        return because("cannot use the key " + key);
+    }
+    if (SSL_CTX_check_private_key(context) != 1) {
+        return because("the key " + key + " does not belong to the certificate " + certificate);
+    }
+    return result;
+}
+
+bool TlsContext::isFor(const std::string& host) const {
+    X509* const certificate = SSL_CTX_get0_certificate(m_context);
+    return X509_check_host(certificate, host.data(), host.size(), 0, nullptr) == 1 ||
+           X509_check_ip_asc(certificate, host.c_str(), 0) == 1;
+}

@@ -1,0 +1,33 @@
+#ifndef ZRM_HOST_TLS_CONTEXT_H
+#define ZRM_HOST_TLS_CONTEXT_H
+
+#include <memory>
+#include <string>
+#include <variant>
+
+struct ssl_ctx_st;
+
+/// A certificate and its key, for connections under TLS. Immutable, so any thread.
+class TlsContext {
+public:
+    /// Reads both files (PEM; the certificate's chain may follow it). Gives what is wrong when they
+    /// cannot be used.
+    static std::variant<std::shared_ptr<const TlsContext>, std::string>
+    load(const std::string& certificate, const std::string& key);
+
+    ~TlsContext();
+    TlsContext(const TlsContext&) = delete;
+    TlsContext& operator=(const TlsContext&) = delete;
+
+    /// True when the certificate was made out for this host name or address.
+    bool isFor(const std::string& host) const;
+
+    ssl_ctx_st* handle() const noexcept { return m_context; }
+
+private:
+    explicit TlsContext(ssl_ctx_st* context) : m_context(context) {}
+
+    ssl_ctx_st* const m_context;
+};
+
+#endif

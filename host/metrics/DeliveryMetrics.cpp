@@ -1,0 +1,68 @@
+#include "host/metrics/DeliveryMetrics.h"
+
+#include "host/events/Delivery.h"
+#include "host/history/HistoryReader.h"
+#include "host/metrics/MetricText.h"
+
+#include <chrono>
+#include <vector>
+
+namespace {
+
+void collectQueue(MetricText& text, const QueueState& queue) {
+    text.gauge("zrm_queue_events", "Events that wait in the queue behind the logs.");
+    text.add(static_cast<double>(queue.size));
+    text.gauge("zrm_queue_capacity_events", "Events that find room in the queue.");
+    text.add(static_cast<double>(queue.capacity));
+    text.counter("zrm_queue_waits_total", "Times that a log had to wait for room in the queue.");
+    text.add(queue.waits);
+    text.counter("zrm_queue_wait_seconds_total",
+                 "Time that logs have waited for room in the queue, in seconds.");
+    text.add(std::chrono::duration<double>(queue.waited).count());
+}
+
+MetricText::Labels labelsOf(const SinkState& sink) {
+    return {{"sink", sink.name}, {"type", sink.type}};
+}
+
+void collectSinks(MetricText& text, const std::vector<SinkState>& sinks) {
+    text.gauge("zrm_sink_up", "0 while deliveries to the sink fail, else 1.");
+    for (const SinkState& sink : sinks) {
+        text.add(sink.condition == SinkState::Condition::FAILING ? 0.0 : 1.0, labelsOf(sink));
+    }
+    text.gauge("zrm_sink_lag_events", "Events that the sink has still to get.");
+    for (const SinkState& sink : sinks) {
+        text.add(sink.lag, labelsOf(sink));
+    }
+    text.counter("zrm_sink_delivered_events_total", "Events that the sink got.");
+    for (const SinkState& sink : sinks) {
+        text.add(sink.delivered, labelsOf(sink));
+    }
+    text.counter("zrm_sink_failures_total", "Deliveries to the sink that failed.");
+    for (const SinkState& sink : sinks) {
+        text.add(sink.failures, labelsOf(sink));
+    }
+}
+
+void collectHistory(MetricText& text, const HistoryState& history) {
+    text.gauge("zrm_history_up", "0 while the history takes no events, else 1.");
+    text.add(history.problem.empty() ? 1.0 : 0.0);
+    text.gauge("zrm_history_events", "Events that the history holds.");
+    text.add(history.events);
+    text.gauge("zrm_history_size_bytes", "Size of the history on disk.");
+    text.add(history.bytes);
+    text.gauge("zrm_history_oldest_event_id", "Id of the oldest event that the history holds.");
+    text.add(history.oldest);
+    text.gauge("zrm_history_newest_event_id", "Id of the newest event of the history.");
+    text.add(history.newest);
+}
+
+} // namespace
+
+void DeliveryMetrics::collect(MetricText& text) {
+    collectQueue(text, m_delivery.queueState());
+    collectSinks(text, m_delivery.sinkStates());
+    if (HistoryReader* const history = m_delivery.history()) {
+        collectHistory(text, history->state());
+    }
+}

@@ -1,0 +1,20 @@
+#ifndef ZRM_HOST_DELIVERY_METRICS_H
+#define ZRM_HOST_DELIVERY_METRICS_H
+
+#include "host/metrics/MetricSource.h"
+
+class Delivery;
+
+/// The way of events: the queue, the history, the sinks.
+class DeliveryMetrics : public MetricSource {
+public:
+    /// `delivery` outlives the object.
+    explicit DeliveryMetrics(Delivery& delivery) : m_delivery(delivery) {}
+
+    void collect(MetricText& text) override;
+
+private:
+    Delivery& m_delivery;
+};
+
+#endif

@@ -1,0 +1,23 @@
+#ifndef ZRM_HOST_METRICS_RESOURCE_H
+#define ZRM_HOST_METRICS_RESOURCE_H
+
+#include "host/http/Resource.h"
+#include "host/metrics/MetricSource.h"
+
+#include <memory>
+#include <utility>
+#include <vector>
+
+/// `GET /metrics`: every metric, for Prometheus.
+class MetricsResource : public Resource {
+public:
+    /// Adds a part's metrics, behind those that were added before. Before the server starts.
+    void add(std::unique_ptr<MetricSource> source) { m_sources.push_back(std::move(source)); }
+
+    void addRoutes(Router& router) override;
+
+private:
+    std::vector<std::unique_ptr<MetricSource>> m_sources;
+};
+
+#endif

@@ -1,0 +1,19 @@
+#ifndef ZRM_HOST_PROCESS_METRICS_H
+#define ZRM_HOST_PROCESS_METRICS_H
+
+#include "host/metrics/MetricSource.h"
+
+/// The process: version, start, processor time, memory, descriptors. What the system does not tell
+/// is left out.
+class ProcessMetrics : public MetricSource {
+public:
+    /// The process counts as started when this is made.
+    ProcessMetrics();
+
+    void collect(MetricText& text) override;
+
+private:
+    const double m_started; ///< seconds since 1970-01-01 UTC
+};
+
+#endif

@@ -1,0 +1,141 @@
+"""The HTTP API under TLS: for addresses that other machines can reach."""
+
+import http.client
+import json
+import re
+import socket
+import ssl
+import subprocess
+import time
+
+import pytest
+
+from conftest import PATIENCE
+
+
+def make_certificate(directory, name="agent"):
+    """A certificate for agent.example and 127.0.0.1, and its key."""
+    certificate, key = directory / f"{name}.pem", directory / f"{name}.key"
+    subprocess.run(
+        ["openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:prime256v1",
+         "-nodes", "-subj", "/CN=agent.example", "-days", "2",
+         "-addext", "subjectAltName=DNS:agent.example,IP:127.0.0.1",
+         "-keyout", str(key), "-out", str(certificate)],
+        check=True,
+        capture_output=True,
+    )  # fmt: skip
+    return certificate, key
+
+
+@pytest.fixture
+def serving(agent):
+    """Starts the agent under TLS; (port, token, context of a client that trusts it)."""
+
+    def start(listen="0.0.0.0:0"):
+        certificate, key = make_certificate(agent.directory)
+        agent.log()
+        agent.listen = listen
+        agent.http_keys = {"certificate": certificate, "key": key}
+        agent.start()
+        line = agent.wait_trace("HTTP at https://")[0]
+        port, token_file = re.search(r"https://[\d.]+:(\d+)/, token in (.+)$", line).groups()
+        with open(token_file, encoding="ascii") as stream:
+            token = stream.read().strip()
+        return int(port), token, ssl.create_default_context(cafile=str(certificate))
+
+    return start
+
+
+def ask(port, token, context, path="/api/v1/status", **headers):
+    connection = http.client.HTTPSConnection("127.0.0.1", port, context=context, timeout=PATIENCE)
+    try:
+        connection.request("GET", path, headers={"Authorization": f"Bearer {token}", **headers})
+        response = connection.getresponse()
+        return response.status, json.load(response)
+    finally:
+        connection.close()
+
+
+def test_the_api_is_served_under_tls(serving):
+    port, token, context = serving()
+    status, answer = ask(port, token, context)
+    assert status == 200 and answer["version"]
+    assert ask(port, "wrong", context)[0] == 401
+    # Large answers and several requests over one connection.
+    connection = http.client.HTTPSConnection("127.0.0.1", port, context=context, timeout=PATIENCE)
+    for _ in range(3):
+        connection.request("GET", "/metrics", headers={"Authorization": f"Bearer {token}"})
+        assert b"zrm_build_info" in connection.getresponse().read()
+    connection.close()
+
+
+def test_the_names_of_the_certificate_are_names_of_the_server(serving):
+    port, token, context = serving()
+    assert ask(port, token, context, Host=f"agent.example:{port}")[0] == 200
+    assert ask(port, token, context, Host=f"localhost:{port}")[0] == 200
+    assert ask(port, token, context, Host=f"evil.example:{port}")[0] == 421
+    assert ask(port, token, context, Host=f"agent.example:{port + 1}")[0] == 421
+    origin = lambda text: ask(port, token, context, Origin=text)[0]
+    assert origin(f"https://agent.example:{port}") == 200
+    assert origin(f"http://agent.example:{port}") == 403
+    assert origin("https://evil.example") == 403
+
+
+def test_old_tls_and_no_tls_are_refused(serving):
+    port, token, context = serving()
+    old = ssl.create_default_context()
+    old.check_hostname = False
+    old.verify_mode = ssl.CERT_NONE
+    old.set_ciphers("ALL:@SECLEVEL=0")
+    old.minimum_version = ssl.TLSVersion.TLSv1
+    old.maximum_version = ssl.TLSVersion.TLSv1_1
+    with pytest.raises((ssl.SSLError, OSError)):
+        ask(port, token, old)
+    with socket.create_connection(("127.0.0.1", port), timeout=PATIENCE) as plain:
+        plain.sendall(b"GET /healthz HTTP/1.1\r\nHost: localhost\r\n\r\n")
+        try:
+            assert not plain.recv(1000).startswith(b"HTTP/")
+        except ConnectionResetError:
+            pass
+    assert ask(port, token, context)[0] == 200
+
+
+def test_clients_that_never_finish_the_handshake_hold_nobody_up(agent, serving):
+    port, token, context = serving()
+    silent = [socket.create_connection(("127.0.0.1", port)) for _ in range(50)]
+    for client in silent[:25]:
+        client.sendall(b"\x16\x03\x01")
+    begin = time.monotonic()
+    assert ask(port, token, context)[0] == 200
+    assert time.monotonic() - begin < 5
+    assert agent.stop() == 0
+    for client in silent:
+        client.close()
+
+
+@pytest.mark.parametrize("broken", ["certificate", "key", "pair"])
+def test_without_a_usable_certificate_monitoring_goes_on(agent, broken):
+    certificate, key = make_certificate(agent.directory)
+    if broken == "pair":
+        _, key = make_certificate(agent.directory, "other")
+    else:
+        {"certificate": certificate, "key": key}[broken].write_text("nonsense")
+    agent.log()
+    agent.listen = "127.0.0.1:0"
+    agent.http_keys = {"certificate": certificate, "key": key}
+    agent.start()
+    expected = {
+        "certificate": f"HTTP is off: cannot use the certificate {certificate}: ",
+        "key": f"HTTP is off: cannot use the key {key}: ",
+        "pair": f"HTTP is off: cannot use the key {key}: key values mismatch",
+    }[broken]
+    agent.wait_trace(expected)
+    assert agent.stop() == 0
+
+
+def test_other_machines_need_tls(agent):
+    agent.log()
+    agent.listen = "0.0.0.0:0"
+    agent.start(wait=False)
+    assert agent.wait_end() == 2
+    assert agent.trace("can be reached from other machines; write a loopback address")

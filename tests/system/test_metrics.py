@@ -1,0 +1,158 @@
+"""/metrics as Prometheus sees it: linted by promtool, scraped by the real program."""
+
+import http.client
+import json
+import re
+import shutil
+import socket
+import subprocess
+import time
+
+import pytest
+
+from api import Api
+from conftest import syslog_line, wait_until
+
+
+def metrics(api):
+    connection = http.client.HTTPConnection("127.0.0.1", api.port)
+    connection.request("GET", "/metrics", headers={"Authorization": f"Bearer {api.token}"})
+    response = connection.getresponse()
+    assert response.status == 200
+    assert response.getheader("Content-Type") == "text/plain; version=0.0.4; charset=utf-8"
+    text = response.read().decode()
+    connection.close()
+    return text
+
+
+def value(text, name, **labels):
+    """The value of the one sample of this name that has these labels."""
+    found = []
+    for line in text.splitlines():
+        match = re.fullmatch(rf"{name}(?:\{{(.*)\}})? (\S+)", line)
+        if match is None:
+            continue
+        has = dict(re.findall(r'(\w+)="((?:[^"\\]|\\.)*)"', match.group(1) or ""))
+        if all(has.get(key) == wanted for key, wanted in labels.items()):
+            found.append(float(match.group(2)))
+    assert len(found) == 1, (name, labels, found)
+    return found[0]
+
+
+@pytest.fixture
+def serving(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.situation(name='odd "name"\\', log=log, when=["ENTRYDESC contains 'never'"])
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    return log, Api(agent)
+
+
+def test_metrics_tell_what_happens(agent, serving):
+    log, api = serving
+    for number in range(3):
+        log.append(syslog_line(f"line {number}"))
+    agent.wait_events(3)
+    api.request("GET", "/nothing")
+    api.request("GET", "/api/v1/status")
+    wait_until(lambda: value(metrics(api), "zrm_log_entries_total", log=str(log)) == 3, "3 entries")
+    text = metrics(api)
+    assert value(text, "zrm_log_errors_total", log=str(log)) == 0
+    assert value(text, "zrm_log_size_bytes", log=str(log)) == log.path.stat().st_size
+    assert value(text, "zrm_log_running", log=str(log)) == 1
+    assert value(text, "zrm_log_state", log=str(log), state="Running") == 1
+    assert value(text, "zrm_logs") == 1
+    for count, expected in (("offered", 3), ("matched", 3), ("discarded", 0), ("raised", 3)):
+        assert value(text, f"zrm_situation_{count}_total", situation="every-entry") == expected
+    assert value(text, "zrm_situation_matched_total", situation='odd \\"name\\"\\\\') == 0
+    assert abs(value(text, "zrm_situation_last_raised_seconds") - time.time()) < 120
+    assert value(text, "zrm_queue_capacity_events") > 0
+    assert value(text, "zrm_queue_waits_total") == 0
+    assert value(text, "zrm_sink_up", type="jsonl") == 1
+    assert value(text, "zrm_sink_delivered_events_total", type="jsonl") == 3
+    assert value(text, "zrm_sink_failures_total", type="jsonl") == 0
+    assert value(text, "zrm_http_requests_total", route="none", status="404", method="GET") == 1
+    assert value(text, "zrm_http_requests_total", route="/api/v1/status", status="200") == 1
+    assert value(text, "zrm_http_request_duration_seconds_count", route="/api/v1/status") == 1
+    assert value(text, "zrm_http_connections") >= 1
+    assert value(text, "process_cpu_seconds_total") > 0
+    assert value(text, "process_resident_memory_bytes") > 1e6
+    assert value(text, "process_open_fds") > 3
+    assert abs(value(text, "process_start_time_seconds") - time.time()) < 600
+    assert value(text, "zrm_build_info") == 1
+
+
+def test_metrics_need_the_token(serving):
+    _, api = serving
+    status, _, _ = api.request("GET", "/metrics", headers={"Authorization": None})
+    assert status == 401
+
+
+def test_promtool_has_nothing_to_say(agent, serving):
+    log, api = serving
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    metrics(api)  # so that there are requests to count
+    linted = subprocess.run(
+        ["promtool", "check", "metrics"], input=metrics(api), capture_output=True, text=True, timeout=60
+    )
+    assert (linted.returncode, linted.stdout + linted.stderr) == (0, "")
+
+
+def free_port():
+    with socket.socket() as listener:
+        listener.bind(("127.0.0.1", 0))
+        return listener.getsockname()[1]
+
+
+def asked(port, query):
+    connection = http.client.HTTPConnection("127.0.0.1", port, timeout=30)
+    try:
+        connection.request("GET", f"/api/v1/query?query={query}")
+        return json.load(connection.getresponse())["data"]["result"]
+    except (OSError, ValueError):
+        return []
+    finally:
+        connection.close()
+
+
+def test_prometheus_scrapes_the_agent(agent, serving, tmp_path):
+    log, api = serving
+    for number in range(4):
+        log.append(syslog_line(f"line {number}"))
+    agent.wait_events(4)
+    config = tmp_path / "prometheus.yml"
+    config.write_text(
+        f"""
+global: {{scrape_interval: 1s}}
+scrape_configs:
+  - job_name: zrmagent
+    authorization: {{credentials_file: {api.token_file}}}
+    static_configs: [{{targets: ["127.0.0.1:{api.port}"]}}]
+"""
+    )
+    subprocess.run(["promtool", "check", "config", str(config)], check=True, capture_output=True)
+    port = free_port()
+    with open(tmp_path / "prometheus.log", "wb") as output:
+        prometheus = subprocess.Popen(
+            [
+                shutil.which("prometheus"),
+                f"--config.file={config}",
+                f"--storage.tsdb.path={tmp_path / 'data'}",
+                f"--web.listen-address=127.0.0.1:{port}",
+            ],
+            stdin=subprocess.DEVNULL,
+            stdout=output,
+            stderr=output,
+        )
+    try:
+        (up,) = wait_until(lambda: asked(port, "up==1"), "a scrape that succeeded")
+        assert up["metric"]["job"] == "zrmagent"
+        (raised,) = asked(port, 'zrm_situation_raised_total{situation="every-entry"}')
+        assert raised["value"][1] == "4"
+        (entries,) = asked(port, "zrm_log_entries_total")
+        assert entries["metric"]["log"] == str(log)
+    finally:
+        prometheus.terminate()
+        prometheus.wait(60)

@@ -1,0 +1,209 @@
+"""docs/openapi.yaml against the routes of the sources and the answers of the running agent."""
+
+import http.client
+import json
+import re
+
+import jsonschema
+import pytest
+import yaml
+
+from api import Api
+from conftest import ROOT, syslog_line, wait_until
+
+DOCUMENT = yaml.safe_load((ROOT / "docs/openapi.yaml").read_text(encoding="utf-8"))
+METHODS = ("get", "put", "post", "delete", "patch")
+OPERATIONS = {
+    (method.upper(), path)
+    for path, item in DOCUMENT["paths"].items()
+    for method in item
+    if method in METHODS
+}
+
+
+def resolved(node):
+    while "$ref" in node:
+        found = DOCUMENT
+        for part in node["$ref"].removeprefix("#/").split("/"):
+            found = found[part]
+        node = found
+    return node
+
+
+def response_of(method, path, status):
+    responses = DOCUMENT["paths"][path][method.lower()]["responses"]
+    return resolved(responses.get(str(status), responses["default"])), str(status) in responses
+
+
+def validate(schema, value):
+    """Holds a value against a schema of the document."""
+    jsonschema.Draft202012Validator(
+        schema, resolver=jsonschema.RefResolver("", DOCUMENT)
+    ).validate(value)
+
+
+def test_every_route_is_documented_and_every_documented_one_exists():
+    routes = set()
+    for source in (ROOT / "host").rglob("*.cpp"):
+        text = source.read_text(encoding="utf-8")
+        if "::addRoutes(Router&" in text:
+            added = re.findall(r'\(\s*"(GET|PUT|POST|DELETE|PATCH)",\s*"(/[^"]*)"', text)
+            assert added, f"{source} adds routes that this test cannot read"
+            routes.update(added)
+    assert routes == OPERATIONS
+
+
+def test_every_schema_is_one():
+    for schema in DOCUMENT["components"]["schemas"].values():
+        jsonschema.Draft202012Validator.check_schema(schema)
+    used = set(re.findall(r'"#/components/(\w+)/(\w+)"', (ROOT / "docs/openapi.yaml").read_text()))
+    declared = {
+        (kind, name)
+        for kind, entries in DOCUMENT["components"].items()
+        if kind != "securitySchemes"
+        for name in entries
+    }
+    assert used == declared
+
+
+DEFINITION = {
+    "name": "made/here",
+    "text": "made here",
+    "severity": "minor",
+    "log": None,
+    "when": ["ENTRYDESC contains 'x'"],
+    "frequency": ">= 2",
+    "period": "60s",
+}
+FROM = "2026-01-01T00:00:00Z"
+
+# What is asked: method, path of the document, path and body of the request, expected status.
+EXAMPLES = [
+    ("GET", "/healthz", None, None, 200),
+    ("GET", "/metrics", None, None, 200),
+    ("GET", "/api/v1/status", None, None, 200),
+    ("PUT", "/api/v1/trace", None, {"levels": "error"}, 200),
+    ("PUT", "/api/v1/trace", None, {"levels": "loud"}, 400),
+    ("GET", "/api/v1/columns", None, None, 200),
+    ("GET", "/api/v1/logs", None, None, 200),
+    ("GET", "/api/v1/logs", "/api/v1/logs?log={log}", None, 200),
+    ("POST", "/api/v1/refresh", None, None, 202),
+    ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/RMMONLOG/sample", {}, 200),
+    ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/NONE/sample", {}, 404),
+    ("POST", "/api/v1/reports", None, {"log": "{log}", "from": FROM}, 200),
+    ("POST", "/api/v1/reports", None, {"log": "/none", "from": FROM}, 404),
+    ("GET", "/api/v1/events", None, None, None),
+    ("GET", "/api/v1/events", "/api/v1/events?limit=1&order=asc&severity=info", None, None),
+    ("GET", "/api/v1/events/{id}", "/api/v1/events/1", None, None),
+    ("GET", "/api/v1/rates", None, None, None),
+    ("GET", "/api/v1/rates", "/api/v1/rates?step=3600", None, None),
+    ("GET", "/api/v1/situations", None, None, 200),
+    ("POST", "/api/v1/situations/validate", None, {"name": "x", "when": ["y"]}, 200),
+    ("POST", "/api/v1/situations", None, DEFINITION, 201),
+    ("POST", "/api/v1/situations", None, DEFINITION, 409),
+    ("GET", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", None, 200),
+    ("GET", "/api/v1/situations/{name}", "/api/v1/situations/none", None, 404),
+    ("PUT", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", DEFINITION, 200),
+    ("POST", "/api/v1/situations/{name}/stop", "/api/v1/situations/made%2Fhere/stop", None, 200),
+    ("POST", "/api/v1/situations/{name}/start", "/api/v1/situations/made%2Fhere/start", None, 200),
+    ("POST", "/api/v1/explain", None, {"situation": "every-entry", "last": 2}, 200),
+    ("POST", "/api/v1/explain", None, {"definition": DEFINITION, "log": "{log}", "line": "no entry"}, 200),
+    ("POST", "/api/v1/explain", None, {"situation": "none", "log": "{log}", "line": "x"}, None),
+    ("POST", "/api/v1/backtest", None, {"situation": "every-entry", "from": FROM, "to": "2099-01-01"}, 200),
+    ("DELETE", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", None, 204),
+    ("DELETE", "/api/v1/situations/{name}", "/api/v1/situations/every-entry", None, 409),
+]  # fmt: skip
+
+# Answered by their own tests: what they send does not end.
+STREAMS = {("GET", "/api/v1/events/stream")}
+
+
+def exchange(api, method, path, body=None, token=True):
+    connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=60)
+    headers = {"Authorization": f"Bearer {api.token}"} if token else {}
+    if body is not None:
+        headers["Content-Type"] = "application/json"
+    try:
+        connection.request(method, path, None if body is None else json.dumps(body), headers)
+        response = connection.getresponse()
+        return response.status, response.getheader("Content-Type"), response.read()
+    finally:
+        connection.close()
+
+
+def check(method, path, status, kind, data):
+    """Holds an answer against what the document says of it."""
+    response, is_named = response_of(method, path, status)
+    assert is_named or status >= 400, f"{method} {path}: {status} is not documented"
+    content = response.get("content", {})
+    if not content:
+        assert data == b"" and kind is None
+        return
+    ((documented, media),) = content.items()
+    assert kind.split(";")[0] == documented, (method, path, data)
+    value = json.loads(data) if documented.endswith("json") else data.decode()
+    validate(resolved(media["schema"]), value)
+
+
+@pytest.fixture
+def serving(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    for number in range(3):
+        log.append(syslog_line(f"line {number}"))
+    agent.wait_events(3)
+    return log, Api(agent)
+
+
+def test_every_answer_is_as_documented(serving):
+    assert {example[:2] for example in EXAMPLES} | STREAMS == OPERATIONS
+    log, api = serving
+    insert = lambda text: text.replace("{log}", str(log)) if isinstance(text, str) else text
+    for method, path, url, body, expected in EXAMPLES:
+        if isinstance(body, dict):
+            body = {key: insert(value) for key, value in body.items()}
+        status, kind, data = exchange(api, method, insert(url or path), body)
+        assert expected is None or status == expected, (method, path, data)
+        check(method, path, status, kind, data)
+
+
+def test_every_refusal_is_as_documented(serving):
+    _, api = serving
+    for method, path in sorted(OPERATIONS):
+        url = re.sub(r"\{\w+\}", "1", path)
+        operation = DOCUMENT["paths"][path][method.lower()]
+        if operation.get("security") != []:
+            status, kind, data = exchange(api, method, url, token=False)
+            assert status == 401, (method, path)
+            check(method, path, status, kind, data)
+        status, kind, data = exchange(api, "PATCH", url, {})
+        assert status == 405, (path, data)
+        check(method, path, status, kind, data)
+        if method in ("PUT", "POST"):
+            for body in ([], {"no such member": 1}):
+                status, kind, data = exchange(api, method, url, body)
+                assert status in (200, 400, 404), (method, path, status, data)
+                check(method, path, status, kind, data)
+        elif "*" not in path:
+            status, kind, data = exchange(api, method, url + "?nosuch=1")
+            check(method, path, status, kind, data)
+
+
+def test_events_are_as_documented(serving):
+    log, api = serving
+    status, _, data = exchange(api, "GET", "/api/v1/status")
+    if not json.loads(data)["history"]["enabled"]:
+        assert exchange(api, "GET", "/api/v1/events")[0] == 409
+        return
+
+    def arrived():
+        answer = json.loads(exchange(api, "GET", "/api/v1/events")[2])
+        return answer if len(answer["events"]) == 3 else None
+
+    for event in wait_until(arrived, "3 events in the history")["events"]:
+        validate(DOCUMENT["components"]["schemas"]["Event"], event)
+        status, kind, data = exchange(api, "GET", f"/api/v1/events/{event['id']}")
+        assert status == 200 and json.loads(data) == event
+        check("GET", "/api/v1/events/{id}", status, kind, data)
