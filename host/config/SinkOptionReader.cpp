@@ -83,12 +83,11 @@ std::string cureOf(const SinkOption& option) {
     return text;
 }
 
-/// True for what may be the name of a header that an operator sets; those that say how a request
-/// is framed are the sink's own.
+/// True for what may be the name of a header that an operator adds to those that a sink sets.
 bool isHeaderName(std::string_view name) {
-    constexpr std::array<std::string_view, 7> own = {
-        "host",       "content-length",  "content-type", "transfer-encoding",
-        "connection", "accept-encoding", "expect"};
+    constexpr std::array<std::string_view, 10> own = {
+        "host",   "content-length", "content-type",    "transfer-encoding", "connection",
+        "expect", "user-agent",     "accept-encoding", "idempotency-key",   "x-zrm-signature"};
     constexpr std::string_view signs = "!#$%&'*+-.^_`|~";
     std::string lower(name);
     std::transform(lower.begin(), lower.end(), lower.begin(),
@@ -121,8 +120,8 @@ struct TableKind {
 };
 
 constexpr std::array tableKinds = {
-    TableKind{SinkOption::HEADERS, isHeaderName, "is no name of a header that can be set",
-              "use letters, digits and dashes; what describes the body is set already"},
+    TableKind{SinkOption::HEADERS, isHeaderName, "is no name of a header that can be added",
+              "use letters, digits and dashes; what describes the request is set already"},
     TableKind{SinkOption::LABELS, isLabelName, "is no name of a label that can be added",
               "use letters, digits and underscores, a letter first; alertname, severity, log and "
               "node are set already"},

@@ -9,7 +9,7 @@ namespace {
 
 TRC1_Anchor anchor{"SinkThread.cpp"};
 
-constexpr std::size_t batch = 64; ///< events per delivery
+constexpr std::size_t batch = 256; ///< events per delivery
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{30'000};
 

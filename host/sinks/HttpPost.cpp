@@ -82,7 +82,8 @@ private:
     enum Outcome { ANSWERED, LOST, OVER };
 
     void connect();
-    Outcome attempt(const std::string& body, const Headers& headers, ConnectionLimit& limit);
+    httplib::Request requestOf(const std::string& body, const Headers& headers);
+    Outcome attempt(const std::string& body, const Headers& headers);
     void note(const httplib::Response& response);
     bool judge();
 
@@ -123,15 +124,8 @@ void HttpPost::Implementation::connect() {
     m_client->set_socket_options([this](socket_t socket) { m_limit->watch(socket); });
 }
 
-HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::string& body,
-                                                                    const Headers& headers,
-                                                                    ConnectionLimit& limit) {
-    const bool isKept = m_client != nullptr && m_client->is_socket_open() != 0;
-    if (m_client == nullptr) {
-        connect();
-    } else if (isKept) {
-        limit.watch(m_client->socket());
-    }
+httplib::Request HttpPost::Implementation::requestOf(const std::string& body,
+                                                     const Headers& headers) {
     httplib::Request request;
     request.method = "POST";
     request.path = m_target;
@@ -140,8 +134,6 @@ HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::s
     request.headers.insert(headers.begin(), headers.end());
     request.headers.emplace("Content-Type", "application/json");
     request.headers.emplace("User-Agent", "zrmagent");
-    m_status = 0;
-    m_answer.clear();
     request.response_handler = [this](const httplib::Response& response) {
         note(response); // before the body, of which nothing may come
         return true;
@@ -151,8 +143,22 @@ HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::s
         m_answer.append(data, std::min(size, longestAnswer - m_answer.size()));
         return m_answer.size() < longestAnswer;
     };
+    return request;
+}
+
+HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::string& body,
+                                                                    const Headers& headers) {
+    const bool isKept = m_client != nullptr && m_client->is_socket_open() != 0;
+    if (m_client == nullptr) {
+        connect();
+    } else if (isKept) {
+        m_limit->watch(m_client->socket());
+    }
+    m_status = 0;
+    m_answer.clear();
+    httplib::Request request = requestOf(body, headers);
     const httplib::Result result = m_client->send(request);
-    limit.watch(-1);
+    m_limit->watch(-1);
     if (result) {
         note(*result);
     } else {
@@ -163,7 +169,7 @@ HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::s
     }
     m_error = std::string(textOf(result.error())) + " (" + m_url.authority() + ')';
     // A receiver may end a connection that it kept at the moment in which it is used again.
-    return isKept && !limit.hasEnded() ? LOST : OVER;
+    return isKept && !m_limit->hasEnded() ? LOST : OVER;
 }
 
 void HttpPost::Implementation::note(const httplib::Response& response) {
@@ -191,11 +197,11 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
     const BrokenPipeBlocked blocked;
     ConnectionLimit limit(Clock::now() + m_timeout, giveUp);
     m_limit = &limit;
-    Outcome outcome = attempt(body, headers, limit);
+    Outcome outcome = attempt(body, headers);
     if (outcome == LOST) {
         trace.detail()("%s has ended the connection; another one is made.",
                        m_url.authority().c_str());
-        outcome = attempt(body, headers, limit);
+        outcome = attempt(body, headers);
     }
     if (outcome == ANSWERED) {
         return trace.result(judge());

@@ -143,7 +143,7 @@ secret_file = "/etc/secret"
               (SinkConfig::Texts{{"Authorization", "Bearer a"}, {"X-Env", "prod"}}));
     EXPECT_EQ(sinks[0].text("ca_file"), "/etc/ca.pem");
     EXPECT_EQ(sinks[1].name, "webhook web1:80");
-    EXPECT_EQ(sinks[1].number("batch"), 64);
+    EXPECT_EQ(sinks[1].number("batch"), 100);
     EXPECT_EQ(sinks[1].duration("timeout"), std::chrono::seconds(10));
     EXPECT_EQ(sinks[1].text("secret"), "");
     EXPECT_EQ(sinks[1].text("secret_file"), "/etc/secret");
@@ -161,7 +161,7 @@ batch = 0
 secret = ""
 secret_file = "secret"
 timeout = "301s"
-headers = { "Content-Type" = "text/plain", "a b" = "c", X = "a\u0007", Y = 5 }
+headers = { "Content-Type" = "text/plain", X-ZRM-SIGNATURE = "a", "a b" = "c", X = "a\u0007", Y = 5 }
 ca_file = "ca.pem"
 path = "-"
 [[sink]]
@@ -174,19 +174,21 @@ ca_file = true
 )"),
         ElementsAre(
             "zrm.toml:3: sink.url: 'web1/hook' is no URL to send events to; " + url,
-            "zrm.toml:4: sink.batch: 0 is out of bounds; write a number from 1 to 1000",
+            "zrm.toml:4: sink.batch: 0 is out of bounds; write a number from 1 to 256",
             "zrm.toml:5: sink.secret: is no usable text; write 1 to 4096 bytes without control "
             "characters",
             "zrm.toml:5: sink.secret: stands beside secret_file; leave one of them out",
             "zrm.toml:6: sink.secret_file: 'secret' is no absolute path; begin it with '/'",
             "zrm.toml:7: sink.timeout: '301s' is no usable length of time; write a number and s, "
             "m, h or d, from 1s to 300s",
-            "zrm.toml:8: sink.headers.Content-Type: is no name of a header that can be set; use "
-            "letters, digits and dashes; what describes the body is set already",
+            "zrm.toml:8: sink.headers.Content-Type: is no name of a header that can be added; use "
+            "letters, digits and dashes; what describes the request is set already",
             "zrm.toml:8: sink.headers.X: holds control characters; leave them out",
+            "zrm.toml:8: sink.headers.X-ZRM-SIGNATURE: is no name of a header that can be added; "
+            "use letters, digits and dashes; what describes the request is set already",
             "zrm.toml:8: sink.headers.Y: is a whole number; write a text in quotes",
-            "zrm.toml:8: sink.headers.a b: is no name of a header that can be set; use letters, "
-            "digits and dashes; what describes the body is set already",
+            "zrm.toml:8: sink.headers.a b: is no name of a header that can be added; use letters, "
+            "digits and dashes; what describes the request is set already",
             "zrm.toml:9: sink.ca_file: 'ca.pem' is no absolute path; begin it with '/'",
             "zrm.toml:10: sink.path: unknown key; the keys here are type, name, url, batch, "
             "secret, secret_file, timeout, headers, ca_file",

@@ -1,5 +1,6 @@
 #include "host/sinks/HttpPost.h"
 
+#include "LocalSocket.h"
 #include "ScriptedServer.h"
 #include "SinkTest.h"
 #include "support/RecordingTrace.h"
@@ -11,8 +12,6 @@
 #include <csignal>
 #include <thread>
 
-#include <arpa/inet.h>
-#include <netinet/in.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -176,14 +175,8 @@ TEST_F(HttpPostTest, EndsAtOnceWhenItIsToldToGiveUp) {
 /// A port at which connections are neither taken nor refused: its queue of them is full.
 class FullPort {
 public:
-    FullPort() : m_listener(socket(AF_INET, SOCK_STREAM, 0)) {
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        bind(m_listener, reinterpret_cast<const sockaddr*>(&address), sizeof address);
-        socklen_t size = sizeof address;
-        getsockname(m_listener, reinterpret_cast<sockaddr*>(&address), &size);
-        port = ntohs(address.sin_port);
+    FullPort() : m_listener(localSocket(SOCK_STREAM, port)) {
+        const sockaddr_in address = localAddress(port);
         listen(m_listener, 0);
         for (int count = 0; count < 4; ++count) {
             const int one = socket(AF_INET, SOCK_STREAM | SOCK_NONBLOCK, 0);

@@ -1,11 +1,11 @@
 #include "ScriptedServer.h"
 
+#include "LocalSocket.h"
+
 #include <algorithm>
 #include <cctype>
 #include <utility>
 
-#include <arpa/inet.h>
-#include <netinet/in.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -60,14 +60,7 @@ std::string ScriptedServer::Request::header(const std::string& name) const {
 }
 
 ScriptedServer::ScriptedServer(Script script) : m_script(std::move(script)) {
-    m_listener = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    bind(m_listener, reinterpret_cast<const sockaddr*>(&address), sizeof address);
-    socklen_t size = sizeof address;
-    getsockname(m_listener, reinterpret_cast<sockaddr*>(&address), &size);
-    m_port = ntohs(address.sin_port);
+    m_listener = localSocket(SOCK_STREAM, m_port);
     listen(m_listener, 16);
     m_acceptor = std::jthread([this] { accept(); });
 }

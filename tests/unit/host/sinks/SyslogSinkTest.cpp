@@ -1,5 +1,6 @@
 #include "host/sinks/SyslogSink.h"
 
+#include "LocalSocket.h"
 #include "SinkTest.h"
 #include "support/RecordingTrace.h"
 
@@ -12,9 +13,7 @@
 #include <thread>
 #include <vector>
 
-#include <arpa/inet.h>
 #include <fcntl.h>
-#include <netinet/in.h>
 #include <poll.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -31,17 +30,8 @@ constexpr int patience = 10'000; ///< milliseconds
 /// A receiver's socket on a port of this machine.
 class Socket {
 public:
-    explicit Socket(int type, std::uint16_t wanted = 0) : m_socket(socket(AF_INET, type, 0)) {
-        const int on = 1;
-        setsockopt(m_socket, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        address.sin_port = htons(wanted);
-        EXPECT_EQ(bind(m_socket, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
-        socklen_t size = sizeof address;
-        getsockname(m_socket, reinterpret_cast<sockaddr*>(&address), &size);
-        port = ntohs(address.sin_port);
+    explicit Socket(int type, std::uint16_t wanted = 0)
+        : port(wanted), m_socket(localSocket(type, port)) {
         if (type == SOCK_STREAM) {
             listen(m_socket, 16);
         }
