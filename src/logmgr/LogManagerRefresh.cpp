@@ -119,6 +119,12 @@ void LogManager::buildLogObject(const ValidLog& log) {
 void LogManager::deleteMarkedLogs() {
     TraceScope trace(anchor);
     LogFile* object = FirstLogObject;
+    // All are asked before the first is waited for: together they take as long as one.
+    for (std::uint32_t left = NumLogs; left > 0; --left, object = object->next()) {
+        if (object->isMarked()) {
+            object->askToStop();
+        }
+    }
     for (std::uint32_t left = NumLogs; left > 0; --left) {
         LogFile* const next = object->next();
         if (object->isMarked()) {
@@ -154,6 +160,15 @@ void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
                       "%d. Agent is terminating.",
                       static_cast<int>(NumLogs.load()), static_cast<int>(depth));
         std::exit(-1);
+    }
+    if (depth == NumLogs) {
+        // All are asked before the first is waited for: together they take as long as one.
+        for (LogFile* member = log;; member = static_cast<LogFile*>(member->prev())) {
+            member->askToStop();
+            if (member == FirstLogObject) {
+                break;
+            }
+        }
     }
     for (; depth >= firstDepth; --depth) {
         auto* const previous = static_cast<LogFile*>(log->prev());

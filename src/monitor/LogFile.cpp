@@ -128,6 +128,11 @@ void LogFile::startThread() {
     }
 }
 
+void LogFile::askToStop() noexcept {
+    _MonitorStatus running = MONITOR_RUNNING;
+    MonitorStatus.compare_exchange_strong(running, MONITOR_STOPPED);
+}
+
 void LogFile::stopThread() {
     TraceScope trace(anchor);
     lockLog();

@@ -1,5 +1,7 @@
 """The log configuration: bad lines, fallback to the syslog configuration, SIGHUP."""
 
+import time
+
 from conftest import Log, descriptions, syslog_line
 
 UNCHANGED = "has not changed since last refresh. No refresh performed."
@@ -145,3 +147,19 @@ def test_a_log_that_appears_later_is_taken_up_by_a_changed_configuration(agent):
     agent.wait_open(late)
     late.append(syslog_line("here at last"))
     assert descriptions(agent.wait_events(1)) == ["here at last"]
+
+
+def test_many_logs_are_dropped_and_stopped_in_the_time_of_one(agent):
+    # Each monitor looks once a second whether it is to end; one after the other, the logs of this
+    # test take 20 seconds to drop and 20 to stop.
+    kept = [agent.log(f"kept{i}.log") for i in range(20)]
+    for i in range(20):
+        agent.log(f"dropped{i}.log")
+    agent.start()
+    agent.configure(*map(str, kept))
+    agent.refresh()
+    agent.wait_trace("Deleting log object for file", count=20, seconds=8)
+    begin = time.monotonic()
+    assert agent.stop() == 0
+    assert time.monotonic() - begin < 8
+    assert len(agent.trace("Deleting log object for file")) == 40
