@@ -1,24 +1,28 @@
-// Writes the benchmark's syslog lines to standard output: about 108 bytes each, the time moving on
-// by a second every thousand lines, every hundredth line a failed login.
+// Writes the benchmark's data to standard output. The time moves on by a second every thousand
+// lines and ends now; every hundredth line is one that a situation looks for.
 //
-//     bench_generate LINES
+//     bench_generate syslog LINES        lines of the system logger, about 110 bytes each
+//     bench_generate user LINES          lines of an application, about 112 bytes each
+//     bench_generate accounting RECORDS  login records of 40 bytes
 
 #include <array>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <ctime>
 #include <string_view>
 
 namespace {
 
-constexpr long kLinesPerSecond = 1000;
-constexpr long kLinesPerMatch = 100;
+constexpr long kPerSecond = 1000;
+constexpr long kPerMatch = 100;
 
 constexpr std::array<std::string_view, 4> kSources = {"app[1402]", "cron[77]", "nginx[901]",
                                                       "kernel"};
 
-void writeLine(long number, const char* stamp) {
-    if (number % kLinesPerMatch == kLinesPerMatch - 1) {
+void writeSyslogLine(long number, const char* stamp) {
+    if (number % kPerMatch == kPerMatch - 1) {
         std::printf("%s web1 sshd[2140]: Failed password for invalid user admin%07ld from "
                     "203.0.113.7 port 50122 ssh2\n",
                     stamp, number);
@@ -31,24 +35,71 @@ void writeLine(long number, const char* stamp) {
                 number % 97 + 100, number % 8);
 }
 
+void writeUserLine(long number, const char* stamp) {
+    const bool fails = number % kPerMatch == kPerMatch - 1;
+    std::printf("%s %s order %07ld of customer %06ld %s after %ld ms on worker %ld, attempt 1, "
+                "queue main\n",
+                stamp, fails ? "ERROR" : "INFO", number, number % 99991,
+                fails ? "payment refused" : "payment accepted", number % 97 + 100, number % 8);
+}
+
+/// The agent's layout: user, id, line, pid, type, termination, exit, time.
+void writeRecord(long number, std::time_t now) {
+    struct {
+        char user[8];
+        char id[4];
+        char line[12];
+        std::int16_t numbers[4];
+        std::int64_t time;
+    } record{};
+    static_assert(sizeof record == 40);
+    std::snprintf(record.user, sizeof record.user, "user%ld", number % 100);
+    std::snprintf(record.line, sizeof record.line, "pts/%ld", number % 40);
+    record.numbers[0] = static_cast<std::int16_t>(1000 + number % 30000);
+    record.numbers[1] = static_cast<std::int16_t>(7 + number % 2);
+    record.time = now;
+    std::fwrite(&record, sizeof record, 1, stdout);
+}
+
+struct Kind {
+    std::string_view name;
+    const char* stamp; ///< null: records
+    void (*writeLine)(long number, const char* stamp);
+};
+
+constexpr Kind kKinds[] = {
+    {"syslog", "%b %e %H:%M:%S", writeSyslogLine},
+    {"user", "%Y-%m-%d %H:%M:%S", writeUserLine},
+    {"accounting", nullptr, nullptr},
+};
+
+void write(const Kind& kind, long count) {
+    const std::time_t begin = std::time(nullptr) - count / kPerSecond;
+    std::array<char, 64> stamp{};
+    for (long number = 0; number < count; ++number) {
+        const std::time_t now = begin + number / kPerSecond;
+        if (kind.stamp == nullptr) {
+            writeRecord(number, now);
+            continue;
+        }
+        if (number % kPerSecond == 0) {
+            std::tm parts{};
+            localtime_r(&now, &parts);
+            std::strftime(stamp.data(), stamp.size(), kind.stamp, &parts);
+        }
+        kind.writeLine(number, stamp.data());
+    }
+}
+
 } // namespace
 
 int main(int argc, char** argv) {
-    if (argc != 2) {
-        std::fputs("usage: bench_generate LINES\n", stderr);
-        return 2;
-    }
-    const long lines = std::strtol(argv[1], nullptr, 10);
-    const std::time_t begin = std::time(nullptr) - lines / kLinesPerSecond;
-    std::array<char, 32> stamp{};
-    for (long number = 0; number < lines; ++number) {
-        if (number % kLinesPerSecond == 0) {
-            const std::time_t now = begin + number / kLinesPerSecond;
-            std::tm parts{};
-            localtime_r(&now, &parts);
-            std::strftime(stamp.data(), stamp.size(), "%b %e %H:%M:%S", &parts);
+    for (const Kind& kind : kKinds) {
+        if (argc == 3 && kind.name == argv[1]) {
+            write(kind, std::strtol(argv[2], nullptr, 10));
+            return std::fflush(stdout) == 0 ? 0 : 1;
         }
-        writeLine(number, stamp.data());
     }
-    return std::fflush(stdout) == 0 ? 0 : 1;
+    std::fputs("usage: bench_generate syslog|user|accounting COUNT\n", stderr);
+    return 2;
 }

@@ -1,5 +1,6 @@
 """The agent as the benchmark sees it: a process whose CPU, memory and events are measured."""
 
+import http.client
 import json
 import os
 import re
@@ -15,12 +16,15 @@ LIMIT = 300  # seconds that any wait may take
 class AgentProcess:
     """A running agent on the given logs; ends with the `with` block."""
 
-    def __init__(self, program, directory, logs, situations):
+    def __init__(self, program, directory, logs, situations, log_lines=None, **settings):
         self.directory = Path(directory)
         self.logs = logs
-        (self.directory / "logs.conf").write_text("".join(f"{log}\n" for log in logs))
+        kinds = log_lines or {}  # what the configuration says of a log beside its path
+        (self.directory / "logs.conf").write_text(
+            "".join(f"{log} {kinds.get(log, ';N ;S')}\n" for log in logs)
+        )
         config = self.directory / "zrm.toml"
-        config.write_text(self._configuration(situations))
+        config.write_text(self._configuration(situations, **settings))
         self.events = 0
         self.last_event_time = None
         self.trace = open(self.directory / "trace", "wb")
@@ -34,9 +38,12 @@ class AgentProcess:
         self.reader = threading.Thread(target=self._count_events, daemon=True)
         self.reader.start()
 
-    def _configuration(self, situations):
+    def _configuration(self, situations, http=False, max_rows=None):
         text = f'state_directory = "{self.directory}/state"\n'
-        text += f'[agent]\nlog_config = "{self.directory}/logs.conf"\n[http]\nlisten = ""\n'
+        text += f'[agent]\nlog_config = "{self.directory}/logs.conf"\n'
+        if max_rows is not None:
+            text += f"max_rows = {max_rows}\n"
+        text += f'[http]\nlisten = "{"127.0.0.1:0" if http else ""}"\n'
         text += '[[sink]]\ntype = "jsonl"\npath = "-"\n'
         for situation in situations:
             keys = {"text": "benchmark", "severity": "info", **situation}
@@ -86,6 +93,35 @@ class AgentProcess:
     def _all_at_end(self):
         positions = self._positions()
         return all(positions.get(str(log)) == os.path.getsize(log) for log in self.logs)
+
+    def report(self, log, begin, end, column, start):
+        """A report's number of rows, and the seconds from the request to the end of its answer."""
+        found = None
+        deadline = time.monotonic() + LIMIT
+        while found is None and time.monotonic() < deadline:
+            trace = (self.directory / "trace").read_text()
+            found = re.search(r"HTTP at http://([^/]+)/, token in (\S+)", trace)
+        host, token = found.group(1), Path(found.group(2)).read_text().strip()
+        filters = [
+            ("LOGPATH", "=", f"{log.parent}/"),
+            ("LOGNAME", "=", log.name),
+            ("ENTRYTIME", ">=", begin),
+            ("ENTRYTIME", "<=", end),
+            (column, "starts", start),
+        ]
+        names = ("column", "op", "value")
+        body = json.dumps({"filters": [dict(zip(names, values)) for values in filters]})
+        headers = {"Authorization": f"Bearer {token}", "Content-Type": "application/json"}
+        connection = http.client.HTTPConnection(host, timeout=LIMIT)
+        since = time.monotonic()
+        connection.request("POST", "/api/v1/tables/RMLOGENT/sample", body, headers)
+        answer = connection.getresponse()
+        text = answer.read()
+        seconds = time.monotonic() - since
+        connection.close()
+        if answer.status != 200:
+            sys.exit(f"report: {answer.status} {text[:500]}")
+        return {"count": json.loads(text)["count"], "seconds": seconds}
 
     def wait_read(self, log):
         """Waits until the log has been read to its end."""
