@@ -94,7 +94,7 @@ private:
     const Headers m_headers;
 
     std::unique_ptr<httplib::ClientImpl> m_client; ///< made anew after every failure
-    ConnectionLimit* m_limit = nullptr;            ///< of the request under way
+    std::optional<ConnectionLimit> m_limit;        ///< of the request under way
     int m_status = 0;
     Clock::time_point m_notBefore{}; ///< the end of the pause that the receiver asked for
     std::string m_answer;
@@ -195,20 +195,21 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
         return trace.result(false); // the last error holds
     }
     const BrokenPipeBlocked blocked;
-    ConnectionLimit limit(Clock::now() + m_timeout, giveUp);
-    m_limit = &limit;
+    m_limit.emplace(Clock::now() + m_timeout, giveUp);
     Outcome outcome = attempt(body, headers);
     if (outcome == LOST) {
         trace.detail()("%s has ended the connection; another one is made.",
                        m_url.authority().c_str());
         outcome = attempt(body, headers);
     }
+    const bool isOverTime = m_limit->hasEnded();
+    m_limit.reset();
     if (outcome == ANSWERED) {
         return trace.result(judge());
     }
     if (giveUp.stop_requested()) {
         m_error = "the agent is ending (" + m_url.authority() + ')';
-    } else if (limit.hasEnded()) {
+    } else if (isOverTime) {
         m_error = "no answer in time (" + m_url.authority() + ')';
     }
     return trace.result(false);
