@@ -9,7 +9,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
-#include <memory>
 #include <optional>
 #include <set>
 #include <utility>
@@ -45,6 +44,22 @@ bool writeAll(int fd, std::string_view text) {
         text.remove_prefix(static_cast<std::size_t>(std::max<ssize_t>(written, 0)));
     }
     return fsync(fd) == 0;
+}
+
+/// Reads the whole file; 0 or the error's number.
+int readAll(const std::string& path, std::string& text) {
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd == -1) {
+        return errno;
+    }
+    char buffer[65536];
+    ssize_t count = 0;
+    while ((count = read(fd, buffer, sizeof buffer)) > 0 || (count == -1 && errno == EINTR)) {
+        text.append(buffer, static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
+    }
+    const int number = count == -1 ? errno : 0;
+    close(fd);
+    return number;
 }
 
 /// A rename lasts only once its directory is on the disk.
@@ -128,20 +143,11 @@ Content SituationStore::load(std::string& message) {
     if (m_path.empty()) {
         return {};
     }
-    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(std::fopen(m_path.c_str(), "re"),
-                                                                 &std::fclose);
-    if (stream == nullptr && errno == ENOENT) {
-        return {};
-    }
     std::string text;
-    if (stream != nullptr) {
-        char buffer[65536];
-        while (const std::size_t count = std::fread(buffer, 1, sizeof buffer, stream.get())) {
-            text.append(buffer, count);
-        }
-    }
-    if (stream == nullptr || std::ferror(stream.get()) != 0) {
-        m_blocked = because("cannot read " + m_path, errno);
+    if (const int number = readAll(m_path, text); number == ENOENT) {
+        return {};
+    } else if (number != 0) {
+        m_blocked = because("cannot read " + m_path, number);
         message = m_blocked + "; no situation is changed through the API until the next start";
         return {};
     }

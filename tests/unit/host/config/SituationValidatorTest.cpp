@@ -1,0 +1,116 @@
+#include "host/config/SituationValidator.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+SituationText named(std::string name) {
+    SituationText text;
+    text.name = std::move(name);
+    return text;
+}
+
+/// The fields that are wrong.
+std::vector<std::string> fieldsOf(const SituationText& text) {
+    SituationConfig situation;
+    std::vector<std::string> fields;
+    for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+        fields.push_back(problem.fieldText());
+    }
+    return fields;
+}
+
+TEST(SituationValidator, KeepsWhatWasWrittenAndMakesConditionsOfIt) {
+    SituationText text = named("ssh");
+    text.text = "Failed logins";
+    text.severity = "major";
+    text.log = "/var/log/auth.log";
+    text.when = {"ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed'"};
+    text.frequency = "> 4";
+    text.period = "1m";
+    SituationConfig situation;
+    EXPECT_THAT(SituationValidator::check(text, situation), IsEmpty());
+    EXPECT_EQ(situation.name, "ssh");
+    EXPECT_EQ(situation.text, "Failed logins");
+    EXPECT_EQ(situation.severity, "major");
+    EXPECT_EQ(situation.log, "/var/log/auth.log");
+    EXPECT_EQ(situation.when, text.when);
+    EXPECT_EQ(situation.frequency, "> 4");
+    EXPECT_EQ(situation.period, "1m");
+    std::vector<std::string> columns;
+    for (const Condition& condition : situation.conditions) {
+        columns.push_back(condition.column);
+    }
+    EXPECT_THAT(columns, ElementsAre("LOGPATH", "LOGNAME", "ENTRYSRC", "ENTRYDESC", "FREQTHRESH",
+                                     "PERIODTHRS"));
+    EXPECT_EQ(situation.conditions.back().number, 60);
+}
+
+TEST(SituationValidator, ANameIsEnough) {
+    SituationConfig situation;
+    EXPECT_THAT(SituationValidator::check(named("a"), situation), IsEmpty());
+    EXPECT_EQ(situation.severity, "warning");
+    EXPECT_THAT(situation.conditions, IsEmpty());
+    EXPECT_FALSE(situation.log);
+}
+
+TEST(SituationValidator, KnowsTheLimitsOfNames) {
+    EXPECT_THAT(fieldsOf(named(std::string(128, 'n'))), IsEmpty());
+    EXPECT_THAT(fieldsOf(named("a/b '\"<>&%\\ \xc3\xa4")), IsEmpty());
+    EXPECT_THAT(fieldsOf(named("...")), IsEmpty());
+    for (const std::string& name :
+         {std::string(), std::string(129, 'n'), std::string("a\nb"), std::string("a\0b", 3),
+          std::string("\x7f"), std::string("."), std::string("..")}) {
+        EXPECT_THAT(fieldsOf(named(name)), ElementsAre("name")) << name;
+    }
+    EXPECT_THAT(fieldsOf(SituationText()), ElementsAre("name"));
+}
+
+TEST(SituationValidator, KnowsTheLimitsOfTextAndConditions) {
+    SituationText text = named("a");
+    text.text = std::string(1024, 't');
+    text.when.assign(100, "ENTRYSRC = 'x'");
+    EXPECT_THAT(fieldsOf(text), IsEmpty());
+    text.text->push_back('t');
+    text.when.emplace_back("ENTRYSRC = 'x'");
+    EXPECT_THAT(fieldsOf(text), ElementsAre("text", "when"));
+    text.text.reset();
+    text.when.assign(16, std::string(4096, 'x'));
+    EXPECT_EQ(fieldsOf(text).size(), 16u) << "each is looked at";
+    text.when.emplace_back("x");
+    EXPECT_THAT(fieldsOf(text), ElementsAre("when"));
+}
+
+TEST(SituationValidator, NamesEveryProblemWithItsPlace) {
+    SituationText text;
+    text.severity = "fatal";
+    text.log = "auth.log";
+    text.when = {"ENTRYSRC = 'x'", "NOTHING = 'x'", "ENTRYSRC = 5"};
+    text.frequency = "often";
+    EXPECT_THAT(fieldsOf(text), ElementsAre("name", "severity", "log", "when[1]", "when[2]",
+                                            "frequency", "frequency"));
+    SituationConfig situation;
+    const auto problems = SituationValidator::check(text, situation);
+    EXPECT_THAT(problems[3].what, HasSubstr("in \"NOTHING = 'x'\": 'NOTHING' is no column"));
+    EXPECT_THAT(problems[3].cure, HasSubstr("the columns are ORIGINNODE, "));
+}
+
+TEST(SituationValidator, ThresholdsStandInOnePlaceOnly) {
+    SituationText text = named("a");
+    text.when = {"FREQTHRESH >= 5", "PERIODTHRS = 60"};
+    EXPECT_THAT(fieldsOf(text), IsEmpty());
+    text.period = "60s";
+    EXPECT_THAT(fieldsOf(text), ElementsAre("frequency", "period"));
+    text.frequency = ">= 5";
+    EXPECT_THAT(fieldsOf(text), ElementsAre("frequency"));
+}
+
+} // namespace

@@ -1,0 +1,274 @@
+// The situations as the API sees and changes them.
+
+#include "host/config/SituationValidator.h"
+#include "host/situations/SituationSet.h"
+
+#include "host/events/EventQueue.h"
+#include "support/Faults.h"
+#include "support/RecordingTrace.h"
+#include "support/TemporaryDirectory.h"
+#include "tables/zrm_rmlogent_data.h"
+#include "tables/zrm_rmlogent_manager.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <cerrno>
+#include <cstring>
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+SituationConfig situation(const std::string& name, std::vector<std::string> when = {},
+                          const std::string& severity = "minor") {
+    SituationText text;
+    text.name = name;
+    text.when = std::move(when);
+    text.severity = severity;
+    SituationConfig config;
+    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    return config;
+}
+
+const SituationStatus& done(const SituationSet::Change& change) {
+    return std::get<SituationStatus>(change);
+}
+
+SituationRefusal::Reason refused(const SituationSet::Change& change) {
+    return std::get<SituationRefusal>(change).reason;
+}
+
+class SituationChanges : public testing::Test {
+protected:
+    SituationChanges() { begin(); }
+
+    /// As a new process begins.
+    void begin() {
+        set.reset();
+        set = std::make_unique<SituationSet>(entries, queue, directory.file("situations.json"));
+        EXPECT_EQ(set->load(), "");
+    }
+    /// The situations that an entry of this source raises.
+    std::vector<std::string> raisedBy(const std::string& source) {
+        zrm_rmlogent_data_t row;
+        std::memset(&row, ' ', sizeof row);
+        source.copy(row.entrysrc, sizeof row.entrysrc);
+        entries.AddDataToEvent(&row, 1);
+        std::vector<std::string> names;
+        while (queue.backlog(reader) > 0) {
+            names.push_back(queue.read(reader, 1)[0].situation->name);
+            queue.release(reader, 1);
+        }
+        return names;
+    }
+    std::vector<std::string> names() const {
+        std::vector<std::string> names;
+        for (const SituationStatus& status : set->list()) {
+            names.push_back(status.config.name);
+        }
+        return names;
+    }
+
+    RecordingTrace trace{TRC1_ERROR};
+    TemporaryDirectory directory;
+    zrm_rmlogent_manager entries{"ZRM", "RMLOGENT"};
+    EventQueue queue{64, sizeof(zrm_rmlogent_data_t)};
+    EventQueue::Reader reader = queue.addReader();
+    std::unique_ptr<SituationSet> set;
+};
+
+TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
+    EXPECT_EQ(done(set->add(situation("a"))).state, SituationStatus::RUNNING);
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+    EXPECT_EQ(done(set->replace(situation("a", {"ENTRYSRC = 'y'"}))).config.when.size(), 1u);
+    EXPECT_THAT(raisedBy("x"), IsEmpty());
+    EXPECT_THAT(raisedBy("y"), ElementsAre("a"));
+    EXPECT_EQ(done(set->stop("a")).state, SituationStatus::STOPPED);
+    EXPECT_THAT(raisedBy("y"), IsEmpty());
+    EXPECT_EQ(done(set->start("a")).state, SituationStatus::RUNNING);
+    EXPECT_THAT(raisedBy("y"), ElementsAre("a"));
+    EXPECT_FALSE(set->remove("a"));
+    EXPECT_THAT(raisedBy("y"), IsEmpty());
+    EXPECT_FALSE(set->find("a"));
+}
+
+TEST_F(SituationChanges, OutliveTheProcess) {
+    set->apply({situation("filed")});
+    set->add(situation("a"));
+    set->add(situation("b"));
+    set->stop("filed");
+    set->stop("b");
+    begin();
+    set->apply({situation("filed"), situation("other")});
+    EXPECT_THAT(names(), ElementsAre("filed", "other", "a", "b"));
+    EXPECT_THAT(raisedBy("x"), testing::UnorderedElementsAre("other", "a"));
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED);
+    set->start("filed");
+    set->remove("a");
+    begin();
+    set->apply({situation("filed"), situation("other")});
+    EXPECT_THAT(raisedBy("x"), testing::UnorderedElementsAre("filed", "other"));
+}
+
+TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
+    set->apply({situation("filed")});
+    set->stop("filed");
+    set->apply({});
+    set->apply({situation("filed")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
+    set->stop("filed");
+    set->apply({situation("filed", {}, "major")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
+}
+
+TEST_F(SituationChanges, AreRefusedWithTheReason) {
+    set->apply({situation("filed")});
+    set->add(situation("a"));
+    EXPECT_EQ(refused(set->add(situation("a"))), SituationRefusal::EXISTS);
+    EXPECT_EQ(refused(set->add(situation("filed"))), SituationRefusal::EXISTS);
+    EXPECT_EQ(refused(set->replace(situation("filed"))), SituationRefusal::FROM_FILE);
+    EXPECT_EQ(refused(set->replace(situation("none"))), SituationRefusal::UNKNOWN);
+    EXPECT_EQ(set->remove("filed")->reason, SituationRefusal::FROM_FILE);
+    EXPECT_EQ(set->remove("none")->reason, SituationRefusal::UNKNOWN);
+    EXPECT_EQ(refused(set->start("none")), SituationRefusal::UNKNOWN);
+    EXPECT_EQ(refused(set->stop("none")), SituationRefusal::UNKNOWN);
+    EXPECT_THAT(names(), ElementsAre("filed", "a"));
+}
+
+TEST_F(SituationChanges, AreNotMadeWhenTheyCannotBeSaved) {
+    set->add(situation("a"));
+    const auto refusedForDisk = [&](auto change) {
+        const Fault fault("write", ENOSPC);
+        const SituationSet::Change result = change();
+        return std::get<SituationRefusal>(result);
+    };
+    for (const SituationRefusal& refusal :
+         {refusedForDisk([&] { return set->add(situation("b")); }),
+          refusedForDisk([&] { return set->replace(situation("a", {"ENTRYSRC = 'y'"})); }),
+          refusedForDisk([&] { return set->stop("a"); }),
+          refusedForDisk([&]() -> SituationSet::Change { return *set->remove("a"); })}) {
+        EXPECT_EQ(refusal.reason, SituationRefusal::NOT_SAVED);
+        EXPECT_THAT(refusal.detail, HasSubstr("was not made: cannot write "));
+        EXPECT_THAT(refusal.detail, HasSubstr("No space left on device"));
+    }
+    EXPECT_THAT(names(), ElementsAre("a"));
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+    begin();
+    set->apply({});
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+}
+
+TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
+    set->add(situation("a", {}, "minor"));
+    set->apply({situation("a", {}, "critical")});
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+    const auto all = set->list();
+    ASSERT_EQ(all.size(), 2u);
+    EXPECT_EQ(all[0].source, SituationStatus::FILE);
+    EXPECT_EQ(all[0].state, SituationStatus::RUNNING);
+    EXPECT_EQ(all[1].source, SituationStatus::API);
+    EXPECT_EQ(all[1].state, SituationStatus::FAILED);
+    EXPECT_THAT(all[1].problem, HasSubstr("the configuration file has a situation of this name"));
+    EXPECT_EQ(set->find("a")->config.severity, "critical");
+    // Changed, it still waits.
+    EXPECT_EQ(done(set->replace(situation("a", {}, "info"))).state, SituationStatus::FAILED);
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+    // A stop is the file's.
+    set->stop("a");
+    EXPECT_THAT(raisedBy("x"), IsEmpty());
+    set->apply({});
+    EXPECT_EQ(set->find("a")->state, SituationStatus::RUNNING);
+    EXPECT_EQ(set->find("a")->config.severity, "info");
+    EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
+}
+
+TEST_F(SituationChanges, CountsBeginAnewWithAnotherDefinitionOnly) {
+    set->add(situation("a"));
+    raisedBy("x");
+    EXPECT_EQ(set->find("a")->raised, 1u);
+    EXPECT_EQ(done(set->replace(situation("a"))).raised, 1u);
+    set->stop("a");
+    raisedBy("x");
+    set->start("a");
+    raisedBy("x");
+    const SituationStatus status = *set->find("a");
+    EXPECT_EQ(status.offered, 2u);
+    EXPECT_EQ(status.matched, 2u);
+    EXPECT_EQ(status.discarded, 0u);
+    EXPECT_EQ(status.raised, 2u);
+    EXPECT_NE(status.lastRaised, 0);
+    EXPECT_EQ(done(set->replace(situation("a", {}, "info"))).raised, 0u);
+    EXPECT_EQ(set->find("a")->lastRaised, 0);
+}
+
+TEST_F(SituationChanges, ThereIsAMostNumber) {
+    std::string text = R"({"version":1,"stopped":[],"situations":[)";
+    for (std::size_t number = 0; number < SituationSet::mostMade; ++number) {
+        text += (number == 0 ? "" : ",") + (R"({"name":"s)" + std::to_string(number)) +
+                R"(","when":["ENTRYSRC = 'x'"],"stopped":true})";
+    }
+    directory.write("situations.json", text + "]}");
+    begin();
+    set->apply({situation("filed")});
+    const SituationSet::Change change = set->add(situation("a"));
+    EXPECT_EQ(refused(change), SituationRefusal::TOO_MANY);
+    EXPECT_EQ(std::get<SituationRefusal>(change).detail,
+              "there are 1000 situations made through the API: remove one first");
+    EXPECT_FALSE(set->remove("s0"));
+    EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
+}
+
+TEST_F(SituationChanges, MayBeAskedForByManyThreadsWhileEntriesArrive) {
+    set->apply({situation("filed", {"ENTRYSRC = 'never'"})});
+    std::atomic<bool> isOver{false};
+    std::thread log([&] {
+        zrm_rmlogent_data_t row;
+        std::memset(&row, ' ', sizeof row);
+        while (!isOver) {
+            entries.AddDataToEvent(&row, 1);
+        }
+    });
+    std::thread looker([&] {
+        while (!isOver) {
+            for (const SituationStatus& status : set->list()) {
+                EXPECT_GE(status.offered, status.matched);
+                EXPECT_GE(status.matched, status.raised);
+            }
+        }
+    });
+    std::thread reloader([&] {
+        for (int round = 0; round < 30; ++round) {
+            set->apply({situation("filed", {"ENTRYSRC = 'never'"}, round % 2 ? "info" : "minor")});
+        }
+    });
+    std::vector<std::thread> changers;
+    for (int number = 0; number < 4; ++number) {
+        changers.emplace_back([&, name = "s" + std::to_string(number)] {
+            for (int round = 0; round < 10; ++round) {
+                const SituationConfig config = situation(name, {"ENTRYSRC = 'never'"});
+                EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(config)));
+                EXPECT_EQ(done(set->stop(name)).state, SituationStatus::STOPPED);
+                EXPECT_EQ(done(set->start(name)).state, SituationStatus::RUNNING);
+                EXPECT_FALSE(set->remove(name));
+            }
+        });
+    }
+    for (std::thread& changer : changers) {
+        changer.join();
+    }
+    reloader.join();
+    isOver = true;
+    log.join();
+    looker.join();
+    EXPECT_THAT(names(), ElementsAre("filed"));
+}
+
+} // namespace

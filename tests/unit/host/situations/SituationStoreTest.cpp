@@ -1,0 +1,196 @@
+#include "host/situations/SituationStore.h"
+
+#include "host/config/SituationValidator.h"
+#include "support/Faults.h"
+#include "support/RecordingTrace.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+
+#include <sys/stat.h>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::EndsWith;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+SituationConfig situation(const std::string& name) {
+    SituationText text;
+    text.name = name;
+    text.text = "'; DROP TABLE x; -- <b> \" \\ \xe2\x82\xac";
+    text.severity = "major";
+    text.log = "/var/log/a b.log";
+    text.when = {"ENTRYSRC = 'it''s'", "ENTRYDESC matches '[\"\\\\]'"};
+    text.frequency = ">= 2";
+    text.period = "1h";
+    SituationConfig config;
+    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    return config;
+}
+
+SituationStore::Content content() {
+    return {{{situation("a"), false}, {situation("b/c"), true}}, {"filed"}};
+}
+
+class SituationStoreTest : public testing::Test {
+protected:
+    std::string text() const {
+        std::ifstream stream(file);
+        return {std::istreambuf_iterator<char>(stream), {}};
+    }
+    std::vector<std::string> names() const {
+        std::vector<std::string> names;
+        for (const auto& entry : std::filesystem::directory_iterator(directory.path())) {
+            names.push_back(entry.path().filename());
+        }
+        return names;
+    }
+
+    RecordingTrace trace{TRC1_ERROR};
+    TemporaryDirectory directory;
+    const std::string file = directory.file("situations.json");
+    SituationStore store{file};
+    std::string message;
+};
+
+TEST_F(SituationStoreTest, GivesBackWhatWasSaved) {
+    EXPECT_EQ(store.save(content()), "");
+    const SituationStore::Content loaded = SituationStore(file).load(message);
+    EXPECT_EQ(message, "");
+    ASSERT_EQ(loaded.made.size(), 2u);
+    EXPECT_EQ(loaded.made[0].config, situation("a"));
+    EXPECT_EQ(loaded.made[1].config, situation("b/c"));
+    EXPECT_FALSE(loaded.made[0].isStopped);
+    EXPECT_TRUE(loaded.made[1].isStopped);
+    EXPECT_EQ(loaded.made[0].problem, "");
+    EXPECT_THAT(loaded.stoppedFiles, ElementsAre("filed"));
+    EXPECT_THAT(names(), ElementsAre("situations.json")) << "no temporary is left";
+    struct stat status {};
+    stat(file.c_str(), &status);
+    EXPECT_EQ(status.st_mode & S_IRWXO, 0u);
+}
+
+TEST_F(SituationStoreTest, IsEmptyWithoutAFile) {
+    EXPECT_THAT(store.load(message).made, IsEmpty());
+    EXPECT_EQ(message, "");
+    EXPECT_THAT(names(), IsEmpty());
+}
+
+TEST_F(SituationStoreTest, KeepsNothingWithoutAPath) {
+    SituationStore nothing("");
+    EXPECT_EQ(nothing.save(content()), "");
+    EXPECT_THAT(nothing.load(message).made, IsEmpty());
+}
+
+TEST_F(SituationStoreTest, MakesItsDirectory) {
+    SituationStore deeper(directory.file("state") + "/situations.json");
+    EXPECT_EQ(deeper.save(content()), "");
+    EXPECT_EQ(deeper.load(message).made.size(), 2u);
+    SituationStore tooDeep(directory.file("no") + "/such/situations.json");
+    EXPECT_THAT(tooDeep.save(content()),
+                HasSubstr("cannot make the directory " + directory.file("no") + "/such: "));
+}
+
+TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
+    ASSERT_EQ(store.save(content()), "");
+    const std::string before = text();
+    for (const char* const call : {"open", "write", "close"}) {
+        trace.clear();
+        const Fault fault(call, ENOSPC);
+        const std::string problem = store.save({});
+        EXPECT_EQ(fault.failed(), 1) << call;
+        EXPECT_THAT(problem, EndsWith(": No space left on device")) << call;
+        EXPECT_THAT(trace.messages(),
+                    ElementsAre("The situations cannot be saved: " + problem + "."));
+        EXPECT_EQ(text(), before) << call;
+        EXPECT_THAT(names(), ElementsAre("situations.json")) << call;
+    }
+    EXPECT_EQ(store.save({}), "");
+    EXPECT_NE(text(), before);
+}
+
+TEST_F(SituationStoreTest, SaysThatTheFileCannotBeReplaced) {
+    std::filesystem::create_directory(file);
+    directory.write("situations.json/inside", "x");
+    SituationStore fresh(file);
+    EXPECT_THAT(fresh.save(content()), HasSubstr("cannot replace " + file + ": "));
+    EXPECT_THAT(names(), ElementsAre("situations.json"));
+}
+
+TEST_F(SituationStoreTest, MovesAsideWhatItCannotUse) {
+    const std::pair<const char*, const char*> bad[] = {
+        {"", "it is damaged"},
+        {"{\"version\":1,", "it is damaged"},
+        {"null", "it is damaged"},
+        {"[1]", "it is damaged"},
+        {R"({"version":1})", "it is damaged"},
+        {R"({"version":1,"situations":{},"stopped":5})", "it is damaged"},
+        {R"({"version":1,"situations":[{"name":5}],"stopped":[]})", "it is damaged"},
+        {R"({"version":1,"situations":[{"name":"a","when":[]}],"stopped":[]})", "it is damaged"},
+        {R"({"version":7,"situations":[],"stopped":[]})", "its version is 7, this agent's is 1"},
+        {R"({"version":1,"situations":[{"name":"a","when":[],"stopped":false},)"
+         R"({"name":"a","when":[],"stopped":false}],"stopped":[]})",
+         "a name comes twice"},
+    };
+    for (const auto& [written, reason] : bad) {
+        for (const std::string& name : names()) {
+            std::filesystem::remove(directory.file(name));
+        }
+        directory.write("situations.json", written);
+        SituationStore fresh(file);
+        EXPECT_THAT(fresh.load(message).made, IsEmpty()) << written;
+        EXPECT_THAT(message, HasSubstr(file + " cannot be used (" + reason + ") and was moved to " +
+                                       file + ".bad-"))
+            << written;
+        ASSERT_EQ(names().size(), 1u);
+        EXPECT_THAT(names()[0], HasSubstr("situations.json.bad-"));
+        EXPECT_EQ(fresh.save(content()), "") << "a new one is begun";
+    }
+}
+
+TEST_F(SituationStoreTest, SavesNothingOverWhatItCouldNotRead) {
+    ASSERT_EQ(store.save(content()), "");
+    const std::string before = text();
+    SituationStore fresh(file);
+    {
+        const Fault fault("open", EACCES);
+        fresh.load(message);
+    }
+    EXPECT_EQ(message, "cannot read " + file +
+                           ": Permission denied; no situation is changed through the API until the "
+                           "next start");
+    EXPECT_EQ(fresh.save({}), "cannot read " + file + ": Permission denied");
+    EXPECT_EQ(text(), before);
+    SituationStore torn(file);
+    {
+        const Fault fault("read", EIO);
+        torn.load(message);
+    }
+    EXPECT_THAT(message, HasSubstr("cannot read " + file));
+    EXPECT_NE(torn.save({}), "");
+    EXPECT_EQ(text(), before);
+}
+
+TEST_F(SituationStoreTest, SaysWhatIsWrongWithASituationThatCannotRun) {
+    directory.write("situations.json",
+                    R"({"version":1,"situations":[{"name":"a","when":["GONE = 'x'"],)"
+                    R"("frequency":">= 5","stopped":true}],"stopped":[]})");
+    const auto loaded = store.load(message);
+    EXPECT_EQ(message, "");
+    ASSERT_EQ(loaded.made.size(), 1u);
+    EXPECT_EQ(loaded.made[0].config.name, "a");
+    EXPECT_THAT(loaded.made[0].config.when, ElementsAre("GONE = 'x'"));
+    EXPECT_THAT(loaded.made[0].problem, HasSubstr("when[0]: in \"GONE = 'x'\": 'GONE' is no"));
+    EXPECT_THAT(loaded.made[0].problem, HasSubstr("; frequency: has no period beside it"));
+}
+
+} // namespace
