@@ -48,6 +48,7 @@ def prompt(api, path="/healthz"):
     return time.monotonic() - begin
 
 
+@pytest.mark.slow
 def test_a_thousand_idle_connections_and_slow_senders_hold_nobody_up(agent, serving):
     log, api = serving
     _, hard = resource.getrlimit(resource.RLIMIT_NOFILE)
