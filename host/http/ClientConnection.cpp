@@ -10,6 +10,9 @@ using namespace std::chrono_literals;
 
 constexpr auto requestTime = 10s; ///< for head and body together
 constexpr auto answerTime = 60s;  ///< for an answer that is no stream
+/// Behind a head: a body in chunks of a few bytes each is several times as long as what it says.
+constexpr std::size_t mostBehindHead = 8 * 1024 * 1024;
+constexpr std::size_t pieceSize = 4096; ///< received at a time
 constexpr std::string_view headEnd = "\r\n\r\n";
 
 } // namespace
@@ -26,12 +29,13 @@ ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle
         if (end != std::string::npos && end <= largestHead) {
             dropRanges(end);
             m_answerDeadline = m_requestDeadline + answerTime;
+            m_bodyLeft = mostBehindHead;
             return COMPLETE;
         }
         if (m_in.size() > largestHead) {
             return TOO_LONG;
         }
-        char bytes[4096];
+        char bytes[pieceSize];
         ClientSocket::Outcome outcome{};
         const std::size_t count = m_socket.receive(bytes, sizeof bytes, m_requestDeadline, outcome);
         if (count == 0) {
@@ -60,10 +64,19 @@ void ClientConnection::dropRanges(std::size_t headSize) {
     }
 }
 
+// The library reads the sizes of chunks byte by byte.
+void ClientConnection::refill() {
+    m_in.resize(std::min(pieceSize, m_bodyLeft));
+    m_at = 0;
+    ClientSocket::Outcome outcome{};
+    m_in.resize(
+        m_in.empty() ? 0 : m_socket.receive(m_in.data(), m_in.size(), m_requestDeadline, outcome));
+    m_bodyLeft -= m_in.size();
+}
+
 std::size_t ClientConnection::read(char* bytes, std::size_t size) {
     if (m_at == m_in.size()) {
-        ClientSocket::Outcome outcome{};
-        return m_socket.receive(bytes, size, m_requestDeadline, outcome);
+        refill();
     }
     const std::size_t count = std::min(size, m_in.size() - m_at);
     std::copy_n(m_in.data() + m_at, count, bytes);

@@ -26,7 +26,8 @@ public:
     /// thing to be read. The time for head and body begins with the first byte.
     Head readHead(std::chrono::milliseconds idle);
 
-    /// Reads on in the request. The number of bytes; 0 when the client sends no more in time.
+    /// Reads on in the request. The number of bytes; 0 when the client sends no more in time, or
+    /// more than any request needs.
     std::size_t read(char* bytes, std::size_t size);
 
     /// True when the time for head and body is over.
@@ -41,11 +42,13 @@ public:
     bool isGone() const { return m_socket.isGone(); }
 
 private:
+    void refill();
     void dropRanges(std::size_t headSize);
 
     ClientSocket& m_socket;
-    std::string m_in;     ///< received
-    std::size_t m_at = 0; ///< of it, what has been read
+    std::string m_in;           ///< received
+    std::size_t m_at = 0;       ///< of it, what has been read
+    std::size_t m_bodyLeft = 0; ///< bytes behind the head that may still be received
     Clock::time_point m_requestDeadline;
     Clock::time_point m_answerDeadline;
 };

@@ -110,6 +110,7 @@ bool ClientSocket::isGone() const {
 }
 
 void ClientSocket::linger() {
+    sayFarewell();
     shutdown(m_fd, SHUT_WR);
     const Clock::time_point deadline = Clock::now() + lingering;
     char bytes[16384];

@@ -44,6 +44,9 @@ public:
     void linger();
 
 protected:
+    /// Whatever is said before the connection is closed for sending.
+    virtual void sayFarewell() {}
+
     /// The number of bytes; 0 when the client has closed the connection, or it is broken; -1 when
     /// there are none yet: `wanted` is then what to wait for with poll.
     virtual ssize_t tryReceive(char* bytes, std::size_t size, short& wanted);

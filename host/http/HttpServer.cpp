@@ -5,6 +5,7 @@
 #include "host/http/DescriptorRoom.h"
 #include "host/http/TlsSocket.h"
 
+#include <exception>
 #include <system_error>
 #include <utility>
 
@@ -92,7 +93,17 @@ void HttpServer::serve(int fd) {
     if (!socket->open(Clock::now() + openTime)) {
         return;
     }
-    ClientConnection connection(*socket);
+    try {
+        serveRequests(*socket);
+    } catch (const std::exception& exception) {
+        TraceScope trace(anchor);
+        trace.error()("A connection broke off: %s", exception.what());
+    }
+    socket->linger();
+}
+
+void HttpServer::serveRequests(ClientSocket& socket) {
+    ClientConnection connection(socket);
     for (std::size_t number = 0; number < HttpExchange::requestsPerConnection; ++number) {
         const ClientConnection::Head head = connection.readHead(idleTime());
         if (head == ClientConnection::NONE) {
@@ -100,17 +111,16 @@ void HttpServer::serve(int fd) {
         }
         if (head == ClientConnection::TOO_LONG) {
             HttpExchange::refuse(connection, {431, "the head has more than 16384 bytes", ""});
-            break;
+            return;
         }
         if (head == ClientConnection::TOO_SLOW) {
             HttpExchange::refuse(connection, {408, "the request did not come within 10 s", ""});
-            break;
+            return;
         }
         if (!m_exchange.serve(connection) || m_stop.isRaised()) {
-            break;
+            return;
         }
     }
-    socket->linger();
 }
 
 void HttpServer::stop(Clock::time_point limit) {

@@ -58,6 +58,7 @@ private:
     void accept(int fd);
     std::unique_ptr<ClientSocket> socketFor(int fd) const;
     void serve(int fd);
+    void serveRequests(ClientSocket& socket);
     std::chrono::milliseconds idleTime() const;
 
     RequestDispatcher m_dispatcher;

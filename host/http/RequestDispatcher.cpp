@@ -4,8 +4,12 @@
 #include "host/http/RequestRefused.h"
 #include "host/http/UrlText.h"
 
+#include <algorithm>
 #include <exception>
+#include <string_view>
 #include <utility>
+
+#include <strings.h>
 
 namespace {
 
@@ -29,6 +33,15 @@ void decodeQuery(IncomingRequest& incoming) {
     incoming.request.query = std::move(*query);
 }
 
+/// True for application/json, with or without parameters.
+bool isJson(const std::string& contentType) {
+    constexpr std::string_view json = "application/json";
+    const std::string_view type =
+        std::string_view(contentType)
+            .substr(0, std::min(contentType.find_first_of("; \t"), contentType.size()));
+    return type.size() == json.size() && strncasecmp(type.data(), json.data(), json.size()) == 0;
+}
+
 void readBodyOf(IncomingRequest& incoming, const BodyReader& readBody) {
     constexpr std::size_t most = RequestDispatcher::largestBody;
     if (!incoming.hasBody) {
@@ -37,7 +50,7 @@ void readBodyOf(IncomingRequest& incoming, const BodyReader& readBody) {
     if (incoming.length.value_or(0) > most) {
         throw RequestDispatcher::tooLong();
     }
-    if (!incoming.contentType.starts_with("application/json")) {
+    if (!isJson(incoming.contentType)) {
         throw RequestRefused(415, "send the body as application/json", "Content-Type");
     }
     incoming.request.body = readBody(most);

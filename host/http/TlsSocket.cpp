@@ -23,11 +23,15 @@ TlsSocket::TlsSocket(int fd, const StopSignal& stop, std::shared_ptr<const TlsCo
 }
 
 TlsSocket::~TlsSocket() {
+    SSL_free(m_session);
+}
+
+void TlsSocket::sayFarewell() {
     if (!m_isBroken) {
         ERR_clear_error();
         SSL_shutdown(m_session);
     }
-    SSL_free(m_session);
+    m_isBroken = true; // nothing more is said
 }
 
 /// What a call that gave no bytes means: see tryReceive.

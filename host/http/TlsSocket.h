@@ -18,6 +18,7 @@ public:
     bool open(Clock::time_point deadline) override;
 
 protected:
+    void sayFarewell() override;
     ssize_t tryReceive(char* bytes, std::size_t size, short& wanted) override;
     ssize_t trySend(const char* bytes, std::size_t size, short& wanted) override;
 

@@ -142,6 +142,8 @@ def test_long_heads_are_refused(serving):
         "huge length": ("Content-Length: 99999999999999999999999\r\n", 400),
         "large length": ("Content-Length: 2000000\r\n", 413),
         "packed": ("Content-Length: 2\r\nContent-Encoding: gzip\r\n", 400),
+        "another kind": ("Content-Length: 2\r\nContent-Type: application/jsonlines\r\n", 415),
+        "with parameters": ("Content-Length: 2\r\nContent-Type: Application/JSON; charset=utf-8\r\n", 200),
         "form": ("Content-Length: 2\r\nContent-Type: multipart/form-data; boundary=x\r\n", 415),
         "two hosts": ("Host: evil.example\r\nContent-Length: 2\r\n", 400),
         "ranges": ("Content-Length: 2\r\nRange: bytes=" + "0-1," * 3000 + "5-6\r\n", 200),
@@ -210,6 +212,10 @@ def test_chunked_bodies_are_read(serving):
     assert status == 200 and json.loads(body)["table"] == "RMMONLOG"
     status, body = exchange(api, head + b"zz\r\n{}\r\n0\r\n\r\n")
     assert status in (400, 413), body
+    begin = time.monotonic()
+    status, body = exchange(api, head + b"1" * 9_000_000, end=False)
+    assert status == 400, "a size that never ends"
+    assert time.monotonic() - begin < 9
     huge = b"".join(b"10000\r\n" + b" " * 65536 + b"\r\n" for _ in range(20)) + b"0\r\n\r\n"
     status, body = exchange(api, head + huge)
     assert status == 413, body

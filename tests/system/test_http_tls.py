@@ -81,6 +81,7 @@ def test_the_names_of_the_certificate_are_names_of_the_server(serving):
     assert origin("https://evil.example") == 403
 
 
+@pytest.mark.filterwarnings("ignore:ssl.TLSVersion.TLSv1")
 def test_old_tls_and_no_tls_are_refused(serving):
     port, token, context = serving()
     old = ssl.create_default_context()
