@@ -65,12 +65,13 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
             const auto& [source, name] = record->first;
             if (source == FILE_SOURCE && !names.contains(name)) {
                 m_runner.stop(runnerKey(source, name));
-                m_stoppedFiles.erase(name);
                 record = m_records.erase(record);
             } else {
                 ++record;
             }
         }
+        std::erase_if(m_stoppedFiles,
+                      [&](const std::string& name) { return !names.contains(name); });
         for (const SituationConfig& config : configs) {
             const Key key{FILE_SOURCE, config.name};
             const auto found = m_records.find(key);
@@ -220,9 +221,13 @@ void SituationSet::publish(const Key& key, const Draft& draft) {
         m_runner.stop(runnerKey(key.first, key.second));
         return;
     }
-    m_stoppedFiles = draft.stoppedFiles;
     if (key.first == FILE_SOURCE) {
         if (found != m_records.end()) {
+            if (drafted->second.isStopped) {
+                m_stoppedFiles.insert(key.second);
+            } else {
+                m_stoppedFiles.erase(key.second);
+            }
             found->second.isStopped = drafted->second.isStopped;
             runAgain(key, found->second);
         }

@@ -125,6 +125,11 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
     set->apply({situation("filed")});
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
     set->stop("filed");
+    begin();
+    set->apply({}); // removed while no agent ran
+    set->apply({situation("filed")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
+    set->stop("filed");
     set->apply({situation("filed", {}, "major")});
     EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
 }
