@@ -66,6 +66,7 @@ std::vector<Explanation> Explainer::last(LogFile& log, std::size_t number) {
         }
     });
     std::vector<Explanation> explanations;
+    explanations.reserve(seen.size());
     for (Seen& entry : seen) {
         explanations.push_back(describe(entry));
     }

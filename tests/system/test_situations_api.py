@@ -487,6 +487,7 @@ def test_situations_change_while_entries_arrive(running):
 
 def test_a_full_queue_holds_no_change_up_for_long(agent):
     """A sink that takes nothing: the log thread waits with the table's lock."""
+    agent.history = {"enabled": False}  # the sink stands between the queue and the log
     agent.listen = "127.0.0.1:0"
     agent.sink = str(agent.directory / "pipe")
     os.mkfifo(agent.sink)
