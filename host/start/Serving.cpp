@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "agent/framework/ctreq.h"
 #include "host/analysis/AnalysisResource.h"
+#include "host/console/ConsoleResource.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/http/AgentResource.h"
@@ -71,6 +72,7 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
 
 void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<HealthResource>());
+    addResource(std::make_unique<ConsoleResource>());
     addResource(std::make_unique<AgentResource>(m_delivery));
     addResource(std::make_unique<LogsResource>());
     addResource(std::make_unique<SampleResource>(m_sampler));

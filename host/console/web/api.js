@@ -1,0 +1,86 @@
+// Requests to the agent, with the session's token.
+
+const KEY = "zrm-token";
+
+export const token = {
+  get: () => sessionStorage.getItem(KEY) || "",
+  set: (value) => sessionStorage.setItem(KEY, value),
+  clear: () => sessionStorage.removeItem(KEY),
+  /** Takes a token from the address and removes it there. */
+  takeFromAddress() {
+    const match = /^#token=([^&]*)&?(.*)$/.exec(location.hash);
+    if (!match) return;
+    if (match[1]) token.set(decodeURIComponent(match[1]));
+    history.replaceState(null, "", `${location.pathname}#${match[2] || "/logs"}`);
+  },
+};
+
+/** Why a request failed, and what to do. */
+export class ApiError extends Error {
+  constructor(status, problem) {
+    super(problem.detail || problem.title || `The agent answered with status ${status}.`);
+    this.status = status;
+    this.field = problem.field || "";
+    if (status === 0) {
+      this.title = "The agent does not answer";
+      this.cure = "The console goes on by itself as soon as it does.";
+    } else if (status === 404 && !problem.detail) {
+      this.title = "Not there";
+    } else if (status >= 500) {
+      this.title = "The agent could not do that";
+      this.cure = "Its trace says more.";
+    }
+  }
+}
+
+/** Tells the page: `lost` and `found` for the connection, `refused` for the token. */
+export const signals = new EventTarget();
+const signal = (name) => signals.dispatchEvent(new Event(name));
+
+export async function open(path, options = {}) {
+  const headers = { Authorization: `Bearer ${token.get()}`, ...options.headers };
+  let body;
+  if (options.body !== undefined) {
+    headers["Content-Type"] = "application/json";
+    body = JSON.stringify(options.body);
+  }
+  let response;
+  try {
+    response = await fetch(path, { method: options.method || "GET", headers, body, signal: options.signal, cache: "no-store" });
+  } catch (error) {
+    if (error.name === "AbortError") throw error;
+    signal("lost");
+    throw new ApiError(0, { detail: "The connection to the agent is lost." });
+  }
+  signal("found");
+  if (response.ok) return response;
+  let problem = {};
+  try {
+    problem = await response.json();
+  } catch {
+    // An answer without a problem document still has its status.
+  }
+  if (response.status === 401) signal("refused");
+  throw new ApiError(response.status, problem);
+}
+
+export async function request(method, path, body, abort) {
+  const response = await open(path, { method, body, signal: abort });
+  const text = await response.text();
+  return text ? JSON.parse(text) : null;
+}
+
+export const get = (path, abort) => request("GET", path, undefined, abort);
+export const post = (path, body = {}, abort) => request("POST", path, body, abort);
+
+/** Path and query; lists repeat their key, empty values are left out. */
+export function withQuery(path, values) {
+  const query = new URLSearchParams();
+  for (const [key, value] of Object.entries(values)) {
+    for (const one of [value].flat()) if (one !== "" && one !== null && one !== undefined) query.append(key, one);
+  }
+  const text = query.toString();
+  return text ? `${path}?${text}` : path;
+}
+
+export const situationPath = (name, action = "") => `/api/v1/situations/${encodeURIComponent(name)}${action && `/${action}`}`;

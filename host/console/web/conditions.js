@@ -1,0 +1,139 @@
+// Conditions, chosen from the columns. Their text form is COLUMN OPERATOR VALUE.
+
+import { button, fill, h, select } from "./dom.js";
+
+const FORM = /^\s*([A-Z]+)\s*(!=|>=|<=|=|<|>|contains\b|starts\b|matches\b|in\b)\s*([^]*)$/;
+const NAMES = {
+  ENTRYSRC: "Source", ENTRYDESC: "Description", ENTRYTYPE: "Type", ENTRYCLASS: "Class", ENTRYSYS: "System", ENTRYTIME: "Time",
+};
+const WORDS = {
+  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches (regular expression)", in: "is one of",
+  ">=": "at least", "<=": "at most", "<": "less than", ">": "more than",
+};
+const FIRST = ["ENTRYSRC", "ENTRYDESC", "ENTRYTYPE", "ENTRYCLASS", "ENTRYSYS", "ENTRYTIME"];
+
+const quote = (text) => `'${text.replaceAll("'", "''")}'`;
+
+function unquote(text) {
+  const inner = /^'((?:[^']|'')*)'\s*$/.exec(text);
+  return inner ? inner[1].replaceAll("''", "'") : null;
+}
+
+/** The parts of a condition; null when only its text can be shown. */
+function parse(text) {
+  const match = FORM.exec(text);
+  if (!match) return null;
+  const [, column, operator, value] = match;
+  if (operator === "in") {
+    const list = /^\[([^]*)\]\s*$/.exec(value);
+    const items = list && list[1].match(/'(?:[^']|'')*'|-?\d+/g);
+    return items && { column, operator, value: items.map((item) => unquote(item) ?? item).join(", ") };
+  }
+  const plain = unquote(value) ?? (/^-?\d+\s*$/.test(value) ? value.trim() : null);
+  return plain === null ? null : { column, operator, value: plain };
+}
+
+/** A list of conditions that a person edits. */
+export class Conditions {
+  #rows = [];
+  #columns;
+  #change;
+
+  /** columns: those of /api/v1/columns; change() after every edit. */
+  constructor(columns, texts, change) {
+    this.#columns = columns;
+    this.#change = change;
+    this.list = h("div", { className: "stack-small" });
+    this.element = h("fieldset", {}, h("legend", {}, "Conditions (all must hold)"), this.list,
+      button("Add a condition", () => {
+        this.#add("ENTRYDESC contains ''").focus();
+        this.#change();
+      }));
+    for (const text of texts) this.#add(text);
+    this.#drawEmpty();
+  }
+
+  /** The conditions as texts; one without a value yet is left out. */
+  get texts() {
+    return this.#rows.filter((row) => !row.isBlank()).map((row) => row.text());
+  }
+
+  /** Puts problems beside their conditions; gives back those of other fields. */
+  setProblems(problems) {
+    for (const row of this.#rows) row.setProblem("");
+    const shown = this.#rows.filter((row) => !row.isBlank());
+    return problems.filter((problem) => {
+      const match = /^(?:definition\.)?(?:when|where)(?:\[(\d+)\])?/.exec(problem.field);
+      const row = match && (shown[Number(match[1] ?? 0)]);
+      row?.setProblem(problem.detail);
+      return !row;
+    });
+  }
+
+  #drawEmpty() {
+    if (this.#rows.length === 0) fill(this.list, h("p", { className: "hint" }, "None: every entry of the log is meant."));
+  }
+
+  #add(text) {
+    if (this.#rows.length === 0) fill(this.list);
+    const parts = parse(text);
+    const row = parts ? this.#chosen(parts) : this.#raw(text);
+    const number = this.#rows.length + 1;
+    const problem = h("p", { className: "problem", hidden: true });
+    row.setProblem = (detail) => {
+      problem.textContent = detail;
+      problem.hidden = !detail;
+      row.input.toggleAttribute("aria-invalid", false);
+      if (detail) row.input.setAttribute("aria-invalid", "true");
+    };
+    row.element.append(button("Remove", () => {
+      this.#rows.splice(this.#rows.indexOf(row), 1);
+      row.element.remove();
+      this.#drawEmpty();
+      this.#change();
+      this.element.querySelector(":scope > button").focus();
+    }, { "aria-label": `Remove condition ${number}` }), problem);
+    this.#rows.push(row);
+    this.list.append(row.element);
+    return row.input;
+  }
+
+  #chosen({ column, operator, value }) {
+    const known = [...this.#columns].sort((a, b) => (FIRST.indexOf(a.name) + 1 || 99) - (FIRST.indexOf(b.name) + 1 || 99));
+    const changed = () => this.#change();
+    const columnBox = select(known.map(({ name }) => [name, NAMES[name] ? `${NAMES[name]} (${name})` : name]), column,
+      { "aria-label": "Column", onchange: () => { offer(); changed(); } });
+    const operatorBox = h("select", { "aria-label": "Operator", onchange: () => { hint(); changed(); } });
+    const input = h("input", { className: "value", value, "aria-label": "Value", spellcheck: false, autocomplete: "off", oninput: changed });
+    const isNumber = () => known.find(({ name }) => name === columnBox.value)?.type === "number";
+    const offer = () => {
+      const before = operatorBox.value || operator;
+      const usable = Object.keys(WORDS).filter((key) => !isNumber() || !["contains", "starts", "matches"].includes(key));
+      fill(operatorBox, usable.map((key) => h("option", { value: key }, WORDS[key])));
+      operatorBox.value = usable.includes(before) ? before : "=";
+      hint();
+    };
+    const hint = () => {
+      input.placeholder = operatorBox.value === "in" ? "one, two, three" : isNumber() ? "a number" : "text";
+    };
+    offer();
+    const write = (text) => (isNumber() ? text.trim() : quote(text));
+    return {
+      element: h("div", { className: "condition", role: "group", "aria-label": "Condition" }, columnBox, operatorBox, input),
+      input,
+      isBlank: () => input.value === "",
+      text: () => {
+        const list = input.value.split(",").map((item) => write(item.trim()));
+        return `${columnBox.value} ${operatorBox.value} ${operatorBox.value === "in" ? `[${list.join(", ")}]` : write(input.value)}`;
+      },
+    };
+  }
+
+  #raw(text) {
+    const input = h("input", { className: "mono", value: text, "aria-label": "Condition", spellcheck: false, oninput: () => this.#change() });
+    return {
+      element: h("div", { className: "condition raw" }, input), input,
+      isBlank: () => input.value.trim() === "", text: () => input.value.trim(),
+    };
+  }
+}

@@ -1,0 +1,29 @@
+// What a situation makes of an entry, in words.
+
+import { h, table } from "./dom.js";
+import { stamp } from "./format.js";
+
+export function explanation(one) {
+  if (!one.row) {
+    return h("div", { className: "stack" }, h("p", { className: "verdict fails" }, "No entry"),
+      one.line && h("pre", {}, one.line), h("p", {}, one.reason || one.decision));
+  }
+  const verdict = one.raised ? "Would be raised" : one.matches ? "Matches, not raised" : "Does not match";
+  return h("div", { className: "stack" },
+    h("p", { className: `verdict ${one.raised || one.matches ? "holds" : "fails"}` }, verdict),
+    h("p", {}, one.decision),
+    one.conditions.length > 0 && table("Conditions", [{ label: "Holds", className: "fit" }, { label: "Condition", className: "wide" }, { label: "The entry has", className: "wide" }],
+      one.conditions.map((condition) => [h("span", { className: condition.holds ? "holds" : "fails" }, condition.holds ? "yes" : "no"), h("code", {}, condition.condition), h("code", {}, String(condition.value))]), { className: "cards" }),
+    one.window && h("p", { className: "quiet" }, `In the last ${one.window.period} s: ${one.window.count}, wanted ${one.window.frequency}.`),
+    h("details", {}, h("summary", {}, "Columns of the entry"), rowList(one.row)));
+}
+
+const TIMES = new Set(["ENTRYTIME", "TIMESTAMP"]);
+
+/** Every column of a row with its value. */
+export function rowList(row) {
+  return h("dl", { className: "pairs" }, Object.entries(row).map(([name, value]) => [
+    h("dt", { className: "mono" }, name),
+    h("dd", {}, value === "" ? h("span", { className: "quiet" }, "blank") : TIMES.has(name) ? `${stamp(value)} (${value})` : String(value)),
+  ]));
+}

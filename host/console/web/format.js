@@ -1,0 +1,72 @@
+// Numbers, sizes and times as people read them.
+
+const whole = new Intl.NumberFormat("en", { maximumFractionDigits: 0 });
+const short = new Intl.NumberFormat("en", { notation: "compact", maximumFractionDigits: 1 });
+
+export const number = (value) => (value === null || value === undefined ? "–" : whole.format(value));
+export const compact = (value) => (value === null || value === undefined ? "–" : short.format(value));
+
+export function bytes(value) {
+  if (value === null || value === undefined || value < 0) return "–";
+  const units = ["B", "kB", "MB", "GB", "TB"];
+  let unit = 0;
+  while (value >= 1000 && unit < units.length - 1) {
+    value /= 1000;
+    unit += 1;
+  }
+  return `${value >= 100 || unit === 0 ? Math.round(value) : value.toFixed(1)} ${units[unit]}`;
+}
+
+const two = (value) => String(value).padStart(2, "0");
+
+/** A time as this browser's local date and time. */
+export function time(value, withMilliseconds = false) {
+  if (!value) return "–";
+  const date = value instanceof Date ? value : new Date(value);
+  if (Number.isNaN(date.getTime())) return String(value);
+  const text = `${date.getFullYear()}-${two(date.getMonth() + 1)}-${two(date.getDate())} ${clock(date)}`;
+  return withMilliseconds ? `${text}.${String(date.getMilliseconds()).padStart(3, "0")}` : text;
+}
+
+export const clock = (date) => `${two(date.getHours())}:${two(date.getMinutes())}:${two(date.getSeconds())}`;
+
+/** The time alone when it is of today. */
+export function briefTime(value) {
+  if (!value) return "–";
+  const text = time(value);
+  return text.startsWith(time(new Date()).slice(0, 10)) ? text.slice(11) : text.slice(5);
+}
+
+/** A 16-digit time stamp as date and time; it is the local time of the agent's machine. */
+export function stamp(value) {
+  const parts = /^([01])(\d\d)(\d\d)(\d\d)(\d\d)(\d\d)(\d\d)/.exec(value || "");
+  if (!parts || /^0+$/.test(value)) return value ? "–" : "";
+  const [, century, year, month, day, hour, minute, second] = parts;
+  return `${century === "1" ? 20 : 19}${year}-${month}-${day} ${hour}:${minute}:${second}`;
+}
+
+export function ago(value) {
+  if (!value) return "never";
+  const seconds = Math.max(0, (Date.now() - new Date(value).getTime()) / 1000);
+  if (seconds < 10) return "just now";
+  if (seconds < 90) return `${Math.round(seconds)} s ago`;
+  if (seconds < 5400) return `${Math.round(seconds / 60)} min ago`;
+  if (seconds < 129600) return `${Math.round(seconds / 3600)} h ago`;
+  return `${Math.round(seconds / 86400)} days ago`;
+}
+
+export const plural = (count, one, many = `${one}s`) => `${number(count)} ${count === 1 ? one : many}`;
+
+/** Entries per minute over the last minutes that are known. */
+export function rate(values, minutes = 5) {
+  const known = values.filter((value) => value !== null).slice(-minutes);
+  if (known.length === 0) return null;
+  return known.reduce((sum, value) => sum + value, 0) / known.length;
+}
+
+export function rateText(value) {
+  if (value === null) return "–";
+  return value > 0 && value < 10 ? value.toFixed(1) : number(value);
+}
+
+export const SEVERITIES = ["critical", "major", "minor", "warning", "info"];

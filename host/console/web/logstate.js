@@ -1,0 +1,40 @@
+// What a monitored log's row says about it, in an operator's words.
+
+import { number } from "./format.js";
+
+const KINDS = { U: "Text", S: "Syslog", A: "Accounting", E: "Error log" };
+export const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
+
+const AGAIN = "Mend it, then re-read the configuration after changing it (touch the file).";
+const WHY = [
+  ["log open failed", `The file cannot be opened: it is missing, or the agent may not read it. ${AGAIN}`],
+  ["format command", `The format of this log cannot be learned. Try it under “Try a format”. ${AGAIN}`],
+  ["log read failed", `Reading failed. Look at the disk and at what writes the file. ${AGAIN}`],
+  ["insufficient memory", `There was too little memory to learn the format. ${AGAIN}`],
+  ["seek for EOF failed", `The end of the file cannot be found; it may be no plain file. ${AGAIN}`],
+  ["child", `The command of this log could not be started. ${AGAIN}`],
+  ["pipe", `The command of this log could not be started. ${AGAIN}`],
+  ["", `The monitor has ended. The agent's trace says why. ${AGAIN}`],
+];
+
+/** {level: "bad" | "warn" | "idle" | "good", state, why} of a log of /api/v1/logs. */
+export function judge({ row, ledger }) {
+  const status = row.MONSTATUS;
+  if (status.startsWith("Error")) {
+    const cause = status.replace(/^Error: /, "");
+    return { level: "bad", state: "Error", why: `${cause}. ${WHY.find(([part]) => cause.includes(part))[1]}` };
+  }
+  if (status === "Stopped") return { level: "bad", state: "Stopped", why: "The monitor has stopped. The agent's trace says why." };
+  if (status !== "Running") return { level: "idle", state: status || "Unknown", why: "" };
+  if (row.LOGSIZE === -1 && row.LOGTYPE !== "E") {
+    return { level: "warn", state: "No file", why: "The file is not there now. It may have been moved away." };
+  }
+  const errors = ledger?.format_errors ?? row.NUMERRORS;
+  const lines = ledger?.lines ?? row.NUMEVENTS;
+  if (errors > 0 && row.LOGTYPE !== "E") {
+    const share = lines > 0 ? Math.min(100, Math.round((errors / lines) * 100)) : 100;
+    return { level: "warn", state: "Rejects", why: `${number(errors)} ${errors === 1 ? "line does" : "lines do"} not fit the format${lines > 0 ? ` (${share < 1 ? "under 1" : share} %)` : ""}. Open the log to see which and why.` };
+  }
+  if (ledger?.skipped_bytes > 0) return { level: "warn", state: "Skipped", why: `${number(ledger.skipped_bytes)} bytes were skipped when the file was cut short.` };
+  return { level: "good", state: "Running", why: "" };
+}

@@ -1,0 +1,69 @@
+// Beside a situation: what it would have done, and what it makes of a line.
+
+import { post } from "./api.js";
+import { button, failure, field, fill, h } from "./dom.js";
+import { explanation } from "./explain.js";
+import { number, plural, stamp } from "./format.js";
+
+const DAY = 24 * 3600 * 1000;
+
+/** "Would have been raised N times in the last 24 hours". `subject()` is the situation or definition. */
+export function previewPanel(subject) {
+  const result = h("div", { role: "status", className: "stack" });
+  let abort = null;
+  const update = async () => {
+    abort?.abort();
+    abort = new AbortController();
+    const mine = abort;
+    fill(result, h("p", { className: "quiet" }, "Reading the last 24 hours …"));
+    try {
+      const now = Date.now();
+      const answer = await post("/api/v1/backtest", { ...subject(), from: new Date(now - DAY).toISOString(), to: new Date(now).toISOString() }, mine.signal);
+      drawPreview(result, answer);
+    } catch (error) {
+      if (error.name !== "AbortError") fill(result, h("p", { className: "quiet" }, error.message));
+    }
+  };
+  return {
+    element: h("section", { className: "panel", "aria-label": "Preview" }, h("h2", {}, "Preview"), result), update,
+    clear: (text) => {
+      abort?.abort();
+      fill(result, h("p", { className: "quiet" }, text));
+    },
+  };
+}
+
+function drawPreview(result, answer) {
+  const times = [...answer.raised_at].reverse();
+  fill(result,
+    h("p", { className: "verdict" }, `Would have been raised ${plural(answer.raised, "time")} in the last 24 hours`),
+    h("p", { className: "quiet" }, `${number(answer.matched)} of ${plural(answer.entries, "entry", "entries")} met the conditions.`,
+      answer.truncated && " The log holds more than was read, so there may be more."),
+    times.length > 0 && h("details", {}, h("summary", {}, "When"), h("ul", {}, times.slice(0, 50).map((one) => h("li", {}, stamp(one))),
+      times.length > 50 && h("li", { className: "quiet" }, `and ${number(answer.raised - 50)} more`))));
+}
+
+/** Explains what the situation makes of a pasted line, or of the log's last entries. */
+export function explainPanel(subject, log) {
+  const input = h("textarea", { rows: 3, spellcheck: false, placeholder: "Paste a line of the log" });
+  const row = field("Line", input);
+  const result = h("div", { role: "status", className: "stack" });
+  const ask = async (what) => {
+    row.setProblem("");
+    if (!log()) {
+      row.setProblem("Choose a log first: its kind says how a line is read.");
+      return;
+    }
+    fill(result, h("p", { className: "quiet" }, "Asking …"));
+    try {
+      const answer = await post("/api/v1/explain", { ...subject(), log: log(), ...what });
+      fill(result, answer.explanations.length > 0 ? answer.explanations.map(explanation) : h("p", {}, "The log holds no entry yet."));
+    } catch (error) {
+      fill(result, failure(error));
+    }
+  };
+  return h("section", { className: "panel", "aria-label": "Explain" }, h("h2", {}, "What would it make of a line?"), row,
+    h("p", { className: "actions" },
+      button("Explain", () => (input.value.trim() ? ask({ line: input.value.split("\n")[0] }) : row.setProblem("Paste a line first."))),
+      button("Explain the last 3 entries", () => ask({ last: 3 }))), result);
+}

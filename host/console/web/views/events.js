@@ -1,0 +1,237 @@
+// Events: live, with filter, pause, and the detail of one.
+
+import { get, post, withQuery } from "../api.js";
+import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
+import { briefTime, number, plural, SEVERITIES, time } from "../format.js";
+import { explanation, rowList } from "../explain.js";
+import { EventStream } from "../stream.js";
+import { WindowedList } from "../windowed.js";
+
+const PAGE = 200;
+const MOST = 20000; // kept in the page; older ones are in the history
+
+const describe = (event) => event.row?.UENTRYDESC || event.row?.ENTRYDESC || "";
+const logOf = (event) => (event.row?.ULOGPATH || event.row?.LOGPATH || "") + (event.row?.ULOGNAME || event.row?.LOGNAME || "");
+
+export async function show(element, query) {
+  const page = new EventsPage(element, query);
+  await page.start();
+  return () => page.end();
+}
+
+class EventsPage {
+  constructor(element, query) {
+    this.all = []; // newest first, before the text filter
+    this.waiting = [];
+    this.arrived = [];
+    this.isPaused = false;
+    this.hasOlder = true;
+    this.wanted = query.get("situation") || "";
+    this.#build(element);
+  }
+
+  #build(element) {
+    const again = () => this.restart();
+    this.situation = select([["", "All situations"]], "", { onchange: again });
+    this.log = select([["", "All logs"]], "", { onchange: again });
+    this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
+    this.text = h("input", { type: "search", placeholder: "in the description", oninput: debounce(() => this.#filter(), 150) });
+    this.state = h("p", { className: "state", role: "status" }, "Connecting");
+    this.pause = button("Pause", () => this.#togglePause(), { "aria-pressed": "false" });
+    this.newer = button("", () => { this.list.element.scrollTop = 0; this.list.element.focus(); }, { hidden: true });
+    this.count = h("p", { className: "quiet" });
+    this.list = new WindowedList({
+      label: "Events, newest first", row: (event) => this.#row(event), end: () => this.#older(),
+      choose: (event, isEntered) => this.#open(event, isEntered),
+    });
+    this.list.element.addEventListener("scroll", () => { if (this.list.isAtTop) this.newer.hidden = true; });
+    this.detail = h("aside", { className: "panel detail", "aria-label": "Event", hidden: true, tabIndex: -1 });
+    this.body = h("div", { className: "stack" }, this.list.element);
+    this.split = h("div", { className: "events" }, this.body, this.detail);
+    fill(element,
+      h("div", { className: "head" }, h("h1", {}, "Events"), this.state, this.count, h("div", { className: "push" }, this.newer, this.pause)),
+      h("div", { className: "toolbar", role: "group", "aria-label": "Filter" }, field("Situation", this.situation), field("Log", this.log),
+        field("Severity", this.severity), field("Text", this.text)),
+      this.split);
+  }
+
+  async start() {
+    this.#offer(); // the lists of the filter may come late
+    await this.restart();
+  }
+
+  async #offer() {
+    const option = (value) => h("option", { value }, value);
+    if (this.wanted) {
+      this.situation.append(option(this.wanted));
+      this.situation.value = this.wanted;
+    }
+    const [situations, logs] = await Promise.allSettled([get("/api/v1/situations"), get("/api/v1/logs")]);
+    for (const { name } of situations.value?.situations || []) if (name !== this.wanted) this.situation.append(option(name));
+    for (const { log } of logs.value?.logs || []) this.log.append(option(log));
+  }
+
+  end() {
+    this.stream?.stop();
+    this.abort?.abort();
+    cancelAnimationFrame(this.frame);
+    this.list.resize.disconnect();
+  }
+
+  get filter() {
+    return { situation: this.situation.value, log: this.log.value, severity: this.severity.value };
+  }
+
+  async restart() {
+    this.stream?.stop();
+    this.abort?.abort();
+    this.abort = new AbortController();
+    const abort = this.abort;
+    this.waiting = [];
+    this.arrived = [];
+    this.hasOlder = true;
+    fill(this.body, this.list.element);
+    let answer;
+    try {
+      answer = await get(withQuery("/api/v1/events", { ...this.filter, limit: PAGE }), abort.signal);
+    } catch (error) {
+      if (error.name !== "AbortError") this.#fail(error);
+      return;
+    }
+    this.all = answer.events;
+    this.hasOlder = answer.events.length === PAGE;
+    this.#filter();
+    const after = Math.max(answer.newest || 0, answer.events[0]?.id || 0);
+    this.stream = new EventStream(this.filter, after, { event: (event) => this.#arrive(event), state: (...state) => this.#setState(...state) });
+  }
+
+  #fail(error) {
+    this.#setState("refused", error);
+    fill(this.body, error.status === 409
+      ? empty("The history is off", "Without it the agent keeps no events, and there are none to show. Set enabled = true under [history] in its configuration and start it again.")
+      : failure(error, () => this.restart()));
+    if (error.status === 0) addEventListener("zrm-regained", () => this.body.isConnected && this.restart(), { once: true });
+  }
+
+  #setState(state, detail) {
+    const texts = {
+      connecting: ["", "Connecting"], live: ["good", "Live"], waiting: ["bad", `Not live; next try in ${detail} s`],
+      refused: ["bad", detail?.status === 409 ? "History off" : "Not live"],
+    };
+    const [level, text] = this.isPaused && state === "live" ? ["warn", "Paused"] : texts[state];
+    this.streamState = state;
+    this.state.className = `state ${level}`;
+    this.state.textContent = text;
+  }
+
+  // Events that come close together are drawn together, once per frame.
+  #arrive(event) {
+    this.arrived.push(event);
+    this.frame ??= requestAnimationFrame(() => {
+      this.frame = null;
+      this.#take(this.arrived.splice(0).reverse());
+    });
+  }
+
+  #take(events) {
+    if (this.isPaused) {
+      this.waiting = events.concat(this.waiting).slice(0, MOST);
+      this.pause.textContent = `Resume (${plural(this.waiting.length, "new event")})`;
+      return;
+    }
+    this.all = events.concat(this.all);
+    if (this.all.length > MOST) {
+      this.all.length = MOST;
+      this.hasOlder = false;
+    }
+    const shown = events.filter((event) => this.#isWanted(event));
+    if (!this.list.isAtTop && shown.length > 0) {
+      this.newer.hidden = false;
+      this.newer.textContent = "New events above";
+    }
+    if (this.list.items.length === 0 && shown.length > 0) fill(this.body, this.list.element);
+    this.list.prepend(shown, MOST);
+    this.#drawCount();
+  }
+
+  #togglePause() {
+    this.isPaused = !this.isPaused;
+    this.pause.textContent = this.isPaused ? "Resume" : "Pause";
+    this.pause.setAttribute("aria-pressed", String(this.isPaused));
+    if (!this.isPaused) this.#take(this.waiting.splice(0));
+    this.#setState(this.streamState);
+  }
+
+  #isWanted(event) {
+    const word = this.text.value.toLowerCase();
+    return !word || describe(event).toLowerCase().includes(word) || event.situation.toLowerCase().includes(word);
+  }
+
+  #filter() {
+    const shown = this.all.filter((event) => this.#isWanted(event));
+    this.list.reset(shown);
+    if (shown.length > 0) fill(this.body, this.list.element);
+    else if (this.all.length > 0) fill(this.body, empty("None of these", "No event that is loaded has this text."));
+    else fill(this.body, empty("No events yet", "An event comes when an entry meets a situation. This page shows it at once.", h("a", { className: "button", href: "#/situations" }, "Situations")));
+    this.#drawCount();
+  }
+
+  #drawCount() {
+    this.count.textContent = `${number(this.list.items.length)}${this.hasOlder ? "+" : ""} shown`;
+  }
+
+  async #older() {
+    if (!this.hasOlder || this.isLoadingOlder || this.all.length === 0) return;
+    this.isLoadingOlder = true;
+    const abort = this.abort;
+    try {
+      const before = this.all[this.all.length - 1].id;
+      const { events } = await get(withQuery("/api/v1/events", { ...this.filter, before, limit: PAGE }), abort.signal);
+      this.all = this.all.concat(events);
+      this.hasOlder = events.length === PAGE && this.all.length < MOST;
+      this.list.append(events.filter((event) => this.#isWanted(event)));
+    } catch {
+      this.hasOlder = abort === this.abort; // scrolling on asks again
+    }
+    this.isLoadingOlder = false;
+    this.#drawCount();
+  }
+
+  #row(event) {
+    return [
+      h("span", { title: time(event.raised, true) }, briefTime(event.raised)),
+      h("span", { className: `severity ${event.severity}` }, event.severity),
+      h("span", { title: event.situation }, event.situation), h("span", {}, describe(event)),
+    ];
+  }
+
+  #open(event, isEntered) {
+    const why = h("div", {});
+    const explain = button("Why was it raised?", async () => {
+      fill(why, h("p", { className: "loading" }, "Asking …"));
+      try {
+        const answer = await post("/api/v1/explain", { situation: event.situation, event: event.id });
+        fill(why, answer.explanations.map(explanation));
+      } catch (error) {
+        fill(why, failure(error));
+      }
+    });
+    fill(this.detail,
+      h("div", { className: "head" }, h("h2", {}, `Event ${event.id}`), h("div", { className: "push" }, button("Close", () => this.#close()))),
+      h("pre", {}, describe(event)),
+      h("dl", { className: "pairs" }, [
+        ["Situation", h("a", { href: withQuery("#/situations", { name: event.situation }) }, event.situation)],
+        ["Severity", h("span", { className: `severity ${event.severity}` }, event.severity)], ["Raised", time(event.raised, true)], ["Log", logOf(event)],
+      ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)])),
+      h("p", { className: "actions" }, explain), why, h("h3", {}, "Columns"), rowList(event.row));
+    this.detail.hidden = false;
+    this.split.classList.add("open");
+    if (isEntered || matchMedia("(max-width: 900px)").matches) this.detail.focus();
+  }
+
+  #close() {
+    this.detail.hidden = true;
+    this.split.classList.remove("open");
+    this.list.element.focus();
+  }
+}

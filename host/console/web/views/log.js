@@ -1,0 +1,82 @@
+// One log: its state, its rates, and its ledger.
+
+import { get, withQuery } from "../api.js";
+import { drawRates } from "../charts.js";
+import { empty, failure, fill, h, loading, table } from "../dom.js";
+import { bytes, number, stamp, time } from "../format.js";
+import { judge, kindOf } from "../logstate.js";
+
+const EVERY = 10000;
+
+export async function show(element, path) {
+  const state = h("div", { className: "panel" }, loading());
+  const chart = h("div", {}, loading("Loading the last 24 hours"));
+  const ledger = h("div", { className: "stack" });
+  fill(element,
+    h("div", { className: "head" }, h("h1", {}, path), h("div", { className: "push" },
+      h("a", { className: "button", href: withQuery("#/reports", { log: path }) }, "Report on this log"),
+      h("a", { className: "button", href: withQuery("#/try", { log: path }) }, "Try a format on it"),
+      h("a", { className: "button", href: "#/logs" }, "All logs"))),
+    state, h("section", { className: "panel" }, h("h2", {}, "Entries and events per minute, last 24 hours"), chart), ledger);
+  let endChart = () => {};
+  const load = async () => {
+    try {
+      const answer = await get(withQuery("/api/v1/logs", { log: path }));
+      const log = answer.logs.find((one) => one.log === path) || answer.logs[0];
+      if (!log) fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
+      else {
+        drawState(state, log);
+        drawLedger(ledger, log);
+      }
+    } catch (error) {
+      fill(state, failure(error, load));
+    }
+  };
+  const loadChart = async () => {
+    try {
+      const rates = await get("/api/v1/rates?step=300");
+      const series = rates.logs.find((one) => one.log === path);
+      endChart();
+      if (!series) fill(chart, h("p", { className: "hint" }, "No entry of this log in the last 24 hours."));
+      else endChart = await drawRates(chart, rates, series);
+    } catch (error) {
+      fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept." : error.message));
+    }
+  };
+  const scheme = matchMedia("(prefers-color-scheme: dark)");
+  scheme.addEventListener("change", loadChart);
+  await Promise.all([load(), loadChart()]);
+  const timer = setInterval(() => !document.hidden && load(), EVERY);
+  return () => {
+    clearInterval(timer);
+    scheme.removeEventListener("change", loadChart);
+    endChart();
+  };
+}
+
+function drawState(element, log) {
+  const { level, state, why } = judge(log);
+  const { row } = log;
+  const ledger = log.ledger || {};
+  const pairs = [
+    ["Kind", kindOf(row)], ["Status", row.MONSTATUS], ["Monitored since", stamp(row.MONTIME)], ["File changed", stamp(row.LOGMODDATE)], ["Size", bytes(row.LOGSIZE)],
+    ["Read", `${bytes(ledger.bytes_read)} in ${number(ledger.lines)} lines`], ["Entries", number(ledger.rows ?? row.NUMEVENTS)], ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
+    ["Truncations", number(ledger.truncations)], ["Skipped", bytes(ledger.skipped_bytes)], ["Restarts of the monitor", number(ledger.restarts)],
+    ["Last entry", time(ledger.last_entry)], ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
+  ];
+  if (row.FORMATTER) pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
+  fill(element, h("p", {}, h("span", { className: `state ${level}` }, state)), why && h("p", { className: `why ${level}` }, why),
+    h("dl", { className: "pairs" }, pairs.map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)])));
+}
+
+function drawLedger(element, log) {
+  const { rejected = [], skipped = [] } = log.ledger || {};
+  fill(element,
+    h("section", { className: "panel flush" }, h("h2", {}, "Rejected lines, the latest"), rejected.length === 0
+      ? h("p", { className: "loading" }, "Every line fitted.")
+      : table("Rejected lines", [{ label: "Time", className: "fit" }, { label: "Line", className: "wide" }, { label: "Reason", className: "wide" }],
+        [...rejected].reverse().map((one) => [time(one.time), h("pre", {}, one.line), h("span", { className: "why bad" }, one.reason)]), { className: "cards" })),
+    skipped.length > 0 && h("section", { className: "panel flush" }, h("h2", {}, "Skipped when the file was cut short"),
+      table("Skipped ranges", [{ label: "Time", className: "fit" }, { label: "From byte", className: "num" }, { label: "To byte", className: "num" }],
+        [...skipped].reverse().map((one) => [time(one.time), number(one.from), number(one.to)]), { className: "cards" })));
+}

@@ -1,0 +1,186 @@
+// Reports: what a log held between two times.
+
+import { get, post } from "../api.js";
+import { Conditions } from "../conditions.js";
+import { button, empty, failure, field, fill, h, loading, select } from "../dom.js";
+import { plural, stamp } from "../format.js";
+
+const HOUR = 3600 * 1000;
+const PRESETS = [
+  ["hour", "Last hour"], ["day", "Last 24 hours"], ["today", "Today"], ["yesterday", "Yesterday"], ["night", "Last night, 22 to 6"], ["week", "Last 7 days"], ["own", "Other times"],
+];
+const MAIN = [
+  ["ENTRYTIME", "Time"], ["ENTRYSYS", "System"], ["ENTRYSRC", "Source"], ["ENTRYTYPE", "Type"], ["ENTRYCLASS", "Class"], ["ENTRYDESC", "Description"],
+];
+
+function window(preset, now = new Date()) {
+  const midnight = new Date(now);
+  midnight.setHours(0, 0, 0, 0);
+  const at = (days, hours = 0) => {
+    const date = new Date(midnight);
+    date.setDate(date.getDate() + days);
+    date.setHours(hours);
+    return date;
+  };
+  switch (preset) {
+    case "hour": return [new Date(now - HOUR), now];
+    case "today": return [midnight, now];
+    case "yesterday": return [at(-1), new Date(midnight - 1000)];
+    case "night": return [at(-1, 22), at(0, 6)];
+    case "week": return [new Date(now - 7 * 24 * HOUR), now];
+    default: return [new Date(now - 24 * HOUR), now];
+  }
+}
+
+/** What an input of type datetime-local takes. */
+function local(date) {
+  const shifted = new Date(date - date.getTimezoneOffset() * 60000);
+  return shifted.toISOString().slice(0, 19);
+}
+
+export async function show(element, query) {
+  const [{ logs }, { columns }] = await Promise.all([get("/api/v1/logs"), get("/api/v1/columns")]);
+  if (logs.length === 0) {
+    fill(element, h("h1", {}, "Reports"), empty("No log is monitored", "A report reads a log that the agent monitors.", h("a", { className: "button", href: "#/logs" }, "Logs")));
+    return () => {};
+  }
+  const page = new ReportPage(element, logs.map(({ log }) => log).sort(), columns, query.get("log"));
+  return () => page.end();
+}
+
+class ReportPage {
+  constructor(element, logs, columns, log) {
+    this.columns = columns;
+    this.result = h("section", { "aria-label": "Result" },
+      h("div", { className: "panel" }, empty("Nothing asked yet", "Choose a log and a time, then run the report. Its newest entries come first.")));
+    this.log = field("Log", select(logs, log && logs.includes(log) ? log : logs[0]));
+    this.preset = field("Time", select(PRESETS, "day", { onchange: () => this.#setWindow() }));
+    const own = () => { this.preset.control.value = "own"; };
+    this.from = field("From", h("input", { type: "datetime-local", step: 1, oninput: own }));
+    this.to = field("To", h("input", { type: "datetime-local", step: 1, oninput: own }));
+    this.conditions = new Conditions(columns, [], () => this.conditions.setProblems([]));
+    this.run = h("button", { className: "primary" }, "Run the report");
+    this.#setWindow();
+    fill(element, h("div", { className: "head" }, h("h1", {}, "Reports")),
+      h("form", { className: "panel", noValidate: true, onsubmit: (event) => { event.preventDefault(); this.#run(); } },
+        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to), this.conditions.element, h("p", { className: "actions" }, this.run)),
+      this.result);
+  }
+
+  end() {
+    this.abort?.abort();
+    clearInterval(this.timer);
+  }
+
+  #setWindow() {
+    if (this.preset.control.value === "own") {
+      this.from.control.focus();
+      return;
+    }
+    const [from, to] = window(this.preset.control.value);
+    this.from.control.value = local(from);
+    this.to.control.value = local(to);
+  }
+
+  async #run() {
+    this.end();
+    this.#setWindow();
+    const from = new Date(this.from.control.value);
+    const to = new Date(this.to.control.value);
+    this.from.setProblem(Number.isNaN(from.getTime()) ? "Say from when." : "");
+    this.to.setProblem(Number.isNaN(to.getTime()) ? "Say until when." : to < from ? "This is before the begin." : "");
+    if (Number.isNaN(from.getTime()) || Number.isNaN(to.getTime()) || to < from) return;
+    this.abort = new AbortController();
+    this.#showProgress();
+    try {
+      const body = { log: this.log.control.value, from: from.toISOString(), to: to.toISOString(), where: this.conditions.texts };
+      this.answer = await post("/api/v1/reports", body, this.abort.signal);
+      this.sort = null;
+      this.#draw();
+    } catch (error) {
+      this.#fail(error);
+    }
+    clearInterval(this.timer);
+  }
+
+  #showProgress() {
+    const begin = performance.now();
+    const elapsed = h("span", {}, "Reading the log, 0 s");
+    fill(this.result, h("div", { className: "panel" }, h("p", { role: "status", className: "actions" }, elapsed, button("Cancel", () => this.abort.abort()))));
+    this.timer = setInterval(() => { elapsed.textContent = `Reading the log, ${Math.round((performance.now() - begin) / 1000)} s`; }, 500);
+  }
+
+  #fail(error) {
+    if (error.name === "AbortError") {
+      fill(this.result, h("div", { className: "panel" }, empty("Cancelled", "Choose a shorter time or more conditions, or run it again.")));
+      return;
+    }
+    const rest = error.field ? this.conditions.setProblems([{ field: error.field, detail: error.message }]) : [error];
+    for (const key of ["from", "to", "log"]) if (error.field === key) this[key].setProblem(error.message);
+    fill(this.result, h("div", { className: "panel" }, rest.length > 0 ? failure(error, () => this.#run()) : failure(new Error("A condition cannot be used; it is marked above."))));
+  }
+
+  #draw() {
+    const { rows, truncated, max_rows: most } = this.answer;
+    if (rows.length === 0) {
+      fill(this.result, h("div", { className: "panel" }, empty("No entries", truncated
+        ? `None of the newest ${most} entries of this time meets the conditions; a report reads no more than that. Choose a shorter time.`
+        : "The log has no entry of this time that meets the conditions.")));
+      return;
+    }
+    const all = h("input", { type: "checkbox", onchange: () => this.#drawTable(all.checked) });
+    this.holder = h("div", { className: "panel flush", tabIndex: 0, role: "region", "aria-label": "Entries" });
+    fill(this.result,
+      h("div", { className: "head" }, h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
+        truncated && h("p", { className: "why warn" }, `Only the newest ${most} entries of the time were read. Choose a shorter time for the rest.`),
+        h("div", { className: "push" }, h("label", { className: "check" }, all, "All columns"),
+          button("CSV", () => this.#download("csv", "text/csv", this.#csv()), { "aria-label": "Download as CSV" }),
+          button("JSON", () => this.#download("json", "application/json", `${JSON.stringify(this.answer.rows, null, 2)}\n`), { "aria-label": "Download as JSON" }))),
+      this.holder);
+    this.#drawTable(false);
+  }
+
+  #drawTable(isWhole) {
+    const { rows } = this.answer;
+    const shown = isWhole ? Object.keys(rows[0]).map((name) => [name, name])
+      : MAIN.filter(([name]) => rows.some((row) => row[name] !== ""));
+    const sorted = this.sort ? [...rows].sort((a, b) => this.#compare(a, b)) : rows;
+    const head = shown.map(([name, label]) => {
+      const isSorted = this.sort?.name === name;
+      return h("th", { scope: "col", role: "columnheader", "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none" },
+        button(`${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`, () => {
+          this.sort = { name, up: isSorted ? !this.sort.up : true };
+          this.#drawTable(isWhole);
+          this.holder.querySelector(`[data-name="${name}"]`).focus();
+        }, { "data-name": name }));
+    });
+    fill(this.holder, h("table", { role: "table", className: isWhole ? "" : "cards" }, h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
+      h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
+      h("tbody", { role: "rowgroup" }, sorted.map((row) => h("tr", { role: "row" }, shown.map(([name, label]) =>
+        h("td", { role: "cell", "data-label": label, className: name.endsWith("DESC") ? "wide break" : "fit" }, name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]))))))));
+  }
+
+  #compare(a, b) {
+    const { name, up } = this.sort;
+    const order = typeof a[name] === "number" ? a[name] - b[name] : a[name] < b[name] ? -1 : a[name] > b[name] ? 1 : 0;
+    return up ? order : -order;
+  }
+
+  // A spreadsheet must not take a log's text for a formula.
+  #csv() {
+    const cell = (value) => {
+      const text = String(value);
+      const safe = typeof value === "string" && /^[=+\-@\t\r]/.test(text) ? `'${text}` : text;
+      return /[",\r\n]/.test(safe) ? `"${safe.replaceAll('"', '""')}"` : safe;
+    };
+    const names = Object.keys(this.answer.rows[0]);
+    return [names, ...this.answer.rows.map((row) => names.map((name) => row[name]))].map((row) => `${row.map(cell).join(",")}\r\n`).join("");
+  }
+
+  #download(ending, type, text) {
+    const url = URL.createObjectURL(new Blob([text], { type }));
+    const name = this.answer.log.split("/").pop();
+    h("a", { href: url, download: `${name}.${ending}` }).click();
+    setTimeout(() => URL.revokeObjectURL(url), 1000);
+  }
+}
