@@ -51,7 +51,7 @@ export async function show(element, query) {
 class ReportPage {
   constructor(element, logs, columns, log) {
     this.columns = columns;
-    this.result = h("section", { "aria-label": "Result" },
+    this.result = h("section", { className: "stack", "aria-label": "Result" },
       h("div", { className: "panel" }, empty("Nothing asked yet", "Choose a log and a time, then run the report. Its newest entries come first.")));
     this.log = field("Log", select(logs, log && logs.includes(log) ? log : logs[0]));
     this.preset = field("Time", select(PRESETS, "day", { onchange: () => this.#setWindow() }));
@@ -157,7 +157,7 @@ class ReportPage {
     fill(this.holder, h("table", { role: "table", className: isWhole ? "" : "cards" }, h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
       h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
       h("tbody", { role: "rowgroup" }, sorted.map((row) => h("tr", { role: "row" }, shown.map(([name, label]) =>
-        h("td", { role: "cell", "data-label": label, className: name.endsWith("DESC") ? "wide break" : "fit" }, name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]))))))));
+        h("td", { role: "cell", "data-label": label, className: name.endsWith("DESC") ? "wide break" : name === "ENTRYTIME" ? "fit whole" : "fit" }, name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]))))))));
   }
 
   #compare(a, b) {

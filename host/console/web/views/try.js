@@ -155,7 +155,7 @@ function coloured(one, names) {
 function columnsPanel(answer) {
   const rows = answer.lines.filter((one) => one.row).slice(0, 20).map((one) => one.row);
   if (rows.length === 0) return null;
-  const columns = COLUMNS.map(([, label]) => ({ label, className: label === "Description" ? "wide break" : "fit" }));
+  const columns = COLUMNS.map(([, label]) => ({ label, className: label === "Description" ? "wide break" : label === "Time" ? "fit whole" : "fit" }));
   return h("section", { className: "panel flush" }, h("h2", {}, rows.length < answer.coverage.matched ? `Columns that result, the first ${rows.length}` : "Columns that result"),
     table("Columns that result", columns, rows.map((row) => COLUMNS.map(([name]) => (name === "ENTRYTIME" ? stamp(row[name]) : row[name] || "–"))), { className: "cards" }));
 }

@@ -1,0 +1,30 @@
+"""Log lines for the console's tests."""
+
+import time
+
+from conftest import syslog_line, until
+
+MARKUP = "<img src=x onerror=window.ran=true><script>window.ran=true</script><b>bold</b>"
+
+
+def failed_login(number, when=None):
+    return syslog_line(f"Failed password for root from 203.0.113.{number} port 50122 ssh2", "sshd[2140]", when=when)
+
+
+def other_entry(number):
+    return syslog_line(f"entry {number} of many", "app[7]")
+
+
+def history_of(count):
+    """Failed logins of the last hours, the newest last, as a log holds them."""
+    now = time.time()
+    lines = (failed_login(number, time.localtime(now - (count - number) * 60)) for number in range(count))
+    return "".join(lines).encode()
+
+
+def fill_history(agent, log, count):
+    """Appends failed logins and waits for their events."""
+    before = len(agent.events())
+    for number in range(count):
+        log.append(failed_login(number))
+    until(lambda: len(agent.events()) >= before + count, "the events")

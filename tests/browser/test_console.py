@@ -1,0 +1,321 @@
+"""Every view used as a person would, on the real agent."""
+
+import re
+import time
+
+from conftest import until
+from selenium.webdriver.common.by import By
+from selenium.webdriver.common.keys import Keys
+
+from support import MARKUP, failed_login, fill_history, history_of, other_entry, syslog_line
+
+FIRST_VIEW_BYTES = 100_000
+
+
+def logs_agent(agent):
+    auth = agent.log("auth.log", content=history_of(40))
+    app = agent.log("app.log", fields=';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description')
+    agent.configure(f"{agent.directory}/missing.log ;N ;U ;A , \"%d\" , year", append=True)
+    agent.situation("ssh-failed", log=auth, when=["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"], severity="critical", text="A failed SSH login")
+    agent.start()
+    return auth, app
+
+
+# ---------------------------------------------------------------------- token and frame
+
+
+def test_the_token_leaves_the_address_and_lasts_for_the_session(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    page.heading("Logs")
+    assert page.token not in page.driver.current_url
+    page.driver.refresh()
+    page.heading("Logs")
+    page.wait_text("auth.log")
+
+
+def test_without_a_token_the_page_asks_and_a_wrong_one_is_refused(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    page.heading("Logs")
+    page.run("sessionStorage.clear()")
+    page.driver.get("about:blank")
+    page.open(token=False)
+    page.type("API token", "wrong")
+    page.click("Open the console")
+    page.wait_text("The agent refused this token")
+    page.pictures("token")
+    page.type("API token", page.token)
+    page.click("Open the console")
+    page.wait_text("auth.log")
+    page.driver.get_log("browser")  # the refusal stands there, as it should
+
+
+def test_the_first_view_is_small_and_runs_only_files_of_its_own(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    page.wait_text("auth.log")
+    loaded = page.run(
+        "return performance.getEntriesByType('resource').concat(performance.getEntriesByType('navigation'))"
+        ".map((one) => [one.name, one.decodedBodySize])"
+    )
+    files = {name: size for name, size in loaded if "/console/" in name or name.endswith("/")}
+    assert len(files) > 5 and sum(files.values()) < FIRST_VIEW_BYTES, files
+    assert not any("chart.js" in name for name in files)
+    page.run("const s = document.createElement('script'); s.textContent = 'window.ran = true'; document.body.append(s)")
+    assert page.run("return window.ran") is None
+    assert any("Content Security Policy" in message for message in page.console_errors())
+
+
+def test_a_lost_connection_shows_and_comes_back(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    page.wait_text("Connected")
+    port = page.api.port
+    agent.stop()
+    page.wait_text("The connection to the agent is lost", 15)
+    page.pictures("connection-lost")
+    agent.listen = f"127.0.0.1:{port}"
+    agent.start()
+    page.wait_text("The connection to the agent is back", 40)
+    until(lambda: "is lost" not in page.text(), "the banner to go")
+    page.driver.get_log("browser")
+
+
+# ---------------------------------------------------------------------- logs
+
+
+def test_logs_tell_trouble_first_and_why(page, agent):
+    _, app = logs_agent(agent)
+    app.append("2026-11-20 07:03:09 ERROR fine\nthis does not fit\n")
+    page.on(agent)
+    page.wait_text("1 in trouble")
+    page.wait_text("The file cannot be opened")
+    page.wait_text("1 line does not fit the format")
+    first = page.find("//table//tbody/tr[1]").text
+    assert "missing.log" in first and "Error" in first
+    page.pictures("logs")
+    page.find("//input[@aria-label='Find a log']").send_keys("auth")
+    until(lambda: len(page.all("tbody tr")) == 1, "one log")
+
+
+def test_a_log_shows_its_state_and_rates(page, agent):
+    auth, _ = logs_agent(agent)
+    fill_history(agent, auth, 5)
+    page.on(agent)
+    page.find("//a[contains(@href, 'auth.log')]").click()
+    page.heading(str(auth))
+    page.wait_text("Monitored since")
+    until(lambda: page.all("canvas"), "the chart")
+    until(lambda: page.run("return typeof window.Chart") == "function", "the chart library")
+    page.pictures("log")
+
+
+def test_200_logs_stay_readable(page, agent):
+    for number in range(200):
+        agent.log(f"service-{number:03}.log")
+    agent.start(wait=False)
+    agent.wait_trace("Agent server is listening; signal sent.")
+    page.on(agent)
+    page.wait_text("200 running")
+    until(lambda: len(page.all("tbody tr")) == 200, "200 rows")
+    page.pictures("logs-200")
+
+
+def test_no_log_says_what_to_do(page, agent):
+    agent.configure("# none yet")
+    agent.start(wait=False)
+    agent.wait_trace("Agent server is listening; signal sent.")
+    page.on(agent)
+    page.wait_text("No log is monitored")
+    page.pictures("logs-empty")
+
+
+# ---------------------------------------------------------------------- events
+
+
+def test_events_come_live_pause_and_open(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "events")
+    page.wait_text("No events yet")
+    page.pictures("events-empty")
+    until(lambda: "Live" in page.text(), "the stream")
+    auth.append(failed_login(1))
+    page.wait_text("Failed password for root from 203.0.113.1")
+    page.click("Pause")
+    auth.append(failed_login(2))
+    page.wait_text("Resume (1 new event)")
+    assert "203.0.113.2 " not in page.text()
+    page.find("//button[contains(., 'Resume')]").click()
+    page.wait_text("203.0.113.2")
+    rows = page.find("//*[@role='listbox']")
+    rows.send_keys(Keys.ARROW_DOWN)
+    page.wait_text("ORIGINNODE")
+    assert len(page.all("aside dt.mono")) == 18
+    page.click("Why was it raised?")
+    page.wait_text("ENTRYSRC starts 'sshd'")
+    page.pictures("events")
+
+
+def test_events_resume_where_they_were_after_a_lost_connection(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "events")
+    until(lambda: "Live" in page.text(), "the stream")
+    auth.append(failed_login(1))
+    page.wait_text("203.0.113.1")
+    agent.listen = f"127.0.0.1:{page.api.port}"
+    agent.stop()
+    page.wait_text("Not live")
+    agent.start()
+    auth.append(failed_login(2))
+    page.wait_text("203.0.113.2", 60)
+    assert page.text().count("203.0.113.1 ") == 1
+    page.driver.get_log("browser")
+
+
+def test_markup_in_a_log_line_stays_text(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "events")
+    until(lambda: "Live" in page.text(), "the stream")
+    auth.append(syslog_line(f"Failed password {MARKUP}", "sshd[1]"))
+    page.wait_text(MARKUP)
+    page.find("//*[@role='option']").click()
+    page.wait_text("ORIGINNODE")
+    assert page.run("return window.ran") is None
+    assert page.all("main img, main script, main b") == []
+
+
+def test_events_are_filtered(page, agent):
+    auth, _ = logs_agent(agent)
+    for number in (1, 2):
+        auth.append(failed_login(number))
+    agent.wait_events(2)
+    page.on(agent, "events")
+    page.wait_text("203.0.113.2")
+    page.type("Text", "113.1")
+    until(lambda: len(page.all("[role=option]")) == 1, "one event")
+    page.type("Text", " ")
+    page.choose("Severity", "info")
+    page.wait_text("No events yet")
+
+
+def test_ten_thousand_live_events_do_not_slow_the_page(page, agent):
+    auth = agent.log("auth.log")
+    agent.situation("every", log=auth)
+    agent.sink = str(agent.directory / "events.jsonl")
+    agent.start()
+    page.on(agent, "events")
+    until(lambda: "Live" in page.text(), "the stream")
+    page.run(
+        "window.longest = 0; let last = performance.now();"
+        "const beat = () => { const now = performance.now(); window.longest = Math.max(window.longest, now - last); last = now; setTimeout(beat, 20); }; beat();"
+    )
+    auth.append("".join(other_entry(number) for number in range(10_000)))
+    until(lambda: "10,0" in page.text() or "9,9" in page.text() or "10,000" in page.text(), "10,000 events", 60)
+    page.wait_text("entry 9999")
+    assert len(page.all("[role=option]")) < 80
+    assert page.run("return window.longest") < 2000
+    begin = time.monotonic()
+    page.run("document.querySelector('.windowed').scrollTop = 150000")
+    page.wait_text("entry 46")
+    assert time.monotonic() - begin < 3
+
+
+# ---------------------------------------------------------------------- situations
+
+
+def test_a_situation_is_made_changed_stopped_started_and_deleted(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "situations")
+    page.wait_text("ssh-failed")
+    page.pictures("situations")
+    page.click("New situation")
+    page.type("Name", "root-login")
+    page.choose("Log", str(auth))
+    page.click("Add a condition")
+    value = page.find("//input[@aria-label='Value']")
+    value.send_keys("for root")
+    page.wait_text("Would have been raised 40 times in the last 24 hours")
+    page.find("//textarea").send_keys(failed_login(7).strip())
+    page.click("Explain")
+    page.wait_text("Would be raised")
+    page.pictures("situation-form")
+    page.click("Create situation")
+    page.heading("root-login")
+    page.wait_text("Running")
+    page.pictures("situation")
+    page.click("Stop root-login")
+    page.wait_text("Stopped")
+    page.click("Start root-login")
+    page.wait_text("Running")
+    page.click("Edit root-login")
+    page.heading("Edit root-login")
+    page.choose("Severity", "major")
+    page.click("Save changes")
+    page.heading("root-login")
+    page.wait_text("major")
+    page.click("Delete root-login")
+    page.click("Delete", "//dialog")
+    page.heading("Situations")
+    until(lambda: "root-login" not in page.text(), "the deletion")
+
+
+def test_a_condition_is_judged_while_it_is_typed(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "situations?new")
+    page.type("Name", "bad")
+    page.choose("Log", str(auth))
+    page.click("Add a condition")
+    page.find("//select[@aria-label='Operator']/option[starts-with(., 'matches')]").click()
+    page.find("//input[@aria-label='Value']").send_keys("port [")
+    page.wait_text("Mend what is marked")
+    assert page.find("//input[@aria-label='Value']").get_attribute("aria-invalid") == "true"
+    page.pictures("situation-problem")
+
+
+# ---------------------------------------------------------------------- reports
+
+
+def test_a_report_is_run_sorted_and_saved(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "reports")
+    page.choose("Log", str(auth))
+    page.click("Run the report")
+    page.wait_text("40 entries")
+    first = page.find("//tbody/tr[1]").text
+    page.click("Time")
+    until(lambda: page.find("//th[@aria-sort='ascending']"), "the order")
+    assert page.find("//tbody/tr[1]").text != first
+    page.pictures("report")
+    page.click("Download as CSV")
+    file = page.driver.downloads / "auth.log.csv"
+    until(file.exists, "the download")
+    lines = file.read_text(encoding="utf-8").splitlines()
+    assert lines[0].startswith("ORIGINNODE,LOGPATH") and len(lines) == 41
+    page.click("Add a condition")
+    page.find("//input[@aria-label='Value']").send_keys("113.39 ")
+    page.click("Run the report")
+    page.wait_text("1 entry")
+    page.find("//input[@aria-label='Value']").send_keys("not there")
+    page.click("Run the report")
+    page.wait_text("No entries")
+
+
+# ---------------------------------------------------------------------- try a format
+
+
+def test_a_format_is_tried_while_it_is_typed(page, agent):
+    logs_agent(agent)
+    page.on(agent, "try")
+    page.wait_text("100 % of the lines fit")
+    assert len(page.all(".lines mark.f0")) == 2
+    page.type("Lines", "2026-11-20 07:03:09 ERROR payment: Card declined\nno entry at all")
+    page.wait_text("50 % of the lines fit")
+    page.wait_text("Stops at column 1")
+    page.wait_text("Card declined")
+    page.pictures("try")
+    page.type("Format", 'A , "%d %q" , year')
+    page.wait_text("The format cannot be used")
+    page.pictures("try-refused")
+    assert re.search(r"Where the format stops", page.text())
+    assert page.driver.find_elements(By.CSS_SELECTOR, "pre mark.stop")
