@@ -1,8 +1,8 @@
 #!/usr/bin/python3
 """Counts test results: `summary.py DIRECTORY...` prints `N passed, N failed, N skipped`.
 
-A directory may hold ctest.xml with one GoogleTest report per program in unit/, system.xml from
-pytest, and `checks` with lines "passed NAME" or "failed NAME". A program that ended without its
+A directory may hold ctest.xml with one GoogleTest report per program in unit/, system.xml and
+browser.xml from pytest, and `checks` with lines "passed NAME" or "failed NAME". A program that ended without its
 report, or that failed although its report shows no failure (a sanitizer's finding at its end),
 counts as one failure. Exit status 1 when anything failed or nothing ran.
 """
@@ -52,8 +52,9 @@ def unit_outcomes(directory):
 
 def outcomes(directory):
     yield from unit_outcomes(directory)
-    for case in cases(directory / "system.xml") or []:
-        yield f"{case.get('classname')}.{case.get('name')}", case_outcome(case)
+    for report in ("system.xml", "browser.xml"):
+        for case in cases(directory / report) or []:
+            yield f"{case.get('classname')}.{case.get('name')}", case_outcome(case)
     checks = directory / "checks"
     if checks.exists():
         for line in checks.read_text().splitlines():
@@ -63,7 +64,11 @@ def outcomes(directory):
 
 def missing_reports(directory):
     """A test runner that died leaves a mark of having begun and no report."""
-    for log, report in (("ctest.log", "ctest.xml"), ("system.log", "system.xml")):
+    for log, report in (
+        ("ctest.log", "ctest.xml"),
+        ("system.log", "system.xml"),
+        ("browser.log", "browser.xml"),
+    ):
         if (directory / log).exists() and cases(directory / report) is None:
             yield f"{directory.name}: no {report}", "failed"
 

@@ -260,7 +260,7 @@ def test_what_is_not_there_is_not_found(serving):
     _, api = serving()
     got, kind, problem = api.sample("RMNONE")
     assert (got, kind, problem["field"]) == (404, "application/problem+json", "table")
-    for method, path in (("GET", "/"), ("GET", "/api/v1/tables/RMMONLOG/sample"), ("POST", "/x")):
+    for method, path in (("GET", "/none"), ("GET", "/api/v1/tables/RMMONLOG/sample"), ("POST", "/x")):
         got, kind, _ = api.request(method, path, "" if method == "POST" else None)
         assert got in (404, 405) and kind == "application/problem+json", path
 

@@ -80,6 +80,9 @@ FROM = "2026-01-01T00:00:00Z"
 # What is asked: method, path of the document, path and body of the request, expected status.
 EXAMPLES = [
     ("GET", "/healthz", None, None, 200),
+    ("GET", "/", None, None, 200),
+    ("GET", "/console/*", "/console/main.js", None, 200),
+    ("GET", "/console/*", "/console/none", None, 404),
     ("GET", "/metrics", None, None, 200),
     ("GET", "/api/v1/status", None, None, 200),
     ("PUT", "/api/v1/trace", None, {"levels": "error"}, 200),
