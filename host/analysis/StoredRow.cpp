@@ -30,7 +30,7 @@ bool StoredRow::fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::str
             std::memset(field, ' ', column.width);
             if (found != columns.end() && found->is_string()) {
                 const auto& text = found->get_ref<const std::string&>();
-                std::memcpy(field, text.data(), std::min(text.size(), column.width));
+                text.copy(field, column.width);
             }
         }
     }

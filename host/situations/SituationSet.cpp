@@ -39,7 +39,6 @@ SituationSet::SituationSet(TableManager& entries, EventQueue& queue, std::string
 std::string SituationSet::load() {
     TraceScope trace(anchor);
     std::string message;
-    const std::lock_guard changing(m_changing);
     SituationStore::Content content = m_store.load(message);
     const std::lock_guard guard(m_mutex);
     for (SituationStore::Made& made : content.made) {
@@ -183,11 +182,45 @@ SituationSet::Change SituationSet::setStopped(const std::string& name, bool isSt
     }));
 }
 
+/// The time in which one change of the API keeps the others waiting.
+class SituationSet::Turn {
+public:
+    explicit Turn(SituationSet& set) : m_set(set) {
+        std::unique_lock lock(m_set.m_mutex);
+        m_hasCome =
+            m_set.m_turnEnded.wait_for(lock, patience, [this] { return !m_set.m_isChanging; });
+        m_set.m_isChanging = true;
+    }
+    ~Turn() {
+        if (m_hasCome) {
+            const std::lock_guard guard(m_set.m_mutex);
+            m_set.m_isChanging = false;
+            m_set.m_turnEnded.notify_one();
+        }
+    }
+    Turn(const Turn&) = delete;
+    Turn& operator=(const Turn&) = delete;
+    bool hasCome() const noexcept { return m_hasCome; }
+
+private:
+    SituationSet& m_set;
+    bool m_hasCome = false;
+};
+
 /// Makes the change that `plan` makes to the draft, of the record whose key it returns.
 SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>& plan) {
     TraceScope trace(anchor);
-    std::unique_lock changing(m_changing, patience);
-    if (!changing) {
+    Changed changed = changeInTurn(plan);
+    if (std::holds_alternative<Key>(changed)) {
+        m_runner.settle(patience);
+    }
+    return changed;
+}
+
+SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Draft&)>& plan) {
+    TraceScope trace(anchor);
+    const Turn turn(*this);
+    if (!turn.hasCome()) {
         return SituationRefusal{SituationRefusal::BUSY,
                                 "other changes of the situations are under way: try again"};
     }
@@ -203,12 +236,8 @@ SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>&
     if (auto refusal = save(draft)) {
         return std::move(*refusal);
     }
-    {
-        const std::lock_guard guard(m_mutex);
-        publish(std::get<Key>(changed), draft);
-    }
-    changing.unlock();
-    m_runner.settle(patience);
+    const std::lock_guard guard(m_mutex);
+    publish(std::get<Key>(changed), draft);
     return changed;
 }
 

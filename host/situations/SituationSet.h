@@ -8,6 +8,7 @@
 #include "host/situations/SituationStore.h"
 
 #include <chrono>
+#include <condition_variable>
 #include <cstddef>
 #include <functional>
 #include <map>
@@ -98,7 +99,9 @@ private:
     };
     using Changed = std::variant<Key, SituationRefusal>;
 
+    class Turn;
     Changed change(const std::function<Changed(Draft&)>& plan);
+    Changed changeInTurn(const std::function<Changed(Draft&)>& plan);
     std::optional<SituationRefusal> save(const Draft& draft);
     Change statusAfter(const Changed& changed) const;
     Change setStopped(const std::string& name, bool isStopped);
@@ -111,10 +114,12 @@ private:
     void runAgain(const Key& key, const Record& record);
     SituationStatus statusOf(const Key& key, const Record& record) const;
 
-    std::timed_mutex m_changing; ///< held through a change by the API, saving included
-    SituationStore m_store;      ///< guarded by m_changing
+    SituationStore m_store; ///< used by the change that has its turn
 
     mutable std::mutex m_mutex; ///< guards what follows; held for moments
+    std::condition_variable m_turnEnded;
+    bool m_isChanging =
+        false; ///< a change by the API has its turn, until it is saved and published
     Records m_records;
     std::set<std::string> m_stoppedFiles; ///< names of the file's situations that are stopped
 
