@@ -26,6 +26,11 @@ const LOC2_Locale* byName(std::string_view codeSet) noexcept;
 /// The first code set of this number; null when there is none.
 const LOC2_Locale* byNumber(std::uint32_t codePage) noexcept;
 
+/// Whether byNumber finds one; at once for those of nearly all systems.
+inline bool isKnown(std::uint32_t codePage) noexcept {
+    return codePage == LOC2_UTF8 || codePage == LOC2_ASCII || byNumber(codePage) != nullptr;
+}
+
 } // namespace CodePages
 
 #endif

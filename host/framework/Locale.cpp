@@ -4,6 +4,9 @@
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
 #include "host/framework/Status.h"
+#include "host/framework/Utf8.h"
+
+#include <cstring>
 
 #include <langinfo.h>
 
@@ -42,6 +45,15 @@ std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
                                   const char* source, std::uint32_t sourceLength,
                                   std::uint32_t* resultLength, int flags, std::uint32_t* status) {
     const bool terminates = (flags & LOC2_NO_TERMINATOR) == 0;
+    // Nearly all text is this: ASCII, which every known code page holds as it is, and it fits.
+    if (!terminates && sourceLength > 0 && sourceLength <= targetSize &&
+        CodePages::isKnown(targetCodePage) && CodePages::isKnown(sourceCodePage) &&
+        Utf8::asciiPrefix({source, sourceLength}) == sourceLength) {
+        std::memcpy(target, source, sourceLength);
+        report(resultLength, sourceLength);
+        report(status, STATUS_OK);
+        return static_cast<std::int32_t>(sourceLength);
+    }
     Converted converted{0, false, false};
     if (!terminates || targetSize > 0) {
         const std::size_t room = terminates ? targetSize - 1 : targetSize;

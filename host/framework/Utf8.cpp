@@ -31,6 +31,14 @@ bool isContinuation(unsigned char byte) {
 
 std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
     std::size_t position = 0;
+    constexpr std::size_t kBlock = 4 * sizeof kHighBits;
+    for (; position + kBlock <= text.size(); position += kBlock) {
+        std::uint64_t words[4];
+        std::memcpy(words, text.data() + position, sizeof words);
+        if (((words[0] | words[1] | words[2] | words[3]) & kHighBits) != 0) {
+            break;
+        }
+    }
     for (; position + sizeof kHighBits <= text.size(); position += sizeof kHighBits) {
         std::uint64_t word;
         std::memcpy(&word, text.data() + position, sizeof word);

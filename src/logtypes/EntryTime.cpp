@@ -40,10 +40,11 @@ void setYear(EntryTime& time, int yearsSince1900) {
 }
 
 bool isDigitPair(long number) {
-    return number >= 0 && number <= 99;
+    return static_cast<unsigned long>(number) <= 99;
 }
 
-char* writePair(char* out, long number) {
+char* writePair(char* out, long pair) {
+    const auto number = static_cast<unsigned>(pair);
     out[0] = static_cast<char>('0' + number / 10);
     out[1] = static_cast<char>('0' + number % 10);
     return out + 2;
@@ -87,7 +88,7 @@ int EntryTime::write(char* out) const noexcept {
     const long pairs[] = {year, month, day, hour, minute, second, 0};
     bool isUsual = century >= 0 && century <= 9;
     for (const long pair : pairs) {
-        isUsual = isUsual && isDigitPair(pair);
+        isUsual &= isDigitPair(pair);
     }
     if (isUsual) {
         *out++ = static_cast<char>('0' + century);

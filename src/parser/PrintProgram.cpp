@@ -36,6 +36,25 @@ bool isInteger(Receiver receiver) {
            receiver == Receiver::INTEGER8;
 }
 
+constexpr std::size_t SMALL_LENGTH = 4;
+constexpr std::uint64_t SMALL = 10000; ///< the first number that is longer
+
+/// Prints a number of so few digits, for which there is room.
+inline void printSmall(std::uint32_t number, std::size_t width, char fill, _FormatBuffer& buffer) {
+    std::size_t length =
+        1U + (number >= 10 ? 1U : 0U) + (number >= 100 ? 1U : 0U) + (number >= 1000 ? 1U : 0U);
+    length = std::max(length, width);
+    char* next = buffer.position + length;
+    do {
+        *--next = static_cast<char>('0' + number % 10);
+        number /= 10;
+    } while (number != 0);
+    while (next != buffer.position) {
+        *--next = fill;
+    }
+    buffer.advance(length);
+}
+
 } // namespace
 
 bool PrintProgram::compile(const char* directive, _DataType type) noexcept {
@@ -90,6 +109,10 @@ bool PrintProgram::run(const void* value, _FormatBuffer& buffer) const noexcept 
     if (m_kind == Kind::LIBRARY) {
         return printByLibrary(value, buffer);
     }
+    if (m_kind == Kind::INTEGER && m_prefixLength + m_suffixLength == 0) {
+        printInteger(value, buffer);
+        return true;
+    }
     buffer.append(m_directive, m_prefixLength);
     switch (m_kind) {
     case Kind::TEXT: {
@@ -117,6 +140,11 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
     auto magnitude = static_cast<std::uint64_t>(number);
     if (isNegative) {
         magnitude = 0 - magnitude;
+    }
+    if (!isNegative && magnitude < SMALL && m_width <= SMALL_LENGTH &&
+        buffer.room >= static_cast<long>(SMALL_LENGTH)) {
+        printSmall(static_cast<std::uint32_t>(magnitude), m_width, m_fill, buffer);
+        return;
     }
     std::size_t length = isNegative ? 2 : 1;
     for (std::uint64_t rest = magnitude; rest >= 10; rest /= 10) {

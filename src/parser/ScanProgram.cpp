@@ -89,6 +89,8 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
     if (*m_literalEnd == '\0') {
         return;
     }
+    m_isOneCharacter =
+        m_literalEnd - m_literal == 1 && !isWhiteSpace(*m_literal) && *m_literal != '%';
     const char* point = nl_langinfo(RADIXCHAR);
     if (*point != '\0' && std::strlen(point) < sizeof m_decimalPoint) {
         std::strcpy(m_decimalPoint, point);
@@ -188,6 +190,35 @@ const char* ScanProgram::compileSet(const char* set) noexcept {
     return *set == ']' ? set + 1 : set;
 }
 
+/// A few digits and nothing before them, which is what the numbers of most logs are; false, with
+/// nothing read, for everything else.
+inline bool ScanProgram::scanShortNumber(const char*& position, void* value) const noexcept {
+    constexpr unsigned MOST_DIGITS = 9; // these fit into 32 bits of either sign
+    std::uint32_t number = 0;
+    unsigned count = 0;
+    for (; count < MOST_DIGITS && isDigit(position[count]); ++count) {
+        if (count == m_width) {
+            break;
+        }
+        number = number * 10 + static_cast<std::uint32_t>(position[count] - '0');
+    }
+    if (count == 0 || (count == MOST_DIGITS && count != m_width)) {
+        return false;
+    }
+    position += count;
+    if (value != nullptr) {
+        // Too small to meet the end of any range but that of the shortest, which cuts it.
+        if (m_receiver == Receiver::INTEGER4) {
+            store<std::int32_t>(number, value);
+        } else if (m_receiver == Receiver::INTEGER2) {
+            store<std::int16_t>(number, value);
+        } else {
+            store<std::int64_t>(number, value);
+        }
+    }
+    return true;
+}
+
 int ScanProgram::run(const char* text, void* value) const noexcept {
     const char* position = text;
     Outcome outcome = matchLiteral(position);
@@ -195,7 +226,9 @@ int ScanProgram::run(const char* text, void* value) const noexcept {
         void* const receiver = m_isSuppressed ? nullptr : value;
         switch (m_kind) {
         case Kind::INTEGER:
-            outcome = scanInteger(position, receiver);
+            if (m_base != 10 || !scanShortNumber(position, receiver)) {
+                outcome = scanInteger(position, receiver);
+            }
             break;
         case Kind::FLOATING:
             outcome = scanFloating(position, receiver);
@@ -219,6 +252,13 @@ int ScanProgram::run(const char* text, void* value) const noexcept {
 }
 
 ScanProgram::Outcome ScanProgram::matchLiteral(const char*& position) const noexcept {
+    if (m_isOneCharacter) {
+        if (*position != *m_literal) {
+            return *position == '\0' ? Outcome::END : Outcome::MISMATCHED;
+        }
+        ++position;
+        return Outcome::MATCHED;
+    }
     for (const char* literal = m_literal; literal != m_literalEnd; ++literal) {
         if (isWhiteSpace(*literal)) {
             position = skipWhiteSpace(position);

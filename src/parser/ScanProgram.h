@@ -38,6 +38,7 @@ private:
     const char* compileConversion(const char* code, unsigned base) noexcept;
     const char* compileSet(const char* set) noexcept;
     Outcome matchLiteral(const char*& position) const noexcept;
+    bool scanShortNumber(const char*& position, void* value) const noexcept;
     Outcome scanInteger(const char*& position, void* value) const noexcept;
     Outcome scanFloating(const char*& position, void* value) const noexcept;
     Outcome scanText(const char*& position, char* value) const noexcept;
@@ -49,6 +50,7 @@ private:
 
     const char* m_literal = nullptr; ///< the leading text, a '%' written twice
     const char* m_literalEnd = nullptr;
+    bool m_isOneCharacter = false; ///< the leading text is, and it matches itself alone
     Kind m_kind = Kind::NOTHING;
     Receiver m_receiver = Receiver::INTEGER4;
     bool m_isSuppressed = false;

@@ -108,6 +108,21 @@ TEST_F(LocaleTest, ABytesThatIsNotValidIsReplaced) {
     EXPECT_EQ(translate(367, 1208, "aéz", 10, 0).target, terminated("a\x1Az", 10));
 }
 
+TEST_F(LocaleTest, AsciiIsCopiedAsFarAsThereIsRoom) {
+    const std::string text(40, 'x');
+    for (const std::uint32_t codePage : {1208u, 367u, 819u}) {
+        const Result fitting = translate(1208, codePage, text, 40, LOC2_NO_TERMINATOR);
+        EXPECT_EQ(fitting.written, 40);
+        EXPECT_EQ(fitting.status, 0u);
+        EXPECT_EQ(fitting.target.substr(0, 41), text + '#');
+        const Result cut = translate(1208, codePage, text, 39, LOC2_NO_TERMINATOR);
+        EXPECT_EQ(cut.written, 39);
+        EXPECT_NE(cut.status, 0u);
+        EXPECT_EQ(cut.target.substr(0, 40), text.substr(1) + '#');
+    }
+    EXPECT_EQ(translate(1208, 1208, "", 10, LOC2_NO_TERMINATOR).written, 0);
+}
+
 TEST_F(LocaleTest, AnUnknownCodePageConvertsNothing) {
     for (const std::uint32_t unknown : {0u, 4711u}) {
         const Result result = translate(1208, unknown, "abc", 10, 0);

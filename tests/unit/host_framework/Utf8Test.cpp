@@ -53,7 +53,7 @@ TEST(Utf8, APieceThatIsNoCharacterEndsWhereOneCouldBegin) {
 }
 
 TEST(Utf8, FindsTheFirstByteBeyondAscii) {
-    for (std::size_t size = 0; size < 40; ++size) {
+    for (std::size_t size = 0; size < 80; ++size) {
         const std::string ascii(size, 'a');
         EXPECT_EQ(Utf8::asciiPrefix(ascii), size);
         EXPECT_EQ(Utf8::asciiPrefix(ascii + "\x80zz"), size);
