@@ -1,6 +1,8 @@
 #include "host/http/SampleRequest.h"
 
 #include "host/config/ConditionBuilder.h"
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
 
 #include <algorithm>
 #include <cstdint>
@@ -119,40 +121,37 @@ std::optional<Problem> incompleteReport(const Conditions& conditions) {
     return std::nullopt;
 }
 
-} // namespace
-
-std::variant<Conditions, Problem> SampleRequest::parse(std::string_view table,
-                                                       std::string_view body) {
-    const json document = body.empty() ? json::object() : json::parse(body, nullptr, false);
-    if (document.is_discarded()) {
-        return bad("the body is no JSON", "body");
-    }
-    if (!document.is_object()) {
-        return bad("write an object with filters", "body");
-    }
-    for (const auto& [key, value] : document.items()) {
-        if (key != "filters") {
-            return bad("unknown member; a sample has filters", key);
-        }
-    }
-    const json filters = document.value("filters", json::array());
-    if (!filters.is_array() || filters.size() > mostFilters) {
-        return bad("write a list of at most 100 filters", "filters");
+Conditions parseFilters(std::string_view table, std::string_view body) {
+    JsonFields fields(body);
+    const json& filters = fields.value("filters");
+    fields.refuseUnknown();
+    if (!filters.is_null() && (!filters.is_array() || filters.size() > mostFilters)) {
+        fields.refuse("filters", "write a list of at most 100 filters");
     }
     const ConditionBuilder builder(table);
     Conditions conditions;
     for (std::size_t index = 0; index < filters.size(); ++index) {
-        auto condition =
-            readFilter(builder, filters[index], "filters[" + std::to_string(index) + "]");
+        auto condition = readFilter(builder, filters[index], fields.place("filters", index));
         if (auto* const problem = std::get_if<Problem>(&condition)) {
-            return std::move(*problem);
+            throw RequestRefused(std::move(*problem));
         }
         conditions.push_back(std::move(std::get<Condition>(condition)));
     }
     if (table == "RMLOGENT") {
         if (std::optional<Problem> problem = incompleteReport(conditions)) {
-            return std::move(*problem);
+            throw RequestRefused(std::move(*problem));
         }
     }
     return conditions;
+}
+
+} // namespace
+
+std::variant<Conditions, Problem> SampleRequest::parse(std::string_view table,
+                                                       std::string_view body) {
+    try {
+        return parseFilters(table, body);
+    } catch (const RequestRefused& refused) {
+        return refused.problem();
+    }
 }

@@ -40,16 +40,19 @@ TEST(SampleRequest, NeedsNoFiltersForTheMonitoredLogs) {
     EXPECT_EQ(refused(""), "accepted");
     EXPECT_EQ(refused("{}"), "accepted");
     EXPECT_EQ(refused(R"({"filters":[]})"), "accepted");
+    EXPECT_EQ(refused(R"({"filters":null})"), "accepted");
 }
 
 TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
     EXPECT_EQ(refused("{"), "body: the body is no JSON");
     EXPECT_EQ(refused("{\"filters\":\"\xff\"}"), "body: the body is no JSON");
-    EXPECT_EQ(refused("[]"), "body: write an object with filters");
-    EXPECT_EQ(refused("5"), "body: write an object with filters");
-    EXPECT_EQ(refused(R"({"filter":[]})"), "filter: unknown member; a sample has filters");
+    EXPECT_EQ(refused("[]"), "body: write an object");
+    EXPECT_EQ(refused("5"), "body: write an object");
+    EXPECT_EQ(refused(R"({"filter":[]})"), "filter: unknown member; the members are filters");
     EXPECT_EQ(refused(R"({"filters":{}})"), "filters: write a list of at most 100 filters");
-    EXPECT_EQ(refused(R"({"filters":null})"), "filters: write a list of at most 100 filters");
+    EXPECT_EQ(refused(R"({"filters":"x"})"), "filters: write a list of at most 100 filters");
+    EXPECT_EQ(refused(R"({"filters":[],"filters":[]})"), "filters: the member comes twice");
+    EXPECT_EQ(refused(std::string(100'000, '[')), "body: the body is nested deeper than 32");
     std::string many = R"({"filters":[0)";
     for (int count = 0; count < 100; ++count) {
         many += ",0";

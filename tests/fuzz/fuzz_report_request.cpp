@@ -1,0 +1,25 @@
+#include "host/http/ReportRequest.h"
+#include "host/http/RequestRefused.h"
+
+#include <cstdint>
+#include <cstdlib>
+#include <string_view>
+
+// Any body gives a report with its log and its window, or a problem that names its place.
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    const std::string_view text(reinterpret_cast<const char*>(data), size);
+    try {
+        const ReportRequest report = ReportRequest::parse(text);
+        if (report.from.size() != 16 || report.to.size() != 16 || report.from > report.to ||
+            report.conditions.size() < 4 || report.log.empty()) {
+            std::abort();
+        }
+    } catch (const RequestRefused& refused) {
+        if (refused.problem().status != 400 || refused.problem().detail.empty() ||
+            refused.problem().field.empty() || refused.problem().json().empty()) {
+            std::abort();
+        }
+    }
+    return 0;
+}
