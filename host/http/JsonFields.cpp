@@ -16,6 +16,11 @@ using nlohmann::json;
 
 constexpr int deepest = 32;
 
+/// A key as a part of a place: also the empty one can be seen.
+std::string shown(std::string_view key) {
+    return key.empty() ? "\"\"" : std::string(key);
+}
+
 /// Watches a body while it is parsed: the parser itself takes any depth, and the last of several
 /// members of one name.
 class BodyRules {
@@ -29,7 +34,7 @@ public:
         } else if (event == json::parse_event_t::object_end) {
             m_keys.pop_back();
         } else if (event == json::parse_event_t::key && !m_keys.back().insert(parsed).second) {
-            throw RequestRefused(400, "the member comes twice", parsed.get<std::string>());
+            throw RequestRefused(400, "the member comes twice", shown(parsed.get<std::string>()));
         }
         return true;
     }
@@ -163,7 +168,7 @@ const json& JsonFields::value(std::string_view key) {
 }
 
 std::string JsonFields::place(std::string_view key) const {
-    return m_prefix + std::string(key);
+    return m_prefix + shown(key);
 }
 
 std::string JsonFields::place(std::string_view key, std::size_t index) const {

@@ -97,6 +97,8 @@ TEST(JsonFields, RefusesMembersThatNobodyAskedFor) {
     };
     EXPECT_EQ(refused(R"({"log":"x","where":[]})", read),
               "where: unknown member; the members are log, logs");
+    EXPECT_EQ(refused(R"({"":1})", read), "\"\": unknown member; the members are log, logs");
+    EXPECT_EQ(refused(R"({"":1,"":2})", read), "\"\": the member comes twice");
     EXPECT_EQ(refused(R"({"definition":{"nam":1}})",
                       [](JsonFields& f) {
                           JsonFields definition = f.object("definition");
