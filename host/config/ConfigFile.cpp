@@ -95,6 +95,36 @@ void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& co
     section.refuseUnknownKeys();
 }
 
+/// A number within bounds; none when the key is missing or the number is not.
+std::optional<std::int64_t> readBounded(ConfigSection& section, std::string_view key,
+                                        std::int64_t least, std::int64_t most) {
+    const std::optional<std::int64_t> number = section.number(key);
+    if (number && (*number < least || *number > most)) {
+        section.problem(key, std::to_string(*number) + " is out of bounds",
+                        "write a number from " + std::to_string(least) + " to " +
+                            std::to_string(most));
+        return std::nullopt;
+    }
+    return number;
+}
+
+void readHistory(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    constexpr std::int64_t mostDays = 36'500;
+    constexpr std::int64_t mostEvents = 1'000'000'000'000;
+    ConfigSection section("history", table, problems);
+    HistoryConfig& history = config.history;
+    history.enabled = section.truth("enabled").value_or(history.enabled);
+    if (const std::optional<std::string> directory = section.text("directory")) {
+        requireAbsolute(section, "directory", *directory);
+        history.directory = *directory;
+    }
+    history.keepDays = readBounded(section, "keep_days", 1, mostDays).value_or(history.keepDays);
+    if (const auto events = readBounded(section, "keep_events", 1, mostEvents)) {
+        history.keepEvents = static_cast<std::uint64_t>(*events);
+    }
+    section.refuseUnknownKeys();
+}
+
 void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
     ConfigSection section("", file, problems);
     if (const std::optional<std::string> directory = section.text("state_directory")) {
@@ -106,6 +136,9 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
     }
     if (const toml::table* const http = section.table("http")) {
         readHttp(*http, problems, config);
+    }
+    if (const toml::table* const history = section.table("history")) {
+        readHistory(*history, problems, config);
     }
     if (const auto sinks = section.tables("sink")) {
         SinkReader reader(problems);

@@ -88,6 +88,18 @@ std::optional<std::int64_t> ConfigSection::number(std::string_view key) {
     return node->as_integer()->get();
 }
 
+std::optional<bool> ConfigSection::truth(std::string_view key) {
+    const toml::node* const node = find(key);
+    if (node == nullptr) {
+        return std::nullopt;
+    }
+    if (!node->is_boolean()) {
+        wrongType(key, *node, "write true or false");
+        return std::nullopt;
+    }
+    return node->as_boolean()->get();
+}
+
 std::vector<ConfigSection::Text> ConfigSection::texts(std::string_view key) {
     const toml::node* const node = find(key);
     std::vector<Text> texts;

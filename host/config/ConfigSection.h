@@ -26,6 +26,7 @@ public:
     /// The value of a key; none when it is missing or of another type, which is a problem.
     std::optional<std::string> text(std::string_view key);
     std::optional<std::int64_t> number(std::string_view key);
+    std::optional<bool> truth(std::string_view key);
     /// A text or a list of texts; empty when the key is missing.
     std::vector<Text> texts(std::string_view key);
     /// A table, as in [key]; null when it is missing.

@@ -5,6 +5,7 @@
 #include "host/framework/Condition.h"
 #include "host/http/ListenAddress.h"
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -23,6 +24,15 @@ struct HttpConfig {
     std::string certificate;             ///< empty: without TLS
     std::string key;                     ///< of the certificate
     bool operator==(const HttpConfig&) const = default;
+};
+
+/// [history]
+struct HistoryConfig {
+    bool enabled = true;
+    std::string directory;                ///< empty: the state directory
+    std::int64_t keepDays = 30;           ///< older events expire
+    std::uint64_t keepEvents = 5'000'000; ///< so many of the newest events are kept at most
+    bool operator==(const HistoryConfig&) const = default;
 };
 
 /// [[situation]]
@@ -44,6 +54,7 @@ struct HostConfig {
     std::string stateDirectory = "/var/lib/zrm";
     std::vector<EnvironmentSetting> environment;
     HttpConfig http;
+    HistoryConfig history;
     std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
     std::vector<SituationConfig> situations;
 };

@@ -10,9 +10,9 @@ constexpr std::chrono::milliseconds gatherTime{5};
 
 } // namespace
 
-EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize)
+EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
     // The rows are left uninitialised: pages that no event has reached cost no memory.
-    : m_rowSize(rowSize), m_events(capacity),
+    : m_rowSize(rowSize), m_last(last), m_events(capacity),
       m_rows(std::make_unique_for_overwrite<char[]>(capacity * rowSize)) {
     for (std::size_t slot = 0; slot < capacity; ++slot) {
         m_events[slot].row = m_rows.get() + slot * rowSize;
@@ -67,7 +67,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
         }
         const std::size_t slot = m_next % m_events.size();
         Event& event = m_events[slot];
-        event.id = m_next + 1;
+        event.id = m_last + m_next + 1;
         event.raised = std::chrono::duration_cast<std::chrono::milliseconds>(
                            system_clock::now().time_since_epoch())
                            .count();
@@ -83,21 +83,29 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
     return true;
 }
 
-void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader) {
+void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader,
+                               Clock::time_point limit) {
     if (m_closed || m_cursor[reader] != m_next) {
         return;
     }
     m_awaited[reader] = m_cursor[reader] + 1;
-    m_changed.wait(lock, [&] { return m_closed || m_next >= m_awaited[reader]; });
-    // Waking a thread costs more than an event does, so one wake-up is to serve many.
-    m_awaited[reader] = m_cursor[reader] + quarter();
-    m_changed.wait_for(lock, gatherTime, [&] { return m_closed || m_next >= m_awaited[reader]; });
+    const auto hasThem = [&] { return m_closed || m_next >= m_awaited[reader]; };
+    if (limit == Clock::time_point::max()) {
+        m_changed.wait(lock, hasThem);
+    } else {
+        m_changed.wait_until(lock, limit, hasThem);
+    }
+    if (m_cursor[reader] != m_next) {
+        // Waking a thread costs more than an event does, so one wake-up is to serve many.
+        m_awaited[reader] = m_cursor[reader] + quarter();
+        m_changed.wait_for(lock, gatherTime, hasThem);
+    }
     m_awaited[reader] = nobody;
 }
 
-std::span<const Event> EventQueue::read(Reader reader, std::size_t most) {
+std::span<const Event> EventQueue::read(Reader reader, std::size_t most, Clock::time_point limit) {
     std::unique_lock lock(m_mutex);
-    waitForEvents(lock, reader);
+    waitForEvents(lock, reader, limit);
     const std::size_t first = m_cursor[reader] % m_events.size();
     const auto waiting = static_cast<std::size_t>(m_next - m_cursor[reader]);
     // A run ends at the ring's end, so that it is one span.
@@ -115,6 +123,11 @@ void EventQueue::release(Reader reader, std::size_t count) {
         }
     }
     m_roomMade.notify_all();
+}
+
+bool EventQueue::ended(Reader reader) const {
+    const std::lock_guard guard(m_mutex);
+    return m_closed && m_cursor[reader] == m_next;
 }
 
 std::size_t EventQueue::backlog(Reader reader) const {

@@ -27,8 +27,8 @@ public:
     using Clock = std::chrono::steady_clock;
     using Reader = std::size_t;
 
-    /// Room for `capacity` events of rows of `rowSize` bytes.
-    EventQueue(std::size_t capacity, std::size_t rowSize);
+    /// Room for `capacity` events of rows of `rowSize` bytes. The ids of the events follow `last`.
+    EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last = 0);
     EventQueue(const EventQueue&) = delete;
     EventQueue& operator=(const EventQueue&) = delete;
 
@@ -39,10 +39,15 @@ public:
     /// the queue is closed or the limit of the waits has passed.
     bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
 
-    /// Waits for events, a few milliseconds for more once the first has come, and gives the oldest
-    /// ones that the reader has not released, at most `most`; they stay as they are until released.
-    /// Empty only when the queue is closed and the reader has released everything.
-    std::span<const Event> read(Reader reader, std::size_t most);
+    /// Waits for events, until the limit, and a few milliseconds for more once the first has come.
+    /// Gives the oldest ones that the reader has not released, at most `most`; they stay as they
+    /// are until released. Empty only when there was none in time, or when the queue is closed and
+    /// the reader has released everything.
+    std::span<const Event> read(Reader reader, std::size_t most,
+                                Clock::time_point limit = Clock::time_point::max());
+
+    /// True when the queue is closed and the reader has released everything.
+    bool ended(Reader reader) const;
 
     /// Moves the reader's cursor past its oldest `count` events.
     void release(Reader reader, std::size_t count);
@@ -62,7 +67,7 @@ public:
 
 private:
     std::uint64_t slowest() const;
-    void waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader);
+    void waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader, Clock::time_point limit);
     std::size_t quarter() const { return std::max<std::size_t>(m_events.size() / 4, 1); }
     bool waitWhileFull(std::unique_lock<std::mutex>& lock);
     static constexpr std::uint64_t nobody = std::numeric_limits<std::uint64_t>::max();
@@ -70,6 +75,7 @@ private:
     bool waitForRoom(std::unique_lock<std::mutex>& lock);
 
     const std::size_t m_rowSize;
+    const std::uint64_t m_last;     ///< id before the first event's
     std::vector<Event> m_events;    ///< ring; event n lives in slot n % size
     std::unique_ptr<char[]> m_rows; ///< the rows of the slots
 

@@ -110,6 +110,7 @@ void Host::tick(int number) {
             say("no log to monitor: %s names none that can be monitored; ending in a minute", file);
         }
     }
+    m_serving->tick();
     if (m_file.hasChanged()) {
         reload();
     }
@@ -129,7 +130,8 @@ void Host::reload() {
     trace.detail()("%s taken over.", m_file.path().c_str());
     m_serving->apply(config.situations);
     if (config.environment != m_config.environment || config.http != m_config.http ||
-        config.sinks != m_config.sinks || config.stateDirectory != m_config.stateDirectory) {
+        config.sinks != m_config.sinks || config.history != m_config.history ||
+        config.stateDirectory != m_config.stateDirectory) {
         say("%s: the situations are taken over, every other change at the next start",
             m_file.path().c_str());
     }

@@ -6,6 +6,7 @@
 #include "host/console/ConsoleResource.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
+#include "host/history/WallClock.h"
 #include "host/http/AgentResource.h"
 #include "host/http/ApiToken.h"
 #include "host/http/EventStream.h"
@@ -64,10 +65,19 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
                  const RowLayout& layout)
-    : m_delivery(config.sinks, layout, request.rowSize),
+    : m_delivery(config, layout, request.rowSize),
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
+    if (History* const history = m_delivery.history()) {
+        m_entries.emplace(*history);
+    }
     addResources(entries);
+}
+
+void Serving::tick() {
+    if (m_entries) {
+        m_entries->tick(WallClock::now());
+    }
 }
 
 void Serving::addResources(TableManager& entries) {
@@ -154,5 +164,8 @@ void Serving::stop(Clock::time_point limit) {
     m_analysis->cancel();
     m_http.stop(limit);
     m_situations.close();
+    if (m_entries) {
+        m_entries->finish();
+    }
     m_delivery.finish(limit);
 }

@@ -3,6 +3,7 @@
 
 #include "host/config/HostConfig.h"
 #include "host/events/Delivery.h"
+#include "host/history/EntryRecorder.h"
 #include "host/http/HttpServer.h"
 #include "host/http/Resource.h"
 #include "host/http/Router.h"
@@ -11,6 +12,7 @@
 
 #include <chrono>
 #include <memory>
+#include <optional>
 #include <vector>
 
 class AnalysisResource;
@@ -36,6 +38,9 @@ public:
 
     /// Exchanges the situations.
     void apply(const std::vector<SituationConfig>& situations) { m_situations.apply(situations); }
+
+    /// What is done about once a second.
+    void tick();
 
     /// The number of monitored logs.
     static std::size_t countLogs();
@@ -63,6 +68,7 @@ private:
     void addResource(std::unique_ptr<Resource> resource);
 
     Delivery m_delivery;
+    std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
     TableSampler m_sampler;
     Router m_router;

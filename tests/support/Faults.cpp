@@ -235,7 +235,7 @@ extern "C" int __wrap_open(const char* path, int flags, ...) {
     return __real_open(path, flags, mode);
 }
 
-// Every fcntl command of this project takes an int or nothing.
+// An fcntl command takes nothing, an int or a pointer; a pointer has room for each.
 extern "C" int __real_fcntl(int fd, int command, ...);
 extern "C" int __wrap_fcntl(int fd, int command, ...);
 extern "C" int __wrap_fcntl(int fd, int command, ...) {
@@ -245,7 +245,7 @@ extern "C" int __wrap_fcntl(int fd, int command, ...) {
     }
     std::va_list arguments;
     va_start(arguments, command);
-    const int argument = va_arg(arguments, int);
+    void* const argument = va_arg(arguments, void*);
     va_end(arguments);
     return __real_fcntl(fd, command, argument);
 }

@@ -121,6 +121,7 @@ class Agent:
         self.more_sinks = []
         self.listen = ""
         self.http_keys = {}
+        self.history = {}  # keys of [history]
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -159,6 +160,8 @@ class Agent:
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
         text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         text += "".join(f"{k} = {json.dumps(str(v))}\n" for k, v in self.http_keys.items())
+        text += "[history]\n"
+        text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in self.history.items())
         if self.sink is not None:
             text += f'\n[[sink]]\ntype = "jsonl"\npath = {json.dumps(str(self.sink))}\n'
         for sink in self.more_sinks:

@@ -57,6 +57,7 @@ def test_a_sink_that_is_full_all_along_does_not_hold_up_the_stop(agent):
     agent.situation(log=log)
     agent.sink = Path("/dev/full")
     agent.environment["AGENT_DEBUG_LOG"] = str(agent.directory / "debug.log")
+    agent.history = {"enabled": False}
     agent.start()
     log.append("".join(syslog_line(f"number {i}") for i in range(5000)))
     agent.wait_trace("Error delivering events to /dev/full: write failed: No space left on device.")

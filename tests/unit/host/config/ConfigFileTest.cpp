@@ -34,6 +34,10 @@ TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
     EXPECT_EQ(config.stateDirectory, "/var/lib/zrm");
     EXPECT_THAT(config.environment, IsEmpty());
     EXPECT_FALSE(config.http.listen);
+    EXPECT_TRUE(config.history.enabled);
+    EXPECT_EQ(config.history.directory, "");
+    EXPECT_EQ(config.history.keepDays, 30);
+    EXPECT_EQ(config.history.keepEvents, 5'000'000u);
     EXPECT_THAT(config.sinks, ElementsAre(SinkConfig::jsonl("-")));
     EXPECT_THAT(config.situations, IsEmpty());
 }
@@ -52,6 +56,12 @@ trace       = "error,LogManager=detail"
 [http]
 listen = "[::1]:0"
 token_file = "/srv/token"
+
+[history]
+enabled     = false
+directory   = "/srv/history"
+keep_days   = 7
+keep_events = 100_000
 
 [[sink]]
 type = "jsonl"
@@ -73,6 +83,7 @@ period    = "60s"
                             EnvironmentSetting{"ZRM_MAX_ROWS", "1000"},
                             EnvironmentSetting{"QFW_TRC1", "error,LogManager=detail"}));
     EXPECT_EQ(config.http.listen, (ListenAddress{"::1", 0}));
+    EXPECT_EQ(config.history, (HistoryConfig{false, "/srv/history", 7, 100'000}));
     EXPECT_EQ(config.http.tokenFile, "/srv/token");
     EXPECT_THAT(config.sinks, ElementsAre(SinkConfig::jsonl("/var/log/events.jsonl")));
     ASSERT_EQ(config.situations.size(), 1u);
@@ -123,12 +134,12 @@ rotate = true
 [[situation]]
 name = "a"
 threshold = 5
-[history]
+[histories]
 keep_days = 30
 )"),
         ElementsAre(
             "zrm.toml:1: colour: unknown key; the keys here are state_directory, agent, http, "
-            "sink, situation",
+            "history, sink, situation",
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
@@ -136,8 +147,8 @@ keep_days = 30
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period",
-            "zrm.toml:13: history: unknown key; the keys here are state_directory, agent, http, "
-            "sink, situation"));
+            "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
+            "http, history, sink, situation"));
 }
 
 TEST(ConfigFile, RefusesValuesOfAnotherType) {
@@ -364,6 +375,30 @@ TEST(ConfigFile, TheExamplesOfTheDocumentationAreAccepted) {
     for (const std::string& block : blocks) {
         EXPECT_THAT(refused(block), IsEmpty()) << block;
     }
+}
+
+TEST(ConfigFile, TellsWhatIsWrongWithTheHistory) {
+    EXPECT_THAT(refused("[history]\n"
+                        "enabled = \"yes\"\n"
+                        "directory = \"state\"\n"
+                        "keep_days = 0\n"
+                        "keep_events = 1_000_000_000_001\n"
+                        "keep = 1\n"),
+                ElementsAre("zrm.toml:2: history.enabled: is a text; write true or false",
+                            "zrm.toml:3: history.directory: 'state' is no absolute path; begin it "
+                            "with '/'",
+                            "zrm.toml:4: history.keep_days: 0 is out of bounds; write a number "
+                            "from 1 to 36500",
+                            "zrm.toml:5: history.keep_events: 1000000000001 is out of bounds; "
+                            "write a number from 1 to 1000000000000",
+                            "zrm.toml:6: history.keep: unknown key; the keys here are enabled, "
+                            "directory, keep_days, keep_events"));
+    EXPECT_THAT(refused("history = true"),
+                ElementsAre("zrm.toml:1: history: is a truth value; write it as [history]"));
+    EXPECT_THAT(refused("[history]\nkeep_days = 1.5\nkeep_events = \"all\"\n"),
+                ElementsAre("zrm.toml:2: history.keep_days: is a number with a fraction; write a "
+                            "whole number",
+                            "zrm.toml:3: history.keep_events: is a text; write a whole number"));
 }
 
 } // namespace

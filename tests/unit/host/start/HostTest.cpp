@@ -120,7 +120,10 @@ protected:
         std::ofstream(directory + "/zrm.toml") << text;
         return directory + "/zrm.toml";
     }
-    std::string sink() const { return "[[sink]]\ntype = 'jsonl'\npath = '" + output() + "'\n"; }
+    std::string sink() const {
+        return "state_directory = '" + directory + "/state'\n[[sink]]\ntype = 'jsonl'\npath = '" +
+               output() + "'\n";
+    }
     /// From here on standard error goes to a file, where this process and its parent can read it.
     void errorsToFile() const {
         const int fd = open((directory + "/errors").c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
@@ -153,8 +156,9 @@ TEST_F(HostTest, AnUnusableCommandLineEndsTheProcess) {
 
 TEST_F(HostTest, AnUnusableConfigurationEndsTheProcessWithEveryProblem) {
     const std::string file = write("a = 1\nb = 2\n");
-    const std::string keys = "unknown key; the keys here are state_directory, agent, http, sink, "
-                             "situation\n";
+    const std::string keys =
+        "unknown key; the keys here are state_directory, agent, http, history, sink, "
+        "situation\n";
     EXPECT_EXIT(start({"--config", file}), testing::ExitedWithCode(2),
                 "^zrmagent: " + file + ":1: a: " + keys + "zrmagent: " + file + ":2: b: " + keys +
                     "$");

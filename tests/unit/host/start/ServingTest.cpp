@@ -102,6 +102,7 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
 }
 
 TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
+    config.history.enabled = false; // the queue is all the room there is
     config.sinks = {SinkConfig::jsonl("/dev/full")};
     const auto serving = Serving::begin(config, entries);
     std::atomic<int> taken{0};
@@ -161,12 +162,41 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     EXPECT_EQ(lines(), 1);
 }
 
+TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
+    const std::vector<SinkConfig> good = config.sinks;
+    config.sinks = {SinkConfig::jsonl(directory.file("no/such/directory/events.jsonl"))};
+    auto serving = Serving::begin(config, entries);
+    EXPECT_EQ(arrive(), 0u);
+    testing::internal::CaptureStderr();
+    serving->stop(Clock::now() + 50ms);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "zrmagent: 1 events were not delivered to " +
+                  directory.file("no/such/directory/events.jsonl") +
+                  "; it gets them when the agent runs again\n");
+    serving.reset();
+    std::filesystem::create_directories(directory.file("no/such/directory"));
+    serving = Serving::begin(config, entries);
+    EXPECT_EQ(arrive(), 0u);
+    serving->stop(Clock::now() + 10s);
+    std::ifstream stream(directory.file("no/such/directory/events.jsonl"));
+    EXPECT_EQ(std::count(std::istreambuf_iterator<char>(stream), {}, '\n'), 2);
+}
+
+TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
+    const auto serving = Serving::begin(config, entries);
+    const int before = logSamples;
+    serving->tick();
+    EXPECT_EQ(logSamples, before) << "no minute is over yet";
+    serving->stop(Clock::now() + 10s);
+    EXPECT_EQ(logSamples, before + 1) << "the end of the agent ends the minute";
+}
+
 TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
     const auto serving = Serving::begin(config, entries);
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
-    EXPECT_FALSE(std::filesystem::exists(directory.file("state")));
+    EXPECT_FALSE(std::filesystem::exists(directory.file("state/api-token")));
     serving->stop(Clock::now() + 10s);
 }
 

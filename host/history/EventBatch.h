@@ -1,0 +1,74 @@
+#ifndef ZRM_HOST_EVENT_BATCH_H
+#define ZRM_HOST_EVENT_BATCH_H
+
+#include "host/events/EventJson.h"
+#include "host/events/EventRecord.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Events in a row, with their texts in one piece of memory. Filled by one thread; sealed, it no
+/// longer changes and any thread reads it.
+class EventBatch {
+public:
+    EventBatch() = default;
+    EventBatch(const EventBatch&) = delete;
+    EventBatch& operator=(const EventBatch&) = delete;
+
+    /// Makes room for texts of so many bytes in all.
+    void reserve(std::size_t bytes) { m_text.reserve(bytes); }
+
+    /// Adds one event of the queue, rendered. Not after seal.
+    void add(const Event& event, const EventJson& format);
+
+    /// Adds a copy of one event. Not after seal.
+    void add(const EventRecord& event);
+
+    /// Makes the records. Once.
+    void seal();
+
+    /// The events; after seal, and as long as the batch.
+    std::span<const EventRecord> records() const noexcept { return m_records; }
+
+    std::size_t size() const noexcept { return m_records.size(); }
+    bool empty() const noexcept { return m_records.empty(); }
+    /// The first and the last id of a batch that is not empty.
+    std::uint64_t first() const noexcept { return m_records.front().id; }
+    std::uint64_t last() const noexcept { return m_records.back().id; }
+    /// Length of the texts, in bytes.
+    std::size_t textBytes() const noexcept { return m_text.size(); }
+    /// Memory taken, in bytes.
+    std::size_t bytes() const noexcept {
+        return m_text.capacity() + m_records.capacity() * sizeof(EventRecord);
+    }
+
+private:
+    struct Piece {
+        std::size_t begin = 0;
+        std::size_t size = 0;
+    };
+    /// Where the texts of one event lie; the memory moves while it grows.
+    struct Places {
+        Piece situation;
+        Piece severity;
+        Piece log;
+        Piece json;
+    };
+
+    std::string_view at(const Piece& piece) const noexcept {
+        return std::string_view(m_text).substr(piece.begin, piece.size);
+    }
+    Piece pieceFrom(std::size_t begin) const noexcept { return {begin, m_text.size() - begin}; }
+    /// Events in a row mostly have these texts in common.
+    Piece sameOr(std::string_view text, Piece Places::*which);
+
+    std::string m_text;
+    std::vector<Places> m_places;
+    std::vector<EventRecord> m_records;
+};
+
+#endif

@@ -1,0 +1,77 @@
+#include "host/history/EventTable.h"
+
+#include <algorithm>
+
+EventTable::EventTable(Database& database)
+    : m_database(database),
+      m_insert(database, "INSERT INTO events (id, raised, label, json) VALUES (?, ?, ?, ?)"),
+      m_mark(database, "INSERT INTO marks (part, earliest, latest) VALUES (?, ?, ?)"
+                       " ON CONFLICT (part) DO UPDATE SET"
+                       " earliest = min(earliest, excluded.earliest),"
+                       " latest = max(latest, excluded.latest)"),
+      m_oldestMoments(database, "SELECT id, raised FROM events ORDER BY id LIMIT ?"),
+      m_firstMoment(database, "SELECT earliest FROM marks WHERE part >= ? AND earliest <= ?"
+                              " ORDER BY part LIMIT 1"),
+      m_remove(database, "DELETE FROM events WHERE id <= ?"),
+      m_removeMarks(database, "DELETE FROM marks WHERE part < ?") {}
+
+void EventTable::append(std::span<const EventRecord> events, std::span<const std::int64_t> labels) {
+    for (std::size_t index = 0; index < events.size(); ++index) {
+        const EventRecord& event = events[index];
+        m_insert.bind(1, event.id).bind(2, event.raised).bind(3, labels[index]).bind(4, event.json);
+        m_insert.run();
+    }
+    while (!events.empty()) {
+        const std::uint64_t part = events.front().id / partSize;
+        const auto end =
+            std::partition_point(events.begin(), events.end(), [part](const EventRecord& event) {
+                return event.id / partSize == part;
+            });
+        const auto count = static_cast<std::size_t>(end - events.begin());
+        mark(events.first(count));
+        events = events.subspan(count);
+    }
+}
+
+void EventTable::mark(std::span<const EventRecord> events) {
+    const auto [earliest, latest] = std::minmax_element(
+        events.begin(), events.end(),
+        [](const EventRecord& a, const EventRecord& b) { return a.raised < b.raised; });
+    m_mark.bind(1, events.front().id / partSize);
+    m_mark.bind(2, earliest->raised).bind(3, latest->raised).run();
+}
+
+std::uint64_t EventTable::oldest() {
+    return static_cast<std::uint64_t>(m_database.number("SELECT min(id) FROM events"));
+}
+
+std::uint64_t EventTable::newest() {
+    return static_cast<std::uint64_t>(m_database.number("SELECT max(id) FROM events"));
+}
+
+std::vector<EventTable::Moment> EventTable::oldestMoments(std::size_t most) {
+    std::vector<Moment> moments;
+    m_oldestMoments.bind(1, std::uint64_t{most});
+    while (m_oldestMoments.step()) {
+        moments.push_back(
+            {static_cast<std::uint64_t>(m_oldestMoments.integer(0)), m_oldestMoments.integer(1)});
+    }
+    m_oldestMoments.reset();
+    return moments;
+}
+
+std::optional<std::int64_t> EventTable::firstMomentFrom(std::uint64_t id, std::int64_t time) {
+    std::optional<std::int64_t> moment;
+    if (m_firstMoment.bind(1, id / partSize).bind(2, time).step()) {
+        moment = m_firstMoment.integer(0);
+    }
+    m_firstMoment.reset();
+    return moment;
+}
+
+void EventTable::removeUntil(std::uint64_t id) {
+    m_remove.bind(1, id).run();
+    // The part of the next event is kept, with what it had of removed ones: a mark may be wider
+    // than its events.
+    m_removeMarks.bind(1, (id + 1) / partSize).run();
+}

@@ -1,0 +1,58 @@
+#ifndef ZRM_HOST_EVENT_TABLE_H
+#define ZRM_HOST_EVENT_TABLE_H
+
+#include "host/events/EventRecord.h"
+#include "host/history/Statement.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <vector>
+
+/// The events of a history, as the writer sees them: appended at one end and removed at the other.
+/// Used by the writer's thread. Throws DatabaseError.
+class EventTable {
+public:
+    /// Events are marked in parts of so many ids: the part of an event is its id divided by this.
+    static constexpr std::uint64_t partSize = 1024;
+
+    /// When an event was raised.
+    struct Moment {
+        std::uint64_t id = 0;
+        std::int64_t raised = 0; ///< milliseconds since 1970, UTC
+    };
+
+    explicit EventTable(Database& database);
+
+    /// Adds events; `labels` has the label of each.
+    void append(std::span<const EventRecord> events, std::span<const std::int64_t> labels);
+
+    /// Id of the oldest event; 0 when there is none.
+    std::uint64_t oldest();
+    /// Id of the newest event; 0 when there is none.
+    std::uint64_t newest();
+
+    /// The oldest events, at most so many, by ascending id.
+    std::vector<Moment> oldestMoments(std::size_t most);
+
+    /// When an event of the part of `id`, or of a later one, was raised, not later than `time`: the
+    /// earliest of the first part that has one. None when every such event was raised later.
+    std::optional<std::int64_t> firstMomentFrom(std::uint64_t id, std::int64_t time);
+
+    /// Removes the events up to this id.
+    void removeUntil(std::uint64_t id);
+
+private:
+    void mark(std::span<const EventRecord> events);
+
+    Database& m_database;
+    Statement m_insert;
+    Statement m_mark;
+    Statement m_oldestMoments;
+    Statement m_firstMoment;
+    Statement m_remove;
+    Statement m_removeMarks;
+};
+
+#endif

@@ -1,0 +1,168 @@
+#include "host/history/History.h"
+
+#include "agent/TraceScope.h"
+#include "host/history/HistoryQuery.h"
+#include "host/history/HistorySource.h"
+#include "host/history/Schema.h"
+#include "host/start/Say.h"
+
+#include <algorithm>
+#include <cinttypes>
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"History.cpp"};
+
+/// For the newest events: what a sink that keeps up is behind, and more.
+constexpr std::size_t bytesInMemory = std::size_t{8} * 1024 * 1024;
+
+/// The place of a sink that is no longer in the configuration is kept so long.
+constexpr int daysOfUnusedCursors = 30;
+
+/// The newest id of a file that is about to be moved aside, as far as it can be told.
+std::uint64_t newestOfCorrupt(const std::string& path) {
+    try {
+        Database database(path, Database::Use::READ);
+        return static_cast<std::uint64_t>(database.number("SELECT max(id) FROM events"));
+    } catch (const DatabaseError&) {
+        return 0;
+    }
+}
+
+std::unique_ptr<HistoryFile> openFile(const std::string& path) {
+    auto file = std::make_unique<HistoryFile>(path);
+    file->removeOldCursors(daysOfUnusedCursors);
+    return file;
+}
+
+/// The file, or what is wrong with it. A corrupt one is exchanged.
+std::variant<std::unique_ptr<HistoryFile>, std::string>
+openOrReplace(const HistoryDirectory& directory) {
+    const auto problem = [&](const char* why) {
+        return "cannot open " + directory.file() + ": " + why;
+    };
+    std::uint64_t newest = 0;
+    try {
+        return openFile(directory.file());
+    } catch (const SchemaTooNew& error) {
+        return problem(error.what()) +
+               "; use the program that wrote it, or move the file out of the way";
+    } catch (const DatabaseError& error) {
+        if (!error.isCorruption()) {
+            return problem(error.what());
+        }
+        newest = newestOfCorrupt(directory.file());
+        if (std::string failure = directory.moveAside(error.what()); !failure.empty()) {
+            return failure;
+        }
+    }
+    try {
+        auto file = openFile(directory.file());
+        file->continueAfter(newest);
+        return file;
+    } catch (const DatabaseError& error) {
+        return problem(error.what());
+    }
+}
+
+} // namespace
+
+std::variant<std::unique_ptr<History>, std::string> History::open(const HistoryConfig& config,
+                                                                  const std::string& directory) {
+    TraceScope trace(anchor);
+    auto opened = HistoryDirectory::open(directory);
+    if (auto* const problem = std::get_if<std::string>(&opened)) {
+        return std::move(*problem);
+    }
+    auto& place = std::get<std::unique_ptr<HistoryDirectory>>(opened);
+    auto file = openOrReplace(*place);
+    if (auto* const problem = std::get_if<std::string>(&file)) {
+        return std::move(*problem);
+    }
+    return std::unique_ptr<History>(new History(
+        config, std::move(place), std::move(std::get<std::unique_ptr<HistoryFile>>(file))));
+}
+
+History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
+                 std::unique_ptr<HistoryFile> file)
+    : m_directory(std::move(directory)), m_recent(bytesInMemory, file->newest()),
+      m_readers(m_directory->file()), m_file(*file),
+      m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors) {}
+
+History::~History() {
+    m_recent.end();
+}
+
+std::unique_ptr<EventSource> History::source(const std::string& key, const std::string& name) {
+    std::uint64_t event = newest();
+    try {
+        event = std::min(m_file.cursor(key).value_or(event), event);
+    } catch (const DatabaseError& error) {
+        say("the place of %s in the history cannot be read (%s); it gets new events only",
+            name.c_str(), error.what());
+    }
+    return std::make_unique<HistorySource>(name, m_recent, m_readers, m_cursors.add(key, event));
+}
+
+void History::start(EventQueue& queue, EventJson format) {
+    TraceScope trace(anchor);
+    m_writer.start(queue, std::move(format));
+}
+
+void History::finish(HistoryWriter::Clock::time_point limit) {
+    TraceScope trace(anchor);
+    const std::uint64_t left = m_writer.finish(limit);
+    m_recent.end();
+    if (left > 0 && !std::exchange(m_toldOfRest, true)) {
+        say("%" PRIu64 " events were not stored in the history %s: %s", left,
+            m_directory->file().c_str(), m_writer.problem().c_str());
+    }
+}
+
+template <class Work> auto History::reading(Work&& work) {
+    try {
+        ReaderPool::Lease lease = m_readers.take();
+        return work(*lease);
+    } catch (const DatabaseError& error) {
+        if (error.isCorruption()) {
+            m_readers.noteCorruption();
+        }
+        throw HistoryError(error.what());
+    }
+}
+
+std::vector<StoredEvent> History::query(const EventFilter& filter) {
+    return reading([&](Database& database) { return HistoryQuery(database, filter).run(); });
+}
+
+std::optional<StoredEvent> History::event(std::uint64_t id) {
+    EventFilter filter;
+    filter.after = id - 1;
+    filter.before = id + 1;
+    filter.limit = 1;
+    std::vector<StoredEvent> found;
+    if (id > 0 && id <= newest()) {
+        found = query(filter);
+    }
+    return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
+}
+
+std::uint64_t History::waitBeyond(std::uint64_t id, Clock::time_point limit,
+                                  const std::stop_token& stop) {
+    return m_recent.waitBeyond(id, limit, stop);
+}
+
+HistoryState History::state() {
+    HistoryState state;
+    state.oldest = m_writer.oldest();
+    state.newest = newest();
+    state.events = state.oldest == 0 ? 0 : state.newest - std::min(state.oldest - 1, state.newest);
+    state.bytes = m_directory->bytes();
+    state.problem = m_writer.problem();
+    return state;
+}
+
+Rates History::rates(std::int64_t from, std::int64_t to, std::int64_t step) {
+    return reading([&](Database& database) { return RateTable::read(database, from, to, step); });
+}

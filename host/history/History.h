@@ -1,0 +1,69 @@
+#ifndef ZRM_HOST_HISTORY_H
+#define ZRM_HOST_HISTORY_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/EventSource.h"
+#include "host/history/Cursors.h"
+#include "host/history/HistoryDirectory.h"
+#include "host/history/HistoryReader.h"
+#include "host/history/HistoryWriter.h"
+#include "host/history/ReaderPool.h"
+#include "host/history/RecentEvents.h"
+
+#include <memory>
+#include <string>
+#include <variant>
+
+/// The history of events: a SQLite file in a directory of its own, one writer, any number of
+/// readers, and a cursor for each sink. Set up, started and finished by one thread at a time; as a
+/// reader used by any.
+class History : public HistoryReader {
+public:
+    /// Opens the history of this directory; a new one is made, and a corrupt one is moved aside
+    /// for a new one, which is said. Gives what is wrong and its cure instead when there can be
+    /// none.
+    static std::variant<std::unique_ptr<History>, std::string> open(const HistoryConfig& config,
+                                                                    const std::string& directory);
+
+    ~History() override;
+
+    /// A source of events for a sink, from where the sink of this key stood when the agent last
+    /// ran; a new one begins with the next event. `name` is how messages call it. Before start.
+    std::unique_ptr<EventSource> source(const std::string& key, const std::string& name);
+
+    /// Begins to store the queue's events, which `format` renders. Their ids follow newest().
+    void start(EventQueue& queue, EventJson format);
+
+    /// Stores what is in the queue, at the latest until the limit, and lets the sources end with
+    /// it. Says so when something could not be stored. Any number of times.
+    void finish(HistoryWriter::Clock::time_point limit);
+
+    /// Keeps the places of sinks that have ended, and the last entries. After finish.
+    void storeRest() { m_writer.storeRest(); }
+
+    /// Takes the entries that a minute brought. Any thread.
+    void addEntries(MinuteCounts counts) { m_writer.addEntries(std::move(counts)); }
+
+    std::vector<StoredEvent> query(const EventFilter& filter) override;
+    std::optional<StoredEvent> event(std::uint64_t id) override;
+    std::uint64_t newest() const override { return m_recent.newest(); }
+    std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
+                             const std::stop_token& stop) override;
+    HistoryState state() override;
+    Rates rates(std::int64_t from, std::int64_t to, std::int64_t step) override;
+
+private:
+    History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
+            std::unique_ptr<HistoryFile> file);
+    template <class Work> auto reading(Work&& work);
+
+    const std::unique_ptr<HistoryDirectory> m_directory;
+    RecentEvents m_recent;
+    ReaderPool m_readers;
+    Cursors m_cursors;
+    HistoryFile& m_file; ///< the writer's, before start
+    HistoryWriter m_writer;
+    bool m_toldOfRest = false; ///< what could not be stored was said
+};
+
+#endif

@@ -1,0 +1,42 @@
+#ifndef ZRM_HOST_HISTORY_DIRECTORY_H
+#define ZRM_HOST_HISTORY_DIRECTORY_H
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <variant>
+
+/// The directory in which a history lives, locked against other processes as long as the object
+/// lives. Immutable but for moveAside.
+class HistoryDirectory {
+public:
+    /// Makes the directory when only it is missing, locks it, and sees that the history's file can
+    /// be written. Gives what is wrong and its cure instead when that cannot be.
+    static std::variant<std::unique_ptr<HistoryDirectory>, std::string>
+    open(const std::string& directory);
+
+    ~HistoryDirectory();
+    HistoryDirectory(const HistoryDirectory&) = delete;
+    HistoryDirectory& operator=(const HistoryDirectory&) = delete;
+
+    /// The path of the history's file.
+    const std::string& file() const noexcept { return m_file; }
+
+    /// Bytes on disk, of the file and of those that SQLite keeps beside it.
+    std::uint64_t bytes() const;
+
+    /// Renames the file to one that says when it was found corrupt, and makes an empty one. Nobody
+    /// has it open. Says so; returns what went wrong, empty when nothing did.
+    std::string moveAside(const std::string& why) const;
+
+private:
+    HistoryDirectory(const std::string& directory, int lock);
+
+    /// Makes the file where it is missing; returns what went wrong, empty when nothing did.
+    std::string makeFile() const;
+
+    const std::string m_file;
+    const int m_lock; ///< descriptor of the file that is locked
+};
+
+#endif

@@ -1,0 +1,248 @@
+#include "host/history/HistoryWriter.h"
+
+#include "agent/TraceScope.h"
+#include "host/history/Schema.h"
+#include "host/history/WallClock.h"
+#include "host/start/Say.h"
+
+#include <algorithm>
+#include <cinttypes>
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"HistoryWriter.cpp"};
+
+constexpr std::size_t batchSize = 512; ///< events per transaction, at most
+constexpr std::chrono::milliseconds firstPause{100};
+constexpr std::chrono::milliseconds longestPause{10'000};
+constexpr std::chrono::seconds housekeepingInterval{1};
+constexpr std::int64_t millisecondsPerDay = 24 * 60 * 60'000;
+
+/// Minutes of entries that are kept while they cannot be stored.
+constexpr std::size_t mostMinutes = 24 * 60;
+
+} // namespace
+
+HistoryWriter::HistoryWriter(const HistoryConfig& config, const HistoryDirectory& directory,
+                             std::unique_ptr<HistoryFile> file, RecentEvents& recent,
+                             ReaderPool& readers, Cursors& cursors)
+    : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
+      m_readers(readers), m_cursors(cursors), m_pause(firstPause), m_oldest(m_file->oldest()) {}
+
+HistoryWriter::~HistoryWriter() {
+    finish(Clock::now());
+}
+
+void HistoryWriter::start(EventQueue& queue, EventJson format) {
+    m_queue = &queue;
+    m_reader = queue.addReader();
+    m_format = std::make_unique<EventJson>(std::move(format));
+    m_thread = std::thread(&HistoryWriter::run, this);
+}
+
+void HistoryWriter::run() {
+    TraceScope trace(anchor);
+    for (;;) {
+        const auto now = Clock::now();
+        const std::span<const Event> events =
+            m_queue->read(m_reader, batchSize, m_hasMoreToDo ? now : now + housekeepingInterval);
+        if (events.empty()) {
+            if (m_queue->ended(m_reader)) {
+                break;
+            }
+            housekeep(true);
+            continue;
+        }
+        const auto batch = std::make_shared<EventBatch>();
+        batch->reserve(m_batchBytes + m_batchBytes / 8);
+        for (const Event& event : events) {
+            batch->add(event, *m_format);
+        }
+        batch->seal();
+        m_batchBytes = batch->textBytes();
+        if (!store(*batch)) {
+            break;
+        }
+        m_recent.publish(batch);
+        m_queue->release(m_reader, events.size());
+        housekeep(false);
+    }
+    {
+        const std::lock_guard guard(m_mutex);
+        m_ended = true;
+    }
+    m_changed.notify_all();
+}
+
+/// False when the end comes before the batch can be stored.
+bool HistoryWriter::store(const EventBatch& batch) {
+    const auto work = [&] {
+        const std::vector<CursorValue> moved = m_cursors.unsaved();
+        m_file->store(batch, moved);
+        m_cursors.saved(moved);
+        m_oldest.store(m_file->oldest());
+    };
+    while (!attempt(work)) {
+        if (!pause()) {
+            return false;
+        }
+    }
+    return true;
+}
+
+/// Does work on the file, which is opened or exchanged first where it must be. False when that
+/// failed.
+template <class Work> bool HistoryWriter::attempt(Work&& work) {
+    try {
+        if (m_file == nullptr) {
+            m_file = std::make_unique<HistoryFile>(m_directory.file());
+            m_file->continueAfter(m_recent.newest());
+        }
+        work();
+        succeeded();
+        return true;
+    } catch (const DatabaseError& error) {
+        if (error.isCorruption()) {
+            replaceFile(error.what());
+        } else {
+            failed(error.what());
+        }
+    } catch (const SchemaTooNew& error) {
+        failed(error.what());
+    }
+    return false;
+}
+
+void HistoryWriter::succeeded() {
+    m_pause = firstPause;
+    const std::lock_guard guard(m_mutex);
+    if (!m_problem.empty()) {
+        TraceScope trace(anchor);
+        trace.error()("The history takes events again.");
+        m_problem.clear();
+    }
+}
+
+void HistoryWriter::failed(const std::string& why) {
+    TraceScope trace(anchor);
+    const std::lock_guard guard(m_mutex);
+    if (m_problem.empty()) {
+        trace.error()("Error writing the history %s: %s. Trying again.", m_directory.file().c_str(),
+                      why.c_str());
+    } else {
+        trace.detail()("The history still cannot be written: %s.", why.c_str());
+    }
+    m_problem = why;
+}
+
+/// False when it is time to give up.
+bool HistoryWriter::pause() {
+    std::unique_lock lock(m_mutex);
+    const auto length = m_finishing ? firstPause : m_pause;
+    m_changed.wait_for(lock, length,
+                       [&, early = !m_finishing] { return m_giveUp || (early && m_finishing); });
+    m_pause = std::min(2 * m_pause, longestPause);
+    return !m_giveUp;
+}
+
+void HistoryWriter::replaceFile(const std::string& why) {
+    TraceScope trace(anchor);
+    // SQLite clears up by name when it closes: nobody may have the file open when the name changes.
+    m_readers.suspend();
+    m_file.reset();
+    const std::string problem = m_directory.moveAside(why);
+    m_readers.resume();
+    if (!problem.empty()) {
+        failed(problem);
+        return;
+    }
+    m_cursors.forgetSaved();
+    m_oldest.store(0);
+}
+
+void HistoryWriter::addEntries(MinuteCounts counts) {
+    const std::lock_guard guard(m_mutex);
+    if (m_minutes.size() < mostMinutes) {
+        m_minutes.push_back(std::move(counts));
+    }
+}
+
+void HistoryWriter::storeEntries() {
+    std::unique_lock lock(m_mutex);
+    const std::vector<MinuteCounts> minutes = m_minutes;
+    lock.unlock();
+    if (!minutes.empty()) {
+        m_file->addEntries(minutes);
+        lock.lock();
+        m_minutes.erase(m_minutes.begin(),
+                        m_minutes.begin() + static_cast<std::ptrdiff_t>(minutes.size()));
+    }
+}
+
+HistoryFile::Limits HistoryWriter::limits() {
+    const std::int64_t now = m_clock.now(WallClock::now(), Clock::now());
+    return {m_config.keepEvents, now - m_config.keepDays * millisecondsPerDay, now};
+}
+
+void HistoryWriter::storeCursors() {
+    const std::vector<CursorValue> moved = m_cursors.unsaved();
+    if (!moved.empty()) {
+        m_file->keepCursors(moved);
+        m_cursors.saved(moved);
+    }
+}
+
+/// What is done beside storing events, a little at a time.
+void HistoryWriter::housekeep(bool idle) {
+    const auto now = Clock::now();
+    const bool isOver = m_recent.newest() - m_oldest.load() >= m_config.keepEvents;
+    if (now < m_nextHousekeeping && !m_hasMoreToDo && !isOver) {
+        return;
+    }
+    m_nextHousekeeping = now + housekeepingInterval;
+    m_hasMoreToDo = false;
+    if (m_readers.takeCorruption()) {
+        replaceFile("a reader found it so");
+    }
+    attempt([&] {
+        storeCursors();
+        storeEntries();
+        m_hasMoreToDo = m_file->expire(limits()) || (idle && m_file->shrink());
+        m_oldest.store(m_file->oldest());
+    });
+}
+
+std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
+    TraceScope trace(anchor);
+    if (m_thread.joinable()) {
+        m_queue->close();
+        {
+            std::unique_lock lock(m_mutex);
+            m_finishing = true;
+            m_changed.notify_all();
+            m_changed.wait_until(lock, limit, [&] { return m_ended; });
+            m_giveUp = true;
+        }
+        m_changed.notify_all();
+        m_thread.join();
+        m_left = m_queue->backlog(m_reader);
+    }
+    return trace.result(m_left);
+}
+
+void HistoryWriter::storeRest() {
+    const bool stored = attempt([&] {
+        storeCursors();
+        storeEntries();
+    });
+    if (!stored) {
+        say("the history %s could not be written at the end: %s; sinks may get events twice",
+            m_directory.file().c_str(), problem().c_str());
+    }
+}
+
+std::string HistoryWriter::problem() const {
+    const std::lock_guard guard(m_mutex);
+    return m_problem;
+}

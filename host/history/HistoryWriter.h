@@ -1,0 +1,97 @@
+#ifndef ZRM_HOST_HISTORY_WRITER_H
+#define ZRM_HOST_HISTORY_WRITER_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/EventJson.h"
+#include "host/events/EventQueue.h"
+#include "host/history/Cursors.h"
+#include "host/history/HistoryDirectory.h"
+#include "host/history/HistoryFile.h"
+#include "host/history/ReaderPool.h"
+#include "host/history/RecentEvents.h"
+#include "host/history/RetentionClock.h"
+
+#include <atomic>
+#include <condition_variable>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+/// The one writer of the history, on a thread of its own: takes events from the queue, stores them
+/// in batches and makes them known; keeps the sinks' cursors and the rates; lets events expire, a
+/// few at a time. A failure is told once and tried again after growing pauses, with the events held
+/// in the queue: nothing is lost, and the logs wait. A corrupt file is exchanged for a new one.
+class HistoryWriter {
+public:
+    using Clock = EventQueue::Clock;
+
+    /// The references outlive the object. `file` is open on the directory's file.
+    HistoryWriter(const HistoryConfig& config, const HistoryDirectory& directory,
+                  std::unique_ptr<HistoryFile> file, RecentEvents& recent, ReaderPool& readers,
+                  Cursors& cursors);
+    ~HistoryWriter();
+    HistoryWriter(const HistoryWriter&) = delete;
+    HistoryWriter& operator=(const HistoryWriter&) = delete;
+
+    /// Starts the thread on the queue's events, which `format` renders. Once.
+    void start(EventQueue& queue, EventJson format);
+
+    /// Ends the thread when everything in the queue, which is closed, is stored; at the latest at
+    /// the limit. Returns the number of events that were not. Any number of times.
+    std::uint64_t finish(Clock::time_point limit);
+
+    /// Stores the cursors and the entries once more; after finish. Says so when that fails.
+    void storeRest();
+
+    /// Takes the entries that a minute brought. Any thread.
+    void addEntries(MinuteCounts counts);
+
+    /// Id of the oldest event held; 0 when there is none. Any thread.
+    std::uint64_t oldest() const noexcept { return m_oldest.load(); }
+
+    /// What keeps the history from taking events now; empty: nothing. Any thread.
+    std::string problem() const;
+
+private:
+    void run();
+    bool store(const EventBatch& batch);
+    template <class Work> bool attempt(Work&& work);
+    void succeeded();
+    void failed(const std::string& why);
+    bool pause();
+    void replaceFile(const std::string& why);
+    void housekeep(bool idle);
+    void storeCursors();
+    void storeEntries();
+    HistoryFile::Limits limits();
+
+    const HistoryConfig m_config;
+    const HistoryDirectory& m_directory;
+    std::unique_ptr<HistoryFile> m_file; ///< null while there is none that can be opened
+    RecentEvents& m_recent;
+    ReaderPool& m_readers;
+    Cursors& m_cursors;
+    EventQueue* m_queue = nullptr;
+    EventQueue::Reader m_reader = 0;
+    std::unique_ptr<EventJson> m_format;
+    std::size_t m_batchBytes = 0; ///< of the last batch's texts
+    std::uint64_t m_left = 0;     ///< events that were not stored when the thread ended
+    RetentionClock m_clock;
+    Clock::time_point m_nextHousekeeping{};
+    bool m_hasMoreToDo = false; ///< housekeeping that was not finished
+    std::chrono::milliseconds m_pause;
+    std::atomic<std::uint64_t> m_oldest{0};
+
+    mutable std::mutex m_mutex; ///< guards what follows
+    std::condition_variable m_changed;
+    std::string m_problem;
+    std::vector<MinuteCounts> m_minutes; ///< still to be stored
+    bool m_finishing = false;            ///< finish was called: pauses stay short
+    bool m_giveUp = false;               ///< its limit has passed
+    bool m_ended = false;                ///< the thread's work is done
+    std::thread m_thread;
+};
+
+#endif

@@ -1,0 +1,49 @@
+#ifndef ZRM_HOST_LABEL_TABLE_H
+#define ZRM_HOST_LABEL_TABLE_H
+
+#include "host/events/EventRecord.h"
+#include "host/history/Statement.h"
+
+#include <cstdint>
+#include <map>
+#include <string>
+#include <string_view>
+
+/// Numbers for what many events have in common: a situation's name and severity, and a log. Used
+/// by the writer's thread. Throws DatabaseError.
+class LabelTable {
+public:
+    struct Label {
+        std::int64_t id = 0;
+        std::int64_t log = 0; ///< number of the log
+    };
+
+    explicit LabelTable(Database& database);
+
+    /// The label of an event; made when there is none yet.
+    Label of(const EventRecord& event);
+
+    /// The number of a log's path; made when there is none yet.
+    std::int64_t log(std::string_view path);
+
+    /// After a transaction was taken back: numbers made in it are nobody's.
+    void forget();
+
+    /// Removes the labels that no event has any more.
+    void removeUnused();
+
+private:
+    Label findOrMake(const EventRecord& event);
+
+    Database& m_database;
+    Statement m_findLog;
+    Statement m_makeLog;
+    Statement m_findLabel;
+    Statement m_makeLabel;
+    std::map<std::string, std::int64_t, std::less<>> m_logs;
+    std::map<std::string, Label, std::less<>> m_labels; ///< by the three texts, zero bytes between
+    std::string m_key;                                  ///< of the last event
+    Label m_last;
+};
+
+#endif

@@ -1,0 +1,52 @@
+#include "host/history/Schema.h"
+
+#include <array>
+#include <cstddef>
+#include <string>
+
+namespace {
+
+/// Each entry makes, of the version before it, the version that is its place in the table.
+/// Published entries never change; a new version is a new entry.
+constexpr std::array<const char*, 2> steps = {
+    // 1: events. Labels intern what is written on many events; one narrow index serves every
+    // filter on them, and the marks narrow a window of time down, so that storing an event costs
+    // one row and one index entry.
+    "CREATE TABLE logs (id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE);"
+    "CREATE TABLE labels (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
+    " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
+    " UNIQUE (situation, severity, log));"
+    "CREATE TABLE events (id INTEGER PRIMARY KEY, raised INTEGER NOT NULL,"
+    " label INTEGER NOT NULL REFERENCES labels, json TEXT NOT NULL);"
+    "CREATE INDEX events_by_label ON events (label);"
+    "CREATE TABLE marks (part INTEGER PRIMARY KEY, earliest INTEGER NOT NULL,"
+    " latest INTEGER NOT NULL);"
+    // The events of an empty history follow the origin, if it has one.
+    "CREATE TABLE origin (event INTEGER NOT NULL);"
+    "CREATE TABLE cursors (sink TEXT PRIMARY KEY, event INTEGER NOT NULL,"
+    " used INTEGER NOT NULL) WITHOUT ROWID;",
+    // 2: entries and events per minute and log. A minute that has no row in `minutes` was not
+    // watched; a watched one without a count had none.
+    "CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
+    "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
+    " entries INTEGER NOT NULL, events INTEGER NOT NULL, PRIMARY KEY (minute, log))"
+    " WITHOUT ROWID;",
+};
+
+} // namespace
+
+const int Schema::version = static_cast<int>(steps.size());
+
+void Schema::bringUpToDate(Database& database) {
+    const std::int64_t found = database.number("PRAGMA user_version");
+    if (found < 0 || found > version) {
+        throw SchemaTooNew("it has version " + std::to_string(found) +
+                           ", and this program knows versions up to " + std::to_string(version));
+    }
+    for (auto next = static_cast<std::size_t>(found); next < steps.size(); ++next) {
+        Transaction transaction(database);
+        database.run(steps[next]);
+        database.run("PRAGMA user_version = " + std::to_string(next + 1));
+        transaction.commit();
+    }
+}

@@ -1,0 +1,25 @@
+#ifndef ZRM_HOST_SCHEMA_H
+#define ZRM_HOST_SCHEMA_H
+
+#include "host/history/Database.h"
+
+#include <stdexcept>
+
+/// The file was written by a later version of this program.
+class SchemaTooNew : public std::runtime_error {
+    using std::runtime_error::runtime_error;
+};
+
+/// The tables of a history. Their version is the file's user_version.
+namespace Schema {
+
+/// The version that this program writes.
+extern const int version;
+
+/// Brings a new or an older file to this version, one version at a time: each is a transaction, so
+/// that a failure leaves a whole older version. Throws DatabaseError or SchemaTooNew.
+void bringUpToDate(Database& database);
+
+} // namespace Schema
+
+#endif

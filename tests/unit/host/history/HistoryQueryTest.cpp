@@ -1,0 +1,155 @@
+#include "host/history/HistoryQuery.h"
+
+#include "TestBatch.h"
+#include "host/history/HistoryFile.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
+#include <iostream>
+#include <random>
+#include <string>
+#include <vector>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+class HistoryQueryTest : public testing::Test {
+protected:
+    std::vector<std::uint64_t> ids(const EventFilter& filter) {
+        std::vector<std::uint64_t> ids;
+        for (const StoredEvent& event : HistoryQuery(database, filter).run()) {
+            ids.push_back(event.id);
+        }
+        return ids;
+    }
+
+    TemporaryDirectory directory;
+    HistoryFile file{directory.file("history.db")};
+    Database database{directory.file("history.db"), Database::Use::READ};
+};
+
+TEST_F(HistoryQueryTest, GivesEventsWithAllThatBelongsToThem) {
+    EventRecord event = testEvent(1, testTime, "ssh", "/var/log/auth.log", "critical");
+    event.json = R"({"id":1})";
+    file.store(*batchOf({event, testEvent(2)}), {});
+    EXPECT_THAT(HistoryQuery(database, {.situations = {"ssh"}}).run(),
+                ElementsAre(StoredEvent{1, testTime, "ssh", "critical", "/var/log/auth.log",
+                                        R"({"id":1})"}));
+}
+
+TEST_F(HistoryQueryTest, NewestFirstUnlessAskedOtherwise) {
+    file.store(*batchOf(1, 500), {});
+    EXPECT_EQ(ids({}).size(), 100u);
+    EXPECT_THAT(ids({.limit = 3}), ElementsAre(500, 499, 498));
+    EXPECT_THAT(ids({.limit = 3, .newestFirst = false}), ElementsAre(1, 2, 3));
+    EXPECT_THAT(ids({.after = 498}), ElementsAre(500, 499));
+    EXPECT_THAT(ids({.after = 10, .before = 13, .newestFirst = false}), ElementsAre(11, 12));
+    EXPECT_THAT(ids({.limit = 0}), IsEmpty());
+    EXPECT_THAT(ids({.after = UINT64_MAX}), IsEmpty());
+    EXPECT_THAT(ids({.before = 0}), IsEmpty());
+    EXPECT_THAT(ids({.after = 499, .before = UINT64_MAX}), ElementsAre(500));
+}
+
+TEST_F(HistoryQueryTest, AnEmptyHistoryHasNoEvents) {
+    EXPECT_THAT(ids({}), IsEmpty());
+    EXPECT_THAT(ids({.from = 0, .to = testTime}), IsEmpty());
+    EXPECT_THAT(ids({.situations = {"a"}}), IsEmpty());
+}
+
+TEST_F(HistoryQueryTest, TakesTextsAsTheyAre) {
+    const std::string odd = "x' OR 1=1; DROP TABLE events; -- \" \\ % _ \xc3\xa4";
+    file.store(*batchOf({testEvent(1, testTime, odd, odd, odd), testEvent(2)}), {});
+    EXPECT_THAT(ids({.situations = {odd}, .logs = {odd}, .severities = {odd}}), ElementsAre(1));
+    EXPECT_THAT(ids({.situations = {"%"}}), IsEmpty());
+    EXPECT_THAT(ids({.situations = {"WATCH"}}), IsEmpty());
+    EXPECT_THAT(ids({.logs = {std::string("/var/log/app.log\0", 17)}}), IsEmpty());
+}
+
+TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutAWalkThroughTheOthers) {
+    std::vector<EventRecord> events;
+    for (std::uint64_t id = 1; id <= 200'000; ++id) {
+        events.push_back(testEvent(id, testTime, id == 77 ? "rare" : "often"));
+    }
+    file.store(*batchOf(events), {});
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_THAT(ids({.situations = {"rare"}}), ElementsAre(77));
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(20));
+}
+
+/// What a plain walk over all events gives.
+std::vector<std::uint64_t> expected(const std::vector<EventRecord>& events,
+                                    const EventFilter& filter) {
+    const auto isOneOf = [](std::string_view text, const std::vector<std::string>& texts) {
+        return texts.empty() || std::find(texts.begin(), texts.end(), text) != texts.end();
+    };
+    std::vector<std::uint64_t> ids;
+    for (const EventRecord& event : events) {
+        if (event.id > filter.after && event.id < filter.before.value_or(UINT64_MAX) &&
+            event.raised >= filter.from.value_or(INT64_MIN) &&
+            event.raised <= filter.to.value_or(INT64_MAX) &&
+            isOneOf(event.situation, filter.situations) && isOneOf(event.log, filter.logs) &&
+            isOneOf(event.severity, filter.severities)) {
+            ids.push_back(event.id);
+        }
+    }
+    if (filter.newestFirst) {
+        std::reverse(ids.begin(), ids.end());
+    }
+    ids.resize(std::min(ids.size(), filter.limit));
+    return ids;
+}
+
+TEST_F(HistoryQueryTest, GivesWhatAPlainWalkGivesWhateverTheFilterAndTheClock) {
+    const unsigned seed = std::random_device{}();
+    std::cout << "seed " << seed << std::endl;
+    std::mt19937 random(seed);
+    const auto upTo = [&](std::uint64_t most) {
+        return std::uniform_int_distribution<std::uint64_t>(0, most)(random);
+    };
+    const std::vector<std::string> names = {"a", "b", "c", "d"};
+    std::vector<EventRecord> events;
+    std::int64_t raised = testTime;
+    const std::uint64_t first = 1 + upTo(3000);
+    for (std::uint64_t id = first; id < first + 6000; ++id) {
+        // Now and then the clock is set, mostly back.
+        raised += upTo(999) == 0 ? static_cast<std::int64_t>(upTo(900'000)) - 600'000
+                                 : static_cast<std::int64_t>(upTo(100));
+        events.push_back(testEvent(id, raised, names[upTo(3)], names[upTo(2)],
+                                   upTo(50) == 0 ? "major" : "info"));
+    }
+    file.continueAfter(first - 1);
+    for (std::size_t at = 0; at < events.size();) {
+        const std::size_t count = std::min<std::size_t>(1 + upTo(511), events.size() - at);
+        file.store(*batchOf({events.begin() + static_cast<std::ptrdiff_t>(at),
+                             events.begin() + static_cast<std::ptrdiff_t>(at + count)}),
+                   {});
+        at += count;
+    }
+    const auto some = [&](std::vector<std::string> from) {
+        std::shuffle(from.begin(), from.end(), random);
+        from.resize(upTo(1) == 0 ? 0 : 1 + upTo(2));
+        return from;
+    };
+    for (int number = 0; number < 300; ++number) {
+        EventFilter filter;
+        filter.after = upTo(2) == 0 ? first + upTo(6000) : 0;
+        filter.before = upTo(2) == 0 ? std::optional(first + upTo(6000)) : std::nullopt;
+        const auto time = [&] { return events[upTo(5999)].raised; };
+        filter.from = upTo(2) == 0 ? std::optional(time()) : std::nullopt;
+        filter.to = upTo(2) == 0 ? std::optional(time()) : std::nullopt;
+        filter.situations = some(names);
+        filter.logs = some(names);
+        filter.severities = some({"major", "info", "critical"});
+        filter.limit = upTo(1) == 0 ? 10 : 1'000'000;
+        filter.newestFirst = upTo(1) == 0;
+        ASSERT_EQ(ids(filter), expected(events, filter)) << "query " << number;
+    }
+}
+
+} // namespace

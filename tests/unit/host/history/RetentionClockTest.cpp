@@ -1,0 +1,44 @@
+#include "host/history/RetentionClock.h"
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr std::int64_t hour = 3'600'000; ///< milliseconds
+
+class RetentionClockTest : public testing::Test {
+protected:
+    std::int64_t after(std::chrono::minutes passed, std::int64_t wall) {
+        steady += passed;
+        return clock.now(wall, steady);
+    }
+    RetentionClock clock;
+    RetentionClock::Clock::time_point steady{};
+};
+
+TEST_F(RetentionClockTest, GoesByTheTimeOfDay) {
+    EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
+    EXPECT_EQ(after(60min, 1001 * hour), 1001 * hour);
+    EXPECT_EQ(after(60min, 1003 * hour), 1003 * hour) << "an hour more is nothing to mistrust";
+    EXPECT_EQ(after(60min, 900 * hour), 900 * hour) << "back is believed: nothing expires by it";
+}
+
+TEST_F(RetentionClockTest, BelievesALeapWhenItHasLasted) {
+    EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
+    EXPECT_EQ(after(60min, 9000 * hour), 1001 * hour);
+    EXPECT_EQ(after(59min, 9001 * hour), 1001 * hour + 59 * 60'000);
+    EXPECT_EQ(after(1min, 9001 * hour), 9001 * hour);
+}
+
+TEST_F(RetentionClockTest, ALeapThatIsTakenBackNeverWas) {
+    EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
+    EXPECT_EQ(after(60min, 9000 * hour), 1001 * hour);
+    EXPECT_EQ(after(60min, 1002 * hour), 1002 * hour);
+    EXPECT_EQ(after(60min, 9000 * hour), 1003 * hour) << "the hour begins anew";
+}
+
+} // namespace

@@ -1,0 +1,96 @@
+#include "host/history/Schema.h"
+
+#include "host/history/Statement.h"
+#include "support/FaultyDisk.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include <sqlite3.h>
+
+namespace {
+
+/// A file as the first version of the schema left it, with one event.
+constexpr const char* firstVersion =
+    "CREATE TABLE logs (id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE);"
+    "CREATE TABLE labels (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
+    " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
+    " UNIQUE (situation, severity, log));"
+    "CREATE TABLE events (id INTEGER PRIMARY KEY, raised INTEGER NOT NULL,"
+    " label INTEGER NOT NULL REFERENCES labels, json TEXT NOT NULL);"
+    "CREATE INDEX events_by_label ON events (label);"
+    "CREATE TABLE marks (part INTEGER PRIMARY KEY, earliest INTEGER NOT NULL,"
+    " latest INTEGER NOT NULL);"
+    "CREATE TABLE origin (event INTEGER NOT NULL);"
+    "CREATE TABLE cursors (sink TEXT PRIMARY KEY, event INTEGER NOT NULL,"
+    " used INTEGER NOT NULL) WITHOUT ROWID;"
+    "INSERT INTO logs VALUES (1, '/var/log/app.log');"
+    "INSERT INTO labels VALUES (1, 'watch', 'minor', 1);"
+    "INSERT INTO events VALUES (41, 1795158189412, 1, '{}');"
+    "INSERT INTO cursors VALUES ('jsonl:out', 40, 1795158189412);"
+    "PRAGMA user_version = 1";
+
+class SchemaTest : public testing::Test {
+protected:
+    static bool hasTable(Database& database, const std::string& name) {
+        return database.number("SELECT count(*) FROM sqlite_schema WHERE name = '" + name + "'") ==
+               1;
+    }
+    static std::int64_t versionOf(Database& database) {
+        return database.number("PRAGMA user_version");
+    }
+
+    FaultyDisk disk;
+    TemporaryDirectory directory;
+    Database database{directory.file("history.db"), Database::Use::WRITE};
+};
+
+TEST_F(SchemaTest, MakesTheTablesOfANewFile) {
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    for (const char* const table :
+         {"events", "labels", "logs", "marks", "origin", "cursors", "minutes", "rates"}) {
+        EXPECT_TRUE(hasTable(database, table)) << table;
+    }
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheFirstVersionUpToDate) {
+    database.run(firstVersion);
+    ASSERT_FALSE(hasTable(database, "rates"));
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    EXPECT_TRUE(hasTable(database, "rates"));
+    EXPECT_EQ(database.number("SELECT id FROM events"), 41);
+    EXPECT_EQ(database.number("SELECT event FROM cursors"), 40);
+}
+
+TEST_F(SchemaTest, AStepThatFailsLeavesTheOlderVersionWhole) {
+    database.run(firstVersion);
+    disk.failWrites(SQLITE_FULL);
+    EXPECT_THROW(Schema::bringUpToDate(database), DatabaseError);
+    disk.failWrites(0);
+    EXPECT_EQ(versionOf(database), 1);
+    EXPECT_FALSE(hasTable(database, "minutes"));
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    EXPECT_EQ(database.number("SELECT id FROM events"), 41);
+}
+
+TEST_F(SchemaTest, RefusesAFileOfALaterVersion) {
+    database.run("PRAGMA user_version = " + std::to_string(Schema::version + 1));
+    try {
+        Schema::bringUpToDate(database);
+        FAIL() << "it was taken";
+    } catch (const SchemaTooNew& error) {
+        EXPECT_STREQ(error.what(),
+                     ("it has version " + std::to_string(Schema::version + 1) +
+                      ", and this program knows versions up to " + std::to_string(Schema::version))
+                         .c_str());
+    }
+}
+
+} // namespace
