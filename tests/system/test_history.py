@@ -1,0 +1,270 @@
+"""The history of events: what survives, and how sinks get what they missed."""
+
+import json
+import os
+import random
+import sqlite3
+import subprocess
+import threading
+import time
+from pathlib import Path
+from signal import SIGKILL
+
+import pytest
+
+from conftest import descriptions, syslog_line, wait_until
+
+
+def lines(numbers):
+    return "".join(syslog_line(f"number {number}") for number in numbers)
+
+
+def texts(numbers):
+    return [f"number {number}" for number in numbers]
+
+
+def history_file(agent):
+    return agent.directory / "state" / "history.db"
+
+
+def stored(agent):
+    """The committed events: (id, description), by id."""
+    with sqlite3.connect(f"file:{history_file(agent)}?mode=ro", uri=True, timeout=20) as database:
+        rows = database.execute("SELECT id, json FROM events ORDER BY id").fetchall()
+    events = []
+    for number, text in rows:
+        event = json.loads(text)
+        assert event["id"] == number
+        events.append((number, event["row"]["ENTRYDESC"]))
+    return events
+
+
+def jsonl(path):
+    return [json.loads(line) for line in Path(path).read_bytes().split(b"\n")[:-1]]
+
+
+def test_what_a_sink_missed_it_gets_after_a_restart(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "not-yet" / "events.jsonl"
+    agent.start()
+    log.append(lines(range(100)))
+    wait_until(lambda: len(stored(agent)) == 100, "the history")
+    assert agent.stop() == 0
+    assert agent.trace(
+        f"100 events were not delivered to {agent.sink}; it gets them when the agent runs again"
+    )
+    agent.sink.parent.mkdir()
+    agent.start()
+    assert descriptions(agent.wait_events(100)) == texts(range(100))
+    log.append(lines(range(100, 110)))
+    events = agent.wait_events(110)
+    assert [event["id"] for event in events] == list(range(1, 111))
+    assert descriptions(events) == texts(range(110))
+    assert agent.stop() == 0
+    agent.start()
+    log.append(lines(range(110, 111)))
+    assert descriptions(agent.wait_events(111)) == texts(range(111)), "nothing twice"
+    assert agent.stop() == 0
+
+
+def test_a_sink_that_is_down_stops_neither_the_others_nor_the_monitoring(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "good.jsonl"
+    late = agent.directory / "not-yet" / "late.jsonl"
+    agent.more_sinks = [{"type": "jsonl", "path": str(late)}]
+    agent.start()
+    for begin in range(0, 10_000, 1000):  # many times what the queue holds
+        log.append(lines(range(begin, begin + 1000)))
+    assert descriptions(agent.wait_events(10_000)) == texts(range(10_000))
+    late.parent.mkdir()
+    agent.wait_trace(f"Sink {late} takes events again.")
+    wait_until(lambda: len(jsonl(late)) == 10_000, "the late sink")
+    assert descriptions(jsonl(late)) == texts(range(10_000))
+    assert agent.stop() == 0
+
+
+def test_a_slow_sink_gets_everything_in_order_and_delays_nobody(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "good.jsonl"
+    pipe = agent.directory / "pipe"
+    os.mkfifo(pipe)
+    agent.more_sinks = [{"type": "jsonl", "path": str(pipe)}]
+    reader = os.open(pipe, os.O_RDONLY | os.O_NONBLOCK)
+    os.set_blocking(reader, True)
+    agent.start()
+    log.append(lines(range(6000)))
+    assert descriptions(agent.wait_events(6000)) == texts(range(6000))
+    got = b""
+    begin = time.monotonic()
+    while got.count(b"\n") < 6000:
+        got += os.read(reader, 65536 if time.monotonic() - begin > 1 else 1024)
+        if time.monotonic() - begin < 1:
+            time.sleep(0.05)
+    os.close(reader)
+    assert descriptions(map(json.loads, got.splitlines())) == texts(range(6000))
+    assert agent.stop() == 0
+
+
+class Appender:
+    """Appends numbered lines to a log until it is stopped."""
+
+    def __init__(self, log, first):
+        self.log, self.next, self.stopped = log, first, False
+        self.thread = threading.Thread(target=self._run)
+        self.thread.start()
+
+    def _run(self):
+        while not self.stopped:
+            self.log.append(lines(range(self.next, self.next + 200)))
+            self.next += 200
+            time.sleep(0.02)
+
+    def stop(self):
+        self.stopped = True
+        self.thread.join()
+        return self.next
+
+
+@pytest.mark.slow
+def test_kill_at_random_moments_loses_nothing_that_was_committed(agent):
+    seed = random.SystemRandom().randrange(1 << 32)
+    print(f"seed {seed}")
+    moments = random.Random(seed)
+    log = agent.log()
+    agent.situation(log=log)
+    agent.sink = agent.directory / "events.jsonl"
+    agent.history = {"keep_events": 10_000_000}
+    number, before = 0, []
+    for _ in range(6):
+        agent.start()
+        appender = Appender(log, number)
+        time.sleep(moments.uniform(0.7, 2.2))
+        agent.send(SIGKILL)
+        agent.wait_end()
+        number = appender.stop()
+        now = stored(agent)
+        assert now[: len(before)] == before
+        before = now
+    agent.start()
+    log.append(lines([number]))
+    last = agent._alive_until(
+        lambda: [e for e in stored(agent) if e[1] == f"number {number}"], "the last line", 60
+    )[0]
+    wait_until(lambda: str(number) in agent.sink.read_text().split("\n")[-2], "the last event")
+    assert agent.stop() == 0
+    final = stored(agent)
+    assert final[: len(before)] == before
+    assert [event[0] for event in final] == list(range(1, last[0] + 1)), "ids without a gap"
+    numbers = [int(event[1].split()[1]) for event in final]
+    assert numbers == sorted(set(numbers)), "in the order of the log, none twice"
+    with sqlite3.connect(history_file(agent)) as database:
+        assert database.execute("PRAGMA integrity_check").fetchall() == [("ok",)]
+    check_deliveries(agent.sink, dict(final))
+
+
+def check_deliveries(path, events):
+    """Every event came, in order, and again only after an end of the agent."""
+    newest, times_back = 0, 0
+    for line in path.read_text().split("\n")[:-1]:
+        # A process that is killed while it writes leaves a torn line, which the next one completes.
+        event = json.loads(line[line.rindex('{"id":') :])
+        assert event["row"]["ENTRYDESC"] == events[event["id"]]
+        if event["id"] != newest + 1:
+            assert event["id"] <= newest, "an event was passed over"
+            times_back += 1
+        newest = event["id"]
+    assert newest == max(events)
+    assert times_back <= 6
+
+
+@pytest.fixture(scope="session")
+def full_disk(tmp_path_factory):
+    library = tmp_path_factory.mktemp("preload") / "full_disk.so"
+    source = Path(__file__).with_name("full_disk.c")
+    subprocess.run(["cc", "-shared", "-fPIC", "-o", library, source, "-ldl"], check=True)
+    return library
+
+
+def test_a_full_disk_holds_events_up_and_loses_none(agent, full_disk):
+    flag = agent.directory / "full"
+    agent.environment.update(
+        {
+            "LD_PRELOAD": str(full_disk),
+            "FULL_DISK": str(flag),
+            "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
+        }
+    )
+    log = agent.log()
+    agent.situation(log=log)
+    agent.start()
+    log.append(lines(range(10)))
+    agent.wait_events(10)
+    flag.touch()
+    log.append(lines(range(10, 5000)))
+    agent.wait_trace(f"Error writing the history {history_file(agent)}: ")
+    time.sleep(1)  # it has tried again by now
+    assert len(agent.trace("Error writing the history")) == 1, "told once"
+    assert len(agent.events()) == 10, "what is not stored is not delivered"
+    flag.unlink()
+    agent.wait_trace("The history takes events again.")
+    assert descriptions(agent.wait_events(5000)) == texts(range(5000))
+    assert agent.stop() == 0
+    assert len(stored(agent)) == 5000
+
+
+def test_a_corrupt_history_is_moved_aside(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    history_file(agent).parent.mkdir()
+    history_file(agent).write_bytes(b"this is no database\n" * 1000)
+    agent.start()
+    said = agent.wait_trace(f"the history {history_file(agent)} is corrupt")[0]
+    aside = said.split("it is kept as ")[1].split(",")[0]
+    assert Path(aside).read_bytes() == b"this is no database\n" * 1000
+    log.append(lines(range(3)))
+    assert descriptions(agent.wait_events(3)) == texts(range(3))
+    assert agent.stop() == 0
+    assert len(stored(agent)) == 3
+
+
+def test_without_a_place_for_the_history_the_agent_says_so_and_goes_on(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    (agent.directory / "plain").write_text("no directory")
+    agent.history = {"directory": str(agent.directory / "plain")}
+    agent.start()
+    agent.wait_trace(
+        f"zrmagent: the history is off: cannot open {agent.directory}/plain/history.lock: "
+        "Not a directory; make it a directory that the agent may write, or set history.directory "
+        "to one."
+    )
+    log.append(lines(range(3)))
+    assert descriptions(agent.wait_events(3)) == texts(range(3))
+    assert agent.stop() == 0
+
+
+def test_two_agents_do_not_share_a_history(agents):
+    first, second = agents(), agents()
+    for one in (first, second):
+        one.situation(log=one.log())
+        one.history = {"directory": str(first.directory / "shared")}
+    first.start()
+    second.start()
+    second.wait_trace(f"{first.directory}/shared is in use by another agent; give each its own")
+    assert second.stop() == 0
+    assert first.stop() == 0
+
+
+def test_only_the_newest_events_are_kept(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.history = {"keep_events": 50}
+    agent.start()
+    log.append(lines(range(4000)))
+    agent.wait_events(4000)
+    wait_until(lambda: len(stored(agent)) == 50, "the removal")
+    assert [event[1] for event in stored(agent)] == texts(range(3950, 4000))
+    assert agent.stop() == 0
