@@ -3,6 +3,7 @@
 import os
 import random
 import shutil
+import sqlite3
 import statistics
 import sys
 import tempfile
@@ -135,6 +136,57 @@ def throughput(options):
         }
 
 
+def count_lines(path, offset):
+    """Newlines behind the offset, and the offset of the end."""
+    with open(path, "rb") as stream:
+        stream.seek(offset)
+        data = stream.read()
+    return data.count(b"\n"), offset + len(data)
+
+
+def events_run(options, data):
+    with Workplace(options) as place:
+        log, sink = place.log("app.log"), place.directory / "events.jsonl"
+        sink.touch()
+        chosen = [{"name": "all", "log": str(log)}]
+        with place.agent([log], chosen, history=True, sink=sink) as agent:
+            cpu, begin = agent.cpu(), time.monotonic()
+            append(data.path, log)
+            count, offset, resident = 0, 0, 0
+            while count < data.count:
+                time.sleep(0.02)
+                more, offset = count_lines(sink, offset)
+                count += more
+                resident = max(resident, agent.resident_kilobytes())
+                if time.monotonic() - begin > 300:
+                    sys.exit(f"only {count} events came")
+            result = {
+                "cpu": agent.cpu() - cpu,
+                "wall": time.monotonic() - begin,
+                "resident": resident / 1024,
+            }
+        with sqlite3.connect(place.directory / "state/history.db") as history:
+            stored = history.execute("SELECT count(*), max(id) FROM events").fetchone()
+        if stored != (data.count, data.count) or count != data.count:
+            sys.exit(f"{data.count} events, but {stored} in the history and {count} in the file")
+        return result
+
+
+def events(options):
+    """Every line is an event: stored in the history, and written to a file from there."""
+    name = "every line an event, history, file"
+    if options.wants(name):
+        data = Data(options, "syslog", options.lines)
+        runs = [events_run(options, data) for _ in range(options.runs)]
+        yield {
+            "case": name,
+            "figure": data.count / median(runs, "wall"),
+            "unit": "events/s",
+            "target": 150_000,
+            **{key: median(runs, key) for key in ("cpu", "wall", "resident")},
+        }
+
+
 def stamp(line):
     """The 16-character time stamp of a syslog line of this year."""
     parsed = time.strptime(f"{time.localtime().tm_year} {line[:15].decode()}", "%Y %b %d %H:%M:%S")
@@ -238,7 +290,7 @@ def latency(options):
     delays, pauses = [], random.Random(1)
     with Workplace(options) as place:
         log = place.log("app.log")
-        with place.agent([log], [{"name": "all", "log": str(log)}]) as agent:
+        with place.agent([log], [{"name": "all", "log": str(log)}], history=True) as agent:
             for number in range(options.latency_lines):
                 time.sleep(pauses.random())  # the writes fall all over the second of a poll
                 line = time.strftime(f"%b %e %H:%M:%S web1 app[1]: number {number}\n")
@@ -260,4 +312,4 @@ def latency(options):
         }
 
 
-ALL = [throughput, reports, idle_logs, latency]
+ALL = [throughput, events, reports, idle_logs, latency]

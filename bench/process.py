@@ -38,13 +38,14 @@ class AgentProcess:
         self.reader = threading.Thread(target=self._count_events, daemon=True)
         self.reader.start()
 
-    def _configuration(self, situations, http=False, max_rows=None):
+    def _configuration(self, situations, http=False, max_rows=None, history=False, sink="-"):
         text = f'state_directory = "{self.directory}/state"\n'
         text += f'[agent]\nlog_config = "{self.directory}/logs.conf"\n'
         if max_rows is not None:
             text += f"max_rows = {max_rows}\n"
         text += f'[http]\nlisten = "{"127.0.0.1:0" if http else ""}"\n'
-        text += '[[sink]]\ntype = "jsonl"\npath = "-"\n'
+        text += f"[history]\nenabled = {'true' if history else 'false'}\n"
+        text += f'[[sink]]\ntype = "jsonl"\npath = "{sink}"\n'
         for situation in situations:
             keys = {"text": "benchmark", "severity": "info", **situation}
             text += "[[situation]]\n"

@@ -49,7 +49,12 @@ HttpAnswer answerWith(const ordered_json& document) {
 
 ordered_json historyOf(Delivery& delivery) {
     HistoryReader* const reader = delivery.history();
-    const HistoryState state = reader == nullptr ? HistoryState() : reader->state();
+    HistoryState state;
+    if (reader != nullptr) {
+        state = reader->state();
+    } else {
+        state.problem = delivery.historyProblem();
+    }
     return {{"enabled", reader != nullptr}, {"events", state.events},
             {"oldest", state.oldest},       {"newest", state.newest},
             {"bytes", state.bytes},         {"problem", textOrNull(state.problem)}};
