@@ -118,9 +118,11 @@ void HttpPost::Implementation::connect() {
     m_client->set_tcp_nodelay(true);
     m_client->set_url_encode(false); // the URL is written as it is sent
     m_client->set_decompress(false);
-    m_client->set_connection_timeout(m_timeout);
-    m_client->set_read_timeout(m_timeout);
-    m_client->set_write_timeout(m_timeout);
+    // These begin anew with each read; the whole request has its own limit, which comes first.
+    const auto spare = m_timeout + std::chrono::seconds(5);
+    m_client->set_connection_timeout(spare);
+    m_client->set_read_timeout(spare);
+    m_client->set_write_timeout(spare);
     m_client->set_socket_options([this](socket_t socket) { m_limit->watch(socket); });
 }
 

@@ -67,11 +67,11 @@ TEST_F(AlertmanagerSinkTest, ARefusalIsAFailureOfAll) {
     events.add({});
     events.add({});
     AlertmanagerSink sink(config());
-    status = 400;
+    server.set(status, 400);
     EXPECT_EQ(deliver(sink), 0u);
     EXPECT_EQ(sink.error(),
               "127.0.0.1:" + std::to_string(server.port()) + " answered with status 400");
-    status = 200;
+    server.set(status, 200);
     EXPECT_EQ(deliver(sink), 2u);
 }
 

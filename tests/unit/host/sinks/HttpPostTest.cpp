@@ -89,13 +89,13 @@ TEST_F(HttpPostTest, EveryOtherStatusIsAFailureWithItsReason) {
         [&](const Request&) { return ScriptedServer::status(status, "no\nwhy \xff"); });
     HttpPost http(configOf(receiver.url()), "");
     for (const int refusal : {301, 302, 400, 401, 404, 413, 500, 503}) {
-        status = refusal;
+        receiver.set(status, refusal);
         EXPECT_FALSE(send(http));
         EXPECT_EQ(http.error(), "127.0.0.1:" + std::to_string(receiver.port()) +
                                     " answered with status " + std::to_string(refusal) +
                                     ": no why  ");
     }
-    status = 200;
+    receiver.set(status, 200);
     EXPECT_TRUE(send(http));
 }
 
@@ -117,12 +117,12 @@ TEST_F(HttpPostTest, AnAnswerThatBreaksOffOrIsNoneIsAFailure) {
     for (const char* const bytes :
          {"", "HTTP/1.1 20", "HTTP/1.1 200 OK\r\nContent-Le", "\0\1\2\3garbage\r\n\r\n",
           "220 mail.example.com ESMTP\r\n", "\r\n\r\n", "HTTP/1.1 999999999999 X\r\n\r\n"}) {
-        reply = {bytes, Reply::CLOSE};
+        receiver.set(reply, Reply{bytes, Reply::CLOSE});
         EXPECT_FALSE(send(http)) << bytes;
         EXPECT_EQ(http.error(), "the connection ended without a whole answer (127.0.0.1:" +
                                     std::to_string(receiver.port()) + ")");
     }
-    reply = ScriptedServer::status(200);
+    receiver.set(reply, ScriptedServer::status(200));
     EXPECT_TRUE(send(http));
 }
 

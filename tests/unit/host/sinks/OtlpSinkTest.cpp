@@ -80,8 +80,8 @@ TEST_F(OtlpSinkTest, TellsOfRecordsThatTheReceiverRejected) {
     OtlpSink sink(config());
     for (const char* const count : {"\"1\"", "1"}) {
         trace.clear();
-        answer = std::string(R"({"partialSuccess":{"rejectedLogRecords":)") + count +
-                 R"(,"errorMessage":"too old"}})";
+        server.set(answer, std::string(R"({"partialSuccess":{"rejectedLogRecords":)") + count +
+                               R"(,"errorMessage":"too old"}})");
         EXPECT_EQ(deliver(sink), 1u) << "they are not to be sent again";
         EXPECT_THAT(trace.messages(),
                     ElementsAre("collector has rejected 1 of 1 events for good: too old"));
@@ -89,12 +89,13 @@ TEST_F(OtlpSinkTest, TellsOfRecordsThatTheReceiverRejected) {
 }
 
 TEST_F(OtlpSinkTest, ARemarkWithoutRejectionIsADetail) {
-    answer = R"({"partialSuccess":{"errorMessage":"be gentle"}})";
+    server.set(answer, R"({"partialSuccess":{"errorMessage":"be gentle"}})");
     OtlpSink sink(config());
     EXPECT_EQ(deliver(sink), 1u);
     EXPECT_THAT(trace.messages(), IsEmpty());
     trace.setLevel(TRC1_DETAIL);
-    answer = R"({"partialSuccess":{"rejectedLogRecords":"0","errorMessage":"be gentle"}})";
+    server.set(answer,
+               R"({"partialSuccess":{"rejectedLogRecords":"0","errorMessage":"be gentle"}})");
     EXPECT_EQ(deliver(sink), 1u);
     EXPECT_THAT(trace.messages(), ElementsAre("collector says: be gentle"));
 }
@@ -104,7 +105,7 @@ TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
     for (const char* const body :
          {"", "ok", "[]", "null", R"({"partialSuccess":null})", R"({"partialSuccess":{}})",
           R"({"partialSuccess":{"rejectedLogRecords":"0","errorMessage":5}})"}) {
-        answer = body;
+        server.set(answer, body);
         EXPECT_EQ(deliver(sink), 1u) << body;
     }
     EXPECT_THAT(trace.messages(), IsEmpty());
@@ -112,8 +113,8 @@ TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
 
 TEST_F(OtlpSinkTest, ARefusalIsAFailure) {
     OtlpSink sink(config());
-    status = 503;
-    answer = "";
+    server.set(status, 503);
+    server.set(answer, "");
     EXPECT_EQ(deliver(sink), 0u);
     EXPECT_EQ(sink.error(),
               "127.0.0.1:" + std::to_string(server.port()) + " answered with status 503");

@@ -7,6 +7,7 @@
 #include <mutex>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 /// An HTTP server on a free port of this machine that says byte by byte what a test wants.
@@ -35,6 +36,12 @@ public:
 
     /// Answers with this status.
     static Reply status(int status, const std::string& body = "", const std::string& headers = "");
+
+    /// Changes a variable that the script reads.
+    template <typename Type, typename Value> void set(Type& variable, Value&& value) {
+        const std::lock_guard guard(m_mutex);
+        variable = std::forward<Value>(value);
+    }
 
     std::string url(const std::string& path = "") const;
     std::uint16_t port() const { return m_port; }

@@ -75,7 +75,7 @@ TEST_F(WebhookSinkTest, IsCalledByItsHostOrAsTheFileSays) {
 }
 
 TEST_F(WebhookSinkTest, AFailureSaysHowFarItCame) {
-    statuses = {200, 404};
+    receiver.set(statuses, std::vector<int>{200, 404});
     WebhookSink sink(config("batch = 2"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 2u);
     EXPECT_EQ(sink.error(),
@@ -85,7 +85,7 @@ TEST_F(WebhookSinkTest, AFailureSaysHowFarItCame) {
 }
 
 TEST_F(WebhookSinkTest, ARequestThatFailedIsRepeatedAsItWas) {
-    statuses = {500};
+    receiver.set(statuses, std::vector<int>{500});
     WebhookSink sink(config());
     EXPECT_EQ(sink.deliver(from(0).first(2), giveUp.get_token()), 0u);
     // More events have come by now; the receiver may have the first request nevertheless.
