@@ -3,6 +3,7 @@
 #include "host/http/HttpServer.h"
 #include "host/http/RequestRefused.h"
 #include "support/RecordingTrace.h"
+#include "unit/host/http/Handoff.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -28,15 +29,29 @@ class HttpExchangeTest : public testing::Test {
 protected:
     void SetUp() override {
         std::signal(SIGPIPE, SIG_IGN); // the agent's threads block it
-        router.add("GET", "/answer", [this](const HttpRequest&) { return answer; });
-        router.add("POST", "/answer", [this](const HttpRequest& request) {
-            body = request.body;
-            return answer;
-        });
-        router.add("DELETE", "/answer", [this](const HttpRequest&) { return answer; });
+        for (const char* const method : {"GET", "POST", "DELETE"}) {
+            router.add(method, "/answer",
+                       [this](const HttpRequest& request) { return handle(request); });
+        }
         ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
     }
-    httplib::Client client() const {
+    /// Gives the answer that the test has set.
+    HttpAnswer handle(const HttpRequest& request) {
+        handoff.pass();
+        body = request.body;
+        HttpAnswer given = answer;
+        if (given.stream) {
+            given.stream = [this, stream = answer.stream](const BodyWriter& write,
+                                                          const std::stop_token& stop) {
+                stream(write, stop);
+                handoff.pass();
+            };
+        }
+        handoff.pass();
+        return given;
+    }
+    httplib::Client client() {
+        handoff.pass();
         httplib::Client result("127.0.0.1", server.port());
         result.set_bearer_token_auth(secret);
         result.set_read_timeout(30s);
@@ -44,6 +59,7 @@ protected:
     }
 
     RecordingTrace trace{0};
+    Handoff handoff;
     HttpAnswer answer = HttpAnswer::json("{}");
     std::string body;
     Router router;
@@ -58,6 +74,7 @@ TEST_F(HttpExchangeTest, AnswersHaveTheirOwnHeadersInPlaceOfTheUsualOnes) {
     EXPECT_EQ(result->get_header_value("Cache-Control"), "max-age=60");
     EXPECT_EQ(result->get_header_value("X-Own"), "1");
     EXPECT_EQ(result->get_header_value("X-Content-Type-Options"), "nosniff");
+    handoff.pass();
     answer.status = 204;
     const auto none = client().Delete("/answer");
     ASSERT_TRUE(none);
@@ -72,8 +89,10 @@ TEST_F(HttpExchangeTest, OneConnectionServesManyRequests) {
     for (int count = 0; count < 5; ++count) {
         const auto result = kept.Post("/answer", std::to_string(count), "application/json");
         ASSERT_TRUE(result);
+        handoff.pass();
         EXPECT_EQ(body, std::to_string(count));
         EXPECT_EQ(result->get_header_value("Connection"), "");
+        handoff.pass();
         EXPECT_EQ(kept.Head("/answer")->status, 200);
     }
     EXPECT_EQ(server.connections(), 1u);
@@ -83,7 +102,9 @@ TEST_F(HttpExchangeTest, ARequestIsReadAsItWasSent) {
     HttpRequest seen;
     Router other;
     other.add("GET", "/a/{name}", [&](const HttpRequest& request) {
+        handoff.pass();
         seen = request;
+        handoff.pass();
         return HttpAnswer::json("{}");
     });
     HttpServer another(other);
@@ -95,6 +116,7 @@ TEST_F(HttpExchangeTest, ARequestIsReadAsItWasSent) {
                        {{"Last-Event-ID", "7"}, {"Accept", "text/event-stream"}})
                   ->status,
               200);
+    handoff.pass();
     EXPECT_EQ(seen.method, "GET");
     EXPECT_EQ(seen.path, "/a/x%2Fy%25");
     EXPECT_THAT(seen.captures, testing::ElementsAre("x/y%"));
@@ -102,7 +124,9 @@ TEST_F(HttpExchangeTest, ARequestIsReadAsItWasSent) {
                 testing::ElementsAre(testing::Pair("b", "1 2"), testing::Pair("b", "&")));
     EXPECT_EQ(seen.lastEventId, "7");
     EXPECT_EQ(seen.accept, "text/event-stream");
+    handoff.pass();
     EXPECT_EQ(asking.Head("/a/x")->status, 200);
+    handoff.pass();
     EXPECT_EQ(seen.method, "GET");
 }
 
@@ -128,6 +152,7 @@ TEST_F(HttpExchangeTest, AStreamIsSentAsItIsWritten) {
                                        return true;
                                    });
     ASSERT_TRUE(result);
+    server.stop(Clock::now() + 30s);
     EXPECT_EQ(text, "firstsecond");
     EXPECT_EQ(result->get_header_value("Content-Type"), "text/event-stream");
 }
@@ -153,6 +178,7 @@ TEST_F(HttpExchangeTest, AStreamLearnsThatItsClientHasGone) {
         EXPECT_FALSE(asking.Get("/answer"));
     }
     EXPECT_TRUE(gone.get_future().get());
+    server.stop(Clock::now() + 30s);
 }
 
 TEST_F(HttpExchangeTest, AStreamThatThrowsEndsAlone) {
@@ -161,6 +187,7 @@ TEST_F(HttpExchangeTest, AStreamThatThrowsEndsAlone) {
         throw std::runtime_error("disk I/O error");
     };
     EXPECT_EQ(client().Get("/answer")->body, "");
+    handoff.pass();
     answer.stream = nullptr;
     EXPECT_EQ(client().Get("/answer")->status, 200);
     EXPECT_THAT(trace.messages(), testing::ElementsAre("A stream broke off: disk I/O error"));

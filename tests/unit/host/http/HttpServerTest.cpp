@@ -3,6 +3,7 @@
 #include "host/http/HealthResource.h"
 #include "host/http/SampleResource.h"
 #include "support/RecordingTrace.h"
+#include "unit/host/http/Handoff.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -35,8 +36,12 @@ const std::string tables = "/api/v1/tables/";
 class TestSource : public SampleSource {
 public:
     Rows take(std::string_view table, const std::vector<Condition>& conditions) override {
-        return onTake(std::string(table), conditions);
+        handoff.pass();
+        Rows rows = onTake(std::string(table), conditions);
+        handoff.pass();
+        return rows;
     }
+    Handoff handoff;
     std::function<Rows(std::string, std::vector<Condition>)> onTake = [](auto, auto) {
         return Rows{R"([{"LOGNAME":"auth.log"}])", 1, false};
     };
@@ -56,8 +61,11 @@ protected:
         result.set_bearer_token_auth(secret);
         return result;
     }
-    httplib::Result sample(const std::string& table, const std::string& body) const {
-        return client().Post(tables + table + "/sample", body, "application/json");
+    httplib::Result sample(const std::string& table, const std::string& body) {
+        source.handoff.pass();
+        auto result = client().Post(tables + table + "/sample", body, "application/json");
+        source.handoff.pass();
+        return result;
     }
     static std::string report() {
         return R"({"filters":[{"column":"LOGPATH","op":"=","value":"/var/log/"},)"
