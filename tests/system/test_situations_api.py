@@ -47,6 +47,17 @@ class Situations:
     def names(self):
         return [situation["name"] for situation in self.list()]
 
+    def wait_opened(self, count):
+        """Waits until there are so many and each that runs is open, not only to be opened."""
+
+        def opened():
+            now = self.list()
+            return len(now) == count and not any(
+                s["state"] == "running" and s["problem"] is not None for s in now
+            )
+
+        wait_until(opened, lambda: f"{count} situations: {self.list()}")
+
     def post(self, name, what):
         status, answer = self.send("POST", path(name, what))
         assert status == 200, answer
@@ -294,7 +305,7 @@ def test_the_file_and_the_api(agent):
     # The file comes to have the name of one made through the API: the file's runs.
     good = agent.zrm_toml.read_text()
     agent.zrm_toml.write_text(good + '\n[[situation]]\nname = "made"\nseverity = "info"\n')
-    wait_until(lambda: len(api.list()) == 3, "the file's situation")
+    api.wait_opened(3)
     of_name = {s["source"]: s for s in api.list() if s["name"] == "made"}
     assert of_name["file"]["state"] == "running"
     assert of_name["api"]["state"] == "failed"
@@ -308,8 +319,8 @@ def test_the_file_and_the_api(agent):
     ]
     # When the file gives the name back, the other one runs again.
     agent.zrm_toml.write_text(good)
-    wait_until(lambda: len(api.list()) == 2, "the file's situation to go")
-    wait_until(lambda: api.get("made")["state"] == "running", "the other to run")
+    api.wait_opened(2)
+    assert api.get("made")["state"] == "running"
     log.append(syslog_line("two"))
     events = agent.wait_events(4)[2:]
     assert sorted((e["situation"], e["severity"]) for e in events) == [
@@ -318,7 +329,7 @@ def test_the_file_and_the_api(agent):
     ]
     # One that is hidden can be removed.
     agent.zrm_toml.write_text(good + '\n[[situation]]\nname = "made"\n')
-    wait_until(lambda: len(api.list()) == 3, "the file's situation")
+    api.wait_opened(3)
     assert api.remove("made")[0] == 204
     assert [(s["name"], s["source"]) for s in api.list()] == [("filed", "file"), ("made", "file")]
     assert agent.stop() == 0
@@ -339,7 +350,7 @@ def test_what_is_stopped_stays_stopped(agent):
     assert sorted(e["situation"] for e in agent.wait_events(2)) == ["other", "second"]
     # A change of the file elsewhere leaves it stopped.
     agent.zrm_toml.write_text(agent.zrm_toml.read_text() + '\n[[situation]]\nname = "third"\n')
-    wait_until(lambda: "third" in api.names(), "the third")
+    api.wait_opened(5)
     assert api.get("filed")["state"] == "stopped"
     assert agent.stop() == 0
 
