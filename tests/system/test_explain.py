@@ -376,3 +376,45 @@ def test_a_backtest_of_many_entries_names_the_first_thousand(agent):
     assert (tested["entries"], tested["raised"], tested["truncated"]) == (3000, 3000, False)
     assert tested["raised_at"] == [stamp(now + n // 2) for n in range(1000)]
     assert agent.stop() == 0
+
+
+def test_the_entry_of_an_event(agent):
+    agent.listen = "127.0.0.1:0"
+    log = agent.log(content=b"")
+    agent.situation("many", log=log, when=["ENTRYDESC starts 'hit'"], frequency=">= 2", period="1h")
+    agent.start()
+    api = Analysis(agent)
+    log.append(syslog_line("hit") * 3 + syslog_line("miss"))
+    events = agent.wait_events(2)
+    wait_until(lambda: api.request("GET", f"/api/v1/events/{events[1]['id']}")[0] == 200, "event")
+    for event, count in zip(events, (2, 3)):
+        explained = api.explain(event=event["id"])
+        assert len(explained) == 1
+        assert explained[0]["event"] == event["id"]
+        assert explained[0]["line"].endswith("hit")
+        assert explained[0]["window"]["count"] == count
+        assert explained[0]["raised"]
+    # What another situation would make of the same entry.
+    other = api.explain(event=events[0]["id"], definition={"when": ["ENTRYDESC = 'miss'"]})[0]
+    assert other["decision"] == "Would not be raised: ENTRYDESC 'hit' is not 'miss'."
+    # The log is written anew: the event's own row still tells how many were counted.
+    log.path.write_bytes(b"")
+    gone = api.explain(event=events[1]["id"])[0]
+    assert gone["line"] is None and gone["row"]["ENTRYDESC"] == "hit"
+    assert gone["decision"] == "Would be raised: 3 entries in 3600 s, the threshold is >= 2."
+    other = api.explain(event=events[1]["id"], definition={"frequency": ">= 2", "period": "1h"})[0]
+    assert other["window"]["count"] is None and not other["raised"]
+    assert other["decision"].startswith("Cannot be told: ")
+    assert api.post("explain", {"event": 99}, 404)["field"] == "event"
+    assert agent.stop() == 0
+
+
+def test_without_a_history_there_is_no_event_to_explain(agent):
+    agent.listen = "127.0.0.1:0"
+    agent.history = {"enabled": False}
+    log = agent.log()
+    agent.situation("all", log=log)
+    agent.start()
+    answer = Analysis(agent).post("explain", {"event": 1, "situation": "all"}, 409)
+    assert (answer["field"], answer["detail"]) == ("event", "the history is off")
+    assert agent.stop() == 0
