@@ -136,12 +136,15 @@ bool ErrLogFile::readLine() {
 
 void ErrLogFile::deliverLine() {
     ++NumEvents;
+    m_ledger.addBytes(static_cast<std::int64_t>(std::strlen(m_line)));
+    m_ledger.noteEntries();
     zrm_rmlogent_data_t row;
     if (formatEntryAsRow(m_line, &row, nullptr) == 0) {
         zrm_rmlogent_manager::EventArrived(&row, 1);
         writeToDebugLog(m_line, std::strlen(m_line), &row, sizeof row);
     } else {
         ++NumFormatErrors;
+        m_ledger.noteRejected(m_line);
         writeToDebugLog(m_line, std::strlen(m_line), nullptr, 0);
     }
 }

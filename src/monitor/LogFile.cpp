@@ -114,6 +114,7 @@ void LogFile::startThread() {
                       error.number(), error.text());
     } else {
         m_hasThread = true;
+        m_ledger.noteStart();
         MonitorStatus = MONITOR_RUNNING;
         MonitorStartStopTime = std::time(nullptr);
     }

@@ -4,6 +4,7 @@
 #include "logmgr/LogBase.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogBufferInfo.h"
+#include "monitor/LogLedger.h"
 #include "monitor/MonitorStatus.h"
 #include "tables/zrm_rmlogent_data.h"
 
@@ -65,6 +66,7 @@ public:
     std::int64_t numEvents() const noexcept { return NumEvents.load(); }
     std::int64_t numFormatErrors() const noexcept { return NumFormatErrors.load(); }
     std::time_t monitorStartStopTime() const noexcept { return MonitorStartStopTime.load(); }
+    const LogLedger& ledger() const noexcept { return m_ledger; }
 
     // The log manager's mark of logs that a new configuration no longer names.
     bool isMarked() const noexcept { return RefreshMode; }
@@ -118,6 +120,7 @@ protected:
     std::atomic<std::int64_t> OptimumBlockSize{0};
 
     static pthread_mutex_t m_debugFileLock;
+    LogLedger m_ledger; ///< lives as long as the object: through every refresh that keeps it
 
 private:
     friend void* logThread(void* logFile);

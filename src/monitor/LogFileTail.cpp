@@ -95,6 +95,7 @@ bool LogFile::checkForChange() {
         trace.error()("Warning: log file %s truncated. Resetting EOF to offset %ld.",
                       fileNameLocal(), static_cast<long>(newEOF));
         LogEOF = newEOF;
+        m_ledger.noteTruncated(newEOF);
     }
     return trace.result(true);
 }
@@ -108,7 +109,12 @@ bool LogFile::readGrowth() {
         setMonitorStatus(MONITOR_ERR_REWIND);
         return trace.result(false);
     }
-    if (readLog() != 0) {
+    const std::int64_t entriesBefore = numEvents();
+    const long outcome = readLog();
+    if (numEvents() != entriesBefore) {
+        m_ledger.noteEntries();
+    }
+    if (outcome != 0) {
         setMonitorStatus(MONITOR_ERR_READ);
         return trace.result(false);
     }
@@ -121,6 +127,7 @@ bool LogFile::readGrowth() {
         setMonitorStatus(MONITOR_ERR_RESET_EOF);
         return trace.result(false);
     }
+    m_ledger.addBytes(consumed - LogEOF);
     LogEOF = consumed;
     return trace.result(true);
 }
@@ -135,6 +142,7 @@ long LogFile::readLog() {
             zrm_rmlogent_manager::EventArrived(&m_row, 1);
         } else {
             count(NumFormatErrors);
+            m_ledger.noteRejected(line);
         }
         std::FILE* const debugLog = debugLogStream();
         writeRecord(debugLog, line, debugLog != nullptr ? std::strlen(line) : 0,

@@ -1,0 +1,91 @@
+#include "monitor/LogLedger.h"
+
+#include <algorithm>
+#include <cstring>
+#include <new>
+
+namespace {
+
+class LedgerGuard {
+public:
+    explicit LedgerGuard(SYS1_Lock& lock) : m_lock(lock) { SYS1_GetLock(&m_lock); }
+    ~LedgerGuard() { SYS1_ReleaseLock(&m_lock); }
+    LedgerGuard(const LedgerGuard&) = delete;
+    LedgerGuard& operator=(const LedgerGuard&) = delete;
+
+private:
+    SYS1_Lock& m_lock;
+};
+
+std::timespec now() noexcept {
+    std::timespec time{};
+    clock_gettime(CLOCK_REALTIME, &time);
+    return time;
+}
+
+/// Adds without a locked instruction: one thread alone writes the counter.
+void add(std::atomic<std::int64_t>& counter, std::int64_t count) noexcept {
+    counter.store(counter.load(std::memory_order_relaxed) + count, std::memory_order_relaxed);
+}
+
+} // namespace
+
+/// The place of the next entry, that of the oldest one once KEPT are there; null without memory.
+template <typename Entry> Entry* LogLedger::Latest<Entry>::next() noexcept {
+    if (!entries) {
+        entries.reset(new (std::nothrow) Entry[KEPT]);
+    }
+    return entries ? &entries[count++ % KEPT] : nullptr;
+}
+
+template <typename Entry> std::size_t LogLedger::Latest<Entry>::copy(Entry* out) const noexcept {
+    const std::size_t kept = std::min(count, KEPT);
+    for (std::size_t i = 0; i < kept; ++i) {
+        out[i] = entries[(count - kept + i) % KEPT];
+    }
+    return kept;
+}
+
+void LogLedger::addBytes(std::int64_t count) noexcept {
+    add(m_bytes, count);
+}
+
+void LogLedger::noteEntries() noexcept {
+    constexpr std::int64_t NANOSECONDS = 1'000'000'000;
+    const std::timespec time = now();
+    m_lastEntry.store(time.tv_sec * NANOSECONDS + time.tv_nsec, std::memory_order_relaxed);
+}
+
+void LogLedger::noteRejected(const char* line) noexcept {
+    std::size_t length = strnlen(line, sizeof RejectedLine::text);
+    length -= length > 0 && line[length - 1] == '\n' ? 1 : 0;
+    const LedgerGuard guard(m_lock);
+    if (RejectedLine* const rejected = m_rejectedLines.next()) {
+        rejected->time = now();
+        rejected->length = length;
+        std::memcpy(rejected->text, line, length);
+    }
+}
+
+void LogLedger::noteTruncated(std::int64_t newEnd) noexcept {
+    add(m_truncations, 1);
+    add(m_skipped, newEnd);
+    const LedgerGuard guard(m_lock);
+    if (SkippedRange* const skipped = m_skippedRanges.next()) {
+        *skipped = {now(), 0, newEnd};
+    }
+}
+
+std::int64_t LogLedger::restarts() const noexcept {
+    return std::max<std::int64_t>(m_starts.load(std::memory_order_relaxed) - 1, 0);
+}
+
+std::size_t LogLedger::copyRejected(RejectedLine* lines) const noexcept {
+    const LedgerGuard guard(m_lock);
+    return m_rejectedLines.copy(lines);
+}
+
+std::size_t LogLedger::copySkipped(SkippedRange* ranges) const noexcept {
+    const LedgerGuard guard(m_lock);
+    return m_skippedRanges.copy(ranges);
+}

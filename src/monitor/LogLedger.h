@@ -1,0 +1,86 @@
+#ifndef ZRM_LOG_LEDGER_H
+#define ZRM_LOG_LEDGER_H
+
+#include "agent/framework/locks.h"
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <ctime>
+#include <memory>
+
+/// What one log's monitor has read and what it has passed over, since the log is monitored; beside
+/// the numbers of lines and of format errors, which the log itself counts. The log's thread writes,
+/// any thread reads. Reading costs the log's thread nothing: it takes the lock only for a line that
+/// does not fit and for a truncation, and memory for these is allocated by the first of them.
+/// Without memory they are counted, but not kept.
+class LogLedger {
+public:
+    /// A line that did not fit, without its line end.
+    struct RejectedLine {
+        std::timespec time; ///< when it was read
+        std::size_t length;
+        char text[2048];
+    };
+    /// Bytes of a truncated log that the monitor does not read: those in front of the new end.
+    struct SkippedRange {
+        std::timespec time; ///< when the truncation was seen
+        std::int64_t from;
+        std::int64_t to; ///< behind the last byte
+    };
+    static constexpr std::size_t KEPT = 16; ///< lines and ranges that are kept, the latest
+
+    LogLedger() = default;
+    LogLedger(const LogLedger&) = delete;
+    LogLedger& operator=(const LogLedger&) = delete;
+
+    // On the log's thread.
+
+    void addBytes(std::int64_t count) noexcept;
+    /// Entries have just been read.
+    void noteEntries() noexcept;
+    /// A line did not fit.
+    void noteRejected(const char* line) noexcept;
+    /// The log has become shorter; reading goes on at the new end.
+    void noteTruncated(std::int64_t newEnd) noexcept;
+
+    // On the thread that starts the monitor.
+
+    void noteStart() noexcept { m_starts.fetch_add(1, std::memory_order_relaxed); }
+
+    // On any thread.
+
+    std::int64_t bytesRead() const noexcept { return m_bytes.load(std::memory_order_relaxed); }
+    std::int64_t truncations() const noexcept {
+        return m_truncations.load(std::memory_order_relaxed);
+    }
+    std::int64_t skippedBytes() const noexcept { return m_skipped.load(std::memory_order_relaxed); }
+    /// How often the monitor was started again.
+    std::int64_t restarts() const noexcept;
+    /// When entries were read last, in nanoseconds since the epoch; 0: never.
+    std::int64_t lastEntry() const noexcept { return m_lastEntry.load(std::memory_order_relaxed); }
+    /// Copies the lines kept, the oldest first, to an array of KEPT. Returns their number.
+    std::size_t copyRejected(RejectedLine* lines) const noexcept;
+    /// The same for the ranges.
+    std::size_t copySkipped(SkippedRange* ranges) const noexcept;
+
+private:
+    template <typename Entry> struct Latest {
+        std::unique_ptr<Entry[]> entries; ///< KEPT of them, or null
+        std::size_t count = 0;            ///< written so far
+
+        Entry* next() noexcept;
+        std::size_t copy(Entry* out) const noexcept;
+    };
+
+    std::atomic<std::int64_t> m_bytes{0};
+    std::atomic<std::int64_t> m_truncations{0};
+    std::atomic<std::int64_t> m_skipped{0};
+    std::atomic<std::int64_t> m_starts{0};
+    std::atomic<std::int64_t> m_lastEntry{0};
+    mutable SYS1_Lock m_lock; ///< guards what follows
+    Latest<RejectedLine> m_rejectedLines;
+    Latest<SkippedRange> m_skippedRanges;
+};
+
+#endif

@@ -1,0 +1,190 @@
+#include "monitor/LogLedger.h"
+
+#include "TestLog.h"
+
+#include <gmock/gmock.h>
+
+#include <array>
+#include <ctime>
+#include <filesystem>
+#include <memory>
+#include <thread>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+std::vector<std::string> rejectedBy(const LogLedger& ledger) {
+    const auto lines = std::make_unique<std::array<LogLedger::RejectedLine, LogLedger::KEPT>>();
+    const std::size_t count = ledger.copyRejected(lines->data());
+    std::vector<std::string> texts;
+    for (std::size_t i = 0; i < count; ++i) {
+        texts.emplace_back((*lines)[i].text, (*lines)[i].length);
+    }
+    return texts;
+}
+
+std::vector<LogLedger::SkippedRange> skippedBy(const LogLedger& ledger) {
+    std::vector<LogLedger::SkippedRange> ranges(LogLedger::KEPT);
+    ranges.resize(ledger.copySkipped(ranges.data()));
+    return ranges;
+}
+
+TEST(LogLedger, BeginsEmpty) {
+    const LogLedger ledger;
+    EXPECT_EQ(ledger.bytesRead(), 0);
+    EXPECT_EQ(ledger.truncations(), 0);
+    EXPECT_EQ(ledger.skippedBytes(), 0);
+    EXPECT_EQ(ledger.restarts(), 0);
+    EXPECT_EQ(ledger.lastEntry(), 0);
+    EXPECT_THAT(rejectedBy(ledger), IsEmpty());
+    EXPECT_THAT(skippedBy(ledger), IsEmpty());
+}
+
+TEST(LogLedger, KeepsTheLatestLinesTheOldestFirst) {
+    LogLedger ledger;
+    std::vector<std::string> expected;
+    for (int i = 0; i < 20; ++i) {
+        const std::string line = "line " + std::to_string(i);
+        ledger.noteRejected((line + "\n").c_str());
+        if (i >= 20 - static_cast<int>(LogLedger::KEPT)) {
+            expected.push_back(line);
+        }
+    }
+    EXPECT_EQ(rejectedBy(ledger), expected);
+}
+
+TEST(LogLedger, KeepsTheLongestPieceOfALineWhole) {
+    LogLedger ledger;
+    ledger.noteRejected("");
+    ledger.noteRejected("\n");
+    ledger.noteRejected(std::string(2047, 'x').c_str());
+    ledger.noteRejected((std::string(2046, 'y') + "\n").c_str());
+    EXPECT_THAT(rejectedBy(ledger),
+                ElementsAre("", "", std::string(2047, 'x'), std::string(2046, 'y')));
+}
+
+TEST(LogLedger, KeepsTheLatestRangesAndCountsAll) {
+    LogLedger ledger;
+    for (int i = 1; i <= 20; ++i) {
+        ledger.noteTruncated(i);
+    }
+    EXPECT_EQ(ledger.truncations(), 20);
+    EXPECT_EQ(ledger.skippedBytes(), 210);
+    const auto ranges = skippedBy(ledger);
+    ASSERT_THAT(ranges, SizeIs(LogLedger::KEPT));
+    EXPECT_EQ(ranges.front().from, 0);
+    EXPECT_EQ(ranges.front().to, 5);
+    EXPECT_EQ(ranges.back().to, 20);
+    EXPECT_NEAR(static_cast<double>(ranges.back().time.tv_sec),
+                static_cast<double>(std::time(nullptr)), 5.0);
+}
+
+TEST(LogLedger, IsReadWhileItIsWritten) {
+    LogLedger ledger;
+    std::atomic<bool> ends{false};
+    std::thread writer([&] {
+        for (int i = 0; i < 2000; ++i) {
+            ledger.addBytes(10);
+            ledger.noteEntries();
+            ledger.noteRejected("a line\n");
+            ledger.noteTruncated(3);
+            ledger.noteStart();
+        }
+        ends = true;
+    });
+    while (!ends) {
+        for (const std::string& line : rejectedBy(ledger)) {
+            ASSERT_EQ(line, "a line");
+        }
+        for (const LogLedger::SkippedRange& range : skippedBy(ledger)) {
+            ASSERT_EQ(range.to, 3);
+        }
+        ASSERT_EQ(ledger.bytesRead() % 10, 0);
+    }
+    writer.join();
+    EXPECT_EQ(ledger.bytesRead(), 20000);
+    EXPECT_EQ(ledger.truncations(), 2000);
+    EXPECT_EQ(ledger.restarts(), 1999);
+}
+
+/// The ledger of a log that is followed on the test's own thread.
+class LedgerOfALog : public MonitoredFile {
+protected:
+    LedgerOfALog() { m_log.openLogAndSeek(); }
+    ~LedgerOfALog() override { m_log.closeLog(); }
+    /// Follows the log until so many lines have been read.
+    void followTo(std::size_t lines) {
+        m_log.onLine = [this, lines](const std::string&) {
+            if (m_log.lines.size() >= lines) {
+                m_log.setMonitorStatus(MONITOR_STOPPED);
+            }
+        };
+        m_log.follow();
+    }
+
+    TestLog m_log{*m_line};
+    const LogLedger& m_ledger = m_log.ledger();
+};
+
+TEST_F(LedgerOfALog, CountsTheBytesThatWereRead) {
+    append("one\ntwo\n");
+    followTo(2);
+    EXPECT_EQ(m_ledger.bytesRead(), 8);
+    append("three");
+    followTo(3);
+    EXPECT_EQ(m_ledger.bytesRead(), 13);
+}
+
+TEST_F(LedgerOfALog, KeepsTheLinesThatDoNotFit) {
+    append("one\nbad\ntwo\nbad again\n");
+    followTo(4);
+    EXPECT_THAT(rejectedBy(m_ledger), ElementsAre("bad", "bad again"));
+}
+
+TEST_F(LedgerOfALog, TellsTheTimeOfTheLastEntry) {
+    const std::time_t before = std::time(nullptr);
+    append("one\n");
+    followTo(1);
+    EXPECT_GE(m_ledger.lastEntry() / 1'000'000'000, before);
+    EXPECT_LE(m_ledger.lastEntry() / 1'000'000'000, std::time(nullptr));
+}
+
+TEST_F(LedgerOfALog, TellsWhichBytesATruncationSkips) {
+    append("one\ntwo\n");
+    followTo(2);
+    std::filesystem::resize_file(m_path, 4);
+    RecordingTrace trace(TRC1_ERROR);
+    std::thread follower([this] { m_log.follow(); });
+    EXPECT_TRUE(waitUntil([this] { return m_ledger.truncations() == 1; }));
+    m_log.setMonitorStatus(MONITOR_STOPPED);
+    follower.join();
+    EXPECT_EQ(m_ledger.skippedBytes(), 4);
+    const auto ranges = skippedBy(m_ledger);
+    ASSERT_THAT(ranges, SizeIs(1));
+    EXPECT_EQ(ranges[0].from, 0);
+    EXPECT_EQ(ranges[0].to, 4);
+    append("new\n");
+    followTo(3);
+    EXPECT_EQ(m_ledger.bytesRead(), 12);
+}
+
+TEST_F(MonitoredFile, ALedgerLastsThroughARefreshThatRestartsTheMonitor) {
+    TestLog log(*m_line);
+    log.startThread();
+    ASSERT_TRUE(waitUntil([&log] { return log.eof() == 0; }));
+    append("one\nbad\n");
+    ASSERT_TRUE(waitUntil([&log] { return log.ledger().bytesRead() == 8; }));
+    EXPECT_EQ(log.ledger().restarts(), 0);
+    log = *m_line;
+    EXPECT_EQ(log.ledger().restarts(), 0) << "a monitor that runs is not started again";
+    log.setMonitorStatus(MONITOR_ERR_READ);
+    log = *m_line;
+    EXPECT_EQ(log.ledger().restarts(), 1);
+    EXPECT_EQ(log.ledger().bytesRead(), 8);
+    EXPECT_THAT(rejectedBy(log.ledger()), ElementsAre("bad"));
+}
+
+} // namespace
