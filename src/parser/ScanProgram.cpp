@@ -251,6 +251,15 @@ int ScanProgram::run(const char* text, void* value) const noexcept {
                                                       : MISMATCH;
 }
 
+ScanProgram::Place ScanProgram::findValue(const char* text) const noexcept {
+    const char* position = text;
+    if (matchLiteral(position) != Outcome::MATCHED) {
+        return {position, false};
+    }
+    const bool skips = m_kind != Kind::CHARACTERS && m_skipsWhiteSpace;
+    return {skips ? skipWhiteSpace(position) : position, true};
+}
+
 ScanProgram::Outcome ScanProgram::matchLiteral(const char*& position) const noexcept {
     if (m_isOneCharacter) {
         if (*position != *m_literal) {

@@ -30,6 +30,13 @@ public:
     /// "%n" cannot say how many it took and gives MISMATCH.
     int run(const char* text, void* value) const noexcept;
 
+    /// Where a scan of `text` looks for the value. Explains what run does; scanning needs it not.
+    struct Place {
+        const char* position; ///< the value's beginning, or where the leading text does not fit
+        bool isLiteralMatched;
+    };
+    Place findValue(const char* text) const noexcept;
+
 private:
     enum class Kind { NOTHING, INTEGER, FLOATING, TEXT, CHARACTERS };
     enum class Outcome { MATCHED, MISMATCHED, END };

@@ -4,6 +4,7 @@
 #include "parser/DirectiveRules.h"
 
 #include <cstdio>
+#include <cstring>
 #include <new>
 #include <string_view>
 
@@ -12,6 +13,20 @@ namespace {
 TRC1_Anchor anchor{"StringParser.cpp"};
 
 constexpr char START_PATTERN[] = " %*1[Aa] , \"%n";
+
+/// Where a specifier without the right beginning goes wrong.
+std::size_t findBadStart(const char* text) {
+    constexpr const char* expected[] = {"Aa", ",", "\""};
+    const char* position = text;
+    for (const char* const characters : expected) {
+        position = skipWhiteSpace(position);
+        if (*position == '\0' || std::strchr(characters, *position) == nullptr) {
+            break;
+        }
+        ++position;
+    }
+    return static_cast<std::size_t>(position - text);
+}
 
 } // namespace
 
@@ -28,9 +43,11 @@ StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* va
             "Scan for start of format specifier failed; looking for \"%s\" but found:  %s",
             START_PATTERN, text);
         ObjectStatus = OBJECT_FAILED;
+        m_learnedTo = findBadStart(text);
         return;
     }
     ObjectStatus = learnLogFormat(text + length - 1, validFields);
+    m_learnedTo += static_cast<std::size_t>(length - 1);
     if (ObjectStatus == OBJECT_FORMAT_LEARNED && trace.isOn(TRC1_DETAIL)) {
         printChain();
     }
@@ -39,7 +56,9 @@ StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* va
 StringParser::StringParser(const char** formatPosition) {
     TraceScope trace(anchor);
     initThis();
-    *formatPosition = formatNextDirective(*formatPosition);
+    const char* const begin = *formatPosition;
+    *formatPosition = formatNextDirective(begin);
+    m_distanceToEnd = static_cast<std::size_t>(*formatPosition - begin);
     if (ObjectStatus != OBJECT_LEARNED) {
         return;
     }
@@ -93,8 +112,10 @@ _ObjectStatus StringParser::learnLogFormat(const char* format, const _KeywordFie
         return trace.result(OBJECT_FAILED);
     }
     if (ScanOrder->ObjectStatus == OBJECT_LEARNED && parseFieldNames(position, validFields) > 0) {
+        m_learnedTo = 0;
         return trace.result(OBJECT_FORMAT_LEARNED);
     }
+    m_learnedTo += static_cast<std::size_t>(position - format);
     ScanOrder.reset();
     return trace.result(OBJECT_FAILED);
 }

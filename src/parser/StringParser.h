@@ -47,6 +47,29 @@ public:
     /// when one cannot be printed.
     int formatFields(_FormatBuffer* buffers);
 
+    // For explaining a format and its lines.
+
+    /// Where one directive looks in a line; offsets in the line.
+    struct Place {
+        bool isInside;         ///< false: the line ends before the directive's column
+        bool isLiteralMatched; ///< the literal text in front of the directive is there
+        bool isMatched;
+        std::size_t value; ///< where the value begins, or where the line stops fitting
+        std::size_t end;   ///< behind the value, when matched
+    };
+    /// Scans this node's directive alone, from `position` in the line, which the directive's column
+    /// overrules: a step of scanInput, without its messages.
+    Place locate(const char* line, std::size_t position) const;
+    /// Prints the value scanned last as formatFields does; false when it cannot be printed.
+    bool printValue(_FormatBuffer& buffer) const;
+    /// On the anchor: the offset in the specifier at which learning began to go wrong. On an anchor
+    /// that was learned: of the scan format's opening quote.
+    std::size_t learnedTo() const noexcept { return m_learnedTo; }
+    /// Characters of the specifier from the last one of the directive before (from the opening
+    /// quote, for the first) to this directive's '%', and to its last one.
+    std::size_t distanceToBegin() const noexcept { return m_distanceToBegin; }
+    std::size_t distanceToEnd() const noexcept { return m_distanceToEnd; }
+
     /// Dumps this node and all behind it to the trace.
     void printChain() const;
     void printSelf() const;
@@ -126,6 +149,9 @@ private:
 
     ScanProgram m_scan;
     PrintProgram m_print;
+    std::size_t m_learnedTo = 0;
+    std::size_t m_distanceToBegin = 0;
+    std::size_t m_distanceToEnd = 0;
 };
 
 #endif

@@ -38,6 +38,7 @@ int StringParser::parseFieldNames(const char* text, const _KeywordFields* validF
     const char* position = text + length;
     int named = 0;
     for (StringParser* node = ScanOrder.get(); node != nullptr; node = node->ScanOrder.get()) {
+        m_learnedTo = static_cast<std::size_t>(position - text);
         position = node->getFieldName(position, validFields);
         if (position == nullptr) {
             trace.error()("Error while processing directive #%d; %.*s.", named + 1,
@@ -48,6 +49,7 @@ int StringParser::parseFieldNames(const char* text, const _KeywordFields* validF
         ++named;
     }
     if (named > 0 && *position != '\0') {
+        m_learnedTo = static_cast<std::size_t>(position - text);
         trace.error()("Error: extraneous data included in format specifier:  %s ", position);
         return trace.result(-1);
     }

@@ -80,3 +80,26 @@ int StringParser::formatFields(_FormatBuffer* buffers) {
     }
     return trace.result(count);
 }
+
+StringParser::Place StringParser::locate(const char* line, std::size_t position) const {
+    TraceScope trace(anchor);
+    if (HasColumn) {
+        if (Offset >= std::strlen(line)) {
+            return {false, false, false, std::strlen(line), 0};
+        }
+        position = Offset;
+    }
+    const char* const begin = line + position;
+    const ScanProgram::Place place = m_scan.findValue(begin);
+    const int consumed = m_scan.run(begin, Value.get());
+    const bool isMatched =
+        consumed != ScanProgram::END_OF_INPUT && consumed != ScanProgram::MISMATCH;
+    return {true, place.isLiteralMatched, isMatched,
+            static_cast<std::size_t>(place.position - line),
+            isMatched ? position + static_cast<std::size_t>(consumed) : 0};
+}
+
+bool StringParser::printValue(_FormatBuffer& buffer) const {
+    TraceScope trace(anchor);
+    return trace.result(m_print.isCompiled() && m_print.run(Value.get(), buffer));
+}

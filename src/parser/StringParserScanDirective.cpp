@@ -20,6 +20,7 @@ const char* StringParser::formatNextDirective(const char* position) {
     TraceScope trace(anchor);
     _BuildArea area(position);
     const int found = findDirective(&area);
+    m_distanceToBegin = static_cast<std::size_t>(area.position - position) - (found == 0 ? 1 : 0);
     if (found == 1) {
         ObjectStatus = OBJECT_NO_DIRECTIVE;
     } else if (found == 0 && buildScanDirective(&area) == 0) {
