@@ -2,6 +2,7 @@
 #include "agent/framework/trace.h"
 
 #include "host/framework/CancellationOff.h"
+#include "host/framework/TraceCapture.h"
 #include "host/framework/TraceControl.h"
 #include "host/framework/TraceOutput.h"
 #include "host/framework/TraceRecord.h"
@@ -18,6 +19,11 @@ unsigned TRC1_Sync(TRC1_Anchor& anchor) noexcept {
     // afterwards whether the generation has moved on, so the last to store has the latest.
     for (;;) {
         const unsigned generation = TRC1_Generation.load();
+        if (TraceCapture::exists()) {
+            // Levels differ from thread to thread: no source file learns one.
+            return TraceCapture::current() != nullptr ? static_cast<unsigned>(TRC1_ERROR)
+                                                      : TraceControl::levelOf(anchor.unit);
+        }
         const unsigned level = TraceControl::levelOf(anchor.unit);
         anchor.level.store(level);
         anchor.generation.store(generation);
@@ -30,7 +36,9 @@ unsigned TRC1_Sync(TRC1_Anchor& anchor) noexcept {
 void TRC1_VPrintf(const TRC1_Anchor& anchor, int line, const char* format,
                   std::va_list arguments) noexcept {
     const int savedErrno = errno;
-    {
+    if (TraceCapture* const capture = TraceCapture::current()) {
+        capture->add(format, arguments);
+    } else {
         // The write is a cancellation point, and an unwind must not meet this noexcept.
         const CancellationOff guard;
         std::timespec now{};

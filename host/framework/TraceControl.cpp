@@ -24,8 +24,9 @@ std::atomic<const Setting*> g_setting{nullptr};
 
 /// No anchor has learnt generation 0.
 void bumpGeneration() {
-    const unsigned next = TRC1_Generation.load() + 1;
-    TRC1_Generation.store(next != 0 ? next : 1);
+    if (TRC1_Generation.fetch_add(1) + 1 == 0) {
+        ++TRC1_Generation;
+    }
 }
 
 } // namespace

@@ -1,0 +1,54 @@
+#include "host/framework/TraceCapture.h"
+
+#include "agent/framework/trace.h"
+
+#include <atomic>
+#include <cstdio>
+#include <new>
+#include <utility>
+
+namespace {
+
+thread_local TraceCapture* t_current = nullptr;
+std::atomic<int> g_count{0};
+
+} // namespace
+
+TraceCapture::TraceCapture() {
+    t_current = this;
+    ++g_count;
+    // From here on no source file's level is the one that it has learnt.
+    if (TRC1_Generation.fetch_add(1) + 1 == 0) {
+        ++TRC1_Generation;
+    }
+}
+
+TraceCapture::~TraceCapture() {
+    --g_count;
+    t_current = nullptr;
+}
+
+std::string TraceCapture::take() {
+    return std::exchange(m_errors, {});
+}
+
+TraceCapture* TraceCapture::current() noexcept {
+    return t_current;
+}
+
+bool TraceCapture::exists() noexcept {
+    return g_count != 0;
+}
+
+void TraceCapture::add(const char* format, std::va_list arguments) noexcept {
+    char text[4096];
+    const int length = std::vsnprintf(text, sizeof text, format, arguments);
+    try {
+        if (length > 0) {
+            m_errors += m_errors.empty() ? "" : " ";
+            m_errors += text;
+        }
+    } catch (const std::bad_alloc&) {
+        // A reason less.
+    }
+}
