@@ -14,7 +14,7 @@ std::atomic<int> g_count{0};
 
 } // namespace
 
-TraceCapture::TraceCapture() {
+TraceCapture::TraceCapture() : m_outer(t_current) {
     t_current = this;
     ++g_count;
     // From here on no source file's level is the one that it has learnt.
@@ -25,7 +25,7 @@ TraceCapture::TraceCapture() {
 
 TraceCapture::~TraceCapture() {
     --g_count;
-    t_current = nullptr;
+    t_current = m_outer;
 }
 
 std::string TraceCapture::take() {

@@ -6,8 +6,8 @@
 
 /// While it lives, the errors that the constructing thread traces are kept here and not written,
 /// whatever the trace levels are; other threads trace as always. For what is only tried: the agent
-/// says why it refuses something, and the operator's trace stays free of it. One at a time on a
-/// thread.
+/// says why it refuses something, and the operator's trace stays free of it. Of several on
+/// a thread the latest keeps them.
 class TraceCapture {
 public:
     TraceCapture();
@@ -28,6 +28,7 @@ public:
         __attribute__((format(printf, 2, 0)));
 
 private:
+    TraceCapture* m_outer; ///< goes on when this one ends
     std::string m_errors;
 };
 

@@ -2,6 +2,7 @@
 
 #include "agent/TraceScope.h"
 #include "host/config/ConditionBuilder.h"
+#include "host/diagnose/LogLedgers.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowJson.h"
 #include "host/framework/Sample.h"
@@ -38,6 +39,17 @@ std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
     return std::get<std::vector<Condition>>(std::move(conditions));
 }
 
+/// The log's ledger; null when a refresh has just ended its monitoring.
+std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::string& log,
+                     bool withSamples) {
+    for (const LogLedgerView& ledger : ledgers) {
+        if (ledger.log == log) {
+            return LogLedgers::json(ledger, withSamples);
+        }
+    }
+    return "null";
+}
+
 HttpAnswer logs(const HttpRequest& request) {
     TraceScope trace(anchor);
     QueryFields query(request);
@@ -48,12 +60,16 @@ HttpAnswer logs(const HttpRequest& request) {
     if (log && count == 0) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
+    const std::vector<LogLedgerView> ledgers = LogLedgers::read(log.value_or(""));
     std::string text = "{\"logs\":[";
     for (std::size_t index = 0; index < count; ++index) {
         text += index == 0 ? "{\"log\":" : ",{\"log\":";
         RowJson::appendText(text, LogPath::of(sample->layout(), sample->row(index)));
         text += ",\"row\":";
         RowJson::append(text, sample->layout(), sample->row(index));
+        text +=
+            ",\"ledger\":" +
+            ledgerOf(ledgers, LogPath::of(sample->layout(), sample->row(index)), log.has_value());
         text += '}';
     }
     return HttpAnswer::json(text + "],\"time\":\"" + now() + "\"}");

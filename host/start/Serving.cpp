@@ -4,6 +4,7 @@
 #include "agent/framework/ctreq.h"
 #include "host/analysis/AnalysisResource.h"
 #include "host/console/ConsoleResource.h"
+#include "host/diagnose/DiagnoseResource.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/history/WallClock.h"
@@ -86,6 +87,7 @@ void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<AgentResource>(m_delivery));
     addResource(std::make_unique<LogsResource>());
     addResource(std::make_unique<SampleResource>(m_sampler));
+    addResource(std::make_unique<DiagnoseResource>());
     addResource(std::make_unique<ReportResource>(m_sampler));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));

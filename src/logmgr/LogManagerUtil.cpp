@@ -17,8 +17,6 @@ namespace {
 
 TRC1_Anchor anchor{"LogManagerUtil.cpp"};
 
-constexpr int recordSize = 1024;
-
 /// The one configuration file being read. Trivially destructible: the process may end while the
 /// manager thread reads.
 struct Reader {
@@ -28,7 +26,6 @@ struct Reader {
     bool isOpen() const { return stream != nullptr; }
     bool open(const TraceScope& trace, const char* path);
     void close();
-    char* nextRecord();
 };
 
 Reader reader{};
@@ -39,9 +36,10 @@ bool Reader::open(const TraceScope& trace, const char* path) {
         trace.error()("Error opening file %s; errno = %d", path, errno);
         return false;
     }
-    line = new (std::nothrow) char[recordSize];
+    line = new (std::nothrow) char[LogManagerUtil::RECORD_SIZE];
     if (line == nullptr) {
-        trace.error()("Memory allocation for %d bytes failed; errno = %d", recordSize, errno);
+        trace.error()("Memory allocation for %d bytes failed; errno = %d",
+                      LogManagerUtil::RECORD_SIZE, errno);
         close();
         return false;
     }
@@ -53,34 +51,6 @@ void Reader::close() {
     stream = nullptr;
     delete[] line;
     line = nullptr;
-}
-
-/// The next record, null at the end of the file or on an error.
-char* Reader::nextRecord() {
-    bool tooLong = false;
-    while (std::fgets(line, recordSize, stream) != nullptr) {
-        if (line[0] == '#') {
-            continue;
-        }
-        const std::size_t length = std::strlen(line);
-        if (length == 0 || line[length - 1] != '\n') {
-            tooLong = true;
-            continue;
-        }
-        line[length - 1] = '\0';
-        if (tooLong) {
-            tooLong = false;
-            continue;
-        }
-        char* text = line;
-        while (std::isspace(static_cast<unsigned char>(*text)) != 0) {
-            ++text;
-        }
-        if (*text != '\0') {
-            return text;
-        }
-    }
-    return nullptr;
 }
 
 } // namespace
@@ -117,12 +87,39 @@ std::time_t LogManagerUtil::fileLastModified(const char* path) {
     return trace.result(status.st_mtime);
 }
 
+char* LogManagerUtil::nextRecord(std::FILE* stream, char* line) {
+    bool tooLong = false;
+    while (std::fgets(line, RECORD_SIZE, stream) != nullptr) {
+        if (line[0] == '#') {
+            continue;
+        }
+        const std::size_t length = std::strlen(line);
+        if (length == 0 || line[length - 1] != '\n') {
+            tooLong = true;
+            continue;
+        }
+        line[length - 1] = '\0';
+        if (tooLong) {
+            tooLong = false;
+            continue;
+        }
+        char* text = line;
+        while (std::isspace(static_cast<unsigned char>(*text)) != 0) {
+            ++text;
+        }
+        if (*text != '\0') {
+            return text;
+        }
+    }
+    return nullptr;
+}
+
 char* LogManagerUtil::getNextRec(const char* path) {
     TraceScope trace(anchor);
     if (!reader.isOpen() && !reader.open(trace, path)) {
         return trace.result<char*>(nullptr);
     }
-    char* const record = reader.nextRecord();
+    char* const record = nextRecord(reader.stream, reader.line);
     if (record != nullptr) {
         return trace.result(record);
     }

@@ -15,6 +15,15 @@ std::FILE* openStream(const char* path, const char* mode);
 /// Modification time (seconds since the epoch) of a regular file; 0 when there is no such file.
 std::time_t fileLastModified(const char* path);
 
+/// Bytes of a line of a configuration file, with newline and terminator.
+inline constexpr int RECORD_SIZE = 1024;
+
+/// Reads the next record of an open configuration file into `line`, which has RECORD_SIZE bytes,
+/// and returns it without leading white space and newline; null at the end of the file or on an
+/// error. Comments, blank lines, lines that are too long and a last line without a newline are
+/// passed over. Any thread that owns stream and line.
+char* nextRecord(std::FILE* stream, char* line);
+
 /// Returns the next record of a configuration file, without leading white space and newline, or
 /// null at its end. The record lies in a process-wide buffer until the next call; while a file is
 /// open, `path` only names it in messages. Manager thread only.

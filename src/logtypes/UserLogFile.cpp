@@ -45,6 +45,10 @@ UserLogFile::UserLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log,
     startThread();
 }
 
+UserLogFile::UserLogFile(const ValidLog& log, Unmonitored) : LogFile(log, nullptr) {
+    const TraceScope trace(anchor);
+}
+
 UserLogFile::~UserLogFile() {
     TraceScope trace(anchor);
     stopThread();
@@ -71,6 +75,10 @@ void UserLogFile::processLogData() {
         waitForEventLoop({1, 0});
         closeLog();
     }
+}
+
+const _KeywordFields* UserLogFile::fields() noexcept {
+    return validFields;
 }
 
 bool UserLogFile::hasFormat() const {

@@ -8,6 +8,7 @@
 #include <memory>
 
 class StringParser;
+struct _KeywordFields;
 struct EntryTime;
 struct UserlogBufferInfo;
 struct _EntryTimeBuffers;
@@ -35,7 +36,14 @@ public:
 
     void printSelf() const;
 
+    /// The names that a format may give its fields.
+    static const _KeywordFields* fields() noexcept;
+
 protected:
+    /// Prepares a log that is not monitored: no thread is started. For lines that are only tried.
+    struct Unmonitored {};
+    UserLogFile(const ValidLog& log, Unmonitored);
+
     /// Writes the 16 characters of ENTRYTIME; what the texts do not tell is taken from the report's
     /// date (the year alone) or the clock. 0 or -1. The caller holds the lock of the chain.
     long formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, void* reportContext);

@@ -113,6 +113,12 @@ EXAMPLES = [
     ("POST", "/api/v1/explain", None, {"definition": DEFINITION, "log": "{log}", "line": "no entry"}, 200),
     ("POST", "/api/v1/explain", None, {"situation": "none", "log": "{log}", "line": "x"}, None),
     ("POST", "/api/v1/backtest", None, {"situation": "every-entry", "from": FROM, "to": "2099-01-01"}, 200),
+    ("POST", "/api/v1/try", None, {"format": 'A , "%s" , type', "lines": ["word", ""]}, 200),
+    ("POST", "/api/v1/try", None, {"format": 'A , "%*s %d %[^\n]" , day description', "log": "{log}", "last": 3}, 200),
+    ("POST", "/api/v1/try", None, {"format": 'A , "%q" , type', "lines": ["word"]}, 200),
+    ("POST", "/api/v1/try", None, {"format": "A", "log": "/none", "last": 3}, 400),
+    ("POST", "/api/v1/check", None, {"config": "# logs\n{log}\n/none ;N\nlast"}, 200),
+    ("POST", "/api/v1/check", None, {"config": 7}, 400),
     ("DELETE", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", None, 204),
     ("DELETE", "/api/v1/situations/{name}", "/api/v1/situations/every-entry", None, 409),
 ]  # fmt: skip

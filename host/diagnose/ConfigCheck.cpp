@@ -1,0 +1,151 @@
+#include "host/diagnose/ConfigCheck.h"
+
+#include "agent/TraceScope.h"
+#include "host/framework/TraceCapture.h"
+#include "logmgr/LogManagerUtil.h"
+#include "logmgr/ValidLog.h"
+#include "logtypes/UserLogFile.h"
+#include "parser/StringParser.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdio>
+#include <cstring>
+#include <memory>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+#include <sys/stat.h>
+
+namespace {
+
+TRC1_Anchor anchor{"ConfigCheck.cpp"};
+
+using Line = ConfigCheck::Line;
+using Verdict = ConfigCheck::Verdict;
+using Cause = ConfigCheck::Cause;
+
+/// Every line of the text, until the agent's reading shows that it is more than a comment.
+std::vector<Line> linesOf(std::string_view text) {
+    std::vector<Line> lines;
+    while (!text.empty()) {
+        const std::size_t end = text.find('\n');
+        const bool isEnded = end != std::string_view::npos;
+        Line line{lines.size() + 1, std::string(text.substr(0, end)), Verdict::IGNORED, "", "",
+                  Cause::NONE};
+        const bool isBlank = line.text.find_first_not_of(" \t\v\f\r") == std::string::npos;
+        if (!isBlank && line.text[0] != '#') {
+            line.verdict = Verdict::REFUSED;
+            line.cause = Cause::TEXT;
+            line.reason = !isEnded ? "The file ends without a newline behind this line, so the "
+                                     "agent does not read it."
+                                   : "The agent passes over this line: it, or the line before it, "
+                                     "has more than 1023 characters or a NUL character.";
+        }
+        lines.push_back(std::move(line));
+        text.remove_prefix(isEnded ? end + 1 : text.size());
+    }
+    return lines;
+}
+
+/// The valid logs so far, on one chain.
+class Chain {
+public:
+    /// Judges one record, which is changed.
+    void judge(char* record, Line& line) {
+        const std::string log(record, std::strcspn(record, "\t "));
+        line.log = log[0] == '/' ? log : "";
+        line.reason.clear();
+        line.cause = Cause::NONE;
+        TraceCapture errors;
+        auto valid = std::make_unique<ValidLog>(CONFIG_USER, record,
+                                                m_logs.empty() ? nullptr : m_logs.front().get());
+        line.reason = errors.take();
+        line.verdict = valid->isValid() ? Verdict::ACCEPTED : Verdict::REFUSED;
+        if (valid->isValid() && valid->type() == 'U') {
+            learnFormat(*valid, errors, line);
+        }
+        if (line.verdict == Verdict::REFUSED) {
+            line.cause = isFileMissing(log) ? Cause::FILE : Cause::TEXT;
+        }
+        if (valid->isValid()) {
+            m_logs.push_back(std::move(valid));
+        }
+    }
+
+private:
+    static void learnFormat(const ValidLog& log, TraceCapture& errors, Line& line) {
+        const StringParser format(log.procedure(), UserLogFile::fields());
+        if (format.status() != OBJECT_FORMAT_LEARNED) {
+            line.verdict = Verdict::REFUSED;
+            const std::string learning = errors.take();
+            line.reason += line.reason.empty() || learning.empty() ? "" : " ";
+            line.reason += learning;
+            line.reason += line.reason.empty() ? "" : " ";
+            line.reason += "Error occurred while interpreting format command for file " +
+                           std::string(log.fileNameLocal()) + "; monitoring not started. ";
+        }
+    }
+    static bool isFileMissing(const std::string& log) {
+        struct stat status;
+        return log[0] == '/' && (::stat(log.c_str(), &status) != 0 || !S_ISREG(status.st_mode));
+    }
+
+    std::vector<std::unique_ptr<ValidLog>> m_logs;
+};
+
+} // namespace
+
+ConfigCheck::Result ConfigCheck::check(std::string_view text) {
+    TraceScope trace(anchor);
+    Result result{linesOf(text), 0, 0};
+    std::string content(text); // the stream keeps to it
+    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(
+        content.empty() ? nullptr : fmemopen(content.data(), content.size(), "r"), std::fclose);
+    if (stream != nullptr) {
+        Chain chain;
+        std::array<char, LogManagerUtil::RECORD_SIZE> room;
+        std::size_t read = 0;
+        std::size_t newlines = 0;
+        while (char* const record = LogManagerUtil::nextRecord(stream.get(), room.data())) {
+            const auto position = static_cast<std::size_t>(std::ftell(stream.get()));
+            newlines += static_cast<std::size_t>(
+                std::count(content.begin() + static_cast<std::ptrdiff_t>(read),
+                           content.begin() + static_cast<std::ptrdiff_t>(position), '\n'));
+            read = position;
+            chain.judge(record, result.lines.at(newlines - 1));
+        }
+    }
+    for (const Line& line : result.lines) {
+        result.accepted += line.verdict == Verdict::ACCEPTED ? 1 : 0;
+        result.refused += line.verdict == Verdict::REFUSED ? 1 : 0;
+    }
+    return result;
+}
+
+const char* ConfigCheck::name(Verdict verdict) noexcept {
+    constexpr const char* names[] = {"accepted", "refused", "ignored"};
+    return names[static_cast<std::size_t>(verdict)];
+}
+
+const char* ConfigCheck::name(Cause cause) noexcept {
+    constexpr const char* names[] = {nullptr, "text", "file"};
+    return names[static_cast<std::size_t>(cause)];
+}
+
+std::string ConfigCheck::json(const Result& result) {
+    using Json = nlohmann::ordered_json;
+    const auto orNull = [](const std::string& text) { return text.empty() ? Json() : Json(text); };
+    Json lines = Json::array();
+    for (const Line& line : result.lines) {
+        const char* const cause = name(line.cause);
+        lines.push_back({{"line", line.number},
+                         {"text", line.text},
+                         {"verdict", name(line.verdict)},
+                         {"log", orNull(line.log)},
+                         {"reason", orNull(line.reason)},
+                         {"cause", cause != nullptr ? Json(cause) : Json()}});
+    }
+    const Json object{{"lines", lines}, {"accepted", result.accepted}, {"refused", result.refused}};
+    return object.dump(-1, ' ', false, Json::error_handler_t::replace);
+}

@@ -1,0 +1,99 @@
+#include "host/diagnose/DiagnoseResource.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "host/diagnose/ConfigCheck.h"
+#include "host/diagnose/FormatTrial.h"
+#include "host/diagnose/LastLines.h"
+#include "host/diagnose/LogLedgers.h"
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace {
+
+TRC1_Anchor anchor{"DiagnoseResource.cpp"};
+
+std::vector<std::string> givenLines(JsonFields& fields) {
+    std::vector<std::string> lines = fields.texts("lines", DiagnoseResource::kMostLines);
+    for (std::size_t i = 0; i < lines.size(); ++i) {
+        if (lines[i].size() > DiagnoseResource::kMostLineBytes) {
+            throw RequestRefused(400, "write lines of at most 16384 bytes",
+                                 fields.place("lines", i));
+        }
+        if (lines[i].find('\n') != std::string::npos) {
+            throw RequestRefused(400, "write each line by itself, without its line end",
+                                 fields.place("lines", i));
+        }
+    }
+    return lines;
+}
+
+/// The last lines of a monitored log: the API shows no other file.
+std::vector<std::string> loggedLines(const JsonFields& fields, const std::string& log,
+                                     std::size_t count) {
+    const std::vector<LogLedgerView> monitored = LogLedgers::read(log);
+    if (log.empty() || monitored.empty()) {
+        fields.refuse("log", "this log is not monitored");
+    }
+    if (monitored[0].type != 'U' && monitored[0].type != 'S') {
+        fields.refuse("log", "this log is no text file");
+    }
+    std::optional<std::vector<std::string>> lines = LastLines::read(monitored[0].file, count);
+    if (!lines) {
+        const ErrorText error(errno);
+        throw RequestRefused(409, std::string("the log cannot be read: ") + error.text(),
+                             fields.place("log"));
+    }
+    return std::move(*lines);
+}
+
+} // namespace
+
+void DiagnoseResource::addRoutes(Router& router) {
+    router.add("POST", "/api/v1/try", tryFormat);
+    router.add("POST", "/api/v1/check", checkConfig);
+}
+
+HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields fields(request.body);
+    const std::string format = fields.text("format");
+    const std::optional<std::string> log = fields.optionalText("log");
+    const auto last =
+        fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::kMostLines));
+    const bool hasLines = fields.has("lines");
+    std::vector<std::string> lines = givenLines(fields);
+    fields.refuseUnknown();
+    if (hasLines && last) {
+        fields.refuse("last", "write either lines, or log and last");
+    }
+    if (last && !log) {
+        fields.refuse("log", "is missing: last counts the lines of a log");
+    }
+    if (last) {
+        lines = loggedLines(fields, *log, static_cast<std::size_t>(*last));
+    }
+    const bool isNamed = log && !log->empty();
+    return HttpAnswer::json(FormatTrial::json(
+        FormatTrial::run(format, lines, isNamed ? std::string_view(*log) : FormatTrial::kSomeLog)));
+}
+
+HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields fields(request.body);
+    const std::string config = fields.text("config");
+    fields.refuseUnknown();
+    if (static_cast<std::size_t>(std::count(config.begin(), config.end(), '\n')) >
+        kMostConfigLines) {
+        fields.refuse("config", "write at most 10000 lines");
+    }
+    return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config)));
+}

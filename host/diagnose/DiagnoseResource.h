@@ -1,0 +1,24 @@
+#ifndef ZRM_HOST_DIAGNOSE_RESOURCE_H
+#define ZRM_HOST_DIAGNOSE_RESOURCE_H
+
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
+#include "host/http/Resource.h"
+
+#include <cstddef>
+
+/// `POST /api/v1/try`: tries a format on lines. `POST /api/v1/check`: judges a log configuration.
+class DiagnoseResource : public Resource {
+public:
+    static constexpr std::size_t kMostLines = 1000;        ///< that a format is tried on
+    static constexpr std::size_t kMostLineBytes = 16384;   ///< of such a line
+    static constexpr std::size_t kMostConfigLines = 10000; ///< of a configuration
+
+    void addRoutes(Router& router) override;
+
+private:
+    static HttpAnswer tryFormat(const HttpRequest& request);
+    static HttpAnswer checkConfig(const HttpRequest& request);
+};
+
+#endif

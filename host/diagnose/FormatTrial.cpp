@@ -1,0 +1,248 @@
+#include "host/diagnose/FormatTrial.h"
+
+#include "agent/TraceScope.h"
+#include "host/diagnose/TrialLog.h"
+#include "host/events/RowText.h"
+#include "host/framework/TraceCapture.h"
+#include "tables/zrm_rmlogent_data.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstring>
+
+namespace {
+
+TRC1_Anchor anchor{"FormatTrial.cpp"};
+
+using Row = zrm_rmlogent_data_t;
+
+constexpr std::size_t kPiece = 2047;     ///< bytes that the agent reads as one line at most
+constexpr std::size_t kMostValue = 2048; ///< bytes of a printed value that are shown
+constexpr std::string_view kCount = "%n";
+
+/// The column of each field name, in the order of the names.
+constexpr const char* columnOfField[] = {
+    "ENTRYTIME", "ENTRYTIME", "ENTRYTIME", "ENTRYTIME",  "ENTRYTIME", "ENTRYTIME",
+    "ENTRYSYS",  "ENTRYSRC",  "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC",
+};
+
+/// The columns that a line fills.
+const std::array<RowColumn, 8>& entryColumns() {
+    static const auto* const columns = new std::array<RowColumn, 8>{{
+        {"ENTRYTIME", offsetof(Row, entrytime), sizeof Row::entrytime, COLUMN_CHARACTER},
+        {"ENTRYSYS", offsetof(Row, entrysys), sizeof Row::entrysys, COLUMN_CHARACTER},
+        {"ENTRYSRC", offsetof(Row, entrysrc), sizeof Row::entrysrc, COLUMN_CHARACTER},
+        {"ENTRYTYPE", offsetof(Row, entrytype), sizeof Row::entrytype, COLUMN_CHARACTER},
+        {"ENTRYCLASS", offsetof(Row, entryclass), sizeof Row::entryclass, COLUMN_CHARACTER},
+        {"ENTRYDESC", offsetof(Row, entrydesc), sizeof Row::entrydesc, COLUMN_CHARACTER},
+        {"UENTRYSRC", offsetof(Row, uentrysrc), sizeof Row::uentrysrc, COLUMN_UTF8},
+        {"UENTRYDESC", offsetof(Row, uentrydesc), sizeof Row::uentrydesc, COLUMN_UTF8},
+    }};
+    return *columns; // never destroyed: threads outlive main
+}
+
+/// A scan directive in its two parts: the literal text in front, and the conversion.
+struct Parts {
+    explicit Parts(std::string_view directive) {
+        std::size_t at = 0;
+        while (at < directive.size() && (directive[at] != '%' || directive.substr(at, 2) == "%%")) {
+            at += directive[at] == '%' ? 2 : 1;
+        }
+        literal = directive.substr(0, at);
+        conversion = directive.substr(at);
+        if (conversion.ends_with(kCount)) {
+            conversion.remove_suffix(kCount.size());
+        }
+    }
+    std::string_view literal;
+    std::string_view conversion;
+};
+
+/// Why a line does not fit a directive.
+std::string mismatch(const StringParser& directive, const StringParser::Place& place,
+                     bool isAtEnd) {
+    const Parts parts(directive.scanDirective());
+    if (!place.isInside) {
+        return "The line ends before column " + std::to_string(directive.offset() + 1) +
+               ", where this field begins.";
+    }
+    const std::string where = isAtEnd ? "The line ends here; " : "";
+    if (!place.isLiteralMatched) {
+        return where + "the text \"" + std::string(parts.literal) +
+               "\" of the format does not stand here.";
+    }
+    const char code = parts.conversion.empty() ? '\0' : parts.conversion.back();
+    std::string wanted = "a text for " + std::string(parts.conversion);
+    if (std::strchr("diouxefg", code) != nullptr && code != '\0') {
+        wanted = "a number for " + std::string(parts.conversion);
+    } else if (code == ']') {
+        wanted = "a character of the set in " + std::string(parts.conversion);
+    }
+    return where + wanted + " is expected here.";
+}
+
+/// Why a format without a message of the agent cannot be learned.
+std::string refusal(const std::string& format, std::size_t position) {
+    if (position >= format.size()) {
+        return "The format ends too early: a double quote or the rest of a directive is missing.";
+    }
+    return format[position] == '"' ? "The format has no directive between its double quotes."
+                                   : "A directive, with the text in front of it, is too long: more "
+                                     "than 253 characters.";
+}
+
+std::string capitalised(std::string text) {
+    if (!text.empty() && text[0] >= 'a' && text[0] <= 'z') {
+        text[0] = static_cast<char>(text[0] - 'a' + 'A');
+    }
+    return text;
+}
+
+} // namespace
+
+FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_format(format, log) {
+    TraceScope trace(anchor);
+    const std::size_t lineEnd = std::min(format.find('\n'), format.find('\0'));
+    if (lineEnd != std::string_view::npos) {
+        refuse("A configuration line holds neither line ends nor NUL characters.", lineEnd);
+        return;
+    }
+    const std::size_t length = m_format.line().size();
+    if (length > ConfiguredFormat::kMostInLine) {
+        refuse("The configuration line would have " + std::to_string(length) +
+                   " characters; the agent reads lines of up to 1022.",
+               std::nullopt);
+        return;
+    }
+    learn();
+}
+
+FormatTrial::~FormatTrial() = default;
+
+void FormatTrial::refuse(std::string reason, std::optional<std::size_t> position) {
+    m_result.reason = std::move(reason);
+    m_result.position = position;
+}
+
+void FormatTrial::learn() {
+    TraceScope trace(anchor);
+    TraceCapture errors;
+    auto format = std::make_unique<StringParser>(m_format.text().c_str(), UserLogFile::fields());
+    if (format->status() != OBJECT_FORMAT_LEARNED) {
+        std::string reason = errors.take();
+        const std::size_t position = format->learnedTo();
+        refuse(reason.empty() ? refusal(m_format.text(), position) : std::move(reason),
+               m_format.original(position));
+        return;
+    }
+    m_log = std::make_unique<TrialLog>(std::move(format));
+    m_result.accepted = true;
+    m_result.configurationLine = m_format.line();
+    describeDirectives();
+}
+
+void FormatTrial::describeDirectives() {
+    const StringParser& format = m_log->format();
+    std::size_t last = format.learnedTo();
+    for (const StringParser* node = format.next(); node != nullptr; node = node->next()) {
+        const std::size_t from = last + node->distanceToBegin();
+        last += node->distanceToEnd();
+        Directive directive{m_format.text().substr(from, last + 1 - from), m_format.original(from),
+                            m_format.original(last) + 1, "", ""};
+        if (!node->isSuppressed()) {
+            directive.field = node->fieldName();
+            directive.column = columnOfField[node->printIndex()];
+        }
+        m_result.directives.push_back(std::move(directive));
+    }
+}
+
+FormatTrial::Line FormatTrial::scan(std::string_view line) {
+    return scanPiece((std::string(line) + '\n').substr(0, kPiece));
+}
+
+/// `piece` is a line as the agent reads it, with its line end where it has one.
+FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
+    TraceScope trace(anchor);
+    TraceCapture errors;
+    Line line;
+    line.line = piece.ends_with('\n') ? piece.substr(0, piece.size() - 1) : piece;
+    const auto row = std::make_unique<Row>();
+    line.matched = m_log->formatEntryAsRow(piece.data(), row.get(), nullptr) == 0;
+    std::string messages = errors.take();
+    explain(piece.c_str(), line);
+    if (line.matched) {
+        std::string room;
+        for (const RowColumn& column : entryColumns()) {
+            line.row.emplace_back(
+                column.name, RowText::of(column, reinterpret_cast<const char*>(row.get()), room));
+        }
+    }
+    if (line.matched || line.reason.empty()) {
+        line.reason = std::move(messages);
+    }
+    return line;
+}
+
+/// Goes through the directives one by one, as the scan does, up to the one that does not fit.
+void FormatTrial::explain(const char* text, Line& line) const {
+    if (text[0] != '\0' && text[1] == '\0') {
+        line.failedAt = 0;
+        line.reason = "A line without text is passed over.";
+        return;
+    }
+    std::size_t position = 0;
+    std::size_t index = 0;
+    std::string value(kMostValue, '\0');
+    for (const StringParser* node = m_log->format().next(); node != nullptr;
+         node = node->next(), ++index) {
+        const StringParser::Place place = node->locate(text, position);
+        if (!place.isMatched) {
+            const bool isAtEnd = text[place.value] == '\0' || text[place.value] == '\n';
+            line.failedAt = std::min(place.value, line.line.size());
+            line.directive = index;
+            line.reason = capitalised(mismatch(*node, place, isAtEnd));
+            return;
+        }
+        position = place.end;
+        if (!node->isSuppressed()) {
+            _FormatBuffer buffer{value.data(), static_cast<long>(value.size())};
+            node->printValue(buffer);
+            const Directive& directive = m_result.directives[index];
+            const std::size_t length = line.line.size(); // a value may take the line end
+            line.fields.push_back(
+                {std::min(place.value, length), std::min(place.end, length), directive.field,
+                 directive.column,
+                 value.substr(0, value.size() - static_cast<std::size_t>(buffer.room)), index});
+        }
+    }
+}
+
+FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<std::string>& lines,
+                                     std::string_view log) {
+    TraceScope trace(anchor);
+    FormatTrial trial(format, log);
+    Result result = trial.result();
+    if (!result.accepted) {
+        return result;
+    }
+    for (const std::string& line : lines) {
+        const std::string whole = line + '\n';
+        for (std::size_t at = 0; at < whole.size(); at += kPiece) {
+            result.lines.push_back(trial.scanPiece(whole.substr(at, kPiece)));
+            result.matched += result.lines.back().matched ? 1 : 0;
+        }
+    }
+    return result;
+}
+
+double FormatTrial::percent(const Result& result) noexcept {
+    if (result.lines.empty()) {
+        return 0;
+    }
+    // Rounded down: only when all lines fit it says 100.
+    return std::floor(1000.0 * static_cast<double>(result.matched) /
+                      static_cast<double>(result.lines.size())) /
+           10.0;
+}

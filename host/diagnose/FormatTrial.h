@@ -1,0 +1,97 @@
+#ifndef ZRM_HOST_FORMAT_TRIAL_H
+#define ZRM_HOST_FORMAT_TRIAL_H
+
+#include "host/diagnose/ConfiguredFormat.h"
+
+#include <cstddef>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+class TrialLog;
+
+/// Tries a format specifier on lines: the agent's own parser learns and scans, so what it says is
+/// what monitoring does; nothing is monitored. Works without an agent; the process's locale counts
+/// as the agent's would. One thread at a time.
+class FormatTrial {
+public:
+    /// A learned directive; places are bytes of the format.
+    struct Directive {
+        std::string text;
+        std::size_t from;
+        std::size_t to;     ///< behind its last byte
+        std::string field;  ///< the name in the format; empty for one that is read and forgotten
+        std::string column; ///< the column that it feeds; empty as above
+    };
+    /// A value in a line; places are bytes of the line.
+    struct Field {
+        std::size_t from;
+        std::size_t to;
+        std::string name;
+        std::string column;
+        std::string value;     ///< as it is printed into the column
+        std::size_t directive; ///< index of its directive
+    };
+    struct Line {
+        std::string line; ///< without its line end
+        bool matched = false;
+        std::vector<Field> fields; ///< those in front of the failure, too
+        std::vector<std::pair<std::string, std::string>> row; ///< column and text, when matched
+        std::optional<std::size_t> failedAt;                  ///< byte at which it stops fitting
+        std::optional<std::size_t> directive;                 ///< index of the one that fails
+        std::string reason; ///< why it does not fit; of a line that fits: what its time lacks
+    };
+    struct Result {
+        bool accepted = false;
+        std::string reason;                  ///< why the format is refused
+        std::optional<std::size_t> position; ///< the byte of the format that is wrong
+        std::vector<Directive> directives;
+        std::vector<Line> lines;
+        std::size_t matched = 0;
+        std::string configurationLine; ///< empty when the format is refused
+    };
+
+    /// Learns a format as it stands in a configuration line behind its third ';'. `log` is the
+    /// log's path, for the configuration line.
+    explicit FormatTrial(std::string_view format, std::string_view log = kSomeLog);
+    FormatTrial(const FormatTrial&) = delete;
+    FormatTrial& operator=(const FormatTrial&) = delete;
+    ~FormatTrial();
+
+    bool isAccepted() const noexcept { return m_result.accepted; }
+    /// What there is to say of the format, without lines.
+    const Result& result() const noexcept { return m_result; }
+
+    /// Tries one line, given without its line end; of more than 2046 bytes the beginning. The
+    /// format must have been accepted.
+    Line scan(std::string_view line);
+
+    /// Learns a format and tries it on lines. A line of more than 2046 bytes becomes several, as
+    /// it does when it is monitored.
+    static Result run(std::string_view format, const std::vector<std::string>& lines,
+                      std::string_view log = kSomeLog);
+
+    /// The share of lines that fit, in percent with one decimal; 0 without lines.
+    static double percent(const Result& result) noexcept;
+    /// A result as the JSON object that the API answers. Where a line is no UTF-8, its places are
+    /// those of the text shown.
+    static std::string json(const Result& result);
+
+    static constexpr std::string_view kSomeLog = "/path/to/the.log";
+
+private:
+    void learn();
+    void refuse(std::string reason, std::optional<std::size_t> position);
+    void describeDirectives();
+    void explain(const char* text, Line& line) const;
+    Line scanPiece(std::string piece);
+
+    ConfiguredFormat m_format;
+    std::unique_ptr<TrialLog> m_log;
+    Result m_result;
+};
+
+#endif

@@ -1,0 +1,93 @@
+#include "host/diagnose/LastLines.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <string_view>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+class Descriptor {
+public:
+    // A pipe in the file's place must not hold the caller up.
+    explicit Descriptor(const char* path) : m_fd(::open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK)) {}
+    ~Descriptor() {
+        if (m_fd >= 0) {
+            const int error = errno;
+            ::close(m_fd);
+            errno = error;
+        }
+    }
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    int get() const noexcept { return m_fd; }
+
+private:
+    int m_fd;
+};
+
+/// The bytes from an offset on, as many as there are; none, with errno, on an error.
+std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
+    std::string text(size, '\0');
+    std::size_t length = 0;
+    while (length < size) {
+        const ssize_t count =
+            ::pread(fd, text.data() + length, size - length, offset + static_cast<off_t>(length));
+        if (count < 0 && errno == EINTR) {
+            continue;
+        }
+        if (count < 0) {
+            return std::nullopt;
+        }
+        if (count == 0) {
+            break; // the file has become shorter
+        }
+        length += static_cast<std::size_t>(count);
+    }
+    text.resize(length);
+    return text;
+}
+
+} // namespace
+
+std::optional<std::vector<std::string>> LastLines::read(const std::string& path,
+                                                        std::size_t count) {
+    const Descriptor file(path.c_str());
+    struct stat status;
+    if (file.get() < 0 || ::fstat(file.get(), &status) != 0) {
+        return std::nullopt;
+    }
+    if (!S_ISREG(status.st_mode)) {
+        errno = EINVAL;
+        return std::nullopt;
+    }
+    const auto size = std::min(static_cast<std::size_t>(status.st_size), kMostBytes);
+    const off_t offset = status.st_size - static_cast<off_t>(size);
+    const std::optional<std::string> text = readFrom(file.get(), offset, size);
+    if (!text) {
+        return std::nullopt;
+    }
+    std::string_view rest = *text;
+    if (rest.ends_with('\n')) {
+        rest.remove_suffix(1);
+    } else if (rest.empty()) {
+        return std::vector<std::string>();
+    }
+    std::vector<std::string> lines;
+    while (lines.size() < count) {
+        const std::size_t before = rest.rfind('\n');
+        if (before == std::string_view::npos) {
+            if (offset == 0) { // else the line's beginning was not read
+                lines.emplace_back(rest);
+            }
+            break;
+        }
+        lines.emplace_back(rest.substr(before + 1));
+        rest.remove_suffix(rest.size() - before);
+    }
+    std::reverse(lines.begin(), lines.end());
+    return lines;
+}

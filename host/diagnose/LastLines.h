@@ -1,0 +1,20 @@
+#ifndef ZRM_HOST_LAST_LINES_H
+#define ZRM_HOST_LAST_LINES_H
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <vector>
+
+/// The end of a text file. Stateless.
+class LastLines {
+public:
+    static constexpr std::size_t kMostBytes = std::size_t{4} << 20; ///< that are read at most
+
+    /// The last lines of a regular file, at most `count`, the oldest first and without their line
+    /// ends; fewer when they have more than kMostBytes. None, with errno, when it cannot be read.
+    /// Any thread.
+    static std::optional<std::vector<std::string>> read(const std::string& path, std::size_t count);
+};
+
+#endif

@@ -1,0 +1,45 @@
+#ifndef ZRM_HOST_LOG_LEDGER_VIEW_H
+#define ZRM_HOST_LOG_LEDGER_VIEW_H
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+/// What the monitor of one log has read and what it has passed over, since the log is monitored,
+/// at one moment. A refresh that changes the log's type or procedure begins a new one. Times are
+/// in milliseconds since 1970-01-01 UTC.
+struct LogLedgerView {
+    /// A line that did not fit; its bytes, without the line end.
+    struct Rejected {
+        std::int64_t time;
+        std::string line;
+        std::string reason; ///< where it stops fitting and why
+    };
+    /// Bytes that were not read, since the log had become shorter and was followed from its new
+    /// end on.
+    struct Skipped {
+        std::int64_t time;
+        std::int64_t from;
+        std::int64_t to;
+    };
+
+    std::string log;  ///< the whole path, in UTF-8
+    std::string file; ///< the same in the process's code page
+    char type = 'S';
+    std::string procedure; ///< a user log's format
+    std::int64_t bytesRead = 0;
+    std::int64_t lines = 0;
+    std::int64_t rows = 0;
+    std::int64_t formatErrors = 0;
+    std::int64_t truncations = 0;
+    std::int64_t skippedBytes = 0;
+    std::int64_t restarts = 0; ///< of the monitor
+    std::optional<std::int64_t> lastEntry;
+
+    // The latest, the oldest first. Only of a log that was asked for by name.
+    std::vector<Rejected> rejected;
+    std::vector<Skipped> skipped;
+};
+
+#endif

@@ -1,0 +1,8 @@
+#include "host/diagnose/TrialLog.h"
+
+#include "logmgr/ValidLog.h"
+
+std::unique_ptr<ValidLog> TrialLog::noLine() {
+    char line[] = "";
+    return std::make_unique<ValidLog>(CONFIG_USER, line, nullptr);
+}
