@@ -182,6 +182,9 @@ FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
     if (line.matched || line.reason.empty()) {
         line.reason = std::move(messages);
     }
+    if (!line.matched && line.reason.empty()) {
+        line.reason = "The format prints no field, so that no line gives a row.";
+    }
     return line;
 }
 

@@ -40,8 +40,9 @@ public:
         bool matched = false;
         std::vector<Field> fields; ///< those in front of the failure, too
         std::vector<std::pair<std::string, std::string>> row; ///< column and text, when matched
-        std::optional<std::size_t> failedAt;                  ///< byte at which it stops fitting
-        std::optional<std::size_t> directive;                 ///< index of the one that fails
+        /// Byte at which it stops fitting; none where the directives fit and there is no row yet.
+        std::optional<std::size_t> failedAt;
+        std::optional<std::size_t> directive; ///< index of the one that fails
         std::string reason; ///< why it does not fit; of a line that fits: what its time lacks
     };
     struct Result {

@@ -1,0 +1,97 @@
+"""POST /api/v1/try: a format on lines, judged by the agent's own parser."""
+
+import pytest
+from api import Api
+
+FORMAT = 'A , "%d-%d-%d %d:%d:%d %s %64[^:]: %256[^\\n]" , year month day hour minute second type source description'
+LINE = "2026-11-20 07:03:09 ERROR payment: Card declined"
+
+
+@pytest.fixture
+def serving(agent):
+    agent.listen = "127.0.0.1:0"
+    agent.watched = agent.log(
+        "user.log", b"".join(b"%d number %d\n" % (day, day) for day in range(1, 30)), ' ;N ;U ;A , "%d %s" , day type'
+    )
+    agent.start()
+    agent.api = Api(agent)
+    return agent
+
+
+def attempt(agent, status=200, **body):
+    got, _, answer = agent.api.request("POST", "/api/v1/try", body)
+    assert got == status, answer
+    return answer
+
+
+def test_a_line_that_fits(serving):
+    answer = attempt(serving, format=FORMAT, lines=[LINE])
+    assert answer["accepted"] and answer["reason"] is None and answer["position"] is None
+    assert answer["coverage"] == {"lines": 1, "matched": 1, "percent": 100.0}
+    assert answer["configuration_line"] == "/path/to/the.log ;N ;U ;" + FORMAT
+    for directive in answer["directives"]:
+        assert FORMAT[directive["from"] : directive["to"]] == directive["text"]
+    assert [each["column"] for each in answer["directives"]] == ["ENTRYTIME"] * 6 + [
+        "ENTRYTYPE",
+        "ENTRYSRC",
+        "ENTRYDESC",
+    ]
+    (line,) = answer["lines"]
+    assert line["row"]["ENTRYTIME"] == "1261120070309000"
+    assert line["row"]["ENTRYDESC"] == "Card declined"
+    assert {LINE[each["from"] : each["to"]] for each in line["fields"]} >= {"ERROR", "payment"}
+
+
+def test_a_line_that_does_not_fit(serving):
+    (line,) = attempt(serving, format=FORMAT, lines=["2026-11-20 07:03 ERROR"])["lines"]
+    assert not line["matched"] and line["row"] is None
+    assert (line["failed_at"], line["directive"]) == (16, 5)
+    assert line["reason"] == 'The text ":" of the format does not stand here.'
+    assert len(line["fields"]) == 5
+
+
+def test_a_format_that_is_refused_leaves_the_trace_alone(serving):
+    before = serving.trace("convcode")
+    answer = attempt(serving, format='A , "%d %q" , day', lines=[LINE])
+    assert not answer["accepted"]
+    assert answer["position"] == 9
+    assert answer["reason"].startswith("Invalid convcode or receiving variable size specified")
+    assert answer["lines"] == [] and answer["configuration_line"] is None
+    assert serving.trace("convcode") == before
+
+
+def test_the_last_lines_of_a_monitored_log(serving):
+    answer = attempt(
+        serving, format='A , "%d %*s %d" , day class', log=str(serving.watched), last=3
+    )
+    assert [each["line"] for each in answer["lines"]] == [f"{day} number {day}" for day in (27, 28, 29)]
+    assert answer["coverage"]["percent"] == 100.0
+    assert answer["configuration_line"].startswith(f"{serving.watched} ;N ;U ;A")
+
+
+@pytest.mark.parametrize(
+    "body, field",
+    [
+        ({}, "format"),
+        ({"format": 1}, "format"),
+        ({"format": "A", "lines": "x"}, "lines"),
+        ({"format": "A", "lines": ["x"] * 1001}, "lines"),
+        ({"format": "A", "lines": ["x", "x" * 16385]}, "lines[1]"),
+        ({"format": "A", "lines": ["a\nb"]}, "lines[0]"),
+        ({"format": "A", "lines": ["x"], "log": "/x", "last": 1}, "last"),
+        ({"format": "A", "last": 1}, "log"),
+        ({"format": "A", "log": "/etc/passwd", "last": 1}, "log"),
+        ({"format": "A", "log": "", "last": 1}, "log"),
+        ({"format": "A", "log": "/x", "last": 1001}, "last"),
+        ({"format": "A", "more": 1}, "more"),
+    ],
+)
+def test_what_cannot_be_tried(serving, body, field):
+    assert attempt(serving, 400, **body)["field"] == field
+
+
+def test_odd_names_and_formats(serving):
+    for text in ("'; DROP TABLE x; --", "\u00e9\U0001f600", '"\\', "%", "${@}" * 200, "x" * 5000):
+        answer = attempt(serving, format=f'A , "{text}%s" , type', lines=[text, ""], log="/\u00e9 \"'")
+        assert answer["coverage"]["lines"] in (0, 2, 3, 4)
+    assert serving.running()
