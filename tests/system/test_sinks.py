@@ -76,6 +76,23 @@ def test_a_receiver_that_comes_late_gets_everything(agent, log):
     assert agent.stop() == 0
 
 
+def test_a_receiver_that_was_down_for_a_whole_run_gets_everything_after_a_restart(agent, log):
+    port = free_port()
+    agent.more_sinks.append({"type": "webhook", "url": f"http://127.0.0.1:{port}", "name": "down"})
+    agent.start()
+    append(log, 1, 3000)  # more than the queue holds: the logs do not wait for the sink
+    first = agent.wait_events(3000)
+    assert agent.stop() == 0
+    with Receiver(port) as receiver:
+        agent.start()
+        append(log, 3001, 3010)
+        events = wait_for(receiver, 3010, agent)
+        assert agent.stop() == 0
+    assert descriptions(events) == entries(1, 3010)
+    assert events[:3000] == first
+    assert all(len(request.json["events"]) <= 100 for request in receiver.taken)
+
+
 def test_nothing_is_lost_or_out_of_order_while_a_receiver_fails_in_every_way(agent, log):
     turns = [200, 500, ConnectionResetError(), 400, 200, 503, 302]
     count = 0
