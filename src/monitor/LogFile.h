@@ -51,8 +51,8 @@ public:
     virtual long readLog();
 
     void startThread();
-    /// Lets a running monitor end by itself, so that stopThread waits less: each thread looks at its
-    /// status once a second, and many are to end at once.
+    /// Lets a running monitor end by itself, so that stopThread waits less: each thread looks at
+    /// its status once a second, and many are to end at once.
     void askToStop() noexcept;
     /// Ends the monitoring thread and joins it; at once when no thread was ever started.
     void stopThread();
