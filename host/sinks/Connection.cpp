@@ -30,6 +30,7 @@ Connection::Connection(ListenAddress receiver, Transport transport,
     : m_receiver(std::move(receiver)), m_transport(transport), m_timeout(timeout) {}
 
 Connection::~Connection() {
+    closeIfBroken(); // with something unread, the system would throw away what is still to be sent
     close();
 }
 

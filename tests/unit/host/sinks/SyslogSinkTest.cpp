@@ -8,7 +8,7 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <functional>
+#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
@@ -209,6 +209,19 @@ TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
     connection.write("hello\r\n");
     EXPECT_EQ(deliver(sink, 1, 1), 1u);
     EXPECT_EQ(connection.read(frames(0, 2).size()), frames(0, 2));
+}
+
+TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidSomething) {
+    const Socket listener(SOCK_STREAM);
+    for (int count = 0; count < 300; ++count) {
+        events.add({.description = std::string(1500, 'x')});
+    }
+    auto sink = std::make_unique<SyslogSink>(config(listener.port));
+    EXPECT_EQ(deliver(*sink, 0, 303), 303u);
+    const Socket connection(listener);
+    connection.write("hello\r\n");
+    sink.reset();
+    EXPECT_EQ(connection.read(frames(0, 303).size()), frames(0, 303));
 }
 
 TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
