@@ -15,6 +15,7 @@ import re
 from pathlib import Path
 
 import cases
+import scaling
 import table
 
 LINES = 2_000_000
@@ -33,6 +34,7 @@ def parse_arguments():
     parser.add_argument("--directory", default=None, help="where the logs are written")
     parser.add_argument("--save", help="write the results to this file")
     parser.add_argument("--compare", help="show the change against this saved run")
+    parser.add_argument("--scaling", action="store_true", help="how cost grows, in place of the cases")
     parser.add_argument("--markdown", help="put the table into this file, between its marks")
     options = parser.parse_args()
     options.wants = lambda name: re.search(options.only, name) is not None
@@ -41,6 +43,11 @@ def parse_arguments():
 
 def main():
     options = parse_arguments()
+    if options.scaling:
+        text = scaling.run(options)
+        if options.markdown:
+            table.write_markdown(options.markdown, text, scaling.BEGIN, scaling.END)
+        return
     saved = {}
     if options.compare:
         saved = {r["case"]: r for r in json.loads(Path(options.compare).read_text())}
