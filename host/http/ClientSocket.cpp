@@ -95,8 +95,8 @@ bool ClientSocket::send(std::string_view bytes, Clock::time_point deadline) {
         }
         const bool stops = m_stop.isRaised();
         const auto limit = std::min(deadline, progress + (stops ? noProgressAtTheEnd : noProgress));
-        // A stop that comes during the wait brings the limit forward.
-        if (!wait(wanted, limit, !stops) && (stops || !m_stop.isRaised())) {
+        // A stop that comes during the wait ends it, and brings the limit forward.
+        if (!wait(wanted, limit, !stops) && Clock::now() >= limit) {
             return false;
         }
     }

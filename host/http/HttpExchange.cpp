@@ -231,11 +231,13 @@ bool HttpExchange::Engine::serve(ClientConnection& connection) {
     return isServed && !isLast && exchange.isBodyRead && !stream.isBroken();
 }
 
-HttpExchange::HttpExchange(RequestDispatcher& dispatcher, std::stop_token stop) {
-    const BrokenPipeAction brokenPipe;
-    m_engine = std::make_unique<Engine>(dispatcher, std::move(stop));
-    brokenPipe.restore();
-}
+HttpExchange::HttpExchange(RequestDispatcher& dispatcher, std::stop_token stop)
+    : m_engine([&] {
+          const BrokenPipeAction brokenPipe;
+          auto engine = std::make_unique<Engine>(dispatcher, std::move(stop));
+          brokenPipe.restore();
+          return engine;
+      }()) {}
 
 HttpExchange::~HttpExchange() = default;
 
