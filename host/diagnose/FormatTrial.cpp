@@ -118,7 +118,10 @@ FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_form
     learn();
 }
 
-FormatTrial::~FormatTrial() = default;
+FormatTrial::~FormatTrial() {
+    const TraceCapture quiet; // the end of a log is traced, too
+    m_log.reset();
+}
 
 void FormatTrial::refuse(std::string reason, std::optional<std::size_t> position) {
     m_result.reason = std::move(reason);

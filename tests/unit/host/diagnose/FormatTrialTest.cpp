@@ -2,6 +2,7 @@
 
 #include "agent/zrmmain.h"
 #include "host/framework/TraceCapture.h"
+#include "host/framework/TraceControl.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 #include "support/TemporaryDirectory.h"
@@ -10,6 +11,7 @@
 #include <gmock/gmock.h>
 
 #include <cstdlib>
+#include <filesystem>
 #include <iostream>
 #include <map>
 #include <random>
@@ -220,6 +222,18 @@ TEST(FormatTrial, PlacesOfALineThatIsNoUtf8AreThoseOfWhatIsShown) {
     EXPECT_THAT(json, HasSubstr("\"line\":\"\uFFFD\uFFFD x\""));
     EXPECT_THAT(json, HasSubstr("\"failed_at\":7,"));
     EXPECT_THAT(json, HasSubstr("{\"from\":0,\"to\":6,\"name\":\"type\""));
+}
+
+TEST(FormatTrial, LeavesTheTraceAlone) {
+    const TemporaryDirectory directory;
+    TraceControl::openFile(directory.file("trace"));
+    TraceControl::configure("error+detail+fine");
+    FormatTrial::run(R"(A , "%d" , day)", {"1", "word"});
+    FormatTrial::run(R"(A , "%q" , day)", {});
+    TraceControl::configure("error");
+    TraceControl::openFile("");
+    EXPECT_FALSE(std::filesystem::exists(directory.file("trace")) &&
+                 std::filesystem::file_size(directory.file("trace")) > 0);
 }
 
 TEST(FormatTrial, WritesJson) {
