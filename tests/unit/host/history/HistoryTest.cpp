@@ -70,6 +70,8 @@ protected:
         const std::uint64_t last = history->newest() + static_cast<std::uint64_t>(count);
         push(count);
         EXPECT_GE(history->waitBeyond(last - 1, Clock::now() + 10s, {}), last);
+        // The room in the queue is given back after the events are known.
+        EXPECT_TRUE(eventually([&] { return queue->state().size == 0; }));
     }
     static bool eventually(const std::function<bool()>& condition) {
         const auto limit = Clock::now() + 10s;
