@@ -33,7 +33,7 @@ api = _load("zrm_api", SYSTEM / "api.py")
 if _this is not None:
     sys.modules["conftest"] = _this
 
-PATIENCE = 30
+PATIENCE = 15
 
 
 def until(condition, what, seconds=PATIENCE):

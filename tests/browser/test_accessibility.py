@@ -70,9 +70,11 @@ return faults;
 @pytest.fixture
 def console(page, agent):
     auth = agent.log("auth.log", content=history_of(5))
-    agent.configure(f"{agent.directory}/missing.log", append=True)
+    agent.log("broken.log", fields=';N ;U ;A , "%q" , year')
     agent.situation("ssh-failed", log=auth, when=["ENTRYDESC contains 'Failed password'"], severity="critical")
-    agent.start()
+    agent.start(wait=False)  # the broken log is never opened
+    agent.wait_trace("Agent server is listening; signal sent.")
+    agent.wait_open(auth)
     fill_history(agent, auth, 2)
     return page.on(agent)
 

@@ -15,10 +15,17 @@ FIRST_VIEW_BYTES = 100_000
 def logs_agent(agent):
     auth = agent.log("auth.log", content=history_of(40))
     app = agent.log("app.log", fields=';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description')
-    agent.configure(f"{agent.directory}/missing.log ;N ;U ;A , \"%d\" , year", append=True)
+    agent.log("broken.log", fields=';N ;U ;A , "%q" , year')
     agent.situation("ssh-failed", log=auth, when=["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"], severity="critical", text="A failed SSH login")
-    agent.start()
+    begin(agent, auth, app)
     return auth, app
+
+
+def begin(agent, *logs):
+    agent.start(wait=False)  # the broken log is never opened
+    agent.wait_trace("Agent server is listening; signal sent.")
+    for log in logs:
+        agent.wait_open(log)
 
 
 # ---------------------------------------------------------------------- token and frame
@@ -68,7 +75,7 @@ def test_the_first_view_is_small_and_runs_only_files_of_its_own(page, agent):
 
 
 def test_a_lost_connection_shows_and_comes_back(page, agent):
-    logs_agent(agent)
+    logs = logs_agent(agent)
     page.on(agent)
     page.wait_text("Connected")
     port = page.api.port
@@ -76,7 +83,7 @@ def test_a_lost_connection_shows_and_comes_back(page, agent):
     page.wait_text("The connection to the agent is lost", 15)
     page.pictures("connection-lost")
     agent.listen = f"127.0.0.1:{port}"
-    agent.start()
+    begin(agent, *logs)
     page.wait_text("The connection to the agent is back", 40)
     until(lambda: "is lost" not in page.text(), "the banner to go")
     page.driver.get_log("browser")
@@ -90,10 +97,10 @@ def test_logs_tell_trouble_first_and_why(page, agent):
     app.append("2026-11-20 07:03:09 ERROR fine\nthis does not fit\n")
     page.on(agent)
     page.wait_text("1 in trouble")
-    page.wait_text("The file cannot be opened")
+    page.wait_text("The format of this log cannot be learned")
     page.wait_text("1 line does not fit the format")
     first = page.find("//table//tbody/tr[1]").text
-    assert "missing.log" in first and "Error" in first
+    assert "broken.log" in first and "Error" in first
     page.pictures("logs")
     page.find("//input[@aria-label='Find a log']").send_keys("auth")
     until(lambda: len(page.all("tbody tr")) == 1, "one log")
@@ -158,7 +165,7 @@ def test_events_come_live_pause_and_open(page, agent):
 
 
 def test_events_resume_where_they_were_after_a_lost_connection(page, agent):
-    auth, _ = logs_agent(agent)
+    auth, app = logs_agent(agent)
     page.on(agent, "events")
     until(lambda: "Live" in page.text(), "the stream")
     auth.append(failed_login(1))
@@ -166,7 +173,7 @@ def test_events_resume_where_they_were_after_a_lost_connection(page, agent):
     agent.listen = f"127.0.0.1:{page.api.port}"
     agent.stop()
     page.wait_text("Not live")
-    agent.start()
+    begin(agent, auth, app)
     auth.append(failed_login(2))
     page.wait_text("203.0.113.2", 60)
     assert page.text().count("203.0.113.1 ") == 1

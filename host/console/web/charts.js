@@ -20,11 +20,11 @@ function load() {
 
 const colour = (name) => getComputedStyle(document.documentElement).getPropertyValue(name).trim();
 
-function summary(values, label, minuteOf) {
+function summary(values, label, minuteOf, minutes) {
   const known = values.filter((value) => value !== null);
   if (known.length === 0) return `${label}: nothing known yet`;
   const most = Math.max(...known);
-  const total = known.reduce((sum, value) => sum + value, 0);
+  const total = known.reduce((sum, value) => sum + value, 0) * minutes;
   return `${label}: ${number(total)} in all, at most ${number(most)} per minute${most > 0 ? ` at ${minuteOf(values.indexOf(most))}` : ""}`;
 }
 
@@ -35,13 +35,13 @@ export async function drawRates(holder, rates, series) {
   const perMinute = (values) => values.map((value) => (value === null ? null : (value * 60) / rates.step));
   const entries = perMinute(series.entries);
   const events = perMinute(series.events);
-  const text = `${summary(entries, "Entries", minuteOf)}. ${summary(events, "Events", minuteOf)}.`;
+  const text = `${summary(entries, "Entries", minuteOf, rates.step / 60)}. ${summary(events, "Events", minuteOf, rates.step / 60)}.`;
   const canvas = h("canvas", { role: "img", "aria-label": `Entries and events per minute. ${text}` });
   holder.replaceChildren(h("div", { className: "chart" }, canvas), h("p", { className: "hint" }, text));
   const Chart = await load();
   if (!canvas.isConnected) return () => {};
   const line = (label, data, name) => ({
-    label, data, borderColor: colour(name), backgroundColor: colour(name), borderWidth: 1.5, pointRadius: 0, pointHitRadius: 6, tension: 0,
+    label, data, borderColor: colour(name), backgroundColor: colour(name), borderWidth: 1.5, pointRadius: ({ dataIndex: at }) => ((data[at - 1] ?? null) === null && (data[at + 1] ?? null) === null ? 2 : 0), pointHitRadius: 6, tension: 0,
   });
   const axis = { grid: { color: colour("--line") }, ticks: { color: colour("--quiet"), maxRotation: 0, autoSkipPadding: 24 } };
   const chart = new Chart(canvas, {
