@@ -7,7 +7,8 @@ import { plural, stamp } from "../format.js";
 const START = 'A , "%d-%d-%d %d:%d:%d %s %64[^:]: %256[^\\n]" , year month day hour minute second type source description';
 const SAMPLE = "2026-11-20 07:03:09 ERROR payment: Card declined for order 4711\n2026-11-20 07:03:10 INFO web: Request served";
 const COLUMNS = [["ENTRYTIME", "Time"], ["ENTRYSYS", "System"], ["ENTRYSRC", "Source"], ["ENTRYTYPE", "Type"], ["ENTRYCLASS", "Class"], ["ENTRYDESC", "Description"]];
-const COLOURS = 8;
+// The parts of the time share a colour; the other fields have one each.
+const COLOURS = { system: "f1", source: "f2", type: "f3", class: "f4", description: "f5" };
 const MOST_LINES = 200;
 
 export async function show(element, query) {
@@ -78,6 +79,7 @@ class TryPage {
   }
 
   #configuration(answer) {
+    if (!answer.configuration_line) return null;
     const path = this.takenFrom || this.log.value || "/path/to/the.log";
     const text = answer.configuration_line.replace(/^\S+/, path);
     const said = h("span", { role: "status", className: "hint" });
@@ -113,11 +115,10 @@ class Offsets {
   }
 }
 
-const fieldNames = (directives) => [...new Set(directives.map((one) => one.column).filter(Boolean))];
+const fieldNames = (directives) => [...new Set(directives.map((one) => one.field).filter(Boolean))];
 
 function colourOf(names, name) {
-  const index = names.indexOf(name);
-  return index < 0 ? "forgotten" : `f${index % COLOURS}`;
+  return names.includes(name) ? COLOURS[name] || "f0" : "forgotten";
 }
 
 function coverage({ lines, matched, percent }, names) {
