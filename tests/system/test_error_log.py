@@ -20,6 +20,9 @@ ENDLESS = f"while :; do echo '{ENTRY}'; done"
 # Writes the header, then what is and will be in the file "entries".
 FOLLOW = f"echo '{HEADER}'; exec tail -n +1 -s 0.05 -f entries"
 
+# An entry that comes before the situations are open raises no event.
+AWAIT_SITUATIONS = "until [ -e situations-open ]; do sleep 0.02; done"
+
 # Beside the errors: what becomes of the children.
 TRACE = "error,LogManager=error+detail,ErrLogFileChild=error+detail"
 
@@ -59,7 +62,7 @@ class ErrorLog:
             "#!/bin/sh\n"
             f"cd {self.agent.directory}\n"
             'case "$*" in\n'
-            f'-c*) echo "$$ $*" >> calls; {following};;\n'
+            f'-c*) echo "$$ $*" >> calls; {AWAIT_SITUATIONS}; {following};;\n'
             f'*) echo "$$ $*" >> report-calls; {reporting};;\n'
             "esac\n"
         )
@@ -114,8 +117,11 @@ def log(agent, uname_aix):
 
 def start(agent, **keys):
     """The agent does not open an error log itself: it is up when it listens."""
+    situations_open = agent.directory / "situations-open"
+    situations_open.unlink(missing_ok=True)
     agent.start(wait=False, trace=TRACE, **keys)
     agent.wait_trace("Agent server is listening; signal sent.")
+    situations_open.touch()
 
 
 def has_ended(pid):
