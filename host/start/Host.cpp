@@ -28,9 +28,10 @@ Host& Host::instance() {
     return *theHost;
 }
 
-void Host::configure(HostConfig config, WatchedFile file) {
+void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifier) {
     m_config = std::move(config);
     m_file = std::move(file);
+    m_notifier = std::move(notifier);
 }
 
 void Host::setState(State state) {
@@ -82,6 +83,7 @@ bool Host::begin() {
         m_isBusy = true;
     }
     m_serving->startHttp(m_config);
+    m_notifier.ready();
     return true;
 }
 
@@ -140,6 +142,7 @@ void Host::reload() {
 
 void Host::stop() {
     TraceScope trace(anchor);
+    m_notifier.stopping();
     m_serving->stop(Clock::now() + endLimit);
     setState(ENDED);
 }

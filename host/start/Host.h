@@ -3,6 +3,7 @@
 
 #include "host/config/HostConfig.h"
 #include "host/config/WatchedFile.h"
+#include "host/start/ServiceNotifier.h"
 #include "host/start/Serving.h"
 
 #include <condition_variable>
@@ -26,8 +27,9 @@ public:
     Host(const Host&) = delete;
     Host& operator=(const Host&) = delete;
 
-    /// Takes the configuration that was read at start-up from this file. Main thread, first.
-    void configure(HostConfig config, WatchedFile file);
+    /// Takes the configuration that was read at start-up from this file, and whom to tell of start
+    /// and orderly end. Main thread, first.
+    void configure(HostConfig config, WatchedFile file, ServiceNotifier notifier = {});
     void setLoader(int (*loader)()) noexcept { m_loader = loader; }
 
     /// The main loop: loads the agent, serves until a stop is requested, ends the serving. Returns
@@ -57,6 +59,7 @@ private:
 
     HostConfig m_config;
     WatchedFile m_file{""};
+    ServiceNotifier m_notifier;
     int (*m_loader)() = nullptr;
 
     std::mutex m_mutex; ///< guards what follows

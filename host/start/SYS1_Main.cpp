@@ -5,6 +5,7 @@
 #include "host/start/CommandLine.h"
 #include "host/start/Host.h"
 #include "host/start/Say.h"
+#include "host/start/ServiceNotifier.h"
 
 #include <cstddef>
 #include <cstdio>
@@ -79,5 +80,6 @@ void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
         setenv(setting.variable.c_str(), setting.value.c_str(), keepWhatIsSet);
     }
     setTrace(commandLine.traceFile());
-    Host::instance().configure(std::move(config), std::move(file));
+    Host::instance().configure(std::move(config), std::move(file),
+                               ServiceNotifier::takeFromEnvironment());
 }
