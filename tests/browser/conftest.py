@@ -19,10 +19,10 @@ SYSTEM = ROOT / "tests/system"
 
 
 def _load(name, path):
-    specification = importlib.util.spec_from_file_location(name, path)
-    module = importlib.util.module_from_spec(specification)
+    module_source = importlib.util.spec_from_file_location(name, path)
+    module = importlib.util.module_from_spec(module_source)
     sys.modules[name] = module
-    specification.loader.exec_module(module)
+    module_source.loader.exec_module(module)
     return module
 
 
