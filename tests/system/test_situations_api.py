@@ -2,7 +2,7 @@
 
 import pytest
 from conftest import descriptions, syslog_line
-from situations import SITUATIONS, path, running  # noqa: F401 - running is a fixture
+from situations import SITUATIONS, Situations, path, running  # noqa: F401 - running is a fixture
 
 
 def test_a_situation_is_made_raises_and_is_removed(running):
