@@ -1,0 +1,172 @@
+#include "host/cli/AgentClient.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/JsonText.h"
+
+#include <utility>
+
+#include <httplib.h>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = AgentClient::Json;
+
+constexpr std::chrono::seconds connectTimeout{5};
+constexpr std::chrono::seconds answerTimeout{120}; ///< a report waits for a refresh
+constexpr std::chrono::seconds streamTimeout{45};  ///< three keep-alive comments are missing
+
+bool isSuccess(int status) {
+    return status >= 200 && status < 300;
+}
+
+std::string withQuery(const std::string& path, const AgentClient::Query& query) {
+    std::string text = path;
+    for (const auto& [name, value] : query) {
+        text +=
+            (text.size() == path.size() ? '?' : '&') + name + '=' + AgentClient::pathPart(value);
+    }
+    return text;
+}
+
+} // namespace
+
+class AgentClient::Implementation {
+public:
+    explicit Implementation(Connection connection)
+        : m_connection(std::move(connection)), m_client(m_connection.url) {
+        m_client.set_connection_timeout(connectTimeout);
+        m_client.set_read_timeout(answerTimeout);
+        m_client.set_bearer_token_auth(m_connection.token);
+    }
+
+    httplib::Client& client() { return m_client; }
+
+    Json answer(const httplib::Result& result) const {
+        if (!result) {
+            throw unreachable(result.error());
+        }
+        if (!isSuccess(result->status)) {
+            throw refused(result->status, result->body);
+        }
+        if (result->body.empty()) {
+            return {};
+        }
+        Json body = Json::parse(result->body, nullptr, false);
+        if (body.is_discarded()) {
+            throw CliError(CLI_UNREACHABLE, "what answers at " + m_connection.url +
+                                                " is no zrmagent: its answer is no JSON");
+        }
+        return body;
+    }
+
+    CliError unreachable(httplib::Error error) const {
+        const std::string agent = "the agent at " + m_connection.url;
+        switch (error) {
+        case httplib::Error::Connection:
+            return {CLI_UNREACHABLE, "cannot reach " + agent +
+                                         ": is zrmagent running? (systemctl status zrmagent; "
+                                         "another address: --url or --config)"};
+        case httplib::Error::SSLConnection:
+        case httplib::Error::SSLServerVerification:
+        case httplib::Error::SSLLoadingCerts:
+            return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts"};
+        case httplib::Error::Read:
+            return {CLI_UNREACHABLE, agent + " did not answer: it ended, or it is too busy"};
+        default:
+            return {CLI_UNREACHABLE,
+                    "the connection to " + agent + " failed: " + httplib::to_string(error)};
+        }
+    }
+
+    CliError refused(int status, const std::string& body) const {
+        if (status == 401) {
+            return {CLI_FORBIDDEN, "the agent at " + m_connection.url +
+                                       " does not accept the token of " + m_connection.tokenSource +
+                                       ": name the agent's own with --token-file or --config"};
+        }
+        const Json problem = Json::parse(body, nullptr, false);
+        std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
+        if (text.empty()) {
+            text = "the agent at " + m_connection.url + " answered with status " +
+                   std::to_string(status);
+        }
+        const std::string field = problem.is_discarded() ? "" : JsonText::text(problem, "field");
+        constexpr int unavailable = 503;
+        return {status == unavailable ? CLI_UNREACHABLE : CLI_REFUSED,
+                field.empty() ? text : field + ": " + text};
+    }
+
+private:
+    const Connection m_connection;
+    httplib::Client m_client;
+};
+
+AgentClient::AgentClient(Connection connection)
+    : m_implementation(std::make_unique<Implementation>(std::move(connection))) {}
+
+AgentClient::~AgentClient() = default;
+
+Json AgentClient::get(const std::string& path, const Query& query) {
+    return m_implementation->answer(m_implementation->client().Get(withQuery(path, query)));
+}
+
+Json AgentClient::send(const std::string& method, const std::string& path, const Json& body) {
+    httplib::Request request;
+    request.method = method;
+    request.path = path;
+    if (!body.is_null()) {
+        request.body = body.dump(-1, ' ', false, Json::error_handler_t::replace);
+        request.set_header("Content-Type", "application/json");
+    }
+    return m_implementation->answer(m_implementation->client().send(request));
+}
+
+void AgentClient::stream(const std::string& path, const Query& query,
+                         const std::function<void(std::string_view)>& receiver) {
+    httplib::Client& client = m_implementation->client();
+    client.set_read_timeout(streamTimeout);
+    int status = 0;
+    std::string problem;
+    const httplib::Result result = client.Get(
+        withQuery(path, query),
+        [&](const httplib::Response& response) {
+            status = response.status;
+            return true;
+        },
+        [&](const char* data, std::size_t size) {
+            if (isSuccess(status)) {
+                receiver({data, size});
+            } else {
+                problem.append(data, size);
+            }
+            return true;
+        });
+    client.set_read_timeout(answerTimeout);
+    if (status == 0) {
+        throw m_implementation->unreachable(result.error());
+    }
+    if (!isSuccess(status)) {
+        throw m_implementation->refused(status, problem);
+    }
+}
+
+void AgentClient::stop() {
+    m_implementation->client().stop();
+}
+
+std::string AgentClient::pathPart(std::string_view text) {
+    constexpr std::string_view plain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz"
+                                       "0123456789-._~";
+    constexpr const char* digits = "0123456789ABCDEF";
+    std::string part;
+    for (const char c : text) {
+        if (plain.find(c) != std::string_view::npos) {
+            part += c;
+        } else {
+            const auto byte = static_cast<unsigned char>(c);
+            part += {'%', digits[byte >> 4], digits[byte & 0x0f]};
+        }
+    }
+    return part;
+}

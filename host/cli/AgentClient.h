@@ -1,0 +1,46 @@
+#ifndef ZRM_HOST_AGENT_CLIENT_H
+#define ZRM_HOST_AGENT_CLIENT_H
+
+#include "host/cli/Connection.h"
+
+#include <functional>
+#include <map>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include <nlohmann/json_fwd.hpp>
+
+/// Requests to the agent's HTTP API. One thread, except stop. Failures are thrown as CliError:
+/// no answer, a token that the agent does not accept, or what a problem document says.
+class AgentClient {
+public:
+    using Json = nlohmann::ordered_json;
+    using Query = std::multimap<std::string, std::string>;
+
+    explicit AgentClient(Connection connection);
+    AgentClient(const AgentClient&) = delete;
+    AgentClient& operator=(const AgentClient&) = delete;
+    ~AgentClient();
+
+    Json get(const std::string& path, const Query& query = {});
+    /// Sends a body (null: none) with a method; null when the answer has none.
+    Json send(const std::string& method, const std::string& path, const Json& body);
+
+    /// Reads an answer without end and hands its pieces over. Returns when it breaks off, or
+    /// after stop; throws CliError when it does not begin.
+    void stream(const std::string& path, const Query& query,
+                const std::function<void(std::string_view)>& receiver);
+    /// Ends a request under way. Any thread.
+    void stop();
+
+    /// A text as one part of a path: everything but letters, digits, '-', '.', '_' and '~' as
+    /// %XX.
+    static std::string pathPart(std::string_view text);
+
+private:
+    class Implementation;
+    std::unique_ptr<Implementation> m_implementation;
+};
+
+#endif

@@ -1,0 +1,45 @@
+#include "host/cli/BacktestCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/SituationOptions.h"
+#include "host/cli/TimeDisplay.h"
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+BacktestCommand::BacktestCommand(CLI::App& program)
+    : m_command(
+          program.add_subcommand("backtest", "Run a situation over what its log holds already")) {
+    m_command->add_option("SITUATION", m_situation, "The situation's name");
+    m_command->add_option("--file", m_file, "A definition as JSON instead of a situation")
+        ->type_name("FILE");
+    m_command->add_option("--from", m_from, "First time (default -24h)")->type_name("TIME");
+    m_command->add_option("--to", m_to, "Last time (default now)")->type_name("TIME");
+}
+
+bool BacktestCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int BacktestCommand::run(Context& context) {
+    JsonText::Json body = SituationOptions::subject(m_situation, m_file);
+    body["from"] = Context::time("--from", m_from);
+    body["to"] = Context::time("--to", m_to);
+    const JsonText::Json answer = context.client().send("POST", "/api/v1/backtest", body);
+    if (context.options().json) {
+        context.printJson(answer);
+        return CLI_DONE;
+    }
+    std::string text = DisplayText::visible(JsonText::text(answer, "decision")) + '\n';
+    for (const JsonText::Json& time : JsonText::member(answer, "raised_at")) {
+        text += "  " + DisplayText::visible(TimeDisplay::stamp(JsonText::text(time))) + '\n';
+    }
+    context.print(text);
+    if (JsonText::text(answer, "truncated") == "true") {
+        Context::note("not every entry between these times was read: begin later or end earlier");
+    }
+    return CLI_DONE;
+}

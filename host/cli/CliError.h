@@ -1,0 +1,27 @@
+#ifndef ZRM_HOST_CLI_ERROR_H
+#define ZRM_HOST_CLI_ERROR_H
+
+#include <stdexcept>
+#include <string>
+
+/// The exit statuses of zrmctl.
+enum CliStatus {
+    CLI_DONE = 0,
+    CLI_REFUSED = 1,     ///< refused by the agent or by a check, or nothing was found
+    CLI_USAGE = 2,       ///< the command line or the configuration cannot be used
+    CLI_UNREACHABLE = 3, ///< no agent answers
+    CLI_FORBIDDEN = 4,   ///< the token cannot be read, or the agent does not accept it
+};
+
+/// Why a command ends, in words for the operator, and the status with which it does.
+class CliError : public std::runtime_error {
+public:
+    CliError(CliStatus status, const std::string& text)
+        : std::runtime_error(text), m_status(status) {}
+    CliStatus status() const noexcept { return m_status; }
+
+private:
+    CliStatus m_status;
+};
+
+#endif

@@ -1,0 +1,163 @@
+#include "host/cli/Connection.h"
+
+#include "agent/ErrorText.h"
+#include "host/cli/CliError.h"
+#include "host/config/ConfigFile.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <optional>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include <unistd.h>
+
+namespace {
+
+constexpr const char* defaultConfig = "/etc/zrm/zrm.toml";
+
+std::string variable(const char* name) {
+    const char* const value = std::getenv(name);
+    return value == nullptr ? "" : value;
+}
+
+std::string trimmed(std::string text) {
+    text.erase(text.find_last_not_of(" \t\r\n") + 1);
+    return text;
+}
+
+/// The agent's configuration, read when it is needed first.
+class AgentConfig {
+public:
+    explicit AgentConfig(const std::string& path) : m_path(path.empty() ? defaultConfig : path) {}
+
+    const std::string& path() const { return m_path; }
+
+    bool isThere() const { return access(m_path.c_str(), F_OK) == 0; }
+
+    const HostConfig& get() {
+        if (!m_config) {
+            m_config = load();
+        }
+        return *m_config;
+    }
+
+private:
+    HostConfig load() const {
+        if (!isThere()) {
+            throw CliError(CLI_USAGE, m_path + " does not exist: name the agent's configuration "
+                                               "with --config, or its address with --url");
+        }
+        if (access(m_path.c_str(), R_OK) != 0) {
+            throw CliError(CLI_FORBIDDEN, "no permission to read " + m_path +
+                                              ": use sudo, or join the file's group");
+        }
+        ConfigFile::Result result = ConfigFile::load(m_path);
+        if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+            std::string text;
+            for (const std::string& problem : *problems) {
+                text += (text.empty() ? "" : "\n") + problem;
+            }
+            throw CliError(CLI_USAGE, text);
+        }
+        return std::get<HostConfig>(std::move(result));
+    }
+
+    std::string m_path;
+    std::optional<HostConfig> m_config;
+};
+
+/// The address to which a client of this machine connects.
+std::string urlOf(AgentConfig& config) {
+    const std::optional<ListenAddress>& listen = config.get().http.listen;
+    if (!listen) {
+        throw CliError(CLI_USAGE, config.path() + " switches HTTP off: give [http] a listen "
+                                                  "address, or name the address with --url");
+    }
+    if (listen->port == 0) {
+        throw CliError(CLI_USAGE, config.path() + " leaves the port open: name the address that "
+                                                  "the agent told with --url");
+    }
+    return "http://" + listen->text();
+}
+
+/// A URL that was written by hand, checked: the token goes in the clear to this machine alone.
+std::string checkedUrl(const std::string& written, const std::string& source) {
+    std::string url = written;
+    while (url.ends_with('/')) {
+        url.pop_back();
+    }
+    if (url.starts_with("https://") && url.size() > 8) {
+        return url;
+    }
+    constexpr std::string_view plain = "http://";
+    const std::string address = url.starts_with(plain) ? url.substr(plain.size()) : "";
+    const std::optional<ListenAddress> host =
+        ListenAddress::parse(address.rfind(':') == std::string::npos ? address + ":80" : address);
+    if (!host) {
+        throw CliError(CLI_USAGE, source + ": '" + written +
+                                      "' is no address; write it as "
+                                      "http://127.0.0.1:7186");
+    }
+    if (!host->isLoopback()) {
+        throw CliError(CLI_USAGE, source + ": the token would reach " + host->host +
+                                      " unencrypted; use https, or an SSH tunnel");
+    }
+    return url;
+}
+
+std::string readToken(const std::string& path) {
+    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(std::fopen(path.c_str(), "re"),
+                                                                 &std::fclose);
+    if (stream == nullptr) {
+        const int number = errno;
+        const ErrorText error(number);
+        if (number == EACCES) {
+            throw CliError(CLI_FORBIDDEN, "no permission to read the token " + path +
+                                              ": use sudo, or give the token in ZRM_TOKEN");
+        }
+        throw CliError(CLI_FORBIDDEN, "cannot read the token " + path + ": " + error.text() +
+                                          "; the agent makes it when it starts with HTTP");
+    }
+    char text[4096];
+    std::string token = trimmed({text, std::fread(text, 1, sizeof text, stream.get())});
+    if (token.empty() || token.find_first_of("\r\n") != std::string::npos) {
+        throw CliError(CLI_FORBIDDEN, path + " holds no token: one line of visible characters");
+    }
+    return token;
+}
+
+std::string tokenFileOf(AgentConfig& config) {
+    if (!config.isThere()) {
+        return HostConfig().stateDirectory + "/api-token";
+    }
+    const HostConfig& read = config.get();
+    return read.http.tokenFile.empty() ? read.stateDirectory + "/api-token" : read.http.tokenFile;
+}
+
+} // namespace
+
+Connection Connection::find(const CommonOptions& options) {
+    AgentConfig config(options.config);
+    Connection connection;
+    if (!options.url.empty()) {
+        connection.url = checkedUrl(options.url, "--url");
+    } else if (const std::string url = variable("ZRM_URL"); !url.empty()) {
+        connection.url = checkedUrl(url, "ZRM_URL");
+    } else {
+        connection.url = urlOf(config);
+    }
+    const std::string token = trimmed(variable("ZRM_TOKEN"));
+    if (options.tokenFile.empty() && !token.empty()) {
+        connection.token = token;
+        connection.tokenSource = "ZRM_TOKEN";
+    } else {
+        connection.tokenSource =
+            options.tokenFile.empty() ? tokenFileOf(config) : options.tokenFile;
+        connection.token = readToken(connection.tokenSource);
+    }
+    return connection;
+}

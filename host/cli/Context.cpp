@@ -1,0 +1,65 @@
+#include "host/cli/Context.h"
+
+#include "agent/ErrorText.h"
+#include "host/cli/CliError.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/TimeInput.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <ctime>
+#include <optional>
+
+#include <nlohmann/json.hpp>
+
+Context::Context(const CommonOptions& options, const Terminal& terminal)
+    : m_options(options), m_terminal(terminal) {}
+
+Context::~Context() = default;
+
+const Connection& Context::connection() {
+    if (m_connection == nullptr) {
+        m_connection = std::make_unique<Connection>(Connection::find(m_options));
+    }
+    return *m_connection;
+}
+
+AgentClient& Context::client() {
+    if (m_client == nullptr) {
+        m_client = std::make_unique<AgentClient>(connection());
+    }
+    return *m_client;
+}
+
+void Context::print(std::string_view text) const {
+    if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() ||
+        std::fflush(stdout) != 0) {
+        const ErrorText error(errno);
+        throw CliError(CLI_REFUSED, std::string("cannot write: ") + error.text());
+    }
+}
+
+void Context::printJson(const nlohmann::ordered_json& value) const {
+    print(JsonText::dump(value, !m_terminal.isTerminal) + '\n');
+}
+
+void Context::note(const std::string& text) {
+    std::string lines;
+    for (std::size_t from = 0; from <= text.size();) {
+        const std::size_t end = std::min(text.find('\n', from), text.size());
+        lines += "zrmctl: " + DisplayText::visible(text.substr(from, end - from)) + '\n';
+        from = end + 1;
+    }
+    std::fwrite(lines.data(), 1, lines.size(), stderr);
+}
+
+std::string Context::time(const std::string& option, const std::string& text) {
+    const std::optional<std::string> time = TimeInput::toIso(text, std::time(nullptr));
+    if (!time) {
+        throw CliError(CLI_USAGE,
+                       option + ": '" + text + "' is no time; write " + TimeInput::forms);
+    }
+    return *time;
+}

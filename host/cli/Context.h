@@ -1,0 +1,42 @@
+#ifndef ZRM_HOST_CLI_CONTEXT_H
+#define ZRM_HOST_CLI_CONTEXT_H
+
+#include "host/cli/AgentClient.h"
+#include "host/cli/Connection.h"
+#include "host/cli/Terminal.h"
+
+#include <memory>
+#include <string>
+#include <string_view>
+
+/// What a command works with: the agent, standard output and standard error. One thread.
+class Context {
+public:
+    Context(const CommonOptions& options, const Terminal& terminal);
+    ~Context();
+
+    const CommonOptions& options() const noexcept { return m_options; }
+    const Terminal& terminal() const noexcept { return m_terminal; }
+
+    /// The agent; its address and token are found at the first call. Throws CliError.
+    AgentClient& client();
+    const Connection& connection();
+
+    /// Writes to standard output at once. Throws CliError when it cannot be written.
+    void print(std::string_view text) const;
+    /// Writes JSON: over several lines to a terminal, else on one.
+    void printJson(const nlohmann::ordered_json& value) const;
+    /// Tells the operator something beside the output: "zrmctl: TEXT" on standard error.
+    static void note(const std::string& text);
+
+    /// A time that an operator wrote, as the agent reads it. Throws CliError, naming the option.
+    static std::string time(const std::string& option, const std::string& text);
+
+private:
+    const CommonOptions& m_options;
+    Terminal m_terminal;
+    std::unique_ptr<Connection> m_connection;
+    std::unique_ptr<AgentClient> m_client;
+};
+
+#endif

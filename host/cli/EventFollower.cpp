@@ -1,0 +1,86 @@
+#include "host/cli/EventFollower.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/SseParser.h"
+
+#include <algorithm>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr std::chrono::milliseconds shortestPause = 200ms;
+constexpr std::chrono::milliseconds longestPause = 5s;
+
+} // namespace
+
+EventFollower::EventFollower(AgentClient& client, AgentClient::Query filters, StopSignals& signals,
+                             Note note)
+    : m_client(client), m_filters(std::move(filters)), m_signals(signals), m_note(std::move(note)) {
+}
+
+void EventFollower::follow(std::uint64_t after, const Receiver& receiver) {
+    m_last = after;
+    m_signals.onStop([this] { m_client.stop(); });
+    std::chrono::milliseconds pause = shortestPause;
+    try {
+        while (!m_signals.isStopped()) {
+            pause = connect(receiver) ? shortestPause : std::min(2 * pause, longestPause);
+            // The signal may have come when there was no connection to end.
+            if (m_signals.isStopped() || m_signals.wait(pause)) {
+                break;
+            }
+        }
+    } catch (...) {
+        m_signals.onStop({});
+        throw;
+    }
+    m_signals.onStop({});
+}
+
+bool EventFollower::connect(const Receiver& receiver) {
+    bool hasReceived = false;
+    SseParser parser([&](const std::string& data) {
+        const Json event = Json::parse(data, nullptr, false);
+        const std::uint64_t id = event.is_discarded() ? 0 : JsonText::number(event, "id");
+        if (id > m_last) {
+            receiver(event);
+            m_last = id;
+        }
+    });
+    try {
+        if (m_isLost) {
+            adoptNewHistory();
+        }
+        AgentClient::Query query = m_filters;
+        query.emplace("after", std::to_string(m_last));
+        m_client.stream("/api/v1/events/stream", query, [&](std::string_view piece) {
+            if (std::exchange(m_isLost, false)) {
+                m_note("connected again");
+            }
+            hasReceived = true;
+            parser.take(piece);
+        });
+    } catch (const CliError& error) {
+        if (error.status() != CLI_UNREACHABLE || !(m_isLost || m_signals.isStopped())) {
+            throw;
+        }
+    }
+    if (!m_signals.isStopped() && !std::exchange(m_isLost, true)) {
+        m_note("the connection to the agent is lost; trying to connect again");
+    }
+    return hasReceived;
+}
+
+void EventFollower::adoptNewHistory() {
+    const Json answer = m_client.get("/api/v1/events", {{"limit", "1"}});
+    if (JsonText::member(answer, "newest").is_number() &&
+        JsonText::number(answer, "newest") < m_last) {
+        m_note("the agent has begun a new history; its events follow from the first");
+        m_last = 0;
+    }
+}

@@ -1,0 +1,189 @@
+#include "host/cli/EventsCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/EventFollower.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/StopSignals.h"
+#include "host/cli/Table.h"
+#include "host/cli/TimeDisplay.h"
+
+#include <algorithm>
+#include <utility>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = JsonText::Json;
+
+constexpr unsigned usualLimit = 100;
+constexpr unsigned usualBeforeFollowing = 10;
+
+Colour colourOf(const std::string& severity) {
+    if (severity == "critical" || severity == "major") {
+        return Colour::BAD;
+    }
+    return severity == "info" ? Colour::NONE : Colour::NOTICE;
+}
+
+std::string logOf(const Json& row) {
+    const std::string name = JsonText::text(row, "ULOGNAME");
+    return name.empty() ? JsonText::text(row, "LOGPATH") + JsonText::text(row, "LOGNAME")
+                        : JsonText::text(row, "ULOGPATH") + name;
+}
+
+std::string entryOf(const Json& row) {
+    const auto either = [&](const char* utf8, const char* local) {
+        const std::string text = JsonText::text(row, utf8);
+        return text.empty() ? JsonText::text(row, local) : text;
+    };
+    const std::string source = either("UENTRYSRC", "ENTRYSRC");
+    return (source.empty() ? "" : source + ": ") + either("UENTRYDESC", "ENTRYDESC");
+}
+
+std::string padded(const std::string& text, std::size_t columns) {
+    const std::size_t width = DisplayText::width(text);
+    return text + std::string(width < columns ? columns - width : 0, ' ');
+}
+
+/// One event while following: what comes next is not known, so columns have a width of their own.
+std::string lineOf(const Json& event, const Terminal& terminal) {
+    constexpr std::size_t severityColumns = 8;
+    constexpr std::size_t situationColumns = 20;
+    const std::string severity = DisplayText::visible(JsonText::text(event, "severity"));
+    const std::string head = padded(JsonText::text(event, "id"), 6) + "  " +
+                             TimeDisplay::local(JsonText::text(event, "raised")) + "  ";
+    const std::string tail =
+        padded(DisplayText::visible(JsonText::text(event, "situation")), situationColumns) + "  " +
+        DisplayText::visible(entryOf(JsonText::member(event, "row")));
+    const std::size_t before = head.size() + severityColumns + 2;
+    const std::size_t room = terminal.width > before ? terminal.width - before : 1;
+    return head + terminal.coloured(padded(severity, severityColumns), colourOf(severity)) + "  " +
+           (terminal.width > 0 ? DisplayText::shortened(tail, room, terminal.ellipsis()) : tail) +
+           '\n';
+}
+
+std::string tableText(const Json& events, const Terminal& terminal) {
+    Table table({{"ID", Table::NUMBER},
+                 {"RAISED", Table::FIXED},
+                 {"SEVERITY", Table::FIXED},
+                 {"SITUATION"},
+                 {"LOG"},
+                 {"ENTRY"}});
+    for (const Json& event : events) {
+        const std::string severity = JsonText::text(event, "severity");
+        const Json& row = JsonText::member(event, "row");
+        table.add({JsonText::text(event, "id"),
+                   TimeDisplay::local(JsonText::text(event, "raised")),
+                   {severity, colourOf(severity)},
+                   JsonText::text(event, "situation"),
+                   logOf(row),
+                   entryOf(row)});
+    }
+    return table.text(terminal);
+}
+
+} // namespace
+
+EventsCommand::EventsCommand(CLI::App& program)
+    : m_command(program.add_subcommand("events", "What situations have raised; -f follows")) {
+    const auto anyOf = [&](const char* name, std::vector<std::string>& values, const char* type,
+                           const char* help) {
+        m_command->add_option(name, values, help)->type_name(type)->allow_extra_args(false);
+    };
+    m_command->add_flag("-f,--follow", m_follow, "Go on with new events until Ctrl-C");
+    m_command->add_option("--after", m_after, "Events behind this one")
+        ->type_name("ID")
+        ->check(CLI::NonNegativeNumber);
+    m_command->add_option("--before", m_before, "Events before this one")
+        ->type_name("ID")
+        ->check(CLI::NonNegativeNumber);
+    m_command->add_option("--from", m_from, "Raised at this time or later")->type_name("TIME");
+    m_command->add_option("--to", m_to, "Raised at this time or earlier")->type_name("TIME");
+    anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
+    anyOf("--log", m_logs, "LOG", "Of this log; may be repeated");
+    anyOf("--severity", m_severities, "SEVERITY", "Of this severity; may be repeated");
+    m_command->add_option("--limit", m_limit, "The latest so many (default 100; with -f 10)")
+        ->type_name("COUNT")
+        ->check(CLI::Range(1, 1000));
+}
+
+bool EventsCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+std::multimap<std::string, std::string> EventsCommand::filters() const {
+    std::multimap<std::string, std::string> query;
+    for (const auto& [name, values] :
+         {std::pair("situation", &m_situations), std::pair("log", &m_logs),
+          std::pair("severity", &m_severities)}) {
+        for (const std::string& value : *values) {
+            query.emplace(name, value);
+        }
+    }
+    return query;
+}
+
+int EventsCommand::list(Context& context) {
+    std::multimap<std::string, std::string> query = filters();
+    const auto add = [&](const char* name, const std::string& value) {
+        if (!value.empty()) {
+            query.emplace(name, value);
+        }
+    };
+    add("after", m_after);
+    add("before", m_before);
+    add("from", m_from.empty() ? "" : Context::time("--from", m_from));
+    add("to", m_to.empty() ? "" : Context::time("--to", m_to));
+    add("limit", std::to_string(m_limit > 0 ? m_limit : usualLimit));
+    Json events = JsonText::member(context.client().get("/api/v1/events", query), "events");
+    std::reverse(events.begin(), events.end()); // the newest stands where the eye is
+    if (events.empty()) {
+        Context::note("no such event");
+        return CLI_REFUSED;
+    }
+    if (context.options().json) {
+        for (const Json& event : events) {
+            context.print(JsonText::dump(event, true) + '\n');
+        }
+    } else {
+        context.print(tableText(events, context.terminal()));
+    }
+    return CLI_DONE;
+}
+
+int EventsCommand::follow(Context& context) {
+    if (!m_before.empty() || !m_to.empty()) {
+        throw CliError(CLI_USAGE, "--before and --to end a list; -f has no end");
+    }
+    StopSignals signals;
+    AgentClient& client = context.client();
+    std::multimap<std::string, std::string> query = filters();
+    const auto show = [&](const Json& event) {
+        context.print(context.options().json ? JsonText::dump(event, true) + '\n'
+                                             : lineOf(event, context.terminal()));
+    };
+    std::uint64_t after = 0;
+    if (!m_after.empty()) {
+        after = std::stoull(m_after);
+    } else {
+        query.emplace("limit", std::to_string(m_limit > 0 ? m_limit : usualBeforeFollowing));
+        if (!m_from.empty()) {
+            query.emplace("from", Context::time("--from", m_from));
+        }
+        Json answer = client.get("/api/v1/events", query);
+        Json events = JsonText::member(answer, "events");
+        std::for_each(events.rbegin(), events.rend(), show);
+        after = JsonText::number(answer, "newest");
+    }
+    EventFollower follower(client, filters(), signals, &Context::note);
+    follower.follow(after, show);
+    return CLI_DONE;
+}
+
+int EventsCommand::run(Context& context) {
+    return m_follow ? follow(context) : list(context);
+}

@@ -1,0 +1,110 @@
+#include "host/cli/ExplainCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/JsonText.h"
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = JsonText::Json;
+
+std::string headOf(const Json& explanation) {
+    const std::string event = JsonText::text(explanation, "event");
+    if (!event.empty()) {
+        return "event " + event;
+    }
+    const std::string line = JsonText::text(explanation, "line");
+    const Json& row = JsonText::member(explanation, "row");
+    return line.empty() ? JsonText::text(row, "ENTRYSRC") + ": " + JsonText::text(row, "ENTRYDESC")
+                        : line;
+}
+
+std::string textOf(const Json& explanation, const Terminal& terminal) {
+    const auto shown = [](const std::string& text) { return DisplayText::visible(text); };
+    std::string text = terminal.coloured(shown(headOf(explanation)), Colour::HEADING) + '\n';
+    if (const std::string reason = JsonText::text(explanation, "reason"); !reason.empty()) {
+        text += "  " + terminal.coloured(shown(reason), Colour::BAD) + '\n';
+    }
+    for (const Json& condition : JsonText::member(explanation, "conditions")) {
+        const bool holds = JsonText::text(condition, "holds") == "true";
+        text += "  " +
+                terminal.coloured(holds ? "yes" : "no ", holds ? Colour::GOOD : Colour::BAD) +
+                "  " + shown(JsonText::text(condition, "condition"));
+        text += holds ? "\n" : "; it is '" + shown(JsonText::text(condition, "value")) + "'\n";
+    }
+    const Json& window = JsonText::member(explanation, "window");
+    if (!window.is_null()) {
+        text += "  frequency " + shown(JsonText::text(window, "frequency")) + " within " +
+                shown(JsonText::text(window, "period")) + ": " +
+                shown(JsonText::text(window, "count")) + " so far\n";
+    }
+    const bool isRaised = JsonText::text(explanation, "raised") == "true";
+    return text + "  " +
+           terminal.coloured(shown(JsonText::text(explanation, "decision")),
+                             isRaised ? Colour::GOOD : Colour::NOTICE) +
+           '\n';
+}
+
+} // namespace
+
+ExplainCommand::ExplainCommand(CLI::App& program)
+    : m_command(program.add_subcommand("explain", "Why entries raise a situation, or do not")) {
+    m_command->add_option("SITUATION", m_situation, "The situation's name");
+    m_command->add_option("--file", m_file, "A definition as JSON instead of a situation")
+        ->type_name("FILE");
+    m_command->add_option("--line", m_line, "A line as it stands in the log of --log")
+        ->type_name("TEXT");
+    m_command->add_option("--log", m_log, "The whole path of a log")->type_name("LOG");
+    m_command->add_option("--event", m_event, "An event of the history")->type_name("ID");
+    m_command->add_option("--last", m_last, "The last entries of --log (default 5)")
+        ->type_name("COUNT")
+        ->check(CLI::Range(1, 1000));
+}
+
+bool ExplainCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+Json ExplainCommand::request() const {
+    constexpr unsigned usualLast = 5;
+    Json body = SituationOptions::subject(m_situation, m_file);
+    const bool isEvent = m_event > 0;
+    if (isEvent == !m_log.empty()) {
+        throw CliError(CLI_USAGE, "say what to explain: --event ID, --log LOG with --line TEXT, or "
+                                  "--log LOG with --last COUNT");
+    }
+    if (isEvent) {
+        body["event"] = m_event;
+        return body;
+    }
+    body["log"] = m_log;
+    if (m_line.empty()) {
+        body["last"] = m_last > 0 ? m_last : usualLast;
+    } else {
+        body["line"] = m_line;
+    }
+    return body;
+}
+
+int ExplainCommand::run(Context& context) {
+    const Json answer = context.client().send("POST", "/api/v1/explain", request());
+    const Json& explanations = JsonText::member(answer, "explanations");
+    if (context.options().json) {
+        context.printJson(answer);
+    } else {
+        std::string text;
+        for (const Json& explanation : explanations) {
+            text += (text.empty() ? "" : "\n") + textOf(explanation, context.terminal());
+        }
+        context.print(text);
+    }
+    if (explanations.empty()) {
+        Context::note("there is no entry to explain");
+        return CLI_REFUSED;
+    }
+    return CLI_DONE;
+}

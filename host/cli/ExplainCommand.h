@@ -1,0 +1,30 @@
+#ifndef ZRM_HOST_EXPLAIN_COMMAND_H
+#define ZRM_HOST_EXPLAIN_COMMAND_H
+
+#include "host/cli/Command.h"
+#include "host/cli/SituationOptions.h"
+
+#include <cstdint>
+#include <string>
+
+/// `zrmctl explain SITUATION`: why a line, an event or the last entries of a log raise it or not.
+class ExplainCommand : public Command {
+public:
+    explicit ExplainCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    int run(Context& context) override;
+
+private:
+    SituationOptions::Json request() const;
+
+    CLI::App* m_command;
+    std::string m_situation;
+    std::string m_file;
+    std::string m_line;
+    std::string m_log;
+    std::uint64_t m_event = 0;
+    unsigned m_last = 0;
+};
+
+#endif

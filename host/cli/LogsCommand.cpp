@@ -1,0 +1,171 @@
+#include "host/cli/LogsCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/FactList.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/Table.h"
+#include "host/cli/TimeDisplay.h"
+
+#include <array>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = JsonText::Json;
+
+struct Kind {
+    std::string_view letter;
+    const char* name;
+};
+
+constexpr std::array<Kind, 4> kinds = {
+    {{"U", "text"}, {"S", "syslog"}, {"A", "logins"}, {"E", "errors"}}};
+
+std::string kindOf(const Json& row) {
+    const std::string letter = JsonText::text(row, "LOGTYPE");
+    for (const Kind& kind : kinds) {
+        if (kind.letter == letter) {
+            return kind.name;
+        }
+    }
+    return letter;
+}
+
+Table::Cell statusCell(const Json& row) {
+    const std::string status = JsonText::text(row, "MONSTATUS");
+    if (status == "Running") {
+        return {status, Colour::GOOD};
+    }
+    return {status, status == "Stopped" || status == "Not started" ? Colour::NOTICE : Colour::BAD};
+}
+
+std::string sizeText(const Json& row) {
+    const Json& size = JsonText::member(row, "LOGSIZE");
+    const bool isThere = size.is_number() && size.get<std::int64_t>() >= 0;
+    return isThere ? TimeDisplay::bytes(size.get<std::uint64_t>()) : "no file";
+}
+
+std::string lastEntry(const Json& ledger) {
+    const std::string time = JsonText::text(ledger, "last_entry");
+    return time.ends_with('Z') ? TimeDisplay::local(time) : TimeDisplay::stamp(time);
+}
+
+Table::Cell countCell(const Json& object, const char* key) {
+    const std::string count = JsonText::text(object, key);
+    return {count, count == "0" ? Colour::NONE : Colour::NOTICE};
+}
+
+void addLedger(FactList& facts, const Json& ledger) {
+    struct Row {
+        const char* key;
+        const char* name;
+    };
+    constexpr std::array<Row, 5> rows = {{{"lines", "lines"},
+                                          {"rows", "rows"},
+                                          {"format_errors", "format errors"},
+                                          {"truncations", "truncations"},
+                                          {"restarts", "monitor restarts"}}};
+    if (ledger.is_null()) {
+        return;
+    }
+    facts.add("read", TimeDisplay::bytes(JsonText::number(ledger, "bytes_read")));
+    for (const Row& row : rows) {
+        facts.add(row.name, JsonText::text(ledger, row.key));
+    }
+    facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
+    facts.add("last entry", lastEntry(ledger));
+}
+
+std::string rejectedText(const Json& ledger, const Terminal& terminal) {
+    Table table({{"TIME", Table::FIXED}, {"REJECTED LINE"}, {"REASON"}});
+    for (const Json& line : JsonText::member(ledger, "rejected")) {
+        table.add({TimeDisplay::local(JsonText::text(line, "time")), JsonText::text(line, "line"),
+                   JsonText::text(line, "reason")});
+    }
+    return table.empty() ? "" : '\n' + table.text(terminal);
+}
+
+std::string skippedText(const Json& ledger, const Terminal& terminal) {
+    Table table(
+        {{"TIME", Table::FIXED}, {"SKIPPED FROM BYTE", Table::NUMBER}, {"TO BYTE", Table::NUMBER}});
+    for (const Json& range : JsonText::member(ledger, "skipped")) {
+        table.add({TimeDisplay::local(JsonText::text(range, "time")), JsonText::text(range, "from"),
+                   JsonText::text(range, "to")});
+    }
+    return table.empty() ? "" : '\n' + table.text(terminal);
+}
+
+} // namespace
+
+LogsCommand::LogsCommand(CLI::App& program)
+    : m_command(program.add_subcommand("logs", "The monitored logs, or everything about one")) {
+    m_command->add_option("LOG", m_log, "The whole path of a log");
+}
+
+bool LogsCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int LogsCommand::run(Context& context) {
+    return m_log.empty() ? list(context) : show(context);
+}
+
+int LogsCommand::list(Context& context) {
+    const Json answer = context.client().get("/api/v1/logs");
+    if (context.options().json) {
+        context.printJson(answer);
+        return CLI_DONE;
+    }
+    Table table({{"LOG"},
+                 {"TYPE", Table::FIXED},
+                 {"STATUS", Table::FIXED},
+                 {"ENTRIES", Table::NUMBER},
+                 {"ERRORS", Table::NUMBER},
+                 {"SIZE", Table::NUMBER},
+                 {"CHANGED", Table::FIXED}});
+    for (const Json& log : JsonText::member(answer, "logs")) {
+        const Json& row = JsonText::member(log, "row");
+        table.add({JsonText::text(log, "log"), kindOf(row), statusCell(row),
+                   JsonText::text(row, "NUMEVENTS"), countCell(row, "NUMERRORS"), sizeText(row),
+                   TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE"))});
+    }
+    if (table.empty()) {
+        Context::note("the agent monitors no log");
+        return CLI_REFUSED;
+    }
+    context.print(table.text(context.terminal()));
+    return CLI_DONE;
+}
+
+int LogsCommand::show(Context& context) {
+    const Json answer = context.client().get("/api/v1/logs", {{"log", m_log}});
+    const Json& logs = JsonText::member(answer, "logs");
+    if (logs.empty()) {
+        throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log +
+                                        "; 'zrmctl logs' lists what it monitors");
+    }
+    if (context.options().json) {
+        context.printJson(logs.front());
+        return CLI_DONE;
+    }
+    const Json& row = JsonText::member(logs.front(), "row");
+    const Json& ledger = JsonText::member(logs.front(), "ledger");
+    const Table::Cell status = statusCell(row);
+    FactList facts;
+    facts.add("log", JsonText::text(logs.front(), "log"));
+    facts.add("type", kindOf(row));
+    facts.add("status", status.text, status.colour);
+    facts.add("since", TimeDisplay::stamp(JsonText::text(row, "MONTIME")));
+    facts.add("size", sizeText(row));
+    facts.add("changed", TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE")));
+    facts.add("format", JsonText::text(row, "FORMATTER"));
+    facts.add("entries", JsonText::text(row, "NUMEVENTS"));
+    facts.add("errors", JsonText::text(row, "NUMERRORS"));
+    addLedger(facts, ledger);
+    context.print(facts.text(context.terminal()) + rejectedText(ledger, context.terminal()) +
+                  skippedText(ledger, context.terminal()));
+    return CLI_DONE;
+}

@@ -1,0 +1,24 @@
+#ifndef ZRM_HOST_LOGS_COMMAND_H
+#define ZRM_HOST_LOGS_COMMAND_H
+
+#include "host/cli/Command.h"
+
+#include <string>
+
+/// `zrmctl logs [LOG]`: the monitored logs, or everything about one.
+class LogsCommand : public Command {
+public:
+    explicit LogsCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    int run(Context& context) override;
+
+private:
+    int list(Context& context);
+    int show(Context& context);
+
+    CLI::App* m_command;
+    std::string m_log;
+};
+
+#endif

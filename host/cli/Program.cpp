@@ -1,0 +1,73 @@
+#include "host/cli/Program.h"
+
+#include "host/cli/BacktestCommand.h"
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/EventsCommand.h"
+#include "host/cli/ExplainCommand.h"
+#include "host/cli/LogsCommand.h"
+#include "host/cli/RefreshCommand.h"
+#include "host/cli/ReportCommand.h"
+#include "host/cli/SituationsCommand.h"
+#include "host/cli/StatusCommand.h"
+#include "host/cli/Terminal.h"
+#include "host/cli/TraceCommand.h"
+
+#include <CLI/CLI.hpp>
+
+Program::Program()
+    : m_app(std::make_unique<CLI::App>("Works with the log-monitoring agent zrmagent.", "zrmctl")) {
+    m_app->set_version_flag("--version", "zrmctl " ZRM_VERSION, "Print the version and end");
+    m_app->set_help_flag("--help", "Print this help and end; also behind a command");
+    m_app
+        ->add_option("--config", m_options.config,
+                     "The agent's configuration (default /etc/zrm/zrm.toml), for address and token")
+        ->type_name("FILE");
+    m_app->add_option("--url", m_options.url, "The agent's address (else ZRM_URL)")
+        ->type_name("URL");
+    m_app->add_option("--token-file", m_options.tokenFile, "The token's file (else ZRM_TOKEN)")
+        ->type_name("FILE");
+    m_app->add_flag("--json", m_options.json, "Print JSON");
+    m_app->fallthrough(); // these options may also stand behind the command
+    m_app->require_subcommand(1);
+    m_app->footer("Exit status: 0 done, 1 refused or nothing found, 2 unusable command line or\n"
+                  "configuration, 3 no agent answers, 4 no permission.");
+    m_commands.push_back(std::make_unique<StatusCommand>(*m_app));
+    m_commands.push_back(std::make_unique<LogsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<EventsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<ReportCommand>(*m_app));
+    m_commands.push_back(std::make_unique<SituationsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<ExplainCommand>(*m_app));
+    m_commands.push_back(std::make_unique<BacktestCommand>(*m_app));
+    m_commands.push_back(std::make_unique<RefreshCommand>(*m_app));
+    m_commands.push_back(std::make_unique<TraceCommand>(*m_app));
+}
+
+Program::~Program() = default;
+
+int Program::run(int argc, const char* const* argv) {
+    try {
+        m_app->parse(argc, argv);
+    } catch (const CLI::Success& wish) { // --help, --version
+        return m_app->exit(wish);
+    } catch (const CLI::ParseError& error) {
+        Context::note(std::string(error.what()) + "; zrmctl --help lists commands and options");
+        return CLI_USAGE;
+    }
+    try {
+        return runCommand();
+    } catch (const CliError& error) {
+        Context::note(error.what());
+        return error.status();
+    }
+}
+
+int Program::runCommand() {
+    Context context(m_options, Terminal::ofStandardOutput());
+    for (const std::unique_ptr<Command>& command : m_commands) {
+        if (command->isChosen()) {
+            return command->run(context);
+        }
+    }
+    return CLI_USAGE;
+}

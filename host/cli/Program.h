@@ -1,0 +1,29 @@
+#ifndef ZRM_HOST_CLI_PROGRAM_H
+#define ZRM_HOST_CLI_PROGRAM_H
+
+#include "host/cli/Command.h"
+#include "host/cli/Connection.h"
+
+#include <memory>
+#include <vector>
+
+/// zrmctl: its commands, and the way from a command line to one of them.
+class Program {
+public:
+    Program();
+    ~Program();
+    Program(const Program&) = delete;
+    Program& operator=(const Program&) = delete;
+
+    /// Reads the command line and does what it says; gives the exit status.
+    int run(int argc, const char* const* argv);
+
+private:
+    int runCommand();
+
+    CommonOptions m_options;
+    std::unique_ptr<CLI::App> m_app;
+    std::vector<std::unique_ptr<Command>> m_commands;
+};
+
+#endif

@@ -1,0 +1,23 @@
+#include "host/cli/RefreshCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+RefreshCommand::RefreshCommand(CLI::App& program)
+    : m_command(program.add_subcommand("refresh",
+                                       "Let the agent re-read the configuration of the logs")) {}
+
+bool RefreshCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int RefreshCommand::run(Context& context) {
+    const auto answer = context.client().send("POST", "/api/v1/refresh", nullptr);
+    if (context.options().json) {
+        context.printJson(answer);
+    }
+    return CLI_DONE;
+}

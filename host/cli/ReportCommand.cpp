@@ -1,0 +1,127 @@
+#include "host/cli/ReportCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/CsvText.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/Table.h"
+#include "host/cli/TimeDisplay.h"
+#include "host/cli/TimeInput.h"
+
+#include <algorithm>
+#include <array>
+#include <iterator>
+#include <string_view>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = JsonText::Json;
+
+/// What a table shows unless it is told otherwise, where any entry has it.
+constexpr std::array usualColumns = {"ENTRYTIME", "ENTRYSYS",   "ENTRYSRC",
+                                     "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC"};
+
+bool isTime(std::string_view column) {
+    return column == "ENTRYTIME" || column == "TIMESTAMP";
+}
+
+bool hasAny(const Json& rows, const std::string& column) {
+    return std::any_of(rows.begin(), rows.end(),
+                       [&](const Json& row) { return !JsonText::text(row, column).empty(); });
+}
+
+std::string tableText(const Json& rows, const std::vector<std::string>& columns,
+                      const Terminal& terminal) {
+    std::vector<Table::Column> headings;
+    for (const std::string& column : columns) {
+        headings.push_back({column, isTime(column) ? Table::FIXED : Table::TEXT});
+    }
+    Table table(headings);
+    for (const Json& row : rows) {
+        std::vector<Table::Cell> cells;
+        for (const std::string& column : columns) {
+            const std::string value = JsonText::text(row, column);
+            cells.emplace_back(isTime(column) ? TimeDisplay::stamp(value) : value);
+        }
+        table.add(std::move(cells));
+    }
+    return table.text(terminal);
+}
+
+/// Comma-separated values, as they are; on a terminal without what could steer it.
+std::string csvText(const Json& rows, const std::vector<std::string>& columns,
+                    const Terminal& terminal) {
+    std::string text = CsvText::record(columns);
+    for (const Json& row : rows) {
+        std::vector<std::string> fields;
+        for (const std::string& column : columns) {
+            const std::string value = JsonText::text(row, column);
+            fields.push_back(terminal.isTerminal ? DisplayText::visible(value) : value);
+        }
+        text += CsvText::record(fields);
+    }
+    return text;
+}
+
+} // namespace
+
+ReportCommand::ReportCommand(CLI::App& program)
+    : m_command(program.add_subcommand("report", "What a log held between two times")) {
+    m_command->add_option("LOG", m_log, "The whole path of a log")->required();
+    m_command->add_option("--from", m_from, "First time (default -24h)")->type_name("TIME");
+    m_command->add_option("--to", m_to, "Last time (default now)")->type_name("TIME");
+    m_command
+        ->add_option("--where", m_where,
+                     "A condition, for example \"ENTRYSRC starts 'sshd'\"; all must hold")
+        ->type_name("CONDITION")
+        ->allow_extra_args(false);
+    m_command->add_option("--columns", m_columns, "The columns to show, separated by commas")
+        ->type_name("NAMES")
+        ->delimiter(',')
+        ->allow_extra_args(false);
+    m_command->add_option("--format", m_format, "table, json or csv (default table)")
+        ->type_name("FORMAT")
+        ->check(CLI::IsMember({"table", "json", "csv"}));
+}
+
+bool ReportCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int ReportCommand::run(Context& context) {
+    const Json body = {{"log", m_log},
+                       {"from", Context::time("--from", m_from)},
+                       {"to", Context::time("--to", m_to)},
+                       {"where", m_where}};
+    const Json answer = context.client().send("POST", "/api/v1/reports", body);
+    const Json& rows = JsonText::member(answer, "rows");
+    std::vector<std::string> columns = m_columns;
+    if (context.options().json || m_format == "json") {
+        context.printJson(answer);
+    } else if (m_format == "csv") {
+        if (columns.empty()) {
+            columns = JsonText::member(answer, "columns").get<std::vector<std::string>>();
+        }
+        context.print(csvText(rows, columns, context.terminal()));
+    } else if (!rows.empty()) {
+        if (columns.empty()) {
+            std::copy_if(usualColumns.begin(), usualColumns.end(), std::back_inserter(columns),
+                         [&](const char* column) { return hasAny(rows, column); });
+        }
+        context.print(tableText(rows, columns, context.terminal()));
+    }
+    if (JsonText::text(answer, "truncated") == "true") {
+        Context::note("the report has read " + JsonText::text(answer, "max_rows") +
+                      " entries, the most that it may: older ones are missing; begin later or end "
+                      "earlier");
+    }
+    if (rows.empty()) {
+        Context::note("no entry of " + m_log + " between these times meets the conditions");
+        return CLI_REFUSED;
+    }
+    return CLI_DONE;
+}

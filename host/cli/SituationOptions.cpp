@@ -1,0 +1,92 @@
+#include "host/cli/SituationOptions.h"
+
+#include "host/cli/CliError.h"
+
+#include <fstream>
+#include <iostream>
+#include <iterator>
+#include <utility>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = SituationOptions::Json;
+
+Json fileContent(const std::string& path) {
+    std::ifstream file;
+    if (path != "-") {
+        file.open(path);
+        if (!file) {
+            throw CliError(CLI_USAGE, "--file: cannot read " + path);
+        }
+    }
+    std::istream& input = path == "-" ? std::cin : file;
+    const std::string text((std::istreambuf_iterator<char>(input)), {});
+    Json value = Json::parse(text, nullptr, false);
+    if (!value.is_object()) {
+        throw CliError(CLI_USAGE, "--file: " + path +
+                                      " holds no JSON object; 'zrmctl situations show NAME "
+                                      "--json' prints one");
+    }
+    return value;
+}
+
+/// Takes out what the agent tells of a situation beside its definition, and what is null.
+Json withoutState(Json definition) {
+    for (const char* const key : {"source", "state", "problem", "counts", "last_raised"}) {
+        definition.erase(key);
+    }
+    for (auto member = definition.begin(); member != definition.end();) {
+        member = member->is_null() ? definition.erase(member) : std::next(member);
+    }
+    return definition;
+}
+
+} // namespace
+
+Json SituationOptions::subject(const std::string& name, const std::string& file) {
+    if (name.empty() == file.empty()) {
+        throw CliError(CLI_USAGE, "name either a situation or --file");
+    }
+    return file.empty() ? Json{{"situation", name}}
+                        : Json{{"definition", withoutState(fileContent(file))}};
+}
+
+void SituationOptions::addTo(CLI::App& command) {
+    const auto add = [&](const char* name, std::string& value, const char* type, const char* help) {
+        command.add_option(name, value, help)->type_name(type);
+    };
+    add("--file", m_file, "FILE", "The definition as JSON; - is standard input");
+    add("--text", m_text, "TEXT", "A description for people");
+    add("--severity", m_severity, "SEVERITY", "info, minor, warning, major or critical");
+    add("--log", m_log, "LOG", "The whole path of a log; without it every log");
+    command
+        .add_option("--when", m_when,
+                    "A condition, for example \"ENTRYSRC starts 'sshd'\"; all must hold")
+        ->type_name("CONDITION")
+        ->allow_extra_args(false);
+    add("--frequency", m_frequency, "COUNT", "At least or most so many, for example \">= 5\"");
+    add("--period", m_period, "TIME", "within this time, for example 60s, 5m, 1h");
+}
+
+bool SituationOptions::areGiven() const {
+    return !(m_file.empty() && m_text.empty() && m_severity.empty() && m_log.empty() &&
+             m_when.empty() && m_frequency.empty() && m_period.empty());
+}
+
+Json SituationOptions::definition(const Json& base) const {
+    Json definition = withoutState(m_file.empty() ? base : fileContent(m_file));
+    for (const auto& [key, value] :
+         {std::pair("text", &m_text), std::pair("severity", &m_severity), std::pair("log", &m_log),
+          std::pair("frequency", &m_frequency), std::pair("period", &m_period)}) {
+        if (!value->empty()) {
+            definition[key] = *value;
+        }
+    }
+    if (!m_when.empty()) {
+        definition["when"] = m_when;
+    }
+    return definition;
+}

@@ -1,0 +1,96 @@
+#include "host/cli/StatusCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/FactList.h"
+#include "host/cli/JsonText.h"
+#include "host/cli/Table.h"
+#include "host/cli/TimeDisplay.h"
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = JsonText::Json;
+
+std::string historyText(const Json& history) {
+    if (const std::string problem = JsonText::text(history, "problem"); !problem.empty()) {
+        return problem;
+    }
+    if (JsonText::text(history, "enabled") != "true") {
+        return "off";
+    }
+    const std::uint64_t events = JsonText::number(history, "events");
+    return std::to_string(events) + " events" +
+           (events > 0 ? ", " + JsonText::text(history, "oldest") + " to " +
+                             JsonText::text(history, "newest")
+                       : "") +
+           ", " + TimeDisplay::bytes(JsonText::number(history, "bytes"));
+}
+
+std::string queueText(const Json& queue) {
+    const double seconds = JsonText::member(queue, "waited_seconds").is_number()
+                               ? JsonText::member(queue, "waited_seconds").get<double>()
+                               : 0;
+    return JsonText::text(queue, "size") + " of " + JsonText::text(queue, "capacity") +
+           (JsonText::number(queue, "waits") > 0
+                ? ", logs waited " + JsonText::text(queue, "waits") + " times, " +
+                      TimeDisplay::duration(static_cast<std::uint64_t>(seconds))
+                : "");
+}
+
+Colour colourOf(const std::string& state) {
+    if (state == "up") {
+        return Colour::GOOD;
+    }
+    return state == "failing" ? Colour::BAD : Colour::NOTICE;
+}
+
+} // namespace
+
+StatusCommand::StatusCommand(CLI::App& program)
+    : m_command(program.add_subcommand("status", "How the agent itself fares")) {}
+
+bool StatusCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int StatusCommand::run(Context& context) {
+    const Json status = context.client().get("/api/v1/status");
+    if (context.options().json) {
+        context.printJson(status);
+        return CLI_DONE;
+    }
+    const Json& history = JsonText::member(status, "history");
+    FactList facts;
+    facts.add("agent", "zrmagent " + JsonText::text(status, "version") + " on " +
+                           JsonText::text(status, "node"));
+    const std::string started = JsonText::text(status, "started");
+    facts.add("up", TimeDisplay::between(started, JsonText::text(status, "time")) + ", since " +
+                        TimeDisplay::local(started));
+    facts.add("history", historyText(history),
+              JsonText::text(history, "problem").empty() ? Colour::NONE : Colour::BAD);
+    facts.add("queue", queueText(JsonText::member(status, "queue")));
+    facts.add("trace", JsonText::text(status, "trace"));
+    context.print(facts.text(context.terminal()));
+    Table sinks({{"SINK"},
+                 {"TYPE", Table::FIXED},
+                 {"STATE", Table::FIXED},
+                 {"LAG", Table::NUMBER},
+                 {"DELIVERED", Table::NUMBER},
+                 {"ERROR"}});
+    for (const Json& sink : JsonText::member(status, "sinks")) {
+        const std::string state = JsonText::text(sink, "state");
+        sinks.add({JsonText::text(sink, "name"),
+                   JsonText::text(sink, "type"),
+                   {state, colourOf(state)},
+                   JsonText::text(sink, "lag"),
+                   JsonText::text(sink, "delivered"),
+                   JsonText::text(sink, "error")});
+    }
+    if (!sinks.empty()) {
+        context.print('\n' + sinks.text(context.terminal()));
+    }
+    return CLI_DONE;
+}

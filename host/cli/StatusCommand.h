@@ -1,0 +1,18 @@
+#ifndef ZRM_HOST_STATUS_COMMAND_H
+#define ZRM_HOST_STATUS_COMMAND_H
+
+#include "host/cli/Command.h"
+
+/// `zrmctl status`: how the agent itself fares.
+class StatusCommand : public Command {
+public:
+    explicit StatusCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    int run(Context& context) override;
+
+private:
+    CLI::App* m_command;
+};
+
+#endif

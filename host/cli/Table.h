@@ -1,0 +1,50 @@
+#ifndef ZRM_HOST_CLI_TABLE_H
+#define ZRM_HOST_CLI_TABLE_H
+
+#include "host/cli/Terminal.h"
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Rows of text under headings, made to fit a terminal: columns that may shrink are shortened,
+/// the widest first; what still does not fit is cut at the edge.
+class Table {
+public:
+    enum Kind {
+        FIXED,  ///< keeps its width as long as it can
+        NUMBER, ///< the same, and stands at the right
+        TEXT,   ///< shrinks
+    };
+    struct Column {
+        std::string heading;
+        Kind kind = TEXT;
+    };
+    struct Cell {
+        Cell(std::string cellText, Colour cellColour = Colour::NONE)
+            : text(std::move(cellText)), colour(cellColour) {}
+        std::string text; ///< as it came; shown visibly
+        Colour colour;
+    };
+
+    explicit Table(std::vector<Column> columns);
+
+    /// Adds a row with a cell for each column.
+    void add(std::vector<Cell> row);
+    bool empty() const noexcept { return m_rows.empty(); }
+    std::size_t size() const noexcept { return m_rows.size(); }
+
+    /// The headings and the rows, each line with its end.
+    std::string text(const Terminal& terminal) const;
+
+private:
+    std::vector<std::size_t> widths(std::size_t available) const;
+    std::string line(const std::vector<Cell>& row, const std::vector<std::size_t>& widths,
+                     const Terminal& terminal) const;
+
+    std::vector<Column> m_columns;
+    std::vector<std::vector<Cell>> m_rows;
+};
+
+#endif

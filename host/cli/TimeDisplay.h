@@ -1,0 +1,28 @@
+#ifndef ZRM_HOST_TIME_DISPLAY_H
+#define ZRM_HOST_TIME_DISPLAY_H
+
+#include <cstdint>
+#include <ctime>
+#include <string>
+#include <string_view>
+
+/// Times and amounts as people read them. Stateless.
+class TimeDisplay {
+public:
+    /// The local time of an ISO 8601 time in UTC: "2026-11-20 07:03:09"; the text itself when it
+    /// is none.
+    static std::string local(std::string_view iso);
+
+    /// The time of a 16-character stamp likewise; empty for one of zeros.
+    static std::string stamp(std::string_view stamp);
+
+    /// "3 d 4 h", "4 h 12 min", "12 min 3 s", "3 s".
+    static std::string duration(std::uint64_t seconds);
+    /// The duration from one ISO 8601 time in UTC to another; empty when one is none.
+    static std::string between(std::string_view fromIso, std::string_view toIso);
+
+    /// "512 B", "4.2 kB", "81 MB", "3.1 GB".
+    static std::string bytes(std::uint64_t count);
+};
+
+#endif

@@ -1,0 +1,115 @@
+#include "host/cli/AgentClient.h"
+
+#include "TestAgent.h"
+#include "host/cli/CliError.h"
+
+#include <gtest/gtest.h>
+
+#include <functional>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using httplib::Request;
+using httplib::Response;
+
+void expectError(const std::function<void()>& action, CliStatus status, const std::string& text) {
+    try {
+        action();
+        FAIL() << "no error";
+    } catch (const CliError& error) {
+        EXPECT_EQ(error.status(), status);
+        EXPECT_EQ(std::string(error.what()), text);
+    }
+}
+
+class AgentClientTest : public testing::Test {
+protected:
+    void answer(int status, const std::string& body) {
+        agent.routes().Get("/x", [=](const Request&, Response& response) {
+            response.status = status;
+            response.set_content(body, "application/json");
+        });
+        agent.begin();
+        url = agent.connection().url;
+    }
+    void expectAnswer(CliStatus status, const std::string& text) {
+        AgentClient client(agent.connection());
+        expectError([&] { client.get("/x"); }, status, text);
+    }
+
+    TestAgent agent;
+    std::string url;
+};
+
+} // namespace
+
+TEST_F(AgentClientTest, SendsTokenQueryAndBody) {
+    Request seen;
+    const auto see = [&](const Request& request, Response& response) {
+        seen = request;
+        response.set_content(R"({"b":1,"a":2})", "application/json");
+    };
+    agent.routes().Get("/events", see);
+    agent.routes().Put("/trace", see);
+    agent.begin();
+    AgentClient client(agent.connection());
+    const auto got = client.get("/events", {{"log", "/var/log/a b&c=d+e.log"}, {"log", "/x"}});
+    EXPECT_EQ(got.dump(), R"({"b":1,"a":2})");
+    EXPECT_EQ(seen.get_header_value("Authorization"), "Bearer the-token");
+    EXPECT_EQ(seen.get_param_value_count("log"), 2u);
+    EXPECT_EQ(seen.get_param_value("log", 0), "/var/log/a b&c=d+e.log");
+    client.send("PUT", "/trace", {{"levels", "error"}});
+    EXPECT_EQ(seen.body, R"({"levels":"error"})");
+    EXPECT_EQ(seen.get_header_value("Content-Type"), "application/json");
+}
+
+TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
+    agent.routes().Delete("/x", [](const Request&, Response& response) { response.status = 204; });
+    agent.begin();
+    AgentClient client(agent.connection());
+    EXPECT_TRUE(client.send("DELETE", "/x", nullptr).is_null());
+}
+
+TEST_F(AgentClientTest, AProblemIsToldWithItsField) {
+    answer(400, R"({"status":400,"detail":"'is' is no operator","field":"where[0]"})");
+    expectAnswer(CLI_REFUSED, "where[0]: 'is' is no operator");
+}
+
+TEST_F(AgentClientTest, AProblemWithoutAField) {
+    answer(409, R"({"status":409,"detail":"the history is off"})");
+    expectAnswer(CLI_REFUSED, "the history is off");
+}
+
+TEST_F(AgentClientTest, AnErrorThatIsNoProblemIsTold) {
+    answer(502, "<html>");
+    expectAnswer(CLI_REFUSED, "the agent at " + url + " answered with status 502");
+}
+
+TEST_F(AgentClientTest, ATokenThatIsNotAcceptedIsTold) {
+    answer(401, "{}");
+    expectAnswer(CLI_FORBIDDEN, "the agent at " + url +
+                                    " does not accept the token of its file: name the agent's own "
+                                    "with --token-file or --config");
+}
+
+TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsTold) {
+    answer(200, "<html>");
+    expectAnswer(CLI_UNREACHABLE,
+                 "what answers at " + url + " is no zrmagent: its answer is no JSON");
+}
+
+TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
+    agent.begin();
+    url = agent.connection().url;
+    agent.end();
+    expectAnswer(CLI_UNREACHABLE, "cannot reach the agent at " + url +
+                                      ": is zrmagent running? (systemctl status zrmagent; another "
+                                      "address: --url or --config)");
+}
+
+TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {
+    EXPECT_EQ(AgentClient::pathPart("ssh-brute_force.1~"), "ssh-brute_force.1~");
+    EXPECT_EQ(AgentClient::pathPart("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
+}

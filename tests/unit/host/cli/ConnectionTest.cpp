@@ -1,0 +1,146 @@
+#include "host/cli/Connection.h"
+
+#include "host/cli/CliError.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <functional>
+
+namespace {
+
+class ConnectionTest : public testing::Test {
+protected:
+    void SetUp() override {
+        unsetenv("ZRM_URL");
+        unsetenv("ZRM_TOKEN");
+        options.config = directory.file("zrm.toml");
+        write("api-token", "secret-of-the-configuration\n");
+        write("zrm.toml", "state_directory = \"" + directory.path().string() +
+                              "\"\n[http]\nlisten = \"127.0.0.1:7186\"\n");
+    }
+    void TearDown() override {
+        unsetenv("ZRM_URL");
+        unsetenv("ZRM_TOKEN");
+    }
+    std::string write(const std::string& name, const std::string& text) const {
+        return directory.write(name, text);
+    }
+    void expectError(CliStatus status, const std::string& text) const {
+        try {
+            Connection::find(options);
+            FAIL() << "no error";
+        } catch (const CliError& error) {
+            EXPECT_EQ(error.status(), status);
+            EXPECT_EQ(std::string(error.what()), text);
+        }
+    }
+
+    TemporaryDirectory directory;
+    CommonOptions options;
+};
+
+} // namespace
+
+TEST_F(ConnectionTest, TheConfigurationNamesAddressAndToken) {
+    const Connection connection = Connection::find(options);
+    EXPECT_EQ(connection.url, "http://127.0.0.1:7186");
+    EXPECT_EQ(connection.token, "secret-of-the-configuration");
+    EXPECT_EQ(connection.tokenSource, directory.file("api-token"));
+}
+
+TEST_F(ConnectionTest, ATokenFileOfTheConfigurationIsRead) {
+    const std::string token = write("other", "secret-of-another-file");
+    write("zrm.toml", "[http]\nlisten = \"[::1]:80\"\ntoken_file = \"" + token + "\"\n");
+    const Connection connection = Connection::find(options);
+    EXPECT_EQ(connection.url, "http://[::1]:80");
+    EXPECT_EQ(connection.token, "secret-of-another-file");
+}
+
+TEST_F(ConnectionTest, TheEnvironmentGoesBeforeTheConfiguration) {
+    setenv("ZRM_URL", "http://localhost:99/", 1);
+    setenv("ZRM_TOKEN", "secret-of-the-environment\n", 1);
+    options.config = directory.file("absent.toml"); // not needed
+    const Connection connection = Connection::find(options);
+    EXPECT_EQ(connection.url, "http://localhost:99");
+    EXPECT_EQ(connection.token, "secret-of-the-environment");
+    EXPECT_EQ(connection.tokenSource, "ZRM_TOKEN");
+}
+
+TEST_F(ConnectionTest, OptionsGoBeforeTheEnvironment) {
+    setenv("ZRM_URL", "http://localhost:99", 1);
+    setenv("ZRM_TOKEN", "secret-of-the-environment", 1);
+    options.url = "https://logs.example.org:7186";
+    options.tokenFile = write("mine", "secret-of-mine");
+    const Connection connection = Connection::find(options);
+    EXPECT_EQ(connection.url, "https://logs.example.org:7186");
+    EXPECT_EQ(connection.token, "secret-of-mine");
+}
+
+TEST_F(ConnectionTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
+    options.url = "http://logs.example.org:7186";
+    expectError(CLI_USAGE, "--url: the token would reach logs.example.org unencrypted; use https, "
+                           "or an SSH tunnel");
+    setenv("ZRM_URL", "http://192.0.2.7", 1);
+    options.url.clear();
+    expectError(
+        CLI_USAGE,
+        "ZRM_URL: the token would reach 192.0.2.7 unencrypted; use https, or an SSH tunnel");
+}
+
+TEST_F(ConnectionTest, WhatIsNoAddressIsRefused) {
+    for (const char* const url : {"localhost:7186", "http://", "ftp://localhost", "http://a b:1"}) {
+        options.url = url;
+        expectError(CLI_USAGE, "--url: '" + std::string(url) +
+                                   "' is no address; write it as http://127.0.0.1:7186");
+    }
+}
+
+TEST_F(ConnectionTest, AMissingConfigurationIsTold) {
+    options.config = directory.file("absent.toml");
+    expectError(CLI_USAGE, options.config +
+                               " does not exist: name the agent's configuration with --config, or "
+                               "its address with --url");
+}
+
+TEST_F(ConnectionTest, EveryProblemOfTheConfigurationIsTold) {
+    write("zrm.toml", "[agnt]\n[http]\nlisten = 5\n");
+    try {
+        Connection::find(options);
+        FAIL() << "no error";
+    } catch (const CliError& error) {
+        EXPECT_EQ(error.status(), CLI_USAGE);
+        const std::string text = error.what();
+        EXPECT_NE(text.find("zrm.toml:1: agnt: unknown key"), std::string::npos) << text;
+        EXPECT_NE(text.find("\n" + options.config + ":3: http.listen"), std::string::npos) << text;
+    }
+}
+
+TEST_F(ConnectionTest, AConfigurationWithoutHttpHasNoAddress) {
+    write("zrm.toml", "");
+    expectError(CLI_USAGE, options.config + " switches HTTP off: give [http] a listen address, or "
+                                            "name the address with --url");
+}
+
+TEST_F(ConnectionTest, AnOpenPortIsNoAddress) {
+    write("zrm.toml", "[http]\nlisten = \"127.0.0.1:0\"\n");
+    expectError(CLI_USAGE, options.config + " leaves the port open: name the address that the "
+                                            "agent told with --url");
+}
+
+TEST_F(ConnectionTest, AMissingTokenIsTold) {
+    options.tokenFile = directory.file("absent");
+    expectError(CLI_FORBIDDEN, "cannot read the token " + options.tokenFile +
+                                   ": No such file or directory; the agent makes it when it starts "
+                                   "with HTTP");
+}
+
+TEST_F(ConnectionTest, AFileThatHoldsNoTokenIsTold) {
+    options.tokenFile = write("two-lines", "one\ntwo\n");
+    expectError(CLI_FORBIDDEN,
+                options.tokenFile + " holds no token: one line of visible characters");
+    options.tokenFile = write("blank", "\n");
+    expectError(CLI_FORBIDDEN,
+                options.tokenFile + " holds no token: one line of visible characters");
+}

@@ -1,0 +1,13 @@
+#include "host/cli/CsvText.h"
+
+#include <gtest/gtest.h>
+
+TEST(CsvTextTest, FieldsStandBetweenCommas) {
+    EXPECT_EQ(CsvText::record({"a", "", "c d"}), "a,,c d\r\n");
+    EXPECT_EQ(CsvText::record({}), "\r\n");
+}
+
+TEST(CsvTextTest, WhatWouldBreakARecordStandsInQuotes) {
+    EXPECT_EQ(CsvText::record({"a,b", "say \"hi\"", "two\nlines", "cr\r"}),
+              "\"a,b\",\"say \"\"hi\"\"\",\"two\nlines\",\"cr\r\"\r\n");
+}

@@ -1,0 +1,47 @@
+#include "host/cli/StopSignals.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <chrono>
+#include <csignal>
+
+#include <unistd.h>
+
+using namespace std::chrono_literals;
+
+TEST(StopSignalsTest, AWaitEndsAfterItsTimeWithoutASignal) {
+    StopSignals signals;
+    EXPECT_FALSE(signals.wait(1ms));
+    EXPECT_FALSE(signals.isStopped());
+}
+
+TEST(StopSignalsTest, ASignalEndsTheWaitAndDoesTheAction) {
+    for (const int number : {SIGINT, SIGTERM}) {
+        StopSignals signals;
+        std::atomic<int> stops{0};
+        signals.onStop([&] { ++stops; });
+        kill(getpid(), number);
+        EXPECT_TRUE(signals.wait(60s));
+        EXPECT_TRUE(signals.isStopped());
+        signals.onStop({}); // waits for the action
+        EXPECT_EQ(stops, 1);
+    }
+}
+
+TEST(StopSignalsTest, AnActionThatComesLateIsDoneAtOnce) {
+    StopSignals signals;
+    kill(getpid(), SIGINT);
+    ASSERT_TRUE(signals.wait(60s));
+    int stops = 0;
+    signals.onStop([&] { ++stops; });
+    EXPECT_EQ(stops, 1);
+}
+
+TEST(StopSignalsTest, TheSignalsAreAsBeforeAtTheEnd) {
+    { StopSignals signals; }
+    sigset_t blocked;
+    pthread_sigmask(SIG_SETMASK, nullptr, &blocked);
+    EXPECT_EQ(sigismember(&blocked, SIGINT), 0);
+    EXPECT_EQ(sigismember(&blocked, SIGTERM), 0);
+}
