@@ -38,6 +38,7 @@ public:
         m_client.set_connection_timeout(connectTimeout);
         m_client.set_read_timeout(answerTimeout);
         m_client.set_bearer_token_auth(m_connection.token);
+        trustCertificate();
     }
 
     httplib::Client& client() { return m_client; }
@@ -98,6 +99,19 @@ public:
     }
 
 private:
+    /// The agent's own certificate may be signed by itself, or by an authority of the house.
+    void trustCertificate() {
+        SSL_CTX* const tls = m_client.ssl_context();
+        if (tls == nullptr || m_connection.certificate.empty()) {
+            return;
+        }
+        if (SSL_CTX_load_verify_locations(tls, m_connection.certificate.c_str(), nullptr) != 1) {
+            throw CliError(CLI_FORBIDDEN, "cannot read the certificate " +
+                                              m_connection.certificate + " of the agent");
+        }
+        X509_STORE_set_flags(SSL_CTX_get_cert_store(tls), X509_V_FLAG_PARTIAL_CHAIN);
+    }
+
     const Connection m_connection;
     httplib::Client m_client;
 };

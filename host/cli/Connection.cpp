@@ -81,7 +81,12 @@ std::string urlOf(AgentConfig& config) {
         throw CliError(CLI_USAGE, config.path() + " leaves the port open: name the address that "
                                                   "the agent told with --url");
     }
-    return "http://" + listen->text();
+    ListenAddress reached = *listen;
+    if (reached.host == "0.0.0.0") { // every address, this machine's own among them
+        reached.host = "127.0.0.1";
+    }
+    const bool isSecret = !config.get().http.certificate.empty();
+    return (isSecret ? "https://" : "http://") + reached.text();
 }
 
 /// A URL that was written by hand, checked: the token goes in the clear to this machine alone.
@@ -149,6 +154,7 @@ Connection Connection::find(const CommonOptions& options) {
         connection.url = checkedUrl(url, "ZRM_URL");
     } else {
         connection.url = urlOf(config);
+        connection.certificate = config.get().http.certificate;
     }
     const std::string token = trimmed(variable("ZRM_TOKEN"));
     if (options.tokenFile.empty() && !token.empty()) {

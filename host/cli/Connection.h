@@ -16,6 +16,8 @@ struct Connection {
     std::string url; ///< "http://127.0.0.1:7186", without a slash at its end
     std::string token;
     std::string tokenSource; ///< where the token was found, for messages
+    /// File of a certificate to trust beside those of the system; empty: none.
+    std::string certificate = {};
 
     /// Finds both. The address: `--url`, ZRM_URL, `[http] listen` of the configuration. The
     /// token: `--token-file`, ZRM_TOKEN, the token file of the configuration. Throws CliError

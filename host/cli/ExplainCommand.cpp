@@ -38,9 +38,10 @@ std::string textOf(const Json& explanation, const Terminal& terminal) {
     }
     const Json& window = JsonText::member(explanation, "window");
     if (!window.is_null()) {
+        const std::string count = shown(JsonText::text(window, "count"));
         text += "  frequency " + shown(JsonText::text(window, "frequency")) + " within " +
-                shown(JsonText::text(window, "period")) + ": " +
-                shown(JsonText::text(window, "count")) + " so far\n";
+                shown(JsonText::text(window, "period")) +
+                (count.empty() ? "" : ": " + count + " so far") + '\n';
     }
     const bool isRaised = JsonText::text(explanation, "raised") == "true";
     return text + "  " +

@@ -15,6 +15,19 @@
 
 #include <CLI/CLI.hpp>
 
+namespace {
+
+/// What is wrong with a command line, with the word that stands where a command should.
+std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
+    const std::vector<std::string> rest = app.remaining();
+    if (!app.get_subcommands().empty()) {
+        return error.what();
+    }
+    return rest.empty() ? "name a command" : '\'' + rest.front() + "' is no command";
+}
+
+} // namespace
+
 Program::Program()
     : m_app(std::make_unique<CLI::App>("Works with the log-monitoring agent zrmagent.", "zrmctl")) {
     m_app->set_version_flag("--version", "zrmctl " ZRM_VERSION, "Print the version and end");
@@ -51,7 +64,7 @@ int Program::run(int argc, const char* const* argv) {
     } catch (const CLI::Success& wish) { // --help, --version
         return m_app->exit(wish);
     } catch (const CLI::ParseError& error) {
-        Context::note(std::string(error.what()) + "; zrmctl --help lists commands and options");
+        Context::note(problemOf(*m_app, error) + "; zrmctl --help lists commands and options");
         return CLI_USAGE;
     }
     try {
