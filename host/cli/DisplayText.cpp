@@ -145,3 +145,19 @@ std::string DisplayText::shortened(std::string_view visible, std::size_t columns
     }
     return std::string(beginning(visible, columns - mark)) + std::string(ellipsis);
 }
+
+std::string DisplayText::shortenedPath(std::string_view visible, std::size_t columns,
+                                       std::string_view ellipsis) {
+    if (width(visible) <= columns) {
+        return std::string(visible);
+    }
+    const std::size_t mark = width(ellipsis);
+    if (mark >= columns) {
+        return std::string(beginning(ellipsis, columns));
+    }
+    const Utf8Locale locale;
+    while (width(visible) > columns - mark) {
+        visible.remove_prefix(Utf8::firstSequence(visible).length);
+    }
+    return std::string(ellipsis) + std::string(visible);
+}

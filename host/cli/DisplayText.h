@@ -21,6 +21,9 @@ std::string_view beginning(std::string_view visible, std::size_t columns);
 /// A visible text in at most so many columns; one that is longer ends with the ellipsis.
 std::string shortened(std::string_view visible, std::size_t columns, std::string_view ellipsis);
 
+/// The same, but a text that is longer begins with the ellipsis and keeps its end.
+std::string shortenedPath(std::string_view visible, std::size_t columns, std::string_view ellipsis);
+
 } // namespace DisplayText
 
 #endif

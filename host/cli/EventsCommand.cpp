@@ -71,7 +71,7 @@ std::string tableText(const Json& events, const Terminal& terminal) {
                  {"RAISED", Table::FIXED},
                  {"SEVERITY", Table::FIXED},
                  {"SITUATION"},
-                 {"LOG"},
+                 {"LOG", Table::PATH},
                  {"ENTRY"}});
     for (const Json& event : events) {
         const std::string severity = JsonText::text(event, "severity");

@@ -119,7 +119,7 @@ int LogsCommand::list(Context& context) {
         context.printJson(answer);
         return CLI_DONE;
     }
-    Table table({{"LOG"},
+    Table table({{"LOG", Table::PATH},
                  {"TYPE", Table::FIXED},
                  {"STATUS", Table::FIXED},
                  {"ENTRIES", Table::NUMBER},

@@ -118,7 +118,7 @@ int SituationsCommand::list(Context& context) {
     Table table({{"SITUATION"},
                  {"STATE", Table::FIXED},
                  {"SEVERITY", Table::FIXED},
-                 {"LOG"},
+                 {"LOG", Table::PATH},
                  {"MATCHED", Table::NUMBER},
                  {"RAISED", Table::NUMBER},
                  {"LAST RAISED", Table::FIXED}});

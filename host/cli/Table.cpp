@@ -36,7 +36,8 @@ std::vector<std::size_t> Table::widths(std::size_t available) const {
     while (available > 0 && total > available) {
         std::size_t widest = m_columns.size();
         for (std::size_t at = 0; at < m_columns.size(); ++at) {
-            const bool shrinks = m_columns[at].kind == TEXT && widths[at] > narrowest;
+            const bool shrinks = (m_columns[at].kind == TEXT || m_columns[at].kind == PATH) &&
+                                 widths[at] > narrowest;
             if (shrinks && (widest == m_columns.size() || widths[at] > widths[widest])) {
                 widest = at;
             }
@@ -59,7 +60,9 @@ std::string Table::line(const std::vector<Cell>& row, const std::vector<std::siz
     std::size_t begin = 0;   // of the cell
     for (std::size_t at = 0; at < row.size() && begin < edge; ++at) {
         const std::size_t width = std::min(widths[at], edge - begin);
-        const std::string shown = DisplayText::shortened(row[at].text, width, terminal.ellipsis());
+        const auto shorten =
+            m_columns[at].kind == PATH ? &DisplayText::shortenedPath : &DisplayText::shortened;
+        const std::string shown = shorten(row[at].text, width, terminal.ellipsis());
         const std::size_t taken = DisplayText::width(shown);
         const std::size_t from = m_columns[at].kind == NUMBER ? begin + width - taken : begin;
         if (!shown.empty()) {

@@ -16,6 +16,7 @@ public:
         FIXED,  ///< keeps its width as long as it can
         NUMBER, ///< the same, and stands at the right
         TEXT,   ///< shrinks
+        PATH,   ///< shrinks at its beginning: the names of files differ at their ends
     };
     struct Column {
         std::string heading;

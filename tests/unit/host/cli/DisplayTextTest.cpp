@@ -47,6 +47,14 @@ TEST(DisplayTextTest, ALongTextEndsWithTheEllipsis) {
     EXPECT_EQ(shortened("abcdef", 0, "…"), "");
 }
 
+TEST(DisplayTextTest, ALongPathKeepsItsEnd) {
+    EXPECT_EQ(DisplayText::shortenedPath("/var/log/a.log", 14, "…"), "/var/log/a.log");
+    EXPECT_EQ(DisplayText::shortenedPath("/var/log/a.log", 10, "…"), "…log/a.log");
+    EXPECT_EQ(DisplayText::shortenedPath("/var/log/a.log", 10, "..."), "...g/a.log");
+    EXPECT_EQ(DisplayText::shortenedPath("/日本/a", 4, "…"), "…/a"); // a half does not fit
+    EXPECT_EQ(DisplayText::shortenedPath("/var/log/a.log", 1, "…"), "…");
+}
+
 TEST(DisplayTextTest, AWideCharacterIsNotCut) {
     EXPECT_EQ(shortened("日本語", 4, "…"), "日…");
     EXPECT_EQ(beginning("日本語", 5), "日本");
