@@ -7,25 +7,9 @@ from conftest import until
 from selenium.webdriver.common.by import By
 from selenium.webdriver.common.keys import Keys
 
-from support import MARKUP, failed_login, fill_history, history_of, other_entry, syslog_line
+from support import MARKUP, begin, failed_login, fill_history, logs_agent, other_entry, syslog_line
 
 FIRST_VIEW_BYTES = 100_000
-
-
-def logs_agent(agent):
-    auth = agent.log("auth.log", content=history_of(40))
-    app = agent.log("app.log", fields=';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description')
-    agent.log("broken.log", fields=';N ;U ;A , "%q" , year')
-    agent.situation("ssh-failed", log=auth, when=["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"], severity="critical", text="A failed SSH login")
-    begin(agent, auth, app)
-    return auth, app
-
-
-def begin(agent, *logs):
-    agent.start(wait=False)  # the broken log is never opened
-    agent.wait_trace("Agent server is listening; signal sent.")
-    for log in logs:
-        agent.wait_open(log)
 
 
 # ---------------------------------------------------------------------- token and frame

@@ -37,6 +37,14 @@ export class ApiError extends Error {
 export const signals = new EventTarget();
 const signal = (name) => signals.dispatchEvent(new Event(name));
 
+function lost() {
+  signal("lost");
+  return new ApiError(0, { detail: "The connection to the agent is lost." });
+}
+
+/** A view's module. It comes from the agent, as answers do, and fails as they do. */
+export const viewModule = (name) => import(`./views/${name}.js`).catch(() => { throw lost(); });
+
 export async function open(path, options = {}) {
   const headers = { Authorization: `Bearer ${token.get()}`, ...options.headers };
   let body;
@@ -49,8 +57,7 @@ export async function open(path, options = {}) {
     response = await fetch(path, { method: options.method || "GET", headers, body, signal: options.signal, cache: "no-store" });
   } catch (error) {
     if (error.name === "AbortError") throw error;
-    signal("lost");
-    throw new ApiError(0, { detail: "The connection to the agent is lost." });
+    throw lost();
   }
   signal("found");
   if (response.ok) return response;

@@ -19,7 +19,7 @@ function unquote(text) {
   return inner ? inner[1].replaceAll("''", "'") : null;
 }
 
-/** The parts of a condition; null when only its text can be shown. */
+/** The parts of a condition; null when its text alone can be shown and kept as it is. */
 function parse(text) {
   const match = FORM.exec(text);
   if (!match) return null;
@@ -27,10 +27,12 @@ function parse(text) {
   if (operator === "in") {
     const list = /^\[([^]*)\]\s*$/.exec(value);
     const items = list && list[1].match(/'(?:[^']|'')*'|-?\d+/g);
-    return items && { column, operator, value: items.map((item) => unquote(item) ?? item).join(", ") };
+    const values = items && items.map((item) => unquote(item) ?? item);
+    // One input cannot tell a comma in an item from one between two, nor keep blanks around an item.
+    return values?.every((item) => item && item === item.trim() && !item.includes(",")) ? { column, operator, value: values.join(", ") } : null;
   }
   const plain = unquote(value) ?? (/^-?\d+\s*$/.test(value) ? value.trim() : null);
-  return plain === null ? null : { column, operator, value: plain };
+  return plain ? { column, operator, value: plain } : null; // an input left empty has no condition yet
 }
 
 /** A list of conditions that a person edits. */
@@ -46,10 +48,13 @@ export class Conditions {
     this.list = h("div", { className: "stack-small" });
     this.element = h("fieldset", {}, h("legend", {}, "Conditions (all must hold)"), this.list,
       button("Add a condition", () => {
-        this.#add("ENTRYDESC contains ''").focus();
+        this.#add(this.#chosen({ column: "ENTRYDESC", operator: "contains", value: "" })).focus();
         this.#change();
       }));
-    for (const text of texts) this.#add(text);
+    for (const text of texts) {
+      const parts = parse(text);
+      this.#add(parts ? this.#chosen(parts) : this.#raw(text));
+    }
     this.#drawEmpty();
   }
 
@@ -74,10 +79,8 @@ export class Conditions {
     if (this.#rows.length === 0) fill(this.list, h("p", { className: "hint" }, "None: every entry of the log is meant."));
   }
 
-  #add(text) {
+  #add(row) {
     if (this.#rows.length === 0) fill(this.list);
-    const parts = parse(text);
-    const row = parts ? this.#chosen(parts) : this.#raw(text);
     const number = this.#rows.length + 1;
     const problem = h("p", { className: "problem", hidden: true });
     row.setProblem = (detail) => {

@@ -91,10 +91,13 @@ export function loading(text = "Loading") {
   return h("p", { className: "loading", role: "status" }, `${text} …`);
 }
 
+/** Why something failed; what failed for want of a connection is done again once there is one. */
 export function failure(error, retry) {
-  return h("div", { className: "empty failure", role: "alert" }, h("h2", {}, error.title || "That did not work"),
+  const element = h("div", { className: "empty failure", role: "alert" }, h("h2", {}, error.title || "That did not work"),
     h("p", {}, error.message), error.cure && h("p", {}, error.cure),
-    retry && h("p", { className: "actions" }, button("Try again", retry)));
+    retry && h("p", { className: "actions" }, button("Try again", () => retry())));
+  if (retry && error.status === 0) addEventListener("zrm-regained", () => element.isConnected && retry(), { once: true });
+  return element;
 }
 
 /** Runs the last of several calls, after a pause in them. */

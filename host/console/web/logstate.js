@@ -17,7 +17,7 @@ const WHY = [
   ["", `The monitor has ended. The agent's trace says why. ${AGAIN}`],
 ];
 
-/** {level: "bad" | "warn" | "idle" | "good", state, why} of a log of /api/v1/logs. */
+/** {level: "bad" | "warn" | "idle" | "good", state, why, more: where to look} of a log of /api/v1/logs. */
 export function judge({ row, ledger }) {
   const status = row.MONSTATUS;
   if (status.startsWith("Error")) {
@@ -33,7 +33,7 @@ export function judge({ row, ledger }) {
   const lines = ledger?.lines ?? row.NUMEVENTS;
   if (errors > 0 && row.LOGTYPE !== "E") {
     const share = lines > 0 ? Math.min(100, Math.round((errors / lines) * 100)) : 100;
-    return { level: "warn", state: "Rejects", why: `${number(errors)} ${errors === 1 ? "line does" : "lines do"} not fit the format${lines > 0 ? ` (${share < 1 ? "under 1" : share} %)` : ""}. Open the log to see which and why.` };
+    return { level: "warn", state: "Rejects", why: `${number(errors)} ${errors === 1 ? "line does" : "lines do"} not fit the format${lines > 0 ? ` (${share < 1 ? "under 1" : share} %)` : ""}.`, more: "Open the log to see which and why." };
   }
   if (ledger?.skipped_bytes > 0) return { level: "warn", state: "Skipped", why: `${number(ledger.skipped_bytes)} bytes were skipped when the file was cut short.` };
   return { level: "good", state: "Running", why: "" };

@@ -1,15 +1,9 @@
 // The frame of the page: token, views, connection.
 
-import { get, post, signals, token } from "./api.js";
+import { get, post, signals, token, viewModule } from "./api.js";
 import { button, failure, field, fill, h, loading } from "./dom.js";
 
-const VIEWS = [
-  ["logs", "Logs", "./views/logs.js"],
-  ["events", "Events", "./views/events.js"],
-  ["situations", "Situations", "./views/situations.js"],
-  ["reports", "Reports", "./views/reports.js"],
-  ["try", "Try a format", "./views/try.js"],
-];
+const VIEWS = [["logs", "Logs"], ["events", "Events"], ["situations", "Situations"], ["reports", "Reports"], ["try", "Try a format"]];
 const CHECK_EVERY = 5000;
 const LONGEST_PAUSE = 20000;
 
@@ -38,12 +32,12 @@ async function show(isFirst = false) {
     askForToken("");
     return;
   }
-  const [name, label, module] = VIEWS.find(([key]) => key === here.name) || VIEWS[0];
+  const [name, label] = VIEWS.find(([key]) => key === here.name) || VIEWS[0];
   drawNavigation(name);
   document.title = `${label} · zrmagent`;
   fill(main, loading());
   try {
-    const view = await import(module);
+    const view = await viewModule(name);
     if (number !== visit) return;
     const element = h("div", { className: `view view-${name}` });
     fill(main, element);

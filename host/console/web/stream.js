@@ -12,7 +12,8 @@ export class EventStream {
   #query;
   #handlers;
 
-  /** handlers: event(event), state("connecting" | "live" | "waiting" | "refused", detail) */
+  /** handlers: event(event), state("connecting" | "live" | "waiting" | "refused", detail): waiting says
+   *  for how many seconds and, if the agent refused, why; refused the error */
   constructor(query, after, handlers) {
     this.#query = query;
     this.#last = after;
@@ -27,6 +28,7 @@ export class EventStream {
   async #run() {
     let pause = FIRST_PAUSE;
     while (!this.#abort.signal.aborted) {
+      let refusal = null;
       try {
         this.#handlers.state("connecting");
         const headers = { Accept: "text/event-stream" };
@@ -41,9 +43,10 @@ export class EventStream {
           this.#handlers.state("refused", error);
           return;
         }
+        refusal = error;
       }
       if (this.#abort.signal.aborted) return;
-      this.#handlers.state("waiting", Math.round(pause / 1000));
+      this.#handlers.state("waiting", { seconds: Math.round(pause / 1000), error: refusal });
       await new Promise((resolve) => setTimeout(resolve, pause));
       pause = Math.min(pause * 2, LONGEST_PAUSE);
     }

@@ -40,6 +40,7 @@ class EventsPage {
     this.pause = button("Pause", () => this.#togglePause(), { "aria-pressed": "false" });
     this.newer = button("", () => { this.list.element.scrollTop = 0; this.list.element.focus(); }, { hidden: true });
     this.count = h("p", { className: "quiet" });
+    this.trouble = h("p", { className: "why bad trouble", role: "status" });
     this.list = new WindowedList({
       label: "Events, newest first", row: (event) => this.#row(event), end: () => this.#older(),
       choose: (event, isEntered) => this.#open(event, isEntered),
@@ -49,7 +50,7 @@ class EventsPage {
     this.body = h("div", { className: "stack" }, this.list.element);
     this.split = h("div", { className: "events" }, this.body, this.detail);
     fill(element,
-      h("div", { className: "head" }, h("h1", {}, "Events"), this.state, this.count, h("div", { className: "push" }, this.newer, this.pause)),
+      h("div", { className: "head" }, h("h1", {}, "Events"), this.state, this.count, h("div", { className: "push" }, this.newer, this.pause), this.trouble),
       h("div", { className: "toolbar", role: "group", "aria-label": "Filter" }, field("Situation", this.situation), field("Log", this.log),
         field("Severity", this.severity), field("Text", this.text)),
       this.split);
@@ -110,18 +111,19 @@ class EventsPage {
     fill(this.body, error.status === 409
       ? empty("The history is off", "Without it the agent keeps no events, and there are none to show. Set enabled = true under [history] in its configuration and start it again.")
       : failure(error, () => this.restart()));
-    if (error.status === 0) addEventListener("zrm-regained", () => this.body.isConnected && this.restart(), { once: true });
   }
 
   #setState(state, detail) {
     const texts = {
-      connecting: ["", "Connecting"], live: ["good", "Live"], waiting: ["bad", `Not live; next try in ${detail} s`],
+      connecting: ["", "Connecting"], live: ["good", "Live"], waiting: ["bad", `Not live; next try in ${detail?.seconds} s`],
       refused: ["bad", detail?.status === 409 ? "History off" : "Not live"],
     };
     const [level, text] = this.isPaused && state === "live" ? ["warn", "Paused"] : texts[state];
     this.streamState = state;
     this.state.className = `state ${level}`;
     this.state.textContent = text;
+    // While it is tried again, the reason stays.
+    if (state !== "connecting") this.trouble.textContent = state === "waiting" && detail.error?.status > 0 ? `New events do not come by themselves: ${detail.error.message.replace(/\.$/, "")}.` : "";
   }
 
   // Events that come close together are drawn together, once per frame.

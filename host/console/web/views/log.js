@@ -3,7 +3,7 @@
 import { get, withQuery } from "../api.js";
 import { drawRates } from "../charts.js";
 import { empty, failure, fill, h, loading, table } from "../dom.js";
-import { bytes, number, stamp, time } from "../format.js";
+import { bytes, number, plural, stamp, time } from "../format.js";
 import { judge, kindOf } from "../logstate.js";
 
 const EVERY = 10000;
@@ -11,42 +11,53 @@ const EVERY = 10000;
 export async function show(element, path) {
   const state = h("div", { className: "panel" }, loading());
   const chart = h("div", {}, loading("Loading the last 24 hours"));
+  const rates = h("section", { className: "panel" }, h("h2", {}, "Entries and events per minute, last 24 hours"), chart);
   const ledger = h("div", { className: "stack" });
   fill(element,
-    h("div", { className: "head" }, h("h1", {}, path), h("div", { className: "push" },
+    h("div", { className: "head" }, h("h1", { className: "path" }, path), h("div", { className: "push" },
       h("a", { className: "button", href: withQuery("#/reports", { log: path }) }, "Report on this log"),
       h("a", { className: "button", href: withQuery("#/try", { log: path }) }, "Try a format on it"),
       h("a", { className: "button", href: "#/logs" }, "All logs"))),
-    state, h("section", { className: "panel" }, h("h2", {}, "Entries and events per minute, last 24 hours"), chart), ledger);
+    state, rates, ledger);
   let endChart = () => {};
+  let isDrawn = false;
   const load = async () => {
     try {
-      const answer = await get(withQuery("/api/v1/logs", { log: path }));
-      const log = answer.logs.find((one) => one.log === path) || answer.logs[0];
-      if (!log) fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
-      else {
-        drawState(state, log);
-        drawLedger(ledger, log);
-      }
+      const { logs: [log] } = await get(withQuery("/api/v1/logs", { log: path }));
+      drawState(state, log);
+      drawLedger(ledger, log);
+      isDrawn = true;
+      rates.hidden = false;
     } catch (error) {
-      fill(state, failure(error, load));
+      if (error.status === 404) {
+        fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration. Add it there, then re-read the configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
+        fill(ledger);
+        rates.hidden = true;
+        isDrawn = false;
+      } else if (!isDrawn) fill(state, failure(error, load));
     }
   };
+  let isCharted = false;
   const loadChart = async () => {
     try {
-      const rates = await get("/api/v1/rates?step=300");
-      const series = rates.logs.find((one) => one.log === path);
+      const answer = await get("/api/v1/rates?step=300");
+      const series = answer.logs.find((one) => one.log === path);
       endChart();
       if (!series) fill(chart, h("p", { className: "hint" }, "No entry of this log in the last 24 hours."));
-      else endChart = await drawRates(chart, rates, series);
+      else endChart = await drawRates(chart, answer, series);
+      isCharted = Boolean(series);
     } catch (error) {
-      fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept." : error.message));
+      fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept. [history] in the configuration switches it on." : error.message));
     }
   };
   const scheme = matchMedia("(prefers-color-scheme: dark)");
   scheme.addEventListener("change", loadChart);
   await Promise.all([load(), loadChart()]);
-  const timer = setInterval(() => !document.hidden && load(), EVERY);
+  const timer = setInterval(() => {
+    if (document.hidden) return;
+    load();
+    if (!isCharted) loadChart();
+  }, EVERY);
   return () => {
     clearInterval(timer);
     scheme.removeEventListener("change", loadChart);
@@ -60,7 +71,7 @@ function drawState(element, log) {
   const ledger = log.ledger || {};
   const pairs = [
     ["Kind", kindOf(row)], ["Status", row.MONSTATUS], ["Monitored since", stamp(row.MONTIME)], ["File changed", stamp(row.LOGMODDATE)], ["Size", bytes(row.LOGSIZE)],
-    ["Read", `${bytes(ledger.bytes_read)} in ${number(ledger.lines)} lines`], ["Entries", number(ledger.rows ?? row.NUMEVENTS)], ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
+    ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`], ["Entries", number(ledger.rows ?? row.NUMEVENTS)], ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
     ["Truncations", number(ledger.truncations)], ["Skipped", bytes(ledger.skipped_bytes)], ["Restarts of the monitor", number(ledger.restarts)],
     ["Last entry", time(ledger.last_entry)], ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
   ];

@@ -1,6 +1,6 @@
 // The monitored logs: which are in trouble and why, and what comes in.
 
-import { get, withQuery } from "../api.js";
+import { get, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
 import { button, debounce, empty, failure, fill, h, loading, select, table } from "../dom.js";
 import { ago, briefTime, bytes, number, rate, rateText } from "../format.js";
@@ -17,7 +17,7 @@ const COLUMNS = [
 
 export async function show(element, query) {
   if (query.get("log")) {
-    const detail = await import("./log.js");
+    const detail = await viewModule("log");
     return detail.show(element, query.get("log"));
   }
   const page = new LogsPage(element);
@@ -120,7 +120,7 @@ class LogsPage {
     return [
       h("span", { className: `state ${log.level}` }, log.state),
       h("div", {}, h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log),
-        log.why && h("p", { className: `why ${log.level}` }, log.why)),
+        log.why && h("p", { className: `why ${log.level}` }, [log.why, log.more].filter(Boolean).join(" "))),
       kindOf(log.row), h("span", { title: "Mean of the last five minutes" }, rateText(perMinute)),
       series ? sparkline(series.entries, `Entries over 24 hours, now ${rateText(perMinute)} per minute`) : "–",
       number(log.ledger?.lines ?? log.row.NUMEVENTS), number(log.ledger?.format_errors ?? log.row.NUMERRORS),

@@ -91,13 +91,15 @@ class ReportPage {
     this.to.setProblem(Number.isNaN(to.getTime()) ? "Say until when." : to < from ? "This is before the begin." : "");
     if (Number.isNaN(from.getTime()) || Number.isNaN(to.getTime()) || to < from) return;
     this.abort = new AbortController();
+    const abort = this.abort; // of this run; another may begin before its answer
     this.#showProgress();
     try {
       const body = { log: this.log.control.value, from: from.toISOString(), to: to.toISOString(), where: this.conditions.texts };
-      this.answer = await post("/api/v1/reports", body, this.abort.signal);
+      this.answer = await post("/api/v1/reports", body, abort.signal);
       this.sort = null;
       this.#draw();
     } catch (error) {
+      if (abort !== this.abort) return;
       this.#fail(error);
     }
     clearInterval(this.timer);

@@ -1,6 +1,6 @@
 // Situations: what is watched for, how often it came, and their life.
 
-import { get, post, request, situationPath, withQuery } from "../api.js";
+import { get, post, request, situationPath, viewModule, withQuery } from "../api.js";
 import { button, confirm, empty, failure, fill, h, loading, table } from "../dom.js";
 import { ago, number } from "../format.js";
 
@@ -13,8 +13,8 @@ const COLUMNS = [
 ];
 
 export async function show(element, query) {
-  if (query.has("new") || query.has("edit")) return (await import("./situation-form.js")).show(element, query.get("edit") || "", query);
-  if (query.get("name")) return (await import("./situation.js")).show(element, query.get("name"));
+  if (query.has("new") || query.has("edit")) return (await viewModule("situation-form")).show(element, query.get("edit") || "", query);
+  if (query.get("name")) return (await viewModule("situation")).show(element, query.get("name"));
   const list = h("section", { className: "panel flush", "aria-label": "Situations" }, loading());
   const note = h("div", { role: "alert" });
   fill(element, h("div", { className: "head" }, h("h1", {}, "Situations"), h("div", { className: "push" },

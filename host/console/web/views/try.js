@@ -35,7 +35,10 @@ class TryPage {
     else this.#try();
   }
 
+  /** A try with the lines from before would come late, and wrong; one asked for meanwhile follows. */
   async #take() {
+    this.isTaking = true;
+    this.abort?.abort();
     this.lines.setProblem("");
     try {
       const answer = await post("/api/v1/try", { format: this.format.control.value, log: this.log.value, last: Number(this.count.value) });
@@ -49,10 +52,16 @@ class TryPage {
       this.#draw(answer);
     } catch (error) {
       this.lines.setProblem(error.message);
+      this.isAsked = true;
+    } finally {
+      this.isTaking = false;
+      if (this.isAsked) this.#try();
     }
   }
 
   async #try() {
+    this.isAsked = this.isTaking;
+    if (this.isTaking) return;
     const lines = this.lines.control.value.split("\n").filter((line) => line !== "").slice(0, MOST_LINES);
     const format = this.format.control.value.trim();
     this.abort?.abort();
@@ -75,7 +84,8 @@ class TryPage {
       return;
     }
     const names = fieldNames(answer.directives);
-    fill(this.result, coverage(answer.coverage, names), linesPanel(answer, names), columnsPanel(answer), this.#configuration(answer));
+    if (answer.lines.length === 0) fill(this.result, this.#configuration(answer));
+    else fill(this.result, coverage(answer.coverage, names), linesPanel(answer, names), columnsPanel(answer), this.#configuration(answer));
   }
 
   #configuration(answer) {

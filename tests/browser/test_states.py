@@ -1,0 +1,321 @@
+"""What the views say when something is off, refused, wrong, or cut short."""
+
+import http.client
+import json
+from contextlib import ExitStack
+from signal import SIGCONT, SIGSTOP
+from urllib.parse import quote
+
+import pytest
+from conftest import until
+from selenium.webdriver.support.ui import Select
+
+from support import begin, failed_login, fill_history, logs_agent
+
+MOST_CLIENTS = 32
+FIELDS = ';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description'
+
+
+def entry(text):
+    return f"2026-11-20 07:03:09 ERROR {text}\n"
+
+
+def open_log(page, log):
+    page.open(f"logs?log={quote(str(log))}")
+    page.heading(str(log))
+
+
+@pytest.fixture
+def fast_polls(driver):
+    """Views ask ten times as often."""
+    source = "const plain = setInterval; window.setInterval = (action, time) => plain(action, time / 10);"
+    made = driver.execute_cdp_cmd("Page.addScriptToEvaluateOnNewDocument", {"source": source})
+    yield
+    driver.execute_cdp_cmd("Page.removeScriptToEvaluateOnNewDocument", made)
+
+
+# ---------------------------------------------------------------------- history off
+
+
+def test_without_a_history_the_views_say_so_and_what_to_do(page, agent):
+    agent.history = {"enabled": False}
+    auth, _ = logs_agent(agent)
+    page.on(agent)
+    page.wait_text("The history is off, so events are not kept. [history] in the configuration switches it on.")
+    assert "auth.log" in page.text()
+    page.pictures("logs-history-off")
+    open_log(page, auth)
+    page.wait_text("The history is off, so rates are not kept. [history] in the configuration switches it on.")
+    page.wait_text("Monitored since")
+    page.open("events")
+    page.wait_text("Set enabled = true under [history]")
+    assert page.find("//*[@class='state bad']").text == "History off"
+    page.pictures("events-history-off")
+
+
+# ---------------------------------------------------------------------- too many clients
+
+
+def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent)
+    page.wait_text("Connected")
+    with ExitStack() as others:
+        for _ in range(MOST_CLIENTS):
+            client = http.client.HTTPConnection("127.0.0.1", page.api.port, timeout=10)
+            others.callback(client.close)
+            client.request("GET", "/api/v1/events/stream", headers={"Authorization": f"Bearer {page.token}"})
+            answer = client.getresponse()
+            others.callback(answer.close)
+            assert answer.status == 200
+        page.go("Events")
+        page.wait_text("New events do not come by themselves: too many clients follow the events: at most 32.")
+        page.wait_text("Not live; next try in")
+        page.pictures("events-full")
+    until(lambda: page.find("//*[@class='state good']").text == "Live", "the stream", 30)
+    assert "too many clients" not in page.text()
+    auth.append(failed_login(1))
+    page.wait_text("203.0.113.1")
+
+
+# ---------------------------------------------------------------------- reports
+
+
+def test_a_report_is_cancelled_and_run_again(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "reports")
+    page.choose("Log", str(auth))
+    page.wait_text("Connected")
+    agent.send(SIGSTOP)
+    try:
+        page.click("Run the report")
+        page.wait_text("Reading the log, 1 s")
+        page.pictures("report-running")
+        page.click("Run the report")  # the first run ends silently
+        page.wait_text("Reading the log, 1 s")
+        page.click("Cancel")
+        page.wait_text("Cancelled")
+        assert "Reading the log" not in page.text()
+    finally:
+        agent.send(SIGCONT)
+    page.click("Run the report")
+    page.wait_text("40 entries")
+
+
+def test_a_report_is_saved_as_json(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "reports")
+    page.choose("Log", str(auth))
+    page.click("Run the report")
+    page.wait_text("40 entries")
+    page.click("Download as JSON")
+    file = page.driver.downloads / "auth.log.json"
+    until(file.exists, "the download")
+    rows = json.loads(file.read_text(encoding="utf-8"))
+    assert len(rows) == 40
+    assert rows[0]["LOGNAME"] == "auth.log" and "Failed password" in rows[0]["ENTRYDESC"]
+
+
+# ---------------------------------------------------------------------- try a format
+
+
+def test_the_last_lines_of_a_log_are_taken(page, agent):
+    auth, app = logs_agent(agent)
+    empty = agent.log("empty.log", content=b"")
+    app.append("".join(entry(f"number {number}") for number in range(15)))
+    agent.refresh()
+    agent.wait_open(empty)
+    page.on(agent, "try")
+    page.wait_text("100 % of the lines fit")
+    page.type("Format", FIELDS.removeprefix(";N ;U ;"))
+    Select(page.find("//select[@aria-label='How many lines']")).select_by_visible_text("10")
+    log = Select(page.find("//select[@aria-label='Log']"))
+    log.select_by_visible_text(str(app))
+    page.click("Take them")
+    page.wait_text("10 of 10 lines")
+    assert page.control("Lines").get_attribute("value").splitlines() == [entry(f"number {n}").strip() for n in range(5, 15)]
+    until(lambda: page.find("//*[@aria-label='Configuration line']").text == f"{app} {FIELDS}", "the configuration line")
+    page.pictures("try-taken")
+    page.type("Format", 'A , "%q" , year')
+    page.click("Take them")
+    page.wait_text("The format cannot be used")
+    page.type("Format", FIELDS.removeprefix(";N ;U ;"))
+    page.wait_text("10 of 10 lines")
+    log.select_by_visible_text(str(empty))
+    page.click("Take them")
+    page.wait_text("This log holds no lines yet.")
+    until(lambda: str(empty) in page.find("//*[@aria-label='Configuration line']").text, "the configuration line")
+    assert "of the lines fit" not in page.text()
+    app.path.unlink()
+    log.select_by_visible_text(str(app))
+    page.click("Take them")
+    until(lambda: page.control("Lines").get_attribute("aria-invalid") == "true" and "no lines yet" not in page.text(), "the problem")
+    page.pictures("try-no-file")
+
+
+@pytest.mark.parametrize("permission", ["granted", "denied"])
+def test_the_configuration_line_is_copied(page, agent, permission):
+    logs_agent(agent)
+    for name in ("clipboard-read", "clipboard-write"):
+        page.driver.execute_cdp_cmd("Browser.setPermission", {"permission": {"name": name}, "setting": permission})
+    try:
+        page.on(agent, "try")
+        line = page.find("//*[@aria-label='Configuration line']").text
+        page.click("Copy")
+        if permission == "granted":
+            page.wait_text("Copied.")
+            copied = page.driver.execute_async_script("navigator.clipboard.readText().then(arguments[0], (e) => arguments[0](String(e)))")
+        else:
+            page.wait_text("Selected; copy it with the keyboard.")
+            copied = page.run("return getSelection().toString()")
+        assert copied == line and ' , "' in line
+    finally:
+        page.driver.execute_cdp_cmd("Browser.resetPermissions", {})
+
+
+# ---------------------------------------------------------------------- conditions as text
+
+
+def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent)
+    when = ["ENTRYTYPE = ''", "ENTRYSRC in ['a,b', 'c']", "ENTRYSYS in ['web1', 'web2']", "ENTRYDESC contains 'it''s'"]
+    body = {"name": "by-hand", "text": "Kept", "severity": "minor", "log": str(auth), "when": when}
+    status, _, answer = page.api.request("POST", "/api/v1/situations", body)
+    assert status == 201, answer
+
+    def stored():
+        return page.api.request("GET", "/api/v1/situations/by-hand")[2]
+
+    page.open("situations?edit=by-hand")
+    page.heading("Edit by-hand")
+    texts = page.all("input[aria-label='Condition']")
+    assert [one.get_attribute("value") for one in texts] == when[:2]
+    page.choose("Severity", "major")
+    page.click("Save changes")
+    page.heading("by-hand")
+    assert (stored()["when"], stored()["severity"]) == (when, "major")
+    page.click("Edit by-hand")
+    page.heading("Edit by-hand")
+    text = page.find("(//input[@aria-label='Condition'])[2]")
+    text.send_keys(" or")
+    page.wait_text("Mend what is marked")
+    assert text.get_attribute("aria-invalid") == "true"
+    page.pictures("situation-text")
+    text.clear()
+    text.send_keys("ENTRYSRC in ['a,b']")
+    until(lambda: text.get_attribute("aria-invalid") is None, "the mark to go")
+    page.click("Save changes")
+    page.heading("by-hand")
+    assert stored()["when"] == [when[0], "ENTRYSRC in ['a,b']", *when[2:]]
+
+
+# ---------------------------------------------------------------------- a log's page
+
+
+def test_a_log_shows_rejected_lines_and_skipped_ranges(page, agent):
+    app = agent.log("app.log", content=entry("before the start").encode() * 20, fields=FIELDS)
+    begin(agent, app)
+    page.on(agent)
+    app.append(entry("fits") + "this does not fit\n" + "2026-11-20 07:03:09\n")
+
+    def ledger():
+        return page.api.request("GET", f"/api/v1/logs?log={quote(str(app))}")[2]["logs"][0]["ledger"]
+
+    until(lambda: ledger()["format_errors"] == 2, "the rejected lines")
+    open_log(page, app)
+    page.wait_text("2 lines do not fit the format")
+    assert "Open the log" not in page.text()
+    page.wait_text("in 3 lines")
+
+    def table(name):
+        found = page.driver.find_elements("xpath", f"//table[caption[.='{name}']]/tbody/tr")
+        return [row.text for row in found]
+
+    rows = table("Rejected lines")
+    assert len(rows) == 2 and "this does not fit" in rows[1]
+    assert "A number for %d is expected here." in rows[1]
+    assert "Skipped when the file" not in page.text()
+    app.path.write_bytes(entry("written at once").encode() * 3)  # shorter than it was
+    size = app.path.stat().st_size
+    until(lambda: ledger()["truncations"] == 1, "the truncation")
+    page.driver.refresh()
+    page.wait_text("Skipped when the file was cut short")
+    assert [row.split()[-1] for row in table("Skipped ranges")] == [str(size)]
+    page.pictures("log-ledger")
+
+
+def test_a_log_that_cannot_be_shown_says_why(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    open_log(page, agent.directory / "broken.log")
+    page.wait_text("The format of this log cannot be learned")
+    assert page.find("//*[@class='state bad']").text == "Error"
+    page.pictures("log-error")
+    open_log(page, agent.directory / "other.log")
+    page.wait_text("This log is not monitored")
+    assert "last 24 hours" not in page.text() and "Rejected" not in page.text()
+    page.pictures("log-not-monitored")
+
+
+def test_a_log_keeps_its_state_over_a_lost_connection(page, agent, fast_polls):
+    logs = logs_agent(agent)
+    page.on(agent)
+    open_log(page, logs[0])
+    page.wait_text("Monitored since")
+    agent.listen = f"127.0.0.1:{page.api.port}"
+    agent.stop()
+    page.wait_text("The connection to the agent is lost")
+    asked = "return performance.getEntriesByType('resource').filter((one) => one.name.includes('/logs?log=')).length"
+    before = page.run(asked)
+    until(lambda: page.run(asked) >= before + 2, "two more questions")
+    assert "Monitored since" in page.text() and "That did not work" not in page.text() and "does not answer" not in page.text()
+    page.find("//nav//a[normalize-space()='Situations']").click()  # not even its module comes
+    page.wait_text("The agent does not answer")
+    begin(agent, *logs)
+    page.wait_text("ssh-failed", 40)
+    page.driver.get_log("browser")
+
+
+# ---------------------------------------------------------------------- long paths
+
+# Gives each element in sight that goes beyond its panel or the window.
+BEYOND = """
+return [...document.querySelectorAll('main *')].filter((e) => {
+  if (!e.checkVisibility() || e.closest('.unseen, svg, thead, select, [role=listbox]')) return false;
+  const panel = e.closest('.panel');
+  const limit = Math.min(innerWidth, panel ? panel.getBoundingClientRect().right : innerWidth);
+  return e.getBoundingClientRect().right > limit + 1;
+}).map((e) => `${e.tagName}.${e.className} ${e.textContent.slice(0, 60)}`);
+"""
+
+
+def test_long_paths_wrap_on_a_narrow_screen(page, agent):
+    name = "application-server-of-the-payments/instances/production-europe-west/" + "x" * 60 + "/transactions_and_settlements.log"
+    (agent.directory / name).parent.mkdir(parents=True)
+    log = agent.log(name, fields=FIELDS)
+    agent.situation("declined", log=log, severity="major")
+    agent.start()
+    log.append(entry("declined"))
+    until(agent.events, "the event")
+    page.on(agent)
+    views = {"logs": "Monitored", "situations": "declined", "situations?name=declined": "Its events", "reports": "Run the report", "try": "of the lines fit"}
+    views[f"logs?log={quote(str(log))}"] = "Monitored since"
+    for width in (360, 1280):
+        page.size(width)
+        for view, text in views.items():
+            page.open(view)
+            page.wait_text(text)
+            page.find("//h1")
+            assert page.run(BEYOND) == [], f"{view} at {width}"
+    page.open("logs")
+    page.wait_text("transactions_and_settlements.log")
+    page.pictures("logs-long-path")
+    open_log(page, log)
+    page.wait_text("Monitored since")
+    page.pictures("log-long-path")
+    page.open("events")
+    page.find("//*[@role='option']").click()
+    page.wait_text("ORIGINNODE")
+    page.size(360)
+    assert page.run(BEYOND) == []
