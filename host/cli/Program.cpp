@@ -1,6 +1,7 @@
 #include "host/cli/Program.h"
 
 #include "host/cli/BacktestCommand.h"
+#include "host/cli/CheckCommand.h"
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/EventsCommand.h"
@@ -12,6 +13,7 @@
 #include "host/cli/StatusCommand.h"
 #include "host/cli/Terminal.h"
 #include "host/cli/TraceCommand.h"
+#include "host/cli/TryCommand.h"
 
 #include <CLI/CLI.hpp>
 
@@ -54,6 +56,8 @@ Program::Program()
     m_commands.push_back(std::make_unique<BacktestCommand>(*m_app));
     m_commands.push_back(std::make_unique<RefreshCommand>(*m_app));
     m_commands.push_back(std::make_unique<TraceCommand>(*m_app));
+    m_commands.push_back(std::make_unique<CheckCommand>(*m_app));
+    m_commands.push_back(std::make_unique<TryCommand>(*m_app));
 }
 
 Program::~Program() = default;

@@ -1,8 +1,20 @@
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
 #include "host/cli/Program.h"
+#include "host/framework/TraceControl.h"
 
 #include <clocale>
+#include <cstdlib>
+#include <string>
 
 int main(int argc, char** argv) {
     std::setlocale(LC_CTYPE, ""); // whether the terminal takes UTF-8
+    // The agent's code traces where it is used here; an operator sees that only on demand.
+    const char* const levels = std::getenv("QFW_TRC1");
+    if (const std::string problem = TraceControl::configure(levels == nullptr ? "none" : levels);
+        !problem.empty()) {
+        Context::note("QFW_TRC1: " + problem);
+        return CLI_USAGE;
+    }
     return Program().run(argc, argv);
 }

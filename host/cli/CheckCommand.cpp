@@ -1,0 +1,106 @@
+#include "host/cli/CheckCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/InputFile.h"
+#include "host/config/ConfigFile.h"
+#include "host/diagnose/ConfigCheck.h"
+
+#include <algorithm>
+#include <variant>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr std::size_t numberColumns = 5;
+constexpr std::size_t verdictColumns = 8;
+constexpr std::size_t indent = numberColumns + 2 + verdictColumns + 2;
+
+/// A line that counts, with its number, verdict and reason.
+std::string textOf(const ConfigCheck::Line& line, const Terminal& terminal) {
+    const bool isRefused = line.verdict == ConfigCheck::Verdict::REFUSED;
+    const std::string number = std::to_string(line.number);
+    const std::string verdict = ConfigCheck::name(line.verdict);
+    const std::string blanks(numberColumns - std::min(numberColumns, number.size()), ' ');
+    const std::string shown = DisplayText::visible(line.text);
+    const std::size_t room = terminal.width > indent ? terminal.width - indent : 1;
+    std::string text =
+        blanks + number + "  " +
+        terminal.coloured(verdict, isRefused ? Colour::BAD : Colour::GOOD) +
+        std::string(verdictColumns - verdict.size() + 2, ' ') +
+        (terminal.width > 0 ? DisplayText::shortened(shown, room, terminal.ellipsis()) : shown) +
+        '\n';
+    std::string reason = DisplayText::visible(line.reason);
+    reason.erase(reason.find_last_not_of(' ') + 1);
+    if (!reason.empty()) {
+        text += std::string(indent, ' ') +
+                terminal.coloured(reason, isRefused ? Colour::BAD : Colour::NOTICE) + '\n';
+    }
+    return text;
+}
+
+} // namespace
+
+CheckCommand::CheckCommand(CLI::App& program)
+    : m_command(program.add_subcommand("check", "Check a configuration; needs no agent")) {
+    m_command->add_option("CONFIG", m_config,
+                          "A configuration of logs, judged line by line; - is standard input");
+    m_command->add_option("--host", m_host, "Instead the agent's own configuration, a zrm.toml")
+        ->type_name("FILE");
+}
+
+bool CheckCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int CheckCommand::run(Context& context) {
+    if (m_config.empty() == m_host.empty()) {
+        throw CliError(CLI_USAGE, "check: name either a configuration of logs or --host FILE");
+    }
+    return m_config.empty() ? checkHost(context) : checkLogs(context);
+}
+
+int CheckCommand::checkLogs(Context& context) const {
+    const ConfigCheck::Result result = ConfigCheck::check(InputFile(m_config).text());
+    const CliStatus status = result.refused == 0 ? CLI_DONE : CLI_REFUSED;
+    if (context.options().json) {
+        context.printJson(Json::parse(ConfigCheck::json(result)));
+        return status;
+    }
+    std::string text;
+    for (const ConfigCheck::Line& line : result.lines) {
+        if (line.verdict != ConfigCheck::Verdict::IGNORED) {
+            text += textOf(line, context.terminal());
+        }
+    }
+    context.print(text + std::to_string(result.accepted) + " accepted, " +
+                  std::to_string(result.refused) + " refused\n");
+    if (result.accepted == 0) {
+        Context::note("without an accepted line the agent monitors the files of the syslog "
+                      "configuration instead");
+    }
+    return status;
+}
+
+int CheckCommand::checkHost(Context& context) const {
+    const ConfigFile::Result result = ConfigFile::parse(InputFile(m_host).text(), m_host);
+    const auto* const found = std::get_if<std::vector<std::string>>(&result);
+    const std::vector<std::string> problems =
+        found == nullptr ? std::vector<std::string>() : *found;
+    if (context.options().json) {
+        context.printJson({{"accepted", problems.empty()}, {"problems", problems}});
+    } else if (problems.empty()) {
+        context.print(DisplayText::visible(m_host) + " can be used\n");
+    } else {
+        for (const std::string& problem : problems) {
+            Context::note(problem);
+        }
+    }
+    return problems.empty() ? CLI_DONE : CLI_REFUSED;
+}

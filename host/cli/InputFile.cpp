@@ -1,0 +1,62 @@
+#include "host/cli/InputFile.h"
+
+#include "agent/ErrorText.h"
+#include "host/cli/CliError.h"
+
+#include <cerrno>
+
+namespace {
+
+int leaveOpen(std::FILE*) {
+    return 0;
+}
+
+[[noreturn]] void fail(const std::string& path, int number) {
+    const ErrorText error(number);
+    throw CliError(number == EACCES ? CLI_FORBIDDEN : CLI_USAGE,
+                   "cannot read " + path + ": " + error.text());
+}
+
+} // namespace
+
+InputFile::InputFile(const std::string& path) : m_path(path), m_stream(stdin, &leaveOpen) {
+    if (path != "-") {
+        m_stream = {std::fopen(path.c_str(), "re"), &std::fclose};
+    }
+    if (m_stream == nullptr) {
+        fail(m_path, errno);
+    }
+}
+
+void InputFile::throwIfFailed() const {
+    if (std::ferror(m_stream.get()) != 0) {
+        fail(m_path, errno);
+    }
+}
+
+std::optional<std::string> InputFile::line() {
+    std::string line;
+    int character = EOF;
+    while (line.size() < kMostLine && (character = std::getc(m_stream.get())) != EOF &&
+           character != '\n') {
+        line += static_cast<char>(character);
+    }
+    throwIfFailed();
+    if (character == EOF && line.empty()) {
+        return std::nullopt;
+    }
+    return line;
+}
+
+std::string InputFile::text() {
+    std::string text;
+    int character = EOF;
+    while ((character = std::getc(m_stream.get())) != EOF) {
+        if (text.size() == kMostText) {
+            throw CliError(CLI_USAGE, m_path + " has more than 16 MiB: that is no configuration");
+        }
+        text += static_cast<char>(character);
+    }
+    throwIfFailed();
+    return text;
+}

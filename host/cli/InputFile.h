@@ -1,0 +1,33 @@
+#ifndef ZRM_HOST_INPUT_FILE_H
+#define ZRM_HOST_INPUT_FILE_H
+
+#include <cstddef>
+#include <cstdio>
+#include <memory>
+#include <optional>
+#include <string>
+
+/// A file that a command line names; "-" is standard input. One thread.
+class InputFile {
+public:
+    /// Throws CliError when the file cannot be opened.
+    explicit InputFile(const std::string& path);
+
+    /// The next line without its line end, or none behind the last one. Of a line of more than
+    /// kMostLine bytes each such part is a line. Throws CliError when the file cannot be read.
+    std::optional<std::string> line();
+
+    /// What is left. Throws CliError when that is more than kMostText bytes, or cannot be read.
+    std::string text();
+
+    static constexpr std::size_t kMostLine = 65536;
+    static constexpr std::size_t kMostText = 16 * 1024 * 1024;
+
+private:
+    void throwIfFailed() const;
+
+    std::string m_path;
+    std::unique_ptr<std::FILE, int (*)(std::FILE*)> m_stream;
+};
+
+#endif

@@ -1,0 +1,153 @@
+#include "host/cli/TryCommand.h"
+
+#include "host/cli/CliError.h"
+#include "host/cli/Context.h"
+#include "host/cli/DisplayText.h"
+#include "host/cli/InputFile.h"
+#include "host/cli/MarkedText.h"
+#include "host/cli/TimeDisplay.h"
+#include "host/diagnose/FormatTrial.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdio>
+#include <filesystem>
+#include <optional>
+#include <string_view>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr std::size_t mostLines = 100000;
+constexpr std::size_t numberColumns = 5;
+constexpr std::size_t indent = numberColumns + 2;
+constexpr std::size_t nameColumns = 12;
+
+std::string_view cell(const FormatTrial::Line& line, std::string_view column) {
+    for (const auto& [name, text] : line.row) {
+        if (name == column) {
+            return text;
+        }
+    }
+    return {};
+}
+
+/// The columns that have something to show; of twins the second only where it differs.
+std::string columnsOf(const FormatTrial::Line& line, const Terminal& terminal) {
+    std::string text;
+    for (const auto& [column, value] : line.row) {
+        const bool isTwin = column.starts_with('U');
+        if (value.empty() || (isTwin && cell(line, column.substr(1)) == value)) {
+            continue;
+        }
+        const std::string shown =
+            DisplayText::visible(column == "ENTRYTIME" ? TimeDisplay::stamp(value) : value);
+        text += std::string(indent, ' ') + terminal.coloured(column, Colour::FAINT) +
+                std::string(nameColumns - std::min(nameColumns, column.size()), ' ') + shown + '\n';
+    }
+    return text;
+}
+
+std::string reasonOf(const std::string& reason, Colour colour, const Terminal& terminal) {
+    std::string shown = DisplayText::visible(reason);
+    shown.erase(shown.find_last_not_of(' ') + 1);
+    return shown.empty() ? "" : std::string(indent, ' ') + terminal.coloured(shown, colour) + '\n';
+}
+
+std::string textOf(std::size_t number, const FormatTrial::Line& line, const Terminal& terminal) {
+    const std::string digits = std::to_string(number);
+    const std::string head =
+        std::string(numberColumns - std::min(numberColumns, digits.size()), ' ') + digits + "  ";
+    if (!line.matched && line.failedAt) {
+        // The number takes the place of the blanks in front of the text.
+        const std::string marked = MarkedText::of(line.line, *line.failedAt, indent, terminal);
+        return head + marked.substr(indent) + reasonOf(line.reason, Colour::BAD, terminal);
+    }
+    const std::string shown = DisplayText::visible(line.line);
+    const std::size_t room = terminal.width > indent ? terminal.width - indent : 1;
+    return head +
+           (terminal.width > 0 ? DisplayText::shortened(shown, room, terminal.ellipsis()) : shown) +
+           '\n' + columnsOf(line, terminal) +
+           reasonOf(line.reason, line.matched ? Colour::NOTICE : Colour::BAD, terminal);
+}
+
+std::string refusalOf(const std::string& format, const FormatTrial::Result& result,
+                      const Terminal& terminal) {
+    return (result.position ? MarkedText::of(format, *result.position, 0, terminal) : "") +
+           terminal.coloured(DisplayText::visible(result.reason), Colour::BAD) + '\n';
+}
+
+std::string coverageOf(const FormatTrial::Result& result, const Terminal& terminal) {
+    char percent[16];
+    std::snprintf(percent, sizeof percent, "%.1f", FormatTrial::percent(result));
+    const bool isWhole = result.matched == result.lines.size();
+    const Colour colour = result.matched == 0 ? Colour::BAD : Colour::NOTICE;
+    return terminal.coloured(std::to_string(result.matched) + " of " +
+                                 std::to_string(result.lines.size()) + " lines fit (" + percent +
+                                 " %)",
+                             isWhole ? Colour::GOOD : colour) +
+           '\n';
+}
+
+/// The path that the configuration line names.
+std::string logOf(const std::string& file) {
+    std::error_code error;
+    const std::filesystem::path path = std::filesystem::absolute(file, error);
+    return file == "-" || error ? std::string(FormatTrial::kSomeLog)
+                                : path.lexically_normal().string();
+}
+
+} // namespace
+
+TryCommand::TryCommand(CLI::App& program)
+    : m_command(program.add_subcommand("try", "Try a format on a file; needs no agent")) {
+    m_command
+        ->add_option("FORMAT", m_format,
+                     "The format as a log's configuration has it behind the third ';'")
+        ->required();
+    m_command->add_option("FILE", m_file, "The file with the lines; - is standard input")
+        ->required();
+    m_command->add_option("--lines", m_lines, "The first so many lines (default 100)")
+        ->type_name("COUNT")
+        ->check(CLI::Range(std::size_t{1}, mostLines));
+}
+
+bool TryCommand::isChosen() const {
+    return m_command->parsed();
+}
+
+int TryCommand::run(Context& context) {
+    InputFile file(m_file);
+    std::vector<std::string> lines;
+    std::optional<std::string> next;
+    while (lines.size() < m_lines && (next = file.line())) {
+        lines.push_back(std::move(*next));
+    }
+    const FormatTrial::Result result = FormatTrial::run(m_format, lines, logOf(m_file));
+    const CliStatus status = result.accepted && result.matched > 0 ? CLI_DONE : CLI_REFUSED;
+    if (context.options().json) {
+        context.printJson(Json::parse(FormatTrial::json(result)));
+        return status;
+    }
+    if (!result.accepted) {
+        context.print(refusalOf(m_format, result, context.terminal()));
+        return status;
+    }
+    std::size_t number = 0;
+    for (const FormatTrial::Line& line : result.lines) {
+        context.print(textOf(++number, line, context.terminal()));
+    }
+    context.print((result.lines.empty() ? "" : "\n") + coverageOf(result, context.terminal()) +
+                  DisplayText::visible(result.configurationLine) + '\n');
+    if (lines.empty()) {
+        Context::note(m_file + " has no line to try the format on");
+    }
+    return status;
+}

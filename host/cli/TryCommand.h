@@ -1,0 +1,25 @@
+#ifndef ZRM_HOST_TRY_COMMAND_H
+#define ZRM_HOST_TRY_COMMAND_H
+
+#include "host/cli/Command.h"
+
+#include <cstddef>
+#include <string>
+
+/// `zrmctl try FORMAT FILE`: what a format specifier makes of the lines of a file, or where they
+/// stop fitting. Needs no agent.
+class TryCommand : public Command {
+public:
+    explicit TryCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    int run(Context& context) override;
+
+private:
+    CLI::App* m_command;
+    std::string m_format;
+    std::string m_file;
+    std::size_t m_lines = 100;
+};
+
+#endif
