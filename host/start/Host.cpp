@@ -47,6 +47,7 @@ int Host::run() {
     {
         const std::lock_guard guard(m_mutex);
         m_mainThread = std::this_thread::get_id();
+        m_state = STARTING;
     }
     // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
     if (std::atexit([] { Host::instance().processEnds(); }) != 0) {
@@ -82,6 +83,7 @@ bool Host::begin() {
         m_state = SERVING;
         m_isBusy = true;
     }
+    m_changed.notify_all();
     m_serving->startHttp(m_config);
     m_notifier.ready();
     return true;
@@ -165,6 +167,10 @@ void Host::processEnds() {
     std::unique_lock lock(m_mutex);
     const bool isMain = std::this_thread::get_id() == m_mainThread;
     m_processEnds = true;
+    if (!isMain) {
+        // Events may have come before the start is over; what serves them is known only then.
+        m_changed.wait_until(lock, limit, [&] { return m_state != STARTING; });
+    }
     if (m_state == SERVING) {
         m_serving->limitWaits(limit);
         m_changed.wait_until(lock, limit, [&] { return isMain || !m_isBusy; });

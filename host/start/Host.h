@@ -47,7 +47,7 @@ public:
 
 private:
     using Clock = Serving::Clock;
-    enum State { BEFORE, SERVING, STOPPING, ENDED };
+    enum State { BEFORE, STARTING, SERVING, STOPPING, ENDED };
 
     Host() = default;
     bool begin();

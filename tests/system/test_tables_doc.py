@@ -7,7 +7,7 @@ import sys
 
 from api import Api
 from conftest import ROOT
-from test_error_log import log, uname_aix  # noqa: F401 (fixtures)
+from test_error_log import log, start, uname_aix  # noqa: F401 (fixtures)
 
 DOCUMENT = (ROOT / "docs/tables.md").read_text(encoding="utf-8")
 
@@ -56,8 +56,7 @@ def test_the_sample_rows_are_made_by_the_agent(agent, log):  # noqa: F811
     user_log = agent.log("orders.log", content=b"", fields=fields)
     syslog = agent.log("auth.log", content=b"", fields=";Y ;S")
     wtmp = agent.log("wtmp", content=b"", fields=";N ;A")
-    agent.start(wait=False)
-    agent.wait_trace("Agent server is listening; signal sent.")
+    start(agent)
     for followed in (user_log, syslog, wtmp):
         agent.wait_open(followed)
 
