@@ -146,7 +146,7 @@ void AgentClient::stream(const std::string& path, const Query& query,
         withQuery(path, query),
         [&](const httplib::Response& response) {
             status = response.status;
-            return true;
+            return !m_isStopped; // stop may have come before there was a connection
         },
         [&](const char* data, std::size_t size) {
             if (isSuccess(status)) {
@@ -166,6 +166,7 @@ void AgentClient::stream(const std::string& path, const Query& query,
 }
 
 void AgentClient::stop() {
+    m_isStopped = true;
     m_implementation->client().stop();
 }
 

@@ -3,6 +3,7 @@
 
 #include "host/cli/Connection.h"
 
+#include <atomic>
 #include <functional>
 #include <map>
 #include <memory>
@@ -31,7 +32,7 @@ public:
     /// after stop; throws CliError when it does not begin.
     void stream(const std::string& path, const Query& query,
                 const std::function<void(std::string_view)>& receiver);
-    /// Ends a request under way. Any thread.
+    /// Ends a request under way; a stream that begins later ends with its first piece. Any thread.
     void stop();
 
     /// A text as one part of a path: everything but letters, digits, '-', '.', '_' and '~' as
@@ -41,6 +42,7 @@ public:
 private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;
+    std::atomic<bool> m_isStopped{false};
 };
 
 #endif

@@ -113,3 +113,18 @@ TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {
     EXPECT_EQ(AgentClient::pathPart("ssh-brute_force.1~"), "ssh-brute_force.1~");
     EXPECT_EQ(AgentClient::pathPart("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
 }
+
+TEST_F(AgentClientTest, AStreamThatBeginsAfterStopEnds) {
+    agent.routes().Get("/stream", [](const Request&, Response& response) {
+        response.set_chunked_content_provider(
+            "text/event-stream", [](std::size_t, httplib::DataSink& sink) {
+                return sink.is_writable() && sink.write("more", 4); // without end
+            });
+    });
+    agent.begin();
+    AgentClient client(agent.connection());
+    client.stop();
+    int pieces = 0;
+    client.stream("/stream", {}, [&](std::string_view) { ++pieces; });
+    EXPECT_EQ(pieces, 0);
+}

@@ -23,7 +23,7 @@ using httplib::Request;
 using httplib::Response;
 
 /// An agent whose stream gives what a test has scripted for each connection, and then ends it, or
-/// stays silent when that was the last.
+/// stays silent when that was the last. The operator presses Ctrl-C when the last event has come.
 class EventFollowerTest : public testing::Test {
 protected:
     struct Part {
@@ -68,24 +68,26 @@ protected:
         response.set_chunked_content_provider(
             "text/event-stream", [this, text, isLast](std::size_t, httplib::DataSink& sink) {
                 sink.write(text.data(), text.size());
-                ++given;
-                if (isLast) {
-                    kill(getpid(), SIGINT); // nothing more is to come: the operator ends it
-                    while (!ends && sink.is_writable()) {
-                        std::this_thread::sleep_for(std::chrono::milliseconds(5));
-                    }
+                while (isLast && !ends && sink.is_writable()) {
+                    std::this_thread::sleep_for(std::chrono::milliseconds(5));
                 }
                 return false; // breaks the connection off
             });
     }
 
-    std::vector<std::uint64_t> follow(std::uint64_t after) {
+    std::vector<std::uint64_t> follow(std::uint64_t after, std::uint64_t lastEvent) {
         StopSignals signals;
         AgentClient client(agent.connection());
         EventFollower follower(client, {{"situation", "a b"}}, signals,
                                [this](const std::string& text) { notes.push_back(text); });
         std::vector<std::uint64_t> ids;
-        follower.follow(after, [&](const auto& event) { ids.push_back(event["id"]); });
+        follower.follow(after, [&](const auto& event) {
+            ids.push_back(event["id"]);
+            ++received;
+            if (ids.back() == lastEvent) {
+                kill(getpid(), SIGINT);
+            }
+        });
         ends = true;
         return ids;
     }
@@ -104,7 +106,7 @@ protected:
     std::vector<std::string> situations;
     std::vector<std::string> notes;
     std::atomic<bool> ends{false};
-    std::atomic<int> given{0}; ///< parts that were written whole
+    std::atomic<int> received{0}; ///< events
 };
 
 const std::string lost = "the connection to the agent is lost; trying to connect again";
@@ -115,7 +117,7 @@ TEST_F(EventFollowerTest, GivesEventsUntilCtrlC) {
     parts = {{event(8) + ": keep-alive\n\n" + event(9)}};
     addRoutes();
     agent.begin();
-    EXPECT_THAT(follow(7), ElementsAre(8, 9));
+    EXPECT_THAT(follow(7, 9), ElementsAre(8, 9));
     EXPECT_THAT(asked, ElementsAre("7"));
     EXPECT_THAT(situations, ElementsAre("a b"));
     EXPECT_THAT(notes, ElementsAre());
@@ -126,7 +128,7 @@ TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
         {event(8) + event(9) + "id: 10\ndata: {\"id\":1"}, {event(9) + event(10)}, {event(11)}};
     addRoutes();
     agent.begin();
-    EXPECT_THAT(follow(7), ElementsAre(8, 9, 10, 11));
+    EXPECT_THAT(follow(7, 11), ElementsAre(8, 9, 10, 11));
     EXPECT_THAT(asked, ElementsAre("7", "9", "10"));
     EXPECT_THAT(notes, ElementsAre(lost, "connected again", lost, "connected again"));
 }
@@ -136,7 +138,7 @@ TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
     parts = {{event(500)}, {event(1) + event(2)}};
     addRoutes();
     agent.begin();
-    EXPECT_THAT(follow(499), ElementsAre(500, 1, 2));
+    EXPECT_THAT(follow(499, 2), ElementsAre(500, 1, 2));
     EXPECT_THAT(asked, ElementsAre("499", "0"));
     EXPECT_THAT(notes, ElementsAre(lost,
                                    "the agent has begun a new history; its events follow from the "
@@ -149,7 +151,7 @@ TEST_F(EventFollowerTest, ARefusalEndsIt) {
     addRoutes();
     agent.begin();
     try {
-        follow(0);
+        follow(0, 1);
         FAIL() << "no error";
     } catch (const CliError& error) {
         EXPECT_EQ(error.status(), CLI_REFUSED);
@@ -162,14 +164,14 @@ TEST_F(EventFollowerTest, AnAgentThatIsStartedAgainIsFollowedFurther) {
     addRoutes();
     agent.begin();
     std::thread restart([this] {
-        while (given == 0) { // what is on its way when the agent ends may not arrive
+        while (received == 0) { // what is on its way when the agent ends may not arrive
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
         agent.end();
         addRoutes();
         agent.begin();
     });
-    EXPECT_THAT(follow(7), ElementsAre(8, 9));
+    EXPECT_THAT(follow(7, 9), ElementsAre(8, 9));
     restart.join();
     EXPECT_THAT(notes, ElementsAre(lost, "connected again"));
 }
