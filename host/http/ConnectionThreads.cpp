@@ -1,6 +1,8 @@
 #include "host/http/ConnectionThreads.h"
 
+#include <cerrno>
 #include <memory>
+#include <new>
 
 #include <pthread.h>
 
@@ -47,13 +49,14 @@ bool ConnectionThreads::start(const std::function<void()>& work, std::size_t mos
         }
         ++m_count;
     }
-    auto job = std::make_unique<Job>(Job{*this, work});
+    std::unique_ptr<Job> job(new (std::nothrow) Job{*this, work});
     pthread_attr_t attributes;
     pthread_attr_init(&attributes);
     pthread_attr_setstacksize(&attributes, stackSize);
     pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
     pthread_t thread{};
-    const int result = pthread_create(&thread, &attributes, run, job.get());
+    const int result =
+        job == nullptr ? ENOMEM : pthread_create(&thread, &attributes, run, job.get());
     pthread_attr_destroy(&attributes);
     if (result != 0) {
         ended();

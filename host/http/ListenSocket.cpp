@@ -37,12 +37,12 @@ Addresses resolve(const ListenAddress& address) {
 /// A listening socket, or -1. Two servers on one port would share its clients: an address in use
 /// is refused.
 int listening(const addrinfo& address) {
-    const int fd = socket(address.ai_family, address.ai_socktype, address.ai_protocol);
+    const int fd =
+        socket(address.ai_family, address.ai_socktype | SOCK_CLOEXEC, address.ai_protocol);
     if (fd == -1) {
         return -1;
     }
     const int on = 1;
-    fcntl(fd, F_SETFD, FD_CLOEXEC);
     fcntl(fd, F_SETFL, O_NONBLOCK); // a client may be gone when it is accepted
     setsockopt(fd, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
     if (bind(fd, address.ai_addr, address.ai_addrlen) == 0 && listen(fd, waitingClients) == 0) {
@@ -79,7 +79,8 @@ int ListenSocket::accept(int other) const {
     if (poll(waited, 2, forEver) <= 0 || waited[1].revents != 0) {
         return -1;
     }
-    const int fd = ::accept(m_fd, nullptr, nullptr);
+    // At once not for children: one that begins meanwhile would keep the client's connection open.
+    const int fd = accept4(m_fd, nullptr, nullptr, SOCK_CLOEXEC);
     if (fd == -1 && errno != EAGAIN && errno != EINTR && errno != ECONNABORTED) {
         constexpr int pause = 50; // milliseconds: descriptors are short, and the client still waits
         poll(&waited[1], 1, pause);
