@@ -88,7 +88,9 @@ std::string TraceLevels::parseWord(std::string_view word) {
         }
     }
     unsigned level = 0;
-    do {
+    bool hasMore = true;
+    while (hasMore) {
+        hasMore = classes.find('+') != std::string_view::npos;
         const std::string_view name = takePart(classes, '+');
         const std::optional<unsigned> known = classOf(name);
         if (!known) {
@@ -97,7 +99,7 @@ std::string TraceLevels::parseWord(std::string_view word) {
                    "a number from 0 to 255";
         }
         level |= *known;
-    } while (!classes.empty());
+    }
     if (unit) {
         m_units.push_back({std::string(*unit), level});
     } else {

@@ -64,6 +64,9 @@ TEST(TraceLevels, NamesTheWordThatIsWrong) {
     EXPECT_EQ(wrong("detial"), "\"detial\" in \"detial\"" + classes);
     EXPECT_EQ(wrong("fine,ValidLog=error+Fine"), "\"Fine\" in \"ValidLog=error+Fine\"" + classes);
     EXPECT_EQ(wrong("ValidLog="), "\"\" in \"ValidLog=\"" + classes);
+    EXPECT_EQ(wrong("error+"), "\"\" in \"error+\"" + classes);
+    EXPECT_EQ(wrong("+error"), "\"\" in \"+error\"" + classes);
+    EXPECT_EQ(wrong("ValidLog=fine++flow"), "\"\" in \"ValidLog=fine++flow\"" + classes);
     EXPECT_EQ(wrong("256"), "\"256\" in \"256\"" + classes);
     EXPECT_EQ(wrong("-1"), "\"-1\" in \"-1\"" + classes);
     EXPECT_EQ(wrong("0x"), "\"0x\" in \"0x\"" + classes);
