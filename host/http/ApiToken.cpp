@@ -96,6 +96,10 @@ ApiToken::ApiToken(std::string token) : m_token(std::move(token)) {}
 
 std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     TraceScope trace(anchor);
+    struct stat status {};
+    if (stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode)) {
+        return path + " is no file that can hold a token"; // opening a pipe would wait
+    }
     Stream stream(std::fopen(path.c_str(), "re"));
     if (stream == nullptr && errno == ENOENT) {
         if (std::string problem = make(path); !problem.empty()) {
@@ -104,7 +108,6 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
         trace.detail()("New token in %s.", path.c_str());
         stream.reset(std::fopen(path.c_str(), "re"));
     }
-    struct stat status {};
     if (stream == nullptr || fstat(fileno(stream.get()), &status) == -1) {
         return because("cannot read " + path, errno);
     }

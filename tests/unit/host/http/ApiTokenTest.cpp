@@ -94,6 +94,13 @@ TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
     EXPECT_EQ(problem(withContent(std::string(1024, 'x'))), "");
 }
 
+TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
+    const std::string itself = directory.path();
+    EXPECT_EQ(problem(itself), itself + " is no file that can hold a token");
+    ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
+    EXPECT_EQ(problem(path), path + " is no file that can hold a token") << "nobody waits for it";
+}
+
 TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
     const std::string deep = directory.file("no/such/api-token");
     EXPECT_EQ(problem(deep), "cannot make the directory " + directory.file("no/such") +
