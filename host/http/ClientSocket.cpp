@@ -103,7 +103,7 @@ bool ClientSocket::send(std::string_view bytes, Clock::time_point deadline) {
     return true;
 }
 
-bool ClientSocket::isGone() const {
+bool ClientSocket::isGone() {
     char byte = 0;
     const ssize_t count = recv(m_fd, &byte, 1, MSG_PEEK | MSG_DONTWAIT);
     return count == 0 || (count == -1 && errno != EAGAIN && errno != EWOULDBLOCK && errno != EINTR);

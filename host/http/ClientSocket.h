@@ -37,7 +37,7 @@ public:
     bool send(std::string_view bytes, Clock::time_point deadline);
 
     /// True when the client has closed the connection, as far as that can be seen.
-    bool isGone() const;
+    virtual bool isGone();
 
     /// Lets the client have what was sent: says that there is no more, and throws away what it
     /// still sends, for a short time.

@@ -1,17 +1,28 @@
 #include "host/http/TlsContext.h"
 
+#include "agent/ErrorText.h"
+
 #include <openssl/err.h>
 #include <openssl/ssl.h>
 #include <openssl/x509v3.h>
 
 namespace {
 
-/// What the library says of its last failure.
+/// What the library says of its last failure, or the system where a file cannot be read.
 std::string because(const std::string& what) {
     const unsigned long code = ERR_get_error();
     ERR_clear_error();
+    if (ERR_GET_LIB(code) == ERR_LIB_SYS) {
+        const ErrorText error(ERR_GET_REASON(code));
+        return what + ": " + error.text();
+    }
     const char* const reason = ERR_reason_error_string(code);
     return what + ": " + (reason == nullptr ? "unknown reason" : reason);
+}
+
+/// In place of the question at the terminal, for whose answer the agent would wait.
+int noPassphrase(char* /*text*/, int /*size*/, int /*isWriting*/, void* /*data*/) {
+    return -1;
 }
 
 } // namespace
@@ -30,14 +41,16 @@ TlsContext::load(const std::string& certificate, const std::string& key) {
     const std::shared_ptr<const TlsContext> result(new TlsContext(context));
     SSL_CTX_set_min_proto_version(context, TLS1_2_VERSION);
     SSL_CTX_set_options(context, SSL_OP_NO_RENEGOTIATION | SSL_OP_CIPHER_SERVER_PREFERENCE);
+    SSL_CTX_set_default_passwd_cb(context, noPassphrase);
     SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
     // A send that could not go on may be repeated from where its bytes have moved.
     SSL_CTX_set_mode(context, SSL_MODE_ENABLE_PARTIAL_WRITE | SSL_MODE_ACCEPT_MOVING_WRITE_BUFFER);
     if (SSL_CTX_use_certificate_chain_file(context, certificate.c_str()) != 1) {
-        return because("cannot use the certificate " + certificate);
+        return because("cannot use the certificate " + certificate) + "; it must be a PEM file";
     }
     if (SSL_CTX_use_PrivateKey_file(context, key.c_str(), SSL_FILETYPE_PEM) != 1) {
-        return because("cannot use the key " + key);
+        return because("cannot use the key " + key) +
+               "; it must be a PEM file without a passphrase";
     }
     if (SSL_CTX_check_private_key(context) != 1) {
         return because("the key " + key + " does not belong to the certificate " + certificate);

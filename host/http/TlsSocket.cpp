@@ -61,6 +61,18 @@ bool TlsSocket::open(Clock::time_point deadline) {
     return false;
 }
 
+// The farewell of a client comes as bytes, behind which the end of the connection is not seen.
+bool TlsSocket::isGone() {
+    if (m_isBroken) {
+        return true;
+    }
+    char byte = 0;
+    ERR_clear_error();
+    const int count = SSL_peek(m_session, &byte, 1);
+    short wanted = 0;
+    return count <= 0 && notYet(count, wanted) == 0;
+}
+
 ssize_t TlsSocket::tryReceive(char* bytes, std::size_t size, short& wanted) {
     ERR_clear_error();
     const int count = SSL_read(m_session, bytes, sizeFor(size));

@@ -17,6 +17,8 @@ public:
 
     bool open(Clock::time_point deadline) override;
 
+    bool isGone() override;
+
 protected:
     void sayFarewell() override;
     ssize_t tryReceive(char* bytes, std::size_t size, short& wanted) override;

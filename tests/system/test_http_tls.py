@@ -6,11 +6,26 @@ import re
 import socket
 import ssl
 import subprocess
+import sys
 import time
 
 import pytest
 
-from conftest import PATIENCE
+from conftest import PATIENCE, wait_until
+
+# Becomes another program that has a terminal, at which nobody sits.
+WITH_TERMINAL = (
+    sys.executable,
+    "-c",
+    """
+import fcntl, os, sys, termios
+os.setsid()
+for end in os.openpty():
+    os.set_inheritable(end, True)
+fcntl.ioctl(end, termios.TIOCSCTTY, 0)
+os.execv(sys.argv[1], sys.argv[1:])
+""",
+)
 
 
 def make_certificate(directory, name="agent"):
@@ -114,20 +129,34 @@ def test_clients_that_never_finish_the_handshake_hold_nobody_up(agent, serving):
         client.close()
 
 
-@pytest.mark.parametrize("broken", ["certificate", "key", "pair"])
+@pytest.mark.parametrize(
+    "broken", ["certificate", "no certificate", "key", "no key", "passphrase", "pair"]
+)
 def test_without_a_usable_certificate_monitoring_goes_on(agent, broken):
     certificate, key = make_certificate(agent.directory)
     if broken == "pair":
         _, key = make_certificate(agent.directory, "other")
+    elif broken == "passphrase":
+        encrypted = key.with_suffix(".encrypted")
+        subprocess.run(
+            ["openssl", "pkey", "-aes128", "-passout", "pass:secret", "-in", key, "-out", encrypted],
+            check=True, capture_output=True,
+        )  # fmt: skip
+        key = encrypted
+    elif broken.startswith("no "):
+        {"no certificate": certificate, "no key": key}[broken].unlink()
     else:
         {"certificate": certificate, "key": key}[broken].write_text("nonsense")
     agent.log()
     agent.listen = "127.0.0.1:0"
     agent.http_keys = {"certificate": certificate, "key": key}
-    agent.start()
+    agent.start(wrapper=WITH_TERMINAL)
     expected = {
-        "certificate": f"HTTP is off: cannot use the certificate {certificate}: ",
+        "certificate": f"HTTP is off: cannot use the certificate {certificate}: no start line; it must be a PEM file",
+        "no certificate": f"HTTP is off: cannot use the certificate {certificate}: No such file or directory",
         "key": f"HTTP is off: cannot use the key {key}: ",
+        "no key": f"HTTP is off: cannot use the key {key}: No such file or directory",
+        "passphrase": f"HTTP is off: cannot use the key {key}: ",
         "pair": f"HTTP is off: cannot use the key {key}: key values mismatch",
     }[broken]
     agent.wait_trace(expected)
@@ -140,3 +169,31 @@ def test_other_machines_need_tls(agent):
     agent.start(wait=False)
     assert agent.wait_end() == 2
     assert agent.trace("can be reached from other machines; write a loopback address")
+
+
+def test_a_client_that_takes_its_leave_from_a_stream_is_seen_to_go(serving):
+    port, token, context = serving()
+
+    def clients():
+        connection = http.client.HTTPSConnection("127.0.0.1", port, context=context, timeout=PATIENCE)
+        connection.request("GET", "/metrics", headers={"Authorization": f"Bearer {token}"})
+        text = connection.getresponse().read().decode()
+        connection.close()
+        return re.search(r"^zrm_http_stream_clients (\d+)$", text, re.M).group(1)
+
+    raw = socket.create_connection(("127.0.0.1", port), timeout=PATIENCE)
+    stream = context.wrap_socket(raw, server_hostname="agent.example")
+    stream.sendall(
+        f"GET /api/v1/events/stream HTTP/1.1\r\nHost: agent.example:{port}\r\n"
+        f"Authorization: Bearer {token}\r\n\r\n".encode()
+    )
+    assert stream.recv(100).startswith(b"HTTP/1.1 200")
+    assert clients() == "1"
+    left = time.monotonic()
+    try:
+        stream.unwrap()
+    except ssl.SSLError:
+        pass  # what the server had sent meanwhile is not read
+    stream.close()
+    wait_until(lambda: clients() == "0", "the end of the stream")
+    assert time.monotonic() - left < 12, "not only when the stream has something to send"
