@@ -34,10 +34,11 @@ void ReportResource::addRoutes(Router& router) {
 HttpAnswer ReportResource::report(const HttpRequest& request) {
     TraceScope trace(anchor);
     const ReportRequest wanted = ReportRequest::parse(request.body);
-    const SampleSource::Rows rows = m_source.take("RMLOGENT", wanted.conditions);
-    if (rows.count == 0 && !m_source.isMonitored(wanted.conditions)) {
+    // Asked first: the agent takes a report on a log that it does not know for an error of its own.
+    if (!m_source.isMonitored(wanted.conditions)) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
+    const SampleSource::Rows rows = m_source.take("RMLOGENT", wanted.conditions);
     std::string text = "{\"log\":";
     RowJson::appendText(text, wanted.log);
     text += ",\"from\":\"" + wanted.from + "\",\"to\":\"" + wanted.to +

@@ -23,10 +23,11 @@ HttpAnswer SampleResource::sample(const HttpRequest& request) {
         throw RequestRefused(*problem);
     }
     const auto& wanted = std::get<std::vector<Condition>>(conditions);
-    const SampleSource::Rows rows = m_source.take(table, wanted);
-    if (rows.count == 0 && table == "RMLOGENT" && !m_source.isMonitored(wanted)) {
+    // Asked first: the agent takes a report on a log that it does not know for an error of its own.
+    if (table == "RMLOGENT" && !m_source.isMonitored(wanted)) {
         throw RequestRefused(404, "the agent does not monitor this log", "filters");
     }
+    const SampleSource::Rows rows = m_source.take(table, wanted);
     return HttpAnswer::json("{\"table\":\"" + table + "\",\"rows\":" + rows.json +
                             ",\"count\":" + std::to_string(rows.count) +
                             ",\"truncated\":" + (rows.truncated ? "true}" : "false}"));

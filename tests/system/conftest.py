@@ -364,3 +364,17 @@ def agents(tmp_path):
 @pytest.fixture
 def agent(agents):
     return agents()
+
+
+@pytest.fixture
+def serving(agent):
+    """Starts the agent with HTTP on a free port and a log with this content; log and API."""
+    from api import Api  # which itself needs this module
+
+    def start(content=b"", **keys):
+        log = agent.log(content=content.encode() if isinstance(content, str) else content, **keys)
+        agent.listen = "127.0.0.1:0"
+        agent.start()
+        return log, Api(agent)
+
+    return start

@@ -16,19 +16,6 @@ from conftest import syslog_line
 EVER = ("0700101000000000", "1991231235959000")
 
 
-@pytest.fixture
-def serving(agent):
-    """Starts the agent with HTTP on a free port and a log with this content."""
-
-    def start(content=b"", **keys):
-        log = agent.log(content=content.encode() if isinstance(content, str) else content, **keys)
-        agent.listen = "127.0.0.1:0"
-        agent.start()
-        return log, Api(agent)
-
-    return start
-
-
 def lines_of_the_last_hour(count):
     """One line for each second up to now, oldest first, and the time of the first."""
     begin = int(time.time()) - count
@@ -263,6 +250,24 @@ def test_what_is_not_there_is_not_found(serving):
     for method, path in (("GET", "/none"), ("GET", "/api/v1/tables/RMMONLOG/sample"), ("POST", "/x")):
         got, kind, _ = api.request(method, path, "" if method == "POST" else None)
         assert got in (404, 405) and kind == "application/problem+json", path
+
+
+def test_a_report_on_a_log_that_is_not_monitored_is_no_error_of_the_agent(agent, serving):
+    log, api = serving()
+    before = agent.trace(" Error")
+    begin, end = EVER
+    for method, path, body in (
+        ("POST", "/api/v1/reports", {"log": "/no/such.log", "from": begin}),
+        ("POST", "/api/v1/tables/RMLOGENT/sample", {"filters": [
+            {"column": "LOGPATH", "op": "=", "value": "/no/"},
+            {"column": "LOGNAME", "op": "=", "value": "such.log"},
+            {"column": "ENTRYTIME", "op": ">=", "value": begin},
+            {"column": "ENTRYTIME", "op": "<=", "value": end}]}),
+    ):  # fmt: skip
+        got, _, problem = api.request(method, path, body)
+        assert (got, problem["detail"]) == (404, "the agent does not monitor this log")
+    assert agent.stop() == 0
+    assert agent.trace("such.log") == [] and agent.trace(" Error") == before
 
 
 def test_without_a_place_for_the_token_monitoring_goes_on(agent):

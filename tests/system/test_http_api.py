@@ -11,19 +11,6 @@ from api import Api, stamp
 from conftest import syslog_line, wait_until
 
 
-@pytest.fixture
-def serving(agent):
-    """Starts the agent with HTTP on a free port and a log with this content."""
-
-    def start(content=b"", **keys):
-        log = agent.log(content=content.encode() if isinstance(content, str) else content, **keys)
-        agent.listen = "127.0.0.1:0"
-        agent.start()
-        return log, Api(agent)
-
-    return start
-
-
 def as_iso(when):
     return time.strftime("%Y-%m-%dT%H:%M:%SZ", time.gmtime(when))
 

@@ -148,8 +148,7 @@ TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
 
 TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
     source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
-        EXPECT_EQ(table, "RMLOGENT");
-        EXPECT_EQ(conditions.size(), 4u);
+        EXPECT_EQ(conditions.size(), table == "RMLOGENT" ? 4u : 2u);
         return SampleSource::Rows{"[{}]", 1, true};
     };
     const auto result = sample("RMLOGENT", report());
@@ -157,7 +156,7 @@ TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
     EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[{}],"count":1,"truncated":true})");
 }
 
-TEST_F(HttpServerTest, AnEmptyReportOnALogThatIsNotMonitoredIsAProblem) {
+TEST_F(HttpServerTest, AReportOnALogThatIsNotMonitoredIsAProblem) {
     std::vector<std::string> asked;
     std::size_t monitored = 0;
     source.onTake = [&](const std::string& table, const std::vector<Condition>& conditions) {
@@ -166,7 +165,7 @@ TEST_F(HttpServerTest, AnEmptyReportOnALogThatIsNotMonitoredIsAProblem) {
     };
     expectProblem(sample("RMLOGENT", report()), 404, "the agent does not monitor this log",
                   "filters");
-    EXPECT_THAT(asked, testing::ElementsAre("RMLOGENT 4", "RMMONLOG 2"));
+    EXPECT_THAT(asked, testing::ElementsAre("RMMONLOG 2")) << "the agent is not asked for it";
     monitored = 1;
     const auto result = sample("RMLOGENT", report());
     ASSERT_TRUE(result);
