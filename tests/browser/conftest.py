@@ -26,12 +26,10 @@ def _load(name, path):
     return module
 
 
-# The agent and the client of its API are those of the system tests.
-_this = sys.modules.get("conftest")
-harness = _load("conftest", SYSTEM / "conftest.py")
+# The agent and the client of its API are those of the system tests, where these modules have their
+# names; here they are modules of a package, so that both can be run at once.
+harness = sys.modules.get("conftest") or _load("conftest", SYSTEM / "conftest.py")
 api = _load("zrm_api", SYSTEM / "api.py")
-if _this is not None:
-    sys.modules["conftest"] = _this
 
 PATIENCE = 15
 

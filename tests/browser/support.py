@@ -2,7 +2,7 @@
 
 import time
 
-from conftest import syslog_line, until
+from browser.conftest import syslog_line, until
 
 MARKUP = "<img src=x onerror=window.ran=true><script>window.ran=true</script><b>bold</b>"
 

@@ -1,10 +1,10 @@
 """Labels, roles, focus and contrast of every view, computed in the page."""
 
 import pytest
-from conftest import until
+from browser.conftest import until
 from selenium.webdriver.common.keys import Keys
 
-from support import fill_history, history_of
+from browser.support import fill_history, history_of
 
 VIEWS = ["logs", "events", "situations", "situations?new", "situations?name=ssh-failed", "reports", "try"]
 

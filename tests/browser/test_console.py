@@ -3,11 +3,11 @@
 import re
 import time
 
-from conftest import until
+from browser.conftest import until
 from selenium.webdriver.common.by import By
 from selenium.webdriver.common.keys import Keys
 
-from support import MARKUP, begin, failed_login, fill_history, logs_agent, other_entry, syslog_line
+from browser.support import MARKUP, begin, failed_login, fill_history, logs_agent, other_entry, syslog_line
 
 FIRST_VIEW_BYTES = 100_000
 

@@ -7,10 +7,10 @@ from signal import SIGCONT, SIGSTOP
 from urllib.parse import quote
 
 import pytest
-from conftest import until
+from browser.conftest import until
 from selenium.webdriver.support.ui import Select
 
-from support import begin, failed_login, fill_history, logs_agent
+from browser.support import begin, failed_login, fill_history, logs_agent
 
 MOST_CLIENTS = 32
 FIELDS = ';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description'
