@@ -15,6 +15,15 @@ constexpr std::size_t mostBehindHead = 8 * 1024 * 1024;
 constexpr std::size_t pieceSize = 4096; ///< received at a time
 constexpr std::string_view headEnd = "\r\n\r\n";
 
+/// Takes away what some clients send behind a body.
+void dropEmptyLines(std::string& in) {
+    std::size_t size = 0;
+    while (in.compare(size, 2, "\r\n") == 0) {
+        size += 2;
+    }
+    in.erase(0, size);
+}
+
 } // namespace
 
 ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle) {
@@ -22,12 +31,11 @@ ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle
     m_at = 0;
     m_requestDeadline = Clock::now() + (m_in.empty() ? idle : requestTime);
     for (bool hasBegun = !m_in.empty();;) {
-        while (m_in.starts_with("\r\n")) {
-            m_in.erase(0, 2); // as some clients send behind a body
-        }
+        dropEmptyLines(m_in);
         const std::size_t end = m_in.find(headEnd);
         if (end != std::string::npos && end <= largestHead) {
-            dropRanges(end);
+            m_headSize = end;
+            dropRanges();
             m_answerDeadline = m_requestDeadline + answerTime;
             m_bodyLeft = mostBehindHead;
             return COMPLETE;
@@ -51,13 +59,13 @@ ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle
 
 // Answers are given whole. The library would examine the header with a recursion as deep as its
 // value is long.
-void ClientConnection::dropRanges(std::size_t headSize) {
+void ClientConnection::dropRanges() {
     constexpr std::string_view name = "range:";
-    for (std::size_t line = m_in.find("\r\n"); line < headSize;) {
+    for (std::size_t line = m_in.find("\r\n"); line < m_headSize;) {
         const std::size_t next = m_in.find("\r\n", line + 2);
         if (strncasecmp(m_in.data() + line + 2, name.data(), name.size()) == 0) {
             m_in.erase(line, next - line);
-            headSize -= next - line;
+            m_headSize -= next - line;
         } else {
             line = next;
         }

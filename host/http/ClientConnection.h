@@ -26,6 +26,9 @@ public:
     /// thing to be read. The time for head and body begins with the first byte.
     Head readHead(std::chrono::milliseconds idle);
 
+    /// The head that was waited for, without the empty line at its end. Until something is read.
+    std::string_view head() const { return std::string_view(m_in).substr(0, m_headSize); }
+
     /// Reads on in the request. The number of bytes; 0 when the client sends no more in time, or
     /// more than any request needs.
     std::size_t read(char* bytes, std::size_t size);
@@ -43,11 +46,12 @@ public:
 
 private:
     void refill();
-    void dropRanges(std::size_t headSize);
+    void dropRanges();
 
     ClientSocket& m_socket;
-    std::string m_in;           ///< received
-    std::size_t m_at = 0;       ///< of it, what has been read
+    std::string m_in;     ///< received
+    std::size_t m_at = 0; ///< of it, what has been read
+    std::size_t m_headSize = 0;
     std::size_t m_bodyLeft = 0; ///< bytes behind the head that may still be received
     Clock::time_point m_requestDeadline;
     Clock::time_point m_answerDeadline;

@@ -1,8 +1,9 @@
 #include "host/http/HttpExchange.h"
 
-#include <algorithm>
-#include <cctype>
-#include <charconv>
+#include "host/http/HttpDate.h"
+#include "host/http/RequestHead.h"
+
+#include <iterator>
 #include <string>
 #include <utility>
 
@@ -10,6 +11,13 @@
 #include <signal.h>
 
 namespace {
+
+/// Headers of every answer that does not say otherwise. Answers are given whole: without ranges.
+constexpr std::pair<const char*, const char*> usualHeaders[] = {
+    {"Cache-Control", "no-store"},
+    {"X-Content-Type-Options", "nosniff"},
+    {"Accept-Ranges", "none"},
+};
 
 /// The library hands parts of a connection to its own functions through this.
 class ConnectionStream : public httplib::Stream {
@@ -38,7 +46,7 @@ private:
 /// The request that a thread is serving.
 struct Exchange {
     ClientConnection& connection;
-    IncomingRequest incoming = {};
+    IncomingRequest incoming;
     bool isBodyRead = false; ///< what follows in the connection is the next request
 };
 
@@ -55,56 +63,15 @@ private:
     struct sigaction m_action {};
 };
 
-std::optional<std::string> header(const httplib::Request& request, const char* name) {
-    return request.has_header(name) ? std::optional(request.get_header_value(name)) : std::nullopt;
-}
-
-/// How long the body is, and what leaves that open.
-void readFraming(const httplib::Request& request, IncomingRequest& incoming) {
-    const std::string length = request.get_header_value("Content-Length");
-    const std::string coding = request.get_header_value("Transfer-Encoding");
-    std::size_t size = 0;
-    const char* const end = length.data() + length.size();
-    const auto [stop, error] = std::from_chars(length.data(), end, size);
-    const bool isNumber = error == std::errc() && stop == end;
-    if (request.get_header_value_count("Host") > 1) {
-        incoming.problem = "the Host header comes more than once";
-    } else if (!coding.empty() && (!length.empty() || coding != "chunked")) {
-        incoming.problem = "send the body's length, or the body in chunks";
-    } else if (request.get_header_value_count("Content-Length") > 1 ||
-               request.get_header_value_count("Transfer-Encoding") > 1 ||
-               (request.has_header("Content-Length") && (length.empty() || !isNumber))) {
-        incoming.problem = "the body's length is not clear";
-    } else if (request.has_header("Content-Encoding")) {
-        incoming.problem = "send the body without a content coding";
-    }
-    if (!length.empty()) {
-        incoming.length = size;
-    }
-    incoming.hasBody = !coding.empty() || size > 0;
-}
-
-void readHeaders(const httplib::Request& request, IncomingRequest& incoming) {
-    const std::size_t end = std::min(request.target.find('?'), request.target.size());
-    incoming.request.method = request.method;
-    incoming.request.path = request.target.substr(0, end);
-    incoming.rawQuery = request.target.substr(std::min(end + 1, request.target.size()));
-    incoming.rawQuery.erase(std::min(incoming.rawQuery.find('#'), incoming.rawQuery.size()));
-    incoming.request.lastEventId = request.get_header_value("Last-Event-ID");
-    incoming.request.accept = request.get_header_value("Accept");
-    incoming.contentType = request.get_header_value("Content-Type");
-    incoming.headers = {header(request, "Host"), header(request, "Origin"),
-                        header(request, "Authorization")};
-    readFraming(request, incoming);
-}
-
-/// Takes what is of interest out of a request, and from the library what it need not know: it
-/// would search its routes with a recursion as deep as the path is long, and hold back what a
-/// stream sends in order to compress it.
+/// Takes from the library what it need not know: it would search its routes with a recursion as
+/// deep as the path is long, and hold back what a stream sends in order to compress it.
 void takeOver(httplib::Request& request) {
-    readHeaders(request, current->incoming);
     request.path = "/";
     request.headers.erase("Accept-Encoding");
+    if (current->incoming.isLast) {
+        request.headers.erase("Connection");
+        request.set_header("Connection", "close"); // so that the answer says it too
+    }
 }
 
 } // namespace
@@ -112,7 +79,9 @@ void takeOver(httplib::Request& request) {
 class HttpExchange::Engine : private httplib::Server {
 public:
     Engine(RequestDispatcher& dispatcher, std::stop_token stop);
-    bool serve(ClientConnection& connection);
+    bool serve(ClientConnection& connection, bool isLast);
+    static void refuse(ClientConnection& connection, const HttpAnswer& answer);
+    RequestDispatcher& dispatcher() const noexcept { return m_dispatcher; }
 
 private:
     static BodyReader readerOf(const httplib::ContentReader& reader);
@@ -131,7 +100,7 @@ HttpExchange::Engine::Engine(RequestDispatcher& dispatcher, std::stop_token stop
     set_payload_max_length(RequestDispatcher::largestBody + 1);
     set_keep_alive_timeout(15); // for the header that tells the client
     set_keep_alive_max_count(HttpExchange::requestsPerConnection);
-    set_default_headers({{"Cache-Control", "no-store"}, {"X-Content-Type-Options", "nosniff"}});
+    set_default_headers({std::begin(usualHeaders), std::end(usualHeaders)});
     set_pre_routing_handler([this](const auto& request, auto& response) {
         if (mayHaveBody(request.method)) {
             return HandlerResponse::Unhandled;
@@ -146,8 +115,7 @@ HttpExchange::Engine::Engine(RequestDispatcher& dispatcher, std::stop_token stop
     Post("/", withBody).Put("/", withBody).Patch("/", withBody).Delete("/", withBody);
     set_error_handler([this](const auto&, auto& response) {
         if (response.body.empty() && !response.content_provider_) {
-            write(RequestDispatcher::answerOf(
-                      {response.status, "the request cannot be read as HTTP", ""}),
+            write(m_dispatcher.refuse({response.status, "the request cannot be read as HTTP", ""}),
                   response);
         }
     });
@@ -180,13 +148,14 @@ BodyReader HttpExchange::Engine::readerOf(const httplib::ContentReader& reader) 
 
 void HttpExchange::Engine::answer(httplib::Response& response, const BodyReader& readBody) {
     Exchange& exchange = *current;
-    const bool hasBody = exchange.incoming.hasBody || !exchange.incoming.problem.empty();
+    const bool hasBody = exchange.incoming.hasBody;
+    const bool isSaidToBeLast = exchange.incoming.isLast;
     exchange.isBodyRead = !hasBody;
     if (hasBody && readBody == nullptr) {
-        exchange.incoming.problem = "this method has no body";
+        exchange.incoming.problem = {400, "this method has no body", ""};
     }
     HttpAnswer answer = m_dispatcher.answer(std::move(exchange.incoming), readBody);
-    if (!exchange.isBodyRead) {
+    if (!exchange.isBodyRead && !isSaidToBeLast) {
         response.set_header("Connection", "close");
     }
     write(std::move(answer), response);
@@ -194,6 +163,7 @@ void HttpExchange::Engine::answer(httplib::Response& response, const BodyReader&
 
 void HttpExchange::Engine::write(HttpAnswer answer, httplib::Response& response) {
     response.status = answer.status;
+    response.set_header("Date", HttpDate::now());
     for (const auto& [name, value] : answer.headers) {
         response.headers.erase(name); // in place of a default
         response.set_header(name, value);
@@ -221,14 +191,31 @@ void HttpExchange::Engine::writeStream(HttpAnswer answer, httplib::Response& res
         });
 }
 
-bool HttpExchange::Engine::serve(ClientConnection& connection) {
-    Exchange exchange{connection};
+bool HttpExchange::Engine::serve(ClientConnection& connection, bool isLast) {
+    Exchange exchange{connection, RequestHead::read(connection.head())};
+    if (exchange.incoming.problem) {
+        refuse(connection, m_dispatcher.answer(std::move(exchange.incoming), nullptr));
+        return false;
+    }
+    exchange.incoming.isLast = exchange.incoming.isLast || isLast;
+    isLast = exchange.incoming.isLast;
     current = &exchange;
     ConnectionStream stream(connection);
-    bool isLast = false;
-    const bool isServed = process_request(stream, false, isLast, takeOver);
+    bool isClosed = false;
+    const bool isServed = process_request(stream, false, isClosed, takeOver);
     current = nullptr;
-    return isServed && !isLast && exchange.isBodyRead && !stream.isBroken();
+    return isServed && !isLast && !isClosed && exchange.isBodyRead && !stream.isBroken();
+}
+
+// Not by the library, which has not seen the request, or could see another one in it.
+void HttpExchange::Engine::refuse(ClientConnection& connection, const HttpAnswer& answer) {
+    std::string head = "HTTP/1.1 " + std::to_string(answer.status) + " Refused\r\n";
+    for (const auto& [name, value] : usualHeaders) {
+        head += std::string(name) + ": " + value + "\r\n";
+    }
+    connection.write(head + "Date: " + HttpDate::now() + "\r\nContent-Type: " + answer.contentType +
+                     "\r\nContent-Length: " + std::to_string(answer.body.size()) +
+                     "\r\nConnection: close\r\n\r\n" + answer.body);
 }
 
 HttpExchange::HttpExchange(RequestDispatcher& dispatcher, std::stop_token stop)
@@ -241,13 +228,10 @@ HttpExchange::HttpExchange(RequestDispatcher& dispatcher, std::stop_token stop)
 
 HttpExchange::~HttpExchange() = default;
 
-bool HttpExchange::serve(ClientConnection& connection) {
-    return m_engine->serve(connection);
+bool HttpExchange::serve(ClientConnection& connection, bool isLast) {
+    return m_engine->serve(connection, isLast);
 }
 
 void HttpExchange::refuse(ClientConnection& connection, const Problem& problem) {
-    const std::string body = problem.json();
-    connection.write("HTTP/1.1 " + std::to_string(problem.status) +
-                     " Refused\r\nContent-Type: application/problem+json\r\nContent-Length: " +
-                     std::to_string(body.size()) + "\r\nConnection: close\r\n\r\n" + body);
+    Engine::refuse(connection, m_engine->dispatcher().refuse(problem));
 }

@@ -21,12 +21,12 @@ public:
     HttpExchange(const HttpExchange&) = delete;
     HttpExchange& operator=(const HttpExchange&) = delete;
 
-    /// Serves the one request whose head has been read. True when the connection can be used for
-    /// another one.
-    bool serve(ClientConnection& connection);
+    /// Serves the one request whose head has been read; `isLast`: the client is told that the
+    /// connection ends with it. True when the connection can be used for another one.
+    bool serve(ClientConnection& connection, bool isLast);
 
     /// Writes a problem document in place of the answer to a request that was not read.
-    static void refuse(ClientConnection& connection, const Problem& problem);
+    void refuse(ClientConnection& connection, const Problem& problem);
 
 private:
     class Engine;

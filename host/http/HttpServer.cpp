@@ -70,7 +70,11 @@ void HttpServer::accept(int fd) {
     TraceScope trace(anchor);
     const int moved = fcntl(fd, F_DUPFD_CLOEXEC, m_lowestDescriptor);
     close(fd);
-    if (moved != -1 && !m_threads.start([this, moved] { serve(moved); }, m_mostConnections)) {
+    if (moved != -1 && m_threads.start([this, moved] { serve(moved); }, m_mostConnections)) {
+        return;
+    }
+    ++m_refused;
+    if (moved != -1) {
         close(moved);
         trace.detail()("Connection refused: %zu are open.", m_threads.count());
     }
@@ -89,17 +93,22 @@ std::unique_ptr<ClientSocket> HttpServer::socketFor(int fd) const {
 }
 
 void HttpServer::serve(int fd) {
-    const std::unique_ptr<ClientSocket> socket = socketFor(fd);
-    if (!socket->open(Clock::now() + openTime)) {
-        return;
-    }
+    std::unique_ptr<ClientSocket> socket;
     try {
+        socket = socketFor(fd);
+        if (!socket->open(Clock::now() + openTime)) {
+            return;
+        }
         serveRequests(*socket);
     } catch (const std::exception& exception) {
         TraceScope trace(anchor);
         trace.error()("A connection broke off: %s", exception.what());
     }
-    socket->linger();
+    if (socket != nullptr) {
+        socket->linger();
+    } else {
+        close(fd);
+    }
 }
 
 void HttpServer::serveRequests(ClientSocket& socket) {
@@ -110,14 +119,15 @@ void HttpServer::serveRequests(ClientSocket& socket) {
             return;
         }
         if (head == ClientConnection::TOO_LONG) {
-            HttpExchange::refuse(connection, {431, "the head has more than 16384 bytes", ""});
+            m_exchange.refuse(connection, {431, "the head has more than 16384 bytes", ""});
             return;
         }
         if (head == ClientConnection::TOO_SLOW) {
-            HttpExchange::refuse(connection, {408, "the request did not come within 10 s", ""});
+            m_exchange.refuse(connection, {408, "the request did not come within 10 s", ""});
             return;
         }
-        if (!m_exchange.serve(connection) || m_stop.isRaised()) {
+        const bool isLast = number + 1 == HttpExchange::requestsPerConnection;
+        if (!m_exchange.serve(connection, isLast || m_stop.isRaised()) || m_stop.isRaised()) {
             return;
         }
     }

@@ -11,6 +11,7 @@
 #include "host/http/StopSignal.h"
 #include "host/http/TlsContext.h"
 
+#include <atomic>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -43,6 +44,8 @@ public:
     /// What was answered so far, and how many connections are open. Any thread.
     const RequestStatistics& statistics() const noexcept { return m_dispatcher.statistics(); }
     std::size_t connections() const { return m_threads.count(); }
+    /// Connections that found no place.
+    std::uint64_t refusedConnections() const noexcept { return m_refused.load(); }
 
     /// Ends the serving: requests under way are answered first, streams end. At the limit it
     /// returns although a client is still being served; no request is answered from then on. Any
@@ -69,6 +72,7 @@ private:
     std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
     std::size_t m_mostConnections = 0;
     int m_lowestDescriptor = 0; ///< of connections
+    std::atomic<std::uint64_t> m_refused{0};
     std::thread m_acceptor;
     ConnectionThreads m_threads; ///< last: the threads use what stands above
 };

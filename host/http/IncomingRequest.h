@@ -2,6 +2,7 @@
 #define ZRM_HOST_INCOMING_REQUEST_H
 
 #include "host/http/HttpRequest.h"
+#include "host/http/Problem.h"
 #include "host/http/RequestGuard.h"
 
 #include <cstddef>
@@ -16,8 +17,10 @@ struct IncomingRequest {
     RequestGuard::Headers headers;
     std::string contentType;
     bool hasBody = false;
+    bool isChunked = false;            ///< the body comes in chunks
+    bool isLast = false;               ///< the connection ends with the answer
     std::optional<std::size_t> length; ///< of the body, where the client tells it
-    std::string problem;               ///< what makes the request ambiguous; empty when nothing
+    std::optional<Problem> problem;    ///< what makes the request unclear; none when nothing
 };
 
 /// Reads the body of a request, at most so many bytes. Throws RequestRefused when it is longer, or

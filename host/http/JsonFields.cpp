@@ -188,6 +188,7 @@ void JsonFields::refuseUnknown() const {
         for (const std::string& name : m_known) {
             known += (known.empty() ? "" : ", ") + name;
         }
-        refuse(key, "unknown member; the members are " + known);
+        refuse(key, known.empty() ? "this body takes no members"
+                                  : "unknown member; the members are " + known);
     }
 }

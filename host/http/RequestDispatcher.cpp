@@ -81,6 +81,11 @@ HttpAnswer RequestDispatcher::answerOf(const Problem& problem) {
     return answer;
 }
 
+HttpAnswer RequestDispatcher::refuse(const Problem& problem) {
+    m_statistics.count("", "", problem.status, {});
+    return answerOf(problem);
+}
+
 HttpAnswer RequestDispatcher::answer(IncomingRequest incoming, const BodyReader& readBody) {
     TraceScope trace(anchor);
     const auto begin = std::chrono::steady_clock::now();
@@ -110,8 +115,8 @@ HttpAnswer RequestDispatcher::answerOrProblem(IncomingRequest& incoming, const B
 HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyReader& readBody,
                                         std::string& route) {
     HttpRequest& request = incoming.request;
-    if (!incoming.problem.empty()) {
-        throw RequestRefused(400, incoming.problem, "");
+    if (incoming.problem) {
+        throw RequestRefused(*incoming.problem);
     }
     const Router::Match match = m_router.match(request.method, request.path);
     route = match.pattern;

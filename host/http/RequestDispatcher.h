@@ -33,6 +33,9 @@ public:
     /// Throws nothing.
     HttpAnswer answer(IncomingRequest incoming, const BodyReader& readBody);
 
+    /// The answer to a request of which not even the head could be read.
+    HttpAnswer refuse(const Problem& problem);
+
     /// What refuses a body that is too long.
     static RequestRefused tooLong();
 

@@ -14,8 +14,8 @@ class RequestStatistics {
 public:
     /// Requests that are counted together. There are only as many as the router has routes.
     struct Kind {
-        std::string method;
-        std::string route; ///< its pattern; empty for paths at which nothing is
+        std::string method; ///< empty when the request's head could not be read
+        std::string route;  ///< its pattern; empty for paths at which nothing is
         int status = 0;
         auto operator<=>(const Kind&) const = default;
     };

@@ -10,7 +10,7 @@ void HttpMetrics::collect(MetricText& text) {
     const RequestStatistics& statistics = m_server.statistics();
     text.counter("zrm_http_requests_total", "Requests over HTTP that were answered.");
     for (const auto& [kind, count] : statistics.counts()) {
-        text.add(count, {{"method", kind.method},
+        text.add(count, {{"method", kind.method.empty() ? "none" : kind.method},
                          {"route", kind.route.empty() ? "none" : kind.route},
                          {"status", std::to_string(kind.status)}});
     }
@@ -22,6 +22,8 @@ void HttpMetrics::collect(MetricText& text) {
     }
     text.gauge("zrm_http_connections", "Connections of clients that are open.");
     text.add(static_cast<double>(m_server.connections()));
+    text.counter("zrm_http_refused_connections_total", "Connections that found no place.");
+    text.add(m_server.refusedConnections());
     text.gauge("zrm_http_stream_clients", "Clients that follow the events.");
     text.add(static_cast<double>(m_stream.clients()));
 }

@@ -6,6 +6,7 @@ import resource
 import socket
 import threading
 import time
+from email.utils import parsedate_to_datetime
 
 import pytest
 
@@ -145,6 +146,11 @@ def test_long_heads_are_refused(serving):
         "another kind": ("Content-Length: 2\r\nContent-Type: application/jsonlines\r\n", 415),
         "with parameters": ("Content-Length: 2\r\nContent-Type: Application/JSON; charset=utf-8\r\n", 200),
         "form": ("Content-Length: 2\r\nContent-Type: multipart/form-data; boundary=x\r\n", 415),
+        "blank before the colon": ("Content-Length : 2\r\n", 400),
+        "encoded length": ("Content-Length: %32\r\n", 400),
+        "line feed alone": ("Content-Length: 2\n\r\n", 400),
+        "folded": ("Transfer-Encoding:\r\n chunked\r\n", 400),
+        "encoded coding": ("Transfer-Encoding: chunke%64\r\n", 400),
         "two hosts": ("Host: evil.example\r\nContent-Length: 2\r\n", 400),
         "ranges": ("Content-Length: 2\r\nRange: bytes=" + "0-1," * 3000 + "5-6\r\n", 200),
         "range that is none": ("Content-Length: 2\r\nrAnGe: x\r\n", 200),
@@ -199,6 +205,44 @@ def test_bytes_that_are_no_http_are_answered_and_harm_nobody(serving):
     for data in (b"", b"\r\n", b"\r\n\r\n", b"GET / HT"):
         exchange(api, data)  # nothing to answer; it must just not be the end of anything
     prompt(api)
+
+
+def test_nothing_behind_chunks_is_a_request(serving):
+    """The form of chunks leaves much open; what another reader takes for their end is not used."""
+    _, api = serving
+    head = (
+        f"POST /api/v1/tables/RMMONLOG/sample HTTP/1.1\r\nHost: localhost:{api.port}\r\n"
+        f"Authorization: Bearer {api.token}\r\nContent-Type: application/json\r\n"
+        "Transfer-Encoding: chunked\r\n\r\n"
+    ).encode()
+    inner = b"GET /healthz HTTP/1.1\r\nHost: localhost:%d\r\n\r\n" % api.port
+    with connect(api) as client:
+        client.sendall(head + b"0x2;a=b\n{}\r\n0\r\n\r\n" + inner)
+        answer = b""
+        while piece := client.recv(65536):
+            answer += piece
+    assert answer.count(b"HTTP/1.1 ") == 1, answer
+    assert b"Connection: close" in answer
+
+
+def test_every_answer_has_a_date(serving):
+    _, api = serving
+    for request in (b"GET /healthz HTTP/1.1\r\nHost: x\r\n\r\n", b"GET  / HTTP/1.1\r\n\r\n",
+                    b"GET /healthz HTTP/1.1\r\nX: " + b"x" * 20000):  # fmt: skip
+        with connect(api) as client:
+            client.sendall(request)
+            head = client.recv(65536).partition(b"\r\n\r\n")[0]
+        (date,) = [line for line in head.split(b"\r\n") if line.startswith(b"Date: ")]
+        sent = parsedate_to_datetime(date[6:].decode()).timestamp()
+        assert abs(sent - time.time()) < 120
+
+
+def test_the_host_may_stand_in_the_request_line(serving):
+    _, api = serving
+    for host, status in ((f"localhost:{api.port}", 200), ("evil.example", 421)):
+        request = f"GET http://{host}/healthz HTTP/1.1\r\nHost: localhost:{api.port}\r\nConnection: Close\r\n\r\n"
+        got, body = exchange(api, request.encode(), end=False)
+        assert got == status, body
 
 
 def test_chunked_bodies_are_read(serving):

@@ -1,6 +1,7 @@
 #include "host/http/HttpExchange.h"
 
 #include "host/http/HttpServer.h"
+#include "host/http/RequestHead.h"
 #include "host/http/RequestRefused.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
@@ -74,6 +75,8 @@ TEST_F(HttpExchangeTest, AnswersHaveTheirOwnHeadersInPlaceOfTheUsualOnes) {
     EXPECT_EQ(result->get_header_value("Cache-Control"), "max-age=60");
     EXPECT_EQ(result->get_header_value("X-Own"), "1");
     EXPECT_EQ(result->get_header_value("X-Content-Type-Options"), "nosniff");
+    EXPECT_THAT(result->get_header_value("Date"),
+                testing::MatchesRegex("[A-Z][a-z][a-z], .. [A-Z][a-z][a-z] .... ..:..:.. GMT"));
     handoff.pass();
     answer.status = 204;
     const auto none = client().Delete("/answer");
@@ -128,6 +131,18 @@ TEST_F(HttpExchangeTest, ARequestIsReadAsItWasSent) {
     EXPECT_EQ(asking.Head("/a/x")->status, 200);
     handoff.pass();
     EXPECT_EQ(seen.method, "GET");
+}
+
+TEST_F(HttpExchangeTest, TheLastAnswerOfAConnectionSaysSo) {
+    httplib::Client kept = client();
+    kept.set_keep_alive(true);
+    for (std::size_t count = 1; count <= HttpExchange::requestsPerConnection; ++count) {
+        const auto result = kept.Get("/answer");
+        ASSERT_TRUE(result) << count;
+        ASSERT_EQ(result->get_header_value("Connection"),
+                  count == HttpExchange::requestsPerConnection ? "close" : "")
+            << count;
+    }
 }
 
 TEST_F(HttpExchangeTest, AStreamIsSentAsItIsWritten) {
@@ -252,6 +267,7 @@ TEST_F(HttpExchangeTest, WhatWasAnsweredIsCounted) {
     client().Get("/nothing");
     client().Delete("/nothing");
     httplib::Client("127.0.0.1", server.port()).Get("/answer");
+    client().Get("/" + std::string(RequestHead::largestTarget, 'x'));
     const auto counts = server.statistics().counts();
     using Kind = RequestStatistics::Kind;
     EXPECT_EQ(counts.at(Kind{"GET", "/answer", 200}), 1u);
@@ -259,7 +275,8 @@ TEST_F(HttpExchangeTest, WhatWasAnsweredIsCounted) {
     EXPECT_EQ(counts.at(Kind{"GET", "/answer", 401}), 1u);
     EXPECT_EQ(counts.at(Kind{"GET", "", 404}), 1u);
     EXPECT_EQ(counts.at(Kind{"DELETE", "", 404}), 1u);
-    EXPECT_EQ(counts.size(), 5u);
+    EXPECT_EQ(counts.at(Kind{"GET", "", 414}), 1u);
+    EXPECT_EQ(counts.size(), 6u);
 }
 
 } // namespace
