@@ -1,5 +1,6 @@
 #include "host/metrics/LogMetrics.h"
 
+#include "host/diagnose/LogLedgers.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowText.h"
 #include "host/framework/Sample.h"
@@ -10,41 +11,56 @@
 #include <optional>
 #include <string>
 
+#include <sys/stat.h>
+
 namespace {
 
 struct LogState {
-    std::int32_t entries = 0;
-    std::int32_t errors = 0;
-    std::int32_t size = -1;
     std::string status;
+    std::optional<LogLedgerView> ledger; ///< none: a refresh has just ended its monitoring
+};
+using Logs = std::map<std::string, LogState>; ///< by path, so that no two have the same labels
+
+/// What the ledger of a log counts. The numbers of the table's rows have 32 bits.
+struct Count {
+    const char* name;
+    const char* help;
+    std::int64_t LogLedgerView::*value;
 };
 
-std::int32_t integer(const Sample& sample, std::size_t row, const char* name) {
-    const RowColumn* const column = sample.layout().find(name);
-    return column == nullptr ? 0 : column->integer(sample.row(row));
-}
+constexpr Count counts[] = {
+    {"zrm_log_read_bytes_total", "Bytes that were read from the log.", &LogLedgerView::bytesRead},
+    {"zrm_log_lines_total", "Lines that were read from the log.", &LogLedgerView::lines},
+    {"zrm_log_entries_total", "Entries that the lines of the log gave.", &LogLedgerView::rows},
+    {"zrm_log_format_errors_total", "Lines of the log that did not fit its format.",
+     &LogLedgerView::formatErrors},
+    {"zrm_log_truncations_total", "Times that the log became shorter.",
+     &LogLedgerView::truncations},
+    {"zrm_log_skipped_bytes_total", "Bytes that were not read since the log had become shorter.",
+     &LogLedgerView::skippedBytes},
+    {"zrm_log_restarts_total", "Times that the log's monitor was begun again.",
+     &LogLedgerView::restarts},
+};
 
-/// By path, so that no two have the same labels.
-std::map<std::string, LogState> takeLogs() {
-    std::map<std::string, LogState> logs;
+Logs takeLogs() {
+    Logs logs;
     const std::optional<Sample> sample = Sample::take("RMMONLOG", {}, "metrics");
     for (std::size_t row = 0; sample && row < sample->size(); ++row) {
         LogState& log = logs[LogPath::of(sample->layout(), sample->row(row))];
-        log.entries = integer(*sample, row, "NUMEVENTS");
-        log.errors = integer(*sample, row, "NUMERRORS");
-        log.size = integer(*sample, row, "LOGSIZE");
         if (const RowColumn* const status = sample->layout().find("MONSTATUS")) {
             std::string room;
             log.status = RowText::of(*status, sample->row(row), room);
         }
     }
+    for (LogLedgerView& ledger : LogLedgers::read()) {
+        if (const auto log = logs.find(ledger.log); log != logs.end()) {
+            log->second.ledger = std::move(ledger);
+        }
+    }
     return logs;
 }
 
-} // namespace
-
-void LogMetrics::collect(MetricText& text) {
-    const std::map<std::string, LogState> logs = takeLogs();
+void collectStates(MetricText& text, const Logs& logs) {
     text.gauge("zrm_logs", "Number of monitored logs.");
     text.add(static_cast<double>(logs.size()));
     text.gauge("zrm_log_running", "1 while the log is being read, 0 in any other state.");
@@ -55,18 +71,46 @@ void LogMetrics::collect(MetricText& text) {
     for (const auto& [path, log] : logs) {
         text.add(1.0, {{"log", path}, {"state", log.status}});
     }
-    text.counter("zrm_log_entries_total", "Entries that were read from the log.");
-    for (const auto& [path, log] : logs) {
-        text.add(static_cast<double>(log.entries), {{"log", path}});
-    }
-    text.counter("zrm_log_errors_total", "Errors of the log's monitor.");
-    for (const auto& [path, log] : logs) {
-        text.add(static_cast<double>(log.errors), {{"log", path}});
-    }
-    text.gauge("zrm_log_size_bytes", "Size of the log, where the system tells it.");
-    for (const auto& [path, log] : logs) {
-        if (log.size >= 0) {
-            text.add(static_cast<double>(log.size), {{"log", path}});
+}
+
+void collectCounts(MetricText& text, const Logs& logs) {
+    for (const Count& count : counts) {
+        text.counter(count.name, count.help);
+        for (const auto& [path, log] : logs) {
+            if (log.ledger) {
+                text.add(static_cast<double>((*log.ledger).*count.value), {{"log", path}});
+            }
         }
     }
+}
+
+void collectTimes(MetricText& text, const Logs& logs) {
+    constexpr double milliseconds = 1000.0;
+    text.gauge("zrm_log_last_entry_timestamp_seconds",
+               "When entries were last read from the log, in seconds since 1970.");
+    for (const auto& [path, log] : logs) {
+        if (log.ledger && log.ledger->lastEntry) {
+            text.add(static_cast<double>(*log.ledger->lastEntry) / milliseconds, {{"log", path}});
+        }
+    }
+}
+
+void collectSizes(MetricText& text, const Logs& logs) {
+    text.gauge("zrm_log_size_bytes", "Size of the log, where the system tells it.");
+    for (const auto& [path, log] : logs) {
+        struct stat status {};
+        if (log.ledger && stat(log.ledger->file.c_str(), &status) == 0) {
+            text.add(static_cast<double>(status.st_size), {{"log", path}});
+        }
+    }
+}
+
+} // namespace
+
+void LogMetrics::collect(MetricText& text) {
+    const Logs logs = takeLogs();
+    collectStates(text, logs);
+    collectCounts(text, logs);
+    collectTimes(text, logs);
+    collectSizes(text, logs);
 }

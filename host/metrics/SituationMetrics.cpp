@@ -46,7 +46,7 @@ void SituationMetrics::collect(MetricText& text) {
         }
     }
     constexpr double milliseconds = 1000.0;
-    text.gauge("zrm_situation_last_raised_seconds",
+    text.gauge("zrm_situation_last_raised_timestamp_seconds",
                "When the situation was last raised, in seconds since 1970.");
     for (const SituationStatus& situation : situations) {
         if (situation.lastRaised != 0) {

@@ -51,6 +51,7 @@ def serving(agent):
 
 def test_metrics_tell_what_happens(agent, serving):
     log, api = serving
+    before = log.path.stat().st_size
     for number in range(3):
         log.append(syslog_line(f"line {number}"))
     agent.wait_events(3)
@@ -58,7 +59,11 @@ def test_metrics_tell_what_happens(agent, serving):
     api.request("GET", "/api/v1/status")
     wait_until(lambda: value(metrics(api), "zrm_log_entries_total", log=str(log)) == 3, "3 entries")
     text = metrics(api)
-    assert value(text, "zrm_log_errors_total", log=str(log)) == 0
+    assert value(text, "zrm_log_lines_total", log=str(log)) == 3
+    assert value(text, "zrm_log_read_bytes_total", log=str(log)) == log.path.stat().st_size - before
+    for count in ("format_errors", "truncations", "skipped_bytes", "restarts"):
+        assert value(text, f"zrm_log_{count}_total", log=str(log)) == 0, count
+    assert abs(value(text, "zrm_log_last_entry_timestamp_seconds", log=str(log)) - time.time()) < 120
     assert value(text, "zrm_log_size_bytes", log=str(log)) == log.path.stat().st_size
     assert value(text, "zrm_log_running", log=str(log)) == 1
     assert value(text, "zrm_log_state", log=str(log), state="Running") == 1
@@ -66,7 +71,7 @@ def test_metrics_tell_what_happens(agent, serving):
     for count, expected in (("offered", 3), ("matched", 3), ("discarded", 0), ("raised", 3)):
         assert value(text, f"zrm_situation_{count}_total", situation="every-entry") == expected
     assert value(text, "zrm_situation_matched_total", situation='odd \\"name\\"\\\\') == 0
-    assert abs(value(text, "zrm_situation_last_raised_seconds") - time.time()) < 120
+    assert abs(value(text, "zrm_situation_last_raised_timestamp_seconds") - time.time()) < 120
     assert value(text, "zrm_queue_capacity_events") > 0
     assert value(text, "zrm_queue_waits_total") == 0
     assert value(text, "zrm_sink_up", type="jsonl") == 1
@@ -76,11 +81,35 @@ def test_metrics_tell_what_happens(agent, serving):
     assert value(text, "zrm_http_requests_total", route="/api/v1/status", status="200") == 1
     assert value(text, "zrm_http_request_duration_seconds_count", route="/api/v1/status") == 1
     assert value(text, "zrm_http_connections") >= 1
+    assert value(text, "zrm_http_refused_connections_total") == 0
     assert value(text, "process_cpu_seconds_total") > 0
     assert value(text, "process_resident_memory_bytes") > 1e6
     assert value(text, "process_open_fds") > 3
     assert abs(value(text, "process_start_time_seconds") - time.time()) < 600
     assert value(text, "zrm_build_info") == 1
+
+
+def test_counts_and_sizes_have_more_than_32_bits(agent):
+    """Sizes come from the system, not from the table's rows."""
+    log = agent.log()
+    with open(log.path, "ab") as stream:
+        stream.truncate(5 * 2**32 + 17)  # a hole
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    assert value(metrics(Api(agent)), "zrm_log_size_bytes", log=str(log)) == 5 * 2**32 + 17
+
+
+def test_odd_names_of_logs_are_labels(agent):
+    log = agent.log(name='quo"te\\back{}=,\xe9.log')
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    text = metrics(Api(agent))
+    name = str(log).replace("\\", "\\\\").replace('"', '\\"')
+    assert f'zrm_log_lines_total{{log="{name}"}} 0' in text.splitlines()
+    linted = subprocess.run(
+        ["promtool", "check", "metrics"], input=text, capture_output=True, text=True, timeout=60
+    )
+    assert (linted.returncode, linted.stdout + linted.stderr) == (0, "")
 
 
 def test_metrics_need_the_token(serving):
