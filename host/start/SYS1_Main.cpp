@@ -6,6 +6,7 @@
 #include "host/start/Host.h"
 #include "host/start/Say.h"
 #include "host/start/ServiceNotifier.h"
+#include "host/start/StandardStreams.h"
 
 #include <cstddef>
 #include <cstdio>
@@ -68,6 +69,7 @@ void setTrace(const std::string& file) {
 } // namespace
 
 void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
+    StandardStreams::fill();
     const CommandLine commandLine = readCommandLine(*argc, argv);
     std::string path = commandLine.config();
     if (path.empty() && access(defaultConfig, F_OK) == 0) {

@@ -103,3 +103,31 @@ def test_a_reader_of_standard_output_that_goes_away_does_not_end_the_agent(agent
     log.append(syslog_line("nobody listens"))
     agent.wait_trace("Broken pipe")
     assert agent.stop() == 0
+
+
+def test_closed_standard_streams_are_nobody_elses(agent):
+    """The files that the agent opens must not become what it takes for its outputs."""
+    log = agent.log()
+    agent.situation(log=log)
+    debug = agent.directory / "debug.log"
+    agent.agent_keys["debug_log"] = str(debug)
+    output = agent.directory / "events.jsonl"
+    agent.more_sinks = [{"type": "jsonl", "path": str(output)}]
+    trace = agent.directory / "trace"
+    agent.start(
+        "--trace-file",
+        str(trace),
+        wait=False,
+        wrapper=["sh", "-c", 'exec "$0" "$@" 0<&- 1>&- 2>&-'],
+    )
+    wait_until(lambda: trace.exists() and "signal sent" in trace.read_text(), "the start")
+    opened = lambda: any(
+        os.path.realpath(link) == str(log) for link in Path(f"/proc/{agent.process.pid}/fd").iterdir()
+    )
+    wait_until(opened, "the open log")
+    streams = [os.readlink(f"/proc/{agent.process.pid}/fd/{number}") for number in range(3)]
+    assert streams == ["/dev/null"] * 3
+    log.append(syslog_line("nobody listens"))
+    wait_until(lambda: "events to standard output: write failed" in trace.read_text(), "the failure")
+    assert agent.stop() == 0
+    assert len(output.read_text().splitlines()) == 1
