@@ -44,7 +44,7 @@ public:
         }
     }
 
-    /// What was saved is gone.
+    /// What was saved is gone, or is to be saved anew.
     void forgetSaved() {
         for (Entry& entry : m_entries) {
             entry.saved = notSaved;

@@ -17,9 +17,6 @@ TRC1_Anchor anchor{"History.cpp"};
 /// For the newest events: what a sink that keeps up is behind, and more.
 constexpr std::size_t bytesInMemory = std::size_t{8} * 1024 * 1024;
 
-/// The place of a sink that is no longer in the configuration is kept so long.
-constexpr int daysOfUnusedCursors = 30;
-
 /// The newest id of a file that is about to be moved aside, as far as it can be told.
 std::uint64_t newestOfCorrupt(const std::string& path) {
     try {
@@ -30,12 +27,6 @@ std::uint64_t newestOfCorrupt(const std::string& path) {
     }
 }
 
-std::unique_ptr<HistoryFile> openFile(const std::string& path) {
-    auto file = std::make_unique<HistoryFile>(path);
-    file->removeOldCursors(daysOfUnusedCursors);
-    return file;
-}
-
 /// The file, or what is wrong with it. A corrupt one is exchanged.
 std::variant<std::unique_ptr<HistoryFile>, std::string>
 openOrReplace(const HistoryDirectory& directory) {
@@ -44,7 +35,7 @@ openOrReplace(const HistoryDirectory& directory) {
     };
     std::uint64_t newest = 0;
     try {
-        return openFile(directory.file());
+        return std::make_unique<HistoryFile>(directory.file());
     } catch (const SchemaTooNew& error) {
         return problem(error.what()) +
                "; use the program that wrote it, or move the file out of the way";
@@ -58,7 +49,7 @@ openOrReplace(const HistoryDirectory& directory) {
         }
     }
     try {
-        auto file = openFile(directory.file());
+        auto file = std::make_unique<HistoryFile>(directory.file());
         file->continueAfter(newest);
         return file;
     } catch (const DatabaseError& error) {

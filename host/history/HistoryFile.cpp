@@ -51,6 +51,7 @@ HistoryFile::HistoryFile(const std::string& path)
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
+    m_database.number("SELECT count(*) FROM cursors"); // a corrupt table shows it now
 }
 
 template <class Work> void HistoryFile::inTransaction(Work&& work) {

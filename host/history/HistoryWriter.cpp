@@ -19,6 +19,10 @@ constexpr std::chrono::milliseconds longestPause{10'000};
 constexpr std::chrono::seconds housekeepingInterval{1};
 constexpr std::int64_t millisecondsPerDay = 24 * 60 * 60'000;
 
+/// The place of a sink that is no longer in the configuration is kept so long.
+constexpr int daysOfUnusedCursors = 30;
+constexpr std::chrono::hours tendingInterval{24};
+
 /// Minutes of entries that are kept while they cannot be stored.
 constexpr std::size_t mostMinutes = 24 * 60;
 
@@ -193,6 +197,14 @@ void HistoryWriter::storeCursors() {
     }
 }
 
+/// The sinks that run are in use, also those that get no events; who was not for long is forgotten.
+void HistoryWriter::tendCursors() {
+    m_cursors.forgetSaved();
+    storeCursors();
+    m_file->removeOldCursors(daysOfUnusedCursors);
+    m_nextTending = Clock::now() + tendingInterval;
+}
+
 /// What is done beside storing events, a little at a time.
 void HistoryWriter::housekeep(bool idle) {
     const auto now = Clock::now();
@@ -206,7 +218,11 @@ void HistoryWriter::housekeep(bool idle) {
         replaceFile("a reader found it so");
     }
     attempt([&] {
-        storeCursors();
+        if (now >= m_nextTending) {
+            tendCursors();
+        } else {
+            storeCursors();
+        }
         storeEntries();
         m_hasMoreToDo = m_file->expire(limits()) || (idle && m_file->shrink());
         m_oldest.store(m_file->oldest());
@@ -233,6 +249,7 @@ std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
 
 void HistoryWriter::storeRest() {
     const bool stored = attempt([&] {
+        m_cursors.forgetSaved(); // in use until now
         storeCursors();
         storeEntries();
     });

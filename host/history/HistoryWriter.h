@@ -64,6 +64,7 @@ private:
     void replaceFile(const std::string& why);
     void housekeep(bool idle);
     void storeCursors();
+    void tendCursors();
     void storeEntries();
     HistoryFile::Limits limits();
 
@@ -80,6 +81,7 @@ private:
     std::uint64_t m_left = 0;     ///< events that were not stored when the thread ended
     RetentionClock m_clock;
     Clock::time_point m_nextHousekeeping{};
+    Clock::time_point m_nextTending{}; ///< of the cursors
     bool m_hasMoreToDo = false; ///< housekeeping that was not finished
     std::chrono::milliseconds m_pause;
     std::atomic<std::uint64_t> m_oldest{0};

@@ -109,6 +109,10 @@ protected:
         return names;
     }
     std::string file() const { return state + "/history.db"; }
+    void run(const std::string& sql) const { Database(file(), Database::Use::WRITE).run(sql); }
+    std::int64_t number(const std::string& sql) const {
+        return Database(file(), Database::Use::READ).number(sql);
+    }
 
     RecordingTrace trace{TRC1_ERROR};
     FaultyDisk disk;
@@ -181,6 +185,31 @@ TEST_F(HistoryTest, ANewSinkBeginsWithTheNextEvent) {
     history = std::move(std::get<std::unique_ptr<History>>(opened));
     EXPECT_EQ(history->source("other", "other")->backlog(), 0u);
     EXPECT_EQ(history->source("key", "the sink")->backlog(), 5u);
+}
+
+TEST_F(HistoryTest, ThePlaceOfASinkThatRunsIsKeptHoweverLongItWasDown) {
+    open();
+    pushAndWait(5);
+    close();
+    // As after a run of months in which neither of two sinks got an event.
+    run("UPDATE cursors SET used = 1");
+    run("INSERT INTO cursors VALUES ('removed', 2, 1)");
+    open();
+    EXPECT_EQ(sink->backlog(), 5u);
+    EXPECT_TRUE(eventually([&] { return number("SELECT count(*) FROM cursors") == 1; }));
+    EXPECT_GT(number("SELECT used FROM cursors WHERE sink = 'key'"), 1);
+    close();
+    open();
+    EXPECT_EQ(sink->backlog(), 5u);
+}
+
+TEST_F(HistoryTest, AtItsEndASinkWasInUseUntilThen) {
+    open();
+    pushAndWait(1);
+    EXPECT_TRUE(eventually([&] { return number("SELECT count(*) FROM cursors") == 1; }));
+    run("UPDATE cursors SET used = 1");
+    close();
+    EXPECT_GT(number("SELECT used FROM cursors"), 1);
 }
 
 TEST_F(HistoryTest, FinishStoresWhatIsQueued) {
