@@ -85,6 +85,10 @@ void Delivery::finish(EventQueue::Clock::time_point limit) {
 
 void Delivery::finishSinks(EventQueue::Clock::time_point limit) {
     const char* const rest = m_history == nullptr ? "" : "; it gets them when the agent runs again";
+    // All of them first: one that hangs until the limit leaves the others their time.
+    for (const auto& sink : m_sinks) {
+        sink->beginFinish();
+    }
     for (const auto& sink : m_sinks) {
         if (const std::uint64_t left = sink->finish(limit); left > 0) {
             say("%" PRIu64 " events were not delivered to %s%s", left, sink->name().c_str(), rest);

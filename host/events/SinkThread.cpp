@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 
 #include <algorithm>
+#include <exception>
 #include <utility>
 
 namespace {
@@ -18,7 +19,7 @@ constexpr std::chrono::milliseconds longestPause{30'000};
 SinkThread::SinkThread(std::unique_ptr<EventSource> source, std::unique_ptr<Sink> sink,
                        std::string type)
     : m_source(std::move(source)), m_sink(std::move(sink)), m_type(std::move(type)),
-      m_pause(firstPause) {}
+      m_pause(firstPause, longestPause) {}
 
 SinkThread::~SinkThread() {
     finish(Clock::now());
@@ -48,8 +49,19 @@ void SinkThread::run() {
     m_changed.notify_all();
 }
 
+/// A sink that throws, for want of memory or of a thread, has failed like any other.
+std::size_t SinkThread::offer(std::span<const EventRecord> events) {
+    m_exception.clear();
+    try {
+        return m_sink->deliver(events, m_giveUp.get_token());
+    } catch (const std::exception& exception) {
+        m_exception = exception.what();
+        return 0;
+    }
+}
+
 std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
-    const std::size_t delivered = m_sink->deliver(events, m_giveUp.get_token());
+    const std::size_t delivered = offer(events);
     const bool failed = delivered < events.size();
     if (failed) {
         tellOfFailure();
@@ -58,7 +70,7 @@ std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
         trace.error()("Sink %s takes events again.", name().c_str());
     }
     if (delivered > 0) {
-        m_pause = firstPause;
+        m_pause.reset();
     }
     note(delivered, failed);
     return delivered;
@@ -69,16 +81,16 @@ void SinkThread::note(std::size_t delivered, bool failed) {
     m_state.delivered += delivered;
     m_state.failures += failed ? 1 : 0;
     m_state.condition = failed ? SinkState::Condition::FAILING : SinkState::Condition::UP;
-    m_state.error = failed ? m_sink->error() : std::string();
+    m_state.error = failed ? error() : std::string();
 }
 
 void SinkThread::tellOfFailure() {
     TraceScope trace(anchor);
     if (m_state.condition != SinkState::Condition::FAILING) {
         trace.error()("Error delivering events to %s: %s. Trying again.", name().c_str(),
-                      m_sink->error().c_str());
+                      error().c_str());
     } else {
-        trace.detail()("Still no delivery to %s: %s.", name().c_str(), m_sink->error().c_str());
+        trace.detail()("Still no delivery to %s: %s.", name().c_str(), error().c_str());
     }
 }
 
@@ -89,20 +101,26 @@ void SinkThread::pause() {
         m_changed.wait_for(lock, firstPause, wakeUp);
         return;
     }
-    m_nextTry = Clock::now() + m_pause;
+    m_nextTry = Clock::now() + m_pause.next();
     m_changed.wait_until(lock, m_nextTry, [&] { return m_finishing || wakeUp(); });
     m_nextTry = {};
-    m_pause = std::min(2 * m_pause, longestPause);
+}
+
+void SinkThread::beginFinish() {
+    if (m_thread.joinable()) {
+        m_source->end();
+        const std::lock_guard guard(m_mutex);
+        m_finishing = true;
+    }
+    m_changed.notify_all();
 }
 
 std::uint64_t SinkThread::finish(Clock::time_point limit) {
     TraceScope trace(anchor);
+    beginFinish();
     if (m_thread.joinable()) {
-        m_source->end();
         {
             std::unique_lock lock(m_mutex);
-            m_finishing = true;
-            m_changed.notify_all();
             m_changed.wait_until(lock, limit, [&] { return m_ended; });
             m_giveUp.request_stop();
         }

@@ -3,6 +3,7 @@
 
 #include "host/events/EventRecord.h"
 #include "host/events/EventSource.h"
+#include "host/events/RetryPause.h"
 #include "host/events/Sink.h"
 #include "host/events/SinkState.h"
 
@@ -34,7 +35,11 @@ public:
     /// Starts the thread.
     void start();
 
-    /// Ends the source, and the thread when it has delivered everything, at the latest at the
+    /// Ends the source and cuts pauses short: a thread that can deliver the rest does so from now
+    /// on. Not on the sink's own thread; any number of times.
+    void beginFinish();
+
+    /// Does that, and ends the thread when it has delivered everything, at the latest at the
     /// limit. Returns the number of events that were not delivered. Not on the sink's own thread;
     /// any number of times.
     std::uint64_t finish(Clock::time_point limit);
@@ -47,6 +52,8 @@ public:
 private:
     void run();
     std::size_t deliver(std::span<const EventRecord> events);
+    std::size_t offer(std::span<const EventRecord> events);
+    std::string error() const { return m_exception.empty() ? m_sink->error() : m_exception; }
     void note(std::size_t delivered, bool failed);
     void tellOfFailure();
     void pause();
@@ -54,7 +61,8 @@ private:
     const std::unique_ptr<EventSource> m_source;
     const std::unique_ptr<Sink> m_sink;
     const std::string m_type;
-    std::chrono::milliseconds m_pause; ///< before the next try
+    RetryPause m_pause;
+    std::string m_exception; ///< what the last delivery threw; empty when it did not
 
     mutable std::mutex m_mutex; ///< guards what follows
     std::condition_variable m_changed;

@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -105,6 +106,25 @@ TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
               "zrmagent: " + std::to_string(more) +
                   " events were not delivered to /dev/full; it gets them when the agent runs "
                   "again\n");
+}
+
+TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
+    const std::string later = directory.file("later/events.jsonl");
+    Delivery delivery(configFor({"/dev/full", later}), testLayout(), sizeof(TestRow));
+    delivery.start();
+    push(delivery, "a");
+    // Both fail, with pauses that have grown.
+    const auto limit = Clock::now() + 20s;
+    while (delivery.sinkStates()[1].retryIn.value_or(0ms) < 2s && Clock::now() < limit) {
+        std::this_thread::sleep_for(1ms);
+    }
+    std::filesystem::create_directory(directory.file("later"));
+    testing::internal::CaptureStderr();
+    delivery.finish(Clock::now() + 1s);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "zrmagent: 1 events were not delivered to /dev/full; it gets them when the agent "
+              "runs again\n");
+    EXPECT_EQ(lines(later), 1);
 }
 
 TEST_F(DeliveryTest, WithoutADirectoryForTheHistoryItGoesOnWithoutOne) {
