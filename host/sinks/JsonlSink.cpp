@@ -47,8 +47,30 @@ bool JsonlSink::open() {
     const long pipeBuffer = fpathconf(m_fd, _PC_PIPE_BUF);
     m_unblockedWrite = pipeBuffer > 0 ? static_cast<std::size_t>(pipeBuffer) : _POSIX_PIPE_BUF;
     m_lookAgain = Clock::now() + lookInterval;
+    if (m_isRegular && status.st_size > 0 && !endLastLine()) {
+        close();
+        return trace.result(false);
+    }
     trace.detail()("Sink %s opened.", m_path.c_str());
     return trace.result(true);
+}
+
+/// An agent that was killed while it wrote has left a line torn: it is ended, so that the next one
+/// stands alone. False when that failed.
+bool JsonlSink::endLastLine() {
+    char last = '\n';
+    const int fd = m_isStandardOutput ? -1 : ::open(m_path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd != -1) { // what this user may write but not read is taken as it is
+        if (lseek(fd, -1, SEEK_END) == -1 || ::read(fd, &last, 1) != 1) {
+            last = '\n';
+        }
+        ::close(fd);
+    }
+    if (last != '\n' && ::write(m_fd, "\n", 1) != 1) {
+        fail("write", errno);
+        return false;
+    }
+    return true;
 }
 
 void JsonlSink::close() {

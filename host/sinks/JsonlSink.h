@@ -33,6 +33,7 @@ private:
 
     bool ready();
     bool open();
+    bool endLastLine();
     void close();
     bool movedAway();
     bool waitWritable(const std::stop_token& giveUp);

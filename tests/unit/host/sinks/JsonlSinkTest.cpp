@@ -80,6 +80,34 @@ TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
     EXPECT_EQ(content(path), "earlier\n" + lines);
 }
 
+TEST_F(JsonlSinkTest, ALineThatAKilledAgentLeftTornIsEnded) {
+    directory.write("events.jsonl", "earlier\n{\"id\":1,\"situ");
+    JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
+    EXPECT_EQ(content(path), "earlier\n{\"id\":1,\"situ\n" + lines);
+}
+
+TEST_F(JsonlSinkTest, ATornLineThatCannotBeEndedIsAFailure) {
+    directory.write("events.jsonl", "{\"id\":1");
+    JsonlSink sink(SinkConfig::jsonl(path));
+    {
+        const FileSizeLimit limit(7);
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+        EXPECT_EQ(sink.error(), "write failed: File too large");
+    }
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(content(path), "{\"id\":1\n" + lines);
+}
+
+TEST_F(JsonlSinkTest, AFileThatBecomesADirectoryIsAFailureUntilItIsOneAgain) {
+    JsonlSink sink(SinkConfig::jsonl(path));
+    std::filesystem::create_directory(path);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), "open failed: Is a directory");
+    std::filesystem::remove(path);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    EXPECT_EQ(content(path), lines);
+}
+
 TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     const std::string removed = directory.file("removed.jsonl");
     JsonlSink movedSink(SinkConfig::jsonl(path));
