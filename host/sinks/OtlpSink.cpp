@@ -4,6 +4,9 @@
 #include "host/sinks/EventRow.h"
 #include "host/sinks/SeverityCodes.h"
 
+#include <algorithm>
+#include <charconv>
+#include <cinttypes>
 #include <cstdint>
 #include <string_view>
 #include <utility>
@@ -51,9 +54,28 @@ Json recordOf(const EventRecord& event, const EventRow& row) {
             {"attributes", attributesOf(event, row)}};
 }
 
-/// A 64-bit integer in the JSON encoding, where it may be a text or a number.
-std::string integerText(const Json& value) {
-    return value.is_string() ? value.get<std::string>() : value.dump();
+constexpr std::size_t longestRemark = 200; ///< bytes of what a receiver says, in a message
+
+/// A count in the JSON encoding, where it may be a text or a number; 0 for anything else.
+std::uint64_t countOf(const Json& value) {
+    if (value.is_number_unsigned()) {
+        return value.get<std::uint64_t>();
+    }
+    std::uint64_t count = 0;
+    if (value.is_string()) {
+        const auto& text = value.get_ref<const std::string&>();
+        std::from_chars(text.data(), text.data() + text.size(), count);
+    }
+    return count;
+}
+
+/// The beginning of what a receiver says, on one line.
+std::string remarkOf(const Json& value) {
+    std::string text = value.is_string() ? value.get<std::string>() : std::string();
+    text.resize(std::min(text.size(), longestRemark));
+    std::replace_if(
+        text.begin(), text.end(), [](char c) { return c < ' ' || c > '~'; }, ' ');
+    return text;
 }
 
 } // namespace
@@ -92,12 +114,11 @@ void OtlpSink::tellOfRejected(std::size_t sent) const {
     }
     const auto rejected = partial->find("rejectedLogRecords");
     const auto message = partial->find("errorMessage");
-    const std::string count = rejected == partial->end() ? "0" : integerText(*rejected);
-    const std::string why =
-        message == partial->end() || !message->is_string() ? "" : message->get<std::string>();
-    if (count != "0") {
-        trace.error()("%s has rejected %s of %zu events for good: %s", m_name.c_str(),
-                      count.c_str(), sent, why.c_str());
+    const std::uint64_t count = rejected == partial->end() ? 0 : countOf(*rejected);
+    const std::string why = message == partial->end() ? std::string() : remarkOf(*message);
+    if (count != 0) {
+        trace.error()("%s has rejected %" PRIu64 " of %zu events for good: %s", m_name.c_str(),
+                      count, sent, why.c_str());
     } else if (!why.empty()) {
         trace.detail()("%s says: %s", m_name.c_str(), why.c_str());
     }

@@ -111,6 +111,20 @@ TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
+TEST_F(OtlpSinkTest, AnAnswerMadeToHarmDoesNot) {
+    OtlpSink sink(config());
+    const std::string deep = std::string(20'000, '[') + std::string(20'000, ']');
+    server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":)" + deep + "}}");
+    EXPECT_EQ(deliver(sink), 1u);
+    EXPECT_THAT(trace.messages(), IsEmpty()) << "that is no count";
+    server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":"1","errorMessage":"two\nlines)" +
+                           std::string(1000, 'x') + R"("}})");
+    EXPECT_EQ(deliver(sink), 1u);
+    EXPECT_THAT(trace.messages(),
+                ElementsAre("collector has rejected 1 of 1 events for good: two lines" +
+                            std::string(191, 'x')));
+}
+
 TEST_F(OtlpSinkTest, ARefusalIsAFailure) {
     OtlpSink sink(config());
     server.set(status, 503);
