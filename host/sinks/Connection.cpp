@@ -5,11 +5,10 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <memory>
 #include <utility>
+#include <vector>
 
 #include <fcntl.h>
-#include <netdb.h>
 #include <poll.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
@@ -23,11 +22,15 @@ using Clock = std::chrono::steady_clock;
 
 constexpr int pollSlice = 100; ///< milliseconds
 
+/// More than this a receiver that is to answer nothing does not say between two deliveries.
+constexpr std::size_t mostHeard = 256 * 1024; ///< bytes
+
 } // namespace
 
 Connection::Connection(ListenAddress receiver, Transport transport,
                        std::chrono::milliseconds timeout)
-    : m_receiver(std::move(receiver)), m_transport(transport), m_timeout(timeout) {}
+    : m_receiver(std::move(receiver)), m_transport(transport), m_timeout(timeout),
+      m_lookup(m_receiver.host, m_receiver.port) {}
 
 Connection::~Connection() {
     closeIfBroken(); // with something unread, the system would throw away what is still to be sent
@@ -70,13 +73,13 @@ bool Connection::wait(short events, const std::stop_token& giveUp) {
     return false;
 }
 
-bool Connection::connect(const addrinfo& address, const std::stop_token& giveUp) {
-    m_socket = socket(address.ai_family, address.ai_socktype | SOCK_CLOEXEC | SOCK_NONBLOCK,
-                      address.ai_protocol);
+bool Connection::connect(const SocketAddress& address, const std::stop_token& giveUp) {
+    const int type = m_transport == TCP ? SOCK_STREAM : SOCK_DGRAM;
+    m_socket = socket(address.family(), type | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
     if (m_socket == -1) {
         return fail("socket", errno);
     }
-    if (::connect(m_socket, address.ai_addr, address.ai_addrlen) == 0) {
+    if (::connect(m_socket, address.pointer(), address.size) == 0) {
         return true;
     }
     if (errno != EINPROGRESS) {
@@ -96,18 +99,14 @@ bool Connection::open(const std::stop_token& giveUp) {
     if (isOpen()) {
         return trace.result(true);
     }
-    addrinfo wanted{};
-    wanted.ai_socktype = m_transport == TCP ? SOCK_STREAM : SOCK_DGRAM;
-    addrinfo* list = nullptr;
-    const int unknown = getaddrinfo(m_receiver.host.c_str(),
-                                    std::to_string(m_receiver.port).c_str(), &wanted, &list);
-    if (unknown != 0) {
-        m_error = m_receiver.text() + " is not known: " + gai_strerror(unknown);
-        return trace.result(false);
+    const std::vector<SocketAddress> addresses = m_lookup.find(Clock::now() + m_timeout, giveUp);
+    if (addresses.empty()) {
+        m_error = giveUp.stop_requested()
+                      ? "the agent is ending (" + m_receiver.text() + ')'
+                      : m_receiver.text() + " is not known: " + m_lookup.error();
     }
-    const std::unique_ptr<addrinfo, void (*)(addrinfo*)> addresses(list, &freeaddrinfo);
-    for (const addrinfo* address = list; address != nullptr; address = address->ai_next) {
-        if (connect(*address, giveUp)) {
+    for (const SocketAddress& address : addresses) {
+        if (connect(address, giveUp)) {
             return trace.result(true);
         }
         close();
@@ -116,13 +115,16 @@ bool Connection::open(const std::stop_token& giveUp) {
 }
 
 void Connection::closeIfBroken() {
-    char byte;
+    char buffer[4096];
+    std::size_t heard = 0;
     while (isOpen() && m_transport == TCP) {
-        const ssize_t count = recv(m_socket, &byte, 1, MSG_DONTWAIT);
-        if (count == 0 || (count == -1 && errno != EAGAIN && errno != EINTR)) {
-            close();
-        } else if (count == -1) {
+        const ssize_t count = recv(m_socket, buffer, sizeof buffer, MSG_DONTWAIT);
+        if (count == -1 && errno == EAGAIN) {
             return; // nothing to read: the connection stands
+        }
+        heard += count > 0 ? static_cast<std::size_t>(count) : 0;
+        if (count == 0 || (count == -1 && errno != EINTR) || heard > mostHeard) {
+            close();
         }
     }
 }
@@ -134,9 +136,9 @@ bool Connection::send(std::string_view bytes, const std::stop_token& giveUp) {
             bytes.remove_prefix(static_cast<std::size_t>(count));
         } else if (errno != EINTR &&
                    (errno == EAGAIN ? !wait(POLLOUT, giveUp) : !fail("send", errno))) {
-            if (m_transport == TCP) {
-                close(); // a message may have gone out in part
-            }
+            // Over TCP a message may have gone out in part; a socket of UDP is bound to an address
+            // that this machine may have lost.
+            close();
             return false;
         }
     }

@@ -2,6 +2,7 @@
 #define ZRM_HOST_CONNECTION_H
 
 #include "host/http/ListenAddress.h"
+#include "host/sinks/NameLookup.h"
 
 #include <chrono>
 #include <cstddef>
@@ -10,8 +11,7 @@
 #include <string_view>
 
 /// A connection to a receiver that answers nothing, over TCP or UDP. Every wait ends when its time
-/// is over or when giving up is requested; looking a name up takes as long as the system takes.
-/// Used by one thread.
+/// is over or when giving up is requested. Used by one thread.
 class Connection {
 public:
     enum Transport { TCP, UDP };
@@ -26,10 +26,11 @@ public:
     bool open(const std::stop_token& giveUp);
     bool isOpen() const noexcept { return m_socket != -1; }
 
-    /// Closes the connection when the other side has closed it or it has failed meanwhile.
+    /// Closes the connection when the other side has closed it, it has failed meanwhile, or the
+    /// other side does not stop talking.
     void closeIfBroken();
 
-    /// Sends all bytes, over UDP as one message. After a failure a TCP connection is closed.
+    /// Sends all bytes, over UDP as one message. After a failure it is closed.
     bool send(std::string_view bytes, const std::stop_token& giveUp);
 
     /// How many of the bytes that were sent the receiver's system has not acknowledged; 0 where
@@ -40,7 +41,7 @@ public:
     const std::string& error() const noexcept { return m_error; }
 
 private:
-    bool connect(const struct addrinfo& address, const std::stop_token& giveUp);
+    bool connect(const SocketAddress& address, const std::stop_token& giveUp);
     bool wait(short events, const std::stop_token& giveUp);
     bool fail(const char* call, int number);
     void close();
@@ -48,6 +49,7 @@ private:
     const ListenAddress m_receiver;
     const Transport m_transport;
     const std::chrono::milliseconds m_timeout;
+    NameLookup m_lookup;
     int m_socket = -1;
     std::string m_error;
 };

@@ -23,6 +23,8 @@ public:
     /// open for the time in which it is watched, also when its owner closes it.
     void watch(int socket);
 
+    Clock::time_point end() const noexcept { return m_end; }
+
     /// True when the end has come.
     bool hasEnded() const;
 

@@ -4,6 +4,7 @@
 #include "host/config/HttpUrl.h"
 #include "host/sinks/BrokenPipeBlocked.h"
 #include "host/sinks/ConnectionLimit.h"
+#include "host/sinks/NameLookup.h"
 
 #include <algorithm>
 #include <array>
@@ -12,6 +13,7 @@
 #include <exception>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include <httplib.h>
 
@@ -56,6 +58,13 @@ std::string excerpt(const std::string& body) {
     return text;
 }
 
+/// The header Host: the library leaves the brackets out.
+std::string hostOf(const HttpUrl& url) {
+    const std::string authority = url.authority();
+    const bool isUsual = url.port == (url.isSecure ? 443 : 80);
+    return isUsual ? authority.substr(0, authority.rfind(':')) : authority;
+}
+
 /// The pause that a busy receiver asks for; none when it gives no number of seconds.
 std::chrono::seconds pauseOf(const httplib::Response& response) {
     const std::string text = response.get_header_value("Retry-After");
@@ -79,11 +88,16 @@ public:
     const std::string& error() const noexcept { return m_error; }
 
 private:
-    enum Outcome { ANSWERED, LOST, OVER };
+    /// LOST: a connection that was kept had ended. UNREACHED: nobody took the connection. UNKNOWN:
+    /// the receiver has no address.
+    enum Outcome { ANSWERED, LOST, UNREACHED, UNKNOWN, OVER };
 
+    bool lookUp(const std::stop_token& giveUp);
     void connect();
     httplib::Request requestOf(const std::string& body, const Headers& headers);
     Outcome attempt(const std::string& body, const Headers& headers);
+    Outcome attemptAll(const std::string& body, const Headers& headers,
+                       const std::stop_token& giveUp);
     void note(const httplib::Response& response);
     bool judge();
 
@@ -93,6 +107,9 @@ private:
     const std::string m_caFile;
     const Headers m_headers;
 
+    NameLookup m_lookup;
+    std::vector<SocketAddress> m_addresses; ///< of the receiver, when it was last looked up
+    std::size_t m_unreached = 0; ///< connections in a row that nobody took: tells which is next
     std::unique_ptr<httplib::ClientImpl> m_client; ///< made anew after every failure
     std::optional<ConnectionLimit> m_limit;        ///< of the request under way
     int m_status = 0;
@@ -104,7 +121,15 @@ private:
 HttpPost::Implementation::Implementation(const SinkConfig& config, std::string_view path)
     : m_url(HttpUrl::parse(config.text("url")).value_or(HttpUrl{})), m_target(m_url.withPath(path)),
       m_timeout(config.duration("timeout")), m_caFile(config.text("ca_file")),
-      m_headers(config.texts("headers")) {}
+      m_headers(config.texts("headers")), m_lookup(m_url.host, m_url.port) {}
+
+bool HttpPost::Implementation::lookUp(const std::stop_token& giveUp) {
+    m_addresses = m_lookup.find(m_limit->end(), giveUp);
+    if (m_addresses.empty()) {
+        m_error = m_url.authority() + " is not known: " + m_lookup.error();
+    }
+    return !m_addresses.empty();
+}
 
 void HttpPost::Implementation::connect() {
     if (m_url.isSecure) {
@@ -114,6 +139,9 @@ void HttpPost::Implementation::connect() {
     } else {
         m_client = std::make_unique<httplib::ClientImpl>(m_url.host, m_url.port);
     }
+    // Its own lookup of the name could not be ended.
+    const SocketAddress& address = m_addresses[m_unreached % m_addresses.size()];
+    m_client->set_hostname_addr_map({{m_url.host, address.text()}});
     m_client->set_keep_alive(true);
     m_client->set_tcp_nodelay(true);
     m_client->set_url_encode(false); // the URL is written as it is sent
@@ -134,6 +162,7 @@ httplib::Request HttpPost::Implementation::requestOf(const std::string& body,
     request.body = body;
     request.headers = {m_headers.begin(), m_headers.end()};
     request.headers.insert(headers.begin(), headers.end());
+    request.headers.emplace("Host", hostOf(m_url));
     request.headers.emplace("Content-Type", "application/json");
     request.headers.emplace("User-Agent", "zrmagent");
     request.response_handler = [this](const httplib::Response& response) {
@@ -150,11 +179,11 @@ httplib::Request HttpPost::Implementation::requestOf(const std::string& body,
 
 HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::string& body,
                                                                     const Headers& headers) {
-    const bool isKept = m_client != nullptr && m_client->is_socket_open() != 0;
-    if (m_client == nullptr) {
-        connect();
-    } else if (isKept) {
+    const bool isKept = m_client != nullptr;
+    if (isKept) {
         m_limit->watch(m_client->socket());
+    } else {
+        connect();
     }
     m_status = 0;
     m_answer.clear();
@@ -162,6 +191,7 @@ HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::s
     const httplib::Result result = m_client->send(request);
     m_limit->watch(-1);
     if (result) {
+        m_unreached = 0;
         note(*result);
     } else {
         m_client.reset(); // nothing of a failed connection is used again
@@ -170,8 +200,38 @@ HttpPost::Implementation::Outcome HttpPost::Implementation::attempt(const std::s
         return ANSWERED; // the status counts, whatever came of the body
     }
     m_error = std::string(textOf(result.error())) + " (" + m_url.authority() + ')';
+    if (result.error() == httplib::Error::Connection ||
+        result.error() == httplib::Error::ConnectionTimeout) {
+        ++m_unreached;
+        return UNREACHED;
+    }
     // A receiver may end a connection that it kept at the moment in which it is used again.
-    return isKept && !m_limit->hasEnded() ? LOST : OVER;
+    return isKept ? LOST : OVER;
+}
+
+HttpPost::Implementation::Outcome
+HttpPost::Implementation::attemptAll(const std::string& body, const Headers& headers,
+                                     const std::stop_token& giveUp) {
+    TraceScope trace(anchor);
+    if (m_client != nullptr && m_client->is_socket_open() == 0) {
+        m_client.reset(); // the receiver has said that it ends the connection
+    }
+    Outcome outcome = m_client == nullptr ? LOST : attempt(body, headers);
+    if (outcome != LOST || m_limit->hasEnded()) {
+        return outcome;
+    }
+    trace.detail()("A connection to %s is made.", m_url.authority().c_str());
+    if (!lookUp(giveUp)) {
+        return UNKNOWN;
+    }
+    // Each address once, beginning with the one whose turn it is.
+    for (std::size_t tries = m_addresses.size(); tries > 0; --tries) {
+        outcome = attempt(body, headers);
+        if (outcome != UNREACHED || m_limit->hasEnded()) {
+            break;
+        }
+    }
+    return outcome;
 }
 
 void HttpPost::Implementation::note(const httplib::Response& response) {
@@ -198,12 +258,7 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
     }
     const BrokenPipeBlocked blocked;
     m_limit.emplace(Clock::now() + m_timeout, giveUp);
-    Outcome outcome = attempt(body, headers);
-    if (outcome == LOST) {
-        trace.detail()("%s has ended the connection; another one is made.",
-                       m_url.authority().c_str());
-        outcome = attempt(body, headers);
-    }
+    const Outcome outcome = attemptAll(body, headers, giveUp);
     const bool isOverTime = m_limit->hasEnded();
     m_limit.reset();
     if (outcome == ANSWERED) {
@@ -211,7 +266,7 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
     }
     if (giveUp.stop_requested()) {
         m_error = "the agent is ending (" + m_url.authority() + ')';
-    } else if (isOverTime) {
+    } else if (isOverTime && outcome != UNKNOWN) {
         m_error = "no answer in time (" + m_url.authority() + ')';
     }
     return trace.result(false);

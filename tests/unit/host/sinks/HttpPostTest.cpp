@@ -3,6 +3,7 @@
 #include "LocalSocket.h"
 #include "ScriptedServer.h"
 #include "SinkTest.h"
+#include "support/FakeResolver.h"
 #include "support/RecordingTrace.h"
 
 #include <gmock/gmock.h>
@@ -210,6 +211,48 @@ TEST_F(HttpPostTest, MakingAConnectionEndsInTimeAndWhenToldToGiveUp) {
     begin = Clock::now();
     EXPECT_FALSE(send(patient));
     EXPECT_LT(Clock::now() - begin, 5s);
+}
+
+TEST_F(HttpPostTest, LookingANameUpEndsInTimeAndWhenToldToGiveUp) {
+    FakeResolver resolver("127.0.0.1");
+    ScriptedServer receiver([](const Request&) { return ScriptedServer::status(204); });
+    const std::string place = "slow.example:" + std::to_string(receiver.port());
+    HttpPost quick(configOf("http://" + place, 50ms), "");
+    EXPECT_FALSE(send(quick));
+    EXPECT_EQ(quick.error(), place + " is not known: the system is still looking its name up");
+    HttpPost patient(configOf("http://" + place, 60s), "");
+    std::jthread stopper([this, &resolver] {
+        while (resolver.lookups() < 2) {
+            std::this_thread::sleep_for(1ms);
+        }
+        giveUp.request_stop();
+    });
+    const Clock::time_point begin = Clock::now();
+    EXPECT_FALSE(send(patient));
+    EXPECT_LT(Clock::now() - begin, 30s);
+    EXPECT_EQ(patient.error(), "the agent is ending (" + place + ")");
+    stopper.join();
+    giveUp = {};
+    resolver.answer();
+    EXPECT_TRUE(send(patient)) << patient.error();
+    EXPECT_EQ(receiver.requests().at(0).header("host"), place);
+}
+
+TEST_F(HttpPostTest, TriesEachAddressOfAName) {
+    // A server that listens at one of the addresses of localhost.
+    ScriptedServer receiver([](const Request&) { return ScriptedServer::status(204); });
+    HttpPost http(configOf("http://localhost:" + std::to_string(receiver.port())), "");
+    EXPECT_TRUE(send(http)) << http.error();
+    EXPECT_TRUE(send(http)) << http.error();
+    EXPECT_EQ(receiver.requests().at(1).connection, 1);
+}
+
+TEST_F(HttpPostTest, AnAddressOfVersionSixStandsInBracketsInTheRequest) {
+    ScriptedServer receiver([](const Request&) { return ScriptedServer::status(204); });
+    const std::string place = "[::ffff:127.0.0.1]:" + std::to_string(receiver.port());
+    HttpPost http(configOf("http://" + place), "");
+    EXPECT_TRUE(send(http)) << http.error();
+    EXPECT_EQ(receiver.requests().at(0).header("host"), place);
 }
 
 TEST_F(HttpPostTest, LeavesABusyReceiverAloneForAsLongAsItAsks) {

@@ -7,6 +7,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <chrono>
 #include <memory>
 #include <string>
@@ -71,6 +72,13 @@ public:
     void write(const std::string& text) const {
         EXPECT_EQ(::send(m_socket, text.data(), text.size(), MSG_NOSIGNAL),
                   static_cast<ssize_t>(text.size()));
+    }
+    /// Sends what the other side takes at once; false when it is gone.
+    bool talk() const {
+        static const std::string text(65536, 'x');
+        pollfd descriptor = {m_socket, POLLOUT, 0};
+        return poll(&descriptor, 1, 100) == 0 ||
+               ::send(m_socket, text.data(), text.size(), MSG_NOSIGNAL | MSG_DONTWAIT) > 0;
     }
     std::uint16_t port = 0;
 
@@ -209,6 +217,28 @@ TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
     connection.write("hello\r\n");
     EXPECT_EQ(deliver(sink, 1, 1), 1u);
     EXPECT_EQ(connection.read(frames(0, 2).size()), frames(0, 2));
+}
+
+TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
+    const Socket listener(SOCK_STREAM);
+    SyslogSink sink(config(listener.port));
+    EXPECT_EQ(deliver(sink, 0, 1), 1u);
+    auto first = std::make_unique<Socket>(listener);
+    std::atomic<bool> isOver{false};
+    std::jthread talker([&] {
+        while (!isOver && first->talk()) {
+        }
+        first.reset();
+    });
+    // However much it says, each delivery ends, and at last the connection does.
+    std::size_t again = 0;
+    const Clock::time_point limit = Clock::now() + 20s;
+    while (!listener.hasInput(0) && Clock::now() < limit) {
+        ASSERT_EQ(deliver(sink, 1, 1), 1u);
+        ++again;
+    }
+    isOver = true;
+    EXPECT_TRUE(listener.hasInput(0)) << "after " << again << " deliveries";
 }
 
 TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidSomething) {
