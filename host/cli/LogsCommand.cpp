@@ -25,7 +25,7 @@ constexpr std::array<Kind, 4> kinds = {
     {{"U", "text"}, {"S", "syslog"}, {"A", "logins"}, {"E", "errors"}}};
 
 std::string kindOf(const Json& row) {
-    const std::string letter = JsonText::text(row, "LOGTYPE");
+    std::string letter = JsonText::text(row, "LOGTYPE");
     for (const Kind& kind : kinds) {
         if (kind.letter == letter) {
             return kind.name;

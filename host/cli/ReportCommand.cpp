@@ -37,6 +37,7 @@ bool hasAny(const Json& rows, const std::string& column) {
 std::string tableText(const Json& rows, const std::vector<std::string>& columns,
                       const Terminal& terminal) {
     std::vector<Table::Column> headings;
+    headings.reserve(columns.size());
     for (const std::string& column : columns) {
         headings.push_back({column, isTime(column) ? Table::FIXED : Table::TEXT});
     }

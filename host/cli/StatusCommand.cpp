@@ -15,7 +15,7 @@ namespace {
 using Json = JsonText::Json;
 
 std::string historyText(const Json& history) {
-    if (const std::string problem = JsonText::text(history, "problem"); !problem.empty()) {
+    if (std::string problem = JsonText::text(history, "problem"); !problem.empty()) {
         return problem;
     }
     if (JsonText::text(history, "enabled") != "true") {

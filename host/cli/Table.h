@@ -23,6 +23,7 @@ public:
         Kind kind = TEXT;
     };
     struct Cell {
+        // A text alone is a cell. NOLINTNEXTLINE(google-explicit-constructor)
         Cell(std::string cellText, Colour cellColour = Colour::NONE)
             : text(std::move(cellText)), colour(cellColour) {}
         std::string text; ///< as it came; shown visibly

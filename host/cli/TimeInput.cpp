@@ -86,7 +86,7 @@ std::optional<std::string> TimeInput::toIso(std::string_view text, std::time_t n
     if (text.starts_with('-')) {
         return before(text.substr(1), now);
     }
-    if (const std::optional<std::string> time = clock(text, now)) {
+    if (std::optional<std::string> time = clock(text, now)) {
         return time;
     }
     return TimeText::toStamp(text) ? std::optional(std::string(text)) : std::nullopt;

@@ -33,7 +33,7 @@ ClientConnection::Head ClientConnection::readHead(std::chrono::milliseconds idle
     for (bool hasBegun = !m_in.empty();;) {
         dropEmptyLines(m_in);
         const std::size_t end = m_in.find(headEnd);
-        if (end != std::string::npos && end <= largestHead) {
+        if (end <= largestHead) { // and found
             m_headSize = end;
             dropRanges();
             m_answerDeadline = m_requestDeadline + answerTime;

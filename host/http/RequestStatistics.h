@@ -3,11 +3,11 @@
 
 #include <array>
 #include <chrono>
-#include <compare>
 #include <cstdint>
 #include <map>
 #include <mutex>
 #include <string>
+#include <tuple>
 
 /// Counts the requests that were answered, by route. Any thread.
 class RequestStatistics {
@@ -17,7 +17,10 @@ public:
         std::string method; ///< empty when the request's head could not be read
         std::string route;  ///< its pattern; empty for paths at which nothing is
         int status = 0;
-        auto operator<=>(const Kind&) const = default;
+        bool operator<(const Kind& other) const {
+            return std::tie(method, route, status) <
+                   std::tie(other.method, other.route, other.status);
+        }
     };
 
     /// Upper ends of the classes of durations: seconds. What takes longer is in none.

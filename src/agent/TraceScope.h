@@ -55,7 +55,7 @@ public:
         if constexpr (std::is_pointer_v<Result>) {
             m_result = value != nullptr ? 1 : 0;
         } else {
-            m_result = static_cast<long>(value);
+            m_result = static_cast<long>(value); // NOLINT(bugprone-signed-char-misuse): signed
         }
         return value;
     }

@@ -39,7 +39,7 @@ void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
     std::memcpy(out, m_hour, hourLength);
     putTwoDigits(out + hourLength, second / 60);
     putTwoDigits(out + hourLength + 2, second % 60);
-    std::memcpy(out + hourLength + 4, "000", 3);
+    std::memset(out + hourLength + 4, '0', 3);
 }
 
 // A zone may change its offset within a quarter of an hour, and has had offsets that cut an hour

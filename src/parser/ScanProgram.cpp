@@ -92,8 +92,9 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
     m_isOneCharacter =
         m_literalEnd - m_literal == 1 && !isWhiteSpace(*m_literal) && *m_literal != '%';
     const char* point = nl_langinfo(RADIXCHAR);
-    if (*point != '\0' && std::strlen(point) < sizeof m_decimalPoint) {
-        std::strcpy(m_decimalPoint, point);
+    const std::size_t pointSize = std::strlen(point) + 1;
+    if (*point != '\0' && pointSize <= sizeof m_decimalPoint) {
+        std::memcpy(m_decimalPoint, point, pointSize);
     }
     const char* position = m_literalEnd + 1;
     m_isSuppressed = *position == '*';
