@@ -98,6 +98,25 @@ std::string skippedText(const Json& ledger, const Terminal& terminal) {
     return table.empty() ? "" : '\n' + table.text(terminal);
 }
 
+void noteConfiguration(const Json& answer) {
+    const Json& configuration = JsonText::member(answer, "configuration");
+    const std::string problem = JsonText::text(configuration, "problem");
+    if (!problem.empty()) {
+        Context::note("the log configuration " + JsonText::text(configuration, "file") +
+                      " cannot be read: " + problem);
+    }
+}
+
+std::string unmonitoredText(const Json& answer, const Terminal& terminal) {
+    Table table({{"NOT MONITORED", Table::PATH}, {"LINE", Table::NUMBER}, {"REASON"}});
+    for (const Json& log : JsonText::member(answer, "unmonitored")) {
+        table.add({{JsonText::text(log, "log"), Colour::BAD},
+                   JsonText::text(log, "line"),
+                   JsonText::text(log, "reason")});
+    }
+    return table.empty() ? "" : table.text(terminal);
+}
+
 } // namespace
 
 LogsCommand::LogsCommand(CLI::App& program)
@@ -132,17 +151,26 @@ int LogsCommand::list(Context& context) {
                    JsonText::text(row, "NUMEVENTS"), countCell(row, "NUMERRORS"), sizeText(row),
                    TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE"))});
     }
+    noteConfiguration(answer);
+    const std::string unmonitored = unmonitoredText(answer, context.terminal());
     if (table.empty()) {
         Context::note("the agent monitors no log");
+        context.print(unmonitored);
         return CLI_REFUSED;
     }
-    context.print(table.text(context.terminal()));
+    context.print(table.text(context.terminal()) + (unmonitored.empty() ? "" : "\n") + unmonitored);
     return CLI_DONE;
 }
 
 int LogsCommand::show(Context& context) {
     const Json answer = context.client().get("/api/v1/logs", {{"log", m_log}});
     const Json& logs = JsonText::member(answer, "logs");
+    if (const Json& unmonitored = JsonText::member(answer, "unmonitored"); !unmonitored.empty()) {
+        throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log + " (line " +
+                                        JsonText::text(unmonitored.front(), "line") +
+                                        " of its configuration): " +
+                                        JsonText::text(unmonitored.front(), "reason"));
+    }
     if (logs.empty()) {
         throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log +
                                         "; 'zrmctl logs' lists what it monitors");

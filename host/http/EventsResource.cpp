@@ -75,6 +75,7 @@ struct Window {
     std::int64_t from;
     std::int64_t to;
     std::int64_t step;
+    std::optional<std::string> log; ///< only this one
 };
 
 Window windowOf(const HttpRequest& request) {
@@ -86,6 +87,7 @@ Window windowOf(const HttpRequest& request) {
     window.to = query.time("to").value_or(now);
     window.from = query.time("from").value_or(window.to - day);
     window.step = static_cast<std::int64_t>(query.number("step", 60, 86'400).value_or(60)) * 1000;
+    window.log = query.text("log");
     query.refuseUnknown();
     if (window.step % minute != 0) {
         throw RequestRefused(400, "write a multiple of 60 seconds", "step");
@@ -155,8 +157,12 @@ HttpAnswer EventsResource::rates(const HttpRequest& request) {
     const Rates rates = reading([&] { return history.rates(window.from, window.to, window.step); });
     std::string text = "{\"start\":\"" + UtcTime::text(rates.start) +
                        "\",\"step\":" + std::to_string(rates.step / 1000) + ",\"logs\":[";
+    bool isFirst = true;
     for (const LogRates& log : rates.logs) {
-        text += &log == &rates.logs.front() ? "{\"log\":" : ",{\"log\":";
+        if (window.log && log.log != *window.log) {
+            continue;
+        }
+        text += std::exchange(isFirst, false) ? "{\"log\":" : ",{\"log\":";
         RowJson::appendText(text, log.log);
         text += ",\"entries\":";
         append(text, log.entries);

@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/UnmonitoredLogs.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowJson.h"
 #include "host/framework/Sample.h"
@@ -50,6 +51,13 @@ std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::strin
     return "null";
 }
 
+/// Of the logs that are configured and not monitored, all or the one with this path.
+std::vector<UnmonitoredLogs::Log> chosen(std::vector<UnmonitoredLogs::Log> logs,
+                                         const std::optional<std::string>& log) {
+    std::erase_if(logs, [&](const UnmonitoredLogs::Log& one) { return log && one.log != *log; });
+    return logs;
+}
+
 HttpAnswer logs(const HttpRequest& request) {
     TraceScope trace(anchor);
     QueryFields query(request);
@@ -57,7 +65,9 @@ HttpAnswer logs(const HttpRequest& request) {
     query.refuseUnknown();
     const std::optional<Sample> sample = Sample::take("RMMONLOG", conditionsOf(log), "HTTP");
     const std::size_t count = sample ? sample->size() : 0;
-    if (log && count == 0) {
+    const UnmonitoredLogs::Result configured = UnmonitoredLogs::read();
+    const std::vector<UnmonitoredLogs::Log> unmonitored = chosen(configured.logs, log);
+    if (log && count == 0 && unmonitored.empty()) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
     const std::vector<LogLedgerView> ledgers = LogLedgers::read(log.value_or(""));
@@ -72,7 +82,13 @@ HttpAnswer logs(const HttpRequest& request) {
             ledgerOf(ledgers, LogPath::of(sample->layout(), sample->row(index)), log.has_value());
         text += '}';
     }
-    return HttpAnswer::json(text + "],\"time\":\"" + now() + "\"}");
+    text += "],\"unmonitored\":[";
+    for (std::size_t index = 0; index < unmonitored.size(); ++index) {
+        text += (index == 0 ? "" : ",") + UnmonitoredLogs::json(unmonitored[index]);
+    }
+    return HttpAnswer::json(
+        text + "],\"configuration\":" + UnmonitoredLogs::configurationJson(configured) +
+        ",\"time\":\"" + now() + "\"}");
 }
 
 } // namespace

@@ -1,6 +1,7 @@
 #include "host/metrics/LogMetrics.h"
 
 #include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/UnmonitoredLogs.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowText.h"
 #include "host/framework/Sample.h"
@@ -10,6 +11,7 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include <sys/stat.h>
 
@@ -61,15 +63,27 @@ Logs takeLogs() {
 }
 
 void collectStates(MetricText& text, const Logs& logs) {
+    std::vector<UnmonitoredLogs::Log> unmonitored = UnmonitoredLogs::read().logs;
+    // A refresh may come between the two.
+    std::erase_if(unmonitored,
+                  [&](const UnmonitoredLogs::Log& log) { return logs.contains(log.log); });
     text.gauge("zrm_logs", "Number of monitored logs.");
     text.add(static_cast<double>(logs.size()));
+    text.gauge("zrm_logs_unmonitored", "Number of configured logs that are not monitored.");
+    text.add(static_cast<double>(unmonitored.size()));
     text.gauge("zrm_log_running", "1 while the log is being read, 0 in any other state.");
     for (const auto& [path, log] : logs) {
         text.add(log.status == "Running" ? 1.0 : 0.0, {{"log", path}});
     }
+    for (const UnmonitoredLogs::Log& log : unmonitored) {
+        text.add(0.0, {{"log", log.log}});
+    }
     text.gauge("zrm_log_state", "The state of the log's monitor, as a label.");
     for (const auto& [path, log] : logs) {
         text.add(1.0, {{"log", path}, {"state", log.status}});
+    }
+    for (const UnmonitoredLogs::Log& log : unmonitored) {
+        text.add(1.0, {{"log", log.log}, {"state", "Not monitored"}});
     }
 }
 

@@ -82,6 +82,44 @@ def test_logs_tell_path_and_row(agent, serving):
     assert problem(api, "GET", "/api/v1/logs?log=app.log")[:2] == (400, "log")
 
 
+def test_configured_logs_that_are_not_monitored_say_why(agent, serving):
+    gone = agent.directory / "gone.log"
+    agent.configure("# logs", f"{gone} ;N ;S", "relative.log")
+    log, api = serving()
+    agent.wait_open(log)
+    answer = get(api, "/api/v1/logs")
+    assert [one["log"] for one in answer["logs"]] == [str(log)]
+    assert answer["configuration"] == {"file": str(agent.logs_conf), "problem": None}
+    missing = {
+        "log": str(gone),
+        "line": 2,
+        "reason": "The file cannot be used: No such file or directory.",
+        "cause": "file",
+    }
+    assert answer["unmonitored"][0] == missing
+    assert [(one["log"], one["line"], one["cause"]) for one in answer["unmonitored"]] == [
+        (str(gone), 2, "file"),
+        ("relative.log", 3, "text"),
+    ]
+    answer = get(api, f"/api/v1/logs?log={gone}")
+    assert (answer["logs"], answer["unmonitored"]) == ([], [missing])
+    assert get(api, f"/api/v1/logs?log={log}")["unmonitored"] == []
+    gone.write_text("")
+    (waiting,) = get(api, f"/api/v1/logs?log={gone}")["unmonitored"]
+    assert (waiting["reason"], waiting["cause"]) == (
+        "The agent has not read this line yet.",
+        "refresh",
+    )
+    agent.configure(append=True)  # touched
+    agent.refresh()
+    wait_until(lambda: get(api, f"/api/v1/logs?log={gone}")["logs"], "the log")
+    assert get(api, f"/api/v1/logs?log={gone}")["unmonitored"] == []
+    agent.logs_conf.unlink()
+    answer = get(api, "/api/v1/logs")
+    assert answer["configuration"]["problem"] == "No such file or directory"
+    assert len(answer["logs"]) == 2
+
+
 def test_a_refresh_reads_the_configuration_again(agent, serving):
     log, api = serving()
     other = agent.log("other.log")

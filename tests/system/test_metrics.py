@@ -44,6 +44,7 @@ def serving(agent):
     log = agent.log()
     agent.situation(log=log)
     agent.situation(name='odd "name"\\', log=log, when=["ENTRYDESC contains 'never'"])
+    agent.configure(f"{agent.directory}/gone.log ;N", append=True)
     agent.listen = "127.0.0.1:0"
     agent.start()
     return log, Api(agent)
@@ -67,7 +68,10 @@ def test_metrics_tell_what_happens(agent, serving):
     assert value(text, "zrm_log_size_bytes", log=str(log)) == log.path.stat().st_size
     assert value(text, "zrm_log_running", log=str(log)) == 1
     assert value(text, "zrm_log_state", log=str(log), state="Running") == 1
-    assert value(text, "zrm_logs") == 1
+    assert (value(text, "zrm_logs"), value(text, "zrm_logs_unmonitored")) == (1, 1)
+    gone = f"{agent.directory}/gone.log"
+    assert value(text, "zrm_log_running", log=gone) == 0
+    assert value(text, "zrm_log_state", log=gone, state="Not monitored") == 1
     for count, expected in (("offered", 3), ("matched", 3), ("discarded", 0), ("raised", 3)):
         assert value(text, f"zrm_situation_{count}_total", situation="every-entry") == expected
     assert value(text, "zrm_situation_matched_total", situation='odd \\"name\\"\\\\') == 0

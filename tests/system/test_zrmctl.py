@@ -30,11 +30,12 @@ ZRMCTL = str(Path(PROGRAM).with_name("zrmctl"))
 GOLDEN = Path(__file__).with_name("golden")
 WIDTHS = (64, 120)
 
-# Each file holds the commands of one line below, in this order. LOG and TEXTLOG are monitored logs.
+# Each file holds the commands of one line below, in this order. LOG and TEXTLOG are monitored logs,
+# GONE is configured without a file.
 COMMANDS = {
     "program": ["--version", "--help", "", "nonsense", "status --nonsense"],
     "status": ["status", "status --json"],
-    "logs": ["logs", "logs LOG", "logs TEXTLOG", "logs TEXTLOG --json", "logs /none"],
+    "logs": ["logs", "logs LOG", "logs TEXTLOG", "logs TEXTLOG --json", "logs GONE", "logs /none"],
     "events": [
         "events",
         "events --limit 1",
@@ -151,6 +152,7 @@ def watched():
         months_ago = time.localtime(time.time() - 180 * 86400)  # before every report's window
         log = agent.log("auth.log", syslog_line("old", when=months_ago).encode())
         text = agent.log("app.log", b"12:00 old\n", ';N ;U ;A,"%d:%d %s" , hour minute type')
+        agent.configure(f"{directory}/gone ;N ;S", append=True)
         agent.situation("ssh", log, ["ENTRYSRC starts 'sshd'"], text="Failed logins",
                         severity="critical", frequency=">= 2", period="1h")  # fmt: skip
         agent.situation("every-entry", log)
@@ -185,7 +187,7 @@ def watched():
 
 def arguments_of(command, log, text):
     """The words of a command; those with blanks stand between bars."""
-    places = {"LOG": str(log), "TEXTLOG": str(text)}
+    places = {"LOG": str(log), "TEXTLOG": str(text), "GONE": str(log.path.with_name("gone"))}
     words = []
     for number, part in enumerate(command.split("|")):
         words += [part] if number % 2 else part.split()

@@ -15,6 +15,26 @@ export const token = {
   },
 };
 
+// A tab that is opened from another one asks it for the token. Only pages of this agent hear that.
+const tabs = new BroadcastChannel(KEY);
+const PATIENCE_WITH_TABS = 300;
+tabs.addEventListener("message", ({ data }) => {
+  if (data === "ask" && token.get()) tabs.postMessage({ token: token.get() });
+});
+
+/** Takes the token of another tab, if there is one. */
+export function takeTokenFromTabs() {
+  return new Promise((resolve) => {
+    setTimeout(resolve, PATIENCE_WITH_TABS);
+    tabs.addEventListener("message", ({ data }) => {
+      if (!data.token) return;
+      token.set(data.token);
+      resolve();
+    }, { once: true });
+    tabs.postMessage("ask");
+  });
+}
+
 /** Why a request failed, and what to do. */
 export class ApiError extends Error {
   constructor(status, problem) {

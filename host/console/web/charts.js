@@ -1,7 +1,7 @@
 // Charts over time. Chart.js is loaded by the first view that shows one.
 
 import { h, svg } from "./dom.js";
-import { clock, number } from "./format.js";
+import { clock, number, rateText } from "./format.js";
 
 let library = null;
 
@@ -25,7 +25,7 @@ function summary(values, label, minuteOf, minutes) {
   if (known.length === 0) return `${label}: nothing known yet`;
   const most = Math.max(...known);
   const total = known.reduce((sum, value) => sum + value, 0) * minutes;
-  return `${label}: ${number(total)} in all, at most ${number(most)} per minute${most > 0 ? ` at ${minuteOf(values.indexOf(most))}` : ""}`;
+  return `${label}: ${number(total)} in all, at most ${rateText(most)} per minute${most > 0 ? ` at ${minuteOf(values.indexOf(most))}` : ""}`;
 }
 
 /** Draws entries and events per minute. Returns what ends the chart. */
@@ -33,7 +33,8 @@ export async function drawRates(holder, rates, series) {
   const begin = new Date(rates.start).getTime();
   const minuteOf = (index) => clock(new Date(begin + index * rates.step * 1000)).slice(0, 5);
   const perMinute = (values) => values.map((value) => (value === null ? null : (value * 60) / rates.step));
-  const entries = perMinute(series.entries);
+  // The entries of the present minute are counted at its end; until then there is no number, not none.
+  const entries = perMinute(series.entries.with(-1, null));
   const events = perMinute(series.events);
   const text = `${summary(entries, "Entries", minuteOf, rates.step / 60)}. ${summary(events, "Events", minuteOf, rates.step / 60)}.`;
   const canvas = h("canvas", { role: "img", "aria-label": `Entries and events per minute. ${text}` });
@@ -67,17 +68,19 @@ export function sparkline(values, label) {
   const most = Math.max(1e-9, ...sums.filter((value) => value !== null));
   let path = "";
   let isBroken = true;
+  const lone = []; // points without a neighbour, which make no line
   sums.forEach((value, index) => {
     if (value === null) {
       isBroken = true;
       return;
     }
     const x = ((index / Math.max(1, sums.length - 1)) * 118 + 1).toFixed(1);
-    const point = `${x} ${(20.5 - (value / most) * 19).toFixed(1)}`;
-    path += isBroken ? `M${point}h.6` : `L${point}`;
+    const y = (20.5 - (value / most) * 19).toFixed(1);
+    path += `${isBroken ? "M" : "L"}${x} ${y}`;
+    if (isBroken && (sums[index + 1] ?? null) === null) lone.push(svg("circle", { cx: x, cy: y, r: 1.5 }));
     isBroken = false;
   });
   const drawing = svg("svg", { class: "spark", viewBox: "0 0 120 22", preserveAspectRatio: "none", role: "img", "aria-label": label });
-  if (path) drawing.append(svg("path", { d: path }));
+  drawing.append(svg("path", { d: path }), ...lone);
   return drawing;
 }

@@ -7,7 +7,7 @@ const NAMES = {
   ENTRYSRC: "Source", ENTRYDESC: "Description", ENTRYTYPE: "Type", ENTRYCLASS: "Class", ENTRYSYS: "System", ENTRYTIME: "Time",
 };
 const WORDS = {
-  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches (regular expression)", in: "is one of",
+  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches pattern", in: "is one of",
   ">=": "at least", "<=": "at most", "<": "less than", ">": "more than",
 };
 const FIRST = ["ENTRYSRC", "ENTRYDESC", "ENTRYTYPE", "ENTRYCLASS", "ENTRYSYS", "ENTRYTIME"];
@@ -117,7 +117,7 @@ export class Conditions {
       hint();
     };
     const hint = () => {
-      input.placeholder = operatorBox.value === "in" ? "one, two, three" : isNumber() ? "a number" : "text";
+      input.placeholder = operatorBox.value === "in" ? "one, two, three" : operatorBox.value === "matches" ? "a regular expression" : isNumber() ? "a number" : "text";
     };
     offer();
     const write = (text) => (isNumber() ? text.trim() : quote(text));

@@ -78,7 +78,7 @@ export function table(caption, columns, rows, properties = {}) {
     h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, columns.map((column) =>
       h("th", { role: "columnheader", scope: "col", className: column.className || "" }, column.head ?? column.label)))),
     h("tbody", { role: "rowgroup" }, rows.map((cells) => h("tr", { role: "row" }, cells.map((cell, index) =>
-      h("td", { role: "cell", className: columns[index].className || "", "data-label": columns[index].label }, cell))))));
+      h("td", { role: "cell", className: `${columns[index].className || ""}${cell === null ? " absent" : ""}`, "data-label": columns[index].label }, cell))))));
 }
 
 /** What stands where there is nothing, not yet anything, or an error with what to do about it. */

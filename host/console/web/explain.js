@@ -3,7 +3,8 @@
 import { h, table } from "./dom.js";
 import { stamp } from "./format.js";
 
-export function explanation(one) {
+/** Without its columns where they stand beside it. */
+export function explanation(one, { withColumns = true } = {}) {
   if (!one.row) {
     return h("div", { className: "stack" }, h("p", { className: "verdict fails" }, "No entry"),
       one.line && h("pre", {}, one.line), h("p", {}, one.reason || one.decision));
@@ -15,7 +16,7 @@ export function explanation(one) {
     one.conditions.length > 0 && table("Conditions", [{ label: "Holds", className: "fit" }, { label: "Condition", className: "wide" }, { label: "The entry has", className: "wide" }],
       one.conditions.map((condition) => [h("span", { className: condition.holds ? "holds" : "fails" }, condition.holds ? "yes" : "no"), h("code", {}, condition.condition), h("code", {}, String(condition.value))]), { className: "cards" }),
     one.window && h("p", { className: "quiet" }, `In the last ${one.window.period} s: ${one.window.count}, wanted ${one.window.frequency}.`),
-    h("details", {}, h("summary", {}, "Columns of the entry"), rowList(one.row)));
+    withColumns && h("details", {}, h("summary", {}, "Columns of the entry"), rowList(one.row)));
 }
 
 const TIMES = new Set(["ENTRYTIME", "TIMESTAMP"]);

@@ -45,6 +45,12 @@ export function stamp(value) {
   return `${century === "1" ? 20 : 19}${year}-${month}-${day} ${hour}:${minute}:${second}`;
 }
 
+/** By how many minutes the agent's clock on the wall is before UTC, of one moment as 16-digit stamp and in UTC. */
+export function offsetOf(value, utc) {
+  const shown = Date.parse(`${stamp(value).replace(" ", "T")}Z`);
+  return Math.round((shown - Date.parse(utc)) / 900000) * 15; // zones lie quarters of an hour apart
+}
+
 export function ago(value) {
   if (!value) return "never";
   const seconds = Math.max(0, (Date.now() - new Date(value).getTime()) / 1000);

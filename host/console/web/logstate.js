@@ -1,20 +1,20 @@
-// What a monitored log's row says about it, in an operator's words.
+// What a log's row says about it, in an operator's words.
 
 import { number } from "./format.js";
 
 const KINDS = { U: "Text", S: "Syslog", A: "Accounting", E: "Error log" };
 export const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
 
-const AGAIN = "Mend it, then re-read the configuration after changing it (touch the file).";
+/** What a log in trouble needs after it is mended. */
+export const again = (configuration) => `What is mended is taken up when the log configuration${configuration ? ` ${configuration.file}` : ""} has changed (touch it) and “Re-read configuration” under Logs is pressed.`;
 const WHY = [
-  ["log open failed", `The file cannot be opened: it is missing, or the agent may not read it. ${AGAIN}`],
-  ["format command", `The format of this log cannot be learned. Try it under “Try a format”. ${AGAIN}`],
-  ["log read failed", `Reading failed. Look at the disk and at what writes the file. ${AGAIN}`],
-  ["insufficient memory", `There was too little memory to learn the format. ${AGAIN}`],
-  ["seek for EOF failed", `The end of the file cannot be found; it may be no plain file. ${AGAIN}`],
-  ["child", `The command of this log could not be started. ${AGAIN}`],
-  ["pipe", `The command of this log could not be started. ${AGAIN}`],
-  ["", `The monitor has ended. The agent's trace says why. ${AGAIN}`],
+  ["log open failed", "The file cannot be opened: it is missing, or the agent may not read it."],
+  ["format command", "The format of this log cannot be learned. Mend it under “Try a format”."],
+  ["log read failed", "Reading failed. Look at the disk and at what writes the file."],
+  ["insufficient memory", "There was too little memory to learn the format."],
+  ["seek for EOF failed", "The end of the file cannot be found; it may be no plain file."],
+  ["child", "The command of this log could not be started."],
+  ["pipe", "The command of this log could not be started."],
 ];
 
 /** {level: "bad" | "warn" | "idle" | "good", state, why, more: where to look} of a log of /api/v1/logs. */
@@ -22,7 +22,8 @@ export function judge({ row, ledger }) {
   const status = row.MONSTATUS;
   if (status.startsWith("Error")) {
     const cause = status.replace(/^Error: /, "");
-    return { level: "bad", state: "Error", why: `${cause}. ${WHY.find(([part]) => cause.includes(part))[1]}` };
+    const why = WHY.find(([part]) => cause.includes(part))?.[1] ?? `The monitor has ended (${cause}). The agent's trace says why.`;
+    return { level: "bad", state: "Error", why };
   }
   if (status === "Stopped") return { level: "bad", state: "Stopped", why: "The monitor has stopped. The agent's trace says why." };
   if (status !== "Running") return { level: "idle", state: status || "Unknown", why: "" };
@@ -37,4 +38,12 @@ export function judge({ row, ledger }) {
   }
   if (ledger?.skipped_bytes > 0) return { level: "warn", state: "Skipped", why: `${number(ledger.skipped_bytes)} bytes were skipped when the file was cut short.` };
   return { level: "good", state: "Running", why: "" };
+}
+
+/** The same of a log that is configured and not monitored. */
+export function judgeUnmonitored({ line, reason, cause }) {
+  const cures = {
+    file: "Make the file, or mend the path.", text: `Mend line ${line} of the log configuration.`, refresh: "",
+  };
+  return { level: "bad", state: "Not read", why: [reason, cures[cause]].filter(Boolean).join(" ") };
 }

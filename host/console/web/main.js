@@ -1,6 +1,6 @@
 // The frame of the page: token, views, connection.
 
-import { get, post, signals, token, viewModule } from "./api.js";
+import { get, signals, takeTokenFromTabs, token, viewModule } from "./api.js";
 import { button, failure, field, fill, h, loading } from "./dom.js";
 
 const VIEWS = [["logs", "Logs"], ["events", "Events"], ["situations", "Situations"], ["reports", "Reports"], ["try", "Try a format"]];
@@ -154,10 +154,7 @@ addEventListener("hashchange", () => {
   token.takeFromAddress();
   show();
 });
-addEventListener("zrm-refresh", async () => {
-  await post("/api/v1/refresh");
-  setTimeout(show, 1500);
-});
 token.takeFromAddress();
+if (!token.get()) await takeTokenFromTabs();
 show(true);
 check();

@@ -57,7 +57,7 @@ export function explainPanel(subject, log) {
     fill(result, h("p", { className: "quiet" }, "Asking …"));
     try {
       const answer = await post("/api/v1/explain", { ...subject(), log: log(), ...what });
-      fill(result, answer.explanations.length > 0 ? answer.explanations.map(explanation) : h("p", {}, "The log holds no entry yet."));
+      fill(result, answer.explanations.length > 0 ? answer.explanations.map((one) => explanation(one)) : h("p", {}, "The log holds no entry yet."));
     } catch (error) {
       fill(result, failure(error));
     }

@@ -13,7 +13,8 @@ export class EventStream {
   #handlers;
 
   /** handlers: event(event), state("connecting" | "live" | "waiting" | "refused", detail): waiting says
-   *  for how many seconds and, if the agent refused, why; refused the error */
+   *  for how many seconds and, if the agent refused, why; refused the error; again() when a lost stream
+   *  is back */
   constructor(query, after, handlers) {
     this.#query = query;
     this.#last = after;
@@ -27,6 +28,7 @@ export class EventStream {
 
   async #run() {
     let pause = FIRST_PAUSE;
+    let wasLive = false;
     while (!this.#abort.signal.aborted) {
       let refusal = null;
       try {
@@ -35,6 +37,8 @@ export class EventStream {
         if (this.#last !== null && this.#last !== undefined) headers["Last-Event-ID"] = String(this.#last);
         const response = await open(withQuery("/api/v1/events/stream", this.#query), { headers, signal: this.#abort.signal });
         this.#handlers.state("live");
+        if (wasLive) this.#handlers.again();
+        wasLive = true;
         pause = FIRST_PAUSE;
         await this.#read(response.body.getReader());
       } catch (error) {

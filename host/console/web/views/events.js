@@ -26,12 +26,15 @@ class EventsPage {
     this.arrived = [];
     this.isPaused = false;
     this.hasOlder = true;
-    this.wanted = query.get("situation") || "";
+    this.wanted = Object.fromEntries(["situation", "log", "severity"].map((key) => [key, query.get(key) || ""]));
     this.#build(element);
   }
 
   #build(element) {
-    const again = () => this.restart();
+    const again = () => {
+      history.replaceState(null, "", withQuery("#/events", this.filter)); // for a reload, and the way back
+      this.restart();
+    };
     this.situation = select([["", "All situations"]], "", { onchange: again });
     this.log = select([["", "All logs"]], "", { onchange: again });
     this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
@@ -62,14 +65,16 @@ class EventsPage {
   }
 
   async #offer() {
-    const option = (value) => h("option", { value }, value);
-    if (this.wanted) {
-      this.situation.append(option(this.wanted));
-      this.situation.value = this.wanted;
+    const offer = (select, value) => {
+      if ([...select.options].every((one) => one.value !== value)) select.append(h("option", { value }, value));
+    };
+    for (const [key, value] of Object.entries(this.wanted)) {
+      offer(this[key], value);
+      this[key].value = value;
     }
     const [situations, logs] = await Promise.allSettled([get("/api/v1/situations"), get("/api/v1/logs")]);
-    for (const { name } of situations.value?.situations || []) if (name !== this.wanted) this.situation.append(option(name));
-    for (const { log } of logs.value?.logs || []) this.log.append(option(log));
+    for (const { name } of situations.value?.situations || []) offer(this.situation, name);
+    for (const { log } of logs.value?.logs || []) offer(this.log, log);
   }
 
   end() {
@@ -103,7 +108,21 @@ class EventsPage {
     this.hasOlder = answer.events.length === PAGE;
     this.#filter();
     const after = Math.max(answer.newest || 0, answer.events[0]?.id || 0);
-    this.stream = new EventStream(this.filter, after, { event: (event) => this.#arrive(event), state: (...state) => this.#setState(...state) });
+    this.stream = new EventStream(this.filter, after, {
+      event: (event) => this.#arrive(event), state: (...state) => this.#setState(...state), again: () => this.#verify(abort.signal),
+    });
+  }
+
+  /** An agent that comes back with another history counts its events anew: then the list begins anew. */
+  async #verify(signal) {
+    const [latest] = this.all;
+    if (!latest) return;
+    try {
+      const kept = await get(`/api/v1/events/${latest.id}`, signal);
+      if (kept.raised !== latest.raised) this.restart();
+    } catch (error) {
+      if (error.status === 404) this.restart();
+    }
   }
 
   #fail(error) {
@@ -213,7 +232,7 @@ class EventsPage {
       fill(why, h("p", { className: "loading" }, "Asking …"));
       try {
         const answer = await post("/api/v1/explain", { situation: event.situation, event: event.id });
-        fill(why, answer.explanations.map(explanation));
+        fill(why, answer.explanations.map((one) => explanation(one, { withColumns: false })));
       } catch (error) {
         fill(why, failure(error));
       }

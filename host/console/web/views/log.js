@@ -4,9 +4,10 @@ import { get, withQuery } from "../api.js";
 import { drawRates } from "../charts.js";
 import { empty, failure, fill, h, loading, table } from "../dom.js";
 import { bytes, number, plural, stamp, time } from "../format.js";
-import { judge, kindOf } from "../logstate.js";
+import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
 const EVERY = 10000;
+const CHART_EVERY = 60000;
 
 export async function show(element, path) {
   const state = h("div", { className: "panel" }, loading());
@@ -23,11 +24,16 @@ export async function show(element, path) {
   let isDrawn = false;
   const load = async () => {
     try {
-      const { logs: [log] } = await get(withQuery("/api/v1/logs", { log: path }));
-      drawState(state, log);
-      drawLedger(ledger, log);
+      const { logs: [log], unmonitored: [other], configuration } = await get(withQuery("/api/v1/logs", { log: path }));
+      rates.hidden = !log;
+      if (log) {
+        drawState(state, log, configuration);
+        drawLedger(ledger, log);
+      } else {
+        drawUnmonitored(state, other, configuration);
+        fill(ledger);
+      }
       isDrawn = true;
-      rates.hidden = false;
     } catch (error) {
       if (error.status === 404) {
         fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration. Add it there, then re-read the configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
@@ -40,32 +46,31 @@ export async function show(element, path) {
   let isCharted = false;
   const loadChart = async () => {
     try {
-      const answer = await get("/api/v1/rates?step=300");
-      const series = answer.logs.find((one) => one.log === path);
+      const answer = await get(withQuery("/api/v1/rates", { log: path }));
+      const [series] = answer.logs;
       endChart();
-      if (!series) fill(chart, h("p", { className: "hint" }, "No entry of this log in the last 24 hours."));
+      endChart = () => {};
+      if (!series) fill(chart, h("p", { className: "hint" }, "No entry of this log in the last 24 hours. Entries are counted at the end of each minute."));
       else endChart = await drawRates(chart, answer, series);
       isCharted = Boolean(series);
     } catch (error) {
-      fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept. [history] in the configuration switches it on." : error.message));
+      if (!isCharted) fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept. [history] in the configuration switches it on." : error.message));
     }
   };
   const scheme = matchMedia("(prefers-color-scheme: dark)");
   scheme.addEventListener("change", loadChart);
   await Promise.all([load(), loadChart()]);
-  const timer = setInterval(() => {
-    if (document.hidden) return;
-    load();
-    if (!isCharted) loadChart();
-  }, EVERY);
+  const timer = setInterval(() => !document.hidden && load(), EVERY);
+  const chartTimer = setInterval(() => !document.hidden && loadChart(), CHART_EVERY);
   return () => {
     clearInterval(timer);
+    clearInterval(chartTimer);
     scheme.removeEventListener("change", loadChart);
     endChart();
   };
 }
 
-function drawState(element, log) {
+function drawState(element, log, configuration) {
   const { level, state, why } = judge(log);
   const { row } = log;
   const ledger = log.ledger || {};
@@ -77,7 +82,14 @@ function drawState(element, log) {
   ];
   if (row.FORMATTER) pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
   fill(element, h("p", {}, h("span", { className: `state ${level}` }, state)), why && h("p", { className: `why ${level}` }, why),
-    h("dl", { className: "pairs" }, pairs.map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)])));
+    level === "bad" && h("p", { className: "hint" }, again(configuration)),
+    h("dl", { className: "facts" }, pairs.map(([name, value]) => h("div", {}, h("dt", {}, name), h("dd", {}, value)))));
+}
+
+function drawUnmonitored(element, log, configuration) {
+  const { level, state, why } = judgeUnmonitored(log);
+  fill(element, h("p", {}, h("span", { className: `state ${level}` }, state)), h("p", { className: `why ${level}` }, why),
+    h("p", { className: "hint" }, `It stands in line ${log.line} of the log configuration. ${again(configuration)}`));
 }
 
 function drawLedger(element, log) {

@@ -1,16 +1,20 @@
 // The monitored logs: which are in trouble and why, and what comes in.
 
-import { get, viewModule, withQuery } from "../api.js";
+import { get, post, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
 import { button, debounce, empty, failure, fill, h, loading, select, table } from "../dom.js";
 import { ago, briefTime, bytes, number, rate, rateText } from "../format.js";
-import { judge, kindOf } from "../logstate.js";
+import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
 const EVERY = 5000;
+const MINUTE = 60000;
+const LATEST_EVENTS = 100; // of which one row for each situation is made
+const MOST_RAISED = 8;
+const TAKES_A_WHILE = 1500; // until a refresh shows
 const ORDER = { bad: 0, warn: 1, idle: 2, good: 3 };
 
 const COLUMNS = [
-  { label: "State", className: "fit" }, { label: "Log", className: "wide" }, { label: "Kind", className: "fit" },
+  { label: "State", className: "fit lead" }, { label: "Log", className: "wide" }, { label: "Kind", className: "fit tail" },
   { label: "Entries/min", className: "num" }, { label: "Last 24 h", className: "fit" }, { label: "Entries", className: "num" },
   { label: "Rejected", className: "num" }, { label: "Size", className: "num" }, { label: "Last entry", className: "fit" },
 ];
@@ -26,25 +30,32 @@ export async function show(element, query) {
 }
 
 class LogsPage {
+  logs = null;
+  #rates = new Map(); // by log: entries of the last minutes
+  #days = new Map(); // by log: entries of 24 hours
+  #seen = new Map(); // by log: [{at, lines}] of the answers of the last minutes
+  #askedRates = -Infinity;
+  #newest = null;
+
   constructor(element) {
     this.counts = h("p", { className: "counts", role: "status" });
     this.text = h("input", { type: "search", placeholder: "Find a log", "aria-label": "Find a log", oninput: debounce(() => this.draw(), 100) });
     this.which = select([["", "All states"], ["bad", "In trouble"], ["warn", "To look at"], ["good", "Running"]], "", { "aria-label": "State", onchange: () => this.draw() });
-    this.list = h("section", { className: "panel flush", "aria-label": "Monitored logs" }, loading());
+    this.note = h("div", { role: "status" });
+    this.cure = h("p", { className: "hint" });
+    this.trouble = h("div", { role: "alert" });
+    this.list = h("section", { className: "panel flush", "aria-label": "Logs" }, loading());
     this.lately = h("section", { className: "panel flush", "aria-label": "Raised lately" });
     fill(element,
       h("div", { className: "head" }, h("h1", {}, "Logs"), this.counts,
         h("div", { className: "push" }, this.text, this.which,
-          button("Re-read configuration", () => dispatchEvent(new Event("zrm-refresh")), { title: "As SIGHUP does: new logs are taken up, removed ones are left" }))),
-      this.list, this.lately);
-    this.logs = null;
-    this.rates = new Map();
+          button("Re-read configuration", () => this.#reread(), { title: "As SIGHUP does: new logs are taken up, removed ones are left" }))),
+      this.note, this.trouble, this.cure, this.list, this.lately);
   }
 
   async load() {
     try {
-      const answer = await get("/api/v1/logs");
-      this.logs = answer.logs;
+      this.#take(await get("/api/v1/logs"));
     } catch (error) {
       if (!this.logs) fill(this.list, failure(error, () => this.load()));
       return;
@@ -58,39 +69,95 @@ class LogsPage {
     return () => clearInterval(timer);
   }
 
-  async #loadRates() {
+  #take({ logs, unmonitored, configuration, time }) {
+    this.logs = [
+      ...logs.map((log) => ({ ...log, ...judge(log) })),
+      ...unmonitored.map((log) => ({ ...log, ...judgeUnmonitored(log), row: null })),
+    ];
+    this.at = Date.parse(time);
+    for (const { log, ledger } of logs) {
+      const seen = this.#seen.get(log) || [];
+      if (ledger) seen.push({ at: this.at, lines: ledger.lines });
+      while (seen[0]?.at < this.at - 5 * MINUTE || seen[0]?.lines > ledger?.lines) seen.shift();
+      this.#seen.set(log, seen);
+    }
+    this.configuration = configuration;
+    fill(this.trouble, configuration?.problem && h("p", { className: "panel problem" },
+      `The log configuration ${configuration.file} cannot be read: ${configuration.problem}. The agent goes on with the logs that it has; those of the system's syslog configuration, if it had none.`));
+  }
+
+  async #reread() {
     try {
-      const rates = await get("/api/v1/rates");
-      this.rates = new Map(rates.logs.map((log) => [log.log, log]));
+      await post("/api/v1/refresh");
+      fill(this.note, h("p", { className: "hint" }, "The agent was asked to read its log configuration. Where that file has not changed, nothing changes."));
+      setTimeout(() => this.list.isConnected && this.load(), TAKES_A_WHILE);
+    } catch (error) {
+      fill(this.note, h("p", { className: "problem" }, error.message));
+    }
+  }
+
+  // The counts of a minute are kept at its end.
+  async #loadRates() {
+    if (performance.now() - this.#askedRates < MINUTE / 4) return;
+    this.#askedRates = performance.now();
+    const byLog = ({ logs }) => new Map(logs.map((one) => [one.log, one.entries]));
+    try {
+      const from = new Date(this.at - 6 * MINUTE).toISOString();
+      const [day, latest] = await Promise.all([get("/api/v1/rates?step=900"), get(withQuery("/api/v1/rates", { from }))]);
+      this.#days = byLog(day);
+      this.#rates = byLog(latest);
       this.draw();
     } catch {
-      this.rates = new Map(); // the table stands without them
+      // The table stands without them.
     }
+  }
+
+  /** Entries per minute: by the history, or else by what this page has seen come. */
+  #rateOf(log) {
+    const kept = rate((this.#rates.get(log) || []).slice(0, -1)); // the present minute is not over
+    if (kept !== null) return kept;
+    const seen = this.#seen.get(log) || [];
+    const [first, last] = [seen[0], seen.at(-1)];
+    return seen.length > 1 ? ((last.lines - first.lines) * MINUTE) / (last.at - first.at) : null;
   }
 
   async #loadEvents() {
     try {
-      const { events } = await get("/api/v1/events?limit=6");
+      const { newest } = await get("/api/v1/events?limit=1");
+      if (newest === this.#newest) return;
+      const { events } = await get(`/api/v1/events?limit=${LATEST_EVENTS}`);
+      this.#newest = newest;
       this.#drawEvents(events);
     } catch (error) {
       fill(this.lately, h("h2", {}, "Raised lately"), h("p", { className: "loading" }, error.status === 409
         ? "The history is off, so events are not kept. [history] in the configuration switches it on."
         : error.message));
+      this.#newest = null;
     }
   }
 
+  /** One row for each situation, so that a loud one does not hide the others. */
   #drawEvents(events) {
-    fill(this.lately, h("h2", {}, "Raised lately"), events.length === 0
+    const bySituation = new Map();
+    for (const event of events) {
+      const one = bySituation.get(event.situation);
+      if (one) one.count += 1;
+      else bySituation.set(event.situation, { ...event, count: 1 });
+    }
+    const shown = [...bySituation.values()].slice(0, MOST_RAISED);
+    fill(this.lately, h("h2", {}, "Raised lately"), shown.length === 0
       ? h("p", { className: "loading" }, "No situation has been raised yet. ", h("a", { href: "#/situations" }, "Look at the situations"), " to see what would be.")
-      : h("ul", { className: "list" }, events.map((event) => h("li", {},
+      : h("ul", { className: "list" }, shown.map((event) => h("li", {},
         h("span", { title: event.raised }, briefTime(event.raised)),
         h("span", { className: `severity ${event.severity}` }, event.severity),
-        h("a", { href: withQuery("#/events", { situation: event.situation }) }, event.situation),
+        h("span", {}, h("a", { href: withQuery("#/events", { situation: event.situation }) }, event.situation),
+          event.count > 1 && h("span", { className: "quiet", title: `Among the latest ${events.length} events` }, ` × ${event.count}`)),
         h("span", { className: "what" }, event.row?.UENTRYDESC || event.row?.ENTRYDESC || "")))));
   }
 
   draw() {
-    const judged = this.logs.map((log) => ({ ...log, ...judge(log) }));
+    const judged = this.logs;
+    this.cure.textContent = judged.some(({ level }) => level === "bad") ? again(this.configuration) : "";
     const counted = (level) => judged.filter((log) => log.level === level).length;
     fill(this.counts, h("span", {}, h("b", {}, number(judged.length)), ` ${judged.length === 1 ? "log" : "logs"}`),
       counted("bad") > 0 && h("span", { className: "state bad" }, `${counted("bad")} in trouble`),
@@ -109,23 +176,23 @@ class LogsPage {
       return;
     }
     const focused = document.activeElement?.closest?.("td a")?.getAttribute("href");
-    fill(this.list, table("Monitored logs, those in trouble first", COLUMNS, shown.map((log) => this.#cells(log)), { className: "cards" }));
+    fill(this.list, table("Logs, those in trouble first", COLUMNS, shown.map((log) => this.#cells(log)), { className: "cards" }));
     if (focused) this.list.querySelector(`a[href="${CSS.escape(focused)}"]`)?.focus();
   }
 
   #cells(log) {
-    const series = this.rates.get(log.log);
-    const perMinute = series ? rate(series.entries) : null;
+    const why = log.why && h("p", { className: `why ${log.level}` }, [log.why, log.more].filter(Boolean).join(" "));
+    const state = h("span", { className: `state ${log.level}` }, log.state);
+    if (!log.row) return [state, h("div", {}, h("span", { className: "break" }, log.log), why), ...Array(COLUMNS.length - 2).fill(null)];
+    const perMinute = this.#rateOf(log.log);
+    const day = this.#days.get(log.log);
     const last = log.ledger?.last_entry;
     return [
-      h("span", { className: `state ${log.level}` }, log.state),
-      h("div", {}, h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log),
-        log.why && h("p", { className: `why ${log.level}` }, [log.why, log.more].filter(Boolean).join(" "))),
+      state, h("div", {}, h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log), why),
       kindOf(log.row), h("span", { title: "Mean of the last five minutes" }, rateText(perMinute)),
-      series ? sparkline(series.entries, `Entries over 24 hours, now ${rateText(perMinute)} per minute`) : "–",
+      day ? sparkline(day, `Entries over 24 hours, now ${rateText(perMinute)} per minute`) : "–",
       number(log.ledger?.lines ?? log.row.NUMEVENTS), number(log.ledger?.format_errors ?? log.row.NUMERRORS),
       bytes(log.row.LOGSIZE), h("span", { title: last || "" }, last ? ago(last) : "–"),
     ];
   }
 }
-

@@ -3,7 +3,7 @@
 import { get, post } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { button, empty, failure, field, fill, h, loading, select } from "../dom.js";
-import { plural, stamp } from "../format.js";
+import { offsetOf, plural, stamp } from "../format.js";
 
 const HOUR = 3600 * 1000;
 const PRESETS = [
@@ -39,12 +39,14 @@ function local(date) {
 }
 
 export async function show(element, query) {
-  const [{ logs }, { columns }] = await Promise.all([get("/api/v1/logs"), get("/api/v1/columns")]);
+  const [{ logs, time }, { columns }] = await Promise.all([get("/api/v1/logs"), get("/api/v1/columns")]);
   if (logs.length === 0) {
     fill(element, h("h1", {}, "Reports"), empty("No log is monitored", "A report reads a log that the agent monitors.", h("a", { className: "button", href: "#/logs" }, "Logs")));
     return () => {};
   }
   const page = new ReportPage(element, logs.map(({ log }) => log).sort(), columns, query.get("log"));
+  const offset = offsetOf(logs[0].row.TIMESTAMP, time);
+  if (offset !== -new Date().getTimezoneOffset()) page.setZone(offset);
   return () => page.end();
 }
 
@@ -59,12 +61,20 @@ class ReportPage {
     this.from = field("From", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.to = field("To", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.conditions = new Conditions(columns, [], () => this.conditions.setProblems([]));
+    this.zone = h("p", { className: "hint" });
     this.run = h("button", { className: "primary" }, "Run the report");
     this.#setWindow();
     fill(element, h("div", { className: "head" }, h("h1", {}, "Reports")),
       h("form", { className: "panel", noValidate: true, onsubmit: (event) => { event.preventDefault(); this.#run(); } },
-        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to), this.conditions.element, h("p", { className: "actions" }, this.run)),
+        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to), this.zone, this.conditions.element, h("p", { className: "actions" }, this.run)),
       this.result);
+  }
+
+  /** Says whose times are meant, where the agent's machine has others than this browser. */
+  setZone(offset) {
+    const two = (value) => String(Math.floor(value)).padStart(2, "0");
+    const zone = `UTC${offset < 0 ? "−" : "+"}${two(Math.abs(offset) / 60)}:${two(Math.abs(offset) % 60)}`;
+    this.zone.textContent = `From and To are your time; the times of entries are those of the agent's machine (${zone}).`;
   }
 
   end() {
@@ -114,7 +124,7 @@ class ReportPage {
 
   #fail(error) {
     if (error.name === "AbortError") {
-      fill(this.result, h("div", { className: "panel" }, empty("Cancelled", "Choose a shorter time or more conditions, or run it again.")));
+      fill(this.result, h("div", { className: "panel" }, empty("Cancelled", "Choose a later begin or a shorter time, or run it again.")));
       return;
     }
     const rest = error.field ? this.conditions.setProblems([{ field: error.field, detail: error.message }]) : [error];
@@ -149,7 +159,7 @@ class ReportPage {
     const sorted = this.sort ? [...rows].sort((a, b) => this.#compare(a, b)) : rows;
     const head = shown.map(([name, label]) => {
       const isSorted = this.sort?.name === name;
-      return h("th", { scope: "col", role: "columnheader", "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none" },
+      return h("th", { scope: "col", className: name.endsWith("DESC") ? "" : "fit", role: "columnheader", "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none" },
         button(`${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`, () => {
           this.sort = { name, up: isSorted ? !this.sort.up : true };
           this.#drawTable(isWhole);

@@ -44,9 +44,9 @@ function definition(situation) {
   const pairs = [
     ["Text", situation.text || "–"], ["Severity", h("span", { className: `severity ${situation.severity}` }, situation.severity)], ["Log", situation.log || "any log"],
     ["Conditions", situation.when.length > 0 ? situation.when.map((text) => h("div", {}, h("code", {}, text))) : "none: every entry"],
-    ["Repeats", situation.frequency ? `${situation.frequency} within ${situation.period}` : "every match is raised"],
+    ["Frequency", situation.frequency ? `raised while ${situation.frequency} matches come within ${situation.period}` : "every match is raised"],
     ["Comes from", situation.source === "file" ? "the configuration file; it is changed there" : "this console or the API"],
-    ["Offered", number(counts.offered)], ["Matched", number(counts.matched)], ["Held back", `${number(counts.discarded)} by the frequency`], ["Raised", number(counts.raised)],
+    ["Entries judged", number(counts.offered)], ["Matched", number(counts.matched)], ["Held back", `${number(counts.discarded)} by the frequency`], ["Raised", number(counts.raised)],
     ["Last raised", situation.last_raised ? `${time(situation.last_raised)} (${ago(situation.last_raised)})` : "never"],
   ];
   return h("section", { className: "panel" }, situation.problem && h("p", { className: "problem" }, situation.problem),

@@ -8,8 +8,8 @@ const EVERY = 5000;
 export const STATES = { running: ["good", "Running"], stopped: ["warn", "Stopped"], failed: ["bad", "Failed"] };
 
 const COLUMNS = [
-  { label: "State", className: "fit" }, { label: "Situation", className: "wide" }, { label: "Severity", className: "fit" }, { label: "Log", className: "wide break" },
-  { label: "Matched", className: "num" }, { label: "Raised", className: "num" }, { label: "Last raised", className: "fit" }, { label: "Actions", className: "wide", head: h("span", { className: "unseen" }, "Actions") },
+  { label: "State", className: "fit lead" }, { label: "Situation", className: "wide" }, { label: "Severity", className: "fit tail" }, { label: "Log", className: "wide break" },
+  { label: "Matched", className: "num" }, { label: "Raised", className: "num" }, { label: "Last raised", className: "fit" }, { label: "Actions", className: "wide last", head: h("span", { className: "unseen" }, "Actions") },
 ];
 
 export async function show(element, query) {
@@ -60,7 +60,8 @@ function cells(situation, act) {
   return [
     h("span", { className: `state ${level}` }, state),
     h("div", {}, h("a", { href: withQuery("#/situations", { name: situation.name }), "data-key": `open ${situation.name}` }, situation.name),
-      situation.text && h("p", { className: "why" }, situation.text), situation.problem && h("p", { className: "why bad" }, situation.problem)),
+      situation.text && h("p", { className: "why" }, situation.text), situation.source === "file" && h("p", { className: "why" }, "From the configuration file"),
+      situation.problem && h("p", { className: "why bad" }, situation.problem)),
     h("span", { className: `severity ${situation.severity}` }, situation.severity), situation.log || "any log",
     number(situation.counts.matched), number(situation.counts.raised),
     h("span", { title: situation.last_raised || "" }, ago(situation.last_raised)), actions(situation, act),
@@ -81,6 +82,5 @@ export function actions(situation, act, gone = () => {}) {
         await request("DELETE", situationPath(name));
         gone();
       });
-    }, { "aria-label": `Delete ${name}`, "data-key": `delete ${name}` }),
-    !isOurs && h("span", { className: "hint" }, "from the configuration file"));
+    }, { "aria-label": `Delete ${name}`, "data-key": `delete ${name}` }));
 }

@@ -90,7 +90,7 @@ class TryPage {
 
   #configuration(answer) {
     if (!answer.configuration_line) return null;
-    const path = this.takenFrom || this.log.value || "/path/to/the.log";
+    const path = this.takenFrom || "/path/to/the.log";
     const text = answer.configuration_line.replace(/^\S+/, path);
     const said = h("span", { role: "status", className: "hint" });
     const code = h("pre", { className: "copyable", tabIndex: 0, "aria-label": "Configuration line" }, text);
@@ -103,7 +103,8 @@ class TryPage {
           getSelection().selectAllChildren(code);
           said.textContent = "Selected; copy it with the keyboard.";
         }
-      }), said, h("span", { className: "hint" }, "Put it into the file of log_config in place of the log's present line, then re-read the configuration.")));
+      }), said, h("span", { className: "hint" }, this.takenFrom ? "Put it into the file of log_config in place of the log's present line, then re-read the configuration under Logs."
+        : "Put the log's own path in front, and the line into the file of log_config; then re-read the configuration under Logs.")));
   }
 }
 

@@ -86,6 +86,10 @@ TEST_F(EventsResourceTest, GivesRates) {
               R"(200 {"start":"1970-01-01T00:00:00.000Z","step":120,"logs":[)"
               R"({"log":"/a","entries":[1,null],"events":[0,null]},)"
               R"({"log":"/b","entries":[],"events":[]}]})");
+    EXPECT_EQ(
+        get("/api/v1/rates?from=1970-01-01T00:00:00Z&to=1970-01-01T00:04:00Z&step=120&log=/b"),
+        R"(200 {"start":"1970-01-01T00:00:00.000Z","step":120,"logs":[)"
+        R"({"log":"/b","entries":[],"events":[]}]})");
     get("/api/v1/rates");
     EXPECT_EQ(history.ratesTo - history.ratesFrom, 24 * 3600 * 1000);
     EXPECT_EQ(get("/api/v1/rates?step=90"), "400 step: write a multiple of 60 seconds");

@@ -1,0 +1,132 @@
+#include "host/diagnose/UnmonitoredLogs.h"
+
+#include "agent/ErrorText.h"
+#include "agent/TraceScope.h"
+#include "host/diagnose/ConfigCheck.h"
+#include "host/diagnose/LogLedgers.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+
+#include <nlohmann/json.hpp>
+#include <sys/stat.h>
+
+namespace {
+
+TRC1_Anchor anchor{"UnmonitoredLogs.cpp"};
+
+constexpr std::string_view kSpaces = " \t\v\f\r";
+
+/// The log that a line names.
+std::string_view nameIn(std::string_view line) {
+    line.remove_prefix(std::min(line.find_first_not_of(kSpaces), line.size()));
+    return line.substr(0, line.find_first_of(" \t"));
+}
+
+/// The text without the lines of monitored logs, whose verdicts nobody asks for; the other lines
+/// keep their numbers. Empty when none is left.
+std::string others(std::string_view text, const std::set<std::string>& monitored) {
+    std::string left;
+    bool isAnyLeft = false;
+    while (!text.empty()) {
+        const std::size_t end = std::min(text.find('\n'), text.size());
+        const std::string_view name = nameIn(text.substr(0, end));
+        if (!name.empty() && name[0] != '#' && !monitored.contains(std::string(name))) {
+            left += text.substr(0, end);
+            isAnyLeft = true;
+        }
+        const std::size_t next = std::min(end + 1, text.size());
+        left += text.substr(end, next - end);
+        text.remove_prefix(next);
+    }
+    return isAnyLeft ? left : std::string();
+}
+
+/// Why there is nothing to read at a path; empty when there is a file.
+std::string problemOf(const char* path) {
+    struct stat status;
+    if (::stat(path, &status) != 0) {
+        const ErrorText error(errno);
+        return error.text();
+    }
+    return S_ISREG(status.st_mode) ? "" : "It is not a regular file";
+}
+
+UnmonitoredLogs::Log logOf(const ConfigCheck::Line& line) {
+    UnmonitoredLogs::Log log{std::string(nameIn(line.text)), line.number, line.reason,
+                             ConfigCheck::name(line.cause)};
+    if (line.verdict == ConfigCheck::Verdict::ACCEPTED) {
+        log.reason = "The agent has not read this line yet.";
+        log.cause = "refresh";
+    } else if (line.cause == ConfigCheck::Cause::FILE) {
+        // The agent's own message is one for its trace.
+        const std::string problem = problemOf(line.log.c_str());
+        log.reason = problem.empty() ? line.reason : "The file cannot be used: " + problem + ".";
+    }
+    return log;
+}
+
+} // namespace
+
+UnmonitoredLogs::Result UnmonitoredLogs::read() {
+    TraceScope trace(anchor);
+    const char* const path = std::getenv("ZRM_CONFIG_FILE");
+    if (path == nullptr || *path == '\0') {
+        return {};
+    }
+    Result result{path, problemOf(path), {}};
+    if (!result.problem.empty()) { // a pipe would hold up who opens it
+        return result;
+    }
+    std::ifstream stream(path, std::ios::binary);
+    if (!stream) {
+        const ErrorText error(errno);
+        result.problem = error.text();
+        return result;
+    }
+    const std::string text{std::istreambuf_iterator<char>(stream), {}};
+    std::set<std::string> monitored;
+    for (const LogLedgerView& log : LogLedgers::read()) {
+        monitored.insert(log.file);
+    }
+    result.logs = find(text, monitored);
+    return result;
+}
+
+std::vector<UnmonitoredLogs::Log> UnmonitoredLogs::find(std::string_view text,
+                                                        const std::set<std::string>& monitored) {
+    TraceScope trace(anchor);
+    std::vector<Log> logs;
+    for (const ConfigCheck::Line& line : ConfigCheck::check(others(text, monitored)).lines) {
+        if (line.verdict == ConfigCheck::Verdict::IGNORED) {
+            continue;
+        }
+        Log log = logOf(line);
+        const bool isKnown = std::any_of(logs.begin(), logs.end(),
+                                         [&](const Log& other) { return other.log == log.log; });
+        if (!isKnown) {
+            logs.push_back(std::move(log));
+        }
+    }
+    return logs;
+}
+
+std::string UnmonitoredLogs::json(const Log& log) {
+    const nlohmann::ordered_json object{
+        {"log", log.log}, {"line", log.line}, {"reason", log.reason}, {"cause", log.cause}};
+    return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
+}
+
+std::string UnmonitoredLogs::configurationJson(const Result& result) {
+    if (result.file.empty()) {
+        return "null";
+    }
+    nlohmann::ordered_json object{{"file", result.file}, {"problem", nullptr}};
+    if (!result.problem.empty()) {
+        object["problem"] = result.problem;
+    }
+    return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
+}

@@ -1,0 +1,42 @@
+#ifndef ZRM_HOST_UNMONITORED_LOGS_H
+#define ZRM_HOST_UNMONITORED_LOGS_H
+
+#include <cstddef>
+#include <set>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Finds the logs that the log configuration names and the agent does not monitor. The agent
+/// passes over a line that it cannot use, and its tables have no row for it; who runs the agent
+/// wants to see it all the same. Stateless.
+class UnmonitoredLogs {
+public:
+    struct Log {
+        std::string log; ///< as the configuration names it, so not always a whole path
+        std::size_t line;
+        std::string reason;
+        const char* cause; ///< "file", "text", or "refresh" when only that is missing
+    };
+
+    struct Result {
+        std::string file;      ///< the log configuration; empty when none is set
+        std::string problem;   ///< why it cannot be read; empty when it can
+        std::vector<Log> logs; ///< in the order of its lines, each once
+    };
+
+    /// The configuration of this process as it is now, against the logs that its agent monitors.
+    /// Any thread, while the agent runs.
+    static Result read();
+
+    /// The logs that a configuration's text names and that are not among `monitored`, which are
+    /// local names. Any thread.
+    static std::vector<Log> find(std::string_view text, const std::set<std::string>& monitored);
+
+    /// A log as the JSON object that the API answers.
+    static std::string json(const Log& log);
+    /// The file and its problem, as the API answers them; null where nothing is set.
+    static std::string configurationJson(const Result& result);
+};
+
+#endif
