@@ -4,6 +4,9 @@
 #include "agent/TraceScope.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/LogLedgers.h"
+#include "host/framework/CodePages.h"
+#include "host/framework/Converter.h"
+#include "host/framework/Utf8.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -45,6 +48,24 @@ std::string others(std::string_view text, const std::set<std::string>& monitored
     return isAnyLeft ? left : std::string();
 }
 
+/// A name in UTF-8, which the API and the metrics need; the process has another code page perhaps.
+std::string inUtf8(std::string_view name) {
+    if (Utf8::validPrefix(name) == name.size()) {
+        return std::string(name);
+    }
+    constexpr std::size_t maxGrowth = 3;
+    std::string text(name.size() * maxGrowth, '\0');
+    const LOC2_Locale& utf8 = *CodePages::byNumber(LOC2_UTF8);
+    const LOC2_Locale* const local = LOC2_GetLocale(0, 0, 0, nullptr);
+    Converted converted = Converter::convert(utf8, text.data(), text.size(),
+                                             local->codePage == 0 ? utf8 : *local, name);
+    if (!converted.supported) {
+        converted = Converter::convert(utf8, text.data(), text.size(), utf8, name);
+    }
+    text.resize(converted.written);
+    return text;
+}
+
 /// Why there is nothing to read at a path; empty when there is a file.
 std::string problemOf(const char* path) {
     struct stat status;
@@ -56,14 +77,14 @@ std::string problemOf(const char* path) {
 }
 
 UnmonitoredLogs::Log logOf(const ConfigCheck::Line& line) {
-    UnmonitoredLogs::Log log{std::string(nameIn(line.text)), line.number, line.reason,
+    UnmonitoredLogs::Log log{inUtf8(nameIn(line.text)), line.number, line.reason,
                              ConfigCheck::name(line.cause)};
     if (line.verdict == ConfigCheck::Verdict::ACCEPTED) {
         log.reason = "The agent has not read this line yet.";
         log.cause = "refresh";
     } else if (line.cause == ConfigCheck::Cause::FILE) {
         // The agent's own message is one for its trace.
-        const std::string problem = problemOf(line.log.c_str());
+        const std::string problem = problemOf(std::string(nameIn(line.text)).c_str());
         log.reason = problem.empty() ? line.reason : "The file cannot be used: " + problem + ".";
     }
     return log;

@@ -5,6 +5,7 @@ import shutil
 import sys
 import time
 from pathlib import Path
+from urllib.parse import quote
 
 import pytest
 from selenium import webdriver
@@ -108,6 +109,59 @@ class Page:
     def run(self, script, *arguments):
         return self.driver.execute_script(script, *arguments)
 
+    # ------------------------------------------------------------------ what views share
+
+    def pick(self, label, text):
+        """Chooses in a list that has its label as attribute alone."""
+        until(
+            lambda: Select(self.find(f"//select[@aria-label='{label}']")).select_by_visible_text(text) or True,
+            f"{text} in {label}",
+        )
+
+    def open_log(self, log):
+        self.open(f"logs?log={quote(str(log))}")
+        self.heading(str(log))
+
+    def wait_live(self, seconds=PATIENCE):
+        until(lambda: self.find("//*[@class='state good']").text == "Live", "the stream", seconds)
+
+    def condition(self, value, number=1, operator=None):
+        """Adds a condition on the description."""
+        self.click("Add a condition")
+        group = f"(//*[@role='group' and @aria-label='Condition'])[{number}]"
+        if operator:
+            self.find(f"{group}//select[@aria-label='Operator']/option[.='{operator}']").click()
+        self.find(f"{group}//input").send_keys(value)
+        return self.find(f"{group}//input")
+
+    def run_report(self, log, entries):
+        self.choose("Log", str(log))
+        self.click("Run the report")
+        self.wait_text(entries)
+
+    def saved(self, kind):
+        """The text of the report's download as CSV or JSON."""
+        file = self.driver.downloads / f"{Select(self.control('Log')).first_selected_option.text.split('/')[-1]}.{kind.lower()}"
+        file.unlink(missing_ok=True)
+        self.click(f"Download as {kind}")
+        until(file.exists, "the download")
+        return file.read_bytes().decode("utf-8")
+
+    def rows(self, caption):
+        """The texts of a table's rows."""
+        found = self.driver.find_elements(By.XPATH, f"//table[starts-with(caption, '{caption}')]/tbody/tr")
+        return [row.text for row in found]
+
+    def lose(self, agent):
+        """Ends the agent; its next start listens where this one did."""
+        agent.listen = f"127.0.0.1:{self.api.port}"
+        agent.stop()
+        self.wait_text("The connection to the agent is lost")
+
+    def expect_complaints(self):
+        """Forgets what the browser has complained of: lost connections, refused requests."""
+        self.driver.get_log("browser")
+
     # ------------------------------------------------------------------ looking
 
     def size(self, width, height=800):
@@ -190,6 +244,15 @@ def page(driver, agent):
     yield opened
     assert opened.console_errors() == []
     driver.get("about:blank")
+
+
+@pytest.fixture
+def fast_polls(driver):
+    """Views ask ten times as often."""
+    source = "const plain = setInterval; window.setInterval = (action, time) => plain(action, time / 10);"
+    made = driver.execute_cdp_cmd("Page.addScriptToEvaluateOnNewDocument", {"source": source})
+    yield
+    driver.execute_cdp_cmd("Page.removeScriptToEvaluateOnNewDocument", made)
 
 
 syslog_line = harness.syslog_line

@@ -4,11 +4,18 @@ import time
 
 from browser.conftest import syslog_line, until
 
+FIELDS = ';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description'
+REFUSED_FIELDS = ';N ;U ;A , "%q" , year'
 MARKUP = "<img src=x onerror=window.ran=true><script>window.ran=true</script><b>bold</b>"
 
 
 def failed_login(number, when=None):
     return syslog_line(f"Failed password for root from 203.0.113.{number} port 50122 ssh2", "sshd[2140]", when=when)
+
+
+def app_entry(text):
+    """A line that FIELDS fits."""
+    return f"2026-11-20 07:03:09 ERROR {text}\n"
 
 
 def other_entry(number):
@@ -30,13 +37,19 @@ def fill_history(agent, log, count):
     until(lambda: len(agent.events()) >= before + count, "the events")
 
 
-def logs_agent(agent):
+def prepare(agent):
+    """A syslog with a situation, a text log, and one whose format cannot be learned."""
     auth = agent.log("auth.log", content=history_of(40))
-    app = agent.log("app.log", fields=';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description')
-    agent.log("broken.log", fields=';N ;U ;A , "%q" , year')
+    app = agent.log("app.log", fields=FIELDS)
+    agent.log("broken.log", fields=REFUSED_FIELDS)
     agent.situation("ssh-failed", log=auth, when=["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"], severity="critical", text="A failed SSH login")
-    begin(agent, auth, app)
     return auth, app
+
+
+def logs_agent(agent):
+    logs = prepare(agent)
+    begin(agent, *logs)
+    return logs
 
 
 def begin(agent, *logs):

@@ -4,9 +4,9 @@ import pytest
 from browser.conftest import until
 from selenium.webdriver.common.keys import Keys
 
-from browser.support import fill_history, history_of
+from browser.support import REFUSED_FIELDS, fill_history, history_of
 
-VIEWS = ["logs", "events", "situations", "situations?new", "situations?name=ssh-failed", "reports", "try"]
+VIEWS = ["logs", "logs?log=/none", "events", "situations", "situations?new", "situations?name=ssh-failed", "reports", "try"]
 
 # Gives each element with text of its own whose colours are too near each other: WCAG AA.
 CONTRAST = """
@@ -70,7 +70,8 @@ return faults;
 @pytest.fixture
 def console(page, agent):
     auth = agent.log("auth.log", content=history_of(5))
-    agent.log("broken.log", fields=';N ;U ;A , "%q" , year')
+    agent.configure(f"{agent.directory}/missing.log", append=True)
+    agent.log("broken.log", fields=REFUSED_FIELDS)
     agent.situation("ssh-failed", log=auth, when=["ENTRYDESC contains 'Failed password'"], severity="critical")
     agent.start(wait=False)  # the broken log is never opened
     agent.wait_trace("Agent server is listening; signal sent.")
@@ -98,6 +99,36 @@ def test_structure_and_contrast_of_every_view(console):
         console.size(1280)
 
 
+def troubled(console):
+    """What is only seen when something is off, each as it comes."""
+    ready(console, "situations?new")
+    console.type("Name", "bad")
+    console.choose("Log", console.api.request("GET", "/api/v1/logs")[2]["logs"][0]["log"])
+    console.condition("port [", operator="matches pattern")
+    console.wait_text("Mend what is marked")
+    yield "a condition that is wrong"
+    ready(console, "events")
+    console.find("//*[@role='option']").click()
+    console.click("Why was it raised?")
+    console.wait_text("Would be raised")
+    yield "an event"
+    ready(console, "try")
+    console.type("Lines", "2026-11-20 07:03:09 ERROR payment: fits\nno entry at all")
+    console.wait_text("Stops at column 1")
+    yield "a line that does not fit"
+    console.run("sessionStorage.clear(); location.hash = '#/reports'")
+    console.heading("Who may look")
+    yield "no token"
+
+
+def test_contrast_of_what_is_off(console):
+    for state in troubled(console):
+        for scheme in ("light", "dark"):
+            console.scheme(scheme)
+            seen, poor = console.run(CONTRAST)
+            assert seen > 5 and poor == [], f"{state}, {scheme}"
+
+
 def test_the_keyboard_reaches_everything_in_order(console):
     ready(console, "reports")
     console.run("document.activeElement.blur()")
@@ -117,6 +148,57 @@ def test_the_keyboard_reaches_everything_in_order(console):
     assert console.run("return getComputedStyle(document.activeElement).outlineStyle") == "solid"
     console.driver.switch_to.active_element.send_keys(Keys.ENTER)
     console.wait_text("entries")
+
+
+def tab_to(console, name):
+    """Goes on with the Tab key to what has this name; where it stands must show."""
+    for _ in range(60):
+        console.driver.switch_to.active_element.send_keys(Keys.TAB)
+        found = console.run(
+            "const e = document.activeElement; return e === document.body ? null :"
+            " [e.getAttribute('aria-label') || e.labels?.[0]?.textContent || e.textContent, getComputedStyle(e).outlineStyle]"
+        )
+        if found and found[0].strip() == name:
+            assert found[1] == "solid", f"{name} does not show that it has the focus"
+            return console.driver.switch_to.active_element
+    raise AssertionError(f"the Tab key does not reach {name}")
+
+
+def test_a_situation_lives_by_the_keyboard_alone(console):
+    ready(console, "logs")
+    tab_to(console, "Situations").send_keys(Keys.ENTER)
+    console.heading("Situations")
+    tab_to(console, "New situation").send_keys(Keys.ENTER)
+    console.heading("New situation")
+    tab_to(console, "Name").send_keys("by-keyboard")
+    tab_to(console, "Log").send_keys(Keys.ARROW_DOWN)
+    tab_to(console, "Add a condition").send_keys(Keys.ENTER)
+    console.driver.switch_to.active_element.send_keys("password")
+    console.wait_text("Would have been raised")
+    tab_to(console, "Create situation").send_keys(Keys.ENTER)
+    console.heading("by-keyboard")
+    for verb, state in (("Stop", "Stopped"), ("Start", "Running")):
+        tab_to(console, f"{verb} by-keyboard").send_keys(Keys.ENTER)
+        until(lambda: console.find("//h1/following-sibling::span").text == state, state)
+    tab_to(console, "Delete by-keyboard").send_keys(Keys.ENTER)
+    until(lambda: console.all("dialog"), "the question")
+    tab_to(console, "Delete").send_keys(Keys.ENTER)
+    console.heading("Situations")
+    until(lambda: "by-keyboard" not in console.text(), "the deletion")
+
+
+def test_buttons_are_told_from_fields_on_a_narrow_screen(console):
+    console.size(360)
+    ready(console, "situations?new")
+    console.condition("one")
+    looks = console.run(
+        "return [...document.querySelectorAll('.condition > *')].filter((e) => e.matches('select, input, button'))"
+        ".map((e) => [e.tagName, getComputedStyle(e).backgroundColor, e.getBoundingClientRect().width, e.scrollWidth > e.clientWidth])"
+    )
+    fields = [look for look in looks if look[0] != "BUTTON"]
+    ((_, ground, width, is_cut),) = [look for look in looks if look[0] == "BUTTON"]
+    assert ground not in [look[1] for look in fields]
+    assert width < 100 and not is_cut
 
 
 def test_motion_is_not_needed(console):

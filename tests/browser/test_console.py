@@ -39,7 +39,7 @@ def test_without_a_token_the_page_asks_and_a_wrong_one_is_refused(page, agent):
     page.type("API token", page.token)
     page.click("Open the console")
     page.wait_text("auth.log")
-    page.driver.get_log("browser")  # the refusal stands there, as it should
+    page.expect_complaints()
 
 
 def test_the_first_view_is_small_and_runs_only_files_of_its_own(page, agent):
@@ -62,15 +62,46 @@ def test_a_lost_connection_shows_and_comes_back(page, agent):
     logs = logs_agent(agent)
     page.on(agent)
     page.wait_text("Connected")
-    port = page.api.port
-    agent.stop()
-    page.wait_text("The connection to the agent is lost", 15)
+    page.lose(agent)
     page.pictures("connection-lost")
-    agent.listen = f"127.0.0.1:{port}"
     begin(agent, *logs)
     page.wait_text("The connection to the agent is back", 40)
     until(lambda: "is lost" not in page.text(), "the banner to go")
-    page.driver.get_log("browser")
+    page.expect_complaints()
+
+
+def test_a_tab_opened_from_another_has_its_token(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent)
+    page.wait_text("auth.log")
+    first = page.driver.current_window_handle
+    page.driver.switch_to.new_window("tab")
+    try:
+        page.driver.get(f"{page.address}#/logs?log={auth}")
+        page.wait_text("Monitored since")
+    finally:
+        page.driver.close()
+        page.driver.switch_to.window(first)
+    page.wait_text("auth.log")
+
+
+def test_the_way_back_leads_to_what_was_seen(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    page.wait_text("auth.log")
+    page.go("Events")
+    page.choose("Severity", "critical")
+    until(lambda: "severity=critical" in page.driver.current_url, "the filter in the address")
+    page.go("Situations")
+    page.driver.back()
+    page.heading("Events")
+    until(lambda: page.control("Severity").get_attribute("value") == "critical", "the filter")
+    page.driver.refresh()
+    until(lambda: page.control("Severity").get_attribute("value") == "critical", "the filter")
+    page.driver.back()
+    page.heading("Logs")
+    page.driver.forward()
+    page.heading("Events")
 
 
 # ---------------------------------------------------------------------- logs
@@ -130,7 +161,7 @@ def test_events_come_live_pause_and_open(page, agent):
     page.on(agent, "events")
     page.wait_text("No events yet")
     page.pictures("events-empty")
-    until(lambda: "Live" in page.text(), "the stream")
+    page.wait_live()
     auth.append(failed_login(1))
     page.wait_text("Failed password for root from 203.0.113.1")
     page.click("Pause")
@@ -151,23 +182,22 @@ def test_events_come_live_pause_and_open(page, agent):
 def test_events_resume_where_they_were_after_a_lost_connection(page, agent):
     auth, app = logs_agent(agent)
     page.on(agent, "events")
-    until(lambda: "Live" in page.text(), "the stream")
+    page.wait_live()
     auth.append(failed_login(1))
     page.wait_text("203.0.113.1")
-    agent.listen = f"127.0.0.1:{page.api.port}"
-    agent.stop()
+    page.lose(agent)
     page.wait_text("Not live")
     begin(agent, auth, app)
     auth.append(failed_login(2))
     page.wait_text("203.0.113.2", 60)
     assert page.text().count("203.0.113.1 ") == 1
-    page.driver.get_log("browser")
+    page.expect_complaints()
 
 
 def test_markup_in_a_log_line_stays_text(page, agent):
     auth, _ = logs_agent(agent)
     page.on(agent, "events")
-    until(lambda: "Live" in page.text(), "the stream")
+    page.wait_live()
     auth.append(syslog_line(f"Failed password {MARKUP}", "sshd[1]"))
     page.wait_text(MARKUP)
     page.find("//*[@role='option']").click()
@@ -196,7 +226,7 @@ def test_ten_thousand_live_events_do_not_slow_the_page(page, agent):
     agent.sink = str(agent.directory / "events.jsonl")
     agent.start()
     page.on(agent, "events")
-    until(lambda: "Live" in page.text(), "the stream")
+    page.wait_live()
     page.run(
         "window.longest = 0; let last = performance.now();"
         "const beat = () => { const now = performance.now(); window.longest = Math.max(window.longest, now - last); last = now; setTimeout(beat, 20); }; beat();"
@@ -223,9 +253,7 @@ def test_a_situation_is_made_changed_stopped_started_and_deleted(page, agent):
     page.click("New situation")
     page.type("Name", "root-login")
     page.choose("Log", str(auth))
-    page.click("Add a condition")
-    value = page.find("//input[@aria-label='Value']")
-    value.send_keys("for root")
+    page.condition("for root")
     page.wait_text("Would have been raised 40 times in the last 24 hours")
     page.find("//textarea").send_keys(failed_login(7).strip())
     page.click("Explain")
@@ -256,11 +284,9 @@ def test_a_condition_is_judged_while_it_is_typed(page, agent):
     page.on(agent, "situations?new")
     page.type("Name", "bad")
     page.choose("Log", str(auth))
-    page.click("Add a condition")
-    page.find("//select[@aria-label='Operator']/option[starts-with(., 'matches')]").click()
-    page.find("//input[@aria-label='Value']").send_keys("port [")
+    value = page.condition("port [", operator="matches pattern")
     page.wait_text("Mend what is marked")
-    assert page.find("//input[@aria-label='Value']").get_attribute("aria-invalid") == "true"
+    assert value.get_attribute("aria-invalid") == "true"
     page.pictures("situation-problem")
 
 
@@ -270,24 +296,17 @@ def test_a_condition_is_judged_while_it_is_typed(page, agent):
 def test_a_report_is_run_sorted_and_saved(page, agent):
     auth, _ = logs_agent(agent)
     page.on(agent, "reports")
-    page.choose("Log", str(auth))
-    page.click("Run the report")
-    page.wait_text("40 entries")
+    page.run_report(auth, "40 entries")
     first = page.find("//tbody/tr[1]").text
     page.click("Time")
     until(lambda: page.find("//th[@aria-sort='ascending']"), "the order")
     assert page.find("//tbody/tr[1]").text != first
     page.pictures("report")
-    page.click("Download as CSV")
-    file = page.driver.downloads / "auth.log.csv"
-    until(file.exists, "the download")
-    lines = file.read_text(encoding="utf-8").splitlines()
+    lines = page.saved("CSV").splitlines()
     assert lines[0].startswith("ORIGINNODE,LOGPATH") and len(lines) == 41
-    page.click("Add a condition")
-    page.find("//input[@aria-label='Value']").send_keys("113.39 ")
-    page.click("Run the report")
-    page.wait_text("1 entry")
-    page.find("//input[@aria-label='Value']").send_keys("not there")
+    value = page.condition("113.39 ")
+    page.run_report(auth, "1 entry")
+    value.send_keys("not there")
     page.click("Run the report")
     page.wait_text("No entries")
 

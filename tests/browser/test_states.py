@@ -8,30 +8,10 @@ from urllib.parse import quote
 
 import pytest
 from browser.conftest import until
-from selenium.webdriver.support.ui import Select
 
-from browser.support import begin, failed_login, fill_history, logs_agent
+from browser.support import FIELDS, app_entry, begin, failed_login, logs_agent
 
 MOST_CLIENTS = 32
-FIELDS = ';N ;U ;A , "%d-%d-%d %d:%d:%d %s %256[^\\n]" , year month day hour minute second type description'
-
-
-def entry(text):
-    return f"2026-11-20 07:03:09 ERROR {text}\n"
-
-
-def open_log(page, log):
-    page.open(f"logs?log={quote(str(log))}")
-    page.heading(str(log))
-
-
-@pytest.fixture
-def fast_polls(driver):
-    """Views ask ten times as often."""
-    source = "const plain = setInterval; window.setInterval = (action, time) => plain(action, time / 10);"
-    made = driver.execute_cdp_cmd("Page.addScriptToEvaluateOnNewDocument", {"source": source})
-    yield
-    driver.execute_cdp_cmd("Page.removeScriptToEvaluateOnNewDocument", made)
 
 
 # ---------------------------------------------------------------------- history off
@@ -44,7 +24,7 @@ def test_without_a_history_the_views_say_so_and_what_to_do(page, agent):
     page.wait_text("The history is off, so events are not kept. [history] in the configuration switches it on.")
     assert "auth.log" in page.text()
     page.pictures("logs-history-off")
-    open_log(page, auth)
+    page.open_log(auth)
     page.wait_text("The history is off, so rates are not kept. [history] in the configuration switches it on.")
     page.wait_text("Monitored since")
     page.open("events")
@@ -72,7 +52,7 @@ def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent):
         page.wait_text("New events do not come by themselves: too many clients follow the events: at most 32.")
         page.wait_text("Not live; next try in")
         page.pictures("events-full")
-    until(lambda: page.find("//*[@class='state good']").text == "Live", "the stream", 30)
+    page.wait_live(30)
     assert "too many clients" not in page.text()
     auth.append(failed_login(1))
     page.wait_text("203.0.113.1")
@@ -98,20 +78,14 @@ def test_a_report_is_cancelled_and_run_again(page, agent):
         assert "Reading the log" not in page.text()
     finally:
         agent.send(SIGCONT)
-    page.click("Run the report")
-    page.wait_text("40 entries")
+    page.run_report(auth, "40 entries")
 
 
 def test_a_report_is_saved_as_json(page, agent):
     auth, _ = logs_agent(agent)
     page.on(agent, "reports")
-    page.choose("Log", str(auth))
-    page.click("Run the report")
-    page.wait_text("40 entries")
-    page.click("Download as JSON")
-    file = page.driver.downloads / "auth.log.json"
-    until(file.exists, "the download")
-    rows = json.loads(file.read_text(encoding="utf-8"))
+    page.run_report(auth, "40 entries")
+    rows = json.loads(page.saved("JSON"))
     assert len(rows) == 40
     assert rows[0]["LOGNAME"] == "auth.log" and "Failed password" in rows[0]["ENTRYDESC"]
 
@@ -122,18 +96,17 @@ def test_a_report_is_saved_as_json(page, agent):
 def test_the_last_lines_of_a_log_are_taken(page, agent):
     auth, app = logs_agent(agent)
     empty = agent.log("empty.log", content=b"")
-    app.append("".join(entry(f"number {number}") for number in range(15)))
+    app.append("".join(app_entry(f"number {number}") for number in range(15)))
     agent.refresh()
     agent.wait_open(empty)
     page.on(agent, "try")
     page.wait_text("100 % of the lines fit")
     page.type("Format", FIELDS.removeprefix(";N ;U ;"))
-    Select(page.find("//select[@aria-label='How many lines']")).select_by_visible_text("10")
-    log = Select(page.find("//select[@aria-label='Log']"))
-    log.select_by_visible_text(str(app))
+    page.pick("How many lines", "10")
+    page.pick("Log", str(app))
     page.click("Take them")
     page.wait_text("10 of 10 lines")
-    assert page.control("Lines").get_attribute("value").splitlines() == [entry(f"number {n}").strip() for n in range(5, 15)]
+    assert page.control("Lines").get_attribute("value").splitlines() == [app_entry(f"number {n}").strip() for n in range(5, 15)]
     until(lambda: page.find("//*[@aria-label='Configuration line']").text == f"{app} {FIELDS}", "the configuration line")
     page.pictures("try-taken")
     page.type("Format", 'A , "%q" , year')
@@ -141,13 +114,13 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     page.wait_text("The format cannot be used")
     page.type("Format", FIELDS.removeprefix(";N ;U ;"))
     page.wait_text("10 of 10 lines")
-    log.select_by_visible_text(str(empty))
+    page.pick("Log", str(empty))
     page.click("Take them")
     page.wait_text("This log holds no lines yet.")
     until(lambda: str(empty) in page.find("//*[@aria-label='Configuration line']").text, "the configuration line")
     assert "of the lines fit" not in page.text()
     app.path.unlink()
-    log.select_by_visible_text(str(app))
+    page.pick("Log", str(app))
     page.click("Take them")
     until(lambda: page.control("Lines").get_attribute("aria-invalid") == "true" and "no lines yet" not in page.text(), "the problem")
     page.pictures("try-no-file")
@@ -214,45 +187,41 @@ def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
 
 
 def test_a_log_shows_rejected_lines_and_skipped_ranges(page, agent):
-    app = agent.log("app.log", content=entry("before the start").encode() * 20, fields=FIELDS)
+    app = agent.log("app.log", content=app_entry("before the start").encode() * 20, fields=FIELDS)
     begin(agent, app)
     page.on(agent)
-    app.append(entry("fits") + "this does not fit\n" + "2026-11-20 07:03:09\n")
+    app.append(app_entry("fits") + "this does not fit\n" + "2026-11-20 07:03:09\n")
 
     def ledger():
         return page.api.request("GET", f"/api/v1/logs?log={quote(str(app))}")[2]["logs"][0]["ledger"]
 
     until(lambda: ledger()["format_errors"] == 2, "the rejected lines")
-    open_log(page, app)
+    page.open_log(app)
     page.wait_text("2 lines do not fit the format")
     assert "Open the log" not in page.text()
     page.wait_text("in 3 lines")
 
-    def table(name):
-        found = page.driver.find_elements("xpath", f"//table[caption[.='{name}']]/tbody/tr")
-        return [row.text for row in found]
-
-    rows = table("Rejected lines")
+    rows = page.rows("Rejected lines")
     assert len(rows) == 2 and "this does not fit" in rows[1]
     assert "A number for %d is expected here." in rows[1]
     assert "Skipped when the file" not in page.text()
-    app.path.write_bytes(entry("written at once").encode() * 3)  # shorter than it was
+    app.path.write_bytes(app_entry("written at once").encode() * 3)  # shorter than it was
     size = app.path.stat().st_size
     until(lambda: ledger()["truncations"] == 1, "the truncation")
     page.driver.refresh()
     page.wait_text("Skipped when the file was cut short")
-    assert [row.split()[-1] for row in table("Skipped ranges")] == [str(size)]
+    assert [row.split()[-1] for row in page.rows("Skipped ranges")] == [str(size)]
     page.pictures("log-ledger")
 
 
 def test_a_log_that_cannot_be_shown_says_why(page, agent):
     logs_agent(agent)
     page.on(agent)
-    open_log(page, agent.directory / "broken.log")
+    page.open_log(agent.directory / "broken.log")
     page.wait_text("The format of this log cannot be learned")
     assert page.find("//*[@class='state bad']").text == "Error"
     page.pictures("log-error")
-    open_log(page, agent.directory / "other.log")
+    page.open_log(agent.directory / "other.log")
     page.wait_text("This log is not monitored")
     assert "last 24 hours" not in page.text() and "Rejected" not in page.text()
     page.pictures("log-not-monitored")
@@ -261,11 +230,9 @@ def test_a_log_that_cannot_be_shown_says_why(page, agent):
 def test_a_log_keeps_its_state_over_a_lost_connection(page, agent, fast_polls):
     logs = logs_agent(agent)
     page.on(agent)
-    open_log(page, logs[0])
+    page.open_log(logs[0])
     page.wait_text("Monitored since")
-    agent.listen = f"127.0.0.1:{page.api.port}"
-    agent.stop()
-    page.wait_text("The connection to the agent is lost")
+    page.lose(agent)
     asked = "return performance.getEntriesByType('resource').filter((one) => one.name.includes('/logs?log=')).length"
     before = page.run(asked)
     until(lambda: page.run(asked) >= before + 2, "two more questions")
@@ -274,7 +241,7 @@ def test_a_log_keeps_its_state_over_a_lost_connection(page, agent, fast_polls):
     page.wait_text("The agent does not answer")
     begin(agent, *logs)
     page.wait_text("ssh-failed", 40)
-    page.driver.get_log("browser")
+    page.expect_complaints()
 
 
 # ---------------------------------------------------------------------- long paths
@@ -296,10 +263,10 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     log = agent.log(name, fields=FIELDS)
     agent.situation("declined", log=log, severity="major")
     agent.start()
-    log.append(entry("declined"))
+    log.append(app_entry("declined"))
     until(agent.events, "the event")
     page.on(agent)
-    views = {"logs": "Monitored", "situations": "declined", "situations?name=declined": "Its events", "reports": "Run the report", "try": "of the lines fit"}
+    views = {"logs": "Raised lately", "situations": "declined", "situations?name=declined": "Its events", "reports": "Run the report", "try": "of the lines fit"}
     views[f"logs?log={quote(str(log))}"] = "Monitored since"
     for width in (360, 1280):
         page.size(width)
@@ -311,7 +278,7 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     page.open("logs")
     page.wait_text("transactions_and_settlements.log")
     page.pictures("logs-long-path")
-    open_log(page, log)
+    page.open_log(log)
     page.wait_text("Monitored since")
     page.pictures("log-long-path")
     page.open("events")
@@ -319,3 +286,73 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     page.wait_text("ORIGINNODE")
     page.size(360)
     assert page.run(BEYOND) == []
+
+
+# ---------------------------------------------------------------------- configured, and not monitored
+
+
+def test_a_log_that_is_not_monitored_says_why_until_it_is(page, agent, fast_polls):
+    auth, _ = logs_agent(agent)
+    missing = agent.directory / "missing.log"
+    agent.configure(f"{missing} ;N ;S", "relative.log", append=True)
+    page.on(agent)
+    page.wait_text("3 in trouble")
+    row = page.find(f"//tbody/tr[contains(., '{missing}')]").text
+    assert "Not read" in row and "No such file or directory. Make the file, or mend the path." in row
+    assert "Mend line 5 of the log configuration." in page.find("//tbody/tr[contains(., 'relative.log')]").text
+    assert str(agent.logs_conf) in page.text()
+    page.pictures("logs-not-monitored")
+    page.open_log(missing)
+    page.wait_text("It stands in line 4 of the log configuration.")
+    assert "last 24 hours" not in page.text()
+    page.pictures("log-not-read")
+    page.go("Logs")
+    missing.write_text("")
+    page.wait_text("The agent has not read this line yet.")
+    page.click("Re-read configuration")
+    page.wait_text("Where that file has not changed, nothing changes.")
+    agent.configure(append=True)  # touched
+    page.click("Re-read configuration")
+    page.wait_text("2 in trouble")
+    assert "Running" in page.find(f"//tbody/tr[contains(., '{missing}')]").text
+    agent.logs_conf.unlink()
+    page.wait_text(f"The log configuration {agent.logs_conf} cannot be read: No such file or directory.")
+    page.pictures("logs-no-configuration")
+
+
+# ---------------------------------------------------------------------- another agent behind the same address
+
+
+def test_events_begin_anew_with_a_new_history(page, agent):
+    auth, app = logs_agent(agent)
+    page.on(agent, "events")
+    page.wait_live()
+    for number in (1, 2):
+        auth.append(failed_login(number))
+    page.wait_text("203.0.113.2")
+    page.lose(agent)
+    for file in (agent.directory / "state").glob("history.db*"):
+        file.unlink()
+    begin(agent, auth, app)
+    auth.append(failed_login(3))
+    page.wait_text("203.0.113.3", 40)
+    until(lambda: "203.0.113.2" not in page.text(), "the events of before to go")
+    assert len(page.all("[role=option]")) == 1
+    page.expect_complaints()
+
+
+def test_a_new_token_is_asked_for_and_the_view_goes_on(page, agent):
+    logs = logs_agent(agent)
+    page.on(agent, "situations?name=ssh-failed")
+    page.wait_text("Its events")
+    page.lose(agent)
+    token = agent.directory / "state/api-token"
+    token.unlink()
+    begin(agent, *logs)
+    page.wait_text("The agent refused this token", 40)
+    assert page.run("return document.activeElement.type") == "password"
+    page.type("API token", token.read_text().strip())
+    page.click("Open the console")
+    page.heading("ssh-failed")
+    page.wait_text("Its events")
+    page.expect_complaints()

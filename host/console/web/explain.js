@@ -13,9 +13,8 @@ export function explanation(one, { withColumns = true } = {}) {
   return h("div", { className: "stack" },
     h("p", { className: `verdict ${one.raised || one.matches ? "holds" : "fails"}` }, verdict),
     h("p", {}, one.decision),
-    one.conditions.length > 0 && table("Conditions", [{ label: "Holds", className: "fit" }, { label: "Condition", className: "wide" }, { label: "The entry has", className: "wide" }],
-      one.conditions.map((condition) => [h("span", { className: condition.holds ? "holds" : "fails" }, condition.holds ? "yes" : "no"), h("code", {}, condition.condition), h("code", {}, String(condition.value))]), { className: "cards" }),
-    one.window && h("p", { className: "quiet" }, `In the last ${one.window.period} s: ${one.window.count}, wanted ${one.window.frequency}.`),
+    one.conditions.length > 0 && table("Conditions", [{ label: "Holds", className: "fit lead" }, { label: "Condition", className: "wide" }, { label: "The entry has", className: "wide" }],
+      one.conditions.map((condition) => [h("span", { className: condition.holds ? "holds" : "fails" }, condition.holds ? "holds" : "fails"), h("code", {}, condition.condition), h("code", {}, String(condition.value))]), { className: "cards" }),
     withColumns && h("details", {}, h("summary", {}, "Columns of the entry"), rowList(one.row)));
 }
 

@@ -76,3 +76,12 @@ export function rateText(value) {
 }
 
 export const SEVERITIES = ["critical", "major", "minor", "warning", "info"];
+
+/** How a frequency compares, in words. */
+export const COMPARISONS = [[">=", "at least"], ["<=", "at most"], ["=", "exactly"], [">", "more than"], ["<", "fewer than"]];
+
+export function frequencyText(frequency, period) {
+  const [, operator, count] = /^\s*(\S+)\s+(\d+)/.exec(frequency) || [];
+  const words = new Map(COMPARISONS).get(operator);
+  return words ? `${words} ${plural(Number(count), "match", "matches")} within ${period}` : `${frequency} within ${period}`;
+}

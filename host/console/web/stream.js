@@ -5,6 +5,19 @@ import { open, withQuery } from "./api.js";
 const FIRST_PAUSE = 500;
 const LONGEST_PAUSE = 15000;
 
+/** Waits, but no longer than until the page has found the agent again. */
+function pauseFor(milliseconds) {
+  return new Promise((resolve) => {
+    const timer = setTimeout(end, milliseconds);
+    function end() {
+      clearTimeout(timer);
+      removeEventListener("zrm-regained", end);
+      resolve();
+    }
+    addEventListener("zrm-regained", end);
+  });
+}
+
 /** Follows events from the one after `after` until stopped, over lost connections too. */
 export class EventStream {
   #abort = new AbortController();
@@ -51,7 +64,7 @@ export class EventStream {
       }
       if (this.#abort.signal.aborted) return;
       this.#handlers.state("waiting", { seconds: Math.round(pause / 1000), error: refusal });
-      await new Promise((resolve) => setTimeout(resolve, pause));
+      await pauseFor(pause);
       pause = Math.min(pause * 2, LONGEST_PAUSE);
     }
   }

@@ -3,7 +3,7 @@
 import { get, post, request, situationPath } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { debounce, field, fill, h, select } from "../dom.js";
-import { SEVERITIES } from "../format.js";
+import { COMPARISONS, SEVERITIES } from "../format.js";
 import { explainPanel, previewPanel } from "../situation-tools.js";
 
 const BLANK = { name: "", text: "", severity: "warning", log: null, when: [], frequency: null, period: null };
@@ -46,7 +46,7 @@ class Form {
     const [, operator, count] = /^\s*(\S+)\s+(\d+)/.exec(situation.frequency || "") || [null, ">=", "5"];
     const [, length, unit] = /^(\d+)\s*([smhd])/.exec(situation.period || "") || [null, "60", "s"];
     const isOn = h("input", { type: "checkbox", checked: Boolean(situation.frequency), onchange: () => { draw(); changed(); } });
-    const compare = select([[">=", "at least"], ["<=", "at most"], ["=", "exactly"], [">", "more than"], ["<", "fewer than"]], operator, { "aria-label": "How often", onchange: changed });
+    const compare = select(COMPARISONS, operator, { "aria-label": "How often", onchange: changed });
     const times = h("input", { type: "number", min: 0, value: count, "aria-label": "Times", oninput: changed });
     const period = h("input", { type: "number", min: 1, value: length, "aria-label": "Period", oninput: changed });
     const units = select(UNITS, unit, { "aria-label": "Unit of the period", onchange: changed });

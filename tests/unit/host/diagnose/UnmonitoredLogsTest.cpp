@@ -59,6 +59,13 @@ TEST_F(UnmonitoredLogsTest, ALogIsNamedOnce) {
     EXPECT_THAT(UnmonitoredLogs::find(m_there + "\n" + m_there + " ;Y\n", {m_there}), IsEmpty());
 }
 
+TEST_F(UnmonitoredLogsTest, ANameIsAlwaysUtf8) {
+    const std::vector<UnmonitoredLogs::Log> logs =
+        UnmonitoredLogs::find("/none/\xC3\xA4\xE4\n", {});
+    ASSERT_THAT(logs, SizeIs(1));
+    EXPECT_EQ(logs[0].log, "/none/\xC3\xA4\xEF\xBF\xBD");
+}
+
 TEST_F(UnmonitoredLogsTest, AConfigurationThatCannotBeReadSaysSo) {
     const std::string configuration = m_directory.file("logs.conf");
     ASSERT_EQ(setenv("ZRM_CONFIG_FILE", configuration.c_str(), 1), 0);
