@@ -13,6 +13,7 @@ struct EventRecord {
     std::string_view severity;  ///< info, minor, warning, major or critical
     std::string_view log;       ///< the monitored log's whole path
     std::string_view json;      ///< the event as one JSON object, on one line, without a newline
+    std::string_view text = {}; ///< the situation's description for people; may be empty
 };
 
 #endif

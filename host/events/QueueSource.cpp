@@ -19,8 +19,9 @@ std::span<const EventRecord> QueueSource::read(std::size_t most) {
         m_format.append(text, event);
         log.clear();
         m_format.appendLog(log, event);
-        m_records.push_back(
-            {event.id, event.raised, event.situation->name, event.situation->severity, log, text});
+        const SituationLabel& situation = *event.situation;
+        m_records.push_back({event.id, event.raised, situation.name, situation.severity, log, text,
+                             situation.text});
     }
     return m_records;
 }

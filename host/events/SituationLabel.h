@@ -7,7 +7,8 @@
 /// are still on their way.
 struct SituationLabel {
     std::string name;
-    std::string severity; ///< info, minor, warning, major or critical
+    std::string severity;  ///< info, minor, warning, major or critical
+    std::string text = {}; ///< its description for people; may be empty
 };
 
 #endif

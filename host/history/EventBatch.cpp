@@ -13,6 +13,7 @@ void EventBatch::add(const Event& event, const EventJson& format) {
     Places places;
     places.situation = sameOr(event.situation->name, &Places::situation);
     places.severity = sameOr(event.situation->severity, &Places::severity);
+    places.text = sameOr(event.situation->text, &Places::text);
     const std::size_t log = m_text.size();
     format.appendLog(m_text, event);
     places.log = pieceFrom(log);
@@ -24,19 +25,20 @@ void EventBatch::add(const Event& event, const EventJson& format) {
     format.append(m_text, event);
     places.json = pieceFrom(json);
     m_places.push_back(places);
-    m_records.push_back({event.id, event.raised, {}, {}, {}, {}});
+    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}});
 }
 
 void EventBatch::add(const EventRecord& event) {
     Places places;
     places.situation = sameOr(event.situation, &Places::situation);
     places.severity = sameOr(event.severity, &Places::severity);
+    places.text = sameOr(event.text, &Places::text);
     places.log = sameOr(event.log, &Places::log);
     const std::size_t json = m_text.size();
     m_text += event.json;
     places.json = pieceFrom(json);
     m_places.push_back(places);
-    m_records.push_back({event.id, event.raised, {}, {}, {}, {}});
+    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}});
 }
 
 void EventBatch::seal() {
@@ -45,6 +47,7 @@ void EventBatch::seal() {
         EventRecord& record = m_records[index];
         record.situation = at(places.situation);
         record.severity = at(places.severity);
+        record.text = at(places.text);
         record.log = at(places.log);
         record.json = at(places.json);
     }

@@ -55,6 +55,7 @@ private:
     struct Places {
         Piece situation;
         Piece severity;
+        Piece text;
         Piece log;
         Piece json;
     };

@@ -106,13 +106,15 @@ bool HistorySource::load() {
 std::shared_ptr<const EventBatch> HistorySource::readFile() {
     auto batch = std::make_shared<EventBatch>();
     ReaderPool::Lease lease = m_readers.take();
-    Statement events(*lease, "SELECT events.id, raised, situation, severity, path, json FROM events"
-                             " JOIN labels ON labels.id = label JOIN logs ON logs.id = log"
-                             " WHERE events.id > ? ORDER BY events.id LIMIT ?");
+    Statement events(*lease,
+                     "SELECT events.id, raised, situation, severity, path, json, text FROM events"
+                     " JOIN labels ON labels.id = label JOIN logs ON logs.id = log"
+                     " WHERE events.id > ? ORDER BY events.id LIMIT ?");
     events.bind(1, m_cursor.load()).bind(2, readAtOnce);
     while (events.step()) {
         batch->add(EventRecord{static_cast<std::uint64_t>(events.integer(0)), events.integer(1),
-                               events.text(2), events.text(3), events.text(4), events.text(5)});
+                               events.text(2), events.text(3), events.text(4), events.text(5),
+                               events.text(6)});
     }
     batch->seal();
     return batch;

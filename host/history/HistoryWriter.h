@@ -82,7 +82,7 @@ private:
     RetentionClock m_clock;
     Clock::time_point m_nextHousekeeping{};
     Clock::time_point m_nextTending{}; ///< of the cursors
-    bool m_hasMoreToDo = false; ///< housekeeping that was not finished
+    bool m_hasMoreToDo = false;        ///< housekeeping that was not finished
     std::chrono::milliseconds m_pause;
     std::atomic<std::uint64_t> m_oldest{0};
 

@@ -1,15 +1,24 @@
 #include "host/history/LabelTable.h"
 
+#include <array>
+
 #include <sqlite3.h>
 
 namespace {
 
+/// What makes a label.
+std::array<std::string_view, 4> partsOf(const EventRecord& event) {
+    return {event.situation, event.severity, event.text, event.log};
+}
+
 bool isKeyOf(std::string_view key, const EventRecord& event) {
-    const std::size_t situation = event.situation.size();
-    const std::size_t severity = situation + 1 + event.severity.size();
-    return key.size() == severity + 1 + event.log.size() && key.starts_with(event.situation) &&
-           key.ends_with(event.log) && key[situation] == '\0' && key[severity] == '\0' &&
-           key.substr(situation + 1, event.severity.size()) == event.severity;
+    for (const std::string_view part : partsOf(event)) {
+        if (!key.starts_with(part) || key.size() == part.size() || key[part.size()] != '\0') {
+            return false;
+        }
+        key.remove_prefix(part.size() + 1);
+    }
+    return key.empty();
 }
 
 std::int64_t made(Database& database) {
@@ -21,9 +30,10 @@ std::int64_t made(Database& database) {
 LabelTable::LabelTable(Database& database)
     : m_database(database), m_findLog(database, "SELECT id FROM logs WHERE path = ?"),
       m_makeLog(database, "INSERT INTO logs (path) VALUES (?)"),
-      m_findLabel(database,
-                  "SELECT id FROM labels WHERE situation = ? AND severity = ? AND log = ?"),
-      m_makeLabel(database, "INSERT INTO labels (situation, severity, log) VALUES (?, ?, ?)") {}
+      m_findLabel(database, "SELECT id FROM labels WHERE situation = ? AND severity = ? AND log = ?"
+                            " AND text = ?"),
+      m_makeLabel(database, "INSERT INTO labels (situation, severity, log, text)"
+                            " VALUES (?, ?, ?, ?)") {}
 
 std::int64_t LabelTable::log(std::string_view path) {
     if (const auto known = m_logs.find(path); known != m_logs.end()) {
@@ -44,11 +54,14 @@ std::int64_t LabelTable::log(std::string_view path) {
 LabelTable::Label LabelTable::findOrMake(const EventRecord& event) {
     Label label;
     label.log = log(event.log);
-    m_findLabel.bind(1, event.situation).bind(2, event.severity).bind(3, label.log);
+    for (Statement* const statement : {&m_findLabel, &m_makeLabel}) {
+        statement->bind(1, event.situation).bind(2, event.severity);
+        statement->bind(3, label.log).bind(4, event.text);
+    }
     if (m_findLabel.step()) {
         label.id = m_findLabel.integer(0);
     } else {
-        m_makeLabel.bind(1, event.situation).bind(2, event.severity).bind(3, label.log).run();
+        m_makeLabel.run();
         label.id = made(m_database);
     }
     m_findLabel.reset();
@@ -60,8 +73,10 @@ LabelTable::Label LabelTable::of(const EventRecord& event) {
         return m_last;
     }
     m_last = {};
-    m_key.assign(event.situation).append(1, '\0').append(event.severity).append(1, '\0');
-    m_key.append(event.log);
+    m_key.clear();
+    for (const std::string_view part : partsOf(event)) {
+        m_key.append(part).append(1, '\0');
+    }
     const auto known = m_labels.find(m_key);
     m_last = known != m_labels.end() ? known->second
                                      : m_labels.emplace(m_key, findOrMake(event)).first->second;

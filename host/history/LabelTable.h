@@ -9,8 +9,8 @@
 #include <string>
 #include <string_view>
 
-/// Numbers for what many events have in common: a situation's name and severity, and a log. Used
-/// by the writer's thread. Throws DatabaseError.
+/// Numbers for what many events have in common: a situation's name, severity and text, and a log.
+/// Used by the writer's thread. Throws DatabaseError.
 class LabelTable {
 public:
     struct Label {
@@ -41,7 +41,7 @@ private:
     Statement m_findLabel;
     Statement m_makeLabel;
     std::map<std::string, std::int64_t, std::less<>> m_logs;
-    std::map<std::string, Label, std::less<>> m_labels; ///< by the three texts, zero bytes between
+    std::map<std::string, Label, std::less<>> m_labels; ///< by the four texts, zero bytes between
     std::string m_key;                                  ///< of the last event
     Label m_last;
 };

@@ -8,7 +8,7 @@ namespace {
 
 /// Each entry makes, of the version before it, the version that is its place in the table.
 /// Published entries never change; a new version is a new entry.
-constexpr std::array<const char*, 2> steps = {
+constexpr std::array<const char*, 3> steps = {
     // 1: events. Labels intern what is written on many events; one narrow index serves every
     // filter on them, and the marks narrow a window of time down, so that storing an event costs
     // one row and one index entry.
@@ -31,6 +31,13 @@ constexpr std::array<const char*, 2> steps = {
     "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
     " entries INTEGER NOT NULL, events INTEGER NOT NULL, PRIMARY KEY (minute, log))"
     " WITHOUT ROWID;",
+    // 3: a label has the situation's text, too.
+    "CREATE TABLE labels_with_text (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
+    " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs, text TEXT NOT NULL,"
+    " UNIQUE (situation, severity, log, text));"
+    "INSERT INTO labels_with_text SELECT id, situation, severity, log, '' FROM labels;"
+    "DROP TABLE labels;"
+    "ALTER TABLE labels_with_text RENAME TO labels;",
 };
 
 } // namespace

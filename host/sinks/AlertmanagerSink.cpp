@@ -1,19 +1,20 @@
 #include "host/sinks/AlertmanagerSink.h"
 
-#include "agent/TraceScope.h"
 #include "host/framework/UtcTime.h"
 #include "host/sinks/EventRow.h"
+
+#include <string_view>
+#include <utility>
 
 #include <nlohmann/json.hpp>
 
 namespace {
 
-TRC1_Anchor anchor{"AlertmanagerSink.cpp"};
-
 using Json = nlohmann::ordered_json;
 
 Json annotationsOf(const EventRecord& event, const EventRow& row) {
-    return {{"summary", std::string(event.situation) + " in " + std::string(event.log)},
+    const std::string_view what = event.text.empty() ? event.situation : event.text;
+    return {{"summary", std::string(what) + " in " + std::string(event.log)},
             {"description", row.description()},
             {"source", row.source()},
             {"event", std::to_string(event.id)}};
@@ -22,9 +23,8 @@ Json annotationsOf(const EventRecord& event, const EventRow& row) {
 } // namespace
 
 AlertmanagerSink::AlertmanagerSink(const SinkConfig& config)
-    : m_name(config.name), m_resolveAfter(config.duration("resolve_after")),
-      m_labels(config.texts("labels")), m_generatorUrl(config.text("generator_url")),
-      m_http(config, "/api/v2/alerts") {}
+    : JsonPostSink(config, "/api/v2/alerts"), m_resolveAfter(config.duration("resolve_after")),
+      m_labels(config.texts("labels")), m_generatorUrl(config.text("generator_url")) {}
 
 std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const {
     Json alerts = Json::array();
@@ -45,10 +45,4 @@ std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const 
         alerts.push_back(std::move(alert));
     }
     return alerts.dump(-1, ' ', false, Json::error_handler_t::replace);
-}
-
-std::size_t AlertmanagerSink::deliver(std::span<const EventRecord> events,
-                                      const std::stop_token& giveUp) {
-    TraceScope trace(anchor);
-    return trace.result(m_http.send(bodyOf(events), {}, giveUp) ? events.size() : 0);
 }

@@ -81,8 +81,8 @@ std::string remarkOf(const Json& value) {
 } // namespace
 
 OtlpSink::OtlpSink(const SinkConfig& config)
-    : m_name(config.name), m_serviceName(config.text("service_name")),
-      m_attributes(config.texts("attributes")), m_http(config, "/v1/logs") {}
+    : JsonPostSink(config, "/v1/logs"), m_serviceName(config.text("service_name")),
+      m_attributes(config.texts("attributes")) {}
 
 std::string OtlpSink::bodyOf(std::span<const EventRecord> events) const {
     Json resource = Json::array({attribute("service.name", m_serviceName)});
@@ -105,9 +105,9 @@ std::string OtlpSink::bodyOf(std::span<const EventRecord> events) const {
     return body.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
-void OtlpSink::tellOfRejected(std::size_t sent) const {
+void OtlpSink::taken(std::size_t events, const std::string& text) const {
     TraceScope trace(anchor);
-    const Json answer = Json::parse(m_http.answer(), nullptr, false);
+    const Json answer = Json::parse(text, nullptr, false);
     const auto partial = answer.is_object() ? answer.find("partialSuccess") : answer.end();
     if (partial == answer.end() || !partial->is_object()) {
         return;
@@ -117,18 +117,9 @@ void OtlpSink::tellOfRejected(std::size_t sent) const {
     const std::uint64_t count = rejected == partial->end() ? 0 : countOf(*rejected);
     const std::string why = message == partial->end() ? std::string() : remarkOf(*message);
     if (count != 0) {
-        trace.error()("%s has rejected %" PRIu64 " of %zu events for good: %s", m_name.c_str(),
-                      count, sent, why.c_str());
+        trace.error()("%s has rejected %" PRIu64 " of %zu events for good: %s", name().c_str(),
+                      count, events, why.c_str());
     } else if (!why.empty()) {
-        trace.detail()("%s says: %s", m_name.c_str(), why.c_str());
+        trace.detail()("%s says: %s", name().c_str(), why.c_str());
     }
-}
-
-std::size_t OtlpSink::deliver(std::span<const EventRecord> events, const std::stop_token& giveUp) {
-    TraceScope trace(anchor);
-    if (!m_http.send(bodyOf(events), {}, giveUp)) {
-        return trace.result(std::size_t{0});
-    }
-    tellOfRejected(events.size());
-    return trace.result(events.size());
 }

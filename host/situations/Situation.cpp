@@ -29,8 +29,8 @@ std::int64_t now() {
 
 Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
                      std::shared_ptr<SituationCounts> counts)
-    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(
-                                       SituationLabel{m_config.name, m_config.severity})),
+    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(SituationLabel{
+                                       m_config.name, m_config.severity, m_config.text})),
       m_queue(queue), m_counts(std::move(counts)),
       m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
     TraceScope trace(anchor);

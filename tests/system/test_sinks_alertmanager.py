@@ -70,7 +70,7 @@ def wait_for_alerts(server, agent, condition):
 
 def test_an_event_is_an_alert_until_its_time_is_over(agent, alertmanager):
     log = agent.log()
-    agent.situation("disk-full", log=log, severity="critical")
+    agent.situation("disk-full", log=log, severity="critical", text="A disk has no room left")
     agent.more_sinks.append(
         {
             "type": "alertmanager",
@@ -93,7 +93,7 @@ def test_an_event_is_an_alert_until_its_time_is_over(agent, alertmanager):
         "team": "ops",
     }
     assert alert["annotations"] == {
-        "summary": f"disk-full in {log}",
+        "summary": f"A disk has no room left in {log}",
         "description": 'no space on "/var" \u00e4',
         "source": "kernel",
         "event": str(event["id"]),

@@ -26,6 +26,7 @@ TEST(EventBatch, RendersEventsOfTheQueue) {
     EXPECT_EQ(second.raised, testTime);
     EXPECT_EQ(second.situation, "watch");
     EXPECT_EQ(second.severity, "minor");
+    EXPECT_EQ(second.text, "");
     EXPECT_EQ(second.log, "/var/log/app.log");
     EXPECT_EQ(std::string(second.json) + "\n", TestEvents::line(2, "second"));
 }
@@ -36,7 +37,8 @@ TEST(EventBatch, KeepsCopiesOfEvents) {
         const std::string situation = "gone soon";
         for (std::uint64_t id = 7; id < 500; ++id) { // the memory moves while it grows
             const std::string json = "{" + std::to_string(id) + "}";
-            batch.add(EventRecord{id, 1, situation, id % 2 == 0 ? "info" : "major", "/log", json});
+            batch.add(EventRecord{id, 1, situation, id % 2 == 0 ? "info" : "major", "/log", json,
+                                  id % 3 == 0 ? "third" : ""});
         }
     }
     batch.seal();
@@ -45,6 +47,7 @@ TEST(EventBatch, KeepsCopiesOfEvents) {
         EXPECT_EQ(event.situation, "gone soon");
         EXPECT_EQ(event.severity, event.id % 2 == 0 ? "info" : "major");
         EXPECT_EQ(event.log, "/log");
+        EXPECT_EQ(event.text, event.id % 3 == 0 ? "third" : "");
         EXPECT_EQ(event.json, "{" + std::to_string(event.id) + "}");
     }
 }

@@ -85,6 +85,23 @@ TEST_F(HistoryFileTest, WritesWhatEventsHaveInCommonOnce) {
               52);
 }
 
+TEST_F(HistoryFileTest, EventsKeepTheTextThatTheirSituationHad) {
+    std::vector<EventRecord> events = {testEvent(1), testEvent(2), testEvent(3)};
+    events[1].text = "as it was changed";
+    file->store(*batchOf(events), {});
+    reopen();
+    events = {testEvent(4)};
+    events[0].text = "as it was changed";
+    file->store(*batchOf(events), {});
+    EXPECT_EQ(number("SELECT count(*) FROM labels"), 2);
+    EXPECT_EQ(number("SELECT sum(events.id) FROM events JOIN labels ON labels.id = label"
+                     " WHERE text = 'as it was changed'"),
+              6);
+    EXPECT_EQ(number("SELECT sum(events.id) FROM events JOIN labels ON labels.id = label"
+                     " WHERE text = ''"),
+              4);
+}
+
 TEST_F(HistoryFileTest, ABatchIsStoredAsAWholeOrNotAtAll) {
     file->store(*batchOf(1, 2), {{"sink", 1}});
     disk.failWrites(SQLITE_FULL);

@@ -76,6 +76,18 @@ TEST_F(HistorySourceTest, GivesWhatIsInMemoryWithoutReadingTheFile) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
+TEST_F(HistorySourceTest, GivesTheTextOfTheSituationFromTheFileToo) {
+    std::vector<EventRecord> events = {testEvent(1), testEvent(2)};
+    events[1].text = "The door was opened";
+    file.store(*batchOf(events), {});
+    RecentEvents later(plenty, 2);
+    HistorySource late("late", later, readers, cursor);
+    const auto given = late.read(10);
+    ASSERT_EQ(given.size(), 2u);
+    EXPECT_EQ(given[0].text, "");
+    EXPECT_EQ(given[1].text, "The door was opened");
+}
+
 TEST_F(HistorySourceTest, CatchesUpFromTheFileAndGoesOnInMemory) {
     file.store(*batchOf(1, 1000), {});
     RecentEvents later(plenty, 1000);

@@ -1,6 +1,7 @@
 #include "host/history/History.h"
 
 #include "TestBatch.h"
+#include "host/history/Schema.h"
 #include "support/FaultyDisk.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
@@ -369,8 +370,9 @@ TEST_F(HistoryTest, AFileOfALaterVersionIsLeftAlone) {
     Database(file(), Database::Use::WRITE).run("PRAGMA user_version = 1000");
     open();
     EXPECT_EQ(problem, "cannot open " + file() +
-                           ": it has version 1000, and this program knows versions up to 2; use "
-                           "the program that wrote it, or move the file out of the way");
+                           ": it has version 1000, and this program knows versions up to " +
+                           std::to_string(Schema::version) +
+                           "; use the program that wrote it, or move the file out of the way");
     EXPECT_THAT(corruptFiles(), IsEmpty());
 }
 

@@ -68,6 +68,35 @@ TEST_F(SchemaTest, BringsAFileOfTheFirstVersionUpToDate) {
     EXPECT_EQ(database.number("SELECT event FROM cursors"), 40);
 }
 
+TEST_F(SchemaTest, BringsAFileOfTheSecondVersionUpToDate) {
+    database.run(firstVersion);
+    database.run(
+        "CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
+        "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
+        " entries INTEGER NOT NULL, events INTEGER NOT NULL, PRIMARY KEY (minute, log))"
+        " WITHOUT ROWID;"
+        "INSERT INTO rates VALUES (29919303, 1, 5, 1);"
+        "PRAGMA user_version = 2");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    Statement event(database, "SELECT situation, severity, path, text FROM events"
+                              " JOIN labels ON labels.id = label JOIN logs ON logs.id = log");
+    ASSERT_TRUE(event.step());
+    EXPECT_EQ(event.text(0), "watch");
+    EXPECT_EQ(event.text(1), "minor");
+    EXPECT_EQ(event.text(2), "/var/log/app.log");
+    EXPECT_EQ(event.text(3), "");
+    EXPECT_FALSE(event.isNull(3));
+    EXPECT_FALSE(event.step());
+    EXPECT_EQ(database.number("SELECT entries FROM rates"), 5);
+    database.run("PRAGMA foreign_keys = ON");
+    EXPECT_EQ(database.number("SELECT count(*) FROM pragma_foreign_key_check"), 0);
+    database.run("INSERT INTO events VALUES (42, 1795158189412, 1, '{}')");
+    EXPECT_THROW(database.run("INSERT INTO events VALUES (43, 1795158189412, 2, '{}')"),
+                 DatabaseError)
+        << "events still refer to labels";
+}
+
 TEST_F(SchemaTest, AStepThatFailsLeavesTheOlderVersionWhole) {
     database.run(firstVersion);
     disk.failWrites(SQLITE_FULL);

@@ -32,7 +32,10 @@ protected:
 
 TEST_F(AlertmanagerSinkTest, RaisesAnAlertForEachEvent) {
     events.add({});
-    events.add({.description = "caf\xc3\xa9", .situation = "watch", .severity = "info"});
+    events.add({.description = "caf\xc3\xa9",
+                .situation = "watch",
+                .severity = "info",
+                .text = "The door was opened"});
     AlertmanagerSink sink(config());
     EXPECT_EQ(deliver(sink), 2u);
     EXPECT_EQ(server.requests()[0].line, "POST /prefix/api/v2/alerts HTTP/1.1");
@@ -45,7 +48,7 @@ TEST_F(AlertmanagerSinkTest, RaisesAnAlertForEachEvent) {
          "startsAt": "2026-11-20T07:03:09.412Z", "endsAt": "2026-11-20T07:08:09.412Z"},
         {"labels": {"alertname": "watch", "severity": "info",
                     "log": "/var/log/auth.log", "node": "web1"},
-         "annotations": {"summary": "watch in /var/log/auth.log",
+         "annotations": {"summary": "The door was opened in /var/log/auth.log",
                          "description": "caf\u00e9", "source": "sshd", "event": "2"},
          "startsAt": "2026-11-20T07:03:10.412Z", "endsAt": "2026-11-20T07:08:10.412Z"}])"));
 }

@@ -31,6 +31,7 @@ public:
         std::string situation = "ssh-bruteforce";
         std::string severity = "critical";
         std::string log = "/var/log/auth.log";
+        std::string text = {}; ///< of the situation
     };
     static constexpr std::int64_t kRaised = 1'795'158'189'412; ///< of the first event
 
@@ -45,7 +46,8 @@ public:
             R"(","severity":")" + kept.severity + R"(","raised":")" + UtcTime::text(raised) +
             R"(","row":{"ORIGINNODE":"web1:ZRM","ENTRYSRC":"sshd","ENTRYDESC":"short",)" +
             R"("SAMPLENO":3,"UENTRYSRC":"","UENTRYDESC":")" + kept.description + R"("}})");
-        m_records.push_back({id, raised, kept.situation, kept.severity, kept.log, m_texts.back()});
+        m_records.push_back(
+            {id, raised, kept.situation, kept.severity, kept.log, m_texts.back(), kept.text});
     }
     const std::vector<EventRecord>& records() const { return m_records; }
 

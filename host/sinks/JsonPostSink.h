@@ -1,0 +1,37 @@
+#ifndef ZRM_HOST_JSON_POST_SINK_H
+#define ZRM_HOST_JSON_POST_SINK_H
+
+#include "host/events/Sink.h"
+#include "host/sinks/HttpPost.h"
+
+#include <cstddef>
+#include <span>
+#include <stop_token>
+#include <string>
+#include <string_view>
+
+/// A sink that posts each delivery as one JSON body, taken as a whole or not at all. What the body
+/// says is the derived class's. Used by one thread.
+class JsonPostSink : public Sink {
+public:
+    std::string name() const override { return m_name; }
+    std::size_t deliver(std::span<const EventRecord> events,
+                        const std::stop_token& giveUp) override;
+    std::string error() const override { return m_http.error(); }
+
+protected:
+    /// `path` is added to the URL of the configuration.
+    JsonPostSink(const SinkConfig& config, std::string_view path);
+
+    /// The body that says these events.
+    virtual std::string bodyOf(std::span<const EventRecord> events) const = 0;
+
+    /// Called with the receiver's answer when it has taken this many events.
+    virtual void taken(std::size_t events, const std::string& answer) const;
+
+private:
+    const std::string m_name;
+    HttpPost m_http;
+};
+
+#endif
