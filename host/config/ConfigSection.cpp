@@ -76,6 +76,17 @@ std::optional<std::string> ConfigSection::text(std::string_view key) {
     return text;
 }
 
+/// Adds a text of a list, or says what is wrong with it.
+void ConfigSection::addText(std::vector<Text>& texts, std::string_view key,
+                            const toml::value<std::string>& text) {
+    const unsigned line = lineOf(text.source());
+    if (text->find('\0') != std::string::npos) {
+        problem(line, key, "holds a zero byte", "leave it out");
+        return;
+    }
+    texts.emplace_back(*text, line);
+}
+
 std::optional<std::int64_t> ConfigSection::number(std::string_view key) {
     const toml::node* const node = find(key);
     if (node == nullptr) {
@@ -108,11 +119,11 @@ std::vector<ConfigSection::Text> ConfigSection::texts(std::string_view key) {
     }
     constexpr const char* cure = "write a list of texts in quotes";
     if (const auto* const one = node->as_string()) {
-        texts.emplace_back(one->get(), lineOf(node->source()));
+        addText(texts, key, *one);
     } else if (const toml::array* const list = node->as_array()) {
         for (const toml::node& item : *list) {
             if (const auto* const text = item.as_string()) {
-                texts.emplace_back(text->get(), lineOf(item.source()));
+                addText(texts, key, *text);
             } else {
                 wrongType(key, item, cure);
             }

@@ -48,6 +48,8 @@ public:
 
 private:
     const toml::node* find(std::string_view key);
+    void addText(std::vector<Text>& texts, std::string_view key,
+                 const toml::value<std::string>& text);
     void wrongType(std::string_view key, const toml::node& node, const char* cure);
 
     const std::string m_name;

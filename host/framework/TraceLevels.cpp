@@ -86,6 +86,10 @@ std::string TraceLevels::parseWord(std::string_view word) {
         if (unit->empty()) {
             return "no unit is named before '=' in \"" + std::string(word) + "\"";
         }
+        if (!std::all_of(unit->begin(), unit->end(),
+                         [](char c) { return c > ' ' && c < '\x7f'; })) {
+            return "\"" + std::string(*unit) + "\" is no name of a source file";
+        }
     }
     unsigned level = 0;
     bool hasMore = true;

@@ -26,6 +26,8 @@ using nlohmann::ordered_json;
 
 TRC1_Anchor anchor{"AgentResource.cpp"};
 
+constexpr std::size_t longestLevels = 4096; ///< bytes
+
 std::int64_t now() {
     return std::chrono::duration_cast<std::chrono::milliseconds>(
                std::chrono::system_clock::now().time_since_epoch())
@@ -91,6 +93,9 @@ HttpAnswer setTrace(const HttpRequest& request) {
     JsonFields fields(request.body);
     const std::string levels = fields.text("levels");
     fields.refuseUnknown();
+    if (levels.size() > longestLevels) { // a thread may read any that were ever set: all are kept
+        fields.refuse("levels", "write at most " + std::to_string(longestLevels) + " bytes");
+    }
     if (const std::string problem = TraceControl::configure(levels); !problem.empty()) {
         fields.refuse("levels", problem);
     }

@@ -53,6 +53,8 @@ def test_the_trace_is_changed_while_the_agent_runs(agent, serving):
     agent.wait_trace("LogFile.cpp:")
     assert problem(api, "PUT", "/api/v1/trace", {"levels": "loud"})[:2] == (400, "levels")
     assert problem(api, "PUT", "/api/v1/trace", {"level": "all"})[:2] == (400, "levels")
+    for odd in ("error+", "a\n1 forged=fine", "x" * 4096 + "=fine"):
+        assert problem(api, "PUT", "/api/v1/trace", {"levels": odd})[:2] == (400, "levels"), odd
     assert get(api, "/api/v1/status")["trace"] == "error,LogFile=all", "a refusal changes nothing"
 
 

@@ -72,6 +72,8 @@ TEST(TraceLevels, NamesTheWordThatIsWrong) {
     EXPECT_EQ(wrong("0x"), "\"0x\" in \"0x\"" + classes);
     EXPECT_EQ(wrong("0x1g"), "\"0x1g\" in \"0x1g\"" + classes);
     EXPECT_EQ(wrong("a=b=fine"), "\"b=fine\" in \"a=b=fine\"" + classes);
+    EXPECT_EQ(wrong("a b=fine"), "\"a b\" is no name of a source file");
+    EXPECT_EQ(wrong("a\n1 forged=fine"), "\"a\n1 forged\" is no name of a source file");
     EXPECT_EQ(wrong("fine, =fine"), "no unit is named before '=' in \"=fine\"");
 }
 

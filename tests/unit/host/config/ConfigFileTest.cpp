@@ -213,6 +213,16 @@ token_file = "token"
             "zrm.toml:8: http.token_file: 'token' is no absolute path; begin it with '/'"));
 }
 
+TEST(ConfigFile, RefusesZeroBytesInListsToo) {
+    for (const std::string when : {R"("ENTRYDESC contains 'a\u0000b'")",
+                                   R"(["ENTRYSRC = 'x'", "ENTRYDESC contains 'a\u0000b'"])"}) {
+        EXPECT_THAT(refused("[[situation]]\nname = \"a\"\ntext = \"x\"\nseverity = \"info\"\n"
+                            "log = \"/a\"\nwhen = " +
+                            when),
+                    ElementsAre("zrm.toml:6: situation.when: holds a zero byte; leave it out"));
+    }
+}
+
 TEST(ConfigFile, RefusesToListenForOtherMachines) {
     for (const std::string address : {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(refused("http.listen = \"" + address + "\""),
