@@ -104,7 +104,7 @@ def troubled(console):
     ready(console, "situations?new")
     console.type("Name", "bad")
     console.choose("Log", console.api.request("GET", "/api/v1/logs")[2]["logs"][0]["log"])
-    console.condition("port [", operator="matches pattern")
+    console.condition("port [", operator="matches")
     console.wait_text("Mend what is marked")
     yield "a condition that is wrong"
     ready(console, "events")
@@ -199,6 +199,19 @@ def test_buttons_are_told_from_fields_on_a_narrow_screen(console):
     ((_, ground, width, is_cut),) = [look for look in looks if look[0] == "BUTTON"]
     assert ground not in [look[1] for look in fields]
     assert width < 100 and not is_cut
+
+
+def test_what_stays_the_same_is_not_read_aloud_again(console, fast_polls):
+    ready(console, "logs")
+    console.wait_text("in trouble")
+    console.run(
+        "window.said = []; for (const e of document.querySelectorAll('main [role=status], main [role=alert], header [role=status]'))"
+        " new MutationObserver((all) => said.push(e.outerHTML)).observe(e, {childList: true, characterData: true, subtree: true})"
+    )
+    asked = "return performance.getEntriesByType('resource').filter((one) => one.name.endsWith('/api/v1/logs')).length"
+    before = console.run(asked)
+    until(lambda: console.run(asked) >= before + 3, "three more answers")
+    assert console.run("return said") == []
 
 
 def test_motion_is_not_needed(console):

@@ -288,6 +288,17 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     assert page.run(BEYOND) == []
 
 
+def test_a_situation_that_is_not_there_says_so(page, agent):
+    logs_agent(agent)
+    page.on(agent)
+    for view in ("situations?name=gone", "situations?edit=gone"):
+        page.open(view)
+        page.wait_text("No situation is called gone.")
+        page.click("All situations")
+        page.heading("Situations")
+    page.expect_complaints()
+
+
 # ---------------------------------------------------------------------- configured, and not monitored
 
 

@@ -7,7 +7,7 @@ const NAMES = {
   ENTRYSRC: "Source", ENTRYDESC: "Description", ENTRYTYPE: "Type", ENTRYCLASS: "Class", ENTRYSYS: "System", ENTRYTIME: "Time",
 };
 const WORDS = {
-  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches pattern", in: "is one of",
+  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches", in: "is one of",
   ">=": "at least", "<=": "at most", "<": "less than", ">": "more than",
 };
 const FIRST = ["ENTRYSRC", "ENTRYDESC", "ENTRYTYPE", "ENTRYCLASS", "ENTRYSYS", "ENTRYTIME"];
@@ -104,7 +104,7 @@ export class Conditions {
   #chosen({ column, operator, value }) {
     const known = [...this.#columns].sort((a, b) => (FIRST.indexOf(a.name) + 1 || 99) - (FIRST.indexOf(b.name) + 1 || 99));
     const changed = () => this.#change();
-    const columnBox = select(known.map(({ name }) => [name, NAMES[name] ? `${NAMES[name]} (${name})` : name]), column,
+    const columnBox = select(known.map(({ name }) => [name, NAMES[name] ?? name]), column,
       { "aria-label": "Column", onchange: () => { offer(); changed(); } });
     const operatorBox = h("select", { "aria-label": "Operator", onchange: () => { hint(); changed(); } });
     const input = h("input", { className: "value", value, "aria-label": "Value", spellcheck: false, autocomplete: "off", oninput: changed });

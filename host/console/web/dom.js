@@ -25,6 +25,12 @@ export function fill(element, ...children) {
   return element;
 }
 
+/** Fills what is read aloud when it changes; what says the same again is left alone. */
+export function say(element, ...children) {
+  const next = h("div", {}, ...children);
+  if (next.textContent !== element.textContent) element.replaceChildren(...next.childNodes);
+}
+
 const SVG = "http://www.w3.org/2000/svg";
 
 export function svg(tag, attributes = {}, ...children) {
@@ -91,10 +97,13 @@ export function loading(text = "Loading") {
   return h("p", { className: "loading", role: "status" }, `${text} …`);
 }
 
+/** The agent's problems as a sentence. */
+const sentence = (text) => `${text.charAt(0).toUpperCase()}${text.slice(1)}${/[.!?]$/.test(text) ? "" : "."}`;
+
 /** Why something failed; what failed for want of a connection is done again once there is one. */
 export function failure(error, retry) {
   const element = h("div", { className: "empty failure", role: "alert" }, h("h2", {}, error.title || "That did not work"),
-    h("p", {}, error.message), error.cure && h("p", {}, error.cure),
+    h("p", {}, sentence(error.message)), error.cure && h("p", {}, error.cure),
     retry && h("p", { className: "actions" }, button("Try again", () => retry())));
   if (retry && error.status === 0) addEventListener("zrm-regained", () => element.isConnected && retry(), { once: true });
   return element;

@@ -89,7 +89,7 @@ let timer = 0;
 
 function setLink(state, text) {
   link.dataset.state = state;
-  link.textContent = text;
+  if (link.textContent !== text) link.textContent = text; // it is read aloud
 }
 
 signals.addEventListener("lost", () => {

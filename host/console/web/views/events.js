@@ -31,10 +31,7 @@ class EventsPage {
   }
 
   #build(element) {
-    const again = () => {
-      history.replaceState(null, "", withQuery("#/events", this.filter)); // for a reload, and the way back
-      this.restart();
-    };
+    const again = () => this.choose();
     this.situation = select([["", "All situations"]], "", { onchange: again });
     this.log = select([["", "All logs"]], "", { onchange: again });
     this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
@@ -86,6 +83,12 @@ class EventsPage {
 
   get filter() {
     return { situation: this.situation.value, log: this.log.value, severity: this.severity.value };
+  }
+
+  /** Takes the filter as it is now. */
+  choose() {
+    history.replaceState(null, "", withQuery("#/events", this.filter)); // for a reload, and the way back
+    this.restart();
   }
 
   async restart() {
@@ -148,6 +151,7 @@ class EventsPage {
   // Events that come close together are drawn together, once per frame.
   #arrive(event) {
     this.arrived.push(event);
+    if (this.arrived.length > 2 * MOST) this.arrived.splice(0, MOST); // a page out of sight draws no frame
     this.frame ??= requestAnimationFrame(() => {
       this.frame = null;
       this.#take(this.arrived.splice(0).reverse());
@@ -193,7 +197,12 @@ class EventsPage {
     this.list.reset(shown);
     if (shown.length > 0) fill(this.body, this.list.element);
     else if (this.all.length > 0) fill(this.body, empty("None of these", "No event that is loaded has this text."));
-    else fill(this.body, empty("No events yet", "An event comes when an entry meets a situation. This page shows it at once.", h("a", { className: "button", href: "#/situations" }, "Situations")));
+    else if (Object.values(this.filter).some(Boolean)) {
+      fill(this.body, empty("None of these", "No event of the history fits the filter. One that comes shows at once.", button("Show all events", () => {
+        for (const control of [this.situation, this.log, this.severity]) control.value = "";
+        this.choose();
+      })));
+    } else fill(this.body, empty("No events yet", "An event comes when an entry meets a situation. This page shows it at once.", h("a", { className: "button", href: "#/situations" }, "Situations")));
     this.#drawCount();
   }
 
@@ -247,7 +256,7 @@ class EventsPage {
       h("p", { className: "actions" }, explain), why, h("h3", {}, "Columns"), rowList(event.row));
     this.detail.hidden = false;
     this.split.classList.add("open");
-    if (isEntered || matchMedia("(max-width: 900px)").matches) this.detail.focus();
+    if (isEntered || matchMedia("(max-width: 960px)").matches) this.detail.focus();
   }
 
   #close() {

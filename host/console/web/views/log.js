@@ -10,14 +10,14 @@ const EVERY = 10000;
 const CHART_EVERY = 60000;
 
 export async function show(element, path) {
+  const report = h("a", { className: "button", href: withQuery("#/reports", { log: path }), hidden: true }, "Report on this log");
+  const trial = h("a", { className: "button", href: withQuery("#/try", { log: path }), hidden: true }, "Try a format on it");
   const state = h("div", { className: "panel" }, loading());
   const chart = h("div", {}, loading("Loading the last 24 hours"));
   const rates = h("section", { className: "panel" }, h("h2", {}, "Entries and events per minute, last 24 hours"), chart);
   const ledger = h("div", { className: "stack" });
   fill(element,
-    h("div", { className: "head" }, h("h1", { className: "path" }, path), h("div", { className: "push" },
-      h("a", { className: "button", href: withQuery("#/reports", { log: path }) }, "Report on this log"),
-      h("a", { className: "button", href: withQuery("#/try", { log: path }) }, "Try a format on it"),
+    h("div", { className: "head" }, h("h1", { className: "path" }, path), h("div", { className: "push" }, report, trial,
       h("a", { className: "button", href: "#/logs" }, "All logs"))),
     state, rates, ledger);
   let endChart = () => {};
@@ -25,7 +25,8 @@ export async function show(element, path) {
   const load = async () => {
     try {
       const { logs: [log], unmonitored: [other], configuration } = await get(withQuery("/api/v1/logs", { log: path }));
-      rates.hidden = !log;
+      rates.hidden = report.hidden = !log;
+      trial.hidden = !"US".includes(log?.row.LOGTYPE ?? " ");
       if (log) {
         drawState(state, log, configuration);
         drawLedger(ledger, log);
@@ -38,7 +39,7 @@ export async function show(element, path) {
       if (error.status === 404) {
         fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration. Add it there, then re-read the configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
         fill(ledger);
-        rates.hidden = true;
+        rates.hidden = report.hidden = trial.hidden = true;
         isDrawn = false;
       } else if (!isDrawn) fill(state, failure(error, load));
     }

@@ -2,7 +2,7 @@
 
 import { get, post, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
-import { button, debounce, empty, failure, fill, h, loading, select, table } from "../dom.js";
+import { button, debounce, empty, failure, fill, h, loading, say, select, table } from "../dom.js";
 import { ago, briefTime, bytes, number, rate, rateText } from "../format.js";
 import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
@@ -82,7 +82,8 @@ class LogsPage {
       this.#seen.set(log, seen);
     }
     this.configuration = configuration;
-    fill(this.trouble, configuration?.problem && h("p", { className: "panel problem" },
+    this.isIdle = logs.length === 0;
+    say(this.trouble, configuration?.problem && h("p", { className: "panel problem" },
       `The log configuration ${configuration.file} cannot be read: ${configuration.problem}. The agent goes on with the logs that it has; those of the system's syslog configuration, if it had none.`));
   }
 
@@ -157,14 +158,14 @@ class LogsPage {
 
   draw() {
     const judged = this.logs;
-    this.cure.textContent = judged.some(({ level }) => level === "bad") ? again(this.configuration) : "";
+    this.cure.textContent = judged.some(({ level }) => level === "bad") ? `${again(this.configuration)}${this.isIdle ? " The agent monitors nothing: without a log it ends after a minute." : ""}` : "";
     const counted = (level) => judged.filter((log) => log.level === level).length;
-    fill(this.counts, h("span", {}, h("b", {}, number(judged.length)), ` ${judged.length === 1 ? "log" : "logs"}`),
+    say(this.counts, h("span", {}, h("b", {}, number(judged.length)), ` ${judged.length === 1 ? "log" : "logs"}`),
       counted("bad") > 0 && h("span", { className: "state bad" }, `${counted("bad")} in trouble`),
       counted("warn") > 0 && h("span", { className: "state warn" }, `${counted("warn")} to look at`),
       h("span", { className: "state good" }, `${counted("good")} running`));
     if (judged.length === 0) {
-      fill(this.list, empty("No log is monitored", "The agent reads its logs from the file of log_config in its configuration, one path per line. Write one, then re-read the configuration.", h("a", { className: "button", href: "#/try" }, "Make a line for a log")));
+      fill(this.list, empty("No log is monitored", "The agent reads its logs from the file of log_config in its configuration, one path per line. Write one, then re-read the configuration. Without a log the agent ends after a minute, and is to be started again.", h("a", { className: "button", href: "#/try" }, "Make a line for a log")));
       return;
     }
     const word = this.text.value.toLowerCase();

@@ -166,7 +166,7 @@ class ReportPage {
           this.holder.querySelector(`[data-name="${name}"]`).focus();
         }, { "data-name": name }));
     });
-    fill(this.holder, h("table", { role: "table", className: isWhole ? "" : "cards" }, h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
+    fill(this.holder, h("table", { role: "table", className: isWhole ? "" : "cards sortable" }, h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
       h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
       h("tbody", { role: "rowgroup" }, sorted.map((row) => h("tr", { role: "row" }, shown.map(([name, label]) =>
         h("td", { role: "cell", "data-label": label, className: name.endsWith("DESC") ? "wide break" : name === "ENTRYTIME" ? "fit whole" : "fit" }, name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]))))))));

@@ -5,13 +5,25 @@ import { Conditions } from "../conditions.js";
 import { debounce, field, fill, h, select } from "../dom.js";
 import { COMPARISONS, SEVERITIES } from "../format.js";
 import { explainPanel, previewPanel } from "../situation-tools.js";
+import { notThere } from "./situations.js";
 
 const BLANK = { name: "", text: "", severity: "warning", log: null, when: [], frequency: null, period: null };
 const UNITS = [["s", "seconds"], ["m", "minutes"], ["h", "hours"], ["d", "days"]];
 
 export async function show(element, name, query) {
-  const [situation, { logs }, { columns }] = await Promise.all([
-    name ? get(situationPath(name)) : { ...BLANK, log: query.get("log") }, get("/api/v1/logs"), get("/api/v1/columns")]);
+  const given = async () => {
+    try {
+      return name ? await get(situationPath(name)) : { ...BLANK, log: query.get("log") };
+    } catch (error) {
+      if (error.status === 404) return null;
+      throw error;
+    }
+  };
+  const [situation, { logs }, { columns }] = await Promise.all([given(), get("/api/v1/logs"), get("/api/v1/columns")]);
+  if (!situation) {
+    fill(element, notThere(name));
+    return;
+  }
   new Form(element, name, situation, logs.map(({ log }) => log).sort(), columns);
 }
 

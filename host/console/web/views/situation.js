@@ -4,7 +4,7 @@ import { get, situationPath, withQuery } from "../api.js";
 import { failure, fill, h, loading } from "../dom.js";
 import { ago, frequencyText, number, time } from "../format.js";
 import { explainPanel, previewPanel } from "../situation-tools.js";
-import { actions, STATES } from "./situations.js";
+import { actions, notThere, STATES } from "./situations.js";
 
 const EVERY = 5000;
 
@@ -30,7 +30,7 @@ class SituationPage {
     try {
       this.situation = await get(situationPath(this.name));
     } catch (error) {
-      fill(this.element, failure(error, () => this.load()));
+      fill(this.element, error.status === 404 ? notThere(this.name) : failure(error, () => this.load()));
       return;
     }
     const preview = previewPanel(() => ({ situation: this.name }));

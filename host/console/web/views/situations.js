@@ -45,6 +45,12 @@ export async function show(element, query) {
   return () => clearInterval(timer);
 }
 
+/** Where a situation was looked for that there is none of. */
+export function notThere(name) {
+  return [h("h1", { className: "unseen" }, name), empty("This situation is not there", `No situation is called ${name}. It may have been deleted, or taken out of the configuration file.`,
+    h("a", { className: "button", href: "#/situations" }, "All situations"))];
+}
+
 function draw(element, situations, act) {
   if (situations.length === 0) {
     fill(element, empty("No situations yet", "A situation says which entries are worth an event: a log, conditions on its columns, and, if it should, how often they must come.",

@@ -80,7 +80,7 @@ class TryPage {
   #draw(answer) {
     this.format.setProblem(answer.accepted ? "" : `The format cannot be used: ${answer.reason}`);
     if (!answer.accepted) {
-      fill(this.result, h("section", { className: "panel" }, h("h2", {}, "Where the format stops"), markedAt(this.format.control.value, answer.position), h("p", { className: "problem" }, answer.reason)));
+      fill(this.result, h("section", { className: "panel" }, h("h2", {}, "Where the format stops"), markedAt(this.format.control.value, answer.position)));
       return;
     }
     const names = fieldNames(answer.directives);
