@@ -193,8 +193,12 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     }
     Backtest test(wanted.situation, m_entries);
     requireOpen(test.isOpen());
-    const Backtest::Result result =
-        test.run(read, from, to, [this] { return m_isCancelled.load(std::memory_order_relaxed); });
+    const Backtest::Result result = test.run(read, from, to, [&] {
+        return m_isCancelled.load(std::memory_order_relaxed) || logs.areWanted();
+    });
+    if (result.isTruncated && logs.areWanted()) {
+        throw RequestRefused(503, "the agent reads its configuration of logs again: try again", "");
+    }
     return HttpAnswer::json(SituationJson::text({{"entries", result.entries},
                                                  {"matched", result.matched},
                                                  {"raised", result.raised},

@@ -1,6 +1,7 @@
 #include "host/analysis/Backtest.h"
 
 #include "agent/TraceScope.h"
+#include "host/analysis/MonitoredLogs.h"
 #include "monitor/LogFile.h"
 #include "tables/RequestThresholds.h"
 
@@ -8,12 +9,18 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <string_view>
 
 namespace {
 
 TRC1_Anchor anchor{"Backtest.cpp"};
 
 constexpr std::uint64_t entriesPerLook = 1024; ///< at the clock
+
+/// Behind every time of an entry.
+constexpr std::string_view never = "9999999999999999";
+
+constexpr char errorLog = 'E';
 
 std::string times(std::uint64_t number) {
     return number == 1 ? "once" : std::to_string(number) + " times";
@@ -37,11 +44,13 @@ struct Backtest::Limits {
     const std::function<bool()>& isCancelled;
     std::chrono::steady_clock::time_point deadline = std::chrono::steady_clock::now() + patience;
 
-    bool areReached(const Result& result) const {
+    std::uint64_t looked = 0; ///< at entries, also at those behind the last time
+
+    bool areReached(const Result& result) {
         if (result.entries >= mostEntries || result.matched >= mostMatched) {
             return true;
         }
-        return result.entries % entriesPerLook == 0 &&
+        return looked++ % entriesPerLook == 0 &&
                (isCancelled() || std::chrono::steady_clock::now() >= deadline);
     }
 };
@@ -68,8 +77,11 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     TraceScope trace(anchor);
     _RequestThresholds window{};
     from.copy(window.startTime, sizeof window.startTime - 1);
-    to.copy(window.endTime, sizeof window.endTime - 1);
-    void* report = log.startReportRequest(&window);
+    // A log would pass over what is behind the last time in one go, which nothing could end; the
+    // error log's command is told the time instead.
+    const std::string_view end = log.type() == errorLog ? std::string_view(to) : never;
+    end.copy(window.endTime, sizeof window.endTime - 1);
+    void* report = MonitoredLogs::isReadable(log) ? log.startReportRequest(&window) : nullptr;
     if (report == nullptr) {
         return; // the log is empty or cannot be read
     }
@@ -78,6 +90,9 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         if (limits.areReached(result)) {
             result.isTruncated = true;
             break;
+        }
+        if (std::memcmp(row->entrytime, to.data(), sizeof row->entrytime) > 0) {
+            continue;
         }
         ++result.entries;
         if (m_replay.matches(*row)) {

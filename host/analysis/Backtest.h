@@ -22,7 +22,7 @@ public:
     static constexpr std::uint64_t mostEntries = 5'000'000; ///< read
     static constexpr std::size_t mostMatched = 1'000'000;
     static constexpr std::size_t mostTimes = 1000; ///< that the result names
-    static constexpr std::chrono::seconds patience{10};
+    static constexpr std::chrono::seconds patience{30};
 
     struct Result {
         std::uint64_t entries = 0; ///< between the two times

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "host/analysis/MonitoredLogs.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
 #include "tables/RequestThresholds.h"
@@ -12,6 +13,7 @@
 #include <vector>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
@@ -77,8 +79,16 @@ std::string LogTail::read(const Entry& entry) {
         entries(entry);
         return "";
     }
-    const Descriptor file(open(m_log.fileNameLocal(), O_RDONLY | O_CLOEXEC));
-    if (file.get() == -1 || !seekTail(file.get())) {
+    // A pipe in the file's place must not hold the caller up.
+    const Descriptor file(open(m_log.fileNameLocal(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    struct stat status {};
+    if (file.get() == -1 || fstat(file.get(), &status) == -1) {
+        return because("the log cannot be read", errno);
+    }
+    if (!S_ISREG(status.st_mode)) {
+        return "the log cannot be read: it is no file";
+    }
+    if (!seekTail(file.get())) {
         return because("the log cannot be read", errno);
     }
     pieces(file.get(), entry);
@@ -108,8 +118,11 @@ void LogTail::pieces(int fd, const Entry& entry) {
     reader.start(fd);
     zrm_rmlogent_data_t row;
     std::string line;
-    while (char* const piece = reader.next()) {
+    // What a busy log is given meanwhile must not keep the reading from its end.
+    std::size_t read = 0;
+    for (char* piece; read < 2 * longest && (piece = reader.next()) != nullptr;) {
         line = piece; // making the row may change it
+        read += line.size() + 1;
         const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
         if (line.ends_with('\n')) {
             line.pop_back();
@@ -123,7 +136,7 @@ void LogTail::entries(const Entry& entry) {
     _RequestThresholds always{};
     std::strcpy(always.startTime, "0000000000000000");
     std::strcpy(always.endTime, "1991231235959000");
-    void* report = m_log.startReportRequest(&always);
+    void* report = MonitoredLogs::isReadable(m_log) ? m_log.startReportRequest(&always) : nullptr;
     if (report == nullptr) {
         return;
     }

@@ -4,6 +4,8 @@
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
 
+#include <sys/stat.h>
+
 MonitoredLogs::MonitoredLogs() : m_manager(pTheLogManager) {
     if (m_manager != nullptr) {
         m_manager->beginRequest();
@@ -16,6 +18,10 @@ MonitoredLogs::~MonitoredLogs() {
     }
 }
 
+bool MonitoredLogs::areWanted() const noexcept {
+    return m_manager != nullptr && m_manager->isRefreshWaiting();
+}
+
 std::vector<LogFile*> MonitoredLogs::all() const {
     std::vector<LogFile*> logs;
     LogFile* log = nullptr;
@@ -24,6 +30,12 @@ std::vector<LogFile*> MonitoredLogs::all() const {
         logs.push_back(log);
     }
     return logs;
+}
+
+bool MonitoredLogs::isReadable(const LogFile& log) noexcept {
+    struct stat status {};
+    return log.type() == 'E' ||
+           (stat(log.fileNameLocal(), &status) == 0 && S_ISREG(status.st_mode));
 }
 
 LogFile* MonitoredLogs::find(std::string_view path) const {

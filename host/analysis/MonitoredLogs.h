@@ -17,9 +17,15 @@ public:
     MonitoredLogs(const MonitoredLogs&) = delete;
     MonitoredLogs& operator=(const MonitoredLogs&) = delete;
 
+    /// True once a refresh waits for the object's end, and with it every log that has changed.
+    bool areWanted() const noexcept;
     std::vector<LogFile*> all() const;
     /// The log of this whole path, in UTF-8; null when it is not monitored.
     LogFile* find(std::string_view path) const;
+
+    /// Whether a report on the log begins at once: one on a pipe in the place of its file would
+    /// wait for a writer.
+    static bool isReadable(const LogFile& log) noexcept;
 
 private:
     LogManager* const m_manager; ///< null while the process ends

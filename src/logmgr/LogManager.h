@@ -34,6 +34,8 @@ public:
     void beginRequest();
     /// Ends a request; a refresh that waits for the last one goes on.
     void endRequest();
+    /// True while a refresh waits for requests to end: a long one may end early. Any thread.
+    bool isRefreshWaiting() const noexcept { return RefreshWaiting.load(); }
     /// Records that the framework has begun to serve requests; a stop waits for that.
     void setServerUp();
     /// Walks the chain between beginRequest and endRequest: null gives the first log; `index` is
@@ -101,6 +103,7 @@ private:
     std::atomic<std::time_t> SyslogConfFileLastChanged{0};
     std::atomic<std::uint32_t> NumLogs{0};
     std::atomic<std::int32_t> UseCount{0};
+    std::atomic<bool> RefreshWaiting{false};
     /// Owns the circular chain of valid logs, which exists from the reading of the configuration
     /// to the building of the objects.
     std::atomic<ValidLog*> FirstValidLog{nullptr};

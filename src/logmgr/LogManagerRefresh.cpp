@@ -56,6 +56,7 @@ void LogManager::waitForRequests() {
     if (UseCount == 0) {
         return;
     }
+    RefreshWaiting = true;
     while (UseCount != 0) {
         trace.detail()("Refresh suspended pending completion of outstanding requests.");
         if (const int code = waitFor(ManagerNotInUse, nullptr)) {
@@ -65,6 +66,7 @@ void LogManager::waitForRequests() {
                           error.number(), error.text());
         }
     }
+    RefreshWaiting = false;
     trace.detail()("Refresh resuming.");
 }
 

@@ -1,10 +1,12 @@
 """Why a situation is raised by an entry or not, and what it would have made of the past."""
 
 import time
+from concurrent.futures import ThreadPoolExecutor
+from signal import SIGHUP
 
 import pytest
 from api import Api, stamp
-from conftest import syslog_line, wait_until
+from conftest import PATIENCE, syslog_line, wait_until
 
 
 class Analysis(Api):
@@ -418,3 +420,61 @@ def test_without_a_history_there_is_no_event_to_explain(agent):
     answer = Analysis(agent).post("explain", {"event": 1, "situation": "all"}, 409)
     assert (answer["field"], answer["detail"]) == ("event", "the history is off")
     assert agent.stop() == 0
+
+
+def test_a_refresh_waits_for_no_backtest(agent):
+    agent.listen = "127.0.0.1:0"
+    when = time.localtime(time.time() - 60)
+    line = syslog_line("x" * 200, when=when).encode()
+    log = agent.log(content=line * 200_000)
+    agent.start()
+    # Conditions that take long and all hold.
+    slow = {"log": str(log), "when": ["ENTRYDESC matches 'x.*x$'"] * 100}
+    begin = stamp(time.time() - 3600)
+    end = stamp(time.time() + 3600)
+
+    def run():
+        while True:  # until those that ask whether two are under way leave room
+            answer = Analysis(agent).request(
+                "POST", "/api/v1/backtest", {"from": begin, "to": end, "definition": slow}
+            )
+            if "two backtests" not in answer[2].get("detail", ""):
+                return answer
+
+    with ThreadPoolExecutor() as pool:
+        running = [pool.submit(run) for _ in range(2)]
+        refused = []
+
+        def both_run():
+            status, _, answer = run_short(agent, begin, log)
+            refused.append(answer)
+            return status == 503 and "two backtests are under way" in answer["detail"]
+
+        wait_until(both_run, lambda: f"two backtests: {refused[-1]}")
+        begun = time.monotonic()
+        agent.log("new.log")
+        agent.send(SIGHUP)
+        api = Api(agent)
+        new = str(agent.directory / "new.log")
+        wait_until(
+            lambda: new in [one["log"] for one in api.request("GET", "/api/v1/logs")[2]["logs"]],
+            "the new log",
+        )
+        taken = time.monotonic() - begun
+        for answer in running:
+            status, _, problem = answer.result(PATIENCE)
+            assert status == 503, (status, problem, taken)
+            assert problem["detail"] == (
+                "the agent reads its configuration of logs again: try again"
+            )
+    # The same, left alone.
+    status, _, answer = run_short(agent, begin, log)
+    assert (status, answer["entries"]) == (200, 0)
+    assert agent.stop() == 0
+
+
+def run_short(agent, begin, log):
+    definition = {"log": str(log), "when": ["ENTRYSRC = 'none'"]}
+    return Analysis(agent).request(
+        "POST", "/api/v1/backtest", {"from": begin, "to": begin, "definition": definition}
+    )

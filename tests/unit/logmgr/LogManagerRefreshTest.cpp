@@ -162,8 +162,10 @@ TEST_F(LogManagerRefreshTest, ARefreshWaitsForTwoOpenRequests) {
     manager->beginRequest();
     manager->beginRequest();
     trace.clear();
+    EXPECT_FALSE(manager->isRefreshWaiting());
     kill(getpid(), SIGHUP);
     ASSERT_TRUE(trace.waitFor(suspended));
+    EXPECT_TRUE(manager->isRefreshWaiting());
     manager->endRequest();
     EXPECT_FALSE(trace.contains("Refresh resuming."));
     EXPECT_EQ(manager->getNextLogObject(nullptr, 0)->fileNameLocal(), a);
@@ -171,6 +173,7 @@ TEST_F(LogManagerRefreshTest, ARefreshWaitsForTwoOpenRequests) {
     manager->endRequest();
     ASSERT_TRUE(trace.waitFor(waiting));
     EXPECT_TRUE(trace.contains("Refresh resuming."));
+    EXPECT_FALSE(manager->isRefreshWaiting());
     EXPECT_THAT(logs(), ElementsAre(b));
 }
 

@@ -1,6 +1,7 @@
 #include "host/analysis/Backtest.h"
 
 #include "host/config/SituationValidator.h"
+#include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "tables/zrm_rmlogent_manager.h"
@@ -11,6 +12,9 @@
 
 #include <string>
 #include <vector>
+
+#include <sys/stat.h>
+#include <unistd.h>
 
 namespace {
 
@@ -102,6 +106,37 @@ TEST_F(BacktestTest, EndsEarlyWhenItIsCancelledAndSaysSo) {
     EXPECT_EQ(first.ends, first.reports) << "the report is closed";
     EXPECT_EQ(second.reports, 0);
     EXPECT_THAT(run({}).decision, testing::EndsWith("; older entries were not looked at."));
+}
+
+TEST_F(BacktestTest, EndsEarlyAlsoBeforeTheFirstEntryBetweenTheTimes) {
+    for (int n = 0; n < 3000; ++n) {
+        first.entries.emplace_back(2000 + n, "x"); // all of them behind the last time
+    }
+    EXPECT_EQ(run({}).entries, 0u);
+    EXPECT_FALSE(run({}).isTruncated);
+    isCancelled = true;
+    const Backtest::Result result = run({});
+    EXPECT_EQ(result.entries, 0u);
+    EXPECT_TRUE(result.isTruncated);
+}
+
+TEST_F(BacktestTest, LetsTheErrorLogsCommandFindTheLastTime) {
+    const FakeUname aix("AIX");
+    TestLog errors(directory.write("errpt", ""), " ;N ;E");
+    errors.entries = {{5, "x"}, {2000, "x"}};
+    logs = {&errors};
+    EXPECT_THAT(run({}).raisedAt, ElementsAre(stampAt(5)));
+    EXPECT_EQ(errors.window().endTime, to);
+}
+
+TEST_F(BacktestTest, WaitsForNoPipeInTheLogsPlace) {
+    TestLog piped(directory.write("pipe", ""));
+    ASSERT_EQ(unlink(directory.file("pipe").c_str()), 0);
+    ASSERT_EQ(mkfifo(directory.file("pipe").c_str(), 0600), 0);
+    piped.entries = {{5, "x"}};
+    logs = {&piped};
+    EXPECT_EQ(run({}).entries, 0u);
+    EXPECT_EQ(piped.reports, 0);
 }
 
 TEST_F(BacktestTest, ALogThatCannotBeReadHasNothing) {

@@ -13,9 +13,12 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <fstream>
 #include <optional>
 #include <string>
 #include <vector>
+
+#include <sys/stat.h>
 
 namespace {
 
@@ -72,6 +75,32 @@ TEST_F(ExplainerTest, ReadsTheLogsLines) {
     std::filesystem::remove(directory.file("app.log"));
     EXPECT_THAT(linesOf(log), IsEmpty());
     EXPECT_EQ(problem, "the log cannot be read: No such file or directory");
+}
+
+TEST_F(ExplainerTest, WaitsForNoPipeInTheLogsPlace) {
+    TestLog binary(directory.file("app.log"), " ;N ;A");
+    binary.entries = {{0, "hit"}};
+    std::filesystem::remove(directory.file("app.log"));
+    ASSERT_EQ(mkfifo(directory.file("app.log").c_str(), 0600), 0);
+    EXPECT_THAT(linesOf(log), IsEmpty());
+    EXPECT_EQ(problem, "the log cannot be read: it is no file");
+    EXPECT_THAT(explainer().last(binary, 2), IsEmpty());
+    EXPECT_EQ(binary.reports, 0);
+}
+
+TEST_F(ExplainerTest, EndsWithALogThatGrowsAllTheTime) {
+    write("1 a\n");
+    std::ofstream more(directory.file("app.log"), std::ios::app);
+    const std::string line = "1 " + std::string(2000, 'x') + "\n";
+    std::size_t lines = 0;
+    EXPECT_EQ(LogTail(log).read([&](auto, auto*) {
+        ++lines;
+        // The reading is always behind.
+        more << line << line << std::flush;
+    }),
+              "");
+    EXPECT_GT(lines, LogTail::longest / line.size());
+    EXPECT_LT(lines, 3 * LogTail::longest / line.size());
 }
 
 TEST_F(ExplainerTest, ReadsTheLastWholeLinesOfALargeLog) {

@@ -77,6 +77,8 @@ public:
     }
     void processLogData() override {}
 
+    const _RequestThresholds& window() const { return m_window; } ///< of the last report
+
     std::vector<std::pair<int, std::string>> entries;
     bool canReport = true;
     int reports = 0;

@@ -1,0 +1,200 @@
+#include "host/cli/Program.h"
+
+#include "TestAgent.h"
+#include "host/cli/CliError.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <functional>
+#include <string>
+#include <vector>
+
+namespace {
+
+using httplib::Request;
+using httplib::Response;
+using testing::EndsWith;
+using testing::HasSubstr;
+
+class ProgramTest : public testing::Test {
+protected:
+    void SetUp() override {
+        setenv("ZRM_TOKEN", "the-token", 1);
+        answer = [](const Request&, Response&) {};
+        const auto respond = [this](const Request& request, Response& response) {
+            answer(request, response);
+        };
+        agent.routes().Get(".*", respond).Post(".*", respond).Put(".*", respond);
+        agent.begin();
+    }
+    void TearDown() override { unsetenv("ZRM_TOKEN"); }
+
+    void answerWith(const std::string& body) {
+        answer = [=](const Request&, Response& response) {
+            response.set_content(body, "application/json");
+        };
+    }
+    /// Runs zrmctl; its output and errors are kept.
+    int run(std::vector<std::string> arguments) {
+        if (arguments.front() != "--url") {
+            arguments.insert(arguments.begin(), {"--url", agent.connection().url});
+        }
+        arguments.insert(arguments.begin(), "zrmctl");
+        std::vector<const char*> words;
+        for (const std::string& argument : arguments) {
+            words.push_back(argument.c_str());
+        }
+        testing::internal::CaptureStdout();
+        testing::internal::CaptureStderr();
+        const int status = Program().run(static_cast<int>(words.size()), words.data());
+        output = testing::internal::GetCapturedStdout();
+        errors = testing::internal::GetCapturedStderr();
+        return status;
+    }
+
+    TemporaryDirectory directory;
+    TestAgent agent;
+    std::function<void(const Request&, Response&)> answer;
+    std::string output;
+    std::string errors;
+};
+
+TEST_F(ProgramTest, AnAnswerOfAnotherFormEndsNoCommandAbruptly) {
+    const std::vector<std::vector<std::string>> commands = {
+        {"status"},
+        {"logs"},
+        {"logs", "/x"},
+        {"events"},
+        {"report", "/x"},
+        {"report", "/x", "--format", "csv"},
+        {"report", "/x", "--columns", "ENTRYDESC"},
+        {"situations"},
+        {"situations", "show", "x"},
+        {"situations", "add", "x"},
+        {"situations", "set", "x", "--text", "a"},
+        {"explain", "x", "--event", "1"},
+        {"backtest", "x"},
+        {"trace"},
+        {"trace", "error"},
+    };
+    const std::vector<std::string> bodies = {
+        "{}",
+        "[]",
+        "null",
+        "1",
+        R"("x")",
+        R"({"columns":1,"rows":{"a":1},"logs":5,"events":{"a":{"id":-1}},"situations":"x",)"
+        R"("newest":"q","explanations":7,"raised_at":3,"truncated":[]})",
+        R"({"rows":[1,2],"columns":[1],"events":[1],"logs":[[]],"situations":[null],)"
+        R"("explanations":[[]],"raised_at":[1]})"};
+    for (const std::string& body : bodies) {
+        answerWith(body);
+        for (const std::vector<std::string>& command : commands) {
+            const int status = run(command);
+            EXPECT_TRUE(body[0] == '{' ? status <= CLI_UNREACHABLE : status == CLI_UNREACHABLE)
+                << command.front() << " with " << body << ": " << status << errors;
+        }
+    }
+    answerWith(R"({"columns":1,"rows":[{}]})");
+    EXPECT_EQ(run({"report", "/x", "--format", "csv"}), CLI_UNREACHABLE);
+    EXPECT_EQ(errors, "zrmctl: what answers is no zrmagent of this version: its answer has another "
+                      "form\n");
+}
+
+TEST_F(ProgramTest, AColumnThatAReportHasNotIsRefused) {
+    answerWith(R"({"columns":["ENTRYTIME","ENTRYDESC"],"rows":[{"ENTRYDESC":"a, b"}]})");
+    EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CLI_USAGE);
+    EXPECT_EQ(output, "");
+    EXPECT_EQ(errors, "zrmctl: --columns: 'BOGUS' is no column; the columns are ENTRYTIME, "
+                      "ENTRYDESC\n");
+    EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CLI_DONE);
+    EXPECT_EQ(output, "ENTRYDESC\r\n\"a, b\"\r\n");
+}
+
+TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
+    for (const char* const number :
+         {"99999999999999999999999", "9223372036854775808", "1.5", "-1", "x", "", " 1", "1x"}) {
+        EXPECT_EQ(run({"events", "-f", "--after", number}), CLI_USAGE) << number;
+        EXPECT_EQ(errors, "zrmctl: --after: '" + std::string(number) +
+                              "' is no number of an event; zrmctl events --help lists what it "
+                              "takes\n");
+        EXPECT_EQ(run({"events", "--before", number}), CLI_USAGE) << number;
+    }
+    answerWith(R"({"events":[{"id":8}]})");
+    EXPECT_EQ(run({"events", "--json", "--after", "9223372036854775807"}), CLI_DONE);
+    EXPECT_EQ(output, "{\"id\":8}\n");
+}
+
+TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
+    bool isAsked = false;
+    answer = [&](const Request&, Response&) { isAsked = true; };
+    for (const std::vector<std::string>& command :
+         {std::vector<std::string>{"situations", "add", "caf\xe9"},
+          {"situations", "add", "x", "--text", "caf\xe9"},
+          {"explain", "x", "--line", "caf\xe9"},
+          {"report", "/x", "--where", "ENTRYDESC = '\xff'"}}) {
+        EXPECT_EQ(run(command), CLI_USAGE);
+        EXPECT_EQ(errors,
+                  "zrmctl: the command line, or the file that it names, is not valid UTF-8, "
+                  "as the agent's API wants it\n");
+    }
+    EXPECT_FALSE(isAsked);
+}
+
+TEST_F(ProgramTest, OneThingIsExplained) {
+    std::string asked;
+    answer = [&](const Request& request, Response& response) {
+        asked = request.body;
+        response.set_content(R"({"explanations":[{}]})", "application/json");
+    };
+    EXPECT_EQ(run({"explain", "x"}), CLI_DONE);
+    EXPECT_EQ(asked, R"({"situation":"x","last":5})");
+    EXPECT_EQ(run({"explain", "x", "--line", "a b"}), CLI_DONE);
+    EXPECT_EQ(asked, R"({"situation":"x","line":"a b"})");
+    EXPECT_EQ(run({"explain", "x", "--log", "/l", "--last", "7"}), CLI_DONE);
+    EXPECT_EQ(asked, R"({"situation":"x","log":"/l","last":7})");
+    EXPECT_EQ(run({"explain", "x", "--event", "7"}), CLI_DONE);
+    EXPECT_EQ(asked, R"({"situation":"x","event":7})");
+    for (const std::vector<std::string>& both :
+         {std::vector<std::string>{"explain", "x", "--line", "a", "--last", "2"},
+          {"explain", "x", "--event", "1", "--last", "2"},
+          {"explain", "x", "--event", "1", "--log", "/l"}}) {
+        EXPECT_EQ(run(both), CLI_USAGE);
+        EXPECT_THAT(errors, HasSubstr("explain one thing"));
+    }
+}
+
+TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
+    EXPECT_EQ(run({"situations", "bogus"}), CLI_USAGE);
+    EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists what it takes\n"));
+    EXPECT_EQ(run({"situations", "show"}), CLI_USAGE);
+    EXPECT_THAT(errors, EndsWith("; zrmctl situations show --help lists what it takes\n"));
+    EXPECT_EQ(run({"bogus"}), CLI_USAGE);
+    EXPECT_EQ(errors, "zrmctl: 'bogus' is no command; zrmctl --help lists commands and options\n");
+    for (const char* const help : {"-h", "--help"}) {
+        EXPECT_EQ(run({"report", help}), CLI_DONE);
+        EXPECT_THAT(output, HasSubstr("--columns"));
+    }
+}
+
+TEST_F(ProgramTest, ADefinitionWithoutEndIsNotReadForEver) {
+    EXPECT_EQ(run({"backtest", "--file", "/dev/zero"}), CLI_USAGE);
+    EXPECT_EQ(errors, "zrmctl: /dev/zero has more than 16 MiB, which is the most that is read\n");
+    EXPECT_EQ(run({"situations", "add", "x", "--file", directory.path().string()}), CLI_USAGE);
+    EXPECT_EQ(errors, "zrmctl: cannot read " + directory.path().string() + ": Is a directory\n");
+}
+
+TEST_F(ProgramTest, AFileOfCertificatesThatHoldsNoneIsRefused) {
+    const std::string empty = directory.write("empty.pem", "nothing\n");
+    const std::string url = "https://127.0.0.1:1";
+    EXPECT_EQ(run({"--url", url, "--ca-file", empty, "logs"}), CLI_USAGE);
+    EXPECT_EQ(errors, "zrmctl: " + empty + " holds no certificate in PEM\n");
+    const std::string absent = directory.file("absent.pem");
+    EXPECT_EQ(run({"--url", url, "--ca-file", absent, "logs"}), CLI_USAGE);
+    EXPECT_EQ(errors, "zrmctl: cannot read " + absent + ": No such file or directory\n");
+}
+
+} // namespace
