@@ -33,6 +33,31 @@ std::string runnerKey(SituationStatus::Source source, const std::string& name) {
 
 } // namespace
 
+/// The time in which one change of the API keeps the others waiting.
+class SituationSet::Turn {
+public:
+    explicit Turn(SituationSet& set) : m_set(set) {
+        std::unique_lock lock(m_set.m_mutex);
+        m_hasCome =
+            m_set.m_turnEnded.wait_for(lock, patience, [this] { return !m_set.m_isChanging; });
+        m_set.m_isChanging = true;
+    }
+    ~Turn() {
+        if (m_hasCome) {
+            const std::lock_guard guard(m_set.m_mutex);
+            m_set.m_isChanging = false;
+            m_set.m_turnEnded.notify_one();
+        }
+    }
+    Turn(const Turn&) = delete;
+    Turn& operator=(const Turn&) = delete;
+    bool hasCome() const noexcept { return m_hasCome; }
+
+private:
+    SituationSet& m_set;
+    bool m_hasCome = false;
+};
+
 SituationSet::SituationSet(TableManager& entries, EventQueue& queue, std::string storePath)
     : m_store(std::move(storePath)), m_runner(entries, queue) {}
 
@@ -49,6 +74,7 @@ std::string SituationSet::load() {
         record.problem = std::move(made.problem);
     }
     m_stoppedFiles.insert(content.stoppedFiles.begin(), content.stoppedFiles.end());
+    m_keptStopped = m_stoppedFiles;
     return message;
 }
 
@@ -89,6 +115,24 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
         }
     }
     m_runner.settle(patience);
+    keepStoppedFiles();
+}
+
+/// What the file names no more is forgotten for good: not only until the next start.
+void SituationSet::keepStoppedFiles() {
+    TraceScope trace(anchor);
+    const Turn turn(*this);
+    if (!turn.hasCome()) {
+        return; // the change after those that are under way saves it
+    }
+    Draft draft;
+    {
+        const std::lock_guard guard(m_mutex);
+        draft = {m_records, m_stoppedFiles};
+    }
+    if (draft.stoppedFiles != m_keptStopped) {
+        save(draft);
+    }
 }
 
 std::vector<SituationStatus> SituationSet::list() const {
@@ -181,31 +225,6 @@ SituationSet::Change SituationSet::setStopped(const std::string& name, bool isSt
         return key;
     }));
 }
-
-/// The time in which one change of the API keeps the others waiting.
-class SituationSet::Turn {
-public:
-    explicit Turn(SituationSet& set) : m_set(set) {
-        std::unique_lock lock(m_set.m_mutex);
-        m_hasCome =
-            m_set.m_turnEnded.wait_for(lock, patience, [this] { return !m_set.m_isChanging; });
-        m_set.m_isChanging = true;
-    }
-    ~Turn() {
-        if (m_hasCome) {
-            const std::lock_guard guard(m_set.m_mutex);
-            m_set.m_isChanging = false;
-            m_set.m_turnEnded.notify_one();
-        }
-    }
-    Turn(const Turn&) = delete;
-    Turn& operator=(const Turn&) = delete;
-    bool hasCome() const noexcept { return m_hasCome; }
-
-private:
-    SituationSet& m_set;
-    bool m_hasCome = false;
-};
 
 /// Makes the change that `plan` makes to the draft, of the record whose key it returns.
 SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>& plan) {
@@ -331,6 +350,7 @@ std::optional<SituationRefusal> SituationSet::save(const Draft& draft) {
     content.stoppedFiles.assign(draft.stoppedFiles.begin(), draft.stoppedFiles.end());
     const std::string problem = m_store.save(content);
     if (problem.empty()) {
+        m_keptStopped = draft.stoppedFiles;
         return std::nullopt;
     }
     return SituationRefusal{SituationRefusal::NOT_SAVED,

@@ -103,6 +103,7 @@ private:
     Changed change(const std::function<Changed(Draft&)>& plan);
     Changed changeInTurn(const std::function<Changed(Draft&)>& plan);
     std::optional<SituationRefusal> save(const Draft& draft);
+    void keepStoppedFiles();
     Change statusAfter(const Changed& changed) const;
     Change setStopped(const std::string& name, bool isStopped);
     static const Records::value_type* named(const Records& records, const std::string& name);
@@ -114,7 +115,8 @@ private:
     void runAgain(const Key& key, const Record& record);
     SituationStatus statusOf(const Key& key, const Record& record) const;
 
-    SituationStore m_store; ///< used by the change that has its turn
+    SituationStore m_store;              ///< used by the change that has its turn
+    std::set<std::string> m_keptStopped; ///< as the store has m_stoppedFiles; used like it
 
     mutable std::mutex m_mutex; ///< guards what follows; held for moments
     std::condition_variable m_turnEnded;

@@ -134,6 +134,43 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
     EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
 }
 
+TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMoreAfterARestartEither) {
+    set->apply({situation("filed"), situation("other")});
+    set->stop("filed");
+    set->stop("other");
+    set->apply({situation("other")});
+    set->apply({situation("filed"), situation("other")});
+    begin();
+    set->apply({situation("filed"), situation("other")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
+    EXPECT_EQ(set->find("other")->state, SituationStatus::STOPPED);
+}
+
+TEST_F(SituationChanges, AFileThatIsAppliedAgainWritesNothing) {
+    set->apply({situation("filed")});
+    set->stop("filed");
+    const Fault fault("open", EIO);
+    set->apply({situation("filed"), situation("other")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED);
+    EXPECT_THAT(trace.messages(), IsEmpty());
+}
+
+TEST_F(SituationChanges, AFilesSituationIsForgottenAlsoWhenThatCannotBeSaved) {
+    set->apply({situation("filed")});
+    set->stop("filed");
+    {
+        const Fault fault("write", ENOSPC);
+        set->apply({});
+        EXPECT_THAT(trace.messages(), ElementsAre("The situations cannot be saved: cannot write " +
+                                                  directory.file("situations.json.new") +
+                                                  ": No space left on device."));
+    }
+    set->apply({situation("filed")}); // saves what could not be saved then
+    begin();
+    set->apply({situation("filed")});
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
+}
+
 TEST_F(SituationChanges, AreRefusedWithTheReason) {
     set->apply({situation("filed")});
     set->add(situation("a"));
