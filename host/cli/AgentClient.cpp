@@ -1,6 +1,7 @@
 #include "host/cli/AgentClient.h"
 
 #include "host/cli/CliError.h"
+#include "host/cli/InputFile.h"
 #include "host/cli/JsonText.h"
 
 #include <utility>
@@ -38,7 +39,7 @@ public:
         m_client.set_connection_timeout(connectTimeout);
         m_client.set_read_timeout(answerTimeout);
         m_client.set_bearer_token_auth(m_connection.token);
-        trustCertificate();
+        trustAuthorities();
     }
 
     httplib::Client& client() { return m_client; }
@@ -54,9 +55,9 @@ public:
             return {};
         }
         Json body = Json::parse(result->body, nullptr, false);
-        if (body.is_discarded()) {
+        if (!body.is_object()) {
             throw CliError(CLI_UNREACHABLE, "what answers at " + m_connection.url +
-                                                " is no zrmagent: its answer is no JSON");
+                                                " is no zrmagent: its answer is no JSON object");
         }
         return body;
     }
@@ -71,7 +72,9 @@ public:
         case httplib::Error::SSLConnection:
         case httplib::Error::SSLServerVerification:
         case httplib::Error::SSLLoadingCerts:
-            return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts"};
+            return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts for "
+                                             "this address: name the file of its authority, or of "
+                                             "the certificate itself, with --ca-file"};
         case httplib::Error::Read:
             return {CLI_UNREACHABLE, agent + " did not answer: it ended, or it is too busy"};
         default:
@@ -100,14 +103,16 @@ public:
 
 private:
     /// The agent's own certificate may be signed by itself, or by an authority of the house.
-    void trustCertificate() {
+    void trustAuthorities() {
         SSL_CTX* const tls = m_client.ssl_context();
-        if (tls == nullptr || m_connection.certificate.empty()) {
+        if (tls == nullptr || m_connection.authorities.empty()) {
             return;
         }
-        if (SSL_CTX_load_verify_locations(tls, m_connection.certificate.c_str(), nullptr) != 1) {
-            throw CliError(CLI_FORBIDDEN, "cannot read the certificate " +
-                                              m_connection.certificate + " of the agent");
+        for (const std::string& file : m_connection.authorities) {
+            InputFile(file).text(); // tells why it cannot be read, which OpenSSL does not
+            if (SSL_CTX_load_verify_locations(tls, file.c_str(), nullptr) != 1) {
+                throw CliError(CLI_USAGE, file + " holds no certificate in PEM");
+            }
         }
         X509_STORE_set_flags(SSL_CTX_get_cert_store(tls), X509_V_FLAG_PARTIAL_CHAIN);
     }
@@ -130,7 +135,12 @@ Json AgentClient::send(const std::string& method, const std::string& path, const
     request.method = method;
     request.path = path;
     if (!body.is_null()) {
-        request.body = body.dump(-1, ' ', false, Json::error_handler_t::replace);
+        try {
+            request.body = body.dump();
+        } catch (const Json::type_error&) {
+            throw CliError(CLI_USAGE, "the command line, or the file that it names, is not valid "
+                                      "UTF-8, as the agent's API wants it");
+        }
         request.set_header("Content-Type", "application/json");
     }
     return m_implementation->answer(m_implementation->client().send(request));

@@ -154,7 +154,14 @@ Connection Connection::find(const CommonOptions& options) {
         connection.url = checkedUrl(url, "ZRM_URL");
     } else {
         connection.url = urlOf(config);
-        connection.certificate = config.get().http.certificate;
+        if (!config.get().http.certificate.empty()) {
+            connection.authorities.push_back(config.get().http.certificate);
+        }
+    }
+    const std::string authorities =
+        options.caFile.empty() ? variable("ZRM_CA_FILE") : options.caFile;
+    if (!authorities.empty()) {
+        connection.authorities.push_back(authorities);
     }
     const std::string token = trimmed(variable("ZRM_TOKEN"));
     if (options.tokenFile.empty() && !token.empty()) {

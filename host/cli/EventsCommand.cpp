@@ -10,6 +10,10 @@
 #include "host/cli/TimeDisplay.h"
 
 #include <algorithm>
+#include <charconv>
+#include <cstdint>
+#include <optional>
+#include <system_error>
 #include <utility>
 
 #include <CLI/CLI.hpp>
@@ -47,6 +51,19 @@ std::string entryOf(const Json& row) {
 std::string padded(const std::string& text, std::size_t columns) {
     const std::size_t width = DisplayText::width(text);
     return text + std::string(width < columns ? columns - width : 0, ' ');
+}
+
+/// The number of an event; none when it is no such number.
+std::optional<std::int64_t> numberOf(const std::string& text) {
+    std::int64_t number = 0;
+    const char* const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, number);
+    return error == std::errc() && stop == end && number >= 0 ? std::optional(number)
+                                                              : std::nullopt;
+}
+
+std::string problemOfNumber(const std::string& text) {
+    return numberOf(text) ? "" : '\'' + text + "' is no number of an event";
 }
 
 /// One event while following: what comes next is not known, so columns have a width of their own.
@@ -97,10 +114,10 @@ EventsCommand::EventsCommand(CLI::App& program)
     m_command->add_flag("-f,--follow", m_follow, "Go on with new events until Ctrl-C");
     m_command->add_option("--after", m_after, "Events behind this one")
         ->type_name("ID")
-        ->check(CLI::NonNegativeNumber);
+        ->check(problemOfNumber);
     m_command->add_option("--before", m_before, "Events before this one")
         ->type_name("ID")
-        ->check(CLI::NonNegativeNumber);
+        ->check(problemOfNumber);
     m_command->add_option("--from", m_from, "Raised at this time or later")->type_name("TIME");
     m_command->add_option("--to", m_to, "Raised at this time or earlier")->type_name("TIME");
     anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
@@ -168,7 +185,7 @@ int EventsCommand::follow(Context& context) {
     };
     std::uint64_t after = 0;
     if (!m_after.empty()) {
-        after = std::stoull(m_after);
+        after = static_cast<std::uint64_t>(*numberOf(m_after));
     } else {
         query.emplace("limit", std::to_string(m_limit > 0 ? m_limit : usualBeforeFollowing));
         if (!m_from.empty()) {

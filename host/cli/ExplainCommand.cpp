@@ -57,11 +57,11 @@ ExplainCommand::ExplainCommand(CLI::App& program)
     m_command->add_option("SITUATION", m_situation, "The situation's name");
     m_command->add_option("--file", m_file, "A definition as JSON instead of a situation")
         ->type_name("FILE");
-    m_command->add_option("--line", m_line, "A line as it stands in the log of --log")
-        ->type_name("TEXT");
-    m_command->add_option("--log", m_log, "The whole path of a log")->type_name("LOG");
+    m_command->add_option("--line", m_line, "A line as it stands in the log")->type_name("TEXT");
+    m_command->add_option("--log", m_log, "The whole path of a log (default the situation's)")
+        ->type_name("LOG");
     m_command->add_option("--event", m_event, "An event of the history")->type_name("ID");
-    m_command->add_option("--last", m_last, "The last entries of --log (default 5)")
+    m_command->add_option("--last", m_last, "The last entries of the log (default 5)")
         ->type_name("COUNT")
         ->check(CLI::Range(1, 1000));
 }
@@ -74,15 +74,18 @@ Json ExplainCommand::request() const {
     constexpr unsigned usualLast = 5;
     Json body = SituationOptions::subject(m_situation, m_file);
     const bool isEvent = m_event > 0;
-    if (isEvent == !m_log.empty()) {
-        throw CliError(CLI_USAGE, "say what to explain: --event ID, --log LOG with --line TEXT, or "
-                                  "--log LOG with --last COUNT");
+    const int ways = (isEvent ? 1 : 0) + (m_line.empty() ? 0 : 1) + (m_last > 0 ? 1 : 0);
+    if (ways > 1 || (isEvent && !m_log.empty())) {
+        throw CliError(CLI_USAGE, "explain one thing: --event ID, or --line TEXT or --last COUNT "
+                                  "of a log");
     }
     if (isEvent) {
         body["event"] = m_event;
         return body;
     }
-    body["log"] = m_log;
+    if (!m_log.empty()) {
+        body["log"] = m_log;
+    }
     if (m_line.empty()) {
         body["last"] = m_last > 0 ? m_last : usualLast;
     } else {

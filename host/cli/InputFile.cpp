@@ -53,7 +53,8 @@ std::string InputFile::text() {
     int character = EOF;
     while ((character = std::getc(m_stream.get())) != EOF) {
         if (text.size() == kMostText) {
-            throw CliError(CLI_USAGE, m_path + " has more than 16 MiB: that is no configuration");
+            throw CliError(CLI_USAGE,
+                           m_path + " has more than 16 MiB, which is the most that is read");
         }
         text += static_cast<char>(character);
     }

@@ -15,17 +15,31 @@
 #include "host/cli/TraceCommand.h"
 #include "host/cli/TryCommand.h"
 
+#include <new>
+
 #include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
 
 namespace {
 
 /// What is wrong with a command line, with the word that stands where a command should.
 std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
-    const std::vector<std::string> rest = app.remaining();
     if (!app.get_subcommands().empty()) {
         return error.what();
     }
+    const std::vector<std::string> rest = app.remaining();
     return rest.empty() ? "name a command" : '\'' + rest.front() + "' is no command";
+}
+
+/// Where the operator finds what the command takes.
+std::string hintOf(const CLI::App& app) {
+    std::string command = "zrmctl";
+    for (const CLI::App* at = &app; !at->get_subcommands().empty();) {
+        at = at->get_subcommands().front();
+        command += ' ' + at->get_name();
+    }
+    return "; " + command + " --help lists " +
+           (app.get_subcommands().empty() ? "commands and options" : "what it takes");
 }
 
 } // namespace
@@ -33,7 +47,7 @@ std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
 Program::Program()
     : m_app(std::make_unique<CLI::App>("Works with the log-monitoring agent zrmagent.", "zrmctl")) {
     m_app->set_version_flag("--version", "zrmctl " ZRM_VERSION, "Print the version and end");
-    m_app->set_help_flag("--help", "Print this help and end; also behind a command");
+    m_app->set_help_flag("-h,--help", "Print this help and end; also behind a command");
     m_app
         ->add_option("--config", m_options.config,
                      "The agent's configuration (default /etc/zrm/zrm.toml), for address and token")
@@ -41,6 +55,10 @@ Program::Program()
     m_app->add_option("--url", m_options.url, "The agent's address (else ZRM_URL)")
         ->type_name("URL");
     m_app->add_option("--token-file", m_options.tokenFile, "The token's file (else ZRM_TOKEN)")
+        ->type_name("FILE");
+    m_app
+        ->add_option("--ca-file", m_options.caFile,
+                     "Certificates to trust beside the system's (else ZRM_CA_FILE)")
         ->type_name("FILE");
     m_app->add_flag("--json", m_options.json, "Print JSON");
     m_app->fallthrough(); // these options may also stand behind the command
@@ -68,7 +86,7 @@ int Program::run(int argc, const char* const* argv) {
     } catch (const CLI::Success& wish) { // --help, --version
         return m_app->exit(wish);
     } catch (const CLI::ParseError& error) {
-        Context::note(problemOf(*m_app, error) + "; zrmctl --help lists commands and options");
+        Context::note(problemOf(*m_app, error) + hintOf(*m_app));
         return CLI_USAGE;
     }
     try {
@@ -76,6 +94,12 @@ int Program::run(int argc, const char* const* argv) {
     } catch (const CliError& error) {
         Context::note(error.what());
         return error.status();
+    } catch (const nlohmann::json::exception&) {
+        Context::note("what answers is no zrmagent of this version: its answer has another form");
+        return CLI_UNREACHABLE;
+    } catch (const std::bad_alloc&) {
+        Context::note("there is not enough memory for the answer");
+        return CLI_REFUSED;
     }
 }
 

@@ -25,6 +25,25 @@ using Json = JsonText::Json;
 constexpr std::array usualColumns = {"ENTRYTIME", "ENTRYSYS",   "ENTRYSRC",
                                      "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC"};
 
+/// The columns that were asked for, as the report names them. Throws CliError for one that it does
+/// not have.
+std::vector<std::string> chosen(std::vector<std::string> asked, const Json& known) {
+    for (std::string& column : asked) {
+        std::transform(column.begin(), column.end(), column.begin(), [](char c) {
+            return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c;
+        });
+        if (std::find(known.begin(), known.end(), column) == known.end()) {
+            std::string names;
+            for (const Json& name : known) {
+                names += (names.empty() ? "" : ", ") + JsonText::text(name);
+            }
+            throw CliError(CLI_USAGE,
+                           "--columns: '" + column + "' is no column; the columns are " + names);
+        }
+    }
+    return asked;
+}
+
 bool isTime(std::string_view column) {
     return column == "ENTRYTIME" || column == "TIMESTAMP";
 }
@@ -100,12 +119,13 @@ int ReportCommand::run(Context& context) {
                        {"where", m_where}};
     const Json answer = context.client().send("POST", "/api/v1/reports", body);
     const Json& rows = JsonText::member(answer, "rows");
-    std::vector<std::string> columns = m_columns;
+    const Json& known = JsonText::member(answer, "columns");
+    std::vector<std::string> columns = chosen(m_columns, known);
     if (context.options().json || m_format == "json") {
         context.printJson(answer);
     } else if (m_format == "csv") {
         if (columns.empty()) {
-            columns = JsonText::member(answer, "columns").get<std::vector<std::string>>();
+            columns = known.get<std::vector<std::string>>();
         }
         context.print(csvText(rows, columns, context.terminal()));
     } else if (!rows.empty()) {

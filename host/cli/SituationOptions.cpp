@@ -1,9 +1,8 @@
 #include "host/cli/SituationOptions.h"
 
 #include "host/cli/CliError.h"
+#include "host/cli/InputFile.h"
 
-#include <fstream>
-#include <iostream>
 #include <iterator>
 #include <utility>
 
@@ -15,16 +14,7 @@ namespace {
 using Json = SituationOptions::Json;
 
 Json fileContent(const std::string& path) {
-    std::ifstream file;
-    if (path != "-") {
-        file.open(path);
-        if (!file) {
-            throw CliError(CLI_USAGE, "--file: cannot read " + path);
-        }
-    }
-    std::istream& input = path == "-" ? std::cin : file;
-    const std::string text((std::istreambuf_iterator<char>(input)), {});
-    Json value = Json::parse(text, nullptr, false);
+    Json value = Json::parse(InputFile(path).text(), nullptr, false);
     if (!value.is_object()) {
         throw CliError(CLI_USAGE, "--file: " + path +
                                       " holds no JSON object; 'zrmctl situations show NAME "

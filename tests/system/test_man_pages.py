@@ -75,7 +75,7 @@ def test_every_command_of_the_client_with_its_options():
     parts = {heading.split()[0]: part for heading, part in sections("zrmctl.1").items()}
     for command in commands:
         options, _ = help_of(CLIENT, command)
-        assert items(parts[command]) >= options - {"--help"}, command
+        assert items(parts[command]) >= options - {"-h", "--help"}, command
 
 
 def test_every_action_on_situations_with_its_options():
@@ -85,7 +85,7 @@ def test_every_action_on_situations_with_its_options():
     assert items(part) >= actions - {"list"}
     for action in actions:
         options, _ = help_of(CLIENT, "situations", action)
-        assert items(part) >= options - {"--help"}, action
+        assert items(part) >= options - {"-h", "--help"}, action
 
 
 def test_the_page_names_no_option_that_is_not_there():

@@ -11,6 +11,7 @@ import os
 import pty
 import re
 import shutil
+import signal
 import socket
 import struct
 import subprocess
@@ -353,3 +354,54 @@ def test_the_certificate_of_the_configuration_is_trusted(agent):
     url = "https://" + agent.listen.replace("0.0.0.0", "127.0.0.1")
     code, _, errors = run(["logs", "--url", url, "--token-file", str(token)])
     assert code == 3 and "shows no certificate that this machine trusts" in errors
+    assert errors.endswith(", with --ca-file\n")
+    by_hand = ["logs", "--url", url, "--token-file", str(token)]
+    code, output, errors = run([*by_hand, "--ca-file", str(certificate)])
+    assert (code, errors) == (0, "") and "app.log" in output
+    assert run(by_hand, ZRM_CA_FILE=str(certificate))[0] == 0
+    other, _ = make_certificate(agent.directory, "other")
+    assert run([*by_hand, "--ca-file", str(other)], ZRM_CA_FILE=str(certificate))[0] == 3
+    # The name that is asked for must be one of the certificate's.
+    code, _, errors = run([*by_hand[:2], url.replace("127.0.0.1", "127.0.0.2"), *by_hand[3:],
+                           "--ca-file", str(certificate)])  # fmt: skip
+    assert code == 3 and "trusts for this address" in errors
+
+
+def test_an_authority_of_the_house_is_trusted_when_it_is_named(agent):
+    directory = agent.directory
+    openssl = lambda *words: subprocess.run(
+        ["openssl", *map(str, words)], check=True, capture_output=True
+    )
+    request = ("-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:prime256v1", "-nodes")
+    openssl("req", "-x509", *request, "-subj", "/CN=House", "-days", "2",
+            "-keyout", directory / "ca.key", "-out", directory / "ca.pem")  # fmt: skip
+    openssl("req", *request, "-subj", "/CN=agent", "-keyout", directory / "a.key",
+            "-out", directory / "a.csr")  # fmt: skip
+    (directory / "names").write_text("subjectAltName=IP:127.0.0.1\n")
+    openssl("x509", "-req", "-in", directory / "a.csr", "-CA", directory / "ca.pem", "-CAkey",
+            directory / "ca.key", "-CAcreateserial", "-days", "2", "-extfile", directory / "names",
+            "-out", directory / "a.pem")  # fmt: skip
+    agent.log()
+    agent.listen = f"0.0.0.0:{free_port()}"
+    agent.http_keys = {"certificate": directory / "a.pem", "key": directory / "a.key"}
+    agent.start()
+    url = "https://" + agent.listen.replace("0.0.0.0", "127.0.0.1")
+    arguments = ["logs", "--url", url, "--token-file", str(directory / "state" / "api-token")]
+    assert run(arguments)[0] == 3
+    code, output, errors = run([*arguments, "--ca-file", str(directory / "ca.pem")])
+    assert (code, errors) == (0, "") and "app.log" in output
+    assert agent.stop() == 0
+
+
+@pytest.mark.parametrize("command", ["report LOG", "report LOG --format csv", "events --limit 1000"])
+def test_a_pipe_that_is_closed_early_ends_it_quietly(watched, command):
+    agent, log, text, _ = watched
+    arguments = [*arguments_of(command, log, text), "--config", str(agent.zrm_toml)]
+    reading, writing = os.pipe()
+    os.close(reading)
+    done = subprocess.run(
+        [ZRMCTL, *arguments], stdout=writing, stderr=subprocess.PIPE, env=environment(),
+        timeout=PATIENCE, preexec_fn=lambda: signal.signal(signal.SIGPIPE, signal.SIG_DFL),
+    )  # fmt: skip
+    os.close(writing)
+    assert (done.returncode, done.stderr) == (-signal.SIGPIPE, b"")

@@ -147,7 +147,7 @@ def test_what_cannot_be_checked(tmp_path):
     )
     assert run("check", "-", given=b"#" * (16 * 1024 * 1024 + 1), status=2) == (
         "",
-        "zrmctl: - has more than 16 MiB: that is no configuration\n",
+        "zrmctl: - has more than 16 MiB, which is the most that is read\n",
     )
 
 

@@ -97,7 +97,7 @@ TEST_F(AgentClientTest, ATokenThatIsNotAcceptedIsTold) {
 TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsTold) {
     answer(200, "<html>");
     expectAnswer(CLI_UNREACHABLE,
-                 "what answers at " + url + " is no zrmagent: its answer is no JSON");
+                 "what answers at " + url + " is no zrmagent: its answer is no JSON object");
 }
 
 TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {

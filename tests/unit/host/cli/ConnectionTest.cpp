@@ -15,6 +15,7 @@ protected:
     void SetUp() override {
         unsetenv("ZRM_URL");
         unsetenv("ZRM_TOKEN");
+        unsetenv("ZRM_CA_FILE");
         options.config = directory.file("zrm.toml");
         write("api-token", "secret-of-the-configuration\n");
         write("zrm.toml", "state_directory = \"" + directory.path().string() +
@@ -23,6 +24,7 @@ protected:
     void TearDown() override {
         unsetenv("ZRM_URL");
         unsetenv("ZRM_TOKEN");
+        unsetenv("ZRM_CA_FILE");
     }
     std::string write(const std::string& name, const std::string& text) const {
         return directory.write(name, text);
@@ -76,6 +78,21 @@ TEST_F(ConnectionTest, OptionsGoBeforeTheEnvironment) {
     const Connection connection = Connection::find(options);
     EXPECT_EQ(connection.url, "https://logs.example.org:7186");
     EXPECT_EQ(connection.token, "secret-of-mine");
+}
+
+TEST_F(ConnectionTest, CertificatesAreTrustedBesideThatOfTheConfiguration) {
+    EXPECT_TRUE(Connection::find(options).authorities.empty());
+    options.caFile = "/of/the/option.pem";
+    setenv("ZRM_CA_FILE", "/of/the/environment.pem", 1);
+    using Files = std::vector<std::string>;
+    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/option.pem"});
+    options.caFile.clear();
+    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/environment.pem"});
+    write("zrm.toml", "state_directory = \"" + directory.path().string() +
+                          "\"\n[http]\ncertificate = \"/a.pem\"\nkey = \"/a.key\"\n");
+    EXPECT_EQ(Connection::find(options).authorities, (Files{"/a.pem", "/of/the/environment.pem"}));
+    options.url = "https://logs.example.org"; // not the configuration's agent
+    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/environment.pem"});
 }
 
 TEST_F(ConnectionTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
