@@ -19,6 +19,7 @@
 #include <memory>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 namespace {
@@ -266,6 +267,44 @@ TEST_F(SituationChanges, ThereIsAMostNumber) {
               "there are 1000 situations made through the API: remove one first");
     EXPECT_FALSE(set->remove("s0"));
     EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
+}
+
+TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) {
+    const std::vector<SituationConfig> both = {situation("a", {"ENTRYSRC = 'never'"}),
+                                               situation("b", {"ENTRYSRC = 'never'"})};
+    set->apply(both);
+    std::vector<std::thread> threads;
+    threads.emplace_back([&] {
+        for (int round = 0; round < 30; ++round) {
+            set->apply(round % 3 == 0 ? std::vector{both[0]} : both);
+        }
+    });
+    for (const char* const name : {"a", "b"}) {
+        threads.emplace_back([&, name] {
+            for (int round = 0; round < 30; ++round) {
+                set->stop(name); // or the file does not name it
+                if (round % 2 == 0) {
+                    set->start(name);
+                }
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    set->apply(both);
+    const auto states = [&] {
+        std::vector<std::pair<std::string, SituationStatus::State>> found;
+        for (const SituationStatus& status : set->list()) {
+            found.emplace_back(status.config.name, status.state);
+        }
+        return found;
+    };
+    const auto inForce = states();
+    begin();
+    set->apply(both);
+    EXPECT_EQ(states(), inForce);
+    EXPECT_EQ(inForce.size(), 2u);
 }
 
 TEST_F(SituationChanges, MayBeAskedForByManyThreadsWhileEntriesArrive) {
