@@ -1,4 +1,4 @@
-#include "host/cli/Connection.h"
+#include "host/cli/AgentAccess.h"
 
 #include "agent/ErrorText.h"
 #include "host/cli/CliError.h"
@@ -95,13 +95,16 @@ std::string checkedUrl(const std::string& written, const std::string& source) {
     while (url.ends_with('/')) {
         url.pop_back();
     }
-    if (url.starts_with("https://") && url.size() > 8) {
+    constexpr std::string_view secret = "https://";
+    if (url.starts_with(secret) && url.size() > secret.size() &&
+        url.find_first_of("/?#@ \t", secret.size()) == std::string::npos) {
         return url;
     }
     constexpr std::string_view plain = "http://";
     const std::string address = url.starts_with(plain) ? url.substr(plain.size()) : "";
+    const bool hasPort = address.rfind(':') != std::string::npos && !address.ends_with(']');
     const std::optional<ListenAddress> host =
-        ListenAddress::parse(address.rfind(':') == std::string::npos ? address + ":80" : address);
+        ListenAddress::parse(hasPort ? address : address + ":80");
     if (!host) {
         throw CliError(CLI_USAGE, source + ": '" + written +
                                       "' is no address; write it as "
@@ -145,32 +148,31 @@ std::string tokenFileOf(AgentConfig& config) {
 
 } // namespace
 
-Connection Connection::find(const CommonOptions& options) {
+AgentAccess AgentAccess::find(const CommonOptions& options) {
     AgentConfig config(options.config);
-    Connection connection;
+    AgentAccess found;
     if (!options.url.empty()) {
-        connection.url = checkedUrl(options.url, "--url");
+        found.url = checkedUrl(options.url, "--url");
     } else if (const std::string url = variable("ZRM_URL"); !url.empty()) {
-        connection.url = checkedUrl(url, "ZRM_URL");
+        found.url = checkedUrl(url, "ZRM_URL");
     } else {
-        connection.url = urlOf(config);
+        found.url = urlOf(config);
         if (!config.get().http.certificate.empty()) {
-            connection.authorities.push_back(config.get().http.certificate);
+            found.authorities.push_back(config.get().http.certificate);
         }
     }
     const std::string authorities =
         options.caFile.empty() ? variable("ZRM_CA_FILE") : options.caFile;
     if (!authorities.empty()) {
-        connection.authorities.push_back(authorities);
+        found.authorities.push_back(authorities);
     }
     const std::string token = trimmed(variable("ZRM_TOKEN"));
     if (options.tokenFile.empty() && !token.empty()) {
-        connection.token = token;
-        connection.tokenSource = "ZRM_TOKEN";
+        found.token = token;
+        found.tokenSource = "ZRM_TOKEN";
     } else {
-        connection.tokenSource =
-            options.tokenFile.empty() ? tokenFileOf(config) : options.tokenFile;
-        connection.token = readToken(connection.tokenSource);
+        found.tokenSource = options.tokenFile.empty() ? tokenFileOf(config) : options.tokenFile;
+        found.token = readToken(found.tokenSource);
     }
-    return connection;
+    return found;
 }

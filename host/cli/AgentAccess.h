@@ -1,5 +1,5 @@
-#ifndef ZRM_HOST_CONNECTION_H
-#define ZRM_HOST_CONNECTION_H
+#ifndef ZRM_HOST_AGENT_ACCESS_H
+#define ZRM_HOST_AGENT_ACCESS_H
 
 #include <string>
 #include <vector>
@@ -14,7 +14,7 @@ struct CommonOptions {
 };
 
 /// Where the agent is, and the token that it wants.
-struct Connection {
+struct AgentAccess {
     std::string url; ///< "http://127.0.0.1:7186", without a slash at its end
     std::string token;
     std::string tokenSource; ///< where the token was found, for messages
@@ -26,7 +26,7 @@ struct Connection {
     /// `--ca-file` or ZRM_CA_FILE, and the certificate of a configuration that names the address.
     /// Throws CliError when there is no address or token, or when the token would travel
     /// unencrypted to another machine.
-    static Connection find(const CommonOptions& options);
+    static AgentAccess find(const CommonOptions& options);
 };
 
 #endif

@@ -34,11 +34,11 @@ std::string withQuery(const std::string& path, const AgentClient::Query& query) 
 
 class AgentClient::Implementation {
 public:
-    explicit Implementation(Connection connection)
-        : m_connection(std::move(connection)), m_client(m_connection.url) {
+    explicit Implementation(AgentAccess access)
+        : m_access(std::move(access)), m_client(m_access.url) {
         m_client.set_connection_timeout(connectTimeout);
         m_client.set_read_timeout(answerTimeout);
-        m_client.set_bearer_token_auth(m_connection.token);
+        m_client.set_bearer_token_auth(m_access.token);
         trustAuthorities();
     }
 
@@ -56,14 +56,14 @@ public:
         }
         Json body = Json::parse(result->body, nullptr, false);
         if (!body.is_object()) {
-            throw CliError(CLI_UNREACHABLE, "what answers at " + m_connection.url +
+            throw CliError(CLI_UNREACHABLE, "what answers at " + m_access.url +
                                                 " is no zrmagent: its answer is no JSON object");
         }
         return body;
     }
 
     CliError unreachable(httplib::Error error) const {
-        const std::string agent = "the agent at " + m_connection.url;
+        const std::string agent = "the agent at " + m_access.url;
         switch (error) {
         case httplib::Error::Connection:
             return {CLI_UNREACHABLE, "cannot reach " + agent +
@@ -85,15 +85,15 @@ public:
 
     CliError refused(int status, const std::string& body) const {
         if (status == 401) {
-            return {CLI_FORBIDDEN, "the agent at " + m_connection.url +
-                                       " does not accept the token of " + m_connection.tokenSource +
+            return {CLI_FORBIDDEN, "the agent at " + m_access.url +
+                                       " does not accept the token of " + m_access.tokenSource +
                                        ": name the agent's own with --token-file or --config"};
         }
         const Json problem = Json::parse(body, nullptr, false);
         std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
         if (text.empty()) {
-            text = "the agent at " + m_connection.url + " answered with status " +
-                   std::to_string(status);
+            text =
+                "the agent at " + m_access.url + " answered with status " + std::to_string(status);
         }
         const std::string field = problem.is_discarded() ? "" : JsonText::text(problem, "field");
         constexpr int unavailable = 503;
@@ -105,10 +105,10 @@ private:
     /// The agent's own certificate may be signed by itself, or by an authority of the house.
     void trustAuthorities() {
         SSL_CTX* const tls = m_client.ssl_context();
-        if (tls == nullptr || m_connection.authorities.empty()) {
+        if (tls == nullptr || m_access.authorities.empty()) {
             return;
         }
-        for (const std::string& file : m_connection.authorities) {
+        for (const std::string& file : m_access.authorities) {
             InputFile(file).text(); // tells why it cannot be read, which OpenSSL does not
             if (SSL_CTX_load_verify_locations(tls, file.c_str(), nullptr) != 1) {
                 throw CliError(CLI_USAGE, file + " holds no certificate in PEM");
@@ -117,12 +117,12 @@ private:
         X509_STORE_set_flags(SSL_CTX_get_cert_store(tls), X509_V_FLAG_PARTIAL_CHAIN);
     }
 
-    const Connection m_connection;
+    const AgentAccess m_access;
     httplib::Client m_client;
 };
 
-AgentClient::AgentClient(Connection connection)
-    : m_implementation(std::make_unique<Implementation>(std::move(connection))) {}
+AgentClient::AgentClient(AgentAccess access)
+    : m_implementation(std::make_unique<Implementation>(std::move(access))) {}
 
 AgentClient::~AgentClient() = default;
 

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_AGENT_CLIENT_H
 #define ZRM_HOST_AGENT_CLIENT_H
 
-#include "host/cli/Connection.h"
+#include "host/cli/AgentAccess.h"
 
 #include <atomic>
 #include <functional>
@@ -19,7 +19,7 @@ public:
     using Json = nlohmann::ordered_json;
     using Query = std::multimap<std::string, std::string>;
 
-    explicit AgentClient(Connection connection);
+    explicit AgentClient(AgentAccess access);
     AgentClient(const AgentClient&) = delete;
     AgentClient& operator=(const AgentClient&) = delete;
     ~AgentClient();

@@ -19,16 +19,16 @@ Context::Context(const CommonOptions& options, const Terminal& terminal)
 
 Context::~Context() = default;
 
-const Connection& Context::connection() {
-    if (m_connection == nullptr) {
-        m_connection = std::make_unique<Connection>(Connection::find(m_options));
+const AgentAccess& Context::access() {
+    if (m_access == nullptr) {
+        m_access = std::make_unique<AgentAccess>(AgentAccess::find(m_options));
     }
-    return *m_connection;
+    return *m_access;
 }
 
 AgentClient& Context::client() {
     if (m_client == nullptr) {
-        m_client = std::make_unique<AgentClient>(connection());
+        m_client = std::make_unique<AgentClient>(access());
     }
     return *m_client;
 }

@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_CLI_CONTEXT_H
 #define ZRM_HOST_CLI_CONTEXT_H
 
+#include "host/cli/AgentAccess.h"
 #include "host/cli/AgentClient.h"
-#include "host/cli/Connection.h"
 #include "host/cli/Terminal.h"
 
 #include <memory>
@@ -20,7 +20,7 @@ public:
 
     /// The agent; its address and token are found at the first call. Throws CliError.
     AgentClient& client();
-    const Connection& connection();
+    const AgentAccess& access();
 
     /// Writes to standard output at once. Throws CliError when it cannot be written.
     void print(std::string_view text) const;
@@ -35,7 +35,7 @@ public:
 private:
     const CommonOptions& m_options;
     Terminal m_terminal;
-    std::unique_ptr<Connection> m_connection;
+    std::unique_ptr<AgentAccess> m_access;
     std::unique_ptr<AgentClient> m_client;
 };
 

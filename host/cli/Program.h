@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_CLI_PROGRAM_H
 #define ZRM_HOST_CLI_PROGRAM_H
 
+#include "host/cli/AgentAccess.h"
 #include "host/cli/Command.h"
-#include "host/cli/Connection.h"
 
 #include <memory>
 #include <vector>

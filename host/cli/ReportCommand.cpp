@@ -13,6 +13,7 @@
 #include <array>
 #include <iterator>
 #include <string_view>
+#include <utility>
 
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
@@ -42,6 +43,19 @@ std::vector<std::string> chosen(std::vector<std::string> asked, const Json& know
         }
     }
     return asked;
+}
+
+/// The answer with these columns alone.
+Json withColumns(Json answer, const std::vector<std::string>& columns) {
+    answer["columns"] = columns;
+    for (Json& row : answer["rows"]) {
+        Json chosen = Json::object();
+        for (const std::string& column : columns) {
+            chosen[column] = JsonText::member(row, column);
+        }
+        row = std::move(chosen);
+    }
+    return answer;
 }
 
 bool isTime(std::string_view column) {
@@ -122,7 +136,7 @@ int ReportCommand::run(Context& context) {
     const Json& known = JsonText::member(answer, "columns");
     std::vector<std::string> columns = chosen(m_columns, known);
     if (context.options().json || m_format == "json") {
-        context.printJson(answer);
+        context.printJson(columns.empty() ? answer : withColumns(answer, columns));
     } else if (m_format == "csv") {
         if (columns.empty()) {
             columns = known.get<std::vector<std::string>>();

@@ -1,4 +1,4 @@
-#include "host/cli/Connection.h"
+#include "host/cli/AgentAccess.h"
 
 #include "host/cli/CliError.h"
 #include "support/TemporaryDirectory.h"
@@ -10,7 +10,7 @@
 
 namespace {
 
-class ConnectionTest : public testing::Test {
+class AgentAccessTest : public testing::Test {
 protected:
     void SetUp() override {
         unsetenv("ZRM_URL");
@@ -31,7 +31,7 @@ protected:
     }
     void expectError(CliStatus status, const std::string& text) const {
         try {
-            Connection::find(options);
+            AgentAccess::find(options);
             FAIL() << "no error";
         } catch (const CliError& error) {
             EXPECT_EQ(error.status(), status);
@@ -45,57 +45,57 @@ protected:
 
 } // namespace
 
-TEST_F(ConnectionTest, TheConfigurationNamesAddressAndToken) {
-    const Connection connection = Connection::find(options);
+TEST_F(AgentAccessTest, TheConfigurationNamesAddressAndToken) {
+    const AgentAccess connection = AgentAccess::find(options);
     EXPECT_EQ(connection.url, "http://127.0.0.1:7186");
     EXPECT_EQ(connection.token, "secret-of-the-configuration");
     EXPECT_EQ(connection.tokenSource, directory.file("api-token"));
 }
 
-TEST_F(ConnectionTest, ATokenFileOfTheConfigurationIsRead) {
+TEST_F(AgentAccessTest, ATokenFileOfTheConfigurationIsRead) {
     const std::string token = write("other", "secret-of-another-file");
     write("zrm.toml", "[http]\nlisten = \"[::1]:80\"\ntoken_file = \"" + token + "\"\n");
-    const Connection connection = Connection::find(options);
+    const AgentAccess connection = AgentAccess::find(options);
     EXPECT_EQ(connection.url, "http://[::1]:80");
     EXPECT_EQ(connection.token, "secret-of-another-file");
 }
 
-TEST_F(ConnectionTest, TheEnvironmentGoesBeforeTheConfiguration) {
+TEST_F(AgentAccessTest, TheEnvironmentGoesBeforeTheConfiguration) {
     setenv("ZRM_URL", "http://localhost:99/", 1);
     setenv("ZRM_TOKEN", "secret-of-the-environment\n", 1);
     options.config = directory.file("absent.toml"); // not needed
-    const Connection connection = Connection::find(options);
+    const AgentAccess connection = AgentAccess::find(options);
     EXPECT_EQ(connection.url, "http://localhost:99");
     EXPECT_EQ(connection.token, "secret-of-the-environment");
     EXPECT_EQ(connection.tokenSource, "ZRM_TOKEN");
 }
 
-TEST_F(ConnectionTest, OptionsGoBeforeTheEnvironment) {
+TEST_F(AgentAccessTest, OptionsGoBeforeTheEnvironment) {
     setenv("ZRM_URL", "http://localhost:99", 1);
     setenv("ZRM_TOKEN", "secret-of-the-environment", 1);
     options.url = "https://logs.example.org:7186";
     options.tokenFile = write("mine", "secret-of-mine");
-    const Connection connection = Connection::find(options);
+    const AgentAccess connection = AgentAccess::find(options);
     EXPECT_EQ(connection.url, "https://logs.example.org:7186");
     EXPECT_EQ(connection.token, "secret-of-mine");
 }
 
-TEST_F(ConnectionTest, CertificatesAreTrustedBesideThatOfTheConfiguration) {
-    EXPECT_TRUE(Connection::find(options).authorities.empty());
+TEST_F(AgentAccessTest, CertificatesAreTrustedBesideThatOfTheConfiguration) {
+    EXPECT_TRUE(AgentAccess::find(options).authorities.empty());
     options.caFile = "/of/the/option.pem";
     setenv("ZRM_CA_FILE", "/of/the/environment.pem", 1);
     using Files = std::vector<std::string>;
-    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/option.pem"});
+    EXPECT_EQ(AgentAccess::find(options).authorities, Files{"/of/the/option.pem"});
     options.caFile.clear();
-    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/environment.pem"});
+    EXPECT_EQ(AgentAccess::find(options).authorities, Files{"/of/the/environment.pem"});
     write("zrm.toml", "state_directory = \"" + directory.path().string() +
                           "\"\n[http]\ncertificate = \"/a.pem\"\nkey = \"/a.key\"\n");
-    EXPECT_EQ(Connection::find(options).authorities, (Files{"/a.pem", "/of/the/environment.pem"}));
+    EXPECT_EQ(AgentAccess::find(options).authorities, (Files{"/a.pem", "/of/the/environment.pem"}));
     options.url = "https://logs.example.org"; // not the configuration's agent
-    EXPECT_EQ(Connection::find(options).authorities, Files{"/of/the/environment.pem"});
+    EXPECT_EQ(AgentAccess::find(options).authorities, Files{"/of/the/environment.pem"});
 }
 
-TEST_F(ConnectionTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
+TEST_F(AgentAccessTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
     options.url = "http://logs.example.org:7186";
     expectError(CLI_USAGE, "--url: the token would reach logs.example.org unencrypted; use https, "
                            "or an SSH tunnel");
@@ -106,25 +106,36 @@ TEST_F(ConnectionTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
         "ZRM_URL: the token would reach 192.0.2.7 unencrypted; use https, or an SSH tunnel");
 }
 
-TEST_F(ConnectionTest, WhatIsNoAddressIsRefused) {
-    for (const char* const url : {"localhost:7186", "http://", "ftp://localhost", "http://a b:1"}) {
+TEST_F(AgentAccessTest, APortMayBeLeftOut) {
+    options.tokenFile = write("mine", "secret");
+    for (const char* const url : {"http://[::1]", "http://localhost", "https://logs.example.org",
+                                  "https://[2001:db8::1]"}) {
+        options.url = url;
+        EXPECT_EQ(AgentAccess::find(options).url, url);
+    }
+}
+
+TEST_F(AgentAccessTest, WhatIsNoAddressIsRefused) {
+    for (const char* const url :
+         {"localhost:7186", "http://", "ftp://localhost", "http://a b:1", "https://", "https://a b",
+          "https://a/path", "https://user@a", "http://localhost/path", "http://[::1"}) {
         options.url = url;
         expectError(CLI_USAGE, "--url: '" + std::string(url) +
                                    "' is no address; write it as http://127.0.0.1:7186");
     }
 }
 
-TEST_F(ConnectionTest, AMissingConfigurationIsTold) {
+TEST_F(AgentAccessTest, AMissingConfigurationIsTold) {
     options.config = directory.file("absent.toml");
     expectError(CLI_USAGE, options.config +
                                " does not exist: name the agent's configuration with --config, or "
                                "its address with --url");
 }
 
-TEST_F(ConnectionTest, EveryProblemOfTheConfigurationIsTold) {
+TEST_F(AgentAccessTest, EveryProblemOfTheConfigurationIsTold) {
     write("zrm.toml", "[agnt]\n[http]\nlisten = 5\n");
     try {
-        Connection::find(options);
+        AgentAccess::find(options);
         FAIL() << "no error";
     } catch (const CliError& error) {
         EXPECT_EQ(error.status(), CLI_USAGE);
@@ -134,26 +145,26 @@ TEST_F(ConnectionTest, EveryProblemOfTheConfigurationIsTold) {
     }
 }
 
-TEST_F(ConnectionTest, AConfigurationWithoutHttpHasNoAddress) {
+TEST_F(AgentAccessTest, AConfigurationWithoutHttpHasNoAddress) {
     write("zrm.toml", "");
     expectError(CLI_USAGE, options.config + " switches HTTP off: give [http] a listen address, or "
                                             "name the address with --url");
 }
 
-TEST_F(ConnectionTest, AnOpenPortIsNoAddress) {
+TEST_F(AgentAccessTest, AnOpenPortIsNoAddress) {
     write("zrm.toml", "[http]\nlisten = \"127.0.0.1:0\"\n");
     expectError(CLI_USAGE, options.config + " leaves the port open: name the address that the "
                                             "agent told with --url");
 }
 
-TEST_F(ConnectionTest, AMissingTokenIsTold) {
+TEST_F(AgentAccessTest, AMissingTokenIsTold) {
     options.tokenFile = directory.file("absent");
     expectError(CLI_FORBIDDEN, "cannot read the token " + options.tokenFile +
                                    ": No such file or directory; the agent makes it when it starts "
                                    "with HTTP");
 }
 
-TEST_F(ConnectionTest, AFileThatHoldsNoTokenIsTold) {
+TEST_F(AgentAccessTest, AFileThatHoldsNoTokenIsTold) {
     options.tokenFile = write("two-lines", "one\ntwo\n");
     expectError(CLI_FORBIDDEN,
                 options.tokenFile + " holds no token: one line of visible characters");

@@ -112,6 +112,8 @@ TEST_F(ProgramTest, AColumnThatAReportHasNotIsRefused) {
                       "ENTRYDESC\n");
     EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CLI_DONE);
     EXPECT_EQ(output, "ENTRYDESC\r\n\"a, b\"\r\n");
+    EXPECT_EQ(run({"report", "/x", "--json", "--columns", "ENTRYDESC"}), CLI_DONE);
+    EXPECT_EQ(output, "{\"columns\":[\"ENTRYDESC\"],\"rows\":[{\"ENTRYDESC\":\"a, b\"}]}\n");
 }
 
 TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {

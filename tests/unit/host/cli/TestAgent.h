@@ -1,7 +1,7 @@
 #ifndef TEST_AGENT_H
 #define TEST_AGENT_H
 
-#include "host/cli/Connection.h"
+#include "host/cli/AgentAccess.h"
 
 #include <memory>
 #include <string>
@@ -34,7 +34,7 @@ public:
         }
         m_server = std::make_unique<httplib::Server>();
     }
-    Connection connection() const {
+    AgentAccess connection() const {
         return {"http://127.0.0.1:" + std::to_string(m_port), "the-token", "its file"};
     }
 
