@@ -175,6 +175,12 @@ class Page:
             "Emulation.setEmulatedMedia", {"features": [{"name": "prefers-color-scheme", "value": name}]}
         )
 
+    def settle(self):
+        """Waits until what has changed is drawn."""
+        if self.all("canvas"):
+            time.sleep(0.15)  # a chart is drawn anew for its size and colours
+        self.driver.execute_async_script("requestAnimationFrame(() => requestAnimationFrame(arguments[0]))")
+
     def pictures(self, name):
         """Both widths in both colour schemes; each must fit its width."""
         PICTURES.mkdir(parents=True, exist_ok=True)
@@ -182,7 +188,7 @@ class Page:
             self.size(width)
             for scheme in ("light", "dark"):
                 self.scheme(scheme)
-                time.sleep(0.15)  # a chart is drawn anew for its size and colours
+                self.settle()
                 self.driver.save_screenshot(str(PICTURES / f"{name}-{width}-{scheme}.png"))
                 wide = self.run("return document.documentElement.scrollWidth")
                 assert wide <= width, f"{name} is {wide} pixels wide at {width}"
@@ -248,8 +254,11 @@ def page(driver, agent):
 
 @pytest.fixture
 def fast_polls(driver):
-    """Views ask ten times as often."""
-    source = "const plain = setInterval; window.setInterval = (action, time) => plain(action, time / 10);"
+    """Views ask ten times as often, and what is lost is looked for as often."""
+    source = (
+        "const plain = setInterval; window.setInterval = (action, time) => plain(action, time / 10);"
+        "const once = setTimeout; window.setTimeout = (action, time) => once(action, time < 1000 ? time : time / 10);"
+    )
     made = driver.execute_cdp_cmd("Page.addScriptToEvaluateOnNewDocument", {"source": source})
     yield
     driver.execute_cdp_cmd("Page.removeScriptToEvaluateOnNewDocument", made)

@@ -58,7 +58,7 @@ def test_the_first_view_is_small_and_runs_only_files_of_its_own(page, agent):
     assert any("Content Security Policy" in message for message in page.console_errors())
 
 
-def test_a_lost_connection_shows_and_comes_back(page, agent):
+def test_a_lost_connection_shows_and_comes_back(page, agent, fast_polls):
     logs = logs_agent(agent)
     page.on(agent)
     page.wait_text("Connected")
@@ -107,7 +107,7 @@ def test_the_way_back_leads_to_what_was_seen(page, agent):
 # ---------------------------------------------------------------------- logs
 
 
-def test_logs_tell_trouble_first_and_why(page, agent):
+def test_logs_tell_trouble_first_and_why(page, agent, fast_polls):
     _, app = logs_agent(agent)
     app.append("2026-11-20 07:03:09 ERROR fine\nthis does not fit\n")
     page.on(agent)
@@ -183,7 +183,7 @@ def test_events_come_live_pause_and_open(page, agent):
     page.pictures("events")
 
 
-def test_events_resume_where_they_were_after_a_lost_connection(page, agent):
+def test_events_resume_where_they_were_after_a_lost_connection(page, agent, fast_polls):
     auth, app = logs_agent(agent)
     page.on(agent, "events")
     page.wait_live()
@@ -252,7 +252,7 @@ def test_ten_thousand_live_events_do_not_slow_the_page(page, agent):
 # ---------------------------------------------------------------------- situations
 
 
-def test_a_situation_is_made_changed_stopped_started_and_deleted(page, agent):
+def test_a_situation_is_made_changed_stopped_started_and_deleted(page, agent, fast_polls):
     auth, _ = logs_agent(agent)
     page.on(agent, "situations")
     page.wait_text("ssh-failed")

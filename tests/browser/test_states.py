@@ -36,7 +36,7 @@ def test_without_a_history_the_views_say_so_and_what_to_do(page, agent):
 # ---------------------------------------------------------------------- too many clients
 
 
-def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent):
+def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent, fast_polls):
     auth, _ = logs_agent(agent)
     page.on(agent)
     page.wait_text("Connected")
@@ -268,12 +268,13 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     page.on(agent)
     views = {"logs": "Raised lately", "situations": "declined", "situations?name=declined": "Its events", "reports": "Run the report", "try": "of the lines fit"}
     views[f"logs?log={quote(str(log))}"] = "Monitored since"
-    for width in (360, 1280):
-        page.size(width)
-        for view, text in views.items():
-            page.open(view)
-            page.wait_text(text)
-            page.find("//h1")
+    for view, text in views.items():
+        page.open(view)
+        page.wait_text(text)
+        page.find("//h1")
+        for width in (360, 800, 1280):
+            page.size(width)
+            page.settle()
             assert page.run(BEYOND) == [], f"{view} at {width}"
     page.open("logs")
     page.wait_text("transactions_and_settlements.log")
@@ -334,7 +335,7 @@ def test_a_log_that_is_not_monitored_says_why_until_it_is(page, agent, fast_poll
 # ---------------------------------------------------------------------- another agent behind the same address
 
 
-def test_events_begin_anew_with_a_new_history(page, agent):
+def test_events_begin_anew_with_a_new_history(page, agent, fast_polls):
     auth, app = logs_agent(agent)
     page.on(agent, "events")
     page.wait_live()
@@ -352,7 +353,7 @@ def test_events_begin_anew_with_a_new_history(page, agent):
     page.expect_complaints()
 
 
-def test_a_new_token_is_asked_for_and_the_view_goes_on(page, agent):
+def test_a_new_token_is_asked_for_and_the_view_goes_on(page, agent, fast_polls):
     logs = logs_agent(agent)
     page.on(agent, "situations?name=ssh-failed")
     page.wait_text("Its events")
