@@ -63,7 +63,9 @@ std::size_t SinkThread::offer(std::span<const EventRecord> events) {
 std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
     const std::size_t delivered = offer(events);
     const bool failed = delivered < events.size();
-    if (failed) {
+    if (failed && m_giveUp.stop_requested()) {
+        // Nothing is tried again; who ends the thread tells what is left.
+    } else if (failed) {
         tellOfFailure();
     } else if (m_state.condition == SinkState::Condition::FAILING) {
         TraceScope trace(anchor);

@@ -249,14 +249,18 @@ std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
 
 void HistoryWriter::storeRest() {
     const bool stored = attempt([&] {
-        m_cursors.forgetSaved(); // in use until now
         storeCursors();
         storeEntries();
     });
     if (!stored) {
         say("the history %s could not be written at the end: %s; sinks may get events twice",
             m_directory.file().c_str(), problem().c_str());
+        return;
     }
+    attempt([&] { // the sinks were in use until now
+        m_cursors.forgetSaved();
+        storeCursors();
+    });
 }
 
 std::string HistoryWriter::problem() const {

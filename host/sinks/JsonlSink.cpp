@@ -19,6 +19,21 @@ TRC1_Anchor anchor{"JsonlSink.cpp"};
 constexpr std::chrono::seconds lookInterval{1};
 constexpr int pollSlice = 100; ///< milliseconds
 
+/// Standard output, where it is a pipe or a terminal, as a file of the sink's own, so that no write
+/// waits: other processes that have it, too, fill the room that there was a moment before, and a
+/// terminal may have room for less than is written. Where there can be no such file, where it is
+/// not for writing, and for a file on disk, whose position others share, standard output itself.
+int openStandardOutput() {
+    struct stat status {};
+    const int flags = fcntl(STDOUT_FILENO, F_GETFL);
+    if (fstat(STDOUT_FILENO, &status) != 0 || flags == -1 || (flags & O_ACCMODE) == O_RDONLY ||
+        !(S_ISFIFO(status.st_mode) || S_ISCHR(status.st_mode))) {
+        return STDOUT_FILENO;
+    }
+    const int fd = ::open("/proc/self/fd/1", O_WRONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
+    return fd == -1 ? STDOUT_FILENO : fd;
+}
+
 } // namespace
 
 JsonlSink::JsonlSink(const SinkConfig& config)
@@ -37,7 +52,7 @@ bool JsonlSink::open() {
     TraceScope trace(anchor);
     // Without waiting: a pipe in the file system that nobody reads must not hold the thread.
     constexpr int flags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK;
-    m_fd = m_isStandardOutput ? STDOUT_FILENO : ::open(m_path.c_str(), flags, 0640);
+    m_fd = m_isStandardOutput ? openStandardOutput() : ::open(m_path.c_str(), flags, 0640);
     if (m_fd == -1) {
         fail("open", errno);
         return trace.result(false);
@@ -74,7 +89,7 @@ bool JsonlSink::endLastLine() {
 }
 
 void JsonlSink::close() {
-    if (m_fd != -1 && !m_isStandardOutput) {
+    if (m_fd != -1 && m_fd != STDOUT_FILENO) {
         ::close(m_fd);
     }
     m_fd = -1;

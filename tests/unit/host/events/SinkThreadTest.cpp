@@ -28,6 +28,8 @@ struct TestState {
     std::atomic<int> failures{0};         ///< deliveries that still fail; -1: all
     std::atomic<std::size_t> taken{1000}; ///< events that a failing delivery takes
     std::atomic<bool> throws{false};      ///< a failing delivery throws
+    std::atomic<bool> waits{false};     ///< a delivery waits until it is told to give up, and fails
+    std::atomic<bool> isWaiting{false}; ///< one does
     std::mutex mutex;
     std::vector<std::uint64_t> ids;
     std::vector<Clock::time_point> tries;
@@ -43,7 +45,15 @@ public:
     explicit TestSink(std::shared_ptr<TestState> state) : m_state(std::move(state)) {}
     std::string name() const override { return "test"; }
     std::string error() const override { return "no room"; }
-    std::size_t deliver(std::span<const EventRecord> events, const std::stop_token&) override {
+    std::size_t deliver(std::span<const EventRecord> events,
+                        const std::stop_token& giveUp) override {
+        while (m_state->waits && !giveUp.stop_requested()) {
+            m_state->isWaiting = true;
+            std::this_thread::sleep_for(1ms);
+        }
+        if (m_state->waits) {
+            return 0;
+        }
         const std::lock_guard guard(m_state->mutex);
         m_state->tries.push_back(Clock::now());
         std::size_t count = events.size();
@@ -133,6 +143,18 @@ TEST_F(SinkThreadTest, ThePausesGrowWhileNothingIsDelivered) {
     EXPECT_GE(state->tries[1] - state->tries[0], 75ms);
     EXPECT_GE(state->tries[2] - state->tries[1], 150ms);
     EXPECT_GE(state->tries[3] - state->tries[2], 300ms);
+}
+
+TEST_F(SinkThreadTest, ADeliveryThatTheEndBreaksOffIsNotTriedAgain) {
+    state->waits = true;
+    thread.start();
+    push(3);
+    while (thread.state().lag < 3 || !state->isWaiting) {
+        std::this_thread::sleep_for(1ms);
+    }
+    EXPECT_EQ(thread.finish(Clock::now()), 3u);
+    EXPECT_THAT(trace.messages(), ElementsAre()) << "there is no other try to announce";
+    EXPECT_EQ(thread.state().error, "no room");
 }
 
 TEST_F(SinkThreadTest, ASinkThatThrowsHasFailed) {

@@ -12,9 +12,11 @@
 #include <csignal>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <iterator>
 #include <string>
 #include <thread>
+#include <utility>
 
 #include <fcntl.h>
 #include <sys/resource.h>
@@ -278,6 +280,66 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
     const std::stop_source anew;
     EXPECT_EQ(sink.deliver(from(delivered), anew.get_token()), 3 - delivered);
     EXPECT_EQ(written + readAll(), expected);
+}
+
+TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithThoseWhoWriteIntoItToo) {
+    std::fflush(stdout);
+    const int output = dup(STDOUT_FILENO);
+    const int file = ::open(path.c_str(), O_WRONLY | O_CREAT, 0600); // not for appending
+    dup2(file, STDOUT_FILENO);
+    {
+        JsonlSink sink(SinkConfig::jsonl("-"));
+        EXPECT_EQ(::write(file, "first\n", 6), 6);
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+        EXPECT_EQ(::write(file, "last\n", 5), 5);
+    }
+    dup2(output, STDOUT_FILENO);
+    ::close(output);
+    ::close(file);
+    EXPECT_EQ(content(path), "first\n" + lines + "last\n");
+}
+
+/// Standard output is a terminal of which nobody takes what is written.
+class JsonlSinkTerminalTest : public JsonlSinkTest {
+protected:
+    JsonlSinkTerminalTest() {
+        std::fflush(stdout);
+        m_output = dup(STDOUT_FILENO);
+        m_master = posix_openpt(O_RDWR | O_NOCTTY);
+        EXPECT_EQ(grantpt(m_master) + unlockpt(m_master), 0);
+        const int slave = ::open(ptsname(m_master), O_RDWR | O_NOCTTY);
+        dup2(slave, STDOUT_FILENO);
+        ::close(slave);
+    }
+    ~JsonlSinkTerminalTest() override {
+        dup2(m_output, STDOUT_FILENO);
+        ::close(m_output);
+        release();
+    }
+    /// Ends everything that waits for the terminal.
+    void release() {
+        if (m_master != -1) {
+            ::close(std::exchange(m_master, -1));
+        }
+    }
+
+private:
+    int m_output = -1;
+    int m_master = -1;
+};
+
+TEST_F(JsonlSinkTerminalTest, ATerminalWithLittleRoomDoesNotHoldUpTheEnd) {
+    JsonlSink sink(SinkConfig::jsonl("-"));
+    auto delivering = std::async(std::launch::async, [&] {
+        while (sink.deliver(from(0), giveUp.get_token()) == 3) {
+        }
+    });
+    const auto before = delivering.wait_for(std::chrono::milliseconds(300));
+    giveUp.request_stop();
+    const auto after = delivering.wait_for(std::chrono::seconds(20));
+    release(); // a failure of the test is written there, too
+    EXPECT_EQ(before, std::future_status::timeout);
+    EXPECT_EQ(after, std::future_status::ready);
 }
 
 TEST_F(JsonlSinkPipeTest, AReaderThatHasGoneIsAFailure) {
