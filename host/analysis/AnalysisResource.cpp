@@ -8,6 +8,7 @@
 #include "host/analysis/StoredRow.h"
 #include "host/config/TimeText.h"
 #include "host/history/HistoryReader.h"
+#include "host/http/EventQuery.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
@@ -147,7 +148,8 @@ std::vector<Explanation> AnalysisResource::explainEvent(JsonFields& fields) {
     if (m_history == nullptr) {
         throw RequestRefused(409, "the history is off", "event");
     }
-    const std::optional<StoredEvent> event = m_history->event(id);
+    const std::optional<StoredEvent> event =
+        EventQuery::reading([&] { return m_history->event(id); });
     if (!event) {
         throw RequestRefused(404, "the history holds no such event", "event");
     }

@@ -1,7 +1,5 @@
 #include "host/http/EventQuery.h"
 
-#include "host/http/RequestRefused.h"
-
 #include <algorithm>
 #include <array>
 #include <string>

@@ -30,15 +30,6 @@ constexpr std::int64_t minute = 60'000; ///< milliseconds
 constexpr std::int64_t day = 24 * 60 * minute;
 constexpr std::int64_t mostSteps = 2 * 24 * 60;
 
-/// Does what reads the history; what the history says when it cannot be read is the answer.
-template <typename Read> auto reading(const Read& read) {
-    try {
-        return read();
-    } catch (const HistoryError& error) {
-        throw RequestRefused(503, std::string("the history cannot be read: ") + error.what(), "");
-    }
-}
-
 bool isNewestFirst(QueryFields& query) {
     const std::string order = query.text("order").value_or("desc");
     if (order != "asc" && order != "desc") {
@@ -117,8 +108,9 @@ HttpAnswer EventsResource::events(const HttpRequest& request) {
     HistoryReader& history = EventQuery::history(m_history);
     EventFilter filter = filterOf(request);
     const std::size_t limit = filter.limit++; // one more tells whether there are more
-    const std::vector<StoredEvent> found = reading([&] { return history.query(filter); });
-    const HistoryState state = reading([&] { return history.state(); });
+    const std::vector<StoredEvent> found =
+        EventQuery::reading([&] { return history.query(filter); });
+    const HistoryState state = EventQuery::reading([&] { return history.state(); });
     const std::size_t count = std::min(limit, found.size());
     std::string text = "{\"events\":[";
     for (std::size_t at = 0; at < count; ++at) {
@@ -143,7 +135,7 @@ HttpAnswer EventsResource::event(const HttpRequest& request) {
     if (error != std::errc() || stop != end || id > mostId) {
         throw RequestRefused(404, "an event's id is a whole number", "id");
     }
-    const std::optional<StoredEvent> event = reading([&] { return history.event(id); });
+    const std::optional<StoredEvent> event = EventQuery::reading([&] { return history.event(id); });
     if (!event) {
         throw RequestRefused(404, "the history does not hold this event", "id");
     }
@@ -154,7 +146,8 @@ HttpAnswer EventsResource::rates(const HttpRequest& request) {
     TraceScope trace(anchor);
     HistoryReader& history = EventQuery::history(m_history);
     const Window window = windowOf(request);
-    const Rates rates = reading([&] { return history.rates(window.from, window.to, window.step); });
+    const Rates rates =
+        EventQuery::reading([&] { return history.rates(window.from, window.to, window.step); });
     std::string text = "{\"start\":\"" + UtcTime::text(rates.start) +
                        "\",\"step\":" + std::to_string(rates.step / 1000) + ",\"logs\":[";
     bool isFirst = true;

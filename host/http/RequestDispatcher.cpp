@@ -1,6 +1,7 @@
 #include "host/http/RequestDispatcher.h"
 
 #include "agent/TraceScope.h"
+#include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/UrlText.h"
 
@@ -31,6 +32,10 @@ void decodeQuery(IncomingRequest& incoming) {
         throw RequestRefused(400, "write the query as UTF-8 with percent-encoding", "query");
     }
     incoming.request.query = std::move(*query);
+}
+
+bool isRead(std::string_view method) {
+    return method == "GET" || method == "HEAD";
 }
 
 /// True for application/json, with or without parameters.
@@ -129,6 +134,9 @@ HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyRea
     }
     decodeCaptures(match, request);
     decodeQuery(incoming);
+    if (!isRead(request.method)) {
+        QueryFields(request).refuseUnknown(); // what changes something is told by bodies alone
+    }
     readBodyOf(incoming, readBody);
     const ActiveRequests::Guard active(m_active);
     if (!active) {

@@ -1,6 +1,7 @@
 #include "host/situations/SituationsResource.h"
 
 #include "host/http/JsonFields.h"
+#include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
 #include "host/situations/SituationBody.h"
@@ -71,7 +72,10 @@ void SituationsResource::addRoutes(Router& router) {
     const auto answer = [&](const char* method, const char* pattern, auto handler) {
         router.add(method, pattern, std::move(handler));
     };
-    answer("GET", "/api/v1/situations", [this](const HttpRequest&) { return list(); });
+    answer("GET", "/api/v1/situations", [this](const HttpRequest& request) {
+        QueryFields(request).refuseUnknown();
+        return list();
+    });
     answer("POST", "/api/v1/situations",
            [this](const HttpRequest& request) { return add(request); });
     answer("POST", "/api/v1/situations/validate", &SituationsResource::validate);
@@ -82,9 +86,11 @@ void SituationsResource::addRoutes(Router& router) {
     answer("DELETE", "/api/v1/situations/{name}",
            [this](const HttpRequest& request) { return remove(request); });
     answer("POST", "/api/v1/situations/{name}/start", [this](const HttpRequest& request) {
+        JsonFields(request.body).refuseUnknown();
         return answerOf(m_situations.start(request.captures.front()));
     });
     answer("POST", "/api/v1/situations/{name}/stop", [this](const HttpRequest& request) {
+        JsonFields(request.body).refuseUnknown();
         return answerOf(m_situations.stop(request.captures.front()));
     });
 }
@@ -98,6 +104,7 @@ HttpAnswer SituationsResource::list() const {
 }
 
 HttpAnswer SituationsResource::show(const HttpRequest& request) const {
+    QueryFields(request).refuseUnknown();
     const std::string& name = request.captures.front();
     const std::optional<SituationStatus> status = m_situations.find(name);
     if (!status) {
@@ -129,6 +136,7 @@ HttpAnswer SituationsResource::replace(const HttpRequest& request) {
 }
 
 HttpAnswer SituationsResource::remove(const HttpRequest& request) {
+    JsonFields(request.body).refuseUnknown();
     if (const auto refusal = m_situations.remove(request.captures.front())) {
         refuse(*refusal);
     }
