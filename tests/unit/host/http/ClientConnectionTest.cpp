@@ -55,6 +55,17 @@ protected:
     std::unique_ptr<ClientConnection> connection;
 };
 
+TEST_F(ClientConnectionTest, PassesOverEmptyLinesBeforeAHead) {
+    std::string lines;
+    for (int count = 0; count < 1000; ++count) {
+        lines += "\r\n";
+    }
+    send(lines + "GET / HTTP/1.1\r\nrange: x\r\nHost: h\r\n\r\nbody");
+    EXPECT_EQ(connection->readHead(20s), ClientConnection::COMPLETE);
+    EXPECT_EQ(connection->head(), "GET / HTTP/1.1\r\nHost: h");
+    EXPECT_EQ(read(30), "GET / HTTP/1.1\r\nHost: h\r\n\r\nbod");
+}
+
 TEST_F(ClientConnectionTest, GivesHeadsAndWhatFollowsThem) {
     send("GET / HTTP/1.1\r\nHost: x\r\n");
     std::thread later([this] {
