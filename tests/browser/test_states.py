@@ -183,6 +183,35 @@ def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
     assert stored()["when"] == [when[0], "ENTRYSRC in ['a,b']", *when[2:]]
 
 
+def test_a_situation_of_any_log_is_explained_and_edited(page, agent):
+    auth, app = logs_agent(agent)
+    page.on(agent)
+    body = {"name": "anywhere", "text": "", "severity": "minor", "log": None, "when": ["ENTRYDESC contains 'declined'"]}
+    assert page.api.request("POST", "/api/v1/situations", body)[0] == 201
+    page.open("situations?name=anywhere")
+    page.wait_text("any log")
+    page.choose("Log it comes from", str(app))
+    page.type("Line", app_entry("declined").strip())
+    page.click("Explain")
+    page.wait_text("Would be raised")
+    page.click("Edit anywhere")
+    page.heading("Edit anywhere")
+    page.wait_text("Would have been raised 0 times in the last 24 hours")
+    page.choose("Severity", "major")
+    page.click("Save changes")
+    page.heading("anywhere")
+    page.wait_text("major")
+    assert page.api.request("GET", "/api/v1/situations/anywhere")[2]["log"] is None
+    page.open("situations?new")
+    page.type("Name", "new")
+    page.wait_text("Choose a log to see what it would have done.")
+    assert "Log it comes from" not in page.text()
+    page.choose("Log", "Any log")
+    page.wait_text("Log it comes from")
+    page.choose("Log", str(auth))
+    until(lambda: "Log it comes from" not in page.text(), "the log of the line to go")
+
+
 # ---------------------------------------------------------------------- a log's page
 
 

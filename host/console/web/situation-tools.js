@@ -1,7 +1,7 @@
 // Beside a situation: what it would have done, and what it makes of a line.
 
-import { post } from "./api.js";
-import { button, failure, field, fill, h } from "./dom.js";
+import { get, post } from "./api.js";
+import { button, failure, field, fill, h, select } from "./dom.js";
 import { explanation } from "./explain.js";
 import { number, plural, stamp } from "./format.js";
 
@@ -43,27 +43,42 @@ function drawPreview(result, answer) {
       times.length > 50 && h("li", { className: "quiet" }, `and ${number(answer.raised - 50)} more`))));
 }
 
-/** Explains what the situation makes of a pasted line, or of the log's last entries. */
+/** Explains what the situation makes of a pasted line, or of the log's last entries. `log()` is the
+ *  situation's log, null for any, undefined while none is chosen. `update()` tells that it has changed. */
 export function explainPanel(subject, log) {
+  const which = field("Log it comes from", select([]));
+  const update = async () => {
+    which.hidden = log() !== null;
+    if (which.hidden || which.control.options.length > 0) return;
+    try {
+      const { logs } = await get("/api/v1/logs");
+      fill(which.control, logs.map((one) => h("option", { value: one.log }, one.log)));
+    } catch (error) {
+      which.setProblem(error.message);
+    }
+  };
   const input = h("textarea", { rows: 3, spellcheck: false, placeholder: "Paste a line of the log" });
   const row = field("Line", input);
   const result = h("div", { role: "status", className: "stack" });
   const ask = async (what) => {
     row.setProblem("");
-    if (!log()) {
+    const path = log() ?? (log() === null ? which.control.value : "");
+    if (!path) {
       row.setProblem("Choose a log first: its kind says how a line is read.");
       return;
     }
     fill(result, h("p", { className: "quiet" }, "Asking …"));
     try {
-      const answer = await post("/api/v1/explain", { ...subject(), log: log(), ...what });
+      const answer = await post("/api/v1/explain", { ...subject(), log: path, ...what });
       fill(result, answer.explanations.length > 0 ? answer.explanations.map((one) => explanation(one)) : h("p", {}, "The log holds no entry yet."));
     } catch (error) {
       fill(result, failure(error));
     }
   };
-  return h("section", { className: "panel", "aria-label": "Explain" }, h("h2", {}, "What would it make of a line?"), row,
+  update();
+  const element = h("section", { className: "panel", "aria-label": "Explain" }, h("h2", {}, "What would it make of a line?"), which, row,
     h("p", { className: "actions" },
       button("Explain", () => (input.value.trim() ? ask({ line: input.value.split("\n")[0] }) : row.setProblem("Paste a line first."))),
       button("Explain the last 3 entries", () => ask({ last: 3 }))), result);
+  return { element, update };
 }

@@ -8,6 +8,7 @@ import { explainPanel, previewPanel } from "../situation-tools.js";
 import { notThere } from "./situations.js";
 
 const BLANK = { name: "", text: "", severity: "warning", log: null, when: [], frequency: null, period: null };
+const ANY = "*"; // no log has this path
 const UNITS = [["s", "seconds"], ["m", "minutes"], ["h", "hours"], ["d", "days"]];
 
 export async function show(element, name, query) {
@@ -36,11 +37,12 @@ class Form {
       name: field("Name", h("input", { value: situation.name, required: true, disabled: Boolean(name), autocomplete: "off", oninput: changed }), name ? "" : "Short, and not used yet, for example ssh-bruteforce"),
       text: field("Text", h("input", { value: situation.text, autocomplete: "off", oninput: changed }), "What people read when it is raised"),
       severity: field("Severity", select(SEVERITIES, situation.severity, { onchange: changed })),
-      log: field("Log", select([["", "Choose a log"], ...logs], situation.log || "", { onchange: changed })),
+      log: field("Log", select([["", "Choose a log"], ...logs, [ANY, "Any log"]], situation.log || (name ? ANY : ""), { onchange: changed })),
     };
     this.conditions = new Conditions(columns, situation.when, changed);
     this.repeats = this.#repeats(situation, changed);
     this.preview = previewPanel(() => ({ definition: this.definition }));
+    this.explain = explainPanel(() => ({ definition: this.definition }), () => (this.fields.log.control.value ? this.definition.log : undefined));
     this.problem = h("p", { className: "problem", role: "alert" });
     this.save = h("button", { className: "primary" }, name ? "Save changes" : "Create situation");
     fill(element, h("div", { className: "head" }, h("h1", {}, name ? `Edit ${name}` : "New situation")),
@@ -49,7 +51,7 @@ class Form {
           h("div", { className: "fields" }, this.fields.name, this.fields.text), h("div", { className: "fields" }, this.fields.log, this.fields.severity),
           this.conditions.element, this.repeats.element, this.problem,
           h("p", { className: "actions" }, this.save, h("a", { className: "button", href: "#/situations" }, "Cancel"))),
-        h("div", { className: "stack" }, this.preview.element, explainPanel(() => ({ definition: this.definition }), () => this.fields.log.control.value))));
+        h("div", { className: "stack" }, this.preview.element, this.explain.element)));
     this.check = debounce(() => this.#validate(), 350);
     this.#validate();
   }
@@ -80,16 +82,17 @@ class Form {
 
   get definition() {
     const { name, text, severity, log } = this.fields;
-    return { name: name.control.value.trim(), text: text.control.value, severity: severity.control.value, log: log.control.value || null, when: this.conditions.texts, ...this.repeats.value };
+    return { name: name.control.value.trim(), text: text.control.value, severity: severity.control.value, log: [ANY, ""].includes(log.control.value) ? null : log.control.value, when: this.conditions.texts, ...this.repeats.value };
   }
 
   changed() {
+    this.explain.update();
     this.check();
   }
 
   #missing() {
-    const { name, log } = this.definition;
-    if (!log) return "Choose a log to see what it would have done.";
+    const { name } = this.definition;
+    if (!this.fields.log.control.value) return "Choose a log to see what it would have done.";
     return name ? "" : "Give it a name to see what it would have done.";
   }
 
@@ -128,7 +131,8 @@ class Form {
   }
 
   async #save() {
-    const { name, log } = this.definition;
+    const { name } = this.definition;
+    const log = this.fields.log.control.value;
     if (!name) this.fields.name.setProblem("A situation needs a name.");
     if (!log) this.fields.log.setProblem("Choose the log to watch.");
     if (!name || !log) {

@@ -37,7 +37,7 @@ class SituationPage {
     this.#draw();
     fill(this.element, h("div", { className: "head" }, h("h1", {}, this.name), this.state, this.actions), this.note,
       h("div", { className: "split" }, this.definition,
-        h("div", { className: "stack" }, preview.element, explainPanel(() => ({ situation: this.name }), () => this.situation.log))));
+        h("div", { className: "stack" }, preview.element, explainPanel(() => ({ situation: this.name }), () => this.situation.log).element)));
     preview.update();
   }
 
