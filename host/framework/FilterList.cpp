@@ -45,7 +45,8 @@ FilterList::FilterList(const std::vector<Condition>& conditions) {
     for (const Condition& condition : conditions) {
         std::string& value = m_values.emplace_back(valueOf(condition));
         const auto length = static_cast<std::int16_t>(value.size());
-        value.resize(std::max(value.size(), kReadable), ' ');
+        // With NULs: ColumnIsException is handed a value without its length.
+        value.resize(std::max(value.size(), kReadable));
         const bool isNumber = condition.isNumber && condition.op != INTF_IN;
         m_filters.push_back({condition.column.c_str(), condition.op,
                              isNumber ? SEL1_INTEGER : SEL1_CHARACTER, length, value.c_str()});

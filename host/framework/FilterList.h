@@ -11,9 +11,9 @@
 inline constexpr std::int16_t SEL1_CHARACTER = 452;
 
 /// A request's conditions in the form in which the agent reads them. A number is published as 8
-/// bytes in host order. A text is published without padding; 16 bytes can be read whatever its
-/// length, blanks behind the text, and a NUL follows. The values of INTF_IN are one text with a
-/// newline between them, which no log entry holds. Not locked: one thread walks at a time.
+/// bytes in host order. A text is published without padding and with a NUL behind it; 16 bytes can
+/// be read whatever its length. The values of INTF_IN are one text with a newline between them,
+/// which no log entry holds. Not locked: one thread walks at a time.
 class FilterList {
 public:
     /// The conditions must outlive the list.

@@ -134,7 +134,7 @@ TEST_F(CtreqTest, PublishesTheConditionsOneAtATime) {
         EXPECT_EQ(filter->compareOperator, INTF_EQUAL);
         EXPECT_NE(filter->dataType, SEL1_INTEGER);
         EXPECT_EQ(filter->valueLength, 9);
-        EXPECT_EQ(std::string(filter->value, 16), "/var/log/       ");
+        EXPECT_EQ(std::string(filter->value, 16), std::string("/var/log/") + std::string(7, '\0'));
         ASSERT_EQ(request->GetFilterInfo(&filter), 0u);
         EXPECT_STREQ(filter->columnName, "NUMBER");
         EXPECT_EQ(filter->dataType, 496);

@@ -4,9 +4,12 @@
 #include "host/analysis/ConditionVerdict.h"
 #include "host/analysis/Replay.h"
 
+#include "agent/framework/ctreq.h"
 #include "host/config/ConditionParser.h"
 #include "host/config/SituationValidator.h"
 #include "host/events/EventQueue.h"
+#include "host/framework/ContextInfo.h"
+#include "host/framework/RequestDetail.h"
 #include "host/situations/SituationSet.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
@@ -151,6 +154,12 @@ zrm_rmlogent_data_t randomRow(Random& random, int seconds) {
     return row;
 }
 
+class NoReceiver : public RowReceiver {
+public:
+    unsigned receive(const ctreq&, const char*, unsigned) override { return 0; }
+    void stopped(const ctreq&, unsigned) override {}
+};
+
 class LiveModel : public testing::Test {
 protected:
     /// The counts of the situations that an entry raises.
@@ -180,11 +189,33 @@ protected:
             allHold = allHold && one.holds;
         }
         EXPECT_EQ(allHold, verdict.matches);
+        EXPECT_EQ(columnsHold(config, reinterpret_cast<char*>(&judged)), verdict.matches);
         const auto found = raised.find(config.name);
         EXPECT_EQ(found != raised.end(), verdict.isRaised);
         if (found != raised.end()) {
             EXPECT_EQ(found->second, verdict.frequency.value_or(0));
         }
+    }
+
+    /// Whether the table says of every condition, one by one, that the row's column meets it.
+    bool columnsHold(const SituationConfig& config, char* row) {
+        RequestDetail detail;
+        detail.name = config.name;
+        detail.sampleType = SAMPLE_SITUATION;
+        detail.conditions = config.conditions;
+        NoReceiver receiver;
+        ContextInfo context(receiver);
+        const std::unique_ptr<ctreq> request(entries.CreateCtreq(&detail, &context));
+        SEL1_FILTERINFO* filter = nullptr;
+        request->ResetFilterIndex();
+        while (request->GetFilterInfo(&filter) == 0) {
+            if (request->ColumnIsException(row, const_cast<char*>(filter->columnName),
+                                           filter->compareOperator,
+                                           const_cast<char*>(filter->value)) == 0) {
+                return false;
+            }
+        }
+        return true;
     }
 
     RecordingTrace trace{0};
