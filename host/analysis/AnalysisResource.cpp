@@ -137,7 +137,7 @@ std::vector<Explanation> AnalysisResource::explainLast(JsonFields& fields) {
     requireOpen(explainer.isOpen());
     std::vector<Explanation> explanations = explainer.last(log, number);
     if (!explainer.problem().empty()) {
-        throw RequestRefused(503, explainer.problem(), "log");
+        throw RequestRefused(409, explainer.problem(), "log");
     }
     return explanations;
 }

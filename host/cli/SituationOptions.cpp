@@ -3,6 +3,7 @@
 #include "host/cli/CliError.h"
 #include "host/cli/InputFile.h"
 
+#include <algorithm>
 #include <iterator>
 #include <utility>
 
@@ -46,36 +47,44 @@ Json SituationOptions::subject(const std::string& name, const std::string& file)
 
 void SituationOptions::addTo(CLI::App& command) {
     const auto add = [&](const char* name, std::string& value, const char* type, const char* help) {
-        command.add_option(name, value, help)->type_name(type);
+        return command.add_option(name, value, help)->type_name(type);
+    };
+    const auto addMember = [&](const char* key, std::string& value, const char* type,
+                               const char* help) {
+        m_members.push_back(
+            {key, add((std::string("--") + key).c_str(), value, type, help), &value});
     };
     add("--file", m_file, "FILE", "The definition as JSON; - is standard input");
-    add("--text", m_text, "TEXT", "A description for people");
-    add("--severity", m_severity, "SEVERITY", "info, minor, warning, major or critical");
-    add("--log", m_log, "LOG", "The whole path of a log; without it every log");
+    addMember("text", m_text, "TEXT", "A description for people");
+    addMember("severity", m_severity, "SEVERITY", "info, minor, warning, major or critical");
+    addMember("log", m_log, "LOG", "The whole path of a log; without it every log");
     command
         .add_option("--when", m_when,
                     "A condition, for example \"ENTRYSRC starts 'sshd'\"; all must hold")
         ->type_name("CONDITION")
         ->allow_extra_args(false);
-    add("--frequency", m_frequency, "COUNT", "At least or most so many, for example \">= 5\"");
-    add("--period", m_period, "TIME", "within this time, for example 60s, 5m, 1h");
+    addMember("frequency", m_frequency, "COUNT", "At least or most so many, for example \">= 5\"");
+    addMember("period", m_period, "TIME", "within this time, for example 60s, 5m, 1h");
 }
 
 bool SituationOptions::areGiven() const {
-    return !(m_file.empty() && m_text.empty() && m_severity.empty() && m_log.empty() &&
-             m_when.empty() && m_frequency.empty() && m_period.empty());
+    return !m_file.empty() || !m_when.empty() ||
+           std::any_of(m_members.begin(), m_members.end(),
+                       [](const Member& member) { return member.option->count() > 0; });
 }
 
 Json SituationOptions::definition(const Json& base) const {
     Json definition = withoutState(m_file.empty() ? base : fileContent(m_file));
-    for (const auto& [key, value] :
-         {std::pair("text", &m_text), std::pair("severity", &m_severity), std::pair("log", &m_log),
-          std::pair("frequency", &m_frequency), std::pair("period", &m_period)}) {
-        if (!value->empty()) {
-            definition[key] = *value;
+    for (const Member& member : m_members) {
+        if (member.option->count() > 0 && member.value->empty()) {
+            definition.erase(member.key);
+        } else if (member.option->count() > 0) {
+            definition[member.key] = *member.value;
         }
     }
-    if (!m_when.empty()) {
+    if (m_when == std::vector<std::string>{""}) {
+        definition.erase("when");
+    } else if (!m_when.empty()) {
         definition["when"] = m_when;
     }
     return definition;

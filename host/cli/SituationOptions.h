@@ -8,7 +8,8 @@
 
 namespace CLI {
 class App;
-}
+class Option;
+} // namespace CLI
 
 /// The options in which a command line describes a situation.
 class SituationOptions {
@@ -18,8 +19,8 @@ public:
     /// Declares them for a command. The object outlives the reading of the command line.
     void addTo(CLI::App& command);
 
-    /// The definition: that of --file, or `base`, with the members that options name. Throws
-    /// CliError when the file cannot be used.
+    /// The definition: that of --file, or `base`, with the members that options name and without
+    /// those that they name with an empty value. Throws CliError when the file cannot be used.
     Json definition(const Json& base) const;
 
     /// What a request names: a situation by its name, or the definition of a file. Throws CliError
@@ -30,6 +31,13 @@ public:
     bool areGiven() const;
 
 private:
+    /// A member of a definition, and the option of one command that gives it.
+    struct Member {
+        const char* key;
+        const CLI::Option* option;
+        const std::string* value;
+    };
+    std::vector<Member> m_members;
     std::string m_file;
     std::string m_text;
     std::string m_severity;

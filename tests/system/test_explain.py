@@ -1,5 +1,6 @@
 """Why a situation is raised by an entry or not, and what it would have made of the past."""
 
+import os
 import time
 from concurrent.futures import ThreadPoolExecutor
 from signal import SIGHUP
@@ -268,6 +269,17 @@ def test_questions_that_cannot_be_answered(started):
     ):
         answer = started.analysis.post("backtest", body, status)
         assert answer["field"] == field, answer
+    # A log that is gone, and a pipe in its place, which nobody writes to.
+    started.watched.path.unlink()
+    body = {"last": 1, "log": log, "situation": "all"}
+    answer = started.analysis.post("explain", body, 409)
+    assert answer["detail"] == "the log cannot be read: No such file or directory"
+    os.mkfifo(log)
+    answer = started.analysis.post("explain", body, 409)
+    assert answer["detail"] == "the log cannot be read: it is no file"
+    window = {"from": "2026-01-01", "to": "2026-01-02"}
+    answer = started.analysis.post("backtest", {"definition": {"log": log}, **window})
+    assert (answer["entries"], answer["truncated"]) == (0, False)
     assert started.stop() == 0
 
 

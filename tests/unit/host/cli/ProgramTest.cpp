@@ -169,6 +169,23 @@ TEST_F(ProgramTest, OneThingIsExplained) {
     }
 }
 
+TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
+    std::string put;
+    answer = [&](const Request& request, Response& response) {
+        put = request.method == "PUT" ? request.body : put;
+        response.set_content(R"({"name":"x","text":"t","severity":"info","log":"/l",)"
+                             R"("when":["a"],"frequency":">= 5","period":"60s","state":"running"})",
+                             "application/json");
+    };
+    EXPECT_EQ(run({"situations", "set", "x", "--frequency", "", "--period", ""}), CLI_DONE);
+    EXPECT_EQ(put, R"({"name":"x","text":"t","severity":"info","log":"/l","when":["a"]})");
+    EXPECT_EQ(run({"situations", "set", "x", "--log", "", "--when", "", "--severity", "major"}),
+              CLI_DONE);
+    EXPECT_EQ(put, R"({"name":"x","text":"t","severity":"major","frequency":">= 5",)"
+                   R"("period":"60s"})");
+    EXPECT_EQ(run({"situations", "set", "x"}), CLI_USAGE);
+}
+
 TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
     EXPECT_EQ(run({"situations", "bogus"}), CLI_USAGE);
     EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists what it takes\n"));
