@@ -8,7 +8,7 @@
 
 namespace {
 
-constexpr std::array<std::pair<int, const char*>, 15> titles = {{
+constexpr std::array<std::pair<int, const char*>, 16> titles = {{
     {400, "Bad Request"},
     {401, "Unauthorized"},
     {403, "Forbidden"},
@@ -17,6 +17,7 @@ constexpr std::array<std::pair<int, const char*>, 15> titles = {{
     {408, "Request Timeout"},
     {409, "Conflict"},
     {413, "Content Too Large"},
+    {414, "URI Too Long"},
     {415, "Unsupported Media Type"},
     {421, "Misdirected Request"},
     {422, "Unprocessable Content"},
