@@ -19,8 +19,10 @@ constexpr int pagesAtOnce = 64;
 /// Makes a connection one for the writer. Page size and vacuum are settings of a file that is made
 /// here: pages in which many events find room, and free pages that can be given back.
 Database& prepare(Database& database) {
-    database.run("PRAGMA page_size = 16384");
-    database.run("PRAGMA auto_vacuum = INCREMENTAL");
+    if (database.number("PRAGMA page_count") == 0) { // else they would be written all the same
+        database.run("PRAGMA page_size = 16384");
+        database.run("PRAGMA auto_vacuum = INCREMENTAL");
+    }
     database.run("PRAGMA journal_mode = WAL");
     // A commit survives the process; a power failure may take the last ones.
     database.run("PRAGMA synchronous = NORMAL");

@@ -247,6 +247,24 @@ TEST_F(HistoryTest, AFullDiskIsToldOnceAndNothingIsLost) {
                                               "The history takes events again."));
 }
 
+TEST_F(HistoryTest, AHistoryIsOpenedOnAFullDiskAndTakesEventsWhenThereIsRoom) {
+    open();
+    pushAndWait(5);
+    close();
+    disk.failWrites(SQLITE_FULL);
+    open();
+    EXPECT_EQ(problem, "");
+    ASSERT_NE(history, nullptr);
+    EXPECT_EQ(sink->backlog(), 5u);
+    EXPECT_EQ(take(), idsFrom(1, 5)) << "what is stored is delivered";
+    push(3);
+    EXPECT_TRUE(trace.waitFor("Error writing the history " + file() +
+                              ": database or disk is full. Trying again."));
+    disk.failWrites(0);
+    EXPECT_GE(history->waitBeyond(7, Clock::now() + 20s, {}), 8u);
+    EXPECT_EQ(ids(), idsFrom(1, 8));
+}
+
 TEST_F(HistoryTest, AFullDiskDoesNotHoldUpTheEnd) {
     open();
     disk.failWrites(SQLITE_FULL);
