@@ -17,6 +17,15 @@ std::uint64_t wordAt(const char* bytes) noexcept {
     return word;
 }
 
+constexpr std::size_t kBlock = 4 * sizeof kBlanks;
+
+bool isBlankBlock(const char* bytes) noexcept {
+    std::uint64_t words[4];
+    std::memcpy(words, bytes, sizeof words);
+    return ((words[0] ^ kBlanks) | (words[1] ^ kBlanks) | (words[2] ^ kBlanks) |
+            (words[3] ^ kBlanks)) == 0;
+}
+
 /// Difference of the text's first byte that is not a blank from a blank; 0 when there is none.
 int compareWithBlanks(std::string_view text) noexcept {
     const std::size_t position = text.find_first_not_of(' ');
@@ -28,6 +37,9 @@ int compareWithBlanks(std::string_view text) noexcept {
 
 std::string_view ColumnText::withoutTrailingBlanks(std::string_view text) noexcept {
     std::size_t size = text.size();
+    while (size >= kBlock && isBlankBlock(text.data() + size - kBlock)) {
+        size -= kBlock;
+    }
     while (size >= sizeof kBlanks && wordAt(text.data() + size - sizeof kBlanks) == kBlanks) {
         size -= sizeof kBlanks;
     }
@@ -43,6 +55,9 @@ std::string_view ColumnText::unpadded(const char* field, std::size_t width) noex
 
 bool ColumnText::isPadding(const char* rest, std::size_t width) noexcept {
     std::size_t position = 0;
+    while (position + kBlock <= width && isBlankBlock(rest + position)) {
+        position += kBlock;
+    }
     while (position + sizeof kBlanks <= width && wordAt(rest + position) == kBlanks) {
         position += sizeof kBlanks;
     }

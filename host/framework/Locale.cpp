@@ -40,20 +40,13 @@ std::uint32_t LOC2_GetLocaleNumInfo(LOC2_Locale* locale, int item, std::uint32_t
     return known ? locale->codePage : 0;
 }
 
-std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
-                                  std::uint32_t targetSize, std::uint32_t sourceCodePage,
-                                  const char* source, std::uint32_t sourceLength,
-                                  std::uint32_t* resultLength, int flags, std::uint32_t* status) {
-    const bool terminates = (flags & LOC2_NO_TERMINATOR) == 0;
-    // Nearly all text is this: ASCII, which every known code page holds as it is, and it fits.
-    if (!terminates && sourceLength > 0 && sourceLength <= targetSize &&
-        CodePages::isKnown(targetCodePage) && CodePages::isKnown(sourceCodePage) &&
-        Utf8::asciiPrefix({source, sourceLength}) == sourceLength) {
-        std::memcpy(target, source, sourceLength);
-        report(resultLength, sourceLength);
-        report(status, STATUS_OK);
-        return static_cast<std::int32_t>(sourceLength);
-    }
+namespace {
+
+[[gnu::noinline]] std::int32_t translate(std::uint32_t targetCodePage, char* target,
+                                         std::uint32_t targetSize, std::uint32_t sourceCodePage,
+                                         const char* source, std::uint32_t sourceLength,
+                                         std::uint32_t* resultLength, bool terminates,
+                                         std::uint32_t* status) {
     Converted converted{0, false, false};
     if (!terminates || targetSize > 0) {
         const std::size_t room = terminates ? targetSize - 1 : targetSize;
@@ -69,4 +62,24 @@ std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
     report(resultLength, static_cast<std::uint32_t>(converted.written));
     report(status, statusOf(converted));
     return static_cast<std::int32_t>(converted.written);
+}
+
+} // namespace
+
+std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
+                                  std::uint32_t targetSize, std::uint32_t sourceCodePage,
+                                  const char* source, std::uint32_t sourceLength,
+                                  std::uint32_t* resultLength, int flags, std::uint32_t* status) {
+    const bool terminates = (flags & LOC2_NO_TERMINATOR) == 0;
+    // Nearly all text is this: ASCII, which every known code page holds as it is, and it fits.
+    if (!terminates && sourceLength > 0 && sourceLength <= targetSize &&
+        CodePages::isKnown(targetCodePage) && CodePages::isKnown(sourceCodePage) &&
+        Utf8::isAscii({source, sourceLength})) {
+        std::memcpy(target, source, sourceLength);
+        report(resultLength, sourceLength);
+        report(status, STATUS_OK);
+        return static_cast<std::int32_t>(sourceLength);
+    }
+    return translate(targetCodePage, target, targetSize, sourceCodePage, source, sourceLength,
+                     resultLength, terminates, status);
 }

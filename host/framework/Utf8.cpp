@@ -23,11 +23,40 @@ constexpr Form kForms[] = {
     {0xF1, 0xF3, 4, 0x80, 0xBF}, {0xF4, 0xF4, 4, 0x80, 0x8F},
 };
 
+std::uint64_t wordAt(const char* bytes) {
+    std::uint64_t word;
+    std::memcpy(&word, bytes, sizeof word);
+    return word;
+}
+
 bool isContinuation(unsigned char byte) {
     return (byte & 0xC0) == 0x80;
 }
 
 } // namespace
+
+bool Utf8::isAscii(std::string_view text) noexcept {
+    constexpr std::size_t kBlock = 4 * sizeof kHighBits;
+    const char* position = text.data();
+    const char* const end = position + text.size();
+    std::uint64_t seen = 0;
+    for (; static_cast<std::size_t>(end - position) >= kBlock; position += kBlock) {
+        std::uint64_t words[4];
+        std::memcpy(words, position, sizeof words);
+        seen |= words[0] | words[1] | words[2] | words[3];
+    }
+    for (; static_cast<std::size_t>(end - position) >= sizeof seen; position += sizeof seen) {
+        seen |= wordAt(position);
+    }
+    if (text.size() >= sizeof seen) {
+        seen |= wordAt(end - sizeof seen); // what is left, and some bytes again
+    } else {
+        for (; position != end; ++position) {
+            seen |= static_cast<unsigned char>(*position);
+        }
+    }
+    return (seen & kHighBits) == 0;
+}
 
 std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
     std::size_t position = 0;
@@ -39,12 +68,9 @@ std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
             break;
         }
     }
-    for (; position + sizeof kHighBits <= text.size(); position += sizeof kHighBits) {
-        std::uint64_t word;
-        std::memcpy(&word, text.data() + position, sizeof word);
-        if ((word & kHighBits) != 0) {
-            break;
-        }
+    while (position + sizeof kHighBits <= text.size() &&
+           (wordAt(text.data() + position) & kHighBits) == 0) {
+        position += sizeof kHighBits;
     }
     while (position < text.size() && static_cast<unsigned char>(text[position]) < 0x80) {
         ++position;

@@ -2,13 +2,28 @@
 
 #include <algorithm>
 
+#include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/select.h>
+#include <unistd.h>
 
 namespace {
 
 /// Descriptors beside those of the agent and of connections.
 constexpr rlim_t spare = 64;
+
+/// Lets the system enlarge the process's table of descriptors up to this one. It does so when a
+/// descriptor needs it, and where there are threads that takes it many milliseconds, for which the
+/// first client would wait.
+void enlargeTable(int descriptor) {
+    const int opened = open("/dev/null", O_RDONLY | O_CLOEXEC);
+    const int moved = opened != -1 ? fcntl(opened, F_DUPFD_CLOEXEC, descriptor) : -1;
+    for (const int fd : {opened, moved}) {
+        if (fd != -1) {
+            close(fd);
+        }
+    }
+}
 
 } // namespace
 
@@ -27,6 +42,7 @@ DescriptorRoom DescriptorRoom::make(std::size_t wanted) {
         }
     }
     if (limit.rlim_cur >= needed) {
+        enlargeTable(static_cast<int>(low));
         return {wanted, static_cast<int>(low)};
     }
     return {std::min<std::size_t>(wanted, limit.rlim_cur / 2), 0};

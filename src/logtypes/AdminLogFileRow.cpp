@@ -46,13 +46,14 @@ public:
         append("; exit status = ");
         append(record.e_exit);
     }
-    /// Writes at most `room` bytes, without a terminator.
-    void write(char* dest, std::size_t room, bool toUTF8) const {
+    /// Writes at most `room` bytes, without a terminator, and returns their number.
+    std::int32_t write(char* dest, std::size_t room, bool toUTF8) const {
         if (toUTF8) {
-            UTF8Conv::Convert_toUTF8(dest, room, m_text, m_length, LOC2_NO_TERMINATOR);
-        } else {
-            RowBytes::copy(dest, m_text, std::min(room, m_length));
+            return UTF8Conv::Convert_toUTF8(dest, room, m_text, m_length, LOC2_NO_TERMINATOR);
         }
+        const std::size_t length = std::min(room, m_length);
+        RowBytes::copy(dest, m_text, length);
+        return static_cast<std::int32_t>(length);
     }
 
 private:
@@ -91,8 +92,11 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
                              LOC2_NO_TERMINATOR);
     fillEntryType(columns.entrytype, sizeof columns.entrytype, entry.ut_type);
     const Description description(entry);
-    description.write(columns.entrydesc, sizeof columns.entrydesc, false);
-    description.write(columns.uentrydesc, sizeof columns.uentrydesc, true);
+    const std::int32_t length =
+        description.write(columns.entrydesc, sizeof columns.entrydesc, false);
+    const std::int32_t lengthInUTF8 =
+        description.write(columns.uentrydesc, sizeof columns.uentrydesc, true);
+    noteDescriptions(&columns, static_cast<std::size_t>(length), lengthInUTF8);
     return trace.result(0L);
 }
 

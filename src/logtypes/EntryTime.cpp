@@ -1,5 +1,7 @@
 #include "logtypes/EntryTime.h"
 
+#include "parser/DigitPairs.h"
+
 #include <cstdio>
 #include <cstring>
 #include <ctime>
@@ -44,9 +46,7 @@ bool isDigitPair(long number) {
 }
 
 char* writePair(char* out, long pair) {
-    const auto number = static_cast<unsigned>(pair);
-    out[0] = static_cast<char>('0' + number / 10);
-    out[1] = static_cast<char>('0' + number % 10);
+    DigitPairs::put(out, static_cast<unsigned>(pair));
     return out + 2;
 }
 

@@ -1,6 +1,7 @@
 #include "logtypes/QuarterHour.h"
 
 #include "monitor/BrevanTime.h"
+#include "parser/DigitPairs.h"
 
 #include <cstring>
 
@@ -20,11 +21,6 @@ int secondOfHour(const char* stamp) {
     return twoDigits(stamp + hourLength) * 60 + twoDigits(stamp + hourLength + 2);
 }
 
-void putTwoDigits(char* text, int number) {
-    text[0] = static_cast<char>('0' + number / 10);
-    text[1] = static_cast<char>('0' + number % 10);
-}
-
 } // namespace
 
 void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
@@ -37,8 +33,8 @@ void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
     }
     const int second = m_secondOfHour + static_cast<int>(time - m_start);
     std::memcpy(out, m_hour, hourLength);
-    putTwoDigits(out + hourLength, second / 60);
-    putTwoDigits(out + hourLength + 2, second % 60);
+    DigitPairs::put(out + hourLength, static_cast<unsigned>(second) / 60);
+    DigitPairs::put(out + hourLength + 2, static_cast<unsigned>(second) % 60);
     std::memset(out + hourLength + 4, '0', 3);
 }
 

@@ -10,7 +10,9 @@
 #include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -21,6 +23,20 @@ namespace {
 TRC1_Anchor anchor{"SysLogFile.cpp"};
 
 constexpr std::string_view monthNames = "JanFebMarAprMayJunJulAugSepOctNovDec";
+
+constexpr std::uint32_t threeLetters(const char* text) {
+    return static_cast<unsigned char>(text[0]) | static_cast<unsigned char>(text[1]) << 8U |
+           static_cast<unsigned char>(text[2]) << 16U;
+}
+
+constexpr auto months = [] {
+    std::array<std::uint32_t, monthNames.size() / 3> letters{};
+    for (std::size_t month = 0; month < letters.size(); ++month) {
+        letters[month] = threeLetters(monthNames.data() + 3 * month);
+    }
+    return letters;
+}();
+
 constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::size_t timeLength = 15; // Mmm dd hh:mm:ss
 constexpr std::size_t yearLength = 3;
@@ -31,14 +47,26 @@ constexpr std::size_t stampLength = 16;
 constexpr std::ptrdiff_t longestHeader =
     offsetof(zrm_rmlogent_data_t, freqthresh) - offsetof(zrm_rmlogent_data_t, entrysrc);
 
-/// The month's number, 1 to 12; 0 when the text begins with none.
-unsigned monthNumber(const char* text) {
-    for (std::size_t at = 0; at < monthNames.size(); at += 3) {
-        if (std::memcmp(text, monthNames.data() + at, 3) == 0) {
-            return static_cast<unsigned>(at / 3 + 1);
+/// With so few, neither of them runs out of its own column.
+constexpr std::ptrdiff_t shortHeader = timeLength + std::min(sizeof(zrm_rmlogent_data_t::entrysys),
+                                                             sizeof(zrm_rmlogent_data_t::entrysrc));
+
+/// The month's number, 1 to 12; 0 when the text begins with none. `likely` is looked at first.
+unsigned monthNumber(const char* text, unsigned likely) {
+    const std::uint32_t letters = threeLetters(text);
+    if (likely - 1 < months.size() && months[likely - 1] == letters) {
+        return likely;
+    }
+    for (unsigned month = 0; month < months.size(); ++month) {
+        if (months[month] == letters) {
+            return month + 1;
         }
     }
     return 0;
+}
+
+unsigned twoDigits(const char* text) {
+    return static_cast<unsigned>((text[0] - '0') * 10 + (text[1] - '0'));
 }
 
 /// Dates an entry of a report by the newer entry read before it, and becomes that entry's stamp:
@@ -57,27 +85,51 @@ void followYear(char* stamp, char* newer) {
     std::memcpy(newer, stamp, stampLength);
 }
 
-/// White space of the line's layout, whatever the locale.
-bool isSpace(char character) {
-    return character == ' ' || (character >= '\t' && character <= '\r');
+/// The characters that end a field, by their codes: the line's end, white space of the line's
+/// layout, whatever the locale, and others.
+using FieldEnds = std::array<bool, 256>;
+
+constexpr FieldEnds endsAt(std::string_view others) {
+    FieldEnds ends{};
+    ends[0] = ends[' '] = true;
+    for (unsigned character = '\t'; character <= '\r'; ++character) {
+        ends[character] = true;
+    }
+    for (const char character : others) {
+        ends[static_cast<unsigned char>(character)] = true;
+    }
+    return ends;
 }
 
-/// Copies a field's characters. Once `max` were copied one is skipped, and then copying goes on.
-class FieldCopy {
-public:
-    FieldCopy(char* out, unsigned int max, const char* limit)
-        : m_out(out), m_max(max), m_limit(limit) {}
-    void add(char character) {
-        if (m_max-- != 0 && m_out < m_limit) {
-            *m_out++ = character;
+constexpr FieldEnds systemEnds = endsAt("");
+constexpr FieldEnds sourceEnds = endsAt(":");
+
+/// Copies a field's characters and returns where the field ends. Once `max` were copied one is
+/// skipped, and then copying goes on, up to `limit`.
+char* copyField(char* out, char* text, unsigned int max, const char* limit, const FieldEnds& ends) {
+    const auto isEnd = [&ends](char character) {
+        return ends[static_cast<unsigned char>(character)];
+    };
+    const std::size_t room = std::min<std::size_t>(max, static_cast<std::size_t>(limit - out));
+    std::size_t length = 0;
+    for (; length < room; ++length) {
+        if (isEnd(text[length])) {
+            return text + length;
+        }
+        out[length] = text[length];
+    }
+    out += length;
+    text += length;
+    if (length == max && !isEnd(*text)) {
+        ++text;
+    }
+    for (; !isEnd(*text); ++text) {
+        if (out < limit) {
+            *out++ = *text;
         }
     }
-
-private:
-    char* m_out;
-    unsigned int m_max; ///< wraps around, after which it is no limit any more
-    const char* m_limit;
-};
+    return text;
+}
 
 } // namespace
 
@@ -117,14 +169,18 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
                          sizeof entry.entrysys, limit);
     text = extractSource(columns + offsetof(zrm_rmlogent_data_t, entrysrc), text,
                          sizeof entry.entrysrc, limit);
-    UTF8Conv::Convert_toUTF8(entry.uentrysrc, sizeof entry.uentrysrc, entry.entrysrc,
-                             sizeof entry.entrysrc, LOC2_NO_TERMINATOR);
+    // What was written last, the source, is read last: reading it back at once makes a processor
+    // wait.
     const std::size_t rest = std::strlen(text);
     const std::size_t length = std::min(rest > 0 ? rest - 1 : 0, sizeof entry.entrydesc);
     RowBytes::copy(entry.entrydesc, text, length);
-    UTF8Conv::Convert_toUTF8(entry.uentrydesc, sizeof entry.uentrydesc, text, length,
-                             LOC2_NO_TERMINATOR);
-    if (text - line > longestHeader) {
+    UTF8Conv::Convert_toUTF8(entry.uentrysrc, sizeof entry.uentrysrc, entry.entrysrc,
+                             sizeof entry.entrysrc, LOC2_NO_TERMINATOR);
+    const std::int32_t lengthInUTF8 = UTF8Conv::Convert_toUTF8(
+        entry.uentrydesc, sizeof entry.uentrydesc, text, length, LOC2_NO_TERMINATOR);
+    if (text - line <= shortHeader) {
+        noteDescriptions(&entry, length, lengthInUTF8);
+    } else if (text - line > longestHeader) {
         repairRow(&entry);
     }
     return trace.result(0L);
@@ -132,16 +188,18 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
 
 char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     TraceScope trace(anchor);
+    char now[stampLength];
+    BrevanTime::generateCurrentTimestamp(now); // its year counts while monitoring
     const bool isWhole = std::memchr(line, '\0', timeLength) == nullptr;
-    const unsigned month = isWhole ? monthNumber(line) : 0;
+    const unsigned month = isWhole ? monthNumber(line, twoDigits(now + yearLength)) : 0;
     if (month == 0) {
         return trace.result(line + std::strlen(line));
     }
+    std::memcpy(out, now, stampLength);
     const auto place = [out](std::size_t at, char tens, char units) {
         out[at] = tens;
         out[at + 1] = units;
     };
-    BrevanTime::generateCurrentTimestamp(out); // its year counts while monitoring
     place(3, static_cast<char>('0' + month / 10), static_cast<char>('0' + month % 10));
     place(5, line[4] == ' ' ? '0' : line[4], line[5]);
     place(7, line[7], line[8]);
@@ -155,14 +213,8 @@ char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
 
 char* SysLogFile::extractSystem(char* out, char* text, unsigned int max, const char* limit) {
     TraceScope trace(anchor);
-    FieldCopy field(out, max, limit);
-    for (; *text != '\0'; ++text) {
-        if (isSpace(*text)) {
-            return trace.result(text + 1);
-        }
-        field.add(*text);
-    }
-    return trace.result(text);
+    char* const end = copyField(out, text, max, limit, systemEnds);
+    return trace.result(*end != '\0' ? end + 1 : end);
 }
 
 char* SysLogFile::extractSource(char* out, char* text, unsigned int max, const char* limit) {
@@ -171,15 +223,9 @@ char* SysLogFile::extractSource(char* out, char* text, unsigned int max, const c
         std::strncmp(text, repeatNotice.data(), repeatNotice.size()) == 0) {
         return trace.result(text);
     }
-    FieldCopy field(out, max, limit);
-    for (; *text != '\0'; ++text) {
-        if (*text == ':') { // and the blank after it
-            return trace.result(text + (text[1] != '\0' ? 2 : 1));
-        }
-        if (isSpace(*text)) {
-            return trace.result(text + 1);
-        }
-        field.add(*text);
+    char* end = copyField(out, text, max, limit, sourceEnds);
+    if (*end == ':' && end[1] != '\0') {
+        ++end; // the blank after it
     }
-    return trace.result(text);
+    return trace.result(*end != '\0' ? end + 1 : end);
 }

@@ -139,7 +139,11 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     }
     UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
                              sizeof columns->entrysrc, LOC2_NO_TERMINATOR);
-    UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc, columns->entrydesc,
-                             sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
+    const std::int32_t lengthInUTF8 =
+        UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
+                                 columns->entrydesc, sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
+    const _FormatBuffer& description = *(std::end(buffers) - 1);
+    noteDescriptions(columns, static_cast<std::size_t>(description.position - columns->entrydesc),
+                     lengthInUTF8);
     return trace.result(0L);
 }

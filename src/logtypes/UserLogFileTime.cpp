@@ -27,18 +27,27 @@ bool isSpace(char character) {
     return character == ' ' || (character >= '\t' && character <= '\r');
 }
 
+bool isDigit(char character) {
+    return character >= '0' && character <= '9';
+}
+
 /// A text read as strtol reads it with base 10.
 struct Number {
     explicit Number(const char* text) : end(text) {
         const char* next = text;
-        while (isSpace(*next)) {
-            ++next;
+        bool isNegative = false;
+        if (!isDigit(*next)) {
+            while (isSpace(*next)) {
+                ++next;
+            }
+            isNegative = *next == '-';
+            next += isNegative || *next == '+' ? 1 : 0;
         }
-        const bool isNegative = *next == '-';
-        next += isNegative || *next == '+' ? 1 : 0;
-        for (; *next >= '0' && *next <= '9'; ++next) {
-            value = value * 10 + (*next - '0');
-            end = next + 1;
+        if (isDigit(*next)) {
+            for (; isDigit(*next); ++next) {
+                value = value * 10 + (*next - '0');
+            }
+            end = next;
         }
         value = isNegative ? -value : value;
         isWhole = end != text && *end == '\0';

@@ -234,17 +234,31 @@ void LogFile::prepareRow(zrm_rmlogent_data_t* row) {
     char* const columns = reinterpret_cast<char*>(row);
     if (row == &m_row && m_isRowPrepared) {
         constexpr std::size_t entry = offsetof(zrm_rmlogent_data_t, entrytime);
-        constexpr std::size_t entryEnd = offsetof(zrm_rmlogent_data_t, freqthresh);
+        constexpr std::size_t description = offsetof(zrm_rmlogent_data_t, entrydesc);
         constexpr std::size_t entryInUTF8 = offsetof(zrm_rmlogent_data_t, uentrysrc);
-        RowBytes::blank(columns + entry, entryEnd - entry);
-        RowBytes::blank(columns + entryInUTF8, sizeof *row - entryInUTF8);
+        constexpr std::size_t descriptionInUTF8 = offsetof(zrm_rmlogent_data_t, uentrydesc);
+        RowBytes::blank(columns + entry, description - entry + m_descriptionLength);
+        RowBytes::blank(columns + entryInUTF8,
+                        descriptionInUTF8 - entryInUTF8 + m_descriptionLengthInUTF8);
         fillChangingColumns(row);
-        return;
+    } else {
+        RowBytes::blank(columns, sizeof *row);
+        fillCommonColumns(row);
     }
-    RowBytes::blank(columns, sizeof *row);
-    fillCommonColumns(row);
     if (row == &m_row) {
         m_isRowPrepared = true;
+        m_descriptionLength = sizeof row->entrydesc;
+        m_descriptionLengthInUTF8 = sizeof row->uentrydesc;
+    }
+}
+
+void LogFile::noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t length,
+                               std::int32_t lengthInUTF8) noexcept {
+    if (row == &m_row) {
+        m_descriptionLength = std::min(length, sizeof row->entrydesc);
+        // A negative length is none that can be relied upon.
+        m_descriptionLengthInUTF8 =
+            std::min(static_cast<std::size_t>(lengthInUTF8), sizeof row->uentrydesc);
     }
 }
 

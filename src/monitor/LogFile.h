@@ -89,6 +89,11 @@ protected:
     /// Makes `row` blank but for the common columns. The log's own row has kept its common columns
     /// from the line before and costs less.
     void prepareRow(zrm_rmlogent_data_t* row);
+    /// Says that a built row has so many characters in ENTRYDESC and UENTRYDESC and no text that
+    /// ran out of its column, so that the row of the next entry is blanked no further. Without this
+    /// it is blanked to the ends of the columns.
+    void noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t length,
+                          std::int32_t lengthInUTF8) noexcept;
     /// Puts the common columns into a prepared row again, over a field that has run into them.
     void repairRow(zrm_rmlogent_data_t* row);
     /// Makes a prepared row all blank: its entry is rejected.
@@ -133,12 +138,15 @@ private:
     std::FILE* debugLogStream() const;
     void writeRecord(std::FILE* stream, const void* data1, unsigned long length1, const void* data2,
                      unsigned long length2);
+    void traceEntry() const;
 
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
     // The thread's.
     LineReader m_lineReader;
     zrm_rmlogent_data_t m_row{};
-    bool m_isRowPrepared = false; ///< m_row's common columns stand
+    bool m_isRowPrepared = false;        ///< m_row's common columns stand
+    std::size_t m_descriptionLength = 0; ///< characters of m_row's ENTRYDESC that may not be blank
+    std::size_t m_descriptionLengthInUTF8 = 0; ///< and of its UENTRYDESC
 };
 
 /// The monitoring thread's start routine; its argument is the LogFile.

@@ -64,41 +64,50 @@ std::FILE* LogFile::debugLogStream() const {
 
 void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const void* data2,
                               unsigned long length2) {
-    writeRecord(debugLogStream(), data1, length1, data2, length2);
+    if (std::FILE* const stream = debugLogStream()) {
+        writeRecord(stream, data1, length1, data2, length2);
+    } else {
+        traceEntry();
+    }
 }
 
-/// Without a stream only traces that the log has an entry.
+/// Traces that the log has an entry of which the debug log takes nothing: the usual case.
+void LogFile::traceEntry() const {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        trace.detail()("%s monitor detected event.", fileNameLocal());
+    }
+}
+
 void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long length1,
                           const void* data2, unsigned long length2) {
     TraceScope trace(anchor);
     int result = 0;
     int cause = 0;
-    if (stream != nullptr) {
-        lockDebugFile(fileNameLocal());
-        std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
-                     " <<<<<<<<<\n");
-        const auto write = [&](const void* data, unsigned long length) {
-            if (data == nullptr || length == 0 || result == -1) {
-                return;
-            }
-            if (writePiece(stream, data, length)) {
-                ++result;
-            } else {
-                cause = errno;
-                result = -1;
-            }
-        };
-        write(data1, length1);
-        write(data2, length2);
-        unlockDebugFile();
-    }
+    lockDebugFile(fileNameLocal());
+    std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
+                 " <<<<<<<<<\n");
+    const auto write = [&](const void* data, unsigned long length) {
+        if (data == nullptr || length == 0 || result == -1) {
+            return;
+        }
+        if (writePiece(stream, data, length)) {
+            ++result;
+        } else {
+            cause = errno;
+            result = -1;
+        }
+    };
+    write(data1, length1);
+    write(data2, length2);
+    unlockDebugFile();
     if (result == -1) {
         const ErrorText error(cause);
         trace.error()("Error writing %s entry to debug log.  errno = %d; %s", fileNameLocal(),
                       error.number(), error.text());
     } else if (result > 0) {
         trace.detail()("Record written to debug log for log %s.", fileNameLocal());
-    } else if (trace.isOn(TRC1_DETAIL)) { // the usual case
+    } else {
         trace.detail()("%s monitor detected event.", fileNameLocal());
     }
 }

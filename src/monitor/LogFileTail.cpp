@@ -144,9 +144,12 @@ long LogFile::readLog() {
             count(NumFormatErrors);
             m_ledger.noteRejected(line);
         }
-        std::FILE* const debugLog = debugLogStream();
-        writeRecord(debugLog, line, debugLog != nullptr ? std::strlen(line) : 0,
-                    isRow ? &m_row : nullptr, isRow ? sizeof m_row : 0);
+        if (std::FILE* const debugLog = debugLogStream()) {
+            writeRecord(debugLog, line, std::strlen(line), isRow ? &m_row : nullptr,
+                        isRow ? sizeof m_row : 0);
+        } else {
+            traceEntry();
+        }
     }
     if (m_lineReader.error() != 0) {
         const ErrorText error(m_lineReader.error());

@@ -29,7 +29,8 @@ LocaleCache toUTF8Locale;
 LocaleCache fromUTF8Locale;
 
 /// The locale's code page; 0, with a record whatever the trace level, when there is none.
-std::uint32_t localCodePage(const TraceScope& trace, LocaleCache& cache, const char* noCodePage) {
+inline std::uint32_t localCodePage(const TraceScope& trace, LocaleCache& cache,
+                                   const char* noCodePage) {
     LOC2_Locale* const locale = cache.get();
     if (locale == nullptr) {
         trace.always()("Locale returned null; no locale found.");
@@ -43,9 +44,9 @@ std::uint32_t localCodePage(const TraceScope& trace, LocaleCache& cache, const c
     return codePage;
 }
 
-std::int32_t translate(const TraceScope& trace, std::uint32_t targetCodePage, char* out,
-                       std::size_t outSize, std::uint32_t sourceCodePage, const char* in,
-                       std::size_t inLength, int flags) {
+inline std::int32_t translate(const TraceScope& trace, std::uint32_t targetCodePage, char* out,
+                              std::size_t outSize, std::uint32_t sourceCodePage, const char* in,
+                              std::size_t inLength, int flags) {
     std::uint32_t resultLength = 0;
     std::uint32_t status = 0;
     const std::int32_t bytesCopied = LOC2_TranslateString(

@@ -1,5 +1,6 @@
 #include "parser/PrintProgram.h"
 
+#include "parser/DigitPairs.h"
 #include "parser/DirectiveRules.h"
 
 #include <algorithm>
@@ -37,22 +38,27 @@ bool isInteger(Receiver receiver) {
 }
 
 constexpr std::size_t SMALL_LENGTH = 4;
-constexpr std::uint64_t SMALL = 10000; ///< the first number that is longer
 
-/// Prints a number of so few digits, for which there is room.
-inline void printSmall(std::uint32_t number, std::size_t width, char fill, _FormatBuffer& buffer) {
-    std::size_t length =
-        1U + (number >= 10 ? 1U : 0U) + (number >= 100 ? 1U : 0U) + (number >= 1000 ? 1U : 0U);
-    length = std::max(length, width);
-    char* next = buffer.position + length;
-    do {
-        *--next = static_cast<char>('0' + number % 10);
-        number /= 10;
-    } while (number != 0);
-    while (next != buffer.position) {
-        *--next = fill;
+/// Prints a number that is small and needs no padding, as the parts of a time do; false, with
+/// nothing printed, for others. There is room for SMALL_LENGTH characters.
+inline bool printSmall(std::uint32_t number, std::size_t width, _FormatBuffer& buffer) {
+    if (number < 10 && width <= 1) {
+        *buffer.position = static_cast<char>('0' + number);
+        buffer.advance(1);
+        return true;
     }
-    buffer.advance(length);
+    if (number >= 10 && number < 100 && width <= 2) {
+        DigitPairs::put(buffer.position, number);
+        buffer.advance(2);
+        return true;
+    }
+    if (number >= 1000 && number < 10000 && width <= SMALL_LENGTH) {
+        DigitPairs::put(buffer.position, number / 100);
+        DigitPairs::put(buffer.position + 2, number % 100);
+        buffer.advance(SMALL_LENGTH);
+        return true;
+    }
+    return false;
 }
 
 } // namespace
@@ -68,6 +74,8 @@ bool PrintProgram::compile(const char* directive, _DataType type) noexcept {
     m_prefixLength = conversion != nullptr ? static_cast<std::size_t>(conversion - directive)
                                            : std::strlen(directive);
     m_kind = conversion != nullptr ? classify(conversion + 1) : Kind::CONSTANT;
+    m_isBareInteger = m_kind == Kind::INTEGER && m_receiver == Receiver::INTEGER4 &&
+                      m_prefixLength + m_suffixLength == 0;
     return true;
 }
 
@@ -106,12 +114,17 @@ PrintProgram::Kind PrintProgram::classify(const char* conversion) noexcept {
 }
 
 bool PrintProgram::run(const void* value, _FormatBuffer& buffer) const noexcept {
+    // A negative number is a large one here.
+    if (m_isBareInteger && buffer.room >= static_cast<long>(SMALL_LENGTH) &&
+        printSmall(valueAt<std::uint32_t>(value), m_width, buffer)) {
+        return true;
+    }
+    return print(value, buffer);
+}
+
+bool PrintProgram::print(const void* value, _FormatBuffer& buffer) const noexcept {
     if (m_kind == Kind::LIBRARY) {
         return printByLibrary(value, buffer);
-    }
-    if (m_kind == Kind::INTEGER && m_prefixLength + m_suffixLength == 0) {
-        printInteger(value, buffer);
-        return true;
     }
     buffer.append(m_directive, m_prefixLength);
     switch (m_kind) {
@@ -140,11 +153,6 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
     auto magnitude = static_cast<std::uint64_t>(number);
     if (isNegative) {
         magnitude = 0 - magnitude;
-    }
-    if (!isNegative && magnitude < SMALL && m_width <= SMALL_LENGTH &&
-        buffer.room >= static_cast<long>(SMALL_LENGTH)) {
-        printSmall(static_cast<std::uint32_t>(magnitude), m_width, m_fill, buffer);
-        return;
     }
     std::size_t length = isNegative ? 2 : 1;
     for (std::uint64_t rest = magnitude; rest >= 10; rest /= 10) {

@@ -28,6 +28,7 @@ private:
     enum class Kind { CONSTANT, TEXT, CHARACTER, INTEGER, LIBRARY };
 
     Kind classify(const char* conversion) noexcept;
+    bool print(const void* value, _FormatBuffer& buffer) const noexcept;
     void printInteger(const void* value, _FormatBuffer& buffer) const noexcept;
     bool printByLibrary(const void* value, _FormatBuffer& buffer) const noexcept;
 
@@ -39,7 +40,8 @@ private:
     Receiver m_receiver = Receiver::TEXT;
     bool m_isSigned = false;
     char m_fill = ' ';
-    std::size_t m_width = 0; ///< minimum width of an integer
+    std::size_t m_width = 0;      ///< minimum width of an integer
+    bool m_isBareInteger = false; ///< of 32 bits, without text around it
 };
 
 #endif

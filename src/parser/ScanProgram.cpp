@@ -3,6 +3,7 @@
 #include "parser/DirectiveRules.h"
 #include "parser/FloatField.h"
 
+#include <algorithm>
 #include <climits>
 #include <cstring>
 #include <limits>
@@ -89,8 +90,9 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
     if (*m_literalEnd == '\0') {
         return;
     }
-    m_isOneCharacter =
-        m_literalEnd - m_literal == 1 && !isWhiteSpace(*m_literal) && *m_literal != '%';
+    const bool isOne = m_literalEnd - m_literal == 1;
+    m_isOneSpace = isOne && isWhiteSpace(*m_literal);
+    m_isOneCharacter = isOne && !m_isOneSpace;
     const char* point = nl_langinfo(RADIXCHAR);
     const std::size_t pointSize = std::strlen(point) + 1;
     if (*point != '\0' && pointSize <= sizeof m_decimalPoint) {
@@ -115,6 +117,8 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
                   : m_kind == Kind::TEXT && textWidth > 0 ? textWidth
                                                           : UINT_MAX;
     }
+    constexpr unsigned MOST_DIGITS = 9; // these fit into 32 bits of either sign
+    m_fewDigits = std::min(m_width, MOST_DIGITS);
     m_isCounted = CONSUMED_COUNT == position;
 }
 
@@ -194,19 +198,16 @@ const char* ScanProgram::compileSet(const char* set) noexcept {
 /// A few digits and nothing before them, which is what the numbers of most logs are; false, with
 /// nothing read, for everything else.
 inline bool ScanProgram::scanShortNumber(const char*& position, void* value) const noexcept {
-    constexpr unsigned MOST_DIGITS = 9; // these fit into 32 bits of either sign
+    const char* next = position;
+    const char* const limit = position + m_fewDigits;
     std::uint32_t number = 0;
-    unsigned count = 0;
-    for (; count < MOST_DIGITS && isDigit(position[count]); ++count) {
-        if (count == m_width) {
-            break;
-        }
-        number = number * 10 + static_cast<std::uint32_t>(position[count] - '0');
+    for (unsigned digit; next != limit && (digit = byteOf(*next) - unsigned{'0'}) < 10; ++next) {
+        number = number * 10 + digit;
     }
-    if (count == 0 || (count == MOST_DIGITS && count != m_width)) {
+    if (next == position || (next == limit && m_fewDigits != m_width)) {
         return false;
     }
-    position += count;
+    position = next;
     if (value != nullptr) {
         // Too small to meet the end of any range but that of the shortest, which cuts it.
         if (m_receiver == Receiver::INTEGER4) {
@@ -221,15 +222,36 @@ inline bool ScanProgram::scanShortNumber(const char*& position, void* value) con
 }
 
 int ScanProgram::run(const char* text, void* value) const noexcept {
+    if (m_kind == Kind::INTEGER && m_base == 10 && m_isCounted) {
+        const char* position = text;
+        if (skipShortLiteral(position) &&
+            scanShortNumber(position, m_isSuppressed ? nullptr : value)) {
+            return static_cast<int>(position - text);
+        }
+    }
+    return scan(text, value);
+}
+
+/// Skips leading text that is none, or one character that is there.
+inline bool ScanProgram::skipShortLiteral(const char*& position) const noexcept {
+    if (m_isOneCharacter) {
+        return *position++ == *m_literal;
+    }
+    if (m_isOneSpace) {
+        position = skipWhiteSpace(position);
+        return true;
+    }
+    return m_literal == m_literalEnd;
+}
+
+int ScanProgram::scan(const char* text, void* value) const noexcept {
     const char* position = text;
     Outcome outcome = matchLiteral(position);
     if (outcome == Outcome::MATCHED) {
         void* const receiver = m_isSuppressed ? nullptr : value;
         switch (m_kind) {
         case Kind::INTEGER:
-            if (m_base != 10 || !scanShortNumber(position, receiver)) {
-                outcome = scanInteger(position, receiver);
-            }
+            outcome = scanInteger(position, receiver);
             break;
         case Kind::FLOATING:
             outcome = scanFloating(position, receiver);

@@ -44,7 +44,9 @@ private:
 
     const char* compileConversion(const char* code, unsigned base) noexcept;
     const char* compileSet(const char* set) noexcept;
+    int scan(const char* text, void* value) const noexcept;
     Outcome matchLiteral(const char*& position) const noexcept;
+    bool skipShortLiteral(const char*& position) const noexcept;
     bool scanShortNumber(const char*& position, void* value) const noexcept;
     Outcome scanInteger(const char*& position, void* value) const noexcept;
     Outcome scanFloating(const char*& position, void* value) const noexcept;
@@ -58,6 +60,7 @@ private:
     const char* m_literal = nullptr; ///< the leading text, a '%' written twice
     const char* m_literalEnd = nullptr;
     bool m_isOneCharacter = false; ///< the leading text is, and it matches itself alone
+    bool m_isOneSpace = false;     ///< the leading text is one white space, which matches any
     Kind m_kind = Kind::NOTHING;
     Receiver m_receiver = Receiver::INTEGER4;
     bool m_isSuppressed = false;
@@ -66,6 +69,7 @@ private:
     bool m_skipsWhiteSpace = true;
     unsigned m_base = 10;             ///< of an integer; 0: its prefix says
     unsigned m_width = 0;             ///< most characters taken
+    unsigned m_fewDigits = 0;         ///< of a number that is read at once
     const bool* m_accepted = nullptr; ///< characters of a text, by their codes
     CharacterSet m_set{};             ///< the characters of a scan set
     bool m_isUntil = false;           ///< the set lacks one character alone, m_stop

@@ -37,15 +37,34 @@ unsigned zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t* rows, int count
 unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
     const TableLock lock(*this);
-    if (count != 1 || zrm_rmlogent_agent::isTraced()) {
+    if (count != 1 || areOffersTraced()) {
         return trace.result(offerRowsTo<zrm_rmlogent_base>(requests(), rows, count));
     }
     LinkedList& concerned = requestsFor(reinterpret_cast<char*>(rows), sizeof *rows);
-    const unsigned status = offerRowsTo<zrm_rmlogent_base>(concerned, rows, count);
+    void* const lastConcerned = concerned.Last();
+    unsigned status = 0;
+    if (lastConcerned != nullptr) {
+        status = offerRowsTo<zrm_rmlogent_base>(concerned, rows, count);
+    }
     // The row keeps the thresholds of the last request, whether that was passed over or not.
     void* const last = requests().Last();
-    if (last != concerned.Last()) {
+    if (last != lastConcerned) {
         static_cast<zrm_rmlogent_agent*>(static_cast<ctreq*>(last))->writeThresholds(rows, count);
     }
     return trace.result(status);
+}
+
+/// Whether the trace tells to which requests a row is offered. That is asked of several source
+/// files, so the answer is kept until a level changes, unless levels differ between threads: then
+/// no source file has learned one.
+bool zrm_rmlogent_manager::areOffersTraced() {
+    const unsigned generation = anchor.generation.load(std::memory_order_acquire);
+    if (generation != TRC1_Generation.load(std::memory_order_relaxed)) {
+        return zrm_rmlogent_agent::isTraced();
+    }
+    if (generation != m_traceGeneration) {
+        m_areOffersTraced = zrm_rmlogent_agent::isTraced();
+        m_traceGeneration = generation;
+    }
+    return m_areOffersTraced;
 }

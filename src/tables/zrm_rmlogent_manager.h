@@ -17,6 +17,13 @@ public:
     static unsigned EventArrived(zrm_rmlogent_data_t* rows, int count);
 
     unsigned AddDataToEvent(zrm_rmlogent_data_t* rows, int count);
+
+private:
+    bool areOffersTraced();
+
+    // Under the lock.
+    unsigned m_traceGeneration = 0; ///< of the trace levels that m_areOffersTraced follows
+    bool m_areOffersTraced = false;
 };
 
 /// Creates and registers the table's manager. Returns 0 or a framework status.

@@ -18,8 +18,8 @@ TEST(ColumnText, EndsAtTheFirstNulAndWithoutTrailingBlanks) {
 }
 
 TEST(ColumnText, FindsTheEndOfTheTextBehindAnyAmountOfPadding) {
-    for (std::size_t size = 0; size <= 40; ++size) {
-        for (std::size_t padding = 0; padding <= 40; ++padding) {
+    for (std::size_t size = 0; size <= 70; ++size) {
+        for (std::size_t padding = 0; padding <= 70; ++padding) {
             const std::string text = std::string(size, 'x');
             const std::string field = text + std::string(padding, ' ');
             EXPECT_EQ(ColumnText::unpadded(field.data(), field.size()), text);

@@ -20,11 +20,13 @@ struct Value {
 std::string printed(const std::string& directive, _DataType type, const Value& value, long room) {
     PrintProgram program;
     EXPECT_TRUE(program.compile(directive.c_str(), type));
-    std::string text(static_cast<std::size_t>(room), '#');
+    std::string text(static_cast<std::size_t>(room) + 8, '#');
     _FormatBuffer buffer{text.data(), room};
     EXPECT_TRUE(program.run(value.bytes, buffer));
     EXPECT_EQ(buffer.position, text.data() + (room - buffer.room));
-    text.resize(static_cast<std::size_t>(room - buffer.room));
+    const auto used = static_cast<std::size_t>(room - buffer.room);
+    EXPECT_EQ(text.find_first_not_of('#', used), text.npos) << "written behind the text";
+    text.resize(used);
     return text;
 }
 
@@ -147,6 +149,20 @@ TEST(PrintProgram, AgreesWithTheCLibrary) {
         ASSERT_EQ(printed(directive, type, value, room),
                   printedByLibrary(directive, type, value, room))
             << "case " << number << ": " << directive << " for type " << type << " in " << room;
+    }
+}
+
+TEST(PrintProgram, PrintsSmallNumbersAsTheCLibraryDoes) {
+    for (std::int32_t number = -20; number < 11000; ++number) {
+        Value value;
+        std::memcpy(value.bytes, &number, sizeof number);
+        for (const char* const directive : {"%d", "%1d", "%2d", "%02d", "%3d", "%04d", "%5d"}) {
+            for (const long room : {2L, 3L, 4L, 20L}) {
+                ASSERT_EQ(printed(directive, DATATYPE_INT, value, room),
+                          printedByLibrary(directive, DATATYPE_INT, value, room))
+                    << directive << " of " << number << " in " << room;
+            }
+        }
     }
 }
 

@@ -228,12 +228,15 @@ TEST_F(HostRequests, NobodyIsPassedOverWhereTheTraceWouldShowIt) {
                        m_receiver);
     const Request other(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "syslog")}),
                         m_receiver);
-    m_trace.setLevel(TRC1_FINE);
     arrive(rowOf("auth.log", 1));
+    m_trace.setLevel(TRC1_FINE);
+    arrive(rowOf("auth.log", 2));
     m_trace.setLevel(TRC1_ERROR);
+    arrive(rowOf("auth.log", 3));
     EXPECT_EQ(m_trace.count("Event passed to situation alpha for evaluation."), 2);
     EXPECT_EQ(m_trace.count("Passing row 0 to InsertRow()."), 1);
-    EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
+    EXPECT_THAT(m_receiver.received,
+                ElementsAre(std::pair(1, 0), std::pair(2, 0), std::pair(3, 0)));
     m_trace.clear();
 }
 

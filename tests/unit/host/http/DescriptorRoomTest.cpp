@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <fstream>
+#include <string>
 
 #include <sys/resource.h>
 
@@ -40,6 +42,27 @@ TEST(DescriptorRoom, LeavesTheLowDescriptorsToTheAgent) {
     EXPECT_EQ(room.count, 500u);
     EXPECT_EQ(room.lowest, 1024);
     EXPECT_GE(softLimit(), 1024u + 500u) << "the soft limit was raised";
+}
+
+/// Descriptors that the process's table has room for at present.
+int tableSize() {
+    std::ifstream status("/proc/self/status");
+    std::string word;
+    while (status >> word && word != "FDSize:") {
+    }
+    int size = 0;
+    status >> size;
+    return size;
+}
+
+TEST(DescriptorRoom, IsThereBeforeTheFirstClientComes) {
+    const auto inAProcessOfItsOwn = [] {
+        const bool wasSmall = tableSize() <= 1024;
+        const DescriptorRoom room = DescriptorRoom::make(500);
+        std::exit(wasSmall && tableSize() > room.lowest ? 0 : 1);
+    };
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_EXIT(inAProcessOfItsOwn(), testing::ExitedWithCode(0), "");
 }
 
 TEST(DescriptorRoom, TakesHalfOfTheFewThatThereAre) {

@@ -1,0 +1,130 @@
+// The row that a log keeps from line to line is, after each line, what a row made afresh is.
+
+#include "logtypes/AdminLogFile.h"
+
+#include "AccountingRecords.h"
+#include "SyslogTest.h"
+#include "UserLogTest.h"
+
+#include <gtest/gtest.h>
+
+#include <array>
+#include <random>
+#include <string>
+#include <string_view>
+
+namespace {
+
+class Members : public LogFile {
+public:
+    using LogFile::ownRow;
+};
+
+template <typename Log> zrm_rmlogent_data_t* ownRow(Log& log) {
+    return (static_cast<LogFile&>(log).*(&Members::ownRow))();
+}
+
+std::string_view bytesOf(const zrm_rmlogent_data_t& row) {
+    return {reinterpret_cast<const char*>(&row), sizeof row};
+}
+
+/// Formats the entry into the log's own row and into a fresh one, and compares all of their bytes.
+template <typename Log> void expectSameRow(Log& log, const std::string& entry) {
+    zrm_rmlogent_data_t fresh;
+    std::memset(&fresh, '#', sizeof fresh);
+    std::string text = entry;
+    const long result = log.formatEntryAsRow(text.data(), &fresh, nullptr);
+    text = entry;
+    EXPECT_EQ(log.formatEntryAsRow(text.data(), ownRow(log), nullptr), result) << entry;
+    EXPECT_EQ(bytesOf(*ownRow(log)), bytesOf(fresh)) << entry;
+}
+
+class Random {
+public:
+    explicit Random(unsigned seed) : m_engine(seed) {}
+    std::size_t upTo(std::size_t most) {
+        return std::uniform_int_distribution<std::size_t>(0, most)(m_engine);
+    }
+    /// A text of up to so many characters, of which a few are not ASCII.
+    std::string text(std::size_t most) {
+        std::string result(upTo(most), 'x');
+        for (char& character : result) {
+            const std::size_t kind = upTo(30);
+            character = static_cast<char>(kind == 0 ? 0x80 + upTo(0x7f) : 'a' + upTo(25));
+        }
+        return result;
+    }
+    template <std::size_t count> const char* oneOf(const char* const (&texts)[count]) {
+        return texts[upTo(count - 1)];
+    }
+
+private:
+    std::mt19937 m_engine;
+};
+
+std::string syslogLine(Random& random) {
+    static constexpr const char* stamps[] = {"Oct  5 11:59:59", "Dec 31 23:59:59",
+                                             "Jan 12 00:00:00", "Foo 12 00:00:00", "Oct  5 1"};
+    // Lengths below, at and beyond the columns' widths, and beyond all columns of an entry.
+    constexpr std::array<std::size_t, 5> lengths = {5, 31, 33, 90, 420};
+    const auto field = [&] { return random.text(lengths[random.upTo(random.upTo(4))]); };
+    std::string line = random.oneOf(stamps);
+    if (random.upTo(9) > 0) {
+        line += " " + field() + " ";
+        line += random.upTo(9) == 0 ? "last message repeated 3 times" : field() + ": ";
+        line += random.text(random.upTo(3) == 0 ? 400 : 40);
+    }
+    return line + "\n";
+}
+
+class OwnRowOfASyslog : public SyslogTest {};
+class OwnRowOfAUserLog : public UserLogTest {};
+
+TEST_F(OwnRowOfASyslog, IsThatOfAFreshRow) {
+    Random random(1);
+    for (int i = 0; i < 4000 && !HasFailure(); ++i) {
+        expectSameRow(*m_log, syslogLine(random));
+    }
+}
+
+TEST_F(OwnRowOfASyslog, IsThatOfAFreshRowWhenNothingCanBeConverted) {
+    Random random(2);
+    for (int i = 0; i < 400 && !HasFailure(); ++i) {
+        LocaleDouble::setCodePage(random.upTo(1) == 0 ? 0 : LocaleDouble::LATIN1);
+        expectSameRow(*m_log, syslogLine(random));
+    }
+    LocaleDouble::reset();
+}
+
+TEST_F(OwnRowOfAUserLog, IsThatOfAFreshRow) {
+    makeLog(R"(A,"%d %s %s %400[^\n]", day type source description)");
+    Random random(3);
+    for (int i = 0; i < 4000 && !HasFailure(); ++i) {
+        const std::string day = random.upTo(9) == 0 ? "no day" : std::to_string(random.upTo(40));
+        expectSameRow(*m_log, day + " " + random.text(20) + " " + random.text(50) + " " +
+                                  random.text(random.upTo(3) == 0 ? 500 : 40) + "\n");
+    }
+}
+
+TEST_F(OwnRowOfASyslog, OfAccountingRecordsIsThatOfAFreshRow) {
+    Random random(4);
+    const auto line = validLog(m_directory.write("wtmp", ""), " ;N ;A");
+    const Fault fault("open", EACCES);
+    AdminLogFile log(*line, nullptr);
+    while (log.monitorStatus() == MONITOR_RUNNING) {
+        std::this_thread::yield();
+    }
+    for (int i = 0; i < 1000 && !HasFailure(); ++i) {
+        const AccountingRecord record{.user = random.text(8),
+                                      .id = random.text(4),
+                                      .line = random.text(12),
+                                      .pid = static_cast<std::int16_t>(random.upTo(30000)),
+                                      .type = static_cast<std::int16_t>(random.upTo(10)),
+                                      .termination = static_cast<std::int16_t>(random.upTo(9)),
+                                      .exit = static_cast<std::int16_t>(random.upTo(255)),
+                                      .time = 1160049600};
+        expectSameRow(log, record.bytes());
+    }
+}
+
+} // namespace
