@@ -6,18 +6,24 @@
  *
  *     bench_baseline KIND FILE [OFFSET]    KIND is syslog, user or accounting;
  *                                          prints "LINES CPU_SECONDS WALL_SECONDS CHECKSUM"
+ *     bench_baseline idle FILE SECONDS     looks at the ends of a thousand descriptors of the file
+ *                                          once a second, with a thread for each; prints the same,
+ *                                          the looks in place of the lines
  */
 #include <fcntl.h>
+#include <pthread.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/resource.h>
+#include <sys/select.h>
 #include <time.h>
 #include <unistd.h>
 
 enum {
     BLOCK = 256 * 1024,
     RECORD = 40,
+    IDLE_LOGS = 1000,
     ROW = 2864,
     ENTRYTIME = 448,
     ENTRYSYS = 464,
@@ -34,6 +40,7 @@ typedef void (*fill_function)(const char* line, const char* end);
 static char block[BLOCK];
 static char row[ROW];
 static unsigned long checksum;
+static long looks;
 
 static void put(int offset, int width, const char* text, size_t length) {
     memcpy(row + offset, text, length < (size_t)width ? length : (size_t)width);
@@ -118,6 +125,46 @@ static double wall_time(void) {
     return (double)now.tv_sec + 1e-9 * (double)now.tv_nsec;
 }
 
+/* One idle log: its end is asked for once a second. */
+static void* look(void* path) {
+    const int descriptor = open((const char*)path, O_RDONLY);
+    for (;;) {
+        struct timeval second = {1, 0};
+        if (lseek(descriptor, 0, SEEK_END) < 0) {
+            return NULL;
+        }
+        __atomic_add_fetch(&looks, 1, __ATOMIC_RELAXED);
+        select(0, NULL, NULL, NULL, &second);
+    }
+}
+
+static double cpu_time(void) {
+    struct rusage usage;
+    getrusage(RUSAGE_SELF, &usage);
+    return (double)(usage.ru_utime.tv_sec + usage.ru_stime.tv_sec) +
+           1e-6 * (double)(usage.ru_utime.tv_usec + usage.ru_stime.tv_usec);
+}
+
+static int idle(char* path, unsigned seconds) {
+    double cpu, begin;
+    long before;
+    int thread;
+    for (thread = 0; thread < IDLE_LOGS; ++thread) {
+        pthread_t started;
+        if (pthread_create(&started, NULL, look, path) != 0) {
+            fputs("cannot start a thread\n", stderr);
+            return 1;
+        }
+    }
+    sleep(2);
+    before = looks;
+    cpu = cpu_time();
+    begin = wall_time();
+    sleep(seconds);
+    printf("%ld %.6f %.6f 0\n", looks - before, cpu_time() - cpu, wall_time() - begin);
+    return 0;
+}
+
 static fill_function fill_of(const char* kind) {
     if (strcmp(kind, "syslog") == 0) {
         return fill_from_syslog;
@@ -126,23 +173,23 @@ static fill_function fill_of(const char* kind) {
 }
 
 int main(int argc, char** argv) {
-    struct rusage usage;
     const int descriptor = argc >= 3 ? open(argv[2], O_RDONLY) : -1;
     double begin;
     long lines;
     if (descriptor == -1) {
-        fputs("usage: bench_baseline syslog|user|accounting FILE [OFFSET]\n", stderr);
+        fputs("usage: bench_baseline syslog|user|accounting FILE [OFFSET]\n"
+              "       bench_baseline idle FILE SECONDS\n",
+              stderr);
         return 2;
+    }
+    if (strcmp(argv[1], "idle") == 0) {
+        return idle(argv[2], argc > 3 ? (unsigned)atoi(argv[3]) : 10);
     }
     begin = wall_time();
     if (argc > 3) {
         lseek(descriptor, (off_t)atoll(argv[3]), SEEK_SET);
     }
     lines = read_lines(descriptor, fill_of(argv[1]), strcmp(argv[1], "accounting") == 0);
-    getrusage(RUSAGE_SELF, &usage);
-    printf("%ld %.6f %.6f %lu\n", lines,
-           (double)(usage.ru_utime.tv_sec + usage.ru_stime.tv_sec) +
-               1e-6 * (double)(usage.ru_utime.tv_usec + usage.ru_stime.tv_usec),
-           wall_time() - begin, checksum);
+    printf("%ld %.6f %.6f %lu\n", lines, cpu_time(), wall_time() - begin, checksum);
     return 0;
 }

@@ -178,11 +178,13 @@ def events(options):
     if options.wants(name):
         data = Data(options, "syslog", options.lines)
         runs = [events_run(options, data) for _ in range(options.runs)]
+        plain = statistics.median(data.baseline()["wall"] for _ in range(options.runs))
         yield {
             "case": name,
             "figure": data.count / median(runs, "wall"),
             "unit": "events/s",
             "target": 150_000,
+            "plain C": data.count / plain,
             **{key: median(runs, key) for key in ("cpu", "wall", "resident")},
         }
 
@@ -255,6 +257,11 @@ def idle_run(options, count, seconds):
             return agent.cpu() - cpu, agent.resident_kilobytes()
 
 
+def plain_idle_run(options, seconds):
+    with Workplace(options) as place:
+        return data_files.idle_baseline(options.agent, place.log("app.log"), seconds)
+
+
 def idle_logs(options):
     """CPU and memory of logs to which nothing is written."""
     count, seconds = options.idle_logs, 10
@@ -264,10 +271,12 @@ def idle_logs(options):
     runs = [idle_run(options, count, seconds) for _ in range(options.runs)]
     used = statistics.median(cpu for cpu, _ in runs)
     resident = statistics.median(kilobytes for _, kilobytes in runs)
+    plain = statistics.median(plain_idle_run(options, seconds) for _ in range(options.runs))
     yield {
         "case": f"{count} idle logs, CPU",
         "figure": 100 * used / seconds,
         "unit": "% of a core",
+        "plain C": 100 * plain * count / 1000 / seconds,
         "target": 1,
         "less": True,
         "cpu": used,
@@ -280,6 +289,9 @@ def idle_logs(options):
         "unit": "kB per log",
         "target": 60,
         "less": True,
+        "cpu": used,
+        "wall": float(seconds),
+        "resident": resident / 1024,
     }
 
 
@@ -287,10 +299,24 @@ def latency(options):
     """From the write of a line to its event on standard output."""
     if not options.wants("latency: write to event"):
         return
-    delays, pauses = [], random.Random(1)
+    runs = [latency_run(options, random.Random(run)) for run in range(options.runs)]
+    for key, target in (("median", 0.6), ("maximum", 1.1)):
+        yield {
+            "case": f"write to event, {options.latency_lines} lines, {key}",
+            "figure": median(runs, key),
+            "unit": "s",
+            "target": target,
+            "less": True,
+            **{key: median(runs, key) for key in ("cpu", "wall", "resident")},
+        }
+
+
+def latency_run(options, pauses):
+    delays = []
     with Workplace(options) as place:
         log = place.log("app.log")
         with place.agent([log], [{"name": "all", "log": str(log)}], history=True) as agent:
+            cpu, begin = agent.cpu(), time.monotonic()
             for number in range(options.latency_lines):
                 time.sleep(pauses.random())  # the writes fall all over the second of a poll
                 line = time.strftime(f"%b %e %H:%M:%S web1 app[1]: number {number}\n")
@@ -299,17 +325,13 @@ def latency(options):
                 written = time.monotonic()
                 agent.wait_events(number + 1)
                 delays.append(agent.last_event_time - written)
-    for name, figure, target in (
-        ("median", statistics.median(delays), 0.6),
-        ("maximum", max(delays), 1.1),
-    ):
-        yield {
-            "case": f"write to event, {len(delays)} lines, {name}",
-            "figure": figure,
-            "unit": "s",
-            "target": target,
-            "less": True,
-        }
+            return {
+                "median": statistics.median(delays),
+                "maximum": max(delays),
+                "cpu": agent.cpu() - cpu,
+                "wall": time.monotonic() - begin,
+                "resident": agent.resident_kilobytes() / 1024,
+            }
 
 
 ALL = [throughput, events, reports, idle_logs, latency]

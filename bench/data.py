@@ -38,6 +38,14 @@ class Data:
         return {"lines": int(fields[0]), "cpu": float(fields[1]), "wall": float(fields[2])}
 
 
+def idle_baseline(agent, log, seconds):
+    """CPU seconds of a thousand threads in plain C that look at the log's end once a second."""
+    program = Path(agent).parent / "bench_baseline"
+    command = [program, "idle", log, str(seconds)]
+    output = subprocess.run(command, check=True, capture_output=True, text=True).stdout
+    return float(output.split()[1])
+
+
 def initial_line(kind):
     """What a log holds before it grows."""
     if kind == "accounting":

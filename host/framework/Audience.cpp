@@ -43,16 +43,35 @@ LinkedList& Audience::of(char* row, std::size_t rowSize) {
     ++m_row;
     m_offered.store(m_offered.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
     m_chosen.Clear();
-    for (const std::uint32_t index : membersOf(row)) {
-        const Member& member = m_members[index];
-        std::uint64_t word;
-        std::memcpy(&word, row + member.offset, sizeof word);
-        if ((word & member.mask) == member.prefix && meetsChecks(member, row)) {
-            member.request->counts().countOffered();
-            m_chosen.Add(member.request);
-        }
+    findMet(row);
+    for (const std::uint32_t index : m_met) {
+        ctreq* const request = m_members[index].request;
+        request->counts().countOffered();
+        m_chosen.Add(request);
     }
     return m_chosen;
+}
+
+/// Finds the members whose beginning and checks the row meets, in their order in the list.
+void Audience::findMet(char* row) {
+    m_met.clear();
+    bool isSorted = true;
+    for (const Group& group : groupsOf(row)) {
+        std::uint64_t word;
+        std::memcpy(&word, row + group.beginning.offset, sizeof word);
+        if ((word & group.beginning.mask) != group.beginning.prefix) {
+            continue;
+        }
+        isSorted = isSorted && m_met.empty();
+        for (const std::uint32_t index : group.members) {
+            if (meetsChecks(m_members[index], row)) {
+                m_met.push_back(index);
+            }
+        }
+    }
+    if (!isSorted) {
+        std::sort(m_met.begin(), m_met.end());
+    }
 }
 
 bool Audience::meetsChecks(const Member& member, char* row) {
@@ -67,7 +86,7 @@ bool Audience::meetsChecks(const Member& member, char* row) {
     });
 }
 
-const Audience::Members& Audience::membersOf(char* row) {
+const Audience::Groups& Audience::groupsOf(char* row) {
     const Logs::value_type*& recent = m_recent[slotOf(row)];
     if (recent == nullptr || !isOf(row, recent->first)) {
         recent = &findLog(row);
@@ -100,7 +119,18 @@ const Audience::Logs::value_type& Audience::findLog(char* row) {
         m_logs.clear();
         m_recent.fill(nullptr);
     }
-    Members members;
+    return *m_logs.emplace(std::move(log), groupsThatMean(row)).first;
+}
+
+/// The members whose conditions on the log hold for a row of it.
+Audience::Groups Audience::groupsThatMean(char* row) {
+    Groups groups;
+    const auto groupOf = [&groups](const Beginning& beginning) -> Group& {
+        const auto found =
+            std::find_if(groups.begin(), groups.end(),
+                         [&beginning](const Group& group) { return group.beginning == beginning; });
+        return found != groups.end() ? *found : groups.emplace_back(Group{beginning, {}});
+    };
     auto condition = m_logConditions.begin();
     for (std::uint32_t index = 0; index < m_members.size(); ++index) {
         bool isMeant = true;
@@ -108,10 +138,10 @@ const Audience::Logs::value_type& Audience::findLog(char* row) {
             isMeant = isMeant && condition->second->holds(m_members[index].request, row);
         }
         if (isMeant) {
-            members.push_back(index);
+            groupOf(m_members[index].beginning).members.push_back(index);
         }
     }
-    return *m_logs.emplace(std::move(log), std::move(members)).first;
+    return groups;
 }
 
 void Audience::learnRequests(std::size_t rowSize) {
@@ -127,6 +157,7 @@ void Audience::learnRequests(std::size_t rowSize) {
         learnMember(*static_cast<ctreq*>(element), rowSize);
     }
     learnLogColumns();
+    m_met.reserve(m_members.size());
 }
 
 void Audience::learnMember(ctreq& request, std::size_t rowSize) {
@@ -148,11 +179,10 @@ void Audience::learnMember(ctreq& request, std::size_t rowSize) {
 
 void Audience::addCheck(const CompiledCondition& condition, Member& member, std::size_t rowSize) {
     const std::string_view prefix = condition.prefix();
-    if (member.mask == 0 && !prefix.empty() && condition.offset() + kWord <= rowSize) {
+    Beginning& beginning = member.beginning;
+    if (beginning.mask == 0 && !prefix.empty() && condition.offset() + kWord <= rowSize) {
         const std::size_t length = std::min({prefix.size(), kWord, condition.width()});
-        member.mask = maskOf(length);
-        member.prefix = wordOf(prefix, length);
-        member.offset = condition.offset();
+        beginning = {maskOf(length), wordOf(prefix, length), condition.offset()};
     }
     m_checks.push_back({&condition, textOf(condition)});
 }

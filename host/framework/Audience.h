@@ -19,7 +19,7 @@ class ctreq;
 /// offer it to each. Two things are used. The columns that name a log are the same in all rows of
 /// a log, so what the conditions on them say is found once per log and kept until the list of
 /// situations changes. And most other conditions are refused by the first bytes of a column, which
-/// are compared here side by side for all situations of the log.
+/// are compared here once for all situations of the log that want the same bytes there.
 ///
 /// Only conditions on character columns are looked at, since the table writes its integer columns
 /// for each situation anew. A situation that is left out would have refused the row; it counts the
@@ -42,12 +42,17 @@ private:
         const CompiledCondition* condition;
         std::size_t text; ///< index of its column in m_texts
     };
-    /// An open situation. It does not meet its conditions where the eight bytes at the offset,
-    /// masked, are not those of the prefix.
-    struct Member {
+    /// What situations want of a row before it is worth looking at more: that the eight bytes at
+    /// the offset, masked, are those of the prefix.
+    struct Beginning {
         std::uint64_t mask = 0;
         std::uint64_t prefix = 0;
         std::size_t offset = 0;
+        bool operator==(const Beginning&) const = default;
+    };
+    /// An open situation. It does not meet its conditions where its beginning is not met.
+    struct Member {
+        Beginning beginning;
         std::uint32_t firstCheck = 0; ///< in m_checks
         std::uint32_t checks = 0;
         ctreq* request = nullptr;
@@ -64,22 +69,30 @@ private:
         std::size_t begin;
         std::size_t end;
     };
-    using Members = std::vector<std::uint32_t>; ///< indexes of m_members
-    using Logs = std::unordered_map<std::string, Members>;
+    /// Situations of a log that share a beginning, in their order.
+    struct Group {
+        Beginning beginning;
+        std::vector<std::uint32_t> members; ///< indexes of m_members
+    };
+    using Groups = std::vector<Group>; ///< those of a log, of different beginnings
+    using Logs = std::unordered_map<std::string, Groups>;
 
     void learnRequests(std::size_t rowSize);
     void learnMember(ctreq& request, std::size_t rowSize);
     void addCheck(const CompiledCondition& condition, Member& member, std::size_t rowSize);
     std::size_t textOf(const CompiledCondition& condition);
     void learnLogColumns();
-    const Members& membersOf(char* row);
+    const Groups& groupsOf(char* row);
+    void findMet(char* row);
+    Groups groupsThatMean(char* row);
     bool isOf(const char* row, const std::string& log) const noexcept;
     const Logs::value_type& findLog(char* row);
     bool meetsChecks(const Member& member, char* row);
 
     LinkedList& m_requests;
     LinkedList m_chosen;
-    std::uint64_t m_generation = 0; ///< of the list when it was learnt; 0: never
+    std::vector<std::uint32_t> m_met; ///< members that the row may concern
+    std::uint64_t m_generation = 0;   ///< of the list when it was learnt; 0: never
     std::vector<Member> m_members;
     std::vector<Check> m_checks;
     std::vector<Text> m_texts;

@@ -99,6 +99,7 @@ void Timestamp::addToChain(Timestamp* head) {
     if (head == nullptr) {
         m_next = this;
         m_prev = this;
+        m_oldestLow = this;
     } else {
         Timestamp* const oldest = head->m_prev;
         m_next = head;
@@ -106,6 +107,16 @@ void Timestamp::addToChain(Timestamp* head) {
         oldest->m_next = this;
         head->m_prev = this;
         head->m_isHeadOfChain = false;
+
+        m_number = head->m_number + 1;
+        m_olderLow = head;
+        while (m_olderLow != nullptr && m_olderLow->m_eventTime >= m_eventTime) {
+            m_olderLow = m_olderLow->m_olderLow;
+        }
+        m_oldestLow = m_olderLow != nullptr ? head->m_oldestLow : this;
+        if (m_olderLow != nullptr) {
+            m_olderLow->m_newerLow = this;
+        }
     }
     m_isHeadOfChain = true;
 }
@@ -125,22 +136,34 @@ long Timestamp::countEvents(long period, std::int64_t now) {
         cutOff = 0;
     }
 
-    long count = 0;
-    Timestamp* cursor = this;
-    while (cursor->m_eventTime > cutOff) {
-        ++count;
-        cursor = cursor->m_next;
-        if (cursor == this) {
-            return trace.result(count);
-        }
+    Timestamp* const out = newestOut(cutOff);
+    if (out == nullptr) {
+        const Timestamp* const oldest = m_prev;
+        return trace.result(static_cast<long>(m_number - oldest->m_number + 1));
     }
-    if (cursor == this) {
-        cursor = m_next; // the head is never pruned
-    }
-    m_prev = cursor->m_prev;
-    m_prev->m_next = this;
-    if (cursor != this) {
-        delete cursor;
-    }
+    const auto count = static_cast<long>(m_number - out->m_number);
+    prune(*out);
     return trace.result(count);
+}
+
+/// On the head: the newest element that is not later than the cut-off; null when all are.
+Timestamp* Timestamp::newestOut(long cutOff) const {
+    Timestamp* out = nullptr;
+    for (Timestamp* low = m_oldestLow; low != nullptr && low->m_eventTime <= cutOff;
+         low = low->m_newerLow) {
+        out = low;
+    }
+    return out;
+}
+
+/// On the head: deletes this element and the older ones, but never the head.
+void Timestamp::prune(Timestamp& newestOut) {
+    m_oldestLow = &newestOut == this ? this : newestOut.m_newerLow;
+    m_oldestLow->m_olderLow = nullptr;
+    Timestamp* const first = &newestOut == this ? m_next : &newestOut;
+    m_prev = first->m_prev;
+    m_prev->m_next = this;
+    if (first != this) {
+        delete first;
+    }
 }

@@ -32,10 +32,22 @@ public:
     Timestamp* prev() const noexcept { return m_prev; }
 
 private:
+    Timestamp* newestOut(long cutOff) const;
+    void prune(Timestamp& newestOut);
+
     bool m_isHeadOfChain = false;
     std::int64_t m_eventTime = -1;
     Timestamp* m_next = nullptr; ///< the next older element; from the oldest back to the head
     Timestamp* m_prev = nullptr;
+
+    // Events need not come in the order of their times. The lows of a chain are its head and each
+    // element with an earlier time than all newer ones: the newest event that has left a period is
+    // one of them, and the others that have left it are the lows behind it. So a busy situation's
+    // events are counted without a walk over them.
+    std::int64_t m_number = 0;       ///< counts up from the oldest to the head
+    Timestamp* m_olderLow = nullptr; ///< of a low
+    Timestamp* m_newerLow = nullptr; ///< of a low
+    Timestamp* m_oldestLow = this;   ///< of the head
 };
 
 #endif

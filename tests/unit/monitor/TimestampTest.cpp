@@ -144,7 +144,7 @@ TEST_F(TimestampChain, CountingAgreesWithAPlainModel) {
     std::vector<long> model; // newest first
     long clock = now;
     for (int step = 0; step < 5000; ++step) {
-        m_clock.set(clock += static_cast<long>(random() % 4));
+        m_clock.set(clock += static_cast<long>(random() % 6) - 1); // set back now and then
         const long time = clock - static_cast<long>(random() % 20);
         add(time);
         model.insert(model.begin(), time);
@@ -161,6 +161,18 @@ TEST_F(TimestampChain, CountingAgreesWithAPlainModel) {
         }
         ASSERT_EQ(times(), model);
     }
+}
+
+TEST_F(TimestampChain, CountingABusyPeriodDoesNotWalkOverIt) {
+    constexpr long events = 200000; // a walk over them at each event would take minutes
+    for (long number = 1; number <= events; ++number) {
+        add(now - 5);
+        ASSERT_EQ(m_head->countEvents(10), number);
+    }
+    m_clock.set(now + 5);
+    add(now);
+    EXPECT_EQ(m_head->countEvents(10), 1);
+    EXPECT_THAT(times(), ElementsAre(now));
 }
 
 class TimestampText : public TimestampChain {
