@@ -25,8 +25,11 @@ TRC1_Anchor anchor{"SysLogFile.cpp"};
 constexpr std::string_view monthNames = "JanFebMarAprMayJunJulAugSepOctNovDec";
 
 constexpr std::uint32_t threeLetters(const char* text) {
-    return static_cast<unsigned char>(text[0]) | static_cast<unsigned char>(text[1]) << 8U |
-           static_cast<unsigned char>(text[2]) << 16U;
+    std::uint32_t letters = 0;
+    for (int at = 0; at < 3; ++at) {
+        letters = letters << 8U | static_cast<unsigned char>(text[at]);
+    }
+    return letters;
 }
 
 constexpr auto months = [] {
