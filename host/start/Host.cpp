@@ -128,6 +128,7 @@ void Host::reload() {
             say("%s", problem.c_str());
         }
         say("%s was not taken over; the situations go on as they were", m_file.path().c_str());
+        m_serving->noteUnusableConfig();
         return;
     }
     HostConfig& config = std::get<HostConfig>(result);

@@ -16,6 +16,7 @@
 #include "host/http/LogsResource.h"
 #include "host/http/ReportResource.h"
 #include "host/http/SampleResource.h"
+#include "host/metrics/ConfigMetrics.h"
 #include "host/metrics/DeliveryMetrics.h"
 #include "host/metrics/HttpMetrics.h"
 #include "host/metrics/LogMetrics.h"
@@ -75,6 +76,11 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
     addResources(entries);
 }
 
+void Serving::apply(const std::vector<SituationConfig>& situations) {
+    m_situations.apply(situations);
+    m_isConfigTakenOver.store(true);
+}
+
 void Serving::tick() {
     if (m_entries) {
         m_entries->tick(WallClock::now());
@@ -102,6 +108,7 @@ void Serving::addResources(TableManager& entries) {
 void Serving::addMetrics(const EventStream& stream) {
     auto metrics = std::make_unique<MetricsResource>();
     metrics->add(std::make_unique<ProcessMetrics>());
+    metrics->add(std::make_unique<ConfigMetrics>(m_isConfigTakenOver));
     metrics->add(std::make_unique<LogMetrics>());
     metrics->add(std::make_unique<SituationMetrics>(m_situations));
     metrics->add(std::make_unique<DeliveryMetrics>(m_delivery));

@@ -10,6 +10,7 @@
 #include "host/http/TableSampler.h"
 #include "host/situations/SituationSet.h"
 
+#include <atomic>
 #include <chrono>
 #include <memory>
 #include <optional>
@@ -37,7 +38,10 @@ public:
     void startHttp(const HostConfig& config);
 
     /// Exchanges the situations.
-    void apply(const std::vector<SituationConfig>& situations) { m_situations.apply(situations); }
+    void apply(const std::vector<SituationConfig>& situations);
+
+    /// The configuration file has changed and cannot be used as it is now. Any thread.
+    void noteUnusableConfig() noexcept { m_isConfigTakenOver.store(false); }
 
     /// What is done about once a second.
     void tick();
@@ -70,6 +74,7 @@ private:
     Delivery m_delivery;
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
+    std::atomic<bool> m_isConfigTakenOver{true};
     TableSampler m_sampler;
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP

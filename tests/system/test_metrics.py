@@ -116,6 +116,17 @@ def test_odd_names_of_logs_are_labels(agent):
     assert (linted.returncode, linted.stdout + linted.stderr) == (0, "")
 
 
+def test_a_configuration_that_cannot_be_taken_over_is_seen(agent, serving):
+    _, api = serving
+    successful = lambda: value(metrics(api), "zrm_config_last_reload_successful")
+    assert successful() == 1
+    usable = agent.zrm_toml.read_text(encoding="utf-8")
+    agent.zrm_toml.write_text("nonsense = 1\n" + usable, encoding="utf-8")
+    wait_until(lambda: successful() == 0, "the configuration to be refused")
+    agent.zrm_toml.write_text(usable + "# mended\n", encoding="utf-8")
+    wait_until(lambda: successful() == 1, "the configuration to be taken over")
+
+
 def test_metrics_need_the_token(serving):
     _, api = serving
     status, _, _ = api.request("GET", "/metrics", headers={"Authorization": None})
