@@ -1,0 +1,51 @@
+#include "host/config/ConfigFile.h"
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/situations/SituationBody.h"
+#include "host/situations/SituationJson.h"
+
+#include <cstdint>
+#include <cstdlib>
+#include <set>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+#include <nlohmann/json.hpp>
+
+// Any text of a situation in a configuration file gives situations whose definitions the API takes,
+// too, as the same situations, or problems that each name the file and a cure.
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    const std::string_view text(reinterpret_cast<const char*>(data), size);
+    const ConfigFile::Result result =
+        ConfigFile::parse("[[situation]]\n" + std::string(text), "zrm.toml");
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        for (const std::string& problem : *problems) {
+            if (!problem.starts_with("zrm.toml:") || problem.find("; ") == std::string::npos) {
+                std::abort();
+            }
+        }
+        if (problems->empty()) {
+            std::abort();
+        }
+        return 0;
+    }
+    std::set<std::string> names;
+    for (const SituationConfig& situation : std::get<HostConfig>(result).situations) {
+        if (!names.insert(situation.name).second) {
+            std::abort();
+        }
+        try {
+            const std::string body = SituationJson::text(SituationJson::definition(situation));
+            JsonFields fields(body);
+            if (SituationBody::situation(fields) != situation) {
+                std::abort();
+            }
+        } catch (const RequestRefused&) {
+            std::abort();
+        }
+    }
+    return 0;
+}
