@@ -32,13 +32,17 @@ constexpr std::uint32_t threeLetters(const char* text) {
     return letters;
 }
 
-constexpr auto months = [] {
-    std::array<std::uint32_t, monthNames.size() / 3> letters{};
-    for (std::size_t month = 0; month < letters.size(); ++month) {
+constexpr std::size_t monthCount = monthNames.size() / 3;
+
+constexpr std::array<std::uint32_t, monthCount> lettersOfMonths() {
+    std::array<std::uint32_t, monthCount> letters{};
+    for (std::size_t month = 0; month < monthCount; ++month) {
         letters[month] = threeLetters(monthNames.data() + 3 * month);
     }
     return letters;
-}();
+}
+
+constexpr auto months = lettersOfMonths();
 
 constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::size_t timeLength = 15; // Mmm dd hh:mm:ss

@@ -311,7 +311,7 @@ def test_a_report_runs_a_command_of_its_own_over_its_window(agent, log):
         "A924A5FC: SOFTWARE PROGRAM ABNORMALLY TERMINATED",
     ]
     assert [words for _, words in log.calls("report-calls")] == ["-s1005070306 -e1031235906"]
-    assert agent.trace("Report command errpt -s1005070306 -e1031235906 ( pid = ")
+    agent.wait_trace("Report command errpt -s1005070306 -e1031235906 ( pid = ")
     # The monitor's command goes on.
     assert not has_ended(log.calls()[0][0])
     assert agent.stop() == 0
@@ -325,9 +325,9 @@ def test_a_report_that_has_enough_ends_a_command_that_writes_for_ever(agent, log
     answer = Api(agent).report(log, "2006-10-05T07:03:09Z", "2006-10-31T23:59:59Z")
     assert len(answer["rows"]) == 50
     pid = log.calls("report-calls")[0][0]
-    assert has_ended(pid)
+    wait_until(lambda: has_ended(pid), f"the end of {pid}")
     how = "has terminated abnormally; signal number = 13"
-    assert agent.trace(f"( pid = {pid} ) for file {log} {how}")
+    agent.wait_trace(f"( pid = {pid} ) for file {log} {how}")
     assert agent.stop() == 0
 
 
@@ -344,8 +344,8 @@ def test_a_report_without_the_program_is_empty_and_hurts_nothing_else(agent, log
         f"{log}. errno = 2; No such file or directory.  Use the error number and message to "
         "investigate the failure.  Agent is terminating."
     )
-    assert len(agent.trace(message)) == 1
-    assert agent.trace("has terminated normally; exit status = 255")
+    agent.wait_trace("has terminated normally; exit status = 255")
+    assert len(agent.wait_trace(message)) == 1
     # The child did not run the agent's exit routine: the monitor's command is still there.
     log.append(OTHER)
     agent.wait_events(2)
