@@ -252,6 +252,7 @@ def idle_run(options, count, seconds):
     with Workplace(options) as place:
         logs = [place.log(f"app{i}.log") for i in range(count)]
         with place.agent(logs, situations(1, logs[0], NEVER)) as agent:
+            time.sleep(3)  # the samples that the start takes are over: what follows are the polls
             cpu = agent.cpu()
             time.sleep(seconds)
             return agent.cpu() - cpu, agent.resident_kilobytes()

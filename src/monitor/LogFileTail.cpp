@@ -57,16 +57,18 @@ void LogFile::closeLog() {
 
 void LogFile::waitForEventLoop(timeval interval) {
     TraceScope trace(anchor);
-    fd_set none;
-    FD_ZERO(&none);
+    // A wait on no descriptors leaves the empty sets empty.
+    fd_set readable;
+    fd_set writable;
+    fd_set exceptional;
+    FD_ZERO(&readable);
+    FD_ZERO(&writable);
+    FD_ZERO(&exceptional);
     while (monitorStatus() == MONITOR_RUNNING) {
         if (!checkForChange()) {
             return;
         }
         timeval timeOut = interval;
-        fd_set readable = none;
-        fd_set writable = none;
-        fd_set exceptional = none;
         if (select(0, &readable, &writable, &exceptional, &timeOut) < 0 && errno != EINTR) {
             const ErrorText error(errno);
             trace.error()("Error occurred while waiting for data for file %s; errno = %d; %s",
