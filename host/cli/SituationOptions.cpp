@@ -41,8 +41,12 @@ Json SituationOptions::subject(const std::string& name, const std::string& file)
     if (name.empty() == file.empty()) {
         throw CliError(CLI_USAGE, "name either a situation or --file");
     }
-    return file.empty() ? Json{{"situation", name}}
-                        : Json{{"definition", withoutState(fileContent(file))}};
+    if (file.empty()) {
+        return {{"situation", name}};
+    }
+    // Before the list begins: what throws within one is not always cleared away.
+    Json definition = withoutState(fileContent(file));
+    return {{"definition", std::move(definition)}};
 }
 
 void SituationOptions::addTo(CLI::App& command) {

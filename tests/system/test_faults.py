@@ -85,6 +85,7 @@ def test_a_sink_file_that_is_moved_away_is_opened_anew(agent):
         return agent.sink.exists()
 
     wait_until(made_anew, "a new file")
+    wait_until(lambda: f'"later {count}"' in agent.sink.read_text(), "the last event")
     assert agent.stop() == 0
     everything = moved.read_bytes() + agent.sink.read_bytes()
     assert descriptions(map(json.loads, everything.splitlines())) == [

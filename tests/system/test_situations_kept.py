@@ -1,5 +1,6 @@
 """Situations of the file and of the API: kept over restarts, kills and damage, changed under load."""
 
+import http.client
 import json
 import os
 import random
@@ -174,10 +175,8 @@ def test_an_agent_killed_while_it_saves_keeps_what_it_answered(agent):
                 try:
                     if api.send("POST", SITUATIONS, {"name": name})[0] == 201:
                         answered.add(name)
-                except OSError:
-                    break
-                except ValueError:
-                    break
+                except (OSError, ValueError, http.client.HTTPException):
+                    break  # the agent was killed before, while or after it read or answered
             stopped.set()
 
         maker = threading.Thread(target=make, args=(f"round{attempt}",))

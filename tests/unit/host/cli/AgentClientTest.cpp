@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <mutex>
 
 #include <nlohmann/json.hpp>
 
@@ -46,10 +47,16 @@ protected:
 } // namespace
 
 TEST_F(AgentClientTest, SendsTokenQueryAndBody) {
-    Request seen;
+    std::mutex mutex; // the server answers on any of its threads
+    Request last;
     const auto see = [&](const Request& request, Response& response) {
-        seen = request;
+        const std::lock_guard guard(mutex);
+        last = request;
         response.set_content(R"({"b":1,"a":2})", "application/json");
+    };
+    const auto seen = [&] {
+        const std::lock_guard guard(mutex);
+        return last;
     };
     agent.routes().Get("/events", see);
     agent.routes().Put("/trace", see);
@@ -57,12 +64,12 @@ TEST_F(AgentClientTest, SendsTokenQueryAndBody) {
     AgentClient client(agent.connection());
     const auto got = client.get("/events", {{"log", "/var/log/a b&c=d+e.log"}, {"log", "/x"}});
     EXPECT_EQ(got.dump(), R"({"b":1,"a":2})");
-    EXPECT_EQ(seen.get_header_value("Authorization"), "Bearer the-token");
-    EXPECT_EQ(seen.get_param_value_count("log"), 2u);
-    EXPECT_EQ(seen.get_param_value("log", 0), "/var/log/a b&c=d+e.log");
+    EXPECT_EQ(seen().get_header_value("Authorization"), "Bearer the-token");
+    EXPECT_EQ(seen().get_param_value_count("log"), 2u);
+    EXPECT_EQ(seen().get_param_value("log", 0), "/var/log/a b&c=d+e.log");
     client.send("PUT", "/trace", {{"levels", "error"}});
-    EXPECT_EQ(seen.body, R"({"levels":"error"})");
-    EXPECT_EQ(seen.get_header_value("Content-Type"), "application/json");
+    EXPECT_EQ(seen().body, R"({"levels":"error"})");
+    EXPECT_EQ(seen().get_header_value("Content-Type"), "application/json");
 }
 
 TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
