@@ -2,6 +2,7 @@
 #define ZRM_HOST_HTTP_REQUEST_H
 
 #include <map>
+#include <stop_token>
 #include <string>
 #include <vector>
 
@@ -14,6 +15,9 @@ struct HttpRequest {
     std::string body;                              ///< empty, or sent as application/json
     std::string lastEventId;                       ///< header Last-Event-ID, empty without
     std::string accept;                            ///< header Accept, empty without
+    /// Once it is requested, nobody needs the answer: long work ends early. A token without a state
+    /// is never requested.
+    std::stop_token cancelled;
 };
 
 #endif
