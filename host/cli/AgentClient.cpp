@@ -3,19 +3,30 @@
 #include "host/cli/CliError.h"
 #include "host/cli/InputFile.h"
 #include "host/cli/JsonText.h"
+#include "host/client/HttpClient.h"
 
+#include <chrono>
+#include <cstddef>
+#include <optional>
+#include <stop_token>
 #include <utility>
+#include <vector>
 
-#include <httplib.h>
 #include <nlohmann/json.hpp>
 
 namespace {
 
+using namespace std::chrono_literals;
 using Json = AgentClient::Json;
+using Outcome = HttpClientAnswer::Outcome;
 
-constexpr std::chrono::seconds connectTimeout{5};
-constexpr std::chrono::seconds answerTimeout{120}; ///< a report waits for a refresh
-constexpr std::chrono::seconds streamTimeout{45};  ///< three keep-alive comments are missing
+/// A report waits for a refresh, and reads a log that may be large.
+constexpr HttpLimits answerLimits{.connect = 5s, .head = 120s, .whole = 900s, .silence = 120s};
+/// Three keep-alive comments are missing.
+constexpr HttpLimits streamLimits{.connect = 5s, .head = 45s, .whole = 0s, .silence = 45s};
+
+constexpr std::size_t longestAnswer = 256 * 1024 * 1024; ///< bytes
+constexpr std::size_t longestProblem = 64 * 1024;        ///< bytes
 
 bool isSuccess(int status) {
     return status >= 200 && status < 300;
@@ -30,96 +41,157 @@ std::string withQuery(const std::string& path, const AgentClient::Query& query) 
     return text;
 }
 
+HttpUrl serverOf(const AgentAccess& access) {
+    const std::optional<HttpUrl> url = HttpUrl::parse(access.url);
+    if (!url) {
+        throw CliError(CLI_USAGE, "'" + access.url +
+                                      "' is not the address of an agent; write it "
+                                      "as https://HOST:PORT");
+    }
+    return *url;
+}
+
+/// The agent's own certificate may be signed by itself, or by an authority of its owner's.
+std::string authoritiesOf(const AgentAccess& access) {
+    std::string all;
+    for (const std::string& file : access.authorities) {
+        const std::string text = InputFile(file).text();
+        if (text.find("CERTIFICATE-----") == std::string::npos) {
+            throw CliError(CLI_USAGE, file + " holds no certificate in PEM");
+        }
+        all += text + '\n';
+    }
+    return all;
+}
+
 } // namespace
 
 class AgentClient::Implementation {
 public:
     explicit Implementation(AgentAccess access)
-        : m_access(std::move(access)), m_client(m_access.url) {
-        m_client.set_connection_timeout(connectTimeout);
-        m_client.set_read_timeout(answerTimeout);
-        m_client.set_bearer_token_auth(m_access.token);
-        trustAuthorities();
-    }
+        : m_access(std::move(access)),
+          m_client({serverOf(m_access), "", authoritiesOf(m_access), "zrmctl"}) {}
 
-    httplib::Client& client() { return m_client; }
+    void stop() { m_stop.request_stop(); }
 
-    Json answer(const httplib::Result& result) const {
-        if (!result) {
-            throw unreachable(result.error());
-        }
-        if (!isSuccess(result->status)) {
-            throw refused(result->status, result->body);
-        }
-        if (result->body.empty()) {
-            return {};
-        }
-        Json body = Json::parse(result->body, nullptr, false);
-        if (!body.is_object()) {
-            throw CliError(CLI_UNREACHABLE, "what answers at " + m_access.url +
-                                                " is no zrmagent: its answer is no JSON object");
-        }
-        return body;
-    }
-
-    CliError unreachable(httplib::Error error) const {
-        const std::string agent = "the agent at " + m_access.url;
-        switch (error) {
-        case httplib::Error::Connection:
-            return {CLI_UNREACHABLE, "cannot reach " + agent +
-                                         ": is zrmagent running? (systemctl status zrmagent; "
-                                         "another address: --url or --config)"};
-        case httplib::Error::SSLConnection:
-        case httplib::Error::SSLServerVerification:
-        case httplib::Error::SSLLoadingCerts:
-            return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts for "
-                                             "this address: name the file of its authority, or of "
-                                             "the certificate itself, with --ca-file"};
-        case httplib::Error::Read:
-            return {CLI_UNREACHABLE, agent + " did not answer: it ended, or it is too busy"};
-        default:
-            return {CLI_UNREACHABLE,
-                    "the connection to " + agent + " failed: " + httplib::to_string(error)};
-        }
-    }
-
-    CliError refused(int status, const std::string& body) const {
-        if (status == 401) {
-            return {CLI_FORBIDDEN, "the agent at " + m_access.url +
-                                       " does not accept the token of " + m_access.tokenSource +
-                                       ": name the agent's own with --token-file or --config"};
-        }
-        const Json problem = Json::parse(body, nullptr, false);
-        std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
-        if (text.empty()) {
-            text =
-                "the agent at " + m_access.url + " answered with status " + std::to_string(status);
-        }
-        const std::string field = problem.is_discarded() ? "" : JsonText::text(problem, "field");
-        constexpr int unavailable = 503;
-        return {status == unavailable ? CLI_UNREACHABLE : CLI_REFUSED,
-                field.empty() ? text : field + ": " + text};
-    }
+    Json ask(HttpClientRequest request);
+    void stream(HttpClientRequest request, const std::function<void(std::string_view)>& receiver);
 
 private:
-    /// The agent's own certificate may be signed by itself, or by an authority of the house.
-    void trustAuthorities() {
-        SSL_CTX* const tls = m_client.ssl_context();
-        if (tls == nullptr || m_access.authorities.empty()) {
-            return;
-        }
-        for (const std::string& file : m_access.authorities) {
-            InputFile(file).text(); // tells why it cannot be read, which OpenSSL does not
-            if (SSL_CTX_load_verify_locations(tls, file.c_str(), nullptr) != 1) {
-                throw CliError(CLI_USAGE, file + " holds no certificate in PEM");
-            }
-        }
-        X509_STORE_set_flags(SSL_CTX_get_cert_store(tls), X509_V_FLAG_PARTIAL_CHAIN);
-    }
+    HttpClientAnswer send(HttpClientRequest& request);
+    CliError unreachable(const HttpClientAnswer& answer) const;
+    CliError refused(int status, const std::string& body) const;
+    CliError foreign(const std::string& why) const;
 
     const AgentAccess m_access;
-    httplib::Client m_client;
+    HttpClient m_client;
+    std::stop_source m_stop;
 };
+
+HttpClientAnswer AgentClient::Implementation::send(HttpClientRequest& request) {
+    request.headers.push_back("Authorization: Bearer " + m_access.token);
+    if (request.body != nullptr && !request.body->empty()) {
+        request.headers.emplace_back("Content-Type: application/json");
+    }
+    HttpClientAnswer answer = m_client.send(request, m_stop.get_token());
+    const bool isStopped = answer.outcome == Outcome::stopped;
+    if (answer.status == 0 && !isStopped) {
+        throw unreachable(answer);
+    }
+    return answer;
+}
+
+Json AgentClient::Implementation::ask(HttpClientRequest request) {
+    std::string body;
+    bool isTooLong = false;
+    request.limits = answerLimits;
+    request.receive = [&](int status, std::string_view piece) {
+        isTooLong =
+            piece.size() + body.size() > (isSuccess(status) ? longestAnswer : longestProblem);
+        body += isTooLong ? "" : piece;
+        return !isTooLong;
+    };
+    const HttpClientAnswer answer = send(request);
+    if (isTooLong) {
+        throw foreign("its answer does not end");
+    }
+    if (answer.outcome != Outcome::whole) {
+        throw unreachable(answer);
+    }
+    if (!isSuccess(answer.status)) {
+        throw refused(answer.status, body);
+    }
+    if (body.empty()) {
+        return {};
+    }
+    Json document = JsonText::parse(body);
+    if (!document.is_object()) {
+        throw foreign("its answer is no JSON object");
+    }
+    return document;
+}
+
+void AgentClient::Implementation::stream(HttpClientRequest request,
+                                         const std::function<void(std::string_view)>& receiver) {
+    std::string problem;
+    request.limits = streamLimits;
+    request.receive = [&](int status, std::string_view piece) {
+        if (isSuccess(status)) {
+            receiver(piece);
+            return true;
+        }
+        problem += piece.substr(0, longestProblem - problem.size());
+        return problem.size() < longestProblem;
+    };
+    const HttpClientAnswer answer = send(request);
+    if (answer.status != 0 && !isSuccess(answer.status)) {
+        throw refused(answer.status, problem);
+    }
+}
+
+CliError AgentClient::Implementation::unreachable(const HttpClientAnswer& answer) const {
+    const std::string agent = "the agent at " + m_access.url;
+    switch (answer.outcome) {
+    case Outcome::unreachable:
+    case Outcome::unknownName:
+        return {CLI_UNREACHABLE, "cannot reach " + agent +
+                                     ": is zrmagent running? (systemctl status zrmagent; "
+                                     "another address: --url or --config)"};
+    case Outcome::untrusted:
+    case Outcome::noTls:
+    case Outcome::noAuthorities:
+        return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts for "
+                                         "this address: name the file of its authority, or of "
+                                         "the certificate itself, with --ca-file"};
+    case Outcome::notHttp:
+        return foreign("its answer is not HTTP");
+    case Outcome::failed:
+        return {CLI_UNREACHABLE, "the connection to " + agent + " failed: " + answer.detail};
+    default:
+        return {CLI_UNREACHABLE, agent + " did not answer: it ended, or it is too busy"};
+    }
+}
+
+CliError AgentClient::Implementation::refused(int status, const std::string& body) const {
+    if (status == 401) {
+        return {CLI_FORBIDDEN, "the agent at " + m_access.url + " does not accept the token of " +
+                                   m_access.tokenSource +
+                                   ": name the agent's own with --token-file or --config"};
+    }
+    const Json problem = JsonText::parse(body);
+    std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
+    if (text.empty()) {
+        text = "the agent at " + m_access.url + " answered with status " + std::to_string(status);
+    }
+    const std::string field = problem.is_discarded() ? "" : JsonText::text(problem, "field");
+    constexpr int unavailable = 503;
+    return {status == unavailable ? CLI_UNREACHABLE : CLI_REFUSED,
+            field.empty() ? text : field + ": " + text};
+}
+
+CliError AgentClient::Implementation::foreign(const std::string& why) const {
+    return {CLI_UNREACHABLE, "what answers at " + m_access.url + " is no zrmagent: " + why};
+}
 
 AgentClient::AgentClient(AgentAccess access)
     : m_implementation(std::make_unique<Implementation>(std::move(access))) {}
@@ -127,57 +199,31 @@ AgentClient::AgentClient(AgentAccess access)
 AgentClient::~AgentClient() = default;
 
 Json AgentClient::get(const std::string& path, const Query& query) {
-    return m_implementation->answer(m_implementation->client().Get(withQuery(path, query)));
+    return m_implementation->ask({.method = "GET", .target = withQuery(path, query)});
 }
 
 Json AgentClient::send(const std::string& method, const std::string& path, const Json& body) {
-    httplib::Request request;
-    request.method = method;
-    request.path = path;
+    std::string text;
     if (!body.is_null()) {
         try {
-            request.body = body.dump();
+            text = body.dump();
         } catch (const Json::type_error&) {
             throw CliError(CLI_USAGE, "the command line, or the file that it names, is not valid "
                                       "UTF-8, as the agent's API wants it");
         }
-        request.set_header("Content-Type", "application/json");
     }
-    return m_implementation->answer(m_implementation->client().send(request));
+    const bool hasBody = method != "DELETE" || !text.empty();
+    return m_implementation->ask(
+        {.method = method, .target = path, .body = hasBody ? &text : nullptr});
 }
 
 void AgentClient::stream(const std::string& path, const Query& query,
                          const std::function<void(std::string_view)>& receiver) {
-    httplib::Client& client = m_implementation->client();
-    client.set_read_timeout(streamTimeout);
-    int status = 0;
-    std::string problem;
-    const httplib::Result result = client.Get(
-        withQuery(path, query),
-        [&](const httplib::Response& response) {
-            status = response.status;
-            return !m_isStopped; // stop may have come before there was a connection
-        },
-        [&](const char* data, std::size_t size) {
-            if (isSuccess(status)) {
-                receiver({data, size});
-            } else {
-                problem.append(data, size);
-            }
-            return true;
-        });
-    client.set_read_timeout(answerTimeout);
-    if (status == 0) {
-        throw m_implementation->unreachable(result.error());
-    }
-    if (!isSuccess(status)) {
-        throw m_implementation->refused(status, problem);
-    }
+    m_implementation->stream({.method = "GET", .target = withQuery(path, query)}, receiver);
 }
 
 void AgentClient::stop() {
-    m_isStopped = true;
-    m_implementation->client().stop();
+    m_implementation->stop();
 }
 
 std::string AgentClient::pathPart(std::string_view text) {

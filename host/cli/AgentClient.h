@@ -3,7 +3,6 @@
 
 #include "host/cli/AgentAccess.h"
 
-#include <atomic>
 #include <functional>
 #include <map>
 #include <memory>
@@ -32,7 +31,7 @@ public:
     /// after stop; throws CliError when it does not begin.
     void stream(const std::string& path, const Query& query,
                 const std::function<void(std::string_view)>& receiver);
-    /// Ends a request under way; a stream that begins later ends with its first piece. Any thread.
+    /// Ends a request under way, and every later one before it begins. Any thread.
     void stop();
 
     /// A text as one part of a path: everything but letters, digits, '-', '.', '_' and '~' as
@@ -42,7 +41,6 @@ public:
 private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;
-    std::atomic<bool> m_isStopped{false};
 };
 
 #endif

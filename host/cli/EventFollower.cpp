@@ -45,7 +45,7 @@ void EventFollower::follow(std::uint64_t after, const Receiver& receiver) {
 bool EventFollower::connect(const Receiver& receiver) {
     bool hasReceived = false;
     SseParser parser([&](const std::string& data) {
-        const Json event = Json::parse(data, nullptr, false);
+        const Json event = JsonText::parse(data);
         const std::uint64_t id = event.is_discarded() ? 0 : JsonText::number(event, "id");
         if (id > m_last) {
             receiver(event);

@@ -2,6 +2,32 @@
 
 #include <nlohmann/json.hpp>
 
+namespace {
+
+constexpr int deepestNesting = 64;
+
+bool isShallow(std::string_view text) {
+    int depth = 0;
+    bool isInString = false;
+    for (std::size_t at = 0; at < text.size() && depth <= deepestNesting; ++at) {
+        const char c = text[at];
+        if (c == '"') {
+            isInString = !isInString;
+        } else if (isInString) {
+            at += c == '\\' ? 1 : 0;
+        } else {
+            depth += c == '[' || c == '{' ? 1 : c == ']' || c == '}' ? -1 : 0;
+        }
+    }
+    return depth <= deepestNesting;
+}
+
+} // namespace
+
+JsonText::Json JsonText::parse(std::string_view text) {
+    return isShallow(text) ? Json::parse(text, nullptr, false) : Json(Json::value_t::discarded);
+}
+
 std::string JsonText::dump(const Json& value, bool onOneLine) {
     const std::string text =
         value.dump(onOneLine ? -1 : 2, ' ', false, nlohmann::json::error_handler_t::replace);

@@ -12,6 +12,10 @@ class JsonText {
 public:
     using Json = nlohmann::ordered_json;
 
+    /// Reads a text; a discarded value when it is not JSON, or is nested more deeply than anything
+    /// that the agent says: writing such a value takes stack with each level.
+    static Json parse(std::string_view text);
+
     /// JSON text in which no character could steer a terminal; on one line or over several.
     static std::string dump(const Json& value, bool onOneLine);
 

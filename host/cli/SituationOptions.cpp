@@ -2,6 +2,7 @@
 
 #include "host/cli/CliError.h"
 #include "host/cli/InputFile.h"
+#include "host/cli/JsonText.h"
 
 #include <algorithm>
 #include <iterator>
@@ -15,7 +16,7 @@ namespace {
 using Json = SituationOptions::Json;
 
 Json fileContent(const std::string& path) {
-    Json value = Json::parse(InputFile(path).text(), nullptr, false);
+    Json value = JsonText::parse(InputFile(path).text());
     if (!value.is_object()) {
         throw CliError(CLI_USAGE, "--file: " + path +
                                       " holds no JSON object; 'zrmctl situations show NAME "

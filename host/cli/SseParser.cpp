@@ -1,10 +1,22 @@
 #include "host/cli/SseParser.h"
 
+#include "host/cli/CliError.h"
+
 #include <utility>
+
+namespace {
+
+constexpr std::size_t longestEvent = 1024 * 1024; ///< bytes
+
+} // namespace
 
 SseParser::SseParser(Receiver receiver) : m_receiver(std::move(receiver)) {}
 
 void SseParser::take(std::string_view piece) {
+    if (m_line.size() + m_data.size() + piece.size() > longestEvent) {
+        throw CliError(CLI_UNREACHABLE, "what answers is no zrmagent: an event of its stream is "
+                                        "longer than 1 MB");
+    }
     for (std::size_t end = piece.find('\n'); end != std::string_view::npos;
          end = piece.find('\n')) {
         m_line += piece.substr(0, end);

@@ -2,7 +2,7 @@
 #define ZRM_HOST_CONNECTION_H
 
 #include "host/http/ListenAddress.h"
-#include "host/sinks/NameLookup.h"
+#include "host/client/NameLookup.h"
 
 #include <chrono>
 #include <cstddef>

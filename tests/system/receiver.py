@@ -32,7 +32,7 @@ class Receiver:
     connection off.
     """
 
-    def __init__(self, port=0, certificate=None):
+    def __init__(self, port=0, certificate=None, old_ciphers=None):
         self.taken = []
         self.refused = []
         self.answer = lambda request: 200
@@ -67,6 +67,9 @@ class Receiver:
         if certificate:
             context = ssl.SSLContext(ssl.PROTOCOL_TLS_SERVER)
             context.load_cert_chain(*certificate)
+            if old_ciphers:
+                context.maximum_version = ssl.TLSVersion.TLSv1_2
+                context.set_ciphers(old_ciphers)
             self._server.socket = context.wrap_socket(
                 self._server.socket, server_side=True, do_handshake_on_connect=False
             )

@@ -205,6 +205,20 @@ def test_nothing_goes_to_a_server_that_is_not_trusted(agent, log, authority):
         assert right.taken == wrong.taken == []
 
 
+def test_nothing_goes_to_a_server_without_modern_ciphers(agent, log, authority):
+    with Receiver(
+        certificate=certificate(authority, "right"), old_ciphers="ECDHE-ECDSA-AES128-SHA"
+    ) as receiver:
+        agent.more_sinks.append(
+            {"type": "webhook", "url": receiver.url, "ca_file": str(authority / "ca.pem"), "name": "old"}
+        )
+        agent.start()
+        append(log, 1, 3)
+        agent.wait_trace("Error delivering events to old: no TLS connection")
+        assert agent.stop() == 0
+        assert receiver.taken == []
+
+
 def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, authority, tmp_path):
     trusted = tmp_path / "trusted.pem"
     with Receiver(certificate=certificate(authority, "right")) as receiver:

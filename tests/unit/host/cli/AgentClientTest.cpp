@@ -1,7 +1,9 @@
 #include "host/cli/AgentClient.h"
 
+#include "../sinks/ScriptedServer.h"
 #include "TestAgent.h"
 #include "host/cli/CliError.h"
+#include "host/cli/SseParser.h"
 
 #include <gtest/gtest.h>
 
@@ -114,6 +116,34 @@ TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
     expectAnswer(CLI_UNREACHABLE, "cannot reach the agent at " + url +
                                       ": is zrmagent running? (systemctl status zrmagent; another "
                                       "address: --url or --config)");
+}
+
+TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
+    const ScriptedServer server([](const ScriptedServer::Request&) {
+        return ScriptedServer::Reply{"HTTP/1.1 400 Bad\r\nTransfer-Encoding: chunked\r\n\r\n",
+                                     ScriptedServer::Reply::KEEP, "4\r\nmore\r\n"};
+    });
+    AgentClient client({server.url(), "the-token", "its file"});
+    expectError([&] { client.get("/x"); }, CLI_UNREACHABLE,
+                "what answers at " + server.url() + " is no zrmagent: its answer does not end");
+}
+
+TEST_F(AgentClientTest, AnAnswerThatIsNestedWithoutReasonIsTold) {
+    answer(200, R"({"a":)" + std::string(1'000'000, '[') + std::string(1'000'000, ']') + '}');
+    expectAnswer(CLI_UNREACHABLE,
+                 "what answers at " + url + " is no zrmagent: its answer is no JSON object");
+}
+
+TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
+    const ScriptedServer server([](const ScriptedServer::Request&) {
+        return ScriptedServer::Reply{"HTTP/1.1 200 OK\r\n\r\ndata: ", ScriptedServer::Reply::KEEP,
+                                     std::string(4096, 'x')};
+    });
+    AgentClient client({server.url(), "the-token", "its file"});
+    SseParser parser([](const std::string&) {});
+    expectError(
+        [&] { client.stream("/x", {}, [&](std::string_view piece) { parser.take(piece); }); },
+        CLI_UNREACHABLE, "what answers is no zrmagent: an event of its stream is longer than 1 MB");
 }
 
 TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {

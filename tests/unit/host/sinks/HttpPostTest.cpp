@@ -115,13 +115,19 @@ TEST_F(HttpPostTest, AnAnswerThatBreaksOffOrIsNoneIsAFailure) {
     Reply reply;
     ScriptedServer receiver([&](const Request&) { return reply; });
     HttpPost http(configOf(receiver.url(), 2s), "");
-    for (const char* const bytes :
-         {"", "HTTP/1.1 20", "HTTP/1.1 200 OK\r\nContent-Le", "\0\1\2\3garbage\r\n\r\n",
-          "220 mail.example.com ESMTP\r\n", "\r\n\r\n", "HTTP/1.1 999999999999 X\r\n\r\n"}) {
+    const std::string place = " (127.0.0.1:" + std::to_string(receiver.port()) + ")";
+    const auto expectError = [&](const char* bytes, const std::string& error) {
         receiver.set(reply, Reply{bytes, Reply::CLOSE});
         EXPECT_FALSE(send(http)) << bytes;
-        EXPECT_EQ(http.error(), "the connection ended without a whole answer (127.0.0.1:" +
-                                    std::to_string(receiver.port()) + ")");
+        EXPECT_EQ(http.error(), error + place) << bytes;
+    };
+    for (const char* const bytes :
+         {"", "HTTP/1.1 20", "HTTP/1.1 200 OK\r\nContent-Le", "\0\1\2\3garbage\r\n\r\n"}) {
+        expectError(bytes, "the connection ended without a whole answer");
+    }
+    for (const char* const bytes :
+         {"220 mail.example.com ESMTP\r\n", "\r\n\r\n", "HTTP/1.1 999999999999 X\r\n\r\n"}) {
+        expectError(bytes, "the answer is not HTTP, or its head is longer than 64 kB");
     }
     receiver.set(reply, ScriptedServer::status(200));
     EXPECT_TRUE(send(http));
@@ -134,6 +140,27 @@ TEST_F(HttpPostTest, TheStatusCountsWhateverComesOfTheBody) {
     HttpPost http(configOf(receiver.url()), "");
     EXPECT_TRUE(send(http));
     EXPECT_EQ(http.answer(), "{\"partial");
+}
+
+TEST_F(HttpPostTest, AHeadWithoutEndIsAFailureAfterWhichTheReceiverIsTriedAgain) {
+    Reply reply;
+    ScriptedServer receiver([&](const Request&) { return reply; });
+    HttpPost http(configOf(receiver.url(), 10s), "");
+    for (const char* const endless : {"x", "X-More: yes\r\n"}) {
+        receiver.set(reply, Reply{"HTTP/1.1 200 ", Reply::KEEP, std::string(endless)});
+        EXPECT_FALSE(send(http)) << endless;
+        EXPECT_THAT(http.error(), testing::StartsWith("the answer is not HTTP, or its head is "));
+    }
+    receiver.set(reply, ScriptedServer::status(200));
+    EXPECT_TRUE(send(http)) << http.error();
+}
+
+TEST_F(HttpPostTest, AReasonPhraseMayBeLong) {
+    ScriptedServer receiver([](const Request&) {
+        return Reply{"HTTP/1.1 200 " + std::string(40'000, 'x') + "\r\nContent-Length: 0\r\n\r\n"};
+    });
+    HttpPost http(configOf(receiver.url()), "");
+    EXPECT_TRUE(send(http)) << http.error();
 }
 
 TEST_F(HttpPostTest, KeepsOnlyTheBeginningOfALongAnswer) {

@@ -106,6 +106,12 @@ void ScriptedServer::serve(int socket, int number) {
             reply = m_script(request);
         }
         send(socket, reply.bytes.data(), reply.bytes.size(), MSG_NOSIGNAL);
+        while (!reply.endless.empty()) {
+            std::this_thread::sleep_for(reply.pause);
+            if (send(socket, reply.endless.data(), reply.endless.size(), MSG_NOSIGNAL) <= 0) {
+                return;
+            }
+        }
         if (reply.then == Reply::CLOSE) {
             shutdown(socket, SHUT_RDWR);
         }

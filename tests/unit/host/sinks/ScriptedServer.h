@@ -1,6 +1,7 @@
 #ifndef ZRM_TESTS_SCRIPTED_SERVER_H
 #define ZRM_TESTS_SCRIPTED_SERVER_H
 
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <list>
@@ -25,6 +26,8 @@ public:
     struct Reply {
         std::string bytes;
         enum Then { KEEP, CLOSE, HOLD } then = KEEP; ///< HOLD: nothing more happens
+        std::string endless = {};           ///< sent again and again until the client leaves
+        std::chrono::milliseconds pause{0}; ///< before each time
     };
     /// Called for each request, one at a time.
     using Script = std::function<Reply(const Request& request)>;

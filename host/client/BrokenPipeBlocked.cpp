@@ -1,4 +1,4 @@
-#include "host/sinks/BrokenPipeBlocked.h"
+#include "host/client/BrokenPipeBlocked.h"
 
 #include <pthread.h>
 #include <time.h>

@@ -1,4 +1,4 @@
-#include "host/sinks/NameLookup.h"
+#include "host/client/NameLookup.h"
 
 #include <condition_variable>
 #include <cstring>
