@@ -111,7 +111,10 @@ void Host::tick(int number) {
                 "to a file that names one log per line; ending in a minute",
                 m_file.path().empty() ? "/etc/zrm/zrm.toml" : m_file.path().c_str());
         } else {
-            say("no log to monitor: %s names none that can be monitored; ending in a minute", file);
+            say("no log to monitor: %s names none that can be monitored, and 'zrmctl check %s' "
+                "says "
+                "why; ending in a minute",
+                file, file);
         }
     }
     m_serving->tick();

@@ -97,7 +97,7 @@ def test_the_unit_is_what_systemd_takes(root, tmp_path):
         "SupplementaryGroups=adm",
         "StateDirectory=zrm",
         "ExecReload=/bin/kill -HUP $MAINPID",
-        "Restart=on-failure",
+        "Restart=always",
         "NoNewPrivileges=yes",
         "ProtectSystem=strict",
     ):

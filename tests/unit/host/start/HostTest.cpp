@@ -295,7 +295,8 @@ TEST_F(HostTest, SaysWhichFileNamesNoLog) {
         },
         testing::ExitedWithCode(0), "");
     EXPECT_EQ(errors(), "zrmagent: no log to monitor: /etc/zrm/logs.conf names none that can be "
-                        "monitored; ending in a minute\n");
+                        "monitored, and 'zrmctl check /etc/zrm/logs.conf' says why; ending in a "
+                        "minute\n");
 }
 
 TEST_F(HostTest, GoesOnWithoutItsExitRoutine) {
