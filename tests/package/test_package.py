@@ -98,6 +98,8 @@ def test_the_unit_is_what_systemd_takes(root, tmp_path):
         "StateDirectory=zrm",
         "ExecReload=/bin/kill -HUP $MAINPID",
         "Restart=always",
+        "MemoryMax=1G",
+        "TasksMax=4096",
         "NoNewPrivileges=yes",
         "ProtectSystem=strict",
     ):
