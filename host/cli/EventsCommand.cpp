@@ -103,6 +103,37 @@ std::string tableText(const Json& events, const Terminal& terminal) {
     return table.text(terminal);
 }
 
+struct Found {
+    Json events = Json::array(); ///< newest first
+    std::uint64_t newest = 0;    ///< the newest id of the whole history
+};
+
+/// The latest events that the query asks for, at most `limit`. A search for a text takes the
+/// agent several requests.
+Found find(Context& context, std::multimap<std::string, std::string> query, std::size_t limit) {
+    Found found;
+    std::uint64_t before = UINT64_MAX;
+    for (bool isMore = true; isMore && found.events.size() < limit;) {
+        query.erase("limit");
+        query.emplace("limit", std::to_string(limit - found.events.size()));
+        const Json answer = context.client().get("/api/v1/events", query);
+        for (const Json& event : JsonText::member(answer, "events")) {
+            found.events.push_back(event);
+        }
+        for (const Json& id : JsonText::member(answer, "damaged")) {
+            Context::note("event " + JsonText::text(id) +
+                          " is damaged in the history: its content is not what was written");
+        }
+        found.newest = std::max(found.newest, JsonText::number(answer, "newest"));
+        const std::uint64_t next = JsonText::number(answer, "next");
+        isMore = next > 0 && next < before;
+        before = next;
+        query.erase("before");
+        query.emplace("before", std::to_string(next));
+    }
+    return found;
+}
+
 } // namespace
 
 EventsCommand::EventsCommand(CLI::App& program)
@@ -123,6 +154,7 @@ EventsCommand::EventsCommand(CLI::App& program)
     anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
     anyOf("--log", m_logs, "LOG", "Of this log; may be repeated");
     anyOf("--severity", m_severities, "SEVERITY", "Of this severity; may be repeated");
+    m_command->add_option("--text", m_text, "With this text, in whatever case")->type_name("TEXT");
     m_command->add_option("--limit", m_limit, "The latest so many (default 100; with -f 10)")
         ->type_name("COUNT")
         ->check(CLI::Range(1, 1000));
@@ -141,6 +173,9 @@ std::multimap<std::string, std::string> EventsCommand::filters() const {
             query.emplace(name, value);
         }
     }
+    if (!m_text.empty()) {
+        query.emplace("text", m_text);
+    }
     return query;
 }
 
@@ -155,8 +190,7 @@ int EventsCommand::list(Context& context) {
     add("before", m_before);
     add("from", m_from.empty() ? "" : Context::time("--from", m_from));
     add("to", m_to.empty() ? "" : Context::time("--to", m_to));
-    add("limit", std::to_string(m_limit > 0 ? m_limit : usualLimit));
-    Json events = JsonText::member(context.client().get("/api/v1/events", query), "events");
+    Json events = find(context, query, m_limit > 0 ? m_limit : usualLimit).events;
     std::reverse(events.begin(), events.end()); // the newest stands where the eye is
     if (events.empty()) {
         Context::note("no such event");
@@ -187,14 +221,12 @@ int EventsCommand::follow(Context& context) {
     if (!m_after.empty()) {
         after = static_cast<std::uint64_t>(*numberOf(m_after));
     } else {
-        query.emplace("limit", std::to_string(m_limit > 0 ? m_limit : usualBeforeFollowing));
         if (!m_from.empty()) {
             query.emplace("from", Context::time("--from", m_from));
         }
-        Json answer = client.get("/api/v1/events", query);
-        Json events = JsonText::member(answer, "events");
-        std::for_each(events.rbegin(), events.rend(), show);
-        after = JsonText::number(answer, "newest");
+        const Found found = find(context, query, m_limit > 0 ? m_limit : usualBeforeFollowing);
+        std::for_each(found.events.rbegin(), found.events.rend(), show);
+        after = found.newest;
     }
     EventFollower follower(client, filters(), signals, &Context::note);
     follower.follow(after, show);

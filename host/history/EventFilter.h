@@ -17,6 +17,7 @@ struct EventFilter {
     std::vector<std::string> situations = {};      ///< any of these names; empty: whichever
     std::vector<std::string> logs = {};            ///< any of these whole paths; empty: whichever
     std::vector<std::string> severities = {};      ///< any of these; empty: whichever
+    std::string text = {};                         ///< EventText finds it; empty: whichever
     std::size_t limit = 100;                       ///< at most so many events
     bool newestFirst = true;                       ///< by descending id, else by ascending id
 };

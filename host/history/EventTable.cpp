@@ -1,10 +1,13 @@
 #include "host/history/EventTable.h"
 
+#include "host/history/EventChecksum.h"
+
 #include <algorithm>
 
 EventTable::EventTable(Database& database)
     : m_database(database),
-      m_insert(database, "INSERT INTO events (id, raised, label, json) VALUES (?, ?, ?, ?)"),
+      m_insert(database, "INSERT INTO events (id, raised, label, json, checksum)"
+                         " VALUES (?, ?, ?, ?, ?)"),
       m_mark(database, "INSERT INTO marks (part, earliest, latest) VALUES (?, ?, ?)"
                        " ON CONFLICT (part) DO UPDATE SET"
                        " earliest = min(earliest, excluded.earliest),"
@@ -19,6 +22,8 @@ void EventTable::append(std::span<const EventRecord> events, std::span<const std
     for (std::size_t index = 0; index < events.size(); ++index) {
         const EventRecord& event = events[index];
         m_insert.bind(1, event.id).bind(2, event.raised).bind(3, labels[index]).bind(4, event.json);
+        m_insert.bind(5, eventChecksum(static_cast<std::int64_t>(event.id), event.raised,
+                                       labels[index], event.json));
         m_insert.run();
     }
     while (!events.empty()) {

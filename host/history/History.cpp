@@ -17,6 +17,9 @@ TRC1_Anchor anchor{"History.cpp"};
 /// For the newest events: what a sink that keeps up is behind, and more.
 constexpr std::size_t bytesInMemory = std::size_t{8} * 1024 * 1024;
 
+/// Damaged events that are remembered, so that each is traced once.
+constexpr std::size_t mostDamaged = 10'000;
+
 /// The newest id of a file that is about to be moved aside, as far as it can be told.
 std::uint64_t newestOfCorrupt(const std::string& path) {
     try {
@@ -123,20 +126,40 @@ template <class Work> auto History::reading(Work&& work) {
     }
 }
 
-std::vector<StoredEvent> History::query(const EventFilter& filter) {
-    return reading([&](Database& database) { return HistoryQuery(database, filter).run(); });
+EventPage History::query(const EventFilter& filter) {
+    EventPage page =
+        reading([&](Database& database) { return HistoryQuery(database, filter).run(); });
+    noteDamage(page.damaged);
+    return page;
+}
+
+/// Traces what was not known to be damaged.
+void History::noteDamage(const std::vector<std::uint64_t>& events) {
+    TraceScope trace(anchor);
+    const std::lock_guard guard(m_mutex);
+    for (const std::uint64_t event : events) {
+        if (m_damaged.size() < mostDamaged && m_damaged.insert(event).second) {
+            trace.error()("Event %" PRIu64 " in the history %s is damaged: its content is not what "
+                          "was written.",
+                          event, m_directory->file().c_str());
+        }
+    }
 }
 
 std::optional<StoredEvent> History::event(std::uint64_t id) {
+    if (id == 0 || id > newest()) {
+        return std::nullopt;
+    }
     EventFilter filter;
     filter.after = id - 1;
     filter.before = id + 1;
     filter.limit = 1;
-    std::vector<StoredEvent> found;
-    if (id > 0 && id <= newest()) {
-        found = query(filter);
+    EventPage page = query(filter);
+    if (!page.damaged.empty()) {
+        throw HistoryError("event " + std::to_string(id) +
+                           " is damaged: its content is not what was written");
     }
-    return found.empty() ? std::nullopt : std::optional(std::move(found.front()));
+    return page.events.empty() ? std::nullopt : std::optional(std::move(page.events.front()));
 }
 
 std::uint64_t History::waitBeyond(std::uint64_t id, Clock::time_point limit,
@@ -151,6 +174,8 @@ HistoryState History::state() {
     state.events = state.oldest == 0 ? 0 : state.newest - std::min(state.oldest - 1, state.newest);
     state.bytes = m_directory->bytes();
     state.problem = m_writer.problem();
+    const std::lock_guard guard(m_mutex);
+    state.damaged = m_damaged.size();
     return state;
 }
 

@@ -10,9 +10,13 @@
 #include "host/history/ReaderPool.h"
 #include "host/history/RecentEvents.h"
 
+#include <cstdint>
 #include <memory>
+#include <mutex>
+#include <set>
 #include <string>
 #include <variant>
+#include <vector>
 
 /// The history of events: a SQLite file in a directory of its own, one writer, any number of
 /// readers, and a cursor for each sink. Set up, started and finished by one thread at a time; as a
@@ -44,7 +48,7 @@ public:
     /// Takes the entries that a minute brought. Any thread.
     void addEntries(MinuteCounts counts) { m_writer.addEntries(std::move(counts)); }
 
-    std::vector<StoredEvent> query(const EventFilter& filter) override;
+    EventPage query(const EventFilter& filter) override;
     std::optional<StoredEvent> event(std::uint64_t id) override;
     std::uint64_t newest() const override { return m_recent.newest(); }
     std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
@@ -56,6 +60,7 @@ private:
     History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
             std::unique_ptr<HistoryFile> file);
     template <class Work> auto reading(Work&& work);
+    void noteDamage(const std::vector<std::uint64_t>& events);
 
     const std::unique_ptr<HistoryDirectory> m_directory;
     RecentEvents m_recent;
@@ -64,6 +69,9 @@ private:
     HistoryFile& m_file; ///< the writer's, before start
     HistoryWriter m_writer;
     bool m_toldOfRest = false; ///< what could not be stored was said
+
+    mutable std::mutex m_mutex;        ///< guards what follows
+    std::set<std::uint64_t> m_damaged; ///< events that were found damaged
 };
 
 #endif

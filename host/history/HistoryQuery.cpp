@@ -1,6 +1,7 @@
 #include "host/history/HistoryQuery.h"
 
 #include "host/history/EventTable.h"
+#include "host/history/StoredEventRow.h"
 
 #include <algorithm>
 #include <deque>
@@ -15,10 +16,8 @@ namespace {
 constexpr auto noBound = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 constexpr auto partSize = static_cast<std::int64_t>(EventTable::partSize);
 
-/// Columns in the order in which take reads them.
-constexpr const char* selectEvents =
-    "SELECT events.id, raised, situation, severity, path, json FROM events"
-    " JOIN labels ON labels.id = label JOIN logs ON logs.id = log WHERE ";
+/// A search looks at the clock once in so many events.
+constexpr std::size_t eventsBetweenLooksAtTheClock = 64;
 
 std::string condition(std::string_view column, std::size_t values) {
     std::string text = " AND " + std::string(column) + " IN (?";
@@ -30,16 +29,18 @@ std::string condition(std::string_view column, std::size_t values) {
 
 } // namespace
 
-HistoryQuery::HistoryQuery(Database& database, const EventFilter& filter)
+HistoryQuery::HistoryQuery(Database& database, const EventFilter& filter,
+                           std::chrono::milliseconds longest)
     : m_database(database), m_filter(filter),
       m_first(static_cast<std::int64_t>(std::min(filter.after, noBound - 1) + 1)),
-      m_last(static_cast<std::int64_t>(std::min(filter.before.value_or(noBound), noBound)) - 1) {}
+      m_last(static_cast<std::int64_t>(std::min(filter.before.value_or(noBound), noBound)) - 1),
+      m_text(filter.text), m_searchLimit(Clock::now() + longest) {}
 
-std::vector<StoredEvent> HistoryQuery::run() {
+EventPage HistoryQuery::run() {
     if (m_filter.from || m_filter.to) {
         narrowToTime();
     }
-    if (m_first > m_last || full()) {
+    if (m_first > m_last || m_filter.limit == 0) {
         return {};
     }
     if (hasLabelFilter()) {
@@ -95,16 +96,16 @@ std::vector<std::int64_t> HistoryQuery::labels() {
 }
 
 void HistoryQuery::walkAll() {
-    Statement events(m_database, std::string(selectEvents) +
+    Statement events(m_database, std::string(StoredEventRow::select) +
                                      "events.id BETWEEN ? AND ? ORDER BY events.id" + direction());
     events.bind(1, m_first).bind(2, m_last);
-    while (!full() && events.step()) {
-        take(events);
+    while (!isDone() && events.step()) {
+        look(events);
     }
 }
 
 void HistoryQuery::walkLabels(const std::vector<std::int64_t>& labels) {
-    Statement event(m_database, std::string(selectEvents) + "events.id = ?");
+    Statement event(m_database, std::string(StoredEventRow::select) + "events.id = ?");
     const std::string sql = std::string("SELECT id FROM events INDEXED BY events_by_label"
                                         " WHERE label = ? AND id BETWEEN ? AND ? ORDER BY id") +
                             direction();
@@ -121,24 +122,44 @@ void HistoryQuery::walkLabels(const std::vector<std::int64_t>& labels) {
         walks.emplace_back(m_database, sql).bind(1, label).bind(2, m_first).bind(3, m_last);
         advance(walks.size() - 1);
     }
-    while (!full() && !nexts.empty()) {
+    while (!isDone() && !nexts.empty()) {
         const auto [rank, walk] = nexts.top();
         nexts.pop();
         if (event.bind(1, m_filter.newestFirst ? rank : -rank).step()) {
-            take(event);
+            look(event);
         }
         event.reset();
         advance(walk);
     }
 }
 
-void HistoryQuery::take(Statement& event) {
-    const std::int64_t raised = event.integer(1);
-    // The parts of a window have others beside its events.
-    if ((m_filter.from && raised < *m_filter.from) || (m_filter.to && raised > *m_filter.to)) {
-        return;
+/// Whether the page is complete, or the time for the search is over.
+bool HistoryQuery::isDone() const noexcept {
+    return m_found.events.size() >= m_filter.limit || m_found.reached;
+}
+
+/// Takes the event if it is wanted, and ends a search whose time is over.
+void HistoryQuery::look(const Statement& statement) {
+    const StoredEventRow row(statement);
+    const EventRecord event = row.record();
+    if (isWanted(event)) {
+        if (row.isIntact()) {
+            m_found.events.push_back({event.id, event.raised, std::string(event.situation),
+                                      std::string(event.severity), std::string(event.log),
+                                      std::string(event.json)});
+        } else {
+            m_found.damaged.push_back(event.id);
+        }
     }
-    m_found.push_back({static_cast<std::uint64_t>(event.integer(0)), raised,
-                       std::string(event.text(2)), std::string(event.text(3)),
-                       std::string(event.text(4)), std::string(event.text(5))});
+    if (!m_text.isEmpty() && ++m_looked % eventsBetweenLooksAtTheClock == 0 &&
+        Clock::now() >= m_searchLimit) {
+        m_found.reached = event.id;
+    }
+}
+
+bool HistoryQuery::isWanted(const EventRecord& event) const {
+    // The parts of a window have others beside its events.
+    return (!m_filter.from || event.raised >= *m_filter.from) &&
+           (!m_filter.to || event.raised <= *m_filter.to) &&
+           (m_text.isEmpty() || m_text.isIn(event.log, event.json));
 }

@@ -1,22 +1,33 @@
 #ifndef ZRM_HOST_HISTORY_QUERY_H
 #define ZRM_HOST_HISTORY_QUERY_H
 
+#include "host/events/EventRecord.h"
 #include "host/history/Database.h"
 #include "host/history/EventFilter.h"
+#include "host/history/EventPage.h"
+#include "host/history/EventText.h"
 #include "host/history/Statement.h"
-#include "host/history/StoredEvent.h"
 
+#include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <vector>
 
 /// One query of the events of a history. Its work grows with what it gives, not with what the
-/// history holds. Used once, by one thread. Throws DatabaseError.
+/// history holds; the search for a text, which looks at every event that the rest of the filter
+/// lets through, is limited in time. Used once, by one thread. Throws DatabaseError.
 class HistoryQuery {
 public:
-    /// Both references outlive the object.
-    HistoryQuery(Database& database, const EventFilter& filter);
+    using Clock = std::chrono::steady_clock;
 
-    std::vector<StoredEvent> run();
+    /// A search for a text stops about then; whoever asked goes on where it stopped.
+    static constexpr std::chrono::milliseconds searchTime{250};
+
+    /// Both references outlive the object.
+    HistoryQuery(Database& database, const EventFilter& filter,
+                 std::chrono::milliseconds longest = searchTime);
+
+    EventPage run();
 
 private:
     void narrowToTime();
@@ -25,14 +36,18 @@ private:
     void walkAll();
     void walkLabels(const std::vector<std::int64_t>& labels);
     const char* direction() const noexcept { return m_filter.newestFirst ? " DESC" : ""; }
-    bool full() const noexcept { return m_found.size() >= m_filter.limit; }
-    void take(Statement& event);
+    bool isDone() const noexcept;
+    void look(const Statement& statement);
+    bool isWanted(const EventRecord& event) const;
 
     Database& m_database;
     const EventFilter& m_filter;
     std::int64_t m_first; ///< bounds of the ids, both included
     std::int64_t m_last;
-    std::vector<StoredEvent> m_found;
+    const EventText m_text;
+    const Clock::time_point m_searchLimit;
+    std::size_t m_looked = 0; ///< at so many events
+    EventPage m_found;
 };
 
 #endif

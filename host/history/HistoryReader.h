@@ -2,16 +2,15 @@
 #define ZRM_HOST_HISTORY_READER_H
 
 #include "host/history/EventFilter.h"
+#include "host/history/EventPage.h"
 #include "host/history/HistoryState.h"
 #include "host/history/Rates.h"
-#include "host/history/StoredEvent.h"
 
 #include <chrono>
 #include <cstdint>
 #include <optional>
 #include <stdexcept>
 #include <stop_token>
-#include <vector>
 
 /// The history could not be read; what() says why.
 class HistoryError : public std::runtime_error {
@@ -26,10 +25,11 @@ public:
 
     virtual ~HistoryReader() = default;
 
-    /// The events that the filter lets through, in its order.
-    virtual std::vector<StoredEvent> query(const EventFilter& filter) = 0;
+    /// The events that the filter lets through, in its order. A search for a text may stop early.
+    virtual EventPage query(const EventFilter& filter) = 0;
 
-    /// The event with this id; none when the history does not hold it (any more).
+    /// The event with this id; none when the history does not hold it (any more). Throws for one
+    /// that is damaged.
     virtual std::optional<StoredEvent> event(std::uint64_t id) = 0;
 
     /// The id of the newest committed event; 0 when there was none. Costs nothing.

@@ -2,6 +2,7 @@
 
 #include "agent/TraceScope.h"
 #include "host/history/Statement.h"
+#include "host/history/StoredEventRow.h"
 #include "host/start/Say.h"
 
 #include <algorithm>
@@ -103,21 +104,41 @@ bool HistorySource::load() {
     return false;
 }
 
+/// The events behind the cursor, up to the first that is damaged; those in front are passed over.
 std::shared_ptr<const EventBatch> HistorySource::readFile() {
     auto batch = std::make_shared<EventBatch>();
     ReaderPool::Lease lease = m_readers.take();
-    Statement events(*lease,
-                     "SELECT events.id, raised, situation, severity, path, json, text FROM events"
-                     " JOIN labels ON labels.id = label JOIN logs ON logs.id = log"
-                     " WHERE events.id > ? ORDER BY events.id LIMIT ?");
-    events.bind(1, m_cursor.load()).bind(2, readAtOnce);
-    while (events.step()) {
-        batch->add(EventRecord{static_cast<std::uint64_t>(events.integer(0)), events.integer(1),
-                               events.text(2), events.text(3), events.text(4), events.text(5),
-                               events.text(6)});
+    Statement events(*lease, std::string(StoredEventRow::select) +
+                                 "events.id > ? ORDER BY events.id LIMIT ?");
+    for (bool isMore = true; isMore && batch->empty();) {
+        events.bind(1, m_cursor.load()).bind(2, readAtOnce);
+        for (isMore = false; events.step() && addTo(*batch, StoredEventRow(events));) {
+            isMore = true;
+        }
+        events.reset();
     }
     batch->seal();
     return batch;
+}
+
+/// False when the event is damaged and others are to be delivered before it.
+bool HistorySource::addTo(EventBatch& batch, const StoredEventRow& row) {
+    const EventRecord event = row.record();
+    if (row.isIntact()) {
+        batch.add(event);
+        return true;
+    }
+    if (!batch.empty()) {
+        return false;
+    }
+    if (event.id > m_cursor.load() + 1) {
+        passOver(event.id);
+    }
+    say("%s did not get the event %" PRIu64
+        ": it is damaged in the history, its content is not what was written",
+        m_sink.c_str(), event.id);
+    m_cursor.store(event.id);
+    return true;
 }
 
 void HistorySource::release(std::size_t count) {

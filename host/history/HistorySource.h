@@ -11,6 +11,8 @@
 #include <memory>
 #include <string>
 
+class StoredEventRow;
+
 /// The committed events of the history behind a sink's cursor: from memory where the sink keeps
 /// up, else from the file. What was removed before the sink got to it is passed over, and told.
 class HistorySource : public EventSource {
@@ -27,6 +29,7 @@ private:
     bool fetch();
     bool load();
     std::shared_ptr<const EventBatch> readFile();
+    bool addTo(EventBatch& batch, const StoredEventRow& row);
     void use(std::shared_ptr<const EventBatch> batch);
     void passOver(std::uint64_t next);
 

@@ -8,7 +8,7 @@ namespace {
 
 /// Each entry makes, of the version before it, the version that is its place in the table.
 /// Published entries never change; a new version is a new entry.
-constexpr std::array<const char*, 3> steps = {
+constexpr std::array<const char*, 4> steps = {
     // 1: events. Labels intern what is written on many events; one narrow index serves every
     // filter on them, and the marks narrow a window of time down, so that storing an event costs
     // one row and one index entry.
@@ -38,6 +38,8 @@ constexpr std::array<const char*, 3> steps = {
     "INSERT INTO labels_with_text SELECT id, situation, severity, log, '' FROM labels;"
     "DROP TABLE labels;"
     "ALTER TABLE labels_with_text RENAME TO labels;",
+    // 4: events have a checksum (EventChecksum.h); those stored before have none.
+    "ALTER TABLE events ADD COLUMN checksum INTEGER;",
 };
 
 } // namespace

@@ -57,9 +57,13 @@ ordered_json historyOf(Delivery& delivery) {
     } else {
         state.problem = delivery.historyProblem();
     }
-    return {{"enabled", reader != nullptr}, {"events", state.events},
-            {"oldest", state.oldest},       {"newest", state.newest},
-            {"bytes", state.bytes},         {"problem", textOrNull(state.problem)}};
+    return {{"enabled", reader != nullptr},
+            {"events", state.events},
+            {"oldest", state.oldest},
+            {"newest", state.newest},
+            {"bytes", state.bytes},
+            {"damaged", state.damaged},
+            {"problem", textOrNull(state.problem)}};
 }
 
 ordered_json queueOf(const Delivery& delivery) {

@@ -7,7 +7,8 @@
 namespace {
 
 constexpr std::array severities = {"info", "minor", "warning", "major", "critical"};
-constexpr std::size_t mostNames = 100; ///< of one kind
+constexpr std::size_t mostNames = 100;   ///< of one kind
+constexpr std::size_t longestText = 256; ///< bytes
 
 void limitNames(const std::vector<std::string>& names, const char* field) {
     if (names.size() > mostNames) {
@@ -28,6 +29,10 @@ void EventQuery::readKinds(QueryFields& query, EventFilter& filter) {
     filter.situations = query.texts("situation");
     filter.logs = query.texts("log");
     filter.severities = query.texts("severity");
+    filter.text = query.text("text").value_or("");
+    if (filter.text.size() > longestText) {
+        throw RequestRefused(400, "write at most 256 bytes", "text");
+    }
     limitNames(filter.situations, "situation");
     limitNames(filter.logs, "log");
     limitNames(filter.severities, "severity");

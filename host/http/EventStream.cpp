@@ -42,6 +42,16 @@ std::optional<std::uint64_t> resumeAfter(const HttpRequest& request, QueryFields
     return id;
 }
 
+/// The event behind which the next query goes on.
+std::uint64_t lastLookedAt(const EventPage& page, const EventFilter& filter, std::uint64_t newest) {
+    const std::uint64_t last = page.events.empty() ? 0 : page.events.back().id;
+    if (page.events.size() == filter.limit) {
+        return last;
+    }
+    // A search that was not stopped early has seen all up to the newest, and maybe later ones.
+    return page.reached.value_or(std::max(newest, last));
+}
+
 std::string messages(const std::vector<StoredEvent>& events) {
     std::string text;
     for (const StoredEvent& event : events) {
@@ -94,12 +104,9 @@ void EventStream::follow(EventFilter filter, const BodyWriter& write,
         const std::uint64_t newest = m_history->waitBeyond(filter.after, limit, stop);
         std::string text;
         if (newest > filter.after) {
-            const std::vector<StoredEvent> events = m_history->query(filter);
-            // More may have been committed since; fewer than the limit are all up to the newest.
-            filter.after = events.size() == filter.limit
-                               ? events.back().id
-                               : std::max(newest, events.empty() ? 0 : events.back().id);
-            text = messages(events);
+            const EventPage page = m_history->query(filter);
+            text = messages(page.events);
+            filter.after = lastLookedAt(page, filter, newest);
         }
         if (text.empty() && Clock::now() >= silent) {
             text = ": keep-alive\n\n";

@@ -108,20 +108,23 @@ HttpAnswer EventsResource::events(const HttpRequest& request) {
     HistoryReader& history = EventQuery::history(m_history);
     EventFilter filter = filterOf(request);
     const std::size_t limit = filter.limit++; // one more tells whether there are more
-    const std::vector<StoredEvent> found =
-        EventQuery::reading([&] { return history.query(filter); });
+    const EventPage page = EventQuery::reading([&] { return history.query(filter); });
     const HistoryState state = EventQuery::reading([&] { return history.state(); });
-    const std::size_t count = std::min(limit, found.size());
+    const std::size_t count = std::min(limit, page.events.size());
     std::string text = "{\"events\":[";
     for (std::size_t at = 0; at < count; ++at) {
         text += at == 0 ? "" : ",";
-        text += found[at].json;
+        text += page.events[at].json;
     }
-    const std::string next =
-        found.size() > limit ? std::to_string(found[count - 1].id) : std::string("null");
-    return HttpAnswer::json(text + "],\"next\":" + next +
-                            ",\"oldest\":" + std::to_string(state.oldest) +
-                            ",\"newest\":" + std::to_string(state.newest) + "}");
+    const std::optional<std::uint64_t> next =
+        page.events.size() > limit ? std::optional(page.events[count - 1].id) : page.reached;
+    text += "],\"next\":" + (next ? std::to_string(*next) : "null") +
+            ",\"oldest\":" + std::to_string(state.oldest) +
+            ",\"newest\":" + std::to_string(state.newest) + ",\"damaged\":[";
+    for (std::size_t at = 0; at < page.damaged.size(); ++at) {
+        text += (at == 0 ? "" : ",") + std::to_string(page.damaged[at]);
+    }
+    return HttpAnswer::json(text + "]}");
 }
 
 HttpAnswer EventsResource::event(const HttpRequest& request) {

@@ -51,6 +51,8 @@ void collectHistory(MetricText& text, const HistoryState& history) {
     text.add(history.events);
     text.gauge("zrm_history_size_bytes", "Size of the history on disk.");
     text.add(history.bytes);
+    text.gauge("zrm_history_damaged_events", "Events that readers found damaged since the start.");
+    text.add(history.damaged);
     text.gauge("zrm_history_oldest_event_id", "Id of the oldest event that the history holds.");
     text.add(history.oldest);
     text.gauge("zrm_history_newest_event_id", "Id of the newest event of the history.");

@@ -12,7 +12,8 @@ from signal import SIGKILL
 
 import pytest
 
-from conftest import descriptions, syslog_line, wait_until
+from api import Api
+from conftest import PROGRAM, descriptions, syslog_line, wait_until
 
 
 def lines(numbers):
@@ -234,6 +235,37 @@ def test_a_corrupt_history_is_moved_aside(agent):
     assert descriptions(agent.wait_events(3)) == texts(range(3))
     assert agent.stop() == 0
     assert len(stored(agent)) == 3
+
+
+def test_a_flipped_byte_is_reported_and_not_served(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    log.append(lines(range(100)))
+    agent.wait_events(100)
+    assert agent.stop() == 0
+    with sqlite3.connect(history_file(agent)) as database:
+        database.execute("PRAGMA wal_checkpoint(TRUNCATE)")
+    content = bytearray(history_file(agent).read_bytes())
+    for text in (b'"ENTRYDESC":"number 41"', b'"ENTRYDESC":"number 73"'):
+        content[content.index(text) + 12] ^= 0x01  # the quote that begins the description
+    history_file(agent).write_bytes(content)
+    agent.start()
+    api = Api(agent)
+    answer = api.request("GET", "/api/v1/events?limit=1000&order=asc")[2]
+    damaged = [42, 74]
+    assert answer["damaged"] == damaged
+    assert [one["id"] for one in answer["events"]] == [n for n in range(1, 101) if n not in damaged]
+    status, _, problem = api.request("GET", "/api/v1/events/42")
+    assert status == 503 and "event 42 is damaged" in problem["detail"]
+    assert api.request("GET", "/api/v1/status")[2]["history"]["damaged"] == 2
+    assert len(agent.wait_trace("Event 42 in the history")) == 1
+    zrmctl = [Path(PROGRAM).with_name("zrmctl"), "events", "--url", f"http://127.0.0.1:{api.port}"]
+    zrmctl += ["--token-file", agent.directory / "state" / "api-token"]
+    said = subprocess.run(zrmctl, capture_output=True, text=True, check=True)
+    assert "event 42 is damaged in the history" in said.stderr
+    assert agent.stop() == 0
 
 
 def test_without_a_place_for_the_history_the_agent_says_so_and_goes_on(agent):

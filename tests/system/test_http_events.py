@@ -199,3 +199,21 @@ def test_rates_tell_what_came_in(serving):
         return False
 
     wait_until(counted, "5 entries and 6 events in the rates", seconds=150)
+
+
+def test_a_text_is_searched_in_the_whole_history_and_in_the_stream(serving):
+    log, api = serving
+    write(log, 3000, text="usual")
+    write(log, 1, begin=7, text="disk FULL on")
+    write(log, 3000, text="usual")
+    wait_newest(api, 6001)
+    found = get(api, "/api/v1/events?text=Disk+full&limit=10")
+    events = found["events"]
+    while found["next"] is not None:  # a search may take several requests
+        found = get(api, f"/api/v1/events?text=Disk+full&before={found['next']}")
+        events += found["events"]
+    assert [(one["id"], one["row"]["ENTRYDESC"]) for one in events] == [(3001, "disk FULL on 7")]
+    follower = Follower(api, "?text=DISK", last=0)
+    write(log, 1, text="another disk")
+    wait_until(lambda: len(follower.messages) == 2, "both events")
+    assert [json.loads(one["data"])["id"] for one in follower.messages] == [3001, 6002]

@@ -21,12 +21,12 @@ export async function show(element, query) {
 
 class EventsPage {
   constructor(element, query) {
-    this.all = []; // newest first, before the text filter
+    this.all = []; // newest first
     this.waiting = [];
     this.arrived = [];
     this.isPaused = false;
-    this.hasOlder = true;
-    this.wanted = Object.fromEntries(["situation", "log", "severity"].map((key) => [key, query.get(key) || ""]));
+    this.next = null; // older events are before this one
+    this.wanted = Object.fromEntries(["situation", "log", "severity", "text"].map((key) => [key, query.get(key) || ""]));
     this.#build(element);
   }
 
@@ -35,7 +35,9 @@ class EventsPage {
     this.situation = select([["", "All situations"]], "", { onchange: again });
     this.log = select([["", "All logs"]], "", { onchange: again });
     this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
-    this.text = h("input", { type: "search", placeholder: "in the description", oninput: debounce(() => this.#filter(), 150) });
+    this.text = h("input", {
+      type: "search", placeholder: "anywhere in the event", maxLength: 80, value: this.wanted.text, oninput: debounce(again, 300),
+    });
     this.state = h("p", { className: "state", role: "status" }, "Connecting");
     this.pause = button("Pause", () => this.#togglePause(), { "aria-pressed": "false" });
     this.newer = button("", () => { this.list.element.scrollTop = 0; this.list.element.focus(); }, { hidden: true });
@@ -65,9 +67,9 @@ class EventsPage {
     const offer = (select, value) => {
       if ([...select.options].every((one) => one.value !== value)) select.append(h("option", { value }, value));
     };
-    for (const [key, value] of Object.entries(this.wanted)) {
-      offer(this[key], value);
-      this[key].value = value;
+    for (const key of ["situation", "log", "severity"]) {
+      offer(this[key], this.wanted[key]);
+      this[key].value = this.wanted[key];
     }
     const [situations, logs] = await Promise.allSettled([get("/api/v1/situations"), get("/api/v1/logs")]);
     for (const { name } of situations.value?.situations || []) offer(this.situation, name);
@@ -82,7 +84,7 @@ class EventsPage {
   }
 
   get filter() {
-    return { situation: this.situation.value, log: this.log.value, severity: this.severity.value };
+    return { situation: this.situation.value, log: this.log.value, severity: this.severity.value, text: this.text.value };
   }
 
   /** Takes the filter as it is now. */
@@ -98,22 +100,37 @@ class EventsPage {
     const abort = this.abort;
     this.waiting = [];
     this.arrived = [];
-    this.hasOlder = true;
+    this.next = null;
     fill(this.body, this.list.element);
     let answer;
     try {
-      answer = await get(withQuery("/api/v1/events", { ...this.filter, limit: PAGE }), abort.signal);
+      answer = await this.#search(null, abort.signal);
     } catch (error) {
       if (error.name !== "AbortError") this.#fail(error);
       return;
     }
     this.all = answer.events;
-    this.hasOlder = answer.events.length === PAGE;
-    this.#filter();
+    this.next = answer.next;
+    this.#draw();
     const after = Math.max(answer.newest || 0, answer.events[0]?.id || 0);
     this.stream = new EventStream(this.filter, after, {
       event: (event) => this.#arrive(event), state: (...state) => this.#setState(...state), again: () => this.#verify(abort.signal),
     });
+  }
+
+  /** A page of events before this one. A search for a text takes the agent several requests. */
+  async #search(before, signal) {
+    const events = [];
+    let next = before;
+    let newest;
+    do {
+      const answer = await get(withQuery("/api/v1/events", { ...this.filter, before: next, limit: PAGE - events.length }), signal);
+      newest ??= answer.newest;
+      events.push(...answer.events);
+      next = answer.next;
+      if (next !== null && events.length < PAGE) this.count.textContent = `Searching before event ${number(next)} …`;
+    } while (next !== null && events.length < PAGE);
+    return { events, next, newest };
   }
 
   /** An agent that comes back with another history counts its events anew: then the list begins anew. */
@@ -167,15 +184,14 @@ class EventsPage {
     this.all = events.concat(this.all);
     if (this.all.length > MOST) {
       this.all.length = MOST;
-      this.hasOlder = false;
+      this.next = null;
     }
-    const shown = events.filter((event) => this.#isWanted(event));
-    if (!this.list.isAtTop && shown.length > 0) {
+    if (!this.list.isAtTop && events.length > 0) {
       this.newer.hidden = false;
       this.newer.textContent = "New events above";
     }
-    if (this.list.items.length === 0 && shown.length > 0) fill(this.body, this.list.element);
-    this.list.prepend(shown, MOST);
+    if (this.list.items.length === 0 && events.length > 0) fill(this.body, this.list.element);
+    this.list.prepend(events, MOST);
     this.#drawCount();
   }
 
@@ -187,19 +203,12 @@ class EventsPage {
     this.#setState(this.streamState);
   }
 
-  #isWanted(event) {
-    const word = this.text.value.toLowerCase();
-    return !word || describe(event).toLowerCase().includes(word) || event.situation.toLowerCase().includes(word);
-  }
-
-  #filter() {
-    const shown = this.all.filter((event) => this.#isWanted(event));
-    this.list.reset(shown);
-    if (shown.length > 0) fill(this.body, this.list.element);
-    else if (this.all.length > 0) fill(this.body, empty("None of these", "No event that is loaded has this text."));
+  #draw() {
+    this.list.reset(this.all);
+    if (this.all.length > 0) fill(this.body, this.list.element);
     else if (Object.values(this.filter).some(Boolean)) {
       fill(this.body, empty("None of these", "No event of the history fits the filter. One that comes shows at once.", button("Show all events", () => {
-        for (const control of [this.situation, this.log, this.severity]) control.value = "";
+        for (const control of [this.situation, this.log, this.severity, this.text]) control.value = "";
         this.choose();
       })));
     } else fill(this.body, empty("No events yet", "An event comes when an entry meets a situation. This page shows it at once.", h("a", { className: "button", href: "#/situations" }, "Situations")));
@@ -207,23 +216,23 @@ class EventsPage {
   }
 
   #drawCount() {
-    this.count.textContent = `${number(this.list.items.length)}${this.hasOlder ? "+" : ""} shown`;
+    this.count.textContent = `${number(this.list.items.length)}${this.next !== null ? "+" : ""} shown`;
   }
 
   async #older() {
-    if (!this.hasOlder || this.isLoadingOlder || this.all.length === 0) return;
+    if (this.next === null || this.isLoadingOlder) return;
     this.isLoadingOlder = true;
     const abort = this.abort;
     try {
-      const before = this.all[this.all.length - 1].id;
-      const { events } = await get(withQuery("/api/v1/events", { ...this.filter, before, limit: PAGE }), abort.signal);
+      const { events, next } = await this.#search(this.next, abort.signal);
       this.all = this.all.concat(events);
-      this.hasOlder = events.length === PAGE && this.all.length < MOST;
-      this.list.append(events.filter((event) => this.#isWanted(event)));
+      this.next = this.all.length < MOST ? next : null;
+      this.list.append(events);
     } catch {
-      this.hasOlder = abort === this.abort; // scrolling on asks again
+      if (abort !== this.abort) return; // another list by now; else scrolling on asks again
+    } finally {
+      this.isLoadingOlder = false;
     }
-    this.isLoadingOlder = false;
     this.#drawCount();
   }
 

@@ -23,7 +23,7 @@ class HistoryQueryTest : public testing::Test {
 protected:
     std::vector<std::uint64_t> ids(const EventFilter& filter) {
         std::vector<std::uint64_t> ids;
-        for (const StoredEvent& event : HistoryQuery(database, filter).run()) {
+        for (const StoredEvent& event : HistoryQuery(database, filter).run().events) {
             ids.push_back(event.id);
         }
         return ids;
@@ -38,7 +38,7 @@ TEST_F(HistoryQueryTest, GivesEventsWithAllThatBelongsToThem) {
     EventRecord event = testEvent(1, testTime, "ssh", "/var/log/auth.log", "critical");
     event.json = R"({"id":1})";
     file.store(*batchOf({event, testEvent(2)}), {});
-    EXPECT_THAT(HistoryQuery(database, {.situations = {"ssh"}}).run(),
+    EXPECT_THAT(HistoryQuery(database, {.situations = {"ssh"}}).run().events,
                 ElementsAre(StoredEvent{1, testTime, "ssh", "critical", "/var/log/auth.log",
                                         R"({"id":1})"}));
 }
@@ -69,6 +69,80 @@ TEST_F(HistoryQueryTest, TakesTextsAsTheyAre) {
     EXPECT_THAT(ids({.situations = {"%"}}), IsEmpty());
     EXPECT_THAT(ids({.situations = {"WATCH"}}), IsEmpty());
     EXPECT_THAT(ids({.logs = {std::string("/var/log/app.log\0", 17)}}), IsEmpty());
+}
+
+/// An event whose row has this description.
+EventRecord described(std::uint64_t id, std::string& room, const std::string& description,
+                      std::string_view situation = "watch") {
+    room = R"({"row":{"UENTRYDESC":")" + description + R"("}})";
+    EventRecord event = testEvent(id, testTime, situation);
+    event.json = room;
+    return event;
+}
+
+TEST_F(HistoryQueryTest, FindsATextInTheWholeHistory) {
+    std::vector<std::string> rooms(1000);
+    std::vector<EventRecord> events;
+    for (std::uint64_t id = 1; id <= rooms.size(); ++id) {
+        events.push_back(described(id, rooms[id - 1], id % 100 == 7 ? "Disk FULL" : "all is well",
+                                   id == 207 ? "rare" : "often"));
+    }
+    file.store(*batchOf(events), {});
+    EXPECT_THAT(ids({.text = "disk full", .limit = 3}), ElementsAre(907, 807, 707));
+    EXPECT_THAT(ids({.before = 207, .text = "disk full"}), ElementsAre(107, 7));
+    EXPECT_THAT(ids({.situations = {"rare"}, .text = "disk"}), ElementsAre(207));
+    EXPECT_THAT(
+        ids({.situations = {"often", "rare"}, .text = "disk", .limit = 1, .newestFirst = false}),
+        ElementsAre(7));
+    EXPECT_THAT(ids({.text = "nowhere"}), IsEmpty());
+}
+
+TEST_F(HistoryQueryTest, ASearchWhoseTimeIsOverSaysHowFarItWas) {
+    std::vector<std::string> rooms(1000);
+    std::vector<EventRecord> events;
+    for (std::uint64_t id = 1; id <= rooms.size(); ++id) {
+        events.push_back(described(id, rooms[id - 1], id == 1 ? "the one" : "another"));
+    }
+    file.store(*batchOf(events), {});
+    for (const std::vector<std::string>& situations :
+         {std::vector<std::string>{}, std::vector<std::string>{"watch"}}) {
+        EventFilter filter{.situations = situations, .text = "the one"};
+        std::vector<std::uint64_t> found;
+        int requests = 0;
+        for (bool isMore = true; isMore; ++requests) {
+            const EventPage page = HistoryQuery(database, filter, std::chrono::seconds(0)).run();
+            for (const StoredEvent& event : page.events) {
+                found.push_back(event.id);
+            }
+            isMore = page.reached.has_value();
+            ASSERT_TRUE(!isMore || *page.reached < filter.before.value_or(1001));
+            filter.before = page.reached;
+        }
+        EXPECT_THAT(found, ElementsAre(1));
+        EXPECT_EQ(requests, 1000 / 64 + 1);
+    }
+    EXPECT_FALSE(HistoryQuery(database, {.limit = 1000}, std::chrono::seconds(0)).run().reached)
+        << "only a search for a text is limited in time";
+}
+
+TEST_F(HistoryQueryTest, AnEventThatIsNotWhatWasWrittenIsReportedAndNotGiven) {
+    std::vector<std::string> rooms(9);
+    std::vector<EventRecord> events;
+    for (std::uint64_t id = 1; id <= rooms.size(); ++id) {
+        events.push_back(described(id, rooms[id - 1], "text"));
+    }
+    file.store(*batchOf(events), {});
+    Database writer(directory.file("history.db"), Database::Use::WRITE);
+    writer.run("UPDATE events SET json = replace(json, 'text', 'tExt') WHERE id = 2");
+    writer.run("UPDATE events SET raised = raised + 1 WHERE id = 4");
+    writer.run("UPDATE events SET label = 99 WHERE id = 6");
+    writer.run("UPDATE events SET json = '{\"row', checksum = NULL WHERE id = 7");
+    writer.run("UPDATE events SET checksum = NULL WHERE id = 8"); // of an earlier version
+    const EventPage page = HistoryQuery(database, {.newestFirst = false}).run();
+    EXPECT_THAT(page.damaged, ElementsAre(2, 4, 6, 7));
+    EXPECT_THAT(ids({.newestFirst = false}), ElementsAre(1, 3, 5, 8, 9));
+    EXPECT_THAT(HistoryQuery(database, {.text = "text", .newestFirst = false}).run().damaged,
+                ElementsAre(2, 4, 6));
 }
 
 TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutAWalkThroughTheOthers) {

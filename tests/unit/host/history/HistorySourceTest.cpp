@@ -9,11 +9,13 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <chrono>
 #include <future>
 #include <memory>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include <sqlite3.h>
@@ -143,6 +145,37 @@ TEST_F(HistorySourceTest, PassesOverWhatTheHistoryNoLongerHoldsAndSaysSo) {
               "any longer\n");
     EXPECT_EQ(cursor, 900u);
     EXPECT_EQ(late.backlog(), 100u);
+}
+
+TEST_F(HistorySourceTest, PassesOverWhatIsDamagedAndSaysSo) {
+    for (std::uint64_t first = 1; first <= 1000; first += 100) {
+        file.store(*batchOf(first, first + 99), {});
+    }
+    RecentEvents nothingInMemory(plenty, 1000);
+    HistorySource sourceOfFile("sink x", nothingInMemory, readers, cursor);
+    Database writer(directory.file("history.db"), Database::Use::WRITE);
+    writer.run("UPDATE events SET json = '{,}' WHERE id IN (1, 300) OR id BETWEEN 400 AND 800");
+    testing::internal::CaptureStderr();
+    std::vector<std::uint64_t> ids;
+    while (ids.empty() || ids.back() < 1000) {
+        const auto events = sourceOfFile.read(64);
+        for (const EventRecord& event : events) {
+            ids.push_back(event.id);
+        }
+        sourceOfFile.release(events.size());
+    }
+    const std::string told = testing::internal::GetCapturedStderr();
+    std::vector<std::uint64_t> expected = idsFrom(2, 299);
+    for (const auto& [first, last] : {std::pair(301, 399), std::pair(801, 1000)}) {
+        const auto more =
+            idsFrom(static_cast<std::uint64_t>(first), static_cast<std::uint64_t>(last));
+        expected.insert(expected.end(), more.begin(), more.end());
+    }
+    EXPECT_EQ(ids, expected);
+    EXPECT_EQ(std::count(told.begin(), told.end(), '\n'), 403);
+    EXPECT_EQ(told.substr(0, told.find('\n')),
+              "zrmagent: sink x did not get the event 1: it is damaged in the history, its content "
+              "is not what was written");
 }
 
 TEST_F(HistorySourceTest, ReachesBackInMemoryWhereTheFileIsNew) {

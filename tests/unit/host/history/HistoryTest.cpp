@@ -83,7 +83,8 @@ protected:
     }
     std::vector<std::uint64_t> ids() {
         std::vector<std::uint64_t> ids;
-        for (const StoredEvent& event : history->query({.limit = 100'000, .newestFirst = false})) {
+        const EventPage page = history->query({.limit = 100'000, .newestFirst = false});
+        for (const StoredEvent& event : page.events) {
             ids.push_back(event.id);
         }
         return ids;
@@ -382,6 +383,29 @@ TEST_F(HistoryTest, CorruptionThatAReaderFindsIsSeenToAsWell) {
     EXPECT_EQ(ids(), idsFrom(11, 20));
 }
 
+TEST_F(HistoryTest, ADamagedEventIsTracedOnceAndRefused) {
+    open();
+    pushAndWait(3);
+    EXPECT_EQ(history->state().damaged, 0u);
+    run("UPDATE events SET json = replace(json, 'text', 'tex') WHERE id = 2");
+    EXPECT_EQ(ids(), (std::vector<std::uint64_t>{1, 3}));
+    EXPECT_EQ(ids(), (std::vector<std::uint64_t>{1, 3}));
+    EXPECT_THROW(
+        {
+            try {
+                history->event(2);
+            } catch (const HistoryError& error) {
+                EXPECT_STREQ(error.what(),
+                             "event 2 is damaged: its content is not what was written");
+                throw;
+            }
+        },
+        HistoryError);
+    EXPECT_EQ(history->state().damaged, 1u);
+    EXPECT_THAT(trace.messages(), ElementsAre("Event 2 in the history " + file() +
+                                              " is damaged: its content is not what was written."));
+}
+
 TEST_F(HistoryTest, AFileOfALaterVersionIsLeftAlone) {
     open();
     close();
@@ -464,7 +488,7 @@ TEST_F(HistoryTest, ManyReadersDoNotDisturbTheWriter) {
         readers.emplace_back([&] {
             while (!done) {
                 const auto newest = history->newest();
-                const auto events = history->query({.situations = {"watch"}, .limit = 50});
+                const auto events = history->query({.situations = {"watch"}, .limit = 50}).events;
                 ++read;
                 if (newest > 0) {
                     EXPECT_GE(events.front().id, newest);

@@ -91,10 +91,27 @@ TEST_F(SchemaTest, BringsAFileOfTheSecondVersionUpToDate) {
     EXPECT_EQ(database.number("SELECT entries FROM rates"), 5);
     database.run("PRAGMA foreign_keys = ON");
     EXPECT_EQ(database.number("SELECT count(*) FROM pragma_foreign_key_check"), 0);
-    database.run("INSERT INTO events VALUES (42, 1795158189412, 1, '{}')");
-    EXPECT_THROW(database.run("INSERT INTO events VALUES (43, 1795158189412, 2, '{}')"),
+    database.run("INSERT INTO events VALUES (42, 1795158189412, 1, '{}', NULL)");
+    EXPECT_THROW(database.run("INSERT INTO events VALUES (43, 1795158189412, 2, '{}', NULL)"),
                  DatabaseError)
         << "events still refer to labels";
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheThirdVersionUpToDate) {
+    database.run(firstVersion);
+    database.run("CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
+                 "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL,"
+                 " entries INTEGER NOT NULL, events INTEGER NOT NULL, PRIMARY KEY (minute, log))"
+                 " WITHOUT ROWID;"
+                 "ALTER TABLE labels ADD COLUMN text TEXT NOT NULL DEFAULT '';"
+                 "PRAGMA user_version = 3");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    Statement event(database, "SELECT id, json, checksum FROM events");
+    ASSERT_TRUE(event.step());
+    EXPECT_EQ(event.integer(0), 41);
+    EXPECT_EQ(event.text(1), "{}");
+    EXPECT_TRUE(event.isNull(2)) << "what was stored before has no checksum";
 }
 
 TEST_F(SchemaTest, AStepThatFailsLeavesTheOlderVersionWhole) {

@@ -27,21 +27,38 @@ protected:
 };
 
 TEST_F(EventsResourceTest, GivesTheNewestFirstAndWhereToGoOn) {
-    EXPECT_EQ(get("/api/v1/events"), R"(200 {"events":[],"next":null,"oldest":0,"newest":0})");
+    EXPECT_EQ(get("/api/v1/events"),
+              R"(200 {"events":[],"next":null,"oldest":0,"newest":0,"damaged":[]})");
     for (std::uint64_t id = 5; id <= 9; ++id) {
         history.add(id);
     }
     EXPECT_EQ(get("/api/v1/events?limit=2"),
-              R"(200 {"events":[{"id":9},{"id":8}],"next":8,"oldest":5,"newest":9})");
-    EXPECT_EQ(get("/api/v1/events?limit=3&before=8"),
-              R"(200 {"events":[{"id":7},{"id":6},{"id":5}],"next":null,"oldest":5,"newest":9})");
+              R"(200 {"events":[{"id":9},{"id":8}],"next":8,"oldest":5,"newest":9,"damaged":[]})");
+    EXPECT_EQ(
+        get("/api/v1/events?limit=3&before=8"),
+        R"(200 {"events":[{"id":7},{"id":6},{"id":5}],"next":null,"oldest":5,"newest":9,"damaged":[]})");
     EXPECT_EQ(get("/api/v1/events?limit=2&after=5&order=asc"),
-              R"(200 {"events":[{"id":6},{"id":7}],"next":7,"oldest":5,"newest":9})");
+              R"(200 {"events":[{"id":6},{"id":7}],"next":7,"oldest":5,"newest":9,"damaged":[]})");
+}
+
+TEST_F(EventsResourceTest, ASearchThatStoppedSaysWhereToGoOn) {
+    history.add(7);
+    history.reached = 5;
+    history.damaged = {6, 5};
+    EXPECT_EQ(get("/api/v1/events?text=x"),
+              R"(200 {"events":[{"id":7}],"next":5,"oldest":7,"newest":7,"damaged":[6,5]})");
+    history.add(8);
+    EXPECT_EQ(get("/api/v1/events?text=x&limit=1"),
+              R"(200 {"events":[{"id":8}],"next":8,"oldest":7,"newest":8,"damaged":[6,5]})")
+        << "a page that is full goes on behind its last event";
+    EXPECT_EQ(get("/api/v1/events?text=" + std::string(257, 'x')),
+              "400 text: write at most 256 bytes");
 }
 
 TEST_F(EventsResourceTest, HandsEveryWishToTheHistory) {
     get("/api/v1/events?after=3&before=9&from=1970-01-01T00:00:01Z&to=1970-01-01T00:00:02.5Z&"
-        "situation=a&situation=b%27%3B--&log=%2Fx&severity=info&severity=critical&limit=1000");
+        "situation=a&situation=b%27%3B--&log=%2Fx&severity=info&severity=critical&text=%22+y&"
+        "limit=1000");
     const EventFilter filter = history.lastFilter();
     EXPECT_EQ(filter.after, 3u);
     EXPECT_EQ(filter.before, 9u);
@@ -50,6 +67,7 @@ TEST_F(EventsResourceTest, HandsEveryWishToTheHistory) {
     EXPECT_THAT(filter.situations, ElementsAre("a", "b';--"));
     EXPECT_THAT(filter.logs, ElementsAre("/x"));
     EXPECT_THAT(filter.severities, ElementsAre("info", "critical"));
+    EXPECT_EQ(filter.text, "\" y");
     EXPECT_EQ(filter.limit, 1001u);
     EXPECT_TRUE(filter.newestFirst);
 }

@@ -33,7 +33,7 @@ public:
         return m_filter;
     }
 
-    std::vector<StoredEvent> query(const EventFilter& filter) override {
+    EventPage query(const EventFilter& filter) override {
         const std::lock_guard guard(m_mutex);
         check();
         m_filter = filter;
@@ -51,7 +51,7 @@ public:
             std::reverse(found.begin(), found.end());
         }
         found.resize(std::min(found.size(), filter.limit));
-        return found;
+        return {std::move(found), damaged, reached};
     }
     std::optional<StoredEvent> event(std::uint64_t id) override {
         const std::lock_guard guard(m_mutex);
@@ -90,6 +90,8 @@ public:
         return {from, step, {{"/a", {1, std::nullopt}, {0, std::nullopt}}, {"/b", {}, {}}}};
     }
 
+    std::vector<std::uint64_t> damaged;   ///< what queries give as damaged
+    std::optional<std::uint64_t> reached; ///< where queries say that they stopped
     std::int64_t ratesFrom = 0;
     std::int64_t ratesTo = 0;
 
