@@ -5,6 +5,7 @@
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/ConfigSecrets.h"
 #include "host/diagnose/ConfigCheck.h"
 
 #include <algorithm>
@@ -97,6 +98,10 @@ int CheckCommand::checkHost(Context& context) const {
         context.printJson({{"accepted", problems.empty()}, {"problems", problems}});
     } else if (problems.empty()) {
         context.print(DisplayText::visible(m_host) + " can be used\n");
+        if (const std::string warning = warningOfSecrets(std::get<HostConfig>(result), m_host);
+            !warning.empty()) {
+            Context::note(warning);
+        }
     } else {
         for (const std::string& problem : problems) {
             Context::note(problem);

@@ -1,6 +1,7 @@
 #include "host/config/SinkOptionReader.h"
 
 #include "host/config/DurationText.h"
+#include "host/config/HeaderName.h"
 #include "host/config/HttpUrl.h"
 #include "host/http/ListenAddress.h"
 
@@ -83,21 +84,6 @@ std::string cureOf(const SinkOption& option) {
     return text;
 }
 
-/// True for what may be the name of a header that an operator adds to those that a sink sets.
-bool isHeaderName(std::string_view name) {
-    constexpr std::array<std::string_view, 10> own = {
-        "host",   "content-length", "content-type",    "transfer-encoding", "connection",
-        "expect", "user-agent",     "accept-encoding", "idempotency-key",   "x-zrm-signature"};
-    constexpr std::string_view signs = "!#$%&'*+-.^_`|~";
-    std::string lower(name);
-    std::transform(lower.begin(), lower.end(), lower.begin(),
-                   [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c + 32) : c; });
-    return !name.empty() && std::find(own.begin(), own.end(), lower) == own.end() &&
-           std::all_of(name.begin(), name.end(), [&](char c) {
-               return isLetter(c) || isDigit(c) || signs.find(c) != std::string_view::npos;
-           });
-}
-
 /// True for what may be the name of a label that an operator adds to those that an alert has.
 bool isLabelName(std::string_view name) {
     constexpr std::array<std::string_view, 4> own = {"alertname", "severity", "log", "node"};
@@ -120,7 +106,7 @@ struct TableKind {
 };
 
 constexpr std::array tableKinds = {
-    TableKind{SinkOption::HEADERS, isHeaderName, "is no name of a header that can be added",
+    TableKind{SinkOption::HEADERS, isAddableHeader, "is no name of a header that can be added",
               "use letters, digits and dashes; what describes the request is set already"},
     TableKind{SinkOption::LABELS, isLabelName, "is no name of a label that can be added",
               "use letters, digits and underscores, a letter first; alertname, severity, log and "

@@ -43,6 +43,12 @@ constexpr Option headersOption{
     .need = Option::OPTIONAL,
     .value = "",
     .meaning = "headers that are sent with each request, such as `Authorization`"};
+constexpr Option headersFileOption{
+    .name = "headers_file",
+    .kind = Option::PATH,
+    .need = Option::OPTIONAL,
+    .value = "",
+    .meaning = "the file with more headers, `Name: value` a line, which is read for each request"};
 constexpr Option caFileOption{
     .name = "ca_file",
     .kind = Option::PATH,
@@ -77,6 +83,7 @@ constexpr std::array webhookOptions = {
            .meaning = "the file with the secret, which is read for each request"},
     timeoutOption,
     headersOption,
+    headersFileOption,
     caFileOption,
 };
 
@@ -105,6 +112,7 @@ constexpr std::array alertmanagerOptions = {
            .meaning = "the link from an alert to where it comes from"},
     timeoutOption,
     headersOption,
+    headersFileOption,
     caFileOption,
 };
 
@@ -156,6 +164,7 @@ constexpr std::array otlpOptions = {
            .meaning = "resource attributes that are added"},
     timeoutOption,
     headersOption,
+    headersFileOption,
     caFileOption,
 };
 

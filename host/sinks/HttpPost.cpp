@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "host/client/HttpClient.h"
 #include "host/config/HttpUrl.h"
+#include "host/sinks/HeadersFile.h"
 
 #include <algorithm>
 #include <array>
@@ -10,6 +11,7 @@
 #include <chrono>
 #include <cstdint>
 #include <exception>
+#include <optional>
 #include <utility>
 
 namespace {
@@ -80,12 +82,14 @@ public:
 
 private:
     HttpClientRequest requestOf(const std::string& body, const Headers& headers);
+    bool addHeadersOfFile(HttpClientRequest& request);
     bool judge(const HttpClientAnswer& answer);
 
     const HttpUrl m_url;
     const std::string m_target;
     const std::chrono::milliseconds m_timeout;
     const Headers m_headers;
+    const std::string m_headersFile;
     HttpClient m_client;
     Clock::time_point m_notBefore{}; ///< the end of the pause that the receiver asked for
     std::string m_body;              ///< of the last answer
@@ -95,6 +99,7 @@ private:
 HttpPost::Implementation::Implementation(const SinkConfig& config, std::string_view path)
     : m_url(HttpUrl::parse(config.text("url")).value_or(HttpUrl{})), m_target(m_url.withPath(path)),
       m_timeout(config.duration("timeout")), m_headers(config.texts("headers")),
+      m_headersFile(config.text("headers_file")),
       m_client({m_url, config.text("ca_file"), "", "zrmagent"}) {}
 
 HttpClientRequest HttpPost::Implementation::requestOf(const std::string& body,
@@ -117,6 +122,23 @@ HttpClientRequest HttpPost::Implementation::requestOf(const std::string& body,
         }
     }
     return request;
+}
+
+/// Read anew each time, so that they can be changed while the agent runs.
+bool HttpPost::Implementation::addHeadersOfFile(HttpClientRequest& request) {
+    if (m_headersFile.empty()) {
+        return true;
+    }
+    std::string problem;
+    const std::optional<Headers> headers = HeadersFile::read(m_headersFile, problem);
+    if (!headers) {
+        m_error = problem;
+        return false;
+    }
+    for (const auto& [name, value] : *headers) {
+        request.headers.push_back(name + ": " + value);
+    }
+    return true;
 }
 
 bool HttpPost::Implementation::judge(const HttpClientAnswer& answer) {
@@ -144,7 +166,11 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
         return trace.result(false); // the last error holds
     }
     m_body.clear();
-    const HttpClientAnswer answer = m_client.send(requestOf(body, headers), giveUp);
+    HttpClientRequest request = requestOf(body, headers);
+    if (!addHeadersOfFile(request)) {
+        return trace.result(false);
+    }
+    const HttpClientAnswer answer = m_client.send(request, giveUp);
     m_notBefore = Clock::now() + pauseOf(answer);
     return trace.result(judge(answer));
 }

@@ -16,8 +16,8 @@ class HttpPost {
 public:
     using Headers = std::map<std::string, std::string>;
 
-    /// Reads the options url, timeout, headers and ca_file of a sink; `path` is added to the
-    /// path of the URL. Touches nothing outside the process.
+    /// Reads the options url, timeout, headers, headers_file and ca_file of a sink; `path` is added
+    /// to the path of the URL. Touches nothing outside the process.
     HttpPost(const SinkConfig& config, std::string_view path);
     ~HttpPost();
     HttpPost(const HttpPost&) = delete;

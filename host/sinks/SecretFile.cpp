@@ -12,7 +12,7 @@ namespace {
 
 constexpr std::size_t longestSecret = 4096; ///< bytes
 
-/// The whole content of an open file, or as much as tells that it is too long.
+/// The whole content of an open file, or enough of it to show that it is too long.
 std::optional<std::string> content(int fd) {
     std::string text;
     char buffer[1024];
@@ -37,12 +37,18 @@ std::optional<std::string> SecretFile::read(const std::string& path, std::string
         return std::nullopt;
     }
     ::close(fd);
+    if (problem.empty() && text && (status.st_mode & S_IRWXO) != 0) {
+        problem = path +
+                  " is open to every user: take the others' permissions away (chmod o= " + path +
+                  ')';
+        return std::nullopt;
+    }
     if (text && text->ends_with('\n')) {
         text->pop_back();
     }
     if (problem.empty() && (!text || text->empty() || text->size() > longestSecret)) {
-        problem =
-            path + " is no file with a secret of 1 to " + std::to_string(longestSecret) + " bytes";
+        problem = path + " is not a file with a secret of 1 to " + std::to_string(longestSecret) +
+                  " bytes";
         return std::nullopt;
     }
     return text;

@@ -1,5 +1,6 @@
 #include "agent/framework/agent_calls.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/ConfigSecrets.h"
 #include "host/config/WatchedFile.h"
 #include "host/framework/TraceControl.h"
 #include "host/start/CommandLine.h"
@@ -50,7 +51,11 @@ HostConfig readConfig(const std::string& path) {
         }
         std::exit(unusableStatus);
     }
-    return std::get<HostConfig>(std::move(result));
+    HostConfig& config = std::get<HostConfig>(result);
+    if (const std::string warning = warningOfSecrets(config, path); !warning.empty()) {
+        say("%s", warning.c_str());
+    }
+    return std::move(config);
 }
 
 /// The trace goes where the command line says, at the level that the environment says.

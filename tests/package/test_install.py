@@ -48,6 +48,9 @@ def test_install_run_upgrade_remove_purge(installed, service):
         account.pw_gid,
         0o750,
     )
+    config = Path("/etc/zrm/zrm.toml")  # may come to hold secrets
+    assert (config.owner(), config.group()) == ("root", "zrm")
+    assert stat.S_IMODE(config.stat().st_mode) == 0o640
     enabled = Path("/etc/systemd/system/multi-user.target.wants/zrmagent.service")
     assert enabled.is_symlink()
 
@@ -66,9 +69,11 @@ def test_install_run_upgrade_remove_purge(installed, service):
     assert (STATE / "api-token").stat().st_uid == account.pw_uid
 
     own = "# the operator's own\n" + Path("/etc/zrm/zrm.toml").read_text()
-    Path("/etc/zrm/zrm.toml").write_text(own)
+    config.write_text(own)
+    config.chmod(0o644)
     run("dpkg", "--install", PACKAGE)
     assert Path("/etc/zrm/zrm.toml").read_text() == own
+    assert stat.S_IMODE(config.stat().st_mode) == 0o644  # as the operator left it
     assert user() == account
 
     run("dpkg", "--remove", "zrmagent")

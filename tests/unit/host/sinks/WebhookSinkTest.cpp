@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+#include <sys/stat.h>
+
 namespace {
 
 using Reply = ScriptedServer::Reply;
@@ -108,9 +110,9 @@ TEST_F(WebhookSinkTest, ReadsTheSecretAnewForEachRequest) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(), "cannot read " + path + ": No such file or directory");
     for (const char* const empty : {"", "\n"}) {
-        directory.write("secret", empty);
+        chmod(directory.write("secret", empty).c_str(), 0600);
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
-        EXPECT_EQ(sink.error(), path + " is no file with a secret of 1 to 4096 bytes");
+        EXPECT_EQ(sink.error(), path + " is not a file with a secret of 1 to 4096 bytes");
     }
     EXPECT_TRUE(receiver.requests().empty()) << "nothing goes out unsigned";
     for (const char* const secret : {"first", "second key"}) {
@@ -122,15 +124,48 @@ TEST_F(WebhookSinkTest, ReadsTheSecretAnewForEachRequest) {
 }
 
 TEST_F(WebhookSinkTest, ASecretIsARegularFileOfBoundedSize) {
-    directory.write("long", std::string(4097, 'a'));
+    chmod(directory.write("long", std::string(4097, 'a')).c_str(), 0600);
     for (const std::string& path : {std::string(directory.path()), directory.file("long")}) {
         WebhookSink sink(config("secret_file = '" + path + "'"));
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
-        EXPECT_EQ(sink.error(), path + " is no file with a secret of 1 to 4096 bytes");
+        EXPECT_EQ(sink.error(), path + " is not a file with a secret of 1 to 4096 bytes");
     }
-    directory.write("longest", std::string(4096, 'a') + "\n");
+    chmod(directory.write("longest", std::string(4096, 'a') + "\n").c_str(), 0600);
     WebhookSink sink(config("secret_file = '" + directory.file("longest") + "'"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
+}
+
+TEST_F(WebhookSinkTest, ASecretThatIsOpenToEveryUserIsNotUsed) {
+    const std::string path = directory.write("secret", "key\n");
+    chmod(path.c_str(), 0644);
+    WebhookSink sink(config("secret_file = '" + path + "'"));
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(), path +
+                                " is open to every user: take the others' permissions away "
+                                "(chmod o= " +
+                                path + ")");
+    chmod(path.c_str(), 0640);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
+}
+
+TEST_F(WebhookSinkTest, HeadersOfAFileAreReadAnewForEachRequest) {
+    const std::string path =
+        directory.write("headers", "# for the gateway\nAuthorization: Bearer a:b\n\n X-One:1 \n");
+    chmod(path.c_str(), 0600);
+    WebhookSink sink(config("headers = { X-Two = '2' }\nheaders_file = '" + path + "'"));
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
+    EXPECT_EQ(receiver.requests().back().header("authorization"), "bearer a:b");
+    EXPECT_EQ(receiver.requests().back().header("x-one"), "1");
+    EXPECT_EQ(receiver.requests().back().header("x-two"), "2");
+    for (const char* const wrong : {"Host: x", "no colon", ": x", "X-One: \x01"}) {
+        directory.write("headers", std::string("X-Three: 3\n") + wrong + "\n");
+        EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u) << wrong;
+        EXPECT_EQ(sink.error(), path + ":2: not a header that can be added; write 'Name: value', a "
+                                       "line each");
+    }
+    directory.write("headers", "Authorization: other\n");
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
+    EXPECT_EQ(receiver.requests().back().header("authorization"), "other");
 }
 
 TEST(HmacSha256, GivesTheKnownSignatures) {

@@ -1,0 +1,12 @@
+#ifndef ZRM_HOST_CONFIG_SECRETS_H
+#define ZRM_HOST_CONFIG_SECRETS_H
+
+#include "host/config/HostConfig.h"
+
+#include <string>
+
+/// A warning when a configuration, read from the file of this path, holds a secret of a sink and
+/// every user can read the file; else empty.
+std::string warningOfSecrets(const HostConfig& config, const std::string& path);
+
+#endif

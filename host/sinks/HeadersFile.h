@@ -1,0 +1,19 @@
+#ifndef ZRM_HOST_HEADERS_FILE_H
+#define ZRM_HOST_HEADERS_FILE_H
+
+#include <map>
+#include <optional>
+#include <string>
+
+/// Headers that are kept in a file of their own, because they are secrets: "Name: value", one per
+/// line. Stateless.
+class HeadersFile {
+public:
+    using Headers = std::map<std::string, std::string>;
+
+    /// The headers of a file, which holds what a SecretFile may hold; none when it cannot be used:
+    /// then `problem` says why, and never what the file holds.
+    static std::optional<Headers> read(const std::string& path, std::string& problem);
+};
+
+#endif

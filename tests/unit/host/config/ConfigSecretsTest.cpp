@@ -1,0 +1,50 @@
+#include "host/config/ConfigSecrets.h"
+
+#include "host/config/ConfigFile.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <variant>
+
+#include <sys/stat.h>
+
+namespace {
+
+class ConfigSecretsTest : public testing::Test {
+protected:
+    std::string warning(const std::string& option, mode_t mode) {
+        const std::string path = directory.write(
+            "zrm.toml", "[[sink]]\ntype = 'webhook'\nurl = 'http://127.0.0.1'\n" + option + '\n');
+        chmod(path.c_str(), mode);
+        const ConfigFile::Result result = ConfigFile::load(path);
+        return warningOfSecrets(std::get<HostConfig>(result), path);
+    }
+
+    TemporaryDirectory directory;
+};
+
+} // namespace
+
+TEST_F(ConfigSecretsTest, WarnsOfSecretsThatEveryUserCanRead) {
+    const std::string path = directory.file("zrm.toml");
+    const std::string expected =
+        path +
+        " holds secrets and every user can read it: move them into files of their own "
+        "(secret_file, headers_file), or take the others' permissions away (chmod o= " +
+        path + ')';
+    for (const char* const secret :
+         {"secret = 'key'", "headers = { authorization = 'Bearer a' }",
+          "headers = { X-Api-Key = 'a' }", "headers = { X-One = '1', Private-Token = 'a' }"}) {
+        EXPECT_EQ(warning(secret, 0644), expected) << secret;
+        EXPECT_EQ(warning(secret, 0640), "") << secret;
+    }
+}
+
+TEST_F(ConfigSecretsTest, NothingElseIsWarnedOf) {
+    for (const char* const harmless :
+         {"", "secret_file = '/etc/zrm/secret'", "headers = { X-Scope-OrgID = 'a' }"}) {
+        EXPECT_EQ(warning(harmless, 0644), "") << harmless;
+    }
+}
