@@ -30,31 +30,44 @@ std::uint64_t newestOfCorrupt(const std::string& path) {
     }
 }
 
+/// The id behind which a file goes on whose newest event is this one: where the file is new, or an
+/// older copy, ids that were given since are not given again.
+std::uint64_t newestWith(const HistoryDirectory& directory, std::uint64_t newest) {
+    const std::uint64_t reserved = directory.reservedIds();
+    const bool isLost = newest == 0 || newest + HistoryDirectory::idsAtOnce < reserved;
+    return isLost ? reserved : newest;
+}
+
 /// The file, or what is wrong with it. A corrupt one is exchanged.
 std::variant<std::unique_ptr<HistoryFile>, std::string>
 openOrReplace(const HistoryDirectory& directory) {
     const auto problem = [&](const char* why) {
         return "cannot open " + directory.file() + ": " + why;
     };
-    std::uint64_t newest = 0;
+    const auto open = [&](std::uint64_t newest) {
+        auto file = std::make_unique<HistoryFile>(directory.file());
+        const std::uint64_t last = newestWith(directory, std::max(newest, file->newest()));
+        if (last > file->newest()) {
+            file->continueAfter(last);
+        }
+        return file;
+    };
     try {
-        return std::make_unique<HistoryFile>(directory.file());
+        try {
+            return open(0);
+        } catch (const DatabaseError& error) {
+            if (!error.isCorruption()) {
+                throw;
+            }
+            const std::uint64_t newest = newestOfCorrupt(directory.file());
+            if (std::string failure = directory.moveAside(error.what()); !failure.empty()) {
+                return failure;
+            }
+            return open(newest);
+        }
     } catch (const SchemaTooNew& error) {
         return problem(error.what()) +
                "; use the program that wrote it, or move the file out of the way";
-    } catch (const DatabaseError& error) {
-        if (!error.isCorruption()) {
-            return problem(error.what());
-        }
-        newest = newestOfCorrupt(directory.file());
-        if (std::string failure = directory.moveAside(error.what()); !failure.empty()) {
-            return failure;
-        }
-    }
-    try {
-        auto file = std::make_unique<HistoryFile>(directory.file());
-        file->continueAfter(newest);
-        return file;
     } catch (const DatabaseError& error) {
         return problem(error.what());
     }

@@ -4,10 +4,14 @@
 #include "agent/TraceScope.h"
 #include "host/start/Say.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
+#include <charconv>
+#include <cinttypes>
 #include <cstdio>
 #include <ctime>
+#include <limits>
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -38,6 +42,9 @@ bool lockWhole(int fd) {
     return fcntl(fd, F_SETLK, &whole) == 0;
 }
 
+/// Numbers in the lock's file are written over one another.
+constexpr int digitsOfId = 20;
+
 std::string timeNow() {
     const std::time_t now = std::time(nullptr);
     std::tm utc{};
@@ -50,36 +57,80 @@ std::string timeNow() {
 } // namespace
 
 HistoryDirectory::HistoryDirectory(const std::string& directory, int lock)
-    : m_file(directory + "/history.db"), m_lock(lock) {}
+    : m_directory(directory), m_file(directory + "/history.db"), m_lock(lock) {}
 
 HistoryDirectory::~HistoryDirectory() {
-    close(m_lock);
+    if (m_lock != -1) {
+        close(m_lock);
+    }
 }
 
 std::variant<std::unique_ptr<HistoryDirectory>, std::string>
 HistoryDirectory::open(const std::string& directory) {
     TraceScope trace(anchor);
-    constexpr const char* cure = "; make it a directory that the agent may write, or set "
-                                 "history.directory to one";
-    if (mkdir(directory.c_str(), directoryMode) == -1 && errno != EEXIST) {
-        return because("cannot make the directory " + directory, errno) + cure;
-    }
-    const std::string lock = directory + "/history.lock";
-    const int fd = ::open(lock.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, fileMode);
-    if (fd == -1) {
-        return because("cannot open " + lock, errno) + cure;
-    }
-    std::unique_ptr<HistoryDirectory> opened(new HistoryDirectory(directory, fd));
-    if (!lockWhole(fd)) {
-        if (errno == EACCES || errno == EAGAIN) {
-            return directory + " is in use by another agent; give each its own history.directory";
-        }
-        return because("cannot lock " + lock, errno) + cure;
-    }
-    if (std::string problem = opened->makeFile(); !problem.empty()) {
-        return problem + cure;
+    std::unique_ptr<HistoryDirectory> opened(new HistoryDirectory(directory, -1));
+    if (std::string problem = opened->restore(); !problem.empty()) {
+        return problem;
     }
     return opened;
+}
+
+/// Whether the name of the lock's file still leads to the file that is locked.
+bool HistoryDirectory::hasLock() const {
+    struct stat named {};
+    struct stat locked {};
+    return m_lock != -1 && stat(lockPath().c_str(), &named) == 0 && fstat(m_lock, &locked) == 0 &&
+           named.st_dev == locked.st_dev && named.st_ino == locked.st_ino;
+}
+
+std::string HistoryDirectory::restore() {
+    constexpr const char* cure = "; make it a directory that the agent may write, or set "
+                                 "history.directory to one";
+    if (mkdir(m_directory.c_str(), directoryMode) == -1 && errno != EEXIST) {
+        return because("cannot make the directory " + m_directory, errno) + cure;
+    }
+    if (!hasLock()) {
+        const int fd = ::open(lockPath().c_str(), O_RDWR | O_CREAT | O_CLOEXEC, fileMode);
+        if (fd == -1) {
+            return because("cannot open " + lockPath(), errno) + cure;
+        }
+        if (!lockWhole(fd)) {
+            const int number = errno;
+            close(fd);
+            return number == EACCES || number == EAGAIN
+                       ? m_directory +
+                             " is in use by another agent; give each its own history.directory"
+                       : because("cannot lock " + lockPath(), number) + cure;
+        }
+        if (m_lock != -1) {
+            close(m_lock);
+        }
+        m_lock = fd;
+    }
+    const std::string problem = makeFile();
+    return problem.empty() ? problem : problem + cure;
+}
+
+void HistoryDirectory::reserveIds(std::uint64_t last) const {
+    TraceScope trace(anchor);
+    std::array<char, 24> text{};
+    const int length = std::snprintf(text.data(), text.size(), "%0*" PRIu64 "\n", digitsOfId, last);
+    if (pwrite(m_lock, text.data(), static_cast<std::size_t>(length), 0) != length) {
+        const ErrorText error(errno);
+        trace.error()("Error writing %s. errno = %d; %s. Should the history be lost, its ids are "
+                      "given again.",
+                      lockPath().c_str(), error.number(), error.text());
+    }
+}
+
+std::uint64_t HistoryDirectory::reservedIds() const {
+    std::array<char, digitsOfId> text{};
+    const ssize_t length = pread(m_lock, text.data(), text.size(), 0);
+    std::uint64_t last = 0;
+    const char* const end = text.data() + std::max<ssize_t>(length, 0);
+    const auto [stop, error] = std::from_chars(text.data(), end, last);
+    constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max() / 2;
+    return length == digitsOfId && error == std::errc() && stop == end && last <= mostId ? last : 0;
 }
 
 std::string HistoryDirectory::makeFile() const {

@@ -7,7 +7,7 @@
 #include <variant>
 
 /// The directory in which a history lives, locked against other processes as long as the object
-/// lives. Immutable but for moveAside.
+/// lives. Used by one thread at a time, but file and bytes by any.
 class HistoryDirectory {
 public:
     /// Makes the directory when only it is missing, locks it, and sees that the history's file can
@@ -25,6 +25,19 @@ public:
     /// Bytes on disk, of the file and of those that SQLite keeps beside it.
     std::uint64_t bytes() const;
 
+    /// Makes anew what is missing: the directory, the lock's file, an empty history. Returns what
+    /// went wrong, empty when nothing did.
+    std::string restore();
+
+    /// Ids of events are reserved this many at a time.
+    static constexpr std::uint64_t idsAtOnce = 65536;
+
+    /// Keeps, in the lock's file, that ids up to this one may have been given to events, so that
+    /// they are not given again when the history's file is lost.
+    void reserveIds(std::uint64_t last) const;
+    /// The id up to which ids may have been given; 0 when that is not known.
+    std::uint64_t reservedIds() const;
+
     /// Renames the file to one that says when it was found corrupt, and makes an empty one. Nobody
     /// has it open. Says so; returns what went wrong, empty when nothing did.
     std::string moveAside(const std::string& why) const;
@@ -34,9 +47,12 @@ private:
 
     /// Makes the file where it is missing; returns what went wrong, empty when nothing did.
     std::string makeFile() const;
+    std::string lockPath() const { return m_directory + "/history.lock"; }
+    bool hasLock() const;
 
+    const std::string m_directory;
     const std::string m_file;
-    const int m_lock; ///< descriptor of the file that is locked
+    int m_lock; ///< descriptor of the file that is locked
 };
 
 #endif

@@ -49,7 +49,7 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
-      m_cursors(m_database), m_rates(m_database), m_oldest(m_events.oldest()),
+      m_cursors(m_database), m_rates(m_database), m_files(path), m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
@@ -151,6 +151,10 @@ bool HistoryFile::expire(const Limits& limits) {
     inTransaction([&] { m_events.removeUntil(last); });
     m_oldest = last + 1;
     return true;
+}
+
+void HistoryFile::emptyLog() {
+    m_database.number("PRAGMA wal_checkpoint(TRUNCATE)");
 }
 
 bool HistoryFile::shrink() {

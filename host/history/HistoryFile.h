@@ -6,6 +6,7 @@
 #include "host/history/EventBatch.h"
 #include "host/history/EventTable.h"
 #include "host/history/LabelTable.h"
+#include "host/history/OpenFiles.h"
 #include "host/history/RateTable.h"
 
 #include <cstdint>
@@ -63,6 +64,12 @@ public:
     };
     bool expire(const Limits& limits);
 
+    /// The files as they were opened.
+    const OpenFiles& files() const noexcept { return m_files; }
+
+    /// Puts what is in the write-ahead log into the file, when nobody reads it.
+    void emptyLog();
+
     /// Gives the file system back a little of what removed events leave, once that is much. False
     /// when there is nothing to do.
     bool shrink();
@@ -78,6 +85,7 @@ private:
     EventTable m_events;
     CursorTable m_cursors;
     RateTable m_rates;
+    const OpenFiles m_files;
     std::uint64_t m_oldest = 0;
     std::uint64_t m_newest = 0;
     std::vector<std::int64_t> m_labelIds; ///< of one batch

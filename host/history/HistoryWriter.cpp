@@ -1,12 +1,12 @@
 #include "host/history/HistoryWriter.h"
 
 #include "agent/TraceScope.h"
-#include "host/history/Schema.h"
 #include "host/history/WallClock.h"
 #include "host/start/Say.h"
 
 #include <algorithm>
 #include <cinttypes>
+#include <stdexcept>
 #include <utility>
 
 namespace {
@@ -28,7 +28,7 @@ constexpr std::size_t mostMinutes = 24 * 60;
 
 } // namespace
 
-HistoryWriter::HistoryWriter(const HistoryConfig& config, const HistoryDirectory& directory,
+HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                              std::unique_ptr<HistoryFile> file, RecentEvents& recent,
                              ReaderPool& readers, Cursors& cursors)
     : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
@@ -82,6 +82,9 @@ void HistoryWriter::run() {
 /// False when the end comes before the batch can be stored.
 bool HistoryWriter::store(const EventBatch& batch) {
     const auto work = [&] {
+        if (batch.last() > m_reserved) {
+            reserveIds(batch.last() + HistoryDirectory::idsAtOnce);
+        }
         const std::vector<CursorValue> moved = m_cursors.unsaved();
         m_file->store(batch, moved);
         m_cursors.saved(moved);
@@ -100,8 +103,7 @@ bool HistoryWriter::store(const EventBatch& batch) {
 template <class Work> bool HistoryWriter::attempt(Work&& work) {
     try {
         if (m_file == nullptr) {
-            m_file = std::make_unique<HistoryFile>(m_directory.file());
-            m_file->continueAfter(m_recent.newest());
+            openFile();
         }
         work();
         succeeded();
@@ -112,10 +114,29 @@ template <class Work> bool HistoryWriter::attempt(Work&& work) {
         } else {
             failed(error.what());
         }
-    } catch (const SchemaTooNew& error) {
+    } catch (const std::runtime_error& error) { // of openFile
         failed(error.what());
     }
     return false;
+}
+
+void HistoryWriter::openFile() {
+    if (const std::string problem = m_directory.restore(); !problem.empty()) {
+        throw std::runtime_error(problem);
+    }
+    m_file = std::make_unique<HistoryFile>(m_directory.file());
+    if (m_file->newest() > m_recent.newest()) {
+        replaceFile("it is another history, put into its place while the agent ran");
+        throw std::runtime_error("the history's file was replaced");
+    }
+    m_file->continueAfter(m_recent.newest());
+    reserveIds(std::max(m_reserved, m_recent.newest()));
+}
+
+/// Keeps that ids up to this one may have been given.
+void HistoryWriter::reserveIds(std::uint64_t last) {
+    m_directory.reserveIds(last);
+    m_reserved = last;
 }
 
 void HistoryWriter::succeeded() {
@@ -163,6 +184,34 @@ void HistoryWriter::replaceFile(const std::string& why) {
     }
     m_cursors.forgetSaved();
     m_oldest.store(0);
+}
+
+/// Files that were removed while they were in use take what is written with them: this notices it
+/// and lets the next attempt begin with new ones. Where the log alone is gone, nothing is lost.
+void HistoryWriter::leaveRemovedFiles() {
+    TraceScope trace(anchor);
+    using State = OpenFiles::State;
+    const State state = m_file == nullptr ? State::IN_PLACE : m_file->files().state();
+    if (state == State::IN_PLACE) {
+        return;
+    }
+    m_readers.suspend();
+    try {
+        if (state == State::WITHOUT_LOG) {
+            m_file->emptyLog();
+        }
+    } catch (const DatabaseError& error) {
+        failed(error.what());
+    }
+    const OpenFiles files = m_file->files();
+    m_file.reset();
+    files.removeLog();
+    m_readers.resume();
+    m_cursors.forgetSaved();
+    m_oldest.store(0);
+    failed(state == State::WITHOUT_LOG
+               ? "its write-ahead log was removed while the agent ran"
+               : "its files were removed or replaced while the agent ran; a new history follows");
 }
 
 void HistoryWriter::addEntries(MinuteCounts counts) {
@@ -217,6 +266,7 @@ void HistoryWriter::housekeep(bool idle) {
     if (m_readers.takeCorruption()) {
         replaceFile("a reader found it so");
     }
+    leaveRemovedFiles();
     attempt([&] {
         if (now >= m_nextTending) {
             tendCursors();
@@ -261,6 +311,7 @@ void HistoryWriter::storeRest() {
         m_cursors.forgetSaved();
         storeCursors();
     });
+    reserveIds(m_recent.newest());
 }
 
 std::string HistoryWriter::problem() const {

@@ -22,13 +22,14 @@
 /// The one writer of the history, on a thread of its own: takes events from the queue, stores them
 /// in batches and makes them known; keeps the sinks' cursors and the rates; lets events expire, a
 /// few at a time. A failure is told once and tried again after growing pauses, with the events held
-/// in the queue: nothing is lost, and the logs wait. A corrupt file is exchanged for a new one.
+/// in the queue: nothing is lost, and the logs wait. A corrupt file is exchanged for a new one, and
+/// files that were removed are made anew.
 class HistoryWriter {
 public:
     using Clock = EventQueue::Clock;
 
     /// The references outlive the object. `file` is open on the directory's file.
-    HistoryWriter(const HistoryConfig& config, const HistoryDirectory& directory,
+    HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                   std::unique_ptr<HistoryFile> file, RecentEvents& recent, ReaderPool& readers,
                   Cursors& cursors);
     ~HistoryWriter();
@@ -61,7 +62,10 @@ private:
     void succeeded();
     void failed(const std::string& why);
     bool pause();
+    void openFile();
     void replaceFile(const std::string& why);
+    void leaveRemovedFiles();
+    void reserveIds(std::uint64_t last);
     void housekeep(bool idle);
     void storeCursors();
     void tendCursors();
@@ -69,7 +73,7 @@ private:
     HistoryFile::Limits limits();
 
     const HistoryConfig m_config;
-    const HistoryDirectory& m_directory;
+    HistoryDirectory& m_directory;
     std::unique_ptr<HistoryFile> m_file; ///< null while there is none that can be opened
     RecentEvents& m_recent;
     ReaderPool& m_readers;
@@ -78,6 +82,7 @@ private:
     EventQueue::Reader m_reader = 0;
     std::unique_ptr<EventJson> m_format;
     std::size_t m_batchBytes = 0; ///< of the last batch's texts
+    std::uint64_t m_reserved = 0; ///< ids up to this one are kept as given
     std::uint64_t m_left = 0;     ///< events that were not stored when the thread ended
     RetentionClock m_clock;
     Clock::time_point m_nextHousekeeping{};

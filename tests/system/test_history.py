@@ -237,6 +237,28 @@ def test_a_corrupt_history_is_moved_aside(agent):
     assert len(stored(agent)) == 3
 
 
+def test_a_history_that_is_removed_is_made_anew_and_ids_go_on(agent):
+    log = agent.log()
+    agent.situation(log=log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    log.append(lines(range(10)))
+    agent.wait_events(10)
+    for path in history_file(agent).parent.glob("history.db*"):
+        path.unlink()
+    agent.wait_trace("The history takes events again.")
+    log.append(lines(range(10, 15)))
+    assert descriptions(agent.wait_events(15)) == texts(range(15))
+    assert [number for number, _ in stored(agent)] == list(range(11, 16))
+    assert Api(agent).request("GET", "/api/v1/status")[2]["history"]["problem"] is None
+    assert agent.stop() == 0
+    history_file(agent).unlink()  # and while no agent runs
+    agent.start()
+    log.append(lines(range(15, 16)))
+    assert agent.wait_events(1)[0]["id"] == 16
+    assert agent.stop() == 0
+
+
 def test_a_flipped_byte_is_reported_and_not_served(agent):
     log = agent.log()
     agent.situation(log=log)

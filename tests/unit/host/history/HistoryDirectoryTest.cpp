@@ -96,6 +96,36 @@ TEST_F(HistoryDirectoryTest, CountsTheBytesOfAllItsFiles) {
     EXPECT_EQ(place->bytes(), 9u);
 }
 
+TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
+    auto place = opened(path);
+    EXPECT_EQ(place->reservedIds(), 0u);
+    place->reserveIds(123'456);
+    place->reserveIds(7);
+    EXPECT_EQ(place->reservedIds(), 7u);
+    place.reset();
+    place = opened(path);
+    EXPECT_EQ(place->reservedIds(), 7u);
+    for (const char* const content : {"", "7\n", "0000000000000000000x\n", "99999999999999999999\n",
+                                      "-0000000000000000007\n"}) {
+        std::ofstream(path + "/history.lock") << content;
+        EXPECT_EQ(place->reservedIds(), 0u) << content;
+    }
+}
+
+TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
+    const auto place = opened(path);
+    std::filesystem::remove_all(path);
+    EXPECT_EQ(place->restore(), "");
+    EXPECT_TRUE(std::filesystem::exists(place->file()));
+    const pid_t child = fork();
+    if (child == 0) {
+        _exit(problemOf(path).find("in use by another agent") != std::string::npos ? 1 : 0);
+    }
+    int status = 0;
+    waitpid(child, &status, 0);
+    EXPECT_EQ(WEXITSTATUS(status), 1);
+}
+
 TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
     const auto place = opened(path);
     std::vector<std::string> told;

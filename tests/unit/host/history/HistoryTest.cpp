@@ -406,6 +406,116 @@ TEST_F(HistoryTest, ADamagedEventIsTracedOnceAndRefused) {
                                               " is damaged: its content is not what was written."));
 }
 
+TEST_F(HistoryTest, FilesThatAreRemovedAreMadeAnewAndIdsGoOn) {
+    for (const bool isWhole : {false, true}) {
+        open();
+        const std::uint64_t before = history->newest();
+        pushAndWait(10);
+        EXPECT_EQ(take().size(), 10u);
+        trace.clear();
+        if (isWhole) {
+            std::filesystem::remove_all(state);
+        } else {
+            for (const char* const ending : {"", "-wal", "-shm"}) {
+                std::filesystem::remove(file() + ending);
+            }
+        }
+        ASSERT_TRUE(eventually([&] { return trace.messages().size() == 2; }));
+        EXPECT_THAT(trace.messages(),
+                    ElementsAre("Error writing the history " + file() +
+                                    ": its files were removed or replaced while the agent ran; a "
+                                    "new history follows. Trying again.",
+                                "The history takes events again."));
+        EXPECT_EQ(history->state().problem, "");
+        EXPECT_THAT(ids(), IsEmpty());
+        pushAndWait(5);
+        EXPECT_EQ(ids(), idsFrom(before + 11, before + 15));
+        EXPECT_EQ(take(), idsFrom(before + 11, before + 15));
+        close();
+        open();
+        EXPECT_EQ(history->newest(), before + 15);
+        EXPECT_EQ(sink->backlog(), 0u);
+        EXPECT_TRUE(std::filesystem::exists(state + "/history.lock"));
+        close();
+    }
+}
+
+TEST_F(HistoryTest, AWriteAheadLogThatIsRemovedTakesNothingWithIt) {
+    open();
+    pushAndWait(10);
+    std::filesystem::remove(file() + "-wal");
+    ASSERT_TRUE(eventually([&] { return trace.messages().size() == 2; }));
+    EXPECT_THAT(trace.messages()[0], HasSubstr("its write-ahead log was removed"));
+    pushAndWait(5);
+    EXPECT_EQ(ids(), idsFrom(1, 15));
+    close();
+    open();
+    EXPECT_EQ(ids(), idsFrom(1, 15));
+}
+
+TEST_F(HistoryTest, WhileRemovedFilesCannotBeMadeAnewTheProblemSaysSo) {
+    open();
+    pushAndWait(10);
+    std::filesystem::remove_all(state);
+    std::ofstream(state) << "not a directory";
+    EXPECT_TRUE(eventually([&] {
+        return history->state().problem.starts_with("cannot open " + state + "/history.lock: ");
+    })) << history->state().problem;
+    push(5);
+    std::filesystem::remove(state);
+    EXPECT_GE(history->waitBeyond(14, Clock::now() + 20s, {}), 15u);
+    EXPECT_EQ(history->state().problem, "");
+    EXPECT_EQ(ids(), idsFrom(11, 15));
+}
+
+TEST_F(HistoryTest, AnotherHistoryInItsPlaceIsMovedAside) {
+    {
+        HistoryFile other(directory.file("other.db"));
+        other.store(*batchOf(1, 500), {});
+    }
+    open();
+    pushAndWait(10);
+    testing::internal::CaptureStderr();
+    std::filesystem::rename(directory.file("other.db"), file());
+    EXPECT_TRUE(eventually([&] { return corruptFiles().size() == 1; }));
+    pushAndWait(5);
+    EXPECT_THAT(testing::internal::GetCapturedStderr(), HasSubstr("it is another history"));
+    EXPECT_EQ(ids(), idsFrom(11, 15));
+}
+
+TEST_F(HistoryTest, IdsGoOnWhenTheFileWasRemovedBetweenTwoRuns) {
+    open();
+    pushAndWait(10);
+    close();
+    for (const char* const ending : {"", "-wal", "-shm"}) {
+        std::filesystem::remove(file() + ending);
+    }
+    open();
+    EXPECT_EQ(history->newest(), 10u);
+    pushAndWait(5);
+    EXPECT_EQ(ids(), idsFrom(11, 15));
+}
+
+TEST_F(HistoryTest, WithoutAnOrderlyEndIdsOfALostFileAreSkippedAndThoseOfAKeptOneGoOn) {
+    open();
+    pushAndWait(10);
+    history->finish(Clock::now() + 10s); // and nothing more
+    sink.reset();
+    history.reset();
+    open();
+    EXPECT_EQ(history->newest(), 10u);
+    pushAndWait(1);
+    EXPECT_EQ(ids(), idsFrom(1, 11));
+    history->finish(Clock::now() + 10s);
+    sink.reset();
+    history.reset();
+    for (const char* const ending : {"", "-wal", "-shm"}) {
+        std::filesystem::remove(file() + ending);
+    }
+    open();
+    EXPECT_EQ(history->newest(), 11 + HistoryDirectory::idsAtOnce);
+}
+
 TEST_F(HistoryTest, AFileOfALaterVersionIsLeftAlone) {
     open();
     close();
