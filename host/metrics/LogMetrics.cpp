@@ -6,6 +6,8 @@
 #include "host/events/RowText.h"
 #include "host/framework/Sample.h"
 #include "host/metrics/MetricText.h"
+#include "monitor/DebugLogLoss.h"
+#include "monitor/DescriptorReserve.h"
 
 #include <cstdint>
 #include <map>
@@ -127,4 +129,10 @@ void LogMetrics::collect(MetricText& text) {
     collectCounts(text, logs);
     collectTimes(text, logs);
     collectSizes(text, logs);
+    text.counter("zrm_debug_log_incomplete_records_total",
+                 "Records that the debug log did not take whole.");
+    text.add(DebugLogLoss::records());
+    text.counter("zrm_logs_without_descriptor_total",
+                 "Times that a log could not be opened for want of a descriptor.");
+    text.add(DescriptorReserve::failures());
 }

@@ -4,6 +4,7 @@
 #include "host/config/WatchedFile.h"
 #include "host/framework/TraceControl.h"
 #include "host/start/CommandLine.h"
+#include "host/start/Descriptors.h"
 #include "host/start/Host.h"
 #include "host/start/Say.h"
 #include "host/start/ServiceNotifier.h"
@@ -75,6 +76,7 @@ void setTrace(const std::string& file) {
 
 void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
     StandardStreams::fill();
+    Descriptors::raiseLimit();
     const CommandLine commandLine = readCommandLine(*argc, argv);
     std::string path = commandLine.config();
     if (path.empty() && access(defaultConfig, F_OK) == 0) {

@@ -27,6 +27,7 @@
 #include "host/start/Say.h"
 
 #include <string>
+#include <system_error>
 #include <utility>
 #include <variant>
 
@@ -54,9 +55,18 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
         trace.error()("The Log Entries table opens no request.");
         return nullptr;
     }
-    std::unique_ptr<Serving> serving(
-        new Serving(config, entries, *request.get(), RowLayout(*request.get())));
-    serving->m_delivery.start();
+    std::unique_ptr<Serving> serving;
+    try {
+        serving.reset(new Serving(config, entries, *request.get(), RowLayout(*request.get())));
+        serving->m_delivery.start();
+    } catch (const std::system_error& error) {
+        static_cast<void>(
+            serving.release()); // some of its threads run; the process ends under them
+        say("cannot start a thread (%s): raise the limits of threads and memory (TasksMax= and "
+            "MemoryMax= of the service, ulimit -u), or end other programs; ending",
+            error.code().message().c_str());
+        return nullptr;
+    }
     if (const std::string message = serving->m_situations.load(); !message.empty()) {
         say("%s", message.c_str());
     }
@@ -82,6 +92,7 @@ void Serving::apply(const std::vector<SituationConfig>& situations) {
 }
 
 void Serving::tick() {
+    m_descriptors.tick();
     if (m_entries) {
         m_entries->tick(WallClock::now());
     }

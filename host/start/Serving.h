@@ -9,6 +9,7 @@
 #include "host/http/Router.h"
 #include "host/http/TableSampler.h"
 #include "host/situations/SituationSet.h"
+#include "host/start/Descriptors.h"
 
 #include <atomic>
 #include <chrono>
@@ -72,6 +73,7 @@ private:
     void addResource(std::unique_ptr<Resource> resource);
 
     Delivery m_delivery;
+    Descriptors m_descriptors;
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
     std::atomic<bool> m_isConfigTakenOver{true};

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "monitor/DescriptorReserve.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
@@ -86,9 +87,16 @@ void AdminLogFile::processLogData() {
 
 void AdminLogFile::openAdminLog() {
     TraceScope trace(anchor);
-    LogFD = open(fileNameLocal(), O_RDONLY | O_CLOEXEC);
+    int fd = open(fileNameLocal(), O_RDONLY | O_CLOEXEC);
+    if (fd >= 0 && DescriptorReserve::has(fd)) {
+        close(fd);
+        fd = -1;
+        errno = EMFILE;
+    }
+    LogFD = fd;
     if (LogFD < 0) {
         const ErrorText error(errno);
+        DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s. errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
         setMonitorStatus(MONITOR_ERR_OPEN);

@@ -4,9 +4,12 @@
 #include "agent/TraceScope.h"
 #include "agent/zrmmain.h"
 #include "logmgr/LogManager.h"
+#include "monitor/DebugLogLoss.h"
 
+#include <atomic>
 #include <cerrno>
 #include <cstdlib>
+#include <utility>
 
 // The debug log that all logs share: every entry as it was read, and the row built from it.
 
@@ -16,16 +19,31 @@ TRC1_Anchor anchor{"LogFileDebugLog.cpp"};
 
 std::int64_t numRecords = 0; // guarded by m_debugFileLock
 
-/// One piece of a record and a newline behind it; false when nothing of it could be written.
-bool writePiece(std::FILE* stream, const void* data, unsigned long length) {
-    if (std::fwrite(data, 1, length, stream) == 0) {
-        return false;
+std::atomic<std::uint64_t> incompleteRecords{0};
+bool isIncomplete = false; // the latest record was; guarded by m_debugFileLock
+
+/// What became of one piece of a record.
+enum class Piece {
+    NOT_WRITTEN,
+    CUT, ///< some of it was written, or the newline behind it was not
+    WRITTEN,
+};
+
+/// Writes one piece of a record and a newline behind it.
+Piece writePiece(std::FILE* stream, const void* data, unsigned long length) {
+    const std::size_t written = std::fwrite(data, 1, length, stream);
+    if (written == 0) {
+        return Piece::NOT_WRITTEN;
     }
-    std::fputc('\n', stream);
-    return true;
+    const bool isWhole = std::fputc('\n', stream) != EOF;
+    return isWhole && written == length ? Piece::WRITTEN : Piece::CUT;
 }
 
 } // namespace
+
+std::uint64_t DebugLogLoss::records() noexcept {
+    return incompleteRecords.load(std::memory_order_relaxed);
+}
 
 pthread_mutex_t LogFile::m_debugFileLock = PTHREAD_MUTEX_INITIALIZER;
 
@@ -84,23 +102,41 @@ void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long le
     TraceScope trace(anchor);
     int result = 0;
     int cause = 0;
+    int causeOfLoss = 0;
     lockDebugFile(fileNameLocal());
-    std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
-                 " <<<<<<<<<\n");
+    const auto lost = [&] {
+        causeOfLoss = causeOfLoss == 0 ? errno : causeOfLoss;
+        std::clearerr(stream); // so that the next record shows for itself how it fares
+    };
+    if (std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
+                     " <<<<<<<<<\n") < 0) {
+        lost();
+    }
     const auto write = [&](const void* data, unsigned long length) {
         if (data == nullptr || length == 0 || result == -1) {
             return;
         }
-        if (writePiece(stream, data, length)) {
-            ++result;
-        } else {
+        const Piece piece = writePiece(stream, data, length);
+        if (piece != Piece::WRITTEN) {
             cause = errno;
-            result = -1;
+            lost();
         }
+        result = piece == Piece::NOT_WRITTEN ? -1 : result + 1;
     };
     write(data1, length1);
     write(data2, length2);
+    if (causeOfLoss == 0 && std::fflush(stream) != 0) { // what has no newline at its end
+        lost();
+    }
+    const bool wasIncomplete = std::exchange(isIncomplete, causeOfLoss != 0);
+    incompleteRecords.fetch_add(isIncomplete ? 1 : 0, std::memory_order_relaxed);
+    const bool isNews = isIncomplete && !wasIncomplete && result != -1;
     unlockDebugFile();
+    if (isNews) {
+        const ErrorText error(causeOfLoss);
+        trace.error()("The debug log does not take whole records.  errno = %d; %s", error.number(),
+                      error.text());
+    }
     if (result == -1) {
         const ErrorText error(cause);
         trace.error()("Error writing %s entry to debug log.  errno = %d; %s", fileNameLocal(),

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "monitor/DescriptorReserve.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
@@ -26,9 +27,16 @@ void LogFile::count(std::atomic<std::int64_t>& counter) noexcept {
 
 void LogFile::openLogAndSeek() {
     TraceScope trace(anchor);
-    LogFileP = std::fopen(fileNameLocal(), "r");
+    std::FILE* file = std::fopen(fileNameLocal(), "r");
+    if (file != nullptr && DescriptorReserve::has(fileno(file))) {
+        std::fclose(file);
+        file = nullptr;
+        errno = EMFILE;
+    }
+    LogFileP = file;
     if (LogFileP == nullptr) {
         const ErrorText error(errno);
+        DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s.  errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
         setMonitorStatus(MONITOR_ERR_OPEN);

@@ -1,8 +1,10 @@
 #include "LogManagerDouble.h"
 #include "TestLog.h"
+#include "monitor/DebugLogLoss.h"
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <fstream>
@@ -138,6 +140,29 @@ TEST_F(DebugLog, AFailedWriteIsTracedAndLeavesTheSecondPieceOut) {
     EXPECT_EQ(news(), header(number + 1) + "line\n\n");
     log.writeToDebugLog("line\n", 5, "row", 3);
     EXPECT_EQ(news(), header(number + 2) + "line\n\nrow\n");
+}
+
+TEST_F(DebugLog, RecordsThatAFullDiskCutsAreReportedOnceAndCounted) {
+    // Every write to this device fails, but the stream's buffer takes its part first.
+    m_manager.reset();
+    m_manager.emplace("/dev/full");
+    TestLog log(*m_debugged);
+    RecordingTrace trace(TRC1_ERROR);
+    const std::uint64_t before = DebugLogLoss::records();
+    const std::string row(500, 'r');
+    for (int number = 0; number < 10; ++number) {
+        log.writeToDebugLog("line\n", 5, row.data(), row.size());
+    }
+    EXPECT_EQ(DebugLogLoss::records() - before, 10u);
+    const auto messages = trace.messages();
+    EXPECT_EQ(std::count(messages.begin(), messages.end(),
+                         "The debug log does not take whole records.  errno = 28; No space left on "
+                         "device"),
+              1);
+    m_manager.reset();
+    m_manager.emplace(m_debugLog);
+    log.writeToDebugLog("line\n", 5, nullptr, 0);
+    EXPECT_EQ(DebugLogLoss::records() - before, 10u) << "it takes whole records again";
 }
 
 TEST_F(DebugLog, EveryPieceOfALineIsCopiedWithItsRowOrWithoutOne) {

@@ -1,0 +1,40 @@
+#include "host/start/Descriptors.h"
+
+#include "host/start/Say.h"
+#include "monitor/DescriptorReserve.h"
+
+#include <algorithm>
+#include <cinttypes>
+
+#include <sys/resource.h>
+
+namespace {
+
+/// Far more logs than one agent has; a limit without an end costs memory in other programs' ways of
+/// closing what they inherit.
+constexpr rlim_t mostDescriptors = 65536;
+
+} // namespace
+
+void Descriptors::raiseLimit() {
+    rlimit limit{};
+    if (getrlimit(RLIMIT_NOFILE, &limit) == 0 && limit.rlim_cur < mostDescriptors) {
+        limit.rlim_cur = std::min(limit.rlim_max, mostDescriptors);
+        setrlimit(RLIMIT_NOFILE, &limit);
+    }
+}
+
+void Descriptors::tick() {
+    const std::uint64_t failures = DescriptorReserve::failures();
+    if (failures == m_seen && failures > m_told) {
+        rlimit limit{};
+        getrlimit(RLIMIT_NOFILE, &limit);
+        say("%" PRIu64 " logs could not be opened: of %ju descriptors %" PRIu64
+            " are kept for HTTP, the history and the sinks, and no other is free; raise the limit "
+            "(LimitNOFILE= of the service, ulimit -n) and start the agent again",
+            failures - m_told, static_cast<std::uintmax_t>(limit.rlim_cur),
+            DescriptorReserve::size());
+        m_told = failures;
+    }
+    m_seen = failures;
+}

@@ -1,0 +1,13 @@
+#ifndef ZRM_DEBUG_LOG_LOSS_H
+#define ZRM_DEBUG_LOG_LOSS_H
+
+#include <cstdint>
+
+/// Records that the debug log did not take whole, since the start. Any thread.
+namespace DebugLogLoss {
+
+std::uint64_t records() noexcept;
+
+} // namespace DebugLogLoss
+
+#endif
