@@ -3,7 +3,9 @@
 
 #include "host/events/EventRecord.h"
 
+#include <chrono>
 #include <cstddef>
+#include <optional>
 #include <span>
 #include <stop_token>
 #include <string>
@@ -21,6 +23,12 @@ public:
     /// was not delivered. May wait for the receiver; ends a wait when `giveUp` is requested.
     virtual std::size_t deliver(std::span<const EventRecord> events,
                                 const std::stop_token& giveUp) = 0;
+
+    /// Since when a delivery waits for a receiver that takes nothing; none when it does not. Any
+    /// thread.
+    virtual std::optional<std::chrono::steady_clock::time_point> waitsSince() const {
+        return std::nullopt;
+    }
 
     /// Why the last delivery failed.
     virtual std::string error() const = 0;

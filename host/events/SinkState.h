@@ -11,7 +11,7 @@ struct SinkState {
     enum class Condition {
         STARTING, ///< nothing was offered yet
         UP,       ///< the last delivery was whole
-        FAILING,  ///< the last delivery was not, and will be tried again
+        FAILING,  ///< the last delivery was not, and will be tried again, or this one makes no way
     };
 
     std::string name;

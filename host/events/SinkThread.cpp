@@ -4,13 +4,15 @@
 
 #include <algorithm>
 #include <exception>
+#include <optional>
 #include <utility>
 
 namespace {
 
 TRC1_Anchor anchor{"SinkThread.cpp"};
 
-constexpr std::size_t batch = 256; ///< events per delivery
+constexpr std::size_t batch = 256;            ///< events per delivery
+constexpr std::chrono::seconds stallLimit{5}; ///< a wait that is longer is worth a word
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{30'000};
 
@@ -132,6 +134,18 @@ std::uint64_t SinkThread::finish(Clock::time_point limit) {
     return trace.result(m_source->backlog());
 }
 
+/// A delivery that waits has not failed yet, but nothing arrives.
+void SinkThread::noteStall(SinkState& state) const {
+    const std::optional<Clock::time_point> since = m_sink->waitsSince();
+    const auto waited = since ? Clock::now() - *since : Clock::duration::zero();
+    if (waited >= stallLimit) {
+        state.condition = SinkState::Condition::FAILING;
+        state.error = "the reader has taken nothing for " +
+                      std::to_string(std::chrono::floor<std::chrono::seconds>(waited).count()) +
+                      " s";
+    }
+}
+
 SinkState SinkThread::state() const {
     std::unique_lock lock(m_mutex);
     SinkState state = m_state;
@@ -141,6 +155,7 @@ SinkState SinkThread::state() const {
         const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextTry - Clock::now());
         state.retryIn = std::max(left, std::chrono::milliseconds{0});
     }
+    noteStall(state);
     state.name = name();
     state.type = m_type;
     state.lag = m_source->backlog();

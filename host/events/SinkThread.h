@@ -57,6 +57,7 @@ private:
     void note(std::size_t delivered, bool failed);
     void tellOfFailure();
     void pause();
+    void noteStall(SinkState& state) const;
 
     const std::unique_ptr<EventSource> m_source;
     const std::unique_ptr<Sink> m_sink;

@@ -51,8 +51,12 @@ void JsonlSink::fail(const char* call, int number) {
 bool JsonlSink::open() {
     TraceScope trace(anchor);
     // Without waiting: a pipe in the file system that nobody reads must not hold the thread.
-    constexpr int flags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK;
+    constexpr int flags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW;
     m_fd = m_isStandardOutput ? openStandardOutput() : ::open(m_path.c_str(), flags, 0640);
+    if (m_fd == -1 && errno == ELOOP) {
+        m_error = m_path + " is a symbolic link, which is not followed; name the file itself";
+        return trace.result(false);
+    }
     if (m_fd == -1) {
         fail("open", errno);
         return trace.result(false);
@@ -74,7 +78,9 @@ bool JsonlSink::open() {
 /// stands alone. False when that failed.
 bool JsonlSink::endLastLine() {
     char last = '\n';
-    const int fd = m_isStandardOutput ? -1 : ::open(m_path.c_str(), O_RDONLY | O_CLOEXEC);
+    const int fd = m_isStandardOutput
+                       ? -1
+                       : ::open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
     if (fd != -1) { // what this user may write but not read is taken as it is
         if (lseek(fd, -1, SEEK_END) == -1 || ::read(fd, &last, 1) != 1) {
             last = '\n';
@@ -102,7 +108,7 @@ bool JsonlSink::movedAway() {
     m_lookAgain = Clock::now() + lookInterval;
     struct stat opened {};
     struct stat named {};
-    return fstat(m_fd, &opened) != 0 || stat(m_path.c_str(), &named) != 0 ||
+    return fstat(m_fd, &opened) != 0 || lstat(m_path.c_str(), &named) != 0 ||
            opened.st_dev != named.st_dev || opened.st_ino != named.st_ino;
 }
 
@@ -115,16 +121,27 @@ bool JsonlSink::ready() {
 }
 
 bool JsonlSink::waitWritable(const std::stop_token& giveUp) {
-    while (!giveUp.stop_requested()) {
+    const Clock::time_point begin = Clock::now();
+    bool isReady = false;
+    while (!isReady && !giveUp.stop_requested()) {
         struct pollfd descriptor = {m_fd, POLLOUT, 0};
         const int ready = poll(&descriptor, 1, pollSlice);
         // Whatever else poll reports, the write itself says it with its error number.
-        if (ready > 0 || (ready == -1 && errno != EINTR)) {
-            return true;
+        isReady = ready > 0 || (ready == -1 && errno != EINTR);
+        if (!isReady && m_waitsSince == 0) {
+            m_waitsSince = begin.time_since_epoch().count();
         }
     }
-    m_error = "the reader takes no data";
-    return false;
+    m_waitsSince = 0;
+    if (!isReady) {
+        m_error = "the reader takes no data";
+    }
+    return isReady;
+}
+
+std::optional<std::chrono::steady_clock::time_point> JsonlSink::waitsSince() const {
+    const Clock::rep since = m_waitsSince;
+    return since == 0 ? std::nullopt : std::optional(Clock::time_point(Clock::duration(since)));
 }
 
 std::size_t JsonlSink::write(std::string_view text, const std::stop_token& giveUp) {

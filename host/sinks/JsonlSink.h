@@ -4,8 +4,10 @@
 #include "host/config/SinkConfig.h"
 #include "host/events/Sink.h"
 
+#include <atomic>
 #include <chrono>
 #include <cstddef>
+#include <optional>
 #include <span>
 #include <stop_token>
 #include <string>
@@ -13,7 +15,8 @@
 #include <vector>
 
 /// Writes one JSON object per event, one per line, to standard output or to a file. The file is
-/// appended to, made when missing, and opened again when it was moved away or removed. A line is
+/// appended to, made when missing, and opened again when it was moved away or removed; a symbolic
+/// link is not followed. A pipe of the file system and a device are written, too. A line is
 /// never torn or written twice: what a failed write left of a line is taken back, or, where that
 /// is not possible, completed before anything else is written. Used by one thread.
 class JsonlSink : public Sink {
@@ -27,6 +30,7 @@ public:
     std::size_t deliver(std::span<const EventRecord> events,
                         const std::stop_token& giveUp) override;
     std::string error() const override { return m_error; }
+    std::optional<std::chrono::steady_clock::time_point> waitsSince() const override;
 
 private:
     using Clock = std::chrono::steady_clock;
@@ -52,6 +56,7 @@ private:
     std::string m_text;               ///< the lines of one delivery
     std::vector<std::size_t> m_lines; ///< where each of them ends
     std::string m_error;
+    std::atomic<Clock::rep> m_waitsSince{0}; ///< 0: it does not
 };
 
 #endif

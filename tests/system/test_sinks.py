@@ -2,12 +2,16 @@
 
 import hashlib
 import hmac
+import json
+import os
+import re
 import socket
 import subprocess
 import time
 
 import pytest
 
+from api import Api
 from conftest import PATIENCE, descriptions, syslog_line, wait_until
 from receiver import Receiver, free_port, slowly
 
@@ -231,3 +235,33 @@ def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, aut
         trusted.write_bytes((authority / "ca.pem").read_bytes())
         assert descriptions(wait_for(receiver, 3, agent)) == entries(1, 3)
         assert agent.stop() == 0
+
+
+# ------------------------------------------------------------------------------------ pipes
+
+
+def test_a_pipe_whose_reader_stalls_is_failing_until_it_reads(agent, log):
+    pipe = agent.directory / "pipe"
+    os.mkfifo(pipe)
+    reader = os.open(pipe, os.O_RDONLY | os.O_NONBLOCK)
+    agent.more_sinks.append({"type": "jsonl", "path": str(pipe), "name": "pipe"})
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    append(log, 1, 500)  # more than a pipe holds
+
+    def sink():
+        return next(one for one in api.request("GET", "/api/v1/status")[2]["sinks"] if one["name"] == "pipe")
+
+    stalled = wait_until(
+        lambda: sink() if sink()["state"] == "failing" else None, lambda: f"a failing sink: {sink()}"
+    )
+    assert re.fullmatch(r"the reader has taken nothing for \d+ s", stalled["error"])
+    received = b""
+    os.set_blocking(reader, True)
+    while received.count(b"\n") < 500:
+        received += os.read(reader, 65536)
+    assert descriptions(json.loads(line) for line in received.splitlines()) == entries(1, 500)
+    wait_until(lambda: sink()["state"] == "up" and not sink().get("error"), "a sink that is up")
+    assert agent.stop() == 0
+    os.close(reader)

@@ -12,6 +12,7 @@
 #include <chrono>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -30,6 +31,7 @@ struct TestState {
     std::atomic<bool> throws{false};      ///< a failing delivery throws
     std::atomic<bool> waits{false};     ///< a delivery waits until it is told to give up, and fails
     std::atomic<bool> isWaiting{false}; ///< one does
+    std::atomic<Clock::time_point> waitsSince{}; ///< the beginning of time: it does not wait
     std::mutex mutex;
     std::vector<std::uint64_t> ids;
     std::vector<Clock::time_point> tries;
@@ -45,6 +47,10 @@ public:
     explicit TestSink(std::shared_ptr<TestState> state) : m_state(std::move(state)) {}
     std::string name() const override { return "test"; }
     std::string error() const override { return "no room"; }
+    std::optional<Clock::time_point> waitsSince() const override {
+        const Clock::time_point since = m_state->waitsSince;
+        return since == Clock::time_point{} ? std::nullopt : std::optional(since);
+    }
     std::size_t deliver(std::span<const EventRecord> events,
                         const std::stop_token& giveUp) override {
         while (m_state->waits && !giveUp.stop_requested()) {
@@ -106,6 +112,20 @@ TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
     EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
     EXPECT_EQ(state->seen(), upTo(250));
     EXPECT_THAT(trace.messages(), ElementsAre());
+}
+
+TEST_F(SinkThreadTest, AReaderThatTakesNothingForSomeSecondsIsAFailure) {
+    thread.start();
+    state->waitsSince = Clock::now();
+    EXPECT_NE(thread.state().condition, SinkState::Condition::FAILING);
+    EXPECT_EQ(thread.state().error, "");
+    state->waitsSince = Clock::now() - 20s;
+    EXPECT_EQ(thread.state().condition, SinkState::Condition::FAILING);
+    EXPECT_THAT(thread.state().error,
+                testing::MatchesRegex("the reader has taken nothing for 2[0-9] s"));
+    state->waitsSince = Clock::time_point{};
+    EXPECT_NE(thread.state().condition, SinkState::Condition::FAILING);
+    EXPECT_EQ(thread.state().error, "");
 }
 
 TEST_F(SinkThreadTest, DeliversAtOnce) {
