@@ -34,6 +34,25 @@ std::string because(const std::string& what, int number) {
     return what + ": " + error.text();
 }
 
+/// Opens a file of the history, which is made when it is missing; -1 and the reason when it cannot
+/// be opened, or when something else is in its place. Never waits, and follows no link.
+int openFile(const std::string& path, std::string& problem) {
+    const int fd =
+        ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, fileMode);
+    if (fd == -1) {
+        problem = errno == ELOOP ? path + " is a symbolic link, which the history does not follow"
+                                 : because("cannot open " + path, errno);
+        return -1;
+    }
+    struct stat status {};
+    if (fstat(fd, &status) != 0 || !S_ISREG(status.st_mode)) {
+        problem = path + " is not a regular file";
+        close(fd);
+        return -1;
+    }
+    return fd;
+}
+
 /// Takes the lock; false leaves errno.
 bool lockWhole(int fd) {
     struct flock whole {};
@@ -90,9 +109,10 @@ std::string HistoryDirectory::restore() {
         return because("cannot make the directory " + m_directory, errno) + cure;
     }
     if (!hasLock()) {
-        const int fd = ::open(lockPath().c_str(), O_RDWR | O_CREAT | O_CLOEXEC, fileMode);
+        std::string problem;
+        const int fd = openFile(lockPath(), problem);
         if (fd == -1) {
-            return because("cannot open " + lockPath(), errno) + cure;
+            return problem + cure;
         }
         if (!lockWhole(fd)) {
             const int number = errno;
@@ -134,12 +154,11 @@ std::uint64_t HistoryDirectory::reservedIds() const {
 }
 
 std::string HistoryDirectory::makeFile() const {
-    const int fd = ::open(m_file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, fileMode);
-    if (fd == -1) {
-        return because("cannot open " + m_file, errno);
+    std::string problem;
+    if (const int fd = openFile(m_file, problem); fd != -1) {
+        close(fd);
     }
-    close(fd);
-    return {};
+    return problem;
 }
 
 std::uint64_t HistoryDirectory::bytes() const {

@@ -197,8 +197,8 @@ std::string SituationStore::replace(std::string_view text) const {
         return because("cannot make the directory " + directory, errno);
     }
     const std::string temporary = m_path + ".new";
-    const int fd =
-        open(temporary.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, fileMode);
+    unlink(temporary.c_str()); // of an agent that was killed, or whatever stands there
+    const int fd = open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, fileMode);
     if (fd == -1) {
         return because("cannot make " + temporary, errno);
     }

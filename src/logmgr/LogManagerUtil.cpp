@@ -57,8 +57,10 @@ void Reader::close() {
 
 std::FILE* LogManagerUtil::openStream(const char* path, const char* mode) {
     const bool appending = mode[0] == 'a';
-    const int flags = appending ? O_WRONLY | O_CREAT | O_APPEND : O_RDONLY;
-    const int fd = ::open(path, flags | O_CLOEXEC, 0666);
+    // What the agent writes holds log lines, and goes where the configuration says: others get no
+    // permission, and a link put in the file's place leads nowhere.
+    const int flags = appending ? O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW : O_RDONLY;
+    const int fd = ::open(path, flags | O_CLOEXEC, 0640);
     if (fd == -1) {
         return nullptr;
     }

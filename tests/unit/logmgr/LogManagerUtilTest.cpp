@@ -17,6 +17,8 @@
 #include <sys/stat.h>
 #include <utime.h>
 
+#include <unistd.h>
+
 namespace {
 
 using testing::ElementsAre;
@@ -148,6 +150,31 @@ TEST_F(LogManagerUtilTest, StreamsAreNotInheritedAndKeepTheirMode) {
     stream = LogManagerUtil::openStream(path.c_str(), "r");
     ASSERT_NE(stream, nullptr);
     EXPECT_EQ(std::fputc('x', stream), EOF);
+    std::fclose(stream);
+}
+
+TEST_F(LogManagerUtilTest, AFileToWriteIsForOwnerAndGroupAlone) {
+    const mode_t before = umask(0);
+    const std::string path = directory.file("stream");
+    std::FILE* const stream = LogManagerUtil::openStream(path.c_str(), "a");
+    umask(before);
+    ASSERT_NE(stream, nullptr);
+    std::fclose(stream);
+    struct stat status {};
+    ASSERT_EQ(stat(path.c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 0777, 0640u);
+}
+
+TEST_F(LogManagerUtilTest, AFileToWriteIsNotWhereALinkLeads) {
+    const std::string path = directory.file("stream");
+    const std::string target = directory.file("target");
+    ASSERT_EQ(symlink(target.c_str(), path.c_str()), 0);
+    EXPECT_EQ(LogManagerUtil::openStream(path.c_str(), "a"), nullptr);
+    EXPECT_EQ(errno, ELOOP);
+    EXPECT_NE(access(target.c_str(), F_OK), 0);
+    directory.write("target", "line\n");
+    std::FILE* const stream = LogManagerUtil::openStream(path.c_str(), "r");
+    ASSERT_NE(stream, nullptr) << "what is read may be a link";
     std::fclose(stream);
 }
 

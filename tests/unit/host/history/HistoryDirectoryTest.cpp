@@ -70,6 +70,23 @@ TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
     EXPECT_EQ(problemOf(path), "cannot open " + path + "/history.db: Permission denied" + cure);
 }
 
+TEST_F(HistoryDirectoryTest, OpensRegularFilesOfItsOwnAlone) {
+    std::filesystem::create_directory(path);
+    for (const char* const name : {"/history.lock", "/history.db"}) {
+        const std::string place = path + name;
+        std::filesystem::remove(place); // of the turn before
+        std::filesystem::create_symlink(directory.file("target"), place);
+        EXPECT_EQ(problemOf(path),
+                  place + " is a symbolic link, which the history does not follow" + cure);
+        EXPECT_FALSE(std::filesystem::exists(directory.file("target")));
+        std::filesystem::remove(place);
+        ASSERT_EQ(mkfifo(place.c_str(), 0600), 0); // opening it must not wait
+        EXPECT_EQ(problemOf(path), place + " is not a regular file" + cure);
+        std::filesystem::remove(place);
+    }
+    EXPECT_NE(opened(path), nullptr);
+}
+
 TEST_F(HistoryDirectoryTest, BelongsToOneProcessAtATime) {
     auto place = opened(path);
     const auto inChild = [&] {

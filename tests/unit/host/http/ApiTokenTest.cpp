@@ -101,6 +101,13 @@ TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
     EXPECT_EQ(problem(path), path + " is no file that can hold a token") << "nobody waits for it";
 }
 
+TEST_F(ApiTokenTest, NothingIsMadeWhereALinkLeads) {
+    const std::string target = directory.file("target");
+    std::filesystem::create_symlink(target, path);
+    EXPECT_TRUE(std::holds_alternative<std::string>(ApiToken::load(path)));
+    EXPECT_FALSE(std::filesystem::exists(target));
+}
+
 TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
     const std::string deep = directory.file("no/such/api-token");
     EXPECT_EQ(problem(deep), "cannot make the directory " + directory.file("no/such") +

@@ -256,6 +256,47 @@ TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
     EXPECT_EQ(readAll(), lines);
 }
 
+TEST_F(JsonlSinkPipeTest, SaysSinceWhenItsReaderTakesNothing) {
+    JsonlSink sink(SinkConfig::jsonl("-"));
+    EXPECT_EQ(sink.waitsSince(), std::nullopt);
+    const auto begin = std::chrono::steady_clock::now();
+    std::jthread writer([&] {
+        while (sink.deliver(from(0), giveUp.get_token()) == 3) {
+        }
+    });
+    while (!sink.waitsSince()) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    EXPECT_GE(*sink.waitsSince(), begin);
+    giveUp.request_stop();
+    writer.join();
+    EXPECT_EQ(sink.waitsSince(), std::nullopt);
+}
+
+TEST_F(JsonlSinkTest, ALinkIsNotFollowed) {
+    const std::string target = directory.file("target");
+    ASSERT_EQ(symlink(target.c_str(), path.c_str()), 0);
+    JsonlSink sink(SinkConfig::jsonl(path));
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(),
+              path + " is a symbolic link, which is not followed; name the file itself");
+    EXPECT_FALSE(std::filesystem::exists(target));
+    std::filesystem::remove(path);
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+}
+
+TEST_F(JsonlSinkTest, AFileThatALinkReplacedIsLeft) {
+    JsonlSink sink(SinkConfig::jsonl(path));
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
+    std::filesystem::rename(path, directory.file("moved"));
+    std::filesystem::create_symlink(directory.file("moved"), path);
+    std::this_thread::sleep_for(std::chrono::milliseconds(1100)); // it looks once a second
+    EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
+    EXPECT_EQ(sink.error(),
+              path + " is a symbolic link, which is not followed; name the file itself");
+    EXPECT_EQ(content(directory.file("moved")), lines);
+}
+
 TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     std::string expected;

@@ -118,6 +118,21 @@ TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
     EXPECT_NE(text(), before);
 }
 
+TEST_F(SituationStoreTest, NeitherALinkNorAPipeInItsPlaceIsWritten) {
+    const std::string target = directory.write("target", "other");
+    for (const std::string& place : {file, file + ".new"}) {
+        std::filesystem::create_symlink(target, place);
+        EXPECT_EQ(store.save(content()), "") << place;
+        EXPECT_THAT(names(), testing::UnorderedElementsAre("situations.json", "target")) << place;
+        EXPECT_FALSE(std::filesystem::is_symlink(file));
+        std::filesystem::remove(file);
+    }
+    EXPECT_EQ(std::filesystem::file_size(target), 5u);
+    ASSERT_EQ(mkfifo((file + ".new").c_str(), 0600), 0); // opening it would wait for a reader
+    EXPECT_EQ(store.save(content()), "");
+    EXPECT_TRUE(std::filesystem::is_regular_file(file));
+}
+
 TEST_F(SituationStoreTest, SaysThatTheFileCannotBeReplaced) {
     std::filesystem::create_directory(file);
     directory.write("situations.json/inside", "x");
