@@ -19,6 +19,24 @@ if(CMAKE_CXX_COMPILER_ID STREQUAL GNU)
   target_compile_options(zrm_flags INTERFACE -Wno-restrict)
 endif()
 
+# Hardening. The build types that run somewhere are compiled with it; the one that is tested is not,
+# because the checked calls of the C library would go round those that tests make fail. The package's
+# tests look for it in the programs.
+if(NOT ZRM_SANITIZE)
+  include(CheckPIESupported)
+  check_pie_supported()
+  add_link_options(-Wl,-z,relro -Wl,-z,now)
+  set(hardened "$<NOT:$<CONFIG:Debug>>")
+  set(optimised "$<CONFIG:Release,RelWithDebInfo,MinSizeRel>")
+  add_compile_options(
+    "$<${hardened}:-fstack-protector-strong;-fstack-clash-protection;-Wformat;-Werror=format-security>"
+    "$<${optimised}:-U_FORTIFY_SOURCE;-D_FORTIFY_SOURCE=2>")
+  add_compile_definitions("$<${hardened}:_GLIBCXX_ASSERTIONS>")
+  if(CMAKE_SYSTEM_PROCESSOR MATCHES "x86_64|AMD64")
+    add_compile_options("$<${hardened}:-fcf-protection>")
+  endif()
+endif()
+
 if(ZRM_SANITIZE)
   add_compile_options(-fsanitize=${ZRM_SANITIZE} -fno-omit-frame-pointer)
   add_link_options(-fsanitize=${ZRM_SANITIZE})

@@ -2,6 +2,7 @@
 
 import gzip
 import io
+import platform
 import re
 import stat
 import subprocess
@@ -71,6 +72,22 @@ def test_it_says_what_it_needs():
     depends = {entry.split()[0] for entry in field("Depends").split(", ")}
     assert {"adduser", "procps", "libc6", "libsqlite3-0", "libssl3", "libre2-9"} <= depends
     assert field("Recommends") == "ca-certificates"
+
+
+@pytest.mark.parametrize("program", sorted(PROGRAMS))
+def test_the_programs_are_hardened(root, program):
+    path = root / program
+    assert "DYN (Position-Independent Executable file)" in run("readelf", "-hW", path)
+    assert "GNU_RELRO" in run("readelf", "-lW", path)
+    dynamic = run("readelf", "-dW", path)
+    assert "BIND_NOW" in dynamic and "Flags: NOW PIE" in dynamic
+    imported = run("readelf", "-W", "--dyn-syms", path)
+    assert "__stack_chk_fail" in imported  # stack protector
+    assert re.search(r"__\w+_chk\b", imported)  # the C library's checked calls
+    assert "__glibcxx_assert_fail" in imported
+    if platform.machine() == "x86_64":
+        code = run("objdump", "-d", "--no-show-raw-insn", path)
+        assert code.count("endbr64") > 1000  # indirect branches end there
 
 
 @pytest.mark.parametrize("page", sorted(name for name in FILES if "/man/" in name))
