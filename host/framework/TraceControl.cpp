@@ -5,22 +5,53 @@
 #include "host/framework/TraceLevels.h"
 #include "host/framework/TraceOutput.h"
 
+#include <atomic>
 #include <memory>
 #include <mutex>
+#include <thread>
 
 namespace {
 
 constexpr const char* defaultLevels = "error";
 
-/// Levels that were set. Never destroyed, since a thread may be reading them.
+/// Levels that were set.
 struct Setting {
     std::string text;
     TraceLevels levels;
-    const Setting* earlier = nullptr;
+    std::unique_ptr<Setting> earlier; ///< those that a thread may still be reading
 };
 
-constinit std::mutex g_mutex; ///< serialises configure()
-std::atomic<const Setting*> g_setting{nullptr};
+/// Looks for a moment at which no thread reads the levels. Reading takes nanoseconds.
+constexpr int mostLooks = 1000;
+
+constinit std::mutex g_mutex; ///< serialises changes, and guards the texts
+std::atomic<Setting*> g_setting{nullptr};
+std::atomic<int> g_readers{0};
+
+/// Keeps the setting that the calling thread reads. Neither locks nor allocates, so that a child
+/// between fork and exec may read too.
+class Reader {
+public:
+    Reader() noexcept { ++g_readers; }
+    ~Reader() { --g_readers; }
+    Reader(const Reader&) = delete;
+    Reader& operator=(const Reader&) = delete;
+    const Setting* setting() const noexcept { return g_setting.load(); }
+};
+
+/// Frees the settings before this one, which is in force: a thread that begins to read from now on
+/// reads this one. When threads keep reading, the next change frees them.
+void freeEarlier(Setting& current) {
+    for (int look = 0; look < mostLooks; ++look) {
+        if (g_readers.load() == 0) {
+            while (current.earlier != nullptr) {
+                current.earlier = std::move(current.earlier->earlier);
+            }
+            return;
+        }
+        std::this_thread::yield();
+    }
+}
 
 /// No anchor has learnt generation 0.
 void bumpGeneration() {
@@ -38,13 +69,16 @@ std::string TraceControl::configure(const std::string& text) {
     }
     setting->text = text.empty() ? defaultLevels : text;
     const std::lock_guard guard(g_mutex);
-    setting->earlier = g_setting.load();
-    g_setting.store(setting.release());
+    setting->earlier.reset(g_setting.load());
+    Setting& current = *setting.release();
+    g_setting.store(&current);
     bumpGeneration();
+    freeEarlier(current);
     return {};
 }
 
 std::string TraceControl::levels() {
+    const std::lock_guard guard(g_mutex);
     const Setting* const setting = g_setting.load();
     return setting != nullptr ? setting->text : defaultLevels;
 }
@@ -55,6 +89,7 @@ std::string TraceControl::openFile(const std::string& path) {
 }
 
 unsigned TraceControl::levelOf(const char* unit) noexcept {
-    const Setting* const setting = g_setting.load();
+    const Reader reader;
+    const Setting* const setting = reader.setting();
     return setting != nullptr ? setting->levels.levelOf(unit) : static_cast<unsigned>(TRC1_ERROR);
 }

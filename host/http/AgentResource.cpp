@@ -27,6 +27,7 @@ using nlohmann::ordered_json;
 TRC1_Anchor anchor{"AgentResource.cpp"};
 
 constexpr std::size_t longestLevels = 4096; ///< bytes
+constexpr int tracedLevels = 200;           ///< bytes of them that the trace shows
 
 std::int64_t now() {
     return std::chrono::duration_cast<std::chrono::milliseconds>(
@@ -97,14 +98,16 @@ HttpAnswer setTrace(const HttpRequest& request) {
     JsonFields fields(request.body);
     const std::string levels = fields.text("levels");
     fields.refuseUnknown();
-    if (levels.size() > longestLevels) { // a thread may read any that were ever set: all are kept
+    if (levels.size() > longestLevels) {
         fields.refuse("levels", "write at most " + std::to_string(longestLevels) + " bytes");
     }
     if (const std::string problem = TraceControl::configure(levels); !problem.empty()) {
         fields.refuse("levels", problem);
     }
-    trace.always()("Trace levels are now \"%s\".", TraceControl::levels().c_str());
-    return answerWith({{"levels", TraceControl::levels()}});
+    const std::string inForce = TraceControl::levels();
+    trace.always()("Trace levels are now \"%.*s\"%s.", tracedLevels, inForce.c_str(),
+                   inForce.size() > tracedLevels ? " and more" : "");
+    return answerWith({{"levels", inForce}});
 }
 
 HttpAnswer columns(const HttpRequest& request) {
