@@ -7,6 +7,7 @@
 #include "host/analysis/MonitoredLogs.h"
 #include "host/analysis/StoredRow.h"
 #include "host/config/TimeText.h"
+#include "host/framework/TraceCapture.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/EventQuery.h"
 #include "host/http/JsonFields.h"
@@ -111,6 +112,7 @@ std::vector<Explanation> AnalysisResource::explainLine(JsonFields& fields) {
         fields.refuse("line", "write one line of at most " + std::to_string(LogTail::longestLine) +
                                   " bytes");
     }
+    const TraceSilence silence;
     const MonitoredLogs logs;
     LogFile& log = logOf(logs, fields, wanted.situation);
     fields.refuseUnknown();
@@ -130,6 +132,7 @@ std::vector<Explanation> AnalysisResource::explainLast(JsonFields& fields) {
     Subject wanted = subject(fields);
     const auto number = static_cast<std::size_t>(
         fields.number("last", 1, static_cast<std::int64_t>(Explainer::mostEntries)));
+    const TraceSilence silence;
     const MonitoredLogs logs;
     LogFile& log = logOf(logs, fields, wanted.situation);
     fields.refuseUnknown();
@@ -157,6 +160,7 @@ std::vector<Explanation> AnalysisResource::explainEvent(JsonFields& fields) {
     Subject wanted = subject(fields, event->situation);
     fields.refuseUnknown();
     const bool isOwn = isNamed && wanted.situation.name == event->situation;
+    const TraceSilence silence;
     Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
     requireOpen(explainer.isOpen());
     Explainer::EventEntry entry{id, isOwn, {}};
@@ -183,6 +187,7 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
         std::counting_semaphore<2>& room;
         ~Release() { room.release(); }
     } const release{m_room};
+    const TraceSilence silence;
     const MonitoredLogs logs;
     std::vector<LogFile*> read;
     if (wanted.situation.log) {

@@ -38,7 +38,7 @@ void TRC1_VPrintf(const TRC1_Anchor& anchor, int line, const char* format,
     const int savedErrno = errno;
     if (TraceCapture* const capture = TraceCapture::current()) {
         capture->add(format, arguments);
-    } else {
+    } else if (!TraceSilence::isOn()) {
         // The write is a cancellation point, and an unwind must not meet this noexcept.
         const CancellationOff guard;
         std::timespec now{};

@@ -10,6 +10,7 @@
 namespace {
 
 thread_local TraceCapture* t_current = nullptr;
+thread_local int t_silences = 0;
 std::atomic<int> g_count{0};
 
 } // namespace
@@ -51,4 +52,16 @@ void TraceCapture::add(const char* format, std::va_list arguments) noexcept {
     } catch (const std::bad_alloc&) {
         // A reason less.
     }
+}
+
+TraceSilence::TraceSilence() noexcept {
+    ++t_silences;
+}
+
+TraceSilence::~TraceSilence() {
+    --t_silences;
+}
+
+bool TraceSilence::isOn() noexcept {
+    return t_silences != 0;
 }

@@ -32,4 +32,18 @@ private:
     std::string m_errors;
 };
 
+/// While it lives, nothing that the constructing thread traces is written; other threads trace as
+/// always, and at the same cost. For entries that are judged again to answer a question: the trace
+/// of what is monitored stays free of them.
+class TraceSilence {
+public:
+    TraceSilence() noexcept;
+    ~TraceSilence();
+    TraceSilence(const TraceSilence&) = delete;
+    TraceSilence& operator=(const TraceSilence&) = delete;
+
+    /// Whether the calling thread has one. For the trace facility.
+    static bool isOn() noexcept;
+};
+
 #endif

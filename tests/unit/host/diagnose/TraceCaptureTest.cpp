@@ -75,6 +75,34 @@ TEST_F(TraceCaptureTest, AfterItsEndTheLevelsHoldAgain) {
     EXPECT_THAT(traced(), testing::HasSubstr("error later"));
 }
 
+TEST_F(TraceCaptureTest, ASilentThreadWritesNothing) {
+    TraceControl::configure("all");
+    {
+        const TraceSilence silence;
+        speak("silent");
+        const TraceSilence inner;
+        TraceScope(anchor).always()("always");
+    }
+    EXPECT_EQ(traced(), "");
+    speak("after");
+    EXPECT_THAT(traced(), testing::HasSubstr("error after"));
+}
+
+TEST_F(TraceCaptureTest, OtherThreadsTraceWhileOneIsSilent) {
+    TraceControl::configure("error");
+    const TraceSilence silence;
+    std::thread other([] { speak("other"); });
+    other.join();
+    EXPECT_THAT(traced(), testing::HasSubstr("error other"));
+}
+
+TEST_F(TraceCaptureTest, ACaptureKeepsTheErrorsOfASilentThread) {
+    const TraceSilence silence;
+    TraceCapture capture;
+    speak("one");
+    EXPECT_EQ(capture.take(), "error one");
+}
+
 TEST_F(TraceCaptureTest, ThreadsCaptureTheirOwn) {
     TraceControl::configure("none");
     std::vector<std::thread> threads;
