@@ -2,12 +2,10 @@
 
 #include "host/config/ConditionBuilder.h"
 #include "host/events/RowText.h"
-#include "host/framework/CompiledCondition.h"
-#include "host/framework/FilterList.h"
 
 #include <algorithm>
 #include <iterator>
-#include <vector>
+#include <utility>
 
 namespace {
 
@@ -60,11 +58,28 @@ std::string ConditionVerdict::textOf(const Condition& condition) {
            valueOf(condition);
 }
 
-ConditionVerdict ConditionVerdict::of(const Condition& condition, const RowLayout& layout,
-                                      char* row) {
+ConditionJudge::ConditionJudge(std::vector<Condition> conditions, const RowLayout& layout)
+    : m_conditions(std::move(conditions)), m_layout(layout), m_filters(m_conditions) {
+    m_compiled.reserve(m_conditions.size());
+    for (const SEL1_FILTERINFO& filter : m_filters.all()) {
+        m_compiled.emplace_back(filter, layout.find(filter.columnName));
+    }
+}
+
+std::vector<ConditionVerdict> ConditionJudge::judge(char* row) const {
+    std::vector<ConditionVerdict> verdicts;
+    verdicts.reserve(m_conditions.size());
+    for (std::size_t index = 0; index < m_conditions.size(); ++index) {
+        verdicts.push_back(verdict(index, row));
+    }
+    return verdicts;
+}
+
+ConditionVerdict ConditionJudge::verdict(std::size_t index, char* row) const {
+    const Condition& condition = m_conditions[index];
     ConditionVerdict verdict;
-    verdict.condition = textOf(condition);
-    const RowColumn* const column = layout.find(condition.column);
+    verdict.condition = ConditionVerdict::textOf(condition);
+    const RowColumn* const column = m_layout.find(condition.column);
     if (column == nullptr) {
         verdict.refusal = "the entry has no column " + condition.column;
         return verdict;
@@ -79,9 +94,7 @@ ConditionVerdict ConditionVerdict::of(const Condition& condition, const RowLayou
         verdict.value = text;
         shown = quoted(text);
     }
-    const std::vector<Condition> one = {condition};
-    const FilterList filters(one);
-    verdict.holds = CompiledCondition(filters.all().front(), column).holds(nullptr, row);
+    verdict.holds = m_compiled[index].holds(nullptr, row);
     if (!verdict.holds) {
         verdict.refusal =
             condition.column + ' ' + shown + ' ' + denial(condition.op) + ' ' + valueOf(condition);

@@ -1,12 +1,16 @@
 #ifndef ZRM_HOST_CONDITION_VERDICT_H
 #define ZRM_HOST_CONDITION_VERDICT_H
 
+#include "host/framework/CompiledCondition.h"
 #include "host/framework/Condition.h"
+#include "host/framework/FilterList.h"
 #include "host/framework/RowLayout.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <variant>
+#include <vector>
 
 /// What became of one condition on one entry.
 struct ConditionVerdict {
@@ -15,11 +19,28 @@ struct ConditionVerdict {
     bool holds = false;
     std::string refusal; ///< "ENTRYDESC 'Accepted' does not contain 'Failed'"; empty when it holds
 
-    /// Judges the row of a table of this layout as the situation's requests do.
-    static ConditionVerdict of(const Condition& condition, const RowLayout& layout, char* row);
-
     /// COLUMN OP VALUE.
     static std::string textOf(const Condition& condition);
+};
+
+/// Judges rows by conditions, one by one, as a situation's requests do. One thread.
+class ConditionJudge {
+public:
+    /// The rows are those of a table of this layout, which outlives the object.
+    ConditionJudge(std::vector<Condition> conditions, const RowLayout& layout);
+    ConditionJudge(const ConditionJudge&) = delete;
+    ConditionJudge& operator=(const ConditionJudge&) = delete;
+
+    /// In the order of the conditions.
+    std::vector<ConditionVerdict> judge(char* row) const;
+
+private:
+    ConditionVerdict verdict(std::size_t index, char* row) const;
+
+    const std::vector<Condition> m_conditions;
+    const RowLayout& m_layout;
+    const FilterList m_filters;
+    std::vector<CompiledCondition> m_compiled;
 };
 
 #endif

@@ -18,8 +18,10 @@ std::string stampOf(const zrm_rmlogent_data_t& row) {
     return {row.entrytime, sizeof row.entrytime};
 }
 
-bool isThreshold(const Condition& condition) {
-    return condition.column == "FREQTHRESH" || condition.column == "PERIODTHRS";
+std::vector<Condition> withoutThresholds(std::vector<Condition> conditions) {
+    std::erase_if(conditions,
+                  [](const Condition& condition) { return isThresholdColumn(condition.column); });
+    return conditions;
 }
 
 std::string numberOf(long count, const char* one, const char* several) {
@@ -42,7 +44,11 @@ struct Explainer::Seen {
 
 Explainer::Explainer(SituationConfig situation, bool isStopped, TableManager& entries)
     : m_situation(std::move(situation)), m_isStopped(isStopped), m_entries(entries),
-      m_replay(m_situation, entries) {}
+      m_replay(m_situation, entries) {
+    if (isOpen()) {
+        m_judge.emplace(withoutThresholds(m_situation.conditions), layout());
+    }
+}
 
 Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view> line,
                                  zrm_rmlogent_data_t* row) {
@@ -167,11 +173,7 @@ Explanation Explainer::describe(Seen& seen) {
         char* const row = reinterpret_cast<char*>(&seen.row);
         RowJson::append(explanation.row, layout(), row);
         m_replay.matches(seen.row); // gives the row the situation's thresholds
-        for (const Condition& condition : m_situation.conditions) {
-            if (!m_situation.frequency || !isThreshold(condition)) {
-                explanation.conditions.push_back(ConditionVerdict::of(condition, layout(), row));
-            }
-        }
+        explanation.conditions = m_judge->judge(row);
     }
     explanation.matches = seen.verdict.matches;
     explanation.isRaised = seen.verdict.isRaised;

@@ -9,6 +9,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -64,6 +65,7 @@ private:
     const bool m_isStopped;
     TableManager& m_entries;
     Replay m_replay;
+    std::optional<ConditionJudge> m_judge; ///< of every condition but the thresholds
     std::string m_problem;
 };
 

@@ -62,20 +62,45 @@ std::optional<ConditionProblem> checkNumber(std::int64_t number) {
     return std::nullopt;
 }
 
+/// What is wrong with a regular expression. A compilation stops soon behind the largest size: the
+/// memory that it may use allows a few times as much.
+std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudget& budget) {
+    constexpr std::int64_t memory = 512 * 1024;
+    constexpr const char* cure =
+        "repeat less, and write [A-Za-z] or \\w instead of a class of Unicode such as \\pL";
+    if (budget.isSpent()) {
+        return badValue("the regular expressions before this one are as large as all of them may "
+                        "be together",
+                        cure);
+    }
+    RE2::Options options(RE2::Quiet);
+    options.set_max_mem(memory);
+    const RE2 pattern(value, options);
+    const std::size_t size =
+        pattern.ok() ? static_cast<std::size_t>(pattern.ProgramSize()) : std::size_t{0};
+    if (size > PatternBudget::ofPattern || pattern.error_code() == RE2::ErrorPatternTooLarge) {
+        budget.spend(PatternBudget::ofPattern);
+        return badValue(quoted(value) + " is too large a regular expression", cure);
+    }
+    if (!pattern.ok()) {
+        return badValue(quoted(value) + " is no regular expression: " + pattern.error(),
+                        "correct it (RE2 syntax)");
+    }
+    budget.spend(size);
+    if (budget.isExceeded()) {
+        return badValue("with this one the regular expressions are too large together", cure);
+    }
+    return std::nullopt;
+}
+
 /// A value of contains, starts or matches.
-std::optional<ConditionProblem> checkPattern(_IntfOper op, const std::string& value) {
+std::optional<ConditionProblem> checkPattern(_IntfOper op, const std::string& value,
+                                             PatternBudget& budget) {
     if (value.empty() || value.size() > longestPattern) {
         return badValue("the value has " + std::to_string(value.size()) + " bytes",
                         "write 1 to " + std::to_string(longestPattern) + " bytes");
     }
-    if (op == INTF_MATCHES) {
-        const RE2 pattern(value, RE2::Quiet);
-        if (!pattern.ok()) {
-            return badValue(quoted(value) + " is no regular expression: " + pattern.error(),
-                            "correct it (RE2 syntax)");
-        }
-    }
-    return std::nullopt;
+    return op == INTF_MATCHES ? checkRegex(value, budget) : std::nullopt;
 }
 
 ConditionProblem notANumber(const Column& column) {
@@ -151,7 +176,8 @@ ConditionBuilder::column(std::string_view name) const {
 }
 
 ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, std::string_view op,
-                                                 const ConditionValue& value) const {
+                                                 const ConditionValue& value,
+                                                 PatternBudget& budget) const {
     const auto found = column(columnName);
     if (const auto* const problem = std::get_if<ConditionProblem>(&found)) {
         return *problem;
@@ -173,11 +199,12 @@ ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, st
         return value.isList ? badValue(quoted(op) + " takes one value", "use in for a list")
                             : badValue("in takes a list", "write the values in brackets");
     }
-    return known->code == INTF_IN ? several(column, value) : single(column, *known, value);
+    return known->code == INTF_IN ? several(column, value) : single(column, *known, value, budget);
 }
 
 ConditionBuilder::Result ConditionBuilder::single(const Column& column, const Operator& op,
-                                                  const ConditionValue& value) {
+                                                  const ConditionValue& value,
+                                                  PatternBudget& budget) {
     Condition condition;
     condition.column = column.name;
     condition.op = op.code;
@@ -196,7 +223,7 @@ ConditionBuilder::Result ConditionBuilder::single(const Column& column, const Op
         }
         condition.text = std::get<std::string>(item);
         problem = op.forNumbers ? checkWhole(column, condition.text)
-                                : checkPattern(op.code, condition.text);
+                                : checkPattern(op.code, condition.text, budget);
     }
     if (problem) {
         return std::move(*problem);
@@ -215,9 +242,10 @@ ConditionBuilder::Result ConditionBuilder::several(const Column& column,
     condition.op = INTF_IN;
     condition.isNumber = column.isNumber;
     constexpr Operator equal{"=", INTF_EQUAL, true};
+    PatternBudget noPatterns;
     std::size_t bytes = 0;
     for (const ConditionValue::Item& item : value.items) {
-        Result one = single(column, equal, {{item}, false});
+        Result one = single(column, equal, {{item}, false}, noPatterns);
         if (std::holds_alternative<ConditionProblem>(one)) {
             return one;
         }

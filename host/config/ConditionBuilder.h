@@ -2,6 +2,7 @@
 #define ZRM_HOST_CONDITION_BUILDER_H
 
 #include "host/config/Columns.h"
+#include "host/config/PatternBudget.h"
 #include "host/framework/Condition.h"
 
 #include <array>
@@ -36,8 +37,10 @@ public:
     explicit ConditionBuilder(std::string_view table);
 
     /// The condition COLUMN OP VALUE, or what is wrong with it. Values of time columns may be
-    /// ISO 8601 times; the condition holds them as 16-character time stamps.
-    Result build(std::string_view column, std::string_view op, const ConditionValue& value) const;
+    /// ISO 8601 times; the condition holds them as 16-character time stamps. Conditions that belong
+    /// together share a budget for their regular expressions.
+    Result build(std::string_view column, std::string_view op, const ConditionValue& value,
+                 PatternBudget& budget) const;
 
     /// The conditions that hold for the entries of this log alone, or what is wrong with the path:
     /// its directory and its name, in the columns that can hold them.
@@ -54,7 +57,8 @@ private:
     static const std::array<Operator, 10>& operators() noexcept;
     static const Operator* findOperator(std::string_view op) noexcept;
     std::variant<const Column*, ConditionProblem> column(std::string_view name) const;
-    static Result single(const Column& column, const Operator& op, const ConditionValue& value);
+    static Result single(const Column& column, const Operator& op, const ConditionValue& value,
+                         PatternBudget& budget);
     static Result several(const Column& column, const ConditionValue& value);
 
     std::span<const Column> m_columns;

@@ -107,7 +107,8 @@ std::optional<ConditionProblem> list(Scanner& scanner, ConditionValue& value) {
 
 } // namespace
 
-ConditionBuilder::Result ConditionParser::parse(std::string_view text) const {
+ConditionBuilder::Result ConditionParser::parse(std::string_view text,
+                                                PatternBudget& budget) const {
     Scanner scanner(text);
     scanner.skipBlanks();
     const std::string_view column = scanner.takeWhile(isWordCharacter);
@@ -141,10 +142,11 @@ ConditionBuilder::Result ConditionParser::parse(std::string_view text) const {
                            "write one condition per text");
     }
     if (!problem) {
-        return m_builder.build(column, op, value);
+        return m_builder.build(column, op, value, budget);
     }
     // A wrong column or operator is the better thing to say than a value that it made unreadable.
-    ConditionBuilder::Result probe = m_builder.build(column, op, {{std::string("x")}, false});
+    ConditionBuilder::Result probe =
+        m_builder.build(column, op, {{std::string("x")}, false}, budget);
     if (const auto* const earlier = std::get_if<ConditionProblem>(&probe);
         earlier != nullptr && earlier->part != ConditionProblem::VALUE) {
         return *earlier;

@@ -5,6 +5,7 @@
 #include "host/framework/Condition.h"
 #include "host/http/ListenAddress.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -46,6 +47,7 @@ struct SituationConfig {
     std::vector<std::string> when = {};
     std::optional<std::string> frequency = std::nullopt;
     std::optional<std::string> period = std::nullopt;
+    std::size_t patternSize = 0; ///< instructions of its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };
 

@@ -53,7 +53,8 @@ SituationConfig SituationReader::read(const toml::table& table) {
 
     SituationConfig situation;
     bool isNamed = true;
-    for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+    for (const SituationProblem& problem :
+         SituationValidator::check(text, situation, m_patterns.ofNext())) {
         isNamed = isNamed && problem.field != "name";
         if (problem.condition) {
             section.problem(conditions[*problem.condition].second, problem.field, problem.what,
@@ -62,6 +63,7 @@ SituationConfig SituationReader::read(const toml::table& table) {
             section.problem(problem.field, problem.what, problem.cure);
         }
     }
+    m_patterns.spend(situation.patternSize);
     if (isNamed) {
         noteName(section, situation.name);
     }

@@ -4,6 +4,7 @@
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
 #include "host/config/HostConfig.h"
+#include "host/config/PatternBudget.h"
 
 #include <map>
 #include <string>
@@ -21,6 +22,7 @@ private:
     void noteName(ConfigSection& section, const std::string& name);
 
     ConfigProblems& m_problems;
+    PatternBudget m_patterns{PatternBudget::ofSource};
     std::map<std::string, unsigned> m_names; ///< line of each situation's name
 };
 

@@ -67,8 +67,66 @@ void addLog(const std::string& log, SituationConfig& situation, Problems& proble
     situation.conditions = std::move(std::get<std::vector<Condition>>(conditions));
 }
 
-void addConditions(const std::vector<std::string>& texts, SituationConfig& situation,
+/// The thresholds that conditions state themselves. Conditions that put none in force are refused:
+/// the situation would run without the threshold that somebody has written.
+class WrittenThresholds {
+public:
+    explicit WrittenThresholds(Problems& problems) : m_problems(problems) {}
+
+    /// Notes a condition on a threshold's column.
+    void add(std::size_t index, const Condition& condition) {
+        Threshold& threshold = condition.column == "FREQTHRESH" ? m_frequency : m_period;
+        if (threshold.index) {
+            m_problems.push_back({"when", index,
+                                  "a second condition on " + condition.column + " has no effect",
+                                  "leave it out"});
+            return;
+        }
+        threshold.index = index;
+        if (!threshold.isInForce(condition)) {
+            m_problems.push_back({"when", index, threshold.what, threshold.cure});
+        }
+    }
+
+    /// To be called when all conditions were added.
+    void finish() {
+        requireOther(m_frequency, m_period, "add PERIODTHRS = 60");
+        requireOther(m_period, m_frequency, "add FREQTHRESH >= 5");
+    }
+
+    bool any() const { return m_frequency.index || m_period.index; }
+
+private:
+    struct Threshold {
+        const char* column;
+        bool (*isInForce)(const Condition& condition);
+        const char* what;
+        const char* cure;
+        std::optional<std::size_t> index = {}; ///< of the condition that states it
+    };
+
+    void requireOther(const Threshold& one, const Threshold& other, const char* cure) {
+        if (one.index && !other.index) {
+            m_problems.push_back(
+                {"when", one.index,
+                 std::string(one.column) + " has no effect without " + other.column, cure});
+        }
+    }
+
+    Problems& m_problems;
+    Threshold m_frequency{"FREQTHRESH", &Thresholds::isFrequency,
+                          "the condition on FREQTHRESH states no frequency that can be reached",
+                          "write >=, >, <= or < and a number of entries, for example "
+                          "FREQTHRESH >= 5"};
+    Threshold m_period{"PERIODTHRS", &Thresholds::isPeriod,
+                       "the condition on PERIODTHRS states no period",
+                       "write = and a number of seconds from 1, for example PERIODTHRS = 60"};
+};
+
+void addConditions(const SituationText& text, SituationConfig& situation, PatternBudget& budget,
                    Problems& problems) {
+    const std::vector<std::string>& texts = text.when;
+    const bool hasThresholdKeys = text.frequency || text.period;
     if (texts.size() > SituationValidator::mostConditions) {
         problems.push_back({"when",
                             {},
@@ -88,31 +146,31 @@ void addConditions(const std::vector<std::string>& texts, SituationConfig& situa
         return;
     }
     const ConditionParser parser("RMLOGENT");
+    WrittenThresholds thresholds(problems);
     for (std::size_t index = 0; index < texts.size(); ++index) {
-        ConditionBuilder::Result result = parser.parse(texts[index]);
+        ConditionBuilder::Result result = parser.parse(texts[index], budget);
         if (auto* const problem = std::get_if<ConditionProblem>(&result)) {
             problems.push_back({"when", index, "in \"" + texts[index] + "\": " + problem->what,
                                 std::move(problem->cure)});
-        } else {
-            situation.conditions.push_back(std::move(std::get<Condition>(result)));
+            continue;
         }
+        Condition& condition = std::get<Condition>(result);
+        if (isThresholdColumn(condition.column)) {
+            thresholds.add(index, condition);
+        }
+        situation.conditions.push_back(std::move(condition));
     }
-}
-
-/// Whether the conditions that were written state a threshold themselves.
-bool haveThreshold(const std::vector<Condition>& conditions) {
-    return std::any_of(conditions.begin(), conditions.end(), [](const Condition& condition) {
-        return condition.column == "FREQTHRESH" || condition.column == "PERIODTHRS";
-    });
-}
-
-void addThresholds(const SituationText& text, SituationConfig& situation, Problems& problems) {
-    if ((text.frequency || text.period) && haveThreshold(situation.conditions)) {
+    if (!hasThresholdKeys) {
+        thresholds.finish();
+    } else if (thresholds.any()) {
         problems.push_back({"frequency",
                             {},
                             "the conditions name FREQTHRESH or PERIODTHRS as well",
                             "leave those conditions out"});
     }
+}
+
+void addThresholds(const SituationText& text, SituationConfig& situation, Problems& problems) {
     if (text.frequency && !text.period) {
         problems.push_back({"frequency", {}, "has no period beside it", "add period = \"60s\""});
     }
@@ -148,7 +206,8 @@ std::string SituationProblem::fieldText() const {
 }
 
 std::vector<SituationProblem> SituationValidator::check(const SituationText& text,
-                                                        SituationConfig& situation) {
+                                                        SituationConfig& situation,
+                                                        PatternBudget budget) {
     Problems problems;
     situation = {};
     situation.name = text.name.value_or("");
@@ -164,7 +223,8 @@ std::vector<SituationProblem> SituationValidator::check(const SituationText& tex
     if (text.log) {
         addLog(*text.log, situation, problems);
     }
-    addConditions(text.when, situation, problems);
+    addConditions(text, situation, budget, problems);
+    situation.patternSize = budget.used();
     addThresholds(text, situation, problems);
     return problems;
 }

@@ -2,6 +2,7 @@
 #define ZRM_HOST_SITUATION_VALIDATOR_H
 
 #include "host/config/HostConfig.h"
+#include "host/config/PatternBudget.h"
 
 #include <cstddef>
 #include <optional>
@@ -40,9 +41,10 @@ public:
     static constexpr std::size_t longestConditions = 65536; ///< bytes of all of them
 
     /// Makes the situation of the text and returns everything that is wrong with it. The situation
-    /// is meaningless when there is something.
+    /// is meaningless when there is something. The budget is for its regular expressions.
     static std::vector<SituationProblem> check(const SituationText& text,
-                                               SituationConfig& situation);
+                                               SituationConfig& situation,
+                                               PatternBudget budget = PatternBudget());
 };
 
 #endif

@@ -2,6 +2,7 @@
 
 #include "host/config/DurationText.h"
 
+#include <algorithm>
 #include <array>
 #include <charconv>
 #include <cstdint>
@@ -10,6 +11,21 @@
 namespace {
 
 constexpr std::int64_t largest = std::numeric_limits<std::int32_t>::max();
+
+struct Bound {
+    std::string_view sign;
+    _IntfOper op;
+    std::int64_t least; ///< the smallest number that leaves a bound of one entry or more
+
+    bool isReachable(std::int64_t number) const noexcept {
+        return number >= least && number < largest;
+    }
+};
+
+constexpr std::array<Bound, 4> bounds = {{{">=", INTF_GREATER_OR_EQUAL, 1},
+                                          {"<=", INTF_LESS_OR_EQUAL, 1},
+                                          {">", INTF_GREATER, 0},
+                                          {"<", INTF_LESS, 2}}};
 
 /// Reads a number from the text's front and takes it off.
 std::optional<std::int64_t> takeNumber(std::string_view& text) {
@@ -37,15 +53,6 @@ Condition condition(const char* column, _IntfOper op, std::int64_t number) {
 } // namespace
 
 std::optional<Condition> Thresholds::frequency(std::string_view text) {
-    struct Bound {
-        std::string_view sign;
-        _IntfOper op;
-        std::int64_t least; ///< the smallest number that leaves a bound of one entry or more
-    };
-    static constexpr std::array<Bound, 4> bounds = {{{">=", INTF_GREATER_OR_EQUAL, 1},
-                                                     {"<=", INTF_LESS_OR_EQUAL, 1},
-                                                     {">", INTF_GREATER, 0},
-                                                     {"<", INTF_LESS, 2}}};
     for (const Bound& bound : bounds) {
         if (text.starts_with(bound.sign)) {
             text.remove_prefix(bound.sign.size());
@@ -53,7 +60,7 @@ std::optional<Condition> Thresholds::frequency(std::string_view text) {
                 text.remove_prefix(1);
             }
             const std::optional<std::int64_t> number = takeNumber(text);
-            if (!number || !text.empty() || *number < bound.least || *number >= largest) {
+            if (!number || !text.empty() || !bound.isReachable(*number)) {
                 return std::nullopt;
             }
             return condition("FREQTHRESH", bound.op, *number);
@@ -66,4 +73,14 @@ std::optional<Condition> Thresholds::period(std::string_view text) {
     const std::optional<std::chrono::seconds> length = DurationText::parse(text);
     return length ? std::optional(condition("PERIODTHRS", INTF_EQUAL, length->count()))
                   : std::nullopt;
+}
+
+bool Thresholds::isFrequency(const Condition& condition) noexcept {
+    return std::any_of(bounds.begin(), bounds.end(), [&](const Bound& bound) {
+        return bound.op == condition.op && bound.isReachable(condition.number);
+    });
+}
+
+bool Thresholds::isPeriod(const Condition& condition) noexcept {
+    return condition.op == INTF_EQUAL && condition.number >= 1;
 }

@@ -15,6 +15,10 @@ public:
 
     /// The PERIODTHRS condition of "60s", "5m", "1h" or "1d"; none for any other text.
     static std::optional<Condition> period(std::string_view text);
+
+    /// Whether a condition on FREQTHRESH, or on PERIODTHRS, puts a threshold in force.
+    static bool isFrequency(const Condition& condition) noexcept;
+    static bool isPeriod(const Condition& condition) noexcept;
 };
 
 #endif

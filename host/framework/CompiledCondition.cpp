@@ -19,6 +19,9 @@ namespace {
 
 TRC1_Anchor anchor{"CompiledCondition.cpp"};
 
+/// For the program of a pattern and its states that have come up in matching, bytes.
+constexpr std::int64_t patternMemory = 2 * 1024 * 1024;
+
 /// The columns that name a log. Most situations are on one log, and most rows are another's; names
 /// differ more than directories do.
 constexpr std::pair<std::string_view, int> kLogColumns[] = {
@@ -132,6 +135,7 @@ void CompiledCondition::compilePattern(const RowColumn& column) {
     TraceScope trace(anchor);
     re2::RE2::Options options;
     options.set_log_errors(false);
+    options.set_max_mem(patternMemory);
     if (isByteMatch(column, m_value)) {
         options.set_encoding(re2::RE2::Options::EncodingLatin1);
     }

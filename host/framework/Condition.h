@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 /// The host's own operators, beside those of _IntfOper.
@@ -24,5 +25,12 @@ struct Condition {
     std::vector<std::string> values; ///< values of INTF_IN
     bool operator==(const Condition&) const = default;
 };
+
+/// Whether this is a column by which a situation states its thresholds. A condition on it is a
+/// parameter of the situation: the table reads it and writes the column itself, so it is never
+/// compared with a row.
+inline bool isThresholdColumn(std::string_view column) noexcept {
+    return column == "FREQTHRESH" || column == "PERIODTHRS";
+}
 
 #endif

@@ -1,5 +1,6 @@
 #include "host/framework/ConditionSet.h"
 
+#include "agent/framework/ctreq.h"
 #include "host/framework/FilterList.h"
 
 #include <algorithm>
@@ -7,7 +8,11 @@
 ConditionSet::ConditionSet(const FilterList& filters, ctreq& request) : m_request(request) {
     const RowLayout layout(request);
     m_conditions.reserve(filters.all().size());
+    const bool isSituation = request.sampleType() == SAMPLE_SITUATION;
     for (const SEL1_FILTERINFO& filter : filters.all()) {
+        if (isSituation && isThresholdColumn(filter.columnName)) {
+            continue;
+        }
         m_conditions.emplace_back(filter, layout.find(filter.columnName));
     }
     std::stable_sort(m_conditions.begin(), m_conditions.end(),

@@ -7,8 +7,9 @@
 
 class FilterList;
 
-/// All conditions of one request, ready for evaluation, in the order in which a row is refused
-/// soonest. Immutable once built; the filters and the request must outlive it.
+/// The conditions of one request on its rows, ready for evaluation, in the order in which a row is
+/// refused soonest. The thresholds of a situation are not among them. Immutable once built; the
+/// filters and the request must outlive it.
 class ConditionSet {
 public:
     /// Asks the request for its columns, so it must be fully constructed.

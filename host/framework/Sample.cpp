@@ -4,6 +4,7 @@
 #include "host/framework/Request.h"
 #include "host/framework/Tables.h"
 
+#include <algorithm>
 #include <utility>
 
 namespace {
@@ -40,6 +41,9 @@ std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition
     detail.name = std::move(label);
     detail.sampleType = SAMPLE_REPORT;
     detail.conditions = std::move(conditions);
+    // The table takes the log's name from the first condition on it, whatever its operator.
+    std::stable_partition(detail.conditions.begin(), detail.conditions.end(),
+                          [](const Condition& condition) { return condition.op == INTF_EQUAL; });
     const Request request(*manager, std::move(detail), collector);
     if (!request.isOpen()) {
         return std::nullopt;

@@ -86,7 +86,7 @@ std::optional<Problem> checkForm(const json& filter, const std::string& field) {
 }
 
 std::variant<Condition, Problem> readFilter(const ConditionBuilder& builder, const json& filter,
-                                            const std::string& field) {
+                                            const std::string& field, PatternBudget& budget) {
     if (std::optional<Problem> problem = checkForm(filter, field)) {
         return std::move(*problem);
     }
@@ -94,8 +94,9 @@ std::variant<Condition, Problem> readFilter(const ConditionBuilder& builder, con
     if (auto* const problem = std::get_if<Problem>(&value)) {
         return std::move(*problem);
     }
-    auto result = builder.build(filter["column"].get<std::string>(),
-                                filter["op"].get<std::string>(), std::get<ConditionValue>(value));
+    auto result =
+        builder.build(filter["column"].get<std::string>(), filter["op"].get<std::string>(),
+                      std::get<ConditionValue>(value), budget);
     if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
         return bad(problem->what + "; " + problem->cure, fieldOf(problem->part, field));
     }
@@ -129,9 +130,11 @@ Conditions parseFilters(std::string_view table, std::string_view body) {
         fields.refuse("filters", "write a list of at most 100 filters");
     }
     const ConditionBuilder builder(table);
+    PatternBudget budget;
     Conditions conditions;
     for (std::size_t index = 0; index < filters.size(); ++index) {
-        auto condition = readFilter(builder, filters[index], fields.place("filters", index));
+        auto condition =
+            readFilter(builder, filters[index], fields.place("filters", index), budget);
         if (auto* const problem = std::get_if<Problem>(&condition)) {
             throw RequestRefused(std::move(*problem));
         }

@@ -1,6 +1,7 @@
 #include "host/situations/SituationSet.h"
 
 #include "agent/TraceScope.h"
+#include "host/config/PatternBudget.h"
 
 #include <algorithm>
 
@@ -151,6 +152,22 @@ std::optional<SituationStatus> SituationSet::find(const std::string& name) const
     return found == nullptr ? std::nullopt : std::optional(statusOf(found->first, found->second));
 }
 
+/// The key, unless the regular expressions of what was made through the API have become too large.
+SituationSet::Changed SituationSet::orTooLarge(const Records& records, const Key& key) {
+    PatternBudget budget(PatternBudget::ofSource);
+    for (const auto& [one, record] : records) {
+        if (one.first == API_SOURCE) {
+            budget.spend(record.config.patternSize);
+        }
+    }
+    if (!budget.isExceeded()) {
+        return key;
+    }
+    return SituationRefusal{SituationRefusal::TOO_MANY,
+                            "the regular expressions of the situations made through the API are "
+                            "too large together: remove a situation, or write smaller ones"};
+}
+
 SituationSet::Change SituationSet::add(const SituationConfig& config) {
     return statusAfter(change([&](Draft& draft) -> Changed {
         if (named(draft.records, config.name) != nullptr) {
@@ -168,7 +185,7 @@ SituationSet::Change SituationSet::add(const SituationConfig& config) {
         }
         const Key key{API_SOURCE, config.name};
         draft.records.emplace(key, Record{config});
-        return key;
+        return orTooLarge(draft.records, key);
     }));
 }
 
@@ -185,7 +202,7 @@ SituationSet::Change SituationSet::replace(const SituationConfig& config) {
             exchanged.isStopped = record.isStopped;
             record = std::move(exchanged);
         }
-        return key;
+        return orTooLarge(draft.records, key);
     }));
 }
 

@@ -101,6 +101,7 @@ private:
 
     class Turn;
     Changed change(const std::function<Changed(Draft&)>& plan);
+    static Changed orTooLarge(const Records& records, const Key& key);
     Changed changeInTurn(const std::function<Changed(Draft&)>& plan);
     std::optional<SituationRefusal> save(const Draft& draft);
     void keepStoppedFiles();

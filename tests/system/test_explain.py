@@ -170,9 +170,35 @@ def test_thresholds_count_what_the_log_holds(started):
     inside = {"when": ["FREQTHRESH >= 4", "PERIODTHRS = 60"]}
     explained = api.explain_line(syslog_line("x"), started.watched, **inside)
     assert explained["window"] == {"frequency": ">= 4", "period": "60s", "count": 4}
-    assert [c["holds"] for c in explained["conditions"]] == [True, True]
+    assert explained["conditions"] == []  # they are never compared with an entry
     assert explained["raised"]
     assert started.stop() == 0
+
+
+def test_what_is_judged_again_leaves_the_trace_alone(agent):
+    agent.listen = "127.0.0.1:0"
+    lines = "".join(f"2026-11-20 10:00:{n:02} fits\ndoes not\n" for n in range(20))
+    log = agent.log(
+        content=lines.encode(),
+        fields=';N ;U ;A,"%d-%d-%d %d:%d:%d %[^\\n]" , year month day hour minute second description',
+    )
+    agent.start(trace="error+detail+fine")
+    api = Analysis(agent)
+    api.make("kept", log=str(log.path), when=["ENTRYDESC contains 'none'"])
+    rules = {"log": str(log.path), "frequency": ">= 1", "period": "1m"}
+    wait_until(lambda: agent.trace("Opening situation kept"), "the situation's opening")
+    before = len(agent.trace())
+    assert len(api.explain(definition=rules, last=40)) == 40
+    api.explain_line("does not", log.path, **rules)
+    result = api.backtest("2026-11-20T00:00:00", "2026-11-21T00:00:00", definition=rules)
+    assert result["raised"] == 20
+    traced = "\n".join(agent.trace()[before:])
+    for word in ("frequency", "definition", "report", "does not", "StringParser", "UserLogFile"):
+        assert word not in traced, traced
+    assert api.counts("kept")["offered"] == 0
+    log.append("2026-11-20 11:00:00 fits\n")
+    agent.wait_trace("Event passed to situation kept for evaluation.")
+    assert agent.stop() == 0
 
 
 def test_the_last_entries_of_a_log(started):

@@ -151,6 +151,49 @@ TEST_F(HostRequests, ThresholdConditionsHoldForTheRowsTheyLetThrough) {
     }
 }
 
+TEST_F(HostRequests, ThresholdsThatAreNoneLetEveryRowThrough) {
+    const std::vector<std::vector<Condition>> inert = {
+        {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1), number("PERIODTHRS", INTF_EQUAL, 0)},
+        {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1)},
+        {number("FREQTHRESH", INTF_LESS, 1), number("PERIODTHRS", INTF_EQUAL, 60)},
+        {number("PERIODTHRS", INTF_EQUAL, 60)},
+    };
+    for (const std::vector<Condition>& conditions : inert) {
+        Receiver receiver;
+        const Request request(logEntries(), situation(conditions), receiver);
+        arrive(rowOf("auth.log", 1));
+        EXPECT_THAT(receiver.received, ElementsAre(std::pair(1, 0)))
+            << conditions.front().column << ' ' << conditions.front().op;
+    }
+}
+
+TEST_F(HostRequests, AThresholdThatTheTableRefusesLetsEveryRowThrough) {
+    const Request request(
+        logEntries(),
+        situation({number("FREQTHRESH", INTF_EQUAL, 3), number("PERIODTHRS", INTF_EQUAL, 60)}),
+        m_receiver);
+    EXPECT_THAT(m_trace.messages(), ElementsAre("Invalid FREQTHRESH threshold compare operator; "
+                                                "value is 1. Threshold ignored."));
+    m_trace.clear();
+    arrive(rowOf("auth.log", 1));
+    EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
+}
+
+TEST_F(HostRequests, AReportReadsTheLogThatItsEqualityNames) {
+    TestLogs logs;
+    logs.add("/var/log/auth.log").entries = 3;
+    logs.add("/var/log/syslog").entries = 5;
+    const auto sample = Sample::take(
+        "RMLOGENT",
+        {text("LOGNAME", INTF_NOT_EQUAL, "syslog"), text("LOGPATH", INTF_STARTS, "/var"),
+         text("LOGPATH", INTF_EQUAL, "/var/log/"), text("LOGNAME", INTF_EQUAL, "auth.log"),
+         text("ENTRYTIME", INTF_GREATER_OR_EQUAL, "1260101"),
+         text("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
+    ASSERT_TRUE(sample.has_value());
+    EXPECT_EQ(sample->size(), 3U);
+    EXPECT_THAT(logs.calls, ElementsAre("begin", "find /var/log/auth.log", "end"));
+}
+
 TEST_F(HostRequests, ReportsReadTheLogNamedByTheirConditions) {
     TestLogs logs;
     logs.add("/var/log/auth.log").entries = 45;

@@ -51,6 +51,15 @@ protected:
         return {row.freqthresh, row.periodthrs};
     }
 
+    /// How many of one row the situation collects: a row that meets its other conditions.
+    unsigned passed() {
+        zrm_rmlogent_data_t row;
+        std::memset(&row, ' ', sizeof row);
+        m_test.accepts = nullptr;
+        static_cast<zrm_rmlogent_base&>(*m_request).AddData(&row, 1);
+        return m_request->count;
+    }
+
     /// The fine messages and the columns with this FREQTHRESH condition and a period of 60.
     std::pair<std::vector<std::string>, int> frequency(int op, const std::string& bytes,
                                                        int length = -32768) {
@@ -189,10 +198,12 @@ TEST_F(SituationThresholds, OneWithoutTheOtherIsInert) {
     m_test.number("FREQTHRESH", greaterOrEqual, 1).number("PERIODTHRS", equal, 0);
     open(0);
     EXPECT_EQ(columns(), std::pair(0, 0));
+    EXPECT_EQ(passed(), 1U);
     m_test.filters.clear();
     m_test.number("PERIODTHRS", equal, 60).number("FREQTHRESH", less, 1);
     open(0);
     EXPECT_EQ(columns(), std::pair(0, 0));
+    EXPECT_EQ(passed(), 1U);
 }
 
 TEST_F(SituationThresholds, TheFirstUsableOneHolds) {

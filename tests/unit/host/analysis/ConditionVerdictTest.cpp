@@ -23,8 +23,8 @@ class ConditionVerdictTest : public testing::Test {
 protected:
     ConditionVerdict verdict(const std::string& condition, const std::string& description) {
         zrm_rmlogent_data_t row = rowAt(0, description);
-        return ConditionVerdict::of(parsed(condition), layout.layout(),
-                                    reinterpret_cast<char*>(&row));
+        const ConditionJudge judge({parsed(condition)}, layout.layout());
+        return judge.judge(reinterpret_cast<char*>(&row)).at(0);
     }
 
     RecordingTrace trace{TRC1_ERROR};

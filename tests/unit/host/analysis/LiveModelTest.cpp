@@ -40,7 +40,7 @@ template <typename T> const T& pick(Random& random, const std::vector<T>& choice
 const std::vector<std::string> columns = {"ENTRYSYS",   "ENTRYSRC",  "ENTRYTYPE", "ENTRYCLASS",
                                           "ENTRYDESC",  "UENTRYSRC", "LOGPATH",   "LOGNAME",
                                           "UENTRYDESC", "ENTRYTIME", "ULOGPATH"};
-const std::vector<std::string> numbers = {"FREQTHRESH", "PERIODTHRS", "SAMPLENO", "ROWNO"};
+const std::vector<std::string> numbers = {"SAMPLENO", "ROWNO"};
 
 /// Few and like each other, so that conditions hold often.
 std::string randomText(Random& random) {
@@ -97,6 +97,20 @@ std::string randomCondition(Random& random) {
     }
 }
 
+Condition threshold(const char* column, _IntfOper op, std::int64_t number) {
+    Condition condition;
+    condition.column = column;
+    condition.op = op;
+    condition.number = number;
+    condition.isNumber = true;
+    return condition;
+}
+
+const std::vector<Condition> inertThresholds = {
+    threshold("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1), threshold("FREQTHRESH", INTF_LESS, 1),
+    threshold("FREQTHRESH", INTF_EQUAL, 3), threshold("PERIODTHRS", INTF_EQUAL, 0),
+    threshold("PERIODTHRS", INTF_EQUAL, 60)};
+
 SituationConfig randomSituation(Random& random, std::size_t number) {
     SituationText text;
     text.name = "situation " + std::to_string(number);
@@ -106,11 +120,10 @@ SituationConfig randomSituation(Random& random, std::size_t number) {
     if (random() % 3 == 0) {
         text.log = random() % 2 == 0 ? "/var/log/app.log" : "/var/log/other.log";
     }
-    const bool namesThreshold =
-        std::any_of(text.when.begin(), text.when.end(), [](const std::string& condition) {
-            return condition.starts_with("FREQTHRESH") || condition.starts_with("PERIODTHRS");
-        });
-    if (!namesThreshold && random() % 2 == 0) {
+    const auto kind = random() % 4;
+    if (kind == 0) {
+        text.when.insert(text.when.end(), {"FREQTHRESH >= 2", "PERIODTHRS = 30"});
+    } else if (kind < 3) {
         text.frequency =
             pick(random, std::vector<std::string>{">= ", "> ", "<= ", "< "}) +
             pick(random, std::vector<std::string>{"1", "2", "2", "3", "5", "2147483646"});
@@ -123,6 +136,9 @@ SituationConfig randomSituation(Random& random, std::size_t number) {
     SituationConfig config;
     for (const SituationProblem& problem : SituationValidator::check(text, config)) {
         ADD_FAILURE() << problem.fieldText() << ": " << problem.what << "; " << problem.cure;
+    }
+    if (kind == 3) { // refused when somebody writes it; the agent takes it for no threshold
+        config.conditions.push_back(pick(random, inertThresholds));
     }
     return config;
 }
@@ -182,9 +198,12 @@ protected:
         zrm_rmlogent_data_t judged = row;
         EXPECT_EQ(replay.matches(judged), verdict.matches);
         bool allHold = true;
-        for (const Condition& condition : config.conditions) {
-            const ConditionVerdict one =
-                ConditionVerdict::of(condition, replay.layout(), reinterpret_cast<char*>(&judged));
+        std::vector<Condition> conditions = config.conditions;
+        std::erase_if(conditions, [](const Condition& condition) {
+            return isThresholdColumn(condition.column);
+        });
+        const ConditionJudge judge(std::move(conditions), replay.layout());
+        for (const ConditionVerdict& one : judge.judge(reinterpret_cast<char*>(&judged))) {
             EXPECT_EQ(one.holds, one.refusal.empty());
             allHold = allHold && one.holds;
         }
@@ -209,7 +228,8 @@ protected:
         SEL1_FILTERINFO* filter = nullptr;
         request->ResetFilterIndex();
         while (request->GetFilterInfo(&filter) == 0) {
-            if (request->ColumnIsException(row, const_cast<char*>(filter->columnName),
+            if (!isThresholdColumn(filter->columnName) &&
+                request->ColumnIsException(row, const_cast<char*>(filter->columnName),
                                            filter->compareOperator,
                                            const_cast<char*>(filter->value)) == 0) {
                 return false;

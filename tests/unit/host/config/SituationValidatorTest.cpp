@@ -113,4 +113,77 @@ TEST(SituationValidator, ThresholdsStandInOnePlaceOnly) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("frequency"));
 }
 
+TEST(SituationValidator, RegularExpressionsHaveALimitAloneAndTogether) {
+    const auto problemsOf = [](const char* pattern, std::size_t times) {
+        SituationText text = named("a");
+        text.when.assign(times, std::string("ENTRYDESC matches '") + pattern + "'");
+        SituationConfig situation;
+        std::vector<std::string> texts;
+        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+            texts.push_back(problem.fieldText() + ": " + problem.what);
+        }
+        if (texts.empty()) {
+            EXPECT_GT(situation.patternSize, 0u);
+            EXPECT_LE(situation.patternSize, PatternBudget::ofSituation);
+        }
+        return texts;
+    };
+    EXPECT_THAT(problemsOf("Failed password .* from [0-9a-f.:]+", 100), IsEmpty());
+    EXPECT_THAT(problemsOf("\\pL{400}", 1),
+                ElementsAre(HasSubstr("'\\pL{400}' is too large a regular expression")));
+    EXPECT_THAT(problemsOf(".{1000}.{1000}", 1), ElementsAre(HasSubstr("is too large")));
+    const std::vector<std::string> many = problemsOf("\\pL{400}", 100);
+    ASSERT_EQ(many.size(), 100u);
+    EXPECT_THAT(many[1], HasSubstr("is too large a regular expression"));
+    const std::string spent = "the regular expressions before this one are as large as all of "
+                              "them may be together";
+    EXPECT_THAT(many[2], HasSubstr(spent)) << "not even compiled";
+    const std::vector<std::string> together = problemsOf("\\pL{8}", 4);
+    ASSERT_EQ(together.size(), 2u);
+    EXPECT_THAT(together[0], HasSubstr("when[2]: "));
+    EXPECT_THAT(together[0],
+                HasSubstr("with this one the regular expressions are too large together"));
+    EXPECT_THAT(together[1], HasSubstr(spent));
+}
+
+TEST(SituationValidator, RefusesThresholdsThatHaveNoEffect) {
+    const auto refused = [](std::vector<std::string> when) {
+        SituationText text = named("a");
+        text.when = std::move(when);
+        SituationConfig situation;
+        std::vector<std::string> texts;
+        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+            texts.push_back(problem.fieldText() + ": " + problem.what + "; " + problem.cure);
+        }
+        return texts;
+    };
+    const std::string period = "PERIODTHRS = 60";
+    const std::string noFrequency =
+        "when[0]: the condition on FREQTHRESH states no frequency that can be reached; write >=, "
+        ">, <= or < and a number of entries, for example FREQTHRESH >= 5";
+    for (const char* const condition :
+         {"FREQTHRESH = 3", "FREQTHRESH != 3", "FREQTHRESH in [3]", "FREQTHRESH < 1",
+          "FREQTHRESH >= 0", "FREQTHRESH > -1", "FREQTHRESH <= 0", "FREQTHRESH > 2147483647"}) {
+        EXPECT_THAT(refused({condition, period}), ElementsAre(noFrequency)) << condition;
+    }
+    for (const char* const condition :
+         {"PERIODTHRS = 0", "PERIODTHRS = -1", "PERIODTHRS >= 60", "PERIODTHRS in [60]"}) {
+        EXPECT_THAT(refused({"FREQTHRESH >= 5", condition}),
+                    ElementsAre("when[1]: the condition on PERIODTHRS states no period; write = "
+                                "and a number of seconds from 1, for example PERIODTHRS = 60"))
+            << condition;
+    }
+    EXPECT_THAT(refused({"ENTRYSRC = 'x'", period}),
+                ElementsAre("when[1]: PERIODTHRS has no effect without FREQTHRESH; add FREQTHRESH "
+                            ">= 5"));
+    EXPECT_THAT(refused({"FREQTHRESH > 0"}),
+                ElementsAre("when[0]: FREQTHRESH has no effect without PERIODTHRS; add PERIODTHRS "
+                            "= 60"));
+    EXPECT_THAT(refused({"FREQTHRESH >= 5", period, "FREQTHRESH <= 9"}),
+                ElementsAre("when[2]: a second condition on FREQTHRESH has no effect; leave it "
+                            "out"));
+    EXPECT_THAT(refused({"FREQTHRESH > 0", period}), IsEmpty());
+    EXPECT_THAT(refused({"FREQTHRESH < 2", period}), IsEmpty());
+}
+
 } // namespace

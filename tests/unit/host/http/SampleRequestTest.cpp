@@ -99,6 +99,18 @@ TEST(SampleRequest, RefusesUnusableValues) {
               "filters[0].column: 'COLOUR' is no column; th");
 }
 
+TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
+    std::string filters;
+    for (int count = 0; count < 3; ++count) {
+        filters += filters.empty() ? "" : ",";
+        filters += R"({"column":"LOGNAME","op":"matches","value":"\\pL{8}"})";
+    }
+    const std::string problem = refused(R"({"filters":[)" + filters + "]}");
+    EXPECT_TRUE(problem.starts_with("filters[2].value: with this one the regular expressions are "
+                                    "too large together; "))
+        << problem;
+}
+
 TEST(SampleRequest, AReportNamesItsLogAndItsWindow) {
     const std::string path = R"({"column":"LOGPATH","op":"=","value":"/var/log/"})";
     const std::string name = R"({"column":"LOGNAME","op":"=","value":"auth.log"})";

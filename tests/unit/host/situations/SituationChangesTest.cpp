@@ -101,6 +101,20 @@ TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
     EXPECT_FALSE(set->find("a"));
 }
 
+TEST_F(SituationChanges, HaveALimitForTheirRegularExpressionsTogether) {
+    SituationConfig large = situation("a");
+    large.patternSize = PatternBudget::ofSource / 2 + 1;
+    EXPECT_EQ(done(set->add(large)).state, SituationStatus::RUNNING);
+    large.name = "b";
+    EXPECT_EQ(refused(set->add(large)), SituationRefusal::TOO_MANY);
+    EXPECT_THAT(names(), ElementsAre("a"));
+    EXPECT_EQ(done(set->add(situation("b"))).state, SituationStatus::RUNNING);
+    EXPECT_EQ(refused(set->replace(large)), SituationRefusal::TOO_MANY);
+    EXPECT_EQ(set->find("b")->config.patternSize, 0u);
+    EXPECT_FALSE(set->remove("a"));
+    EXPECT_EQ(done(set->replace(large)).state, SituationStatus::RUNNING);
+}
+
 TEST_F(SituationChanges, OutliveTheProcess) {
     set->apply({situation("filed")});
     set->add(situation("a"));
