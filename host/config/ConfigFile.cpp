@@ -5,17 +5,19 @@
 #include "host/config/ConfigSection.h"
 #include "host/config/SinkReader.h"
 #include "host/config/SituationReader.h"
+#include "host/config/TomlNesting.h"
 #include "host/framework/TraceLevels.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstdio>
 #include <limits>
-#include <memory>
 #include <optional>
 #include <utility>
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <toml++/toml.h>
 
@@ -63,34 +65,43 @@ void readAgent(const toml::table& table, ConfigProblems& problems, HostConfig& c
     section.refuseUnknownKeys();
 }
 
-void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
-    ConfigSection section("http", table, problems);
+/// An absolute path; the target is left alone where the key is missing.
+void readPath(ConfigSection& section, std::string_view key, std::string& target) {
+    if (const std::optional<std::string> path = section.text(key)) {
+        requireAbsolute(section, key, *path);
+        target = *path;
+    }
+}
+
+/// What a client of the agent needs of [http].
+void readHttpAccess(ConfigSection& section, HttpConfig& http) {
     const std::string listen = section.text("listen").value_or("127.0.0.1:7186");
     if (!listen.empty()) {
-        config.http.listen = ListenAddress::parse(listen);
-        if (!config.http.listen) {
+        http.listen = ListenAddress::parse(listen);
+        if (!http.listen) {
             section.problem("listen", "'" + listen + "' is no address to listen at",
                             "write ADDRESS:PORT, for example \"127.0.0.1:7186\", or \"\" for none");
-        } else if (!config.http.listen->isLoopback() && !section.has("certificate")) {
-            section.problem("listen", "'" + listen + "' can be reached from other machines",
-                            "write a loopback address (127.0.0.1, [::1] or localhost), or add "
-                            "certificate and key, so that TLS is spoken");
         }
     }
-    for (const auto& [key, path] :
-         {std::pair{"certificate", &config.http.certificate}, std::pair{"key", &config.http.key}}) {
-        if (const std::optional<std::string> file = section.text(key)) {
-            requireAbsolute(section, key, *file);
-            *path = *file;
-        }
+    readPath(section, "certificate", http.certificate);
+    readPath(section, "token_file", http.tokenFile);
+}
+
+void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("http", table, problems);
+    readHttpAccess(section, config.http);
+    const std::optional<ListenAddress>& listen = config.http.listen;
+    if (listen && !listen->isLoopback() && !section.has("certificate")) {
+        section.problem("listen",
+                        "'" + section.text("listen").value_or("") +
+                            "' can be reached from other machines",
+                        "write a loopback address (127.0.0.1, [::1] or localhost), or add "
+                        "certificate and key, so that TLS is spoken");
     }
+    readPath(section, "key", config.http.key);
     if (section.has("certificate") != section.has("key")) {
         section.problem(section.has("key") ? "key" : "certificate", "stands alone",
                         "give both certificate and key, or neither");
-    }
-    if (const std::optional<std::string> file = section.text("token_file")) {
-        requireAbsolute(section, "token_file", *file);
-        config.http.tokenFile = *file;
     }
     section.refuseUnknownKeys();
 }
@@ -114,10 +125,7 @@ void readHistory(const toml::table& table, ConfigProblems& problems, HostConfig&
     ConfigSection section("history", table, problems);
     HistoryConfig& history = config.history;
     history.enabled = section.truth("enabled").value_or(history.enabled);
-    if (const std::optional<std::string> directory = section.text("directory")) {
-        requireAbsolute(section, "directory", *directory);
-        history.directory = *directory;
-    }
+    readPath(section, "directory", history.directory);
     history.keepDays = readBounded(section, "keep_days", 1, mostDays).value_or(history.keepDays);
     if (const auto events = readBounded(section, "keep_events", 1, mostEvents)) {
         history.keepEvents = static_cast<std::uint64_t>(*events);
@@ -127,10 +135,7 @@ void readHistory(const toml::table& table, ConfigProblems& problems, HostConfig&
 
 void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
     ConfigSection section("", file, problems);
-    if (const std::optional<std::string> directory = section.text("state_directory")) {
-        requireAbsolute(section, "state_directory", *directory);
-        config.stateDirectory = *directory;
-    }
+    readPath(section, "state_directory", config.stateDirectory);
     if (const toml::table* const agent = section.table("agent")) {
         readAgent(*agent, problems, config);
     }
@@ -156,39 +161,81 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
     section.refuseUnknownKeys();
 }
 
-/// The content of a file, or the error number that says why there is none.
-std::variant<std::string, int> content(const std::string& path) {
-    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(std::fopen(path.c_str(), "re"),
-                                                                 &std::fclose);
+void readAccess(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("", file, problems);
+    readPath(section, "state_directory", config.stateDirectory);
+    if (const toml::table* const table = section.table("http")) {
+        ConfigSection http("http", *table, problems);
+        readHttpAccess(http, config.http);
+    }
+}
+
+/// Why a file has no content that can be used.
+std::string unreadable(int number) {
+    const ErrorText error(number);
+    return std::string("cannot be read: ") + error.text();
+}
+
+/// Reads an open file into the text, which must be a regular one: a pipe could keep the reader
+/// waiting for ever. Returns what is wrong, empty when nothing is.
+std::string readContent(int fd, std::string& text) {
     struct stat status {};
-    if (stream == nullptr || fstat(fileno(stream.get()), &status) != 0) {
-        return errno;
+    std::string problem;
+    if (fstat(fd, &status) != 0) {
+        problem = unreadable(errno);
+    } else if (!S_ISREG(status.st_mode)) {
+        problem = S_ISDIR(status.st_mode) ? unreadable(EISDIR) : "is not a regular file";
     }
-    if (S_ISDIR(status.st_mode)) {
-        return EISDIR;
-    }
-    std::string text;
     char buffer[65536];
-    while (const std::size_t count = std::fread(buffer, 1, sizeof buffer, stream.get())) {
-        text.append(buffer, count);
+    ssize_t count = 0;
+    while (problem.empty() && (count = read(fd, buffer, sizeof buffer)) > 0) {
+        text.append(buffer, static_cast<std::size_t>(count));
         if (text.size() > largestFile) {
-            return EFBIG;
+            problem = unreadable(EFBIG);
         }
     }
-    if (std::ferror(stream.get()) != 0) {
-        return errno;
+    return count == -1 ? unreadable(errno) : problem;
+}
+
+/// The content of a file; meaningless when a problem was noted.
+std::string readContent(const std::string& path, ConfigProblems& problems) {
+    std::string text;
+    const int fd = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    const std::string problem = fd == -1 ? unreadable(errno) : readContent(fd, text);
+    if (fd != -1) {
+        close(fd);
+    }
+    if (!problem.empty()) {
+        problems.add(0, "", problem, "make it a file that the agent may read, of at most 4 MiB");
     }
     return text;
 }
 
-} // namespace
+/// Notes why a text that was read while the file is in use cannot be the whole file.
+void checkWhole(std::string_view text, ConfigProblems& problems) {
+    if (text.find_first_not_of(" \t\r\n") == std::string_view::npos) {
+        problems.add(0, "", "is empty", "write the configuration into it again");
+    } else if (text.back() != '\n') {
+        const auto lines = std::count(text.begin(), text.end(), '\n');
+        problems.add(static_cast<unsigned>(lines) + 1, "", "the file ends within this line",
+                     "write the rest of it, or end the line");
+    }
+}
 
-ConfigFile::Result ConfigFile::parse(std::string_view text, const std::string& path) {
+using Reading = void(const toml::table& file, ConfigProblems& problems, HostConfig& config);
+
+ConfigFile::Result parsed(std::string_view text, const std::string& path, Reading* read) {
     ConfigProblems problems(path);
+    if (const std::optional<unsigned> line = TomlNesting::tooDeepAt(text)) {
+        const std::string most = std::to_string(TomlNesting::deepest);
+        problems.add(*line, "", "names or brackets are nested deeper than " + most,
+                     "write at most " + most + " levels");
+        return problems.texts();
+    }
     try {
         const toml::table file = toml::parse(text);
         HostConfig config;
-        readFile(file, problems, config);
+        read(file, problems, config);
         if (problems.none()) {
             return config;
         }
@@ -199,14 +246,34 @@ ConfigFile::Result ConfigFile::parse(std::string_view text, const std::string& p
     return problems.texts();
 }
 
+} // namespace
+
+ConfigFile::Result ConfigFile::parse(std::string_view text, const std::string& path) {
+    return parsed(text, path, readFile);
+}
+
 ConfigFile::Result ConfigFile::load(const std::string& path) {
-    const auto text = content(path);
-    if (const auto* const number = std::get_if<int>(&text)) {
-        const ErrorText error(*number);
-        ConfigProblems problems(path);
-        problems.add(0, "", std::string("cannot be read: ") + error.text(),
-                     "make it a file that the agent may read, of at most 4 MiB");
+    ConfigProblems problems(path);
+    const std::string text = readContent(path, problems);
+    return problems.none() ? parse(text, path) : problems.texts();
+}
+
+ConfigFile::Result ConfigFile::loadAccess(const std::string& path) {
+    ConfigProblems problems(path);
+    const std::string text = readContent(path, problems);
+    return problems.none() ? parsed(text, path, readAccess) : problems.texts();
+}
+
+ConfigFile::Result ConfigFile::reload(const std::string& path) {
+    ConfigProblems problems(path);
+    const std::string text = readContent(path, problems);
+    if (!problems.none()) {
         return problems.texts();
     }
-    return parse(std::get<std::string>(text), path);
+    Result result = parse(text, path);
+    checkWhole(text, problems);
+    if (std::holds_alternative<HostConfig>(result) && !problems.none()) {
+        return problems.texts();
+    }
+    return result;
 }

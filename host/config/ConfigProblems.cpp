@@ -7,6 +7,10 @@ ConfigProblems::ConfigProblems(std::string file) : m_file(std::move(file)) {}
 
 void ConfigProblems::add(unsigned line, const std::string& key, const std::string& what,
                          const std::string& cure) {
+    if (m_problems.size() == mostTexts) {
+        ++m_more;
+        return;
+    }
     std::string text = m_file + ':';
     if (line > 0) {
         text += std::to_string(line) + ':';
@@ -26,6 +30,10 @@ std::vector<std::string> ConfigProblems::texts() const {
     texts.reserve(sorted.size());
     for (const Problem& problem : sorted) {
         texts.push_back(problem.text);
+    }
+    if (m_more > 0) {
+        texts.push_back(m_file + ": " + std::to_string(m_more) +
+                        " more problems; correct those above first");
     }
     return texts;
 }

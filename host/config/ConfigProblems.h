@@ -16,7 +16,8 @@ public:
              const std::string& cure);
 
     bool none() const noexcept { return m_problems.empty(); }
-    /// "FILE:LINE: KEY: WHAT; CURE" for every problem, in the order of the lines.
+    /// "FILE:LINE: KEY: WHAT; CURE" for each of the first problems that were added, in the order of
+    /// the lines, and how many more there are.
     std::vector<std::string> texts() const;
 
 private:
@@ -25,8 +26,11 @@ private:
         std::string text;
     };
 
+    static constexpr std::size_t mostTexts = 100;
+
     const std::string m_file;
     std::vector<Problem> m_problems;
+    std::size_t m_more = 0; ///< that are only counted
 };
 
 #endif

@@ -5,16 +5,22 @@
 
 #include <atomic>
 
+/// How the last change of the configuration file went. Written by one thread, read by any.
+struct ConfigReload {
+    std::atomic<bool> isTakenOver{true};     ///< false: the file cannot be used as it is
+    std::atomic<bool> hasRemovedMost{false}; ///< more than half of the file's situations
+};
+
 /// Whether the agent's situations are those of its configuration file.
 class ConfigMetrics : public MetricSource {
 public:
-    /// `isTakenOver`, which outlives the object, is false while the file cannot be used as it is.
-    explicit ConfigMetrics(const std::atomic<bool>& isTakenOver) : m_isTakenOver(isTakenOver) {}
+    /// The reload outlives the object.
+    explicit ConfigMetrics(const ConfigReload& reload) : m_reload(reload) {}
 
     void collect(MetricText& text) override;
 
 private:
-    const std::atomic<bool>& m_isTakenOver;
+    const ConfigReload& m_reload;
 };
 
 #endif

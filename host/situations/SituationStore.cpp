@@ -27,6 +27,8 @@ using nlohmann::json;
 using Content = SituationStore::Content;
 
 constexpr int version = 1;
+constexpr int deepest = 8;                             ///< nesting of the file
+constexpr std::size_t largestFile = 128 * 1024 * 1024; ///< bytes
 constexpr mode_t fileMode = 0640;
 
 std::string because(const std::string& what, int number) {
@@ -46,20 +48,30 @@ bool writeAll(int fd, std::string_view text) {
     return fsync(fd) == 0;
 }
 
-/// Reads the whole file; 0 or the error's number.
+/// Reads the whole file; 0 or the error's number. A pipe in the file's place keeps nobody waiting.
 int readAll(const std::string& path, std::string& text) {
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
     if (fd == -1) {
         return errno;
     }
     char buffer[65536];
     ssize_t count = 0;
-    while ((count = read(fd, buffer, sizeof buffer)) > 0 || (count == -1 && errno == EINTR)) {
+    while (text.size() <= largestFile &&
+           ((count = read(fd, buffer, sizeof buffer)) > 0 || (count == -1 && errno == EINTR))) {
         text.append(buffer, static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
     }
-    const int number = count == -1 ? errno : 0;
+    const int number = count == -1 ? errno : text.size() > largestFile ? EFBIG : 0;
     close(fd);
     return number;
+}
+
+struct TooDeep {};
+
+/// Parses a text. The parser takes any depth, but what it gives is copied and printed recursively.
+json documentOf(const std::string& text) {
+    return json::parse(text, [](int depth, json::parse_event_t, const json&) {
+        return depth <= deepest ? true : throw TooDeep();
+    });
 }
 
 /// A rename lasts only once its directory is on the disk.
@@ -80,7 +92,7 @@ std::optional<std::string> optionalText(const json& object, const char* key) {
     return found->get<std::string>();
 }
 
-SituationStore::Made madeFrom(const json& object) {
+SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     SituationText text;
     text.name = object.at("name").get<std::string>();
     text.text = optionalText(object, "text");
@@ -91,17 +103,19 @@ SituationStore::Made madeFrom(const json& object) {
     text.period = optionalText(object, "period");
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
-    for (const SituationProblem& problem : SituationValidator::check(text, made.config)) {
+    for (const SituationProblem& problem :
+         SituationValidator::check(text, made.config, patterns.ofNext())) {
         made.problem += (made.problem.empty() ? "" : "; ") + problem.fieldText() + ": " +
                         problem.what + "; " + problem.cure;
     }
+    patterns.spend(made.config.patternSize);
     return made;
 }
 
 /// The content of a file's text; `reason` says why there is none.
 std::optional<Content> contentOf(const std::string& text, std::string& reason) {
     try {
-        const json document = json::parse(text);
+        const json document = documentOf(text);
         if (const json& number = document.at("version"); number != version) {
             reason =
                 "its version is " + number.dump() + ", this agent's is " + std::to_string(version);
@@ -109,8 +123,9 @@ std::optional<Content> contentOf(const std::string& text, std::string& reason) {
         }
         Content content;
         std::set<std::string> names;
+        PatternBudget patterns(PatternBudget::ofSource);
         for (const json& object : document.at("situations")) {
-            content.made.push_back(madeFrom(object));
+            content.made.push_back(madeFrom(object, patterns));
             if (!names.insert(content.made.back().config.name).second) {
                 reason = "a name comes twice";
                 return std::nullopt;
@@ -118,10 +133,12 @@ std::optional<Content> contentOf(const std::string& text, std::string& reason) {
         }
         content.stoppedFiles = document.at("stopped").get<std::vector<std::string>>();
         return content;
+    } catch (const TooDeep&) {
+        reason = "it is nested too deep";
     } catch (const json::exception&) {
         reason = "it is damaged";
-        return std::nullopt;
     }
+    return std::nullopt;
 }
 
 nlohmann::ordered_json jsonOf(const Content& content) {
@@ -184,7 +201,12 @@ std::string SituationStore::save(const Content& content) {
     if (!m_blocked.empty()) {
         return m_blocked;
     }
-    std::string problem = replace(SituationJson::text(jsonOf(content)) + '\n');
+    const std::string text = SituationJson::text(jsonOf(content)) + '\n';
+    std::string problem = text.size() <= largestFile
+                              ? replace(text)
+                              : "they have " + std::to_string(text.size()) +
+                                    " bytes, and at most " + std::to_string(largestFile) +
+                                    " can be read again";
     if (!problem.empty()) {
         trace.error()("The situations cannot be saved: %s.", problem.c_str());
     }

@@ -5,7 +5,10 @@
 #include "host/framework/Tables.h"
 #include "host/start/Say.h"
 
+#include <algorithm>
 #include <cstdlib>
+#include <set>
+#include <string_view>
 #include <utility>
 #include <variant>
 
@@ -20,6 +23,17 @@ constexpr std::chrono::seconds endLimit{5};
 
 /// The log manager's first refresh is done within the first of these.
 constexpr int ticksUntilNoLogs = 2;
+
+/// How many situations of a configuration the next one names no more.
+std::size_t removedSituations(const HostConfig& before, const HostConfig& now) {
+    std::set<std::string_view> names;
+    for (const SituationConfig& situation : now.situations) {
+        names.insert(situation.name);
+    }
+    return static_cast<std::size_t>(std::count_if(
+        before.situations.begin(), before.situations.end(),
+        [&](const SituationConfig& situation) { return !names.contains(situation.name); }));
+}
 
 } // namespace
 
@@ -125,7 +139,7 @@ void Host::tick(int number) {
 
 void Host::reload() {
     TraceScope trace(anchor);
-    ConfigFile::Result result = ConfigFile::load(m_file.path());
+    ConfigFile::Result result = ConfigFile::reload(m_file.path());
     if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
         for (const std::string& problem : *problems) {
             say("%s", problem.c_str());
@@ -136,7 +150,14 @@ void Host::reload() {
     }
     HostConfig& config = std::get<HostConfig>(result);
     trace.detail()("%s taken over.", m_file.path().c_str());
-    m_serving->apply(config.situations);
+    const std::size_t removed = removedSituations(m_config, config);
+    const bool removesMost = removed > m_config.situations.size() / 2;
+    if (removesMost) {
+        say("%s: %zu of %zu situations are gone and raise nothing any more; if the file was cut "
+            "off, write it again",
+            m_file.path().c_str(), removed, m_config.situations.size());
+    }
+    m_serving->apply(config.situations, removesMost);
     if (config.environment != m_config.environment || config.http != m_config.http ||
         config.sinks != m_config.sinks || config.history != m_config.history ||
         config.stateDirectory != m_config.stateDirectory) {

@@ -16,7 +16,6 @@
 #include "host/http/LogsResource.h"
 #include "host/http/ReportResource.h"
 #include "host/http/SampleResource.h"
-#include "host/metrics/ConfigMetrics.h"
 #include "host/metrics/DeliveryMetrics.h"
 #include "host/metrics/HttpMetrics.h"
 #include "host/metrics/LogMetrics.h"
@@ -86,9 +85,10 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
     addResources(entries);
 }
 
-void Serving::apply(const std::vector<SituationConfig>& situations) {
+void Serving::apply(const std::vector<SituationConfig>& situations, bool removesMost) {
     m_situations.apply(situations);
-    m_isConfigTakenOver.store(true);
+    m_reload.hasRemovedMost.store(removesMost);
+    m_reload.isTakenOver.store(true);
 }
 
 void Serving::tick() {
@@ -119,7 +119,7 @@ void Serving::addResources(TableManager& entries) {
 void Serving::addMetrics(const EventStream& stream) {
     auto metrics = std::make_unique<MetricsResource>();
     metrics->add(std::make_unique<ProcessMetrics>());
-    metrics->add(std::make_unique<ConfigMetrics>(m_isConfigTakenOver));
+    metrics->add(std::make_unique<ConfigMetrics>(m_reload));
     metrics->add(std::make_unique<LogMetrics>());
     metrics->add(std::make_unique<SituationMetrics>(m_situations));
     metrics->add(std::make_unique<DeliveryMetrics>(m_delivery));

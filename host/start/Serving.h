@@ -8,10 +8,10 @@
 #include "host/http/Resource.h"
 #include "host/http/Router.h"
 #include "host/http/TableSampler.h"
+#include "host/metrics/ConfigMetrics.h"
 #include "host/situations/SituationSet.h"
 #include "host/start/Descriptors.h"
 
-#include <atomic>
 #include <chrono>
 #include <memory>
 #include <optional>
@@ -38,11 +38,11 @@ public:
     /// everything else goes on.
     void startHttp(const HostConfig& config);
 
-    /// Exchanges the situations.
-    void apply(const std::vector<SituationConfig>& situations);
+    /// Exchanges the situations. `removesMost`: more than half of those before are gone.
+    void apply(const std::vector<SituationConfig>& situations, bool removesMost);
 
     /// The configuration file has changed and cannot be used as it is now. Any thread.
-    void noteUnusableConfig() noexcept { m_isConfigTakenOver.store(false); }
+    void noteUnusableConfig() noexcept { m_reload.isTakenOver.store(false); }
 
     /// What is done about once a second.
     void tick();
@@ -76,7 +76,7 @@ private:
     Descriptors m_descriptors;
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
-    std::atomic<bool> m_isConfigTakenOver{true};
+    ConfigReload m_reload;
     TableSampler m_sampler;
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP

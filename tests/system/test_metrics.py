@@ -127,6 +127,33 @@ def test_a_configuration_that_cannot_be_taken_over_is_seen(agent, serving):
     wait_until(lambda: successful() == 1, "the configuration to be taken over")
 
 
+def test_a_file_that_loses_most_situations_is_seen(agent):
+    log = agent.log()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    whole = agent.zrm_toml.read_text(encoding="utf-8")
+    lost = lambda: value(metrics(api), "zrm_config_last_reload_removed_most_situations")
+    running = lambda: metrics(api).count("zrm_situation_running{")
+
+    def change(names, outcome):
+        situations = (f"\n[[situation]]\nname = '{name}'\nlog = '{log}'\n" for name in names)
+        agent.zrm_toml.write_text(whole + "".join(situations), encoding="utf-8")
+        wait_until(lambda: running() == len(names), f"the situations {names}")
+        assert lost() == outcome
+
+    assert lost() == 0
+    change("abc", 0)
+    change("ab", 0)
+    change("b", 0)  # one of two is not more than half
+    change("wxyz", 1)
+    change("w", 1)
+    agent.zrm_toml.write_text("")
+    agent.wait_trace("is empty; write the configuration into it again")
+    assert (running(), lost()) == (1, 1)
+    change("wv", 0)
+
+
 def test_metrics_need_the_token(serving):
     _, api = serving
     status, _, _ = api.request("GET", "/metrics", headers={"Authorization": None})

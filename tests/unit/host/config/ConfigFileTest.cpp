@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+#include <sys/stat.h>
+
 namespace {
 
 using testing::ElementsAre;
@@ -143,7 +145,7 @@ keep_days = 30
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
-            "key, token_file",
+            "token_file, key",
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period",
@@ -328,6 +330,98 @@ TEST(ConfigFile, ThresholdsMayStandAmongTheConditions) {
     const HostConfig config =
         accepted("[[situation]]\nname = 'a'\nwhen = ['FREQTHRESH >= 5', 'PERIODTHRS = 60']\n");
     EXPECT_EQ(config.situations.at(0).conditions.size(), 2u);
+}
+
+std::string repeated(const std::string& text, int times) {
+    std::string all;
+    for (int i = 0; i < times; ++i) {
+        all += text;
+    }
+    return all;
+}
+
+TEST(ConfigFile, TextsOfAnyDepthAreRefused) {
+    constexpr int deep = 200'000;
+    const std::string name = repeated("a.", deep) + "a";
+    for (const std::string& text :
+         {name + " = 1\n", "[" + name + "]\n", "[[" + name + "]]\n", "x = {" + name + " = 1}\n",
+          repeated("'a' . ", deep) + "a = 1\n", "x = " + repeated("[", deep) + "\n",
+          "x = " + repeated("{a=", deep) + "\n", "x = \"\"\"a\"\"\"\"\"\n" + name + " = 1\n",
+          "x = '''a''''\n" + name + " = 1\n", "x = \"\\\"\"\n" + name + " = 1\n",
+          "x = '\\'\n" + name + " = 1\n", "# \"\n" + name + " = 1\n"}) {
+        const std::vector<std::string> problems = refused(text);
+        ASSERT_EQ(problems.size(), 1u) << text.substr(0, 40);
+        EXPECT_THAT(problems[0],
+                    testing::MatchesRegex("zrm.toml:[12]: names or brackets are nested "
+                                          "deeper than 32; write at most 32 levels"))
+            << text.substr(0, 40);
+    }
+}
+
+TEST(ConfigFile, WhatStandsInTextsAndCommentsIsNotNested) {
+    const std::string brackets = repeated("[{.", 100);
+    const HostConfig config =
+        accepted("# " + brackets + "\n[[situation]]\nname = \"\\\"" + repeated("[.", 50) +
+                 "\"\ntext = '''" + brackets + "\n''" + brackets + "'''''\n");
+    EXPECT_EQ(config.situations.at(0).name, "\"" + repeated("[.", 50));
+    EXPECT_EQ(config.situations.at(0).text, brackets + "\n''" + brackets + "''");
+}
+
+TEST(ConfigFile, OfVeryManyProblemsTheFirstAreNamed) {
+    const std::vector<std::string> problems = refused(repeated("[[situation]]\n", 1000));
+    ASSERT_EQ(problems.size(), 101u);
+    EXPECT_EQ(problems[99], "zrm.toml:100: situation.name: is missing; give the situation a name");
+    EXPECT_EQ(problems[100], "zrm.toml: 900 more problems; correct those above first");
+}
+
+TEST(ConfigFile, AReloadTakesNoFileThatIsCutOff) {
+    const TemporaryDirectory directory;
+    const auto reloaded = [&](const std::string& text) {
+        const std::string path = directory.write("zrm.toml", text);
+        const ConfigFile::Result result = ConfigFile::reload(path);
+        const auto* const problems = std::get_if<std::vector<std::string>>(&result);
+        return problems == nullptr ? "" : problems->front().substr(path.size());
+    };
+    const std::string whole = "[[situation]]\nname = 'a'\n";
+    EXPECT_EQ(reloaded(whole), "");
+    EXPECT_EQ(reloaded("# nothing\n"), "");
+    for (const char* const text : {"", "\n", " \r\n\t"}) {
+        EXPECT_EQ(reloaded(text), ": is empty; write the configuration into it again");
+    }
+    for (const char* const rest : {"severity = 'major'", "# cut o"}) {
+        EXPECT_EQ(reloaded(whole + rest),
+                  ":3: the file ends within this line; write the rest of it, or end the line");
+    }
+}
+
+TEST(ConfigFile, APipeIsNotRead) {
+    const TemporaryDirectory directory;
+    const std::string path = directory.file("zrm.toml");
+    ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
+    const ConfigFile::Result result = ConfigFile::load(path);
+    ASSERT_TRUE(std::holds_alternative<std::vector<std::string>>(result));
+    EXPECT_THAT(std::get<std::vector<std::string>>(result),
+                ElementsAre(path + ": is not a regular file; make it a file that the agent may "
+                                   "read, of at most 4 MiB"));
+}
+
+TEST(ConfigFile, TheRegularExpressionsOfAFileHaveALimitTogether) {
+    // Each situation takes more than two thirds of what one may take.
+    const std::string pattern = "\"ENTRYDESC matches '[^,]{800}'\"";
+    const auto file = [&](int situations) {
+        std::string text;
+        for (int number = 0; number < situations; ++number) {
+            text += "[[situation]]\nname = '" + std::to_string(number) + "'\nwhen = [" + pattern +
+                    ", " + pattern + "]\n";
+        }
+        return text;
+    };
+    EXPECT_EQ(accepted(file(50)).situations.size(), 50u);
+    const std::vector<std::string> problems = refused(file(100));
+    ASSERT_FALSE(problems.empty());
+    EXPECT_THAT(problems.back(),
+                testing::HasSubstr("the regular expressions before this one are as large as all of "
+                                   "them may be together"));
 }
 
 TEST(ConfigFile, NamesThePlaceWhereTheSyntaxBreaks) {

@@ -79,6 +79,39 @@ TEST_F(SituationStoreTest, GivesBackWhatWasSaved) {
     EXPECT_EQ(status.st_mode & S_IRWXO, 0u);
 }
 
+TEST_F(SituationStoreTest, AFileOfAnyDepthIsMovedAside) {
+    constexpr std::size_t deep = 300'000;
+    const std::string nested = std::string(deep, '[') + std::string(deep, ']');
+    for (const std::string& content :
+         {"{\"version\": " + nested + "}",
+          "{\"version\": 1, \"situations\": " + nested + ", \"stopped\": []}", nested}) {
+        std::ofstream(file) << content;
+        message.clear();
+        EXPECT_THAT(SituationStore(file).load(message).made, IsEmpty());
+        EXPECT_THAT(message, HasSubstr(file + " cannot be used (it is nested too deep)"));
+    }
+}
+
+TEST_F(SituationStoreTest, APipeInItsPlaceIsNotWaitedFor) {
+    ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
+    EXPECT_THAT(store.load(message).made, IsEmpty());
+    EXPECT_THAT(message, HasSubstr("cannot be used"));
+}
+
+TEST_F(SituationStoreTest, TooLargeRegularExpressionsAreKeptAndDoNotRun) {
+    ASSERT_EQ(store.save(content()), "");
+    std::string stored = text();
+    const std::string small = R"([\"\\\\])";
+    for (std::size_t at = 0; (at = stored.find(small, at)) != std::string::npos;) {
+        stored.replace(at, small.size(), R"(\\pL{400})");
+    }
+    std::ofstream(file) << stored;
+    const SituationStore::Content loaded = SituationStore(file).load(message);
+    ASSERT_EQ(loaded.made.size(), 2u);
+    EXPECT_THAT(loaded.made[0].problem, HasSubstr("'\\pL{400}' is too large a regular expression"));
+    EXPECT_EQ(loaded.made[0].config.when.at(1), "ENTRYDESC matches '\\pL{400}'");
+}
+
 TEST_F(SituationStoreTest, IsEmptyWithoutAFile) {
     EXPECT_THAT(store.load(message).made, IsEmpty());
     EXPECT_EQ(message, "");

@@ -244,7 +244,8 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
             errorsToFile();
             std::thread([this] {
                 arrive(1);
-                write(sink() + "[[situation]]\nname = 'a'\n[[situation]]\nname = 'b'\n[http]\n");
+                write(sink() +
+                      "[[situation]]\nname = 'every'\n[[situation]]\nname = 'b'\n[http]\n");
                 arrive(2);
                 write("broken");
                 waitForError("not taken over");
@@ -262,6 +263,49 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
                               "start\nzrmagent: " +
                               file + ":1: .*; correct the TOML here\nzrmagent: " + file +
                               " was not taken over; the situations go on as they were\n"));
+}
+
+TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
+    const auto situations = [](const std::string& names) {
+        std::string text;
+        for (const char name : names) {
+            text += std::string("[[situation]]\nname = '") + name + "'\n";
+        }
+        return text;
+    };
+    EXPECT_EXIT(
+        {
+            errorsToFile();
+            std::thread([&, this] {
+                arrive(1);
+                write(sink() + situations("abcd"));
+                arrive(4);
+                write("");
+                waitForError("is empty");
+                arrive(4);
+                write(sink() + situations("a") + "# cut o");
+                waitForError("ends within this line");
+                arrive(4);
+                write(sink() + situations("ab"));
+                arrive(2);
+                write(sink() + situations("bxyz"));
+                arrive(4);
+                write(sink() + situations("b"));
+                waitForError("are gone");
+                arrive(1);
+                stop();
+            }).detach();
+            std::exit(run(situations("a")));
+        },
+        testing::ExitedWithCode(0), "");
+    const std::string file = "zrmagent: " + directory + "/zrm.toml";
+    const std::string kept = file + " was not taken over; the situations go on as they were\n";
+    EXPECT_EQ(errors(),
+              file + ": is empty; write the configuration into it again\n" + kept + file +
+                  ":7: the file ends within this line; write the rest of it, or end the line\n" +
+                  kept + file +
+                  ": 3 of 4 situations are gone and raise nothing any more; if the file was cut "
+                  "off, write it again\n");
 }
 
 TEST_F(HostTest, SaysOnceThatThereIsNoLogToMonitor) {
