@@ -55,7 +55,7 @@ private:
             throw CliError(CLI_FORBIDDEN, "no permission to read " + m_path +
                                               ": use sudo, or join the file's group");
         }
-        ConfigFile::Result result = ConfigFile::load(m_path);
+        ConfigFile::Result result = ConfigFile::loadAccess(m_path);
         if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
             std::string text;
             for (const std::string& problem : *problems) {

@@ -7,7 +7,7 @@
 /// The exit statuses of zrmctl.
 enum CliStatus {
     CLI_DONE = 0,
-    CLI_REFUSED = 1,     ///< refused by the agent or by a check, or nothing was found
+    CLI_REFUSED = 1,     ///< refused by the agent or by a check, nothing found, or something wrong
     CLI_USAGE = 2,       ///< the command line or the configuration cannot be used
     CLI_UNREACHABLE = 3, ///< no agent answers
     CLI_FORBIDDEN = 4,   ///< the token cannot be read, or the agent does not accept it

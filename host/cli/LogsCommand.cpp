@@ -7,6 +7,7 @@
 #include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"
 
+#include <algorithm>
 #include <array>
 
 #include <CLI/CLI.hpp>
@@ -107,6 +108,23 @@ void noteConfiguration(const Json& answer) {
     }
 }
 
+/// Whether the agent reads the log, and the log has a file.
+bool isMonitored(const Json& log) {
+    const Json& row = JsonText::member(log, "row");
+    const Json& size = JsonText::member(row, "LOGSIZE");
+    return JsonText::text(row, "MONSTATUS") == "Running" && size.is_number() &&
+           size.get<std::int64_t>() >= 0;
+}
+
+/// Whether a configured log is not monitored, for whatever reason, or there is none.
+bool isSomethingWrong(const Json& answer) {
+    const Json& logs = JsonText::member(answer, "logs");
+    const Json& configuration = JsonText::member(answer, "configuration");
+    return logs.empty() || !std::all_of(logs.begin(), logs.end(), isMonitored) ||
+           !JsonText::member(answer, "unmonitored").empty() ||
+           !JsonText::text(configuration, "problem").empty();
+}
+
 std::string unmonitoredText(const Json& answer, const Terminal& terminal) {
     Table table({{"NOT MONITORED", Table::PATH}, {"LINE", Table::NUMBER}, {"REASON"}});
     for (const Json& log : JsonText::member(answer, "unmonitored")) {
@@ -122,6 +140,7 @@ std::string unmonitoredText(const Json& answer, const Terminal& terminal) {
 LogsCommand::LogsCommand(CLI::App& program)
     : m_command(program.add_subcommand("logs", "The monitored logs, or everything about one")) {
     m_command->add_option("LOG", m_log, "The whole path of a log");
+    m_command->add_flag("--check", m_check, "End with status 1 when a log is not monitored");
 }
 
 bool LogsCommand::isChosen() const {
@@ -132,11 +151,16 @@ int LogsCommand::run(Context& context) {
     return m_log.empty() ? list(context) : show(context);
 }
 
+int LogsCommand::outcome(bool isWrong) const {
+    return m_check && isWrong ? CLI_REFUSED : CLI_DONE;
+}
+
 int LogsCommand::list(Context& context) {
     const Json answer = context.client().get("/api/v1/logs");
+    const int status = outcome(isSomethingWrong(answer));
     if (context.options().json) {
         context.printJson(answer);
-        return CLI_DONE;
+        return status;
     }
     Table table({{"LOG", Table::PATH},
                  {"TYPE", Table::FIXED},
@@ -159,7 +183,7 @@ int LogsCommand::list(Context& context) {
         return CLI_REFUSED;
     }
     context.print(table.text(context.terminal()) + (unmonitored.empty() ? "" : "\n") + unmonitored);
-    return CLI_DONE;
+    return status;
 }
 
 int LogsCommand::show(Context& context) {
@@ -175,9 +199,10 @@ int LogsCommand::show(Context& context) {
         throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log +
                                         "; 'zrmctl logs' lists what it monitors");
     }
+    const int exitStatus = outcome(!isMonitored(logs.front()));
     if (context.options().json) {
         context.printJson(logs.front());
-        return CLI_DONE;
+        return exitStatus;
     }
     const Json& row = JsonText::member(logs.front(), "row");
     const Json& ledger = JsonText::member(logs.front(), "ledger");
@@ -195,5 +220,5 @@ int LogsCommand::show(Context& context) {
     addLedger(facts, ledger);
     context.print(facts.text(context.terminal()) + rejectedText(ledger, context.terminal()) +
                   skippedText(ledger, context.terminal()));
-    return CLI_DONE;
+    return exitStatus;
 }

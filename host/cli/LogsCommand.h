@@ -16,9 +16,11 @@ public:
 private:
     int list(Context& context);
     int show(Context& context);
+    int outcome(bool isWrong) const;
 
     CLI::App* m_command;
     std::string m_log;
+    bool m_check = false;
 };
 
 #endif

@@ -40,6 +40,24 @@ std::string queueText(const Json& queue) {
                 : "");
 }
 
+/// Whether the history or a sink does not work; says which on standard error.
+bool isSomethingWrong(const Json& status) {
+    bool isWrong = false;
+    const std::string problem = JsonText::text(JsonText::member(status, "history"), "problem");
+    if (!problem.empty()) {
+        Context::note("the history does not work: " + problem);
+        isWrong = true;
+    }
+    for (const Json& sink : JsonText::member(status, "sinks")) {
+        if (JsonText::text(sink, "state") == "failing") {
+            Context::note("the sink " + JsonText::text(sink, "name") +
+                          " fails: " + JsonText::text(sink, "error"));
+            isWrong = true;
+        }
+    }
+    return isWrong;
+}
+
 Colour colourOf(const std::string& state) {
     if (state == "up") {
         return Colour::GOOD;
@@ -50,7 +68,10 @@ Colour colourOf(const std::string& state) {
 } // namespace
 
 StatusCommand::StatusCommand(CLI::App& program)
-    : m_command(program.add_subcommand("status", "How the agent itself fares")) {}
+    : m_command(program.add_subcommand("status", "How the agent itself fares")) {
+    m_command->add_flag("--check", m_check,
+                        "End with status 1 when the history or a sink does not work");
+}
 
 bool StatusCommand::isChosen() const {
     return m_command->parsed();
@@ -58,9 +79,10 @@ bool StatusCommand::isChosen() const {
 
 int StatusCommand::run(Context& context) {
     const Json status = context.client().get("/api/v1/status");
+    const CliStatus outcome = m_check && isSomethingWrong(status) ? CLI_REFUSED : CLI_DONE;
     if (context.options().json) {
         context.printJson(status);
-        return CLI_DONE;
+        return outcome;
     }
     const Json& history = JsonText::member(status, "history");
     FactList facts;
@@ -92,5 +114,5 @@ int StatusCommand::run(Context& context) {
     if (!sinks.empty()) {
         context.print('\n' + sinks.text(context.terminal()));
     }
-    return CLI_DONE;
+    return outcome;
 }

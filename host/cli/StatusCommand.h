@@ -13,6 +13,7 @@ public:
 
 private:
     CLI::App* m_command;
+    bool m_check = false;
 };
 
 #endif

@@ -342,6 +342,45 @@ def test_exit_statuses_tell_what_failed(followed, tmp_path):
     assert errors.startswith(f"zrmctl: cannot reach the agent at http://{agent.listen}: is zrmagent")
 
 
+def test_one_wrong_key_keeps_nobody_from_the_agent(followed, tmp_path):
+    agent, _, _ = followed
+    wrong = tmp_path / "wrong.toml"
+    wrong.write_text("nonsense = 1\n" + agent.zrm_toml.read_text() + "\n[[situation]]\nname = 5\n")
+    assert run(["status", "--config", str(wrong)])[0] == 0
+    assert run(["check", "--host", str(wrong)])[0] == 1
+
+
+def test_check_ends_with_status_1_when_something_is_wrong(agent):
+    log = agent.log()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    access = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", str(api.token_file)]
+    wait_until(lambda: run(["logs", "--check", *access])[0] == 0, "the log to run")
+    assert run(["logs", str(log), "--check", *access])[0] == 0
+    assert run(["status", "--check", *access])[0] == 0
+    log.path.rename(log.path.with_name("elsewhere"))
+    assert run(["logs", *access])[0] == 0
+    assert run(["logs", "--check", *access])[0] == 1
+    code, output, _ = run(["logs", str(log), "--check", "--json", *access])
+    assert code == 1 and json.loads(output)["log"] == str(log)
+
+
+def test_check_names_the_sink_that_fails(agent):
+    log = agent.log()
+    agent.listen = "127.0.0.1:0"
+    agent.situation(log=log)
+    agent.sink = str(log.path.parent / "no" / "such" / "file")
+    agent.start()
+    api = Api(agent)
+    access = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", str(api.token_file)]
+    log.append(syslog_line("one"))
+    wait_until(lambda: run(["status", "--check", *access])[0] == 1, "the sink to fail")
+    assert run(["status", *access])[0] == 0
+    code, _, errors = run(["status", "--check", *access])
+    assert code == 1 and re.search("the sink .* fails: .*No such file", errors), errors
+
+
 def test_the_certificate_of_the_configuration_is_trusted(agent):
     certificate, key = make_certificate(agent.directory)
     agent.log()

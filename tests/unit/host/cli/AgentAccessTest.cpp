@@ -132,15 +132,23 @@ TEST_F(AgentAccessTest, AMissingConfigurationIsTold) {
                                "its address with --url");
 }
 
-TEST_F(AgentAccessTest, EveryProblemOfTheConfigurationIsTold) {
-    write("zrm.toml", "[agnt]\n[http]\nlisten = 5\n");
+TEST_F(AgentAccessTest, WhatTheAgentAloneNeedsMayBeWrong) {
+    write("zrm.toml", "wrong = 1\n[[situation]]\n[history]\ndirectory = 5\n[http]\n"
+                      "listen = '127.0.0.1:7000'\nlisen = ''\nkey = 'x'\n");
+    write("token", "secret\n");
+    options.tokenFile = directory.file("token");
+    EXPECT_EQ(AgentAccess::find(options).url, "http://127.0.0.1:7000");
+}
+
+TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsTold) {
+    write("zrm.toml", "state_directory = 5\n[http]\nlisten = 5\n");
     try {
         AgentAccess::find(options);
         FAIL() << "no error";
     } catch (const CliError& error) {
         EXPECT_EQ(error.status(), CLI_USAGE);
         const std::string text = error.what();
-        EXPECT_NE(text.find("zrm.toml:1: agnt: unknown key"), std::string::npos) << text;
+        EXPECT_NE(text.find("zrm.toml:1: state_directory: "), std::string::npos) << text;
         EXPECT_NE(text.find("\n" + options.config + ":3: http.listen"), std::string::npos) << text;
     }
 }
