@@ -5,5 +5,6 @@
 void HealthResource::addRoutes(Router& router) {
     router.add(
         "GET", "/healthz",
-        [](const HttpRequest&) { return HttpAnswer::json(R"({"status":"ok"})"); }, Router::PUBLIC);
+        [](const HttpRequest&) { return HttpAnswer::json(R"({"status":"ok"})"); }, Router::PUBLIC,
+        Router::QUICK);
 }

@@ -2,27 +2,46 @@
 #define ZRM_HOST_HTTP_ANSWER_H
 
 #include <functional>
-#include <stop_token>
+#include <memory>
 #include <string>
-#include <string_view>
 #include <utility>
 #include <vector>
 
-/// Sends a part of a body to the client. False when the client is gone, or reads too slowly: the
-/// stream ends then. An empty part sends nothing and tells whether the client is there.
-using BodyWriter = std::function<bool(std::string_view)>;
+/// The way of a body to its client while the body comes into being. Any thread; nothing here waits.
+class BodyChannel {
+public:
+    virtual ~BodyChannel() = default;
+
+    /// Hands over the next part. It is kept in memory until the client has taken it, so a writer
+    /// that may have much hands over more only while isReady(). Does nothing once the channel is
+    /// closed.
+    virtual void send(std::string text) = 0;
+
+    /// True when the client has taken everything that was handed over.
+    virtual bool isReady() const = 0;
+
+    /// False when the client has gone, reads too slowly, or the server stops.
+    virtual bool isOpen() const = 0;
+
+    /// The body is over.
+    virtual void end() = 0;
+};
 
 /// The answer to a request.
 struct HttpAnswer {
-    using Stream = std::function<void(const BodyWriter&, const std::stop_token&)>;
+    /// Begins a body that is sent as it comes into being. `changed` may be called whenever the
+    /// channel has become ready or was closed, on a thread that must not be kept waiting.
+    struct Stream {
+        std::function<void(std::shared_ptr<BodyChannel>)> begin;
+        std::function<void()> changed;
+        explicit operator bool() const noexcept { return begin != nullptr; }
+    };
 
     int status = 200;
     std::string contentType = "application/json";
     std::string body;
     std::vector<std::pair<std::string, std::string>> headers = {}; ///< further ones
-    /// In place of `body`, writes one that goes on until the function returns. It returns soon
-    /// after the token asks for it, and runs on the connection's own thread.
-    Stream stream = {};
+    Stream stream = {};                                            ///< in place of `body`
 
     /// An answer of status 200 with a JSON text.
     static HttpAnswer json(std::string text) { return {200, "application/json", std::move(text)}; }

@@ -2,32 +2,35 @@
 #define ZRM_HOST_HTTP_SERVER_H
 
 #include "host/http/ApiToken.h"
-#include "host/http/ConnectionThreads.h"
-#include "host/http/HttpExchange.h"
 #include "host/http/ListenAddress.h"
-#include "host/http/ListenSocket.h"
-#include "host/http/RequestDispatcher.h"
-#include "host/http/Router.h"
-#include "host/http/StopSignal.h"
 #include "host/http/TlsContext.h"
 
-#include <atomic>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <stop_token>
 #include <string>
-#include <thread>
 
-/// Serves the routes of a router over HTTP: connections with their threads and limits. start, stop
-/// and abandon are called by one thread at a time.
+class RequestStatistics;
+class Router;
+
+/// Serves the routes of a router over HTTP, with limits on everything that a client can do. A few
+/// threads do all reading and writing, handlers run on workers. start, renew, stop and abandon are
+/// called by one thread at a time.
 class HttpServer {
 public:
     using Clock = std::chrono::steady_clock;
 
+    /// How many may be served at a time, and how many threads do so.
+    struct Size {
+        std::size_t connections = 2048; ///< fewer where the process may have few descriptors
+        std::size_t workers = 16;
+        std::size_t quickWorkers = 2; ///< for routes on Router::QUICK
+    };
+
     /// `router` outlives the object.
     explicit HttpServer(const Router& router);
+    HttpServer(const Router& router, Size size);
     HttpServer(const HttpServer&) = delete;
     HttpServer& operator=(const HttpServer&) = delete;
     /// Stops the server and waits for its threads.
@@ -38,43 +41,31 @@ public:
     std::string start(const ListenAddress& address, ApiToken token,
                       std::shared_ptr<const TlsContext> tls = nullptr);
 
+    /// From now on requests carry this token, and new connections use this certificate; null where
+    /// the server was started without one. Connections that are open live on.
+    void renew(ApiToken token, std::shared_ptr<const TlsContext> tls);
+
     /// The port at which it listens.
-    std::uint16_t port() const noexcept { return m_listen.port(); }
+    std::uint16_t port() const noexcept;
 
     /// What was answered so far, and how many connections are open. Any thread.
-    const RequestStatistics& statistics() const noexcept { return m_dispatcher.statistics(); }
-    std::size_t connections() const { return m_threads.count(); }
+    const RequestStatistics& statistics() const noexcept;
+    std::size_t connections() const;
     /// Connections that found no place.
-    std::uint64_t refusedConnections() const noexcept { return m_refused.load(); }
+    std::uint64_t refusedConnections() const;
 
-    /// Ends the serving: requests under way are answered first, streams end. At the limit it
-    /// returns although a client is still being served; no request is answered from then on. Any
-    /// number of times; not on a thread of the server.
+    /// Ends the serving: requests under way are cancelled and answered first, streams end. At the
+    /// limit it returns although a client is still being served; no request is answered from then
+    /// on. Any number of times; not on a thread of the server.
     void stop(Clock::time_point limit);
 
     /// For the end of the process on any thread, also on one of the server's: answers no further
-    /// requests and waits for those under way, at most until the limit.
+    /// requests, cancels those under way and waits for them, at most until the limit.
     void abandon(Clock::time_point limit);
 
 private:
-    void acceptClients();
-    void accept(int fd);
-    std::unique_ptr<ClientSocket> socketFor(int fd) const;
-    void serve(int fd);
-    void serveRequests(ClientSocket& socket);
-    std::chrono::milliseconds idleTime() const;
-
-    RequestDispatcher m_dispatcher;
-    StopSignal m_stop;
-    std::stop_source m_streams; ///< asked to stop with the signal
-    HttpExchange m_exchange;
-    ListenSocket m_listen;
-    std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
-    std::size_t m_mostConnections = 0;
-    int m_lowestDescriptor = 0; ///< of connections
-    std::atomic<std::uint64_t> m_refused{0};
-    std::thread m_acceptor;
-    ConnectionThreads m_threads; ///< last: the threads use what stands above
+    class Network;
+    std::unique_ptr<Network> m_network;
 };
 
 #endif

@@ -6,7 +6,6 @@
 #include "host/http/RequestGuard.h"
 
 #include <cstddef>
-#include <functional>
 #include <optional>
 #include <string>
 
@@ -19,12 +18,10 @@ struct IncomingRequest {
     bool hasBody = false;
     bool isChunked = false;            ///< the body comes in chunks
     bool isLast = false;               ///< the connection ends with the answer
+    bool isHttp10 = false;             ///< the client does not know chunks
+    bool waitsForContinue = false;     ///< the body comes when the client is asked for it
     std::optional<std::size_t> length; ///< of the body, where the client tells it
     std::optional<Problem> problem;    ///< what makes the request unclear; none when nothing
 };
-
-/// Reads the body of a request, at most so many bytes. Throws RequestRefused when it is longer, or
-/// does not come whole.
-using BodyReader = std::function<std::string(std::size_t most)>;
 
 #endif

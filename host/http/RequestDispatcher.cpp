@@ -38,6 +38,10 @@ bool isRead(std::string_view method) {
     return method == "GET" || method == "HEAD";
 }
 
+bool mayHaveBody(std::string_view method) {
+    return method == "POST" || method == "PUT" || method == "PATCH" || method == "DELETE";
+}
+
 /// True for application/json, with or without parameters.
 bool isJson(const std::string& contentType) {
     constexpr std::string_view json = "application/json";
@@ -47,18 +51,17 @@ bool isJson(const std::string& contentType) {
     return type.size() == json.size() && strncasecmp(type.data(), json.data(), json.size()) == 0;
 }
 
-void readBodyOf(IncomingRequest& incoming, const BodyReader& readBody) {
-    constexpr std::size_t most = RequestDispatcher::largestBody;
+/// What speaks against a body before it is read.
+void checkBody(const IncomingRequest& incoming) {
     if (!incoming.hasBody) {
         return;
     }
-    if (incoming.length.value_or(0) > most) {
+    if (incoming.length.value_or(0) > RequestDispatcher::largestBody) {
         throw RequestDispatcher::tooLong();
     }
     if (!isJson(incoming.contentType)) {
         throw RequestRefused(415, "send the body as application/json", "Content-Type");
     }
-    incoming.request.body = readBody(most);
 }
 
 /// The answer to a request that has no handler.
@@ -91,73 +94,101 @@ HttpAnswer RequestDispatcher::refuse(const Problem& problem) {
     return answerOf(problem);
 }
 
-HttpAnswer RequestDispatcher::answer(IncomingRequest incoming, const BodyReader& readBody) {
-    TraceScope trace(anchor);
-    const auto begin = std::chrono::steady_clock::now();
-    const std::string method = incoming.request.method;
-    std::string route;
-    HttpAnswer answer = answerOrProblem(incoming, readBody, route);
-    m_statistics.count(method, route, answer.status, std::chrono::steady_clock::now() - begin);
+HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Problem& problem) {
+    HttpAnswer answer = answerOf(problem);
+    count(admission, answer);
     return answer;
 }
 
-HttpAnswer RequestDispatcher::answerOrProblem(IncomingRequest& incoming, const BodyReader& readBody,
-                                              std::string& route) {
+void RequestDispatcher::count(const Admission& admission, const HttpAnswer& answer) {
+    m_statistics.count(admission.method, admission.route, answer.status,
+                       std::chrono::steady_clock::now() - admission.begin);
+}
+
+void RequestDispatcher::setGuard(RequestGuard guard) {
+    auto next = std::make_shared<const RequestGuard>(std::move(guard));
+    const std::lock_guard lock(m_mutex);
+    m_guard.swap(next);
+}
+
+std::shared_ptr<const RequestGuard> RequestDispatcher::guard() {
+    const std::lock_guard lock(m_mutex);
+    return m_guard;
+}
+
+/// Does a part of the work on a request; what it throws becomes the answer.
+template <class Work>
+std::optional<HttpAnswer> RequestDispatcher::problemOf(const HttpRequest& request, Work work) {
     TraceScope trace(anchor);
     try {
-        return tryAnswer(incoming, readBody, route);
+        return work();
     } catch (const RequestRefused& refused) {
         const Problem& problem = refused.problem();
-        trace.detail()("Request for %s refused: %s.", incoming.request.path.c_str(),
-                       problem.detail.c_str());
+        trace.detail()("Request for %s refused: %s.", request.path.c_str(), problem.detail.c_str());
         return answerOf(problem);
     } catch (const std::exception& exception) {
-        trace.error()("Request for %s failed: %s", incoming.request.path.c_str(), exception.what());
+        trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
     }
     return answerOf({500, "the request failed", ""});
 }
 
-HttpAnswer RequestDispatcher::tryAnswer(IncomingRequest& incoming, const BodyReader& readBody,
-                                        std::string& route) {
+RequestDispatcher::Admission RequestDispatcher::admit(IncomingRequest incoming) {
+    TraceScope trace(anchor);
+    Admission admission;
+    admission.begin = std::chrono::steady_clock::now();
+    admission.method = incoming.request.method;
+    admission.refusal = problemOf(incoming.request, [&]() -> std::optional<HttpAnswer> {
+        tryAdmit(incoming, admission);
+        return std::move(admission.refusal);
+    });
+    admission.request = std::move(incoming.request);
+    if (admission.refusal) {
+        count(admission, *admission.refusal);
+    }
+    return admission;
+}
+
+void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission) {
     HttpRequest& request = incoming.request;
     if (incoming.problem) {
         throw RequestRefused(*incoming.problem);
     }
+    if (incoming.hasBody && !mayHaveBody(request.method)) {
+        throw RequestRefused(400, "this method has no body", "");
+    }
     const Router::Match match = m_router.match(request.method, request.path);
-    route = match.pattern;
+    admission.route = match.pattern;
     const bool isPublic = match.handler != nullptr && match.access == Router::PUBLIC;
-    if (std::optional<Problem> problem = m_guard->refuse(incoming.headers, isPublic)) {
+    if (std::optional<Problem> problem = guard()->refuse(incoming.headers, isPublic)) {
         throw RequestRefused(std::move(*problem));
     }
     if (match.handler == nullptr) {
-        return unrouted(match);
+        admission.refusal = unrouted(match);
+        return;
     }
     decodeCaptures(match, request);
     decodeQuery(incoming);
     if (!isRead(request.method)) {
         QueryFields(request).refuseUnknown(); // what changes something is told by bodies alone
     }
-    readBodyOf(incoming, readBody);
-    const ActiveRequests::Guard active(m_active);
-    if (!active) {
-        throw RequestRefused(503, "the agent is ending", "");
-    }
+    checkBody(incoming);
     if (request.method == "HEAD") {
         request.method = "GET";
     }
-    return (*match.handler)(request);
+    admission.handler = match.handler;
+    admission.lane = match.lane;
 }
 
-void RequestDispatcher::stream(const HttpAnswer::Stream& stream, const BodyWriter& write,
-                               const std::stop_token& stop) {
+HttpAnswer RequestDispatcher::answer(Admission& admission) {
     TraceScope trace(anchor);
-    const ActiveRequests::Guard active(m_active);
-    if (!active) {
-        return;
-    }
-    try {
-        stream(write, stop);
-    } catch (const std::exception& exception) {
-        trace.error()("A stream broke off: %s", exception.what());
-    }
+    const HttpRequest& request = admission.request;
+    std::optional<HttpAnswer> answer = problemOf(request, [&]() -> std::optional<HttpAnswer> {
+        const ActiveRequests::Guard active(m_active);
+        if (!active) {
+            throw RequestRefused(503, "the agent is ending", "");
+        }
+        return (*admission.handler)(request);
+    });
+    count(admission, *answer);
+    return std::move(*answer);
 }

@@ -11,10 +11,10 @@
 
 #include <chrono>
 #include <cstddef>
+#include <memory>
+#include <mutex>
 #include <optional>
-#include <stop_token>
 #include <string>
-#include <utility>
 
 /// Holds the rules of access against requests and lets the router's handlers answer them. What
 /// goes wrong becomes a problem document. Any thread.
@@ -23,15 +23,32 @@ public:
     /// The largest body: bytes.
     static constexpr std::size_t largestBody = 1024 * 1024;
 
+    /// A request whose head was held against the rules. What may wait comes after that: the body,
+    /// and the handler.
+    struct Admission {
+        HttpRequest request;
+        const Router::Handler* handler = nullptr;
+        Router::Lane lane = Router::USUAL;
+        std::string method; ///< as it was sent
+        std::string route;
+        std::chrono::steady_clock::time_point begin;
+        std::optional<HttpAnswer> refusal; ///< the answer, where a rule speaks against the request
+    };
+
     /// `router` outlives the object.
     explicit RequestDispatcher(const Router& router) : m_router(router) {}
 
-    /// Before the first request.
-    void setGuard(RequestGuard guard) { m_guard.emplace(std::move(guard)); }
+    /// Before the first request, and whenever the token or the certificate has changed.
+    void setGuard(RequestGuard guard);
 
-    /// Answers a request, whose body is read only when nothing speaks against the rest of it.
-    /// Throws nothing.
-    HttpAnswer answer(IncomingRequest incoming, const BodyReader& readBody);
+    /// Judges a request by its head. Throws nothing and never waits.
+    Admission admit(IncomingRequest incoming);
+
+    /// Lets the handler of a request that was not refused answer it. Throws nothing.
+    HttpAnswer answer(Admission& admission);
+
+    /// The answer to a request that was admitted and cannot be answered otherwise.
+    HttpAnswer refuse(const Admission& admission, const Problem& problem);
 
     /// The answer to a request of which not even the head could be read.
     HttpAnswer refuse(const Problem& problem);
@@ -42,10 +59,6 @@ public:
     /// The answer that is a problem document.
     static HttpAnswer answerOf(const Problem& problem);
 
-    /// Lets the stream of an answer write until its end. Throws nothing.
-    void stream(const HttpAnswer::Stream& stream, const BodyWriter& write,
-                const std::stop_token& stop);
-
     /// Lets no more requests be answered and waits for those under way, at most until the limit.
     void close(std::chrono::steady_clock::time_point limit) { m_active.close(limit); }
 
@@ -53,12 +66,15 @@ public:
     const RequestStatistics& statistics() const noexcept { return m_statistics; }
 
 private:
-    HttpAnswer answerOrProblem(IncomingRequest& incoming, const BodyReader& readBody,
-                               std::string& route);
-    HttpAnswer tryAnswer(IncomingRequest& incoming, const BodyReader& readBody, std::string& route);
+    template <class Work>
+    std::optional<HttpAnswer> problemOf(const HttpRequest& request, Work work);
+    void tryAdmit(IncomingRequest& incoming, Admission& admission);
+    void count(const Admission& admission, const HttpAnswer& answer);
+    std::shared_ptr<const RequestGuard> guard();
 
     const Router& m_router;
-    std::optional<RequestGuard> m_guard;
+    std::mutex m_mutex;
+    std::shared_ptr<const RequestGuard> m_guard; ///< guarded by the mutex
     ActiveRequests m_active;
     RequestStatistics m_statistics;
 };

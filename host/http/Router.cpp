@@ -68,8 +68,9 @@ void allow(std::string& methods, const std::string& method) {
 
 } // namespace
 
-void Router::add(std::string method, const std::string& pattern, Handler handler, Access access) {
-    Route route{std::move(method), pattern, split(pattern), "", std::move(handler), access};
+void Router::add(std::string method, const std::string& pattern, Handler handler, Access access,
+                 Lane lane) {
+    Route route{std::move(method), pattern, split(pattern), "", std::move(handler), access, lane};
     std::transform(route.parts.begin(), route.parts.end(), std::back_inserter(route.rank), rankOf);
     m_routes.push_back(std::move(route));
 }
@@ -97,6 +98,7 @@ Router::Match Router::match(std::string_view method, std::string_view path) cons
         match.handler = &best->handler;
         match.pattern = best->pattern;
         match.access = best->access;
+        match.lane = best->lane;
     }
     return match;
 }

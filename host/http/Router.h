@@ -22,11 +22,18 @@ public:
         PUBLIC, ///< anyone that reaches this server
     };
 
+    /// Where a handler runs.
+    enum Lane {
+        USUAL, ///< among all others; may take its time
+        QUICK, ///< apart from them, so that no slow answer keeps it waiting; never waits itself
+    };
+
     /// The route of a request.
     struct Match {
         const Handler* handler = nullptr; ///< null: none for this method, or for this path
         std::string pattern;              ///< empty when nothing is at this path
         Access access = TOKEN;
+        Lane lane = USUAL;
         std::vector<std::string> captures; ///< as they stand in the path, not decoded
         std::string allow; ///< the methods of this path, as the header Allow names them
     };
@@ -34,8 +41,8 @@ public:
     /// Adds a route. A pattern is a path; `{name}` stands for any one part of it that is not
     /// empty, and `*` at the end for any rest. Literal parts win over these. A route for GET
     /// answers HEAD too.
-    void add(std::string method, const std::string& pattern, Handler handler,
-             Access access = TOKEN);
+    void add(std::string method, const std::string& pattern, Handler handler, Access access = TOKEN,
+             Lane lane = USUAL);
 
     /// Finds the route of a path as it was sent, without the query.
     Match match(std::string_view method, std::string_view path) const;
@@ -51,6 +58,7 @@ private:
         std::string rank; ///< smaller: more literal, from the left
         Handler handler;
         Access access;
+        Lane lane;
     };
 
     std::vector<Route> m_routes;

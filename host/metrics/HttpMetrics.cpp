@@ -2,6 +2,7 @@
 
 #include "host/http/EventStream.h"
 #include "host/http/HttpServer.h"
+#include "host/http/RequestStatistics.h"
 #include "host/metrics/MetricText.h"
 
 #include <string>

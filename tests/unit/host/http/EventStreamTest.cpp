@@ -10,8 +10,8 @@
 #include <chrono>
 #include <condition_variable>
 #include <functional>
+#include <memory>
 #include <mutex>
-#include <stop_token>
 #include <string>
 #include <thread>
 
@@ -19,48 +19,80 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// A client that follows a stream on a thread of its own.
+/// A client of a stream, which takes everything at once unless it is told not to.
 class Client {
 public:
-    explicit Client(HttpAnswer answer) : m_answer(std::move(answer)) {
-        m_thread = std::jthread([this](const std::stop_token& stop) {
-            m_answer.stream(
-                [this](std::string_view text) {
-                    const std::lock_guard guard(m_mutex);
-                    m_text += text;
-                    m_changed.notify_all();
-                    return !m_isGone;
-                },
-                stop);
-            m_answer = {};
-        });
+    explicit Client(const HttpAnswer& answer, bool takesAll = true)
+        : m_channel(std::make_shared<Channel>(answer.stream.changed, takesAll)) {
+        answer.stream.begin(m_channel);
     }
+    ~Client() { leave(); }
     /// Waits for the text that came so far to end with this one.
     bool gets(const std::string& end) {
-        std::unique_lock lock(m_mutex);
-        return m_changed.wait_for(lock, 20s, [&] { return m_text.ends_with(end); });
+        return m_channel->waitFor([&] { return m_channel->text.ends_with(end); });
     }
     std::string text() {
-        const std::lock_guard guard(m_mutex);
-        return m_text;
+        std::string copy;
+        m_channel->waitFor([&] {
+            copy = m_channel->text;
+            return true;
+        });
+        return copy;
+    }
+    void takeAll() {
+        m_channel->set([](Channel& channel) { channel.isReadyNow = true; });
     }
     void leave() {
-        const std::lock_guard guard(m_mutex);
-        m_isGone = true;
+        m_channel->set([](Channel& channel) { channel.isOpenNow = false; });
     }
-    void stop() {
-        m_thread.request_stop();
-        m_thread.join();
+    bool isEnded() {
+        return m_channel->waitFor([&] { return m_channel->isEnded; });
     }
-    void join() { m_thread.join(); }
 
 private:
-    HttpAnswer m_answer;
-    std::mutex m_mutex;
-    std::condition_variable m_changed;
-    std::string m_text;
-    bool m_isGone = false;
-    std::jthread m_thread;
+    struct Channel : BodyChannel {
+        Channel(std::function<void()> whenChanged, bool takesAllAtOnce)
+            : isReadyNow(takesAllAtOnce), m_whenChanged(std::move(whenChanged)) {}
+        void send(std::string part) override {
+            const std::lock_guard guard(mutex);
+            text += part;
+            changed.notify_all();
+        }
+        bool isReady() const override {
+            const std::lock_guard guard(mutex);
+            return isOpenNow && isReadyNow;
+        }
+        bool isOpen() const override {
+            const std::lock_guard guard(mutex);
+            return isOpenNow;
+        }
+        void end() override {
+            const std::lock_guard guard(mutex);
+            isEnded = true;
+            changed.notify_all();
+        }
+        bool waitFor(const std::function<bool()>& condition) {
+            std::unique_lock lock(mutex);
+            return changed.wait_for(lock, 20s, condition);
+        }
+        template <class Change> void set(Change change) {
+            {
+                const std::lock_guard guard(mutex);
+                change(*this);
+            }
+            m_whenChanged();
+        }
+        mutable std::mutex mutex;
+        std::condition_variable changed;
+        std::string text;
+        bool isReadyNow;
+        bool isOpenNow = true;
+        bool isEnded = false;
+
+    private:
+        const std::function<void()> m_whenChanged;
+    };
+    std::shared_ptr<Channel> m_channel;
 };
 
 std::string message(int id) {
@@ -72,6 +104,13 @@ class EventStreamTest : public testing::Test {
 protected:
     HttpAnswer open(const std::string& query = "", const std::string& lastEventId = "") const {
         return router.ask("GET", "/api/v1/events/stream" + query, "", lastEventId);
+    }
+
+    bool hasNoClients() const {
+        for (int count = 0; count < 2000 && stream.clients() > 0; ++count) {
+            std::this_thread::sleep_for(10ms);
+        }
+        return stream.clients() == 0;
     }
 
     RecordingTrace trace{0};
@@ -92,7 +131,6 @@ TEST_F(EventStreamTest, GivesWhatIsNewFromNowOn) {
     history.add(3);
     EXPECT_TRUE(client.gets(message(3)));
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(3));
-    client.stop();
 }
 
 TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
@@ -107,14 +145,12 @@ TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
         Client client(answer);
         EXPECT_TRUE(client.gets(message(500)));
         EXPECT_EQ(client.text(), expected);
-        client.stop();
     }
     // Ids beyond the newest belong to a history that is no more.
     Client beyond(open("?after=100000"));
     EXPECT_TRUE(beyond.gets("retry: 2000\n\n"));
     history.add(501);
     EXPECT_TRUE(beyond.gets(message(501)));
-    beyond.stop();
 }
 
 TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
@@ -126,7 +162,6 @@ TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
     history.add(4, "b");
     EXPECT_TRUE(client.gets(message(4)));
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(4));
-    client.stop();
 }
 
 TEST_F(EventStreamTest, TellsThatItIsAlive) {
@@ -134,7 +169,6 @@ TEST_F(EventStreamTest, TellsThatItIsAlive) {
     const TestRouter asked(often);
     Client client(asked.ask("GET", "/api/v1/events/stream"));
     EXPECT_TRUE(client.gets(": keep-alive\n\n: keep-alive\n\n"));
-    client.stop();
 }
 
 TEST_F(EventStreamTest, EndsWhenTheClientHasGone) {
@@ -142,8 +176,46 @@ TEST_F(EventStreamTest, EndsWhenTheClientHasGone) {
     EXPECT_TRUE(client.gets("retry: 2000\n\n"));
     EXPECT_EQ(stream.clients(), 1u);
     client.leave();
-    client.join();
-    EXPECT_EQ(stream.clients(), 0u);
+    EXPECT_TRUE(hasNoClients());
+    // Whoever comes then is served by a new thread.
+    Client another(open());
+    EXPECT_TRUE(another.gets("retry: 2000\n\n"));
+    history.add(1);
+    EXPECT_TRUE(another.gets(message(1)));
+}
+
+TEST_F(EventStreamTest, AClientThatIsNotReadyGetsNothingAndHoldsNobodyUp) {
+    Client slow(open(), false);
+    Client quick(open());
+    for (int id = 1; id <= 3; ++id) {
+        history.add(static_cast<std::uint64_t>(id));
+        EXPECT_TRUE(quick.gets(message(id)));
+    }
+    EXPECT_EQ(slow.text(), "retry: 2000\n\n");
+    slow.takeAll();
+    EXPECT_TRUE(slow.gets(message(1) + message(2) + message(3)));
+}
+
+TEST_F(EventStreamTest, AStreamThatCannotReadTheHistoryEndsAlone) {
+    trace.setLevel(TRC1_ERROR);
+    Client client(open());
+    history.fail();
+    history.add(1);
+    EXPECT_TRUE(client.isEnded());
+    EXPECT_TRUE(hasNoClients());
+    EXPECT_THAT(trace.messages(), testing::ElementsAre("A stream broke off: disk I/O error"));
+}
+
+TEST_F(EventStreamTest, TheEndOfTheResourceEndsEveryStream) {
+    auto other = std::make_unique<EventStream>(&history);
+    const HttpAnswer answer = TestRouter(*other).ask("GET", "/api/v1/events/stream");
+    const HttpAnswer late = TestRouter(*other).ask("GET", "/api/v1/events/stream");
+    Client client(answer);
+    EXPECT_TRUE(client.gets("retry: 2000\n\n"));
+    other.reset();
+    EXPECT_TRUE(client.isEnded());
+    Client tooLate(late);
+    EXPECT_TRUE(tooLate.isEnded());
 }
 
 TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {

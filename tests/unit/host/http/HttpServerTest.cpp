@@ -1,9 +1,12 @@
 #include "host/http/HttpServer.h"
 
 #include "host/http/HealthResource.h"
+#include "host/http/RequestStatistics.h"
+#include "host/http/Router.h"
 #include "host/http/SampleResource.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
+#include "unit/host/http/TestClient.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -15,13 +18,15 @@
 #include <functional>
 #include <future>
 #include <mutex>
+#include <optional>
 #include <stdexcept>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include <httplib.h>
 #include <nlohmann/json.hpp>
+#include <sys/socket.h>
+#include <unistd.h>
 
 namespace {
 
@@ -56,14 +61,12 @@ protected:
         ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
     }
 
-    httplib::Client client() const {
-        httplib::Client result("127.0.0.1", server.port());
-        result.set_bearer_token_auth(secret);
-        return result;
-    }
-    httplib::Result sample(const std::string& table, const std::string& body) {
+    using Reply = std::optional<TestClient::Reply>;
+
+    TestClient client() const { return {"127.0.0.1", server.port(), secret}; }
+    Reply sample(const std::string& table, const std::string& body) {
         source.handoff.pass();
-        auto result = client().Post(tables + table + "/sample", body, "application/json");
+        auto result = client().post(tables + table + "/sample", body);
         source.handoff.pass();
         return result;
     }
@@ -73,22 +76,17 @@ protected:
                R"({"column":"ENTRYTIME","op":">=","value":"2026-11-20"},)"
                R"({"column":"ENTRYTIME","op":"<=","value":"2026-11-21"}]})";
     }
-    static void expectProblem(const httplib::Result& result, int status, const std::string& detail,
+    static void expectProblem(const Reply& result, int status, const std::string& detail,
                               const std::string& field) {
-        ASSERT_TRUE(result) << httplib::to_string(result.error());
+        ASSERT_TRUE(result);
         EXPECT_EQ(result->status, status);
-        EXPECT_EQ(result->get_header_value("Content-Type"), "application/problem+json");
+        EXPECT_EQ(result->header("content-type"), "application/problem+json");
         const json document = json::parse(result->body);
         EXPECT_EQ(document["type"], "about:blank");
         EXPECT_EQ(document["status"], status);
         EXPECT_EQ(document["detail"], detail);
         EXPECT_EQ(document.value("field", ""), field);
     }
-    /// A connection of its own.
-    int connected() const;
-    /// Sends bytes as they are and gives the answer up to the end of its first line.
-    std::string raw(const std::string& bytes) const;
-
     RecordingTrace trace{0};
     TestSource source;
     SampleResource samples{source};
@@ -96,36 +94,13 @@ protected:
     HttpServer server{router};
 };
 
-int HttpServerTest::connected() const {
-    const int fd = socket(AF_INET, SOCK_STREAM, 0);
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_port = htons(server.port());
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    EXPECT_EQ(connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-    return fd;
-}
-
-std::string HttpServerTest::raw(const std::string& bytes) const {
-    const int fd = connected();
-    EXPECT_EQ(send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL),
-              static_cast<ssize_t>(bytes.size()));
-    std::string answer;
-    char c = 0;
-    while (recv(fd, &c, 1, 0) == 1 && c != '\r') {
-        answer += c;
-    }
-    close(fd);
-    return answer;
-}
-
 TEST_F(HttpServerTest, HealthNeedsNoToken) {
-    httplib::Client anonymous("127.0.0.1", server.port());
-    const auto result = anonymous.Get("/healthz");
+    TestClient anonymous("127.0.0.1", server.port());
+    const auto result = anonymous.get("/healthz");
     ASSERT_TRUE(result);
     EXPECT_EQ(result->status, 200);
     EXPECT_EQ(result->body, R"({"status":"ok"})");
-    EXPECT_EQ(result->get_header_value("Content-Type"), "application/json");
+    EXPECT_EQ(result->header("content-type"), "application/json");
 }
 
 TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
@@ -142,8 +117,8 @@ TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
     EXPECT_EQ(
         result->body,
         R"({"table":"RMMONLOG","rows":[{"LOGTYPE":"S"},{"LOGTYPE":"S"}],"count":2,"truncated":false})");
-    EXPECT_EQ(result->get_header_value("Content-Type"), "application/json");
-    EXPECT_EQ(result->get_header_value("Cache-Control"), "no-store");
+    EXPECT_EQ(result->header("content-type"), "application/json");
+    EXPECT_EQ(result->header("cache-control"), "no-store");
 }
 
 TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
@@ -173,36 +148,37 @@ TEST_F(HttpServerTest, AReportOnALogThatIsNotMonitoredIsAProblem) {
 }
 
 TEST_F(HttpServerTest, RefusesRequestsWithoutTheToken) {
-    httplib::Client anonymous("127.0.0.1", server.port());
-    const auto result = anonymous.Post(tables + "RMMONLOG/sample", "{}", "application/json");
+    TestClient anonymous("127.0.0.1", server.port());
+    const auto result = anonymous.post(tables + "RMMONLOG/sample", "{}");
     expectProblem(result, 401, "send the API token: Authorization: Bearer TOKEN", "Authorization");
-    EXPECT_EQ(result->get_header_value("WWW-Authenticate"), "Bearer");
-    anonymous.set_bearer_token_auth(std::string(64, 'b'));
-    expectProblem(anonymous.Post(tables + "RMMONLOG/sample", "{}", "application/json"), 401,
+    EXPECT_EQ(result->header("www-authenticate"), "Bearer");
+    TestClient wrong("127.0.0.1", server.port(), std::string(64, 'b'));
+    expectProblem(wrong.post(tables + "RMMONLOG/sample", "{}"), 401,
                   "the token is not the one in the agent's token file", "Authorization");
-    expectProblem(anonymous.Get("/nothing"), 401,
-                  "the token is not the one in the agent's token file", "Authorization");
+    expectProblem(wrong.get("/nothing"), 401, "the token is not the one in the agent's token file",
+                  "Authorization");
 }
 
 TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
-    expectProblem(client().Get("/healthz", {{"Host", "evil.example"}}), 421,
+    expectProblem(client().get("/healthz", {{"Host", "evil.example"}}), 421,
                   "the Host header must be the address at which the agent listens", "Host");
-    EXPECT_EQ(raw("GET /healthz HTTP/1.1\r\n\r\n"), "HTTP/1.1 421 Misdirected Request");
-    expectProblem(client().Get("/healthz", {{"Origin", "http://evil.example"}}), 403,
+    EXPECT_THAT(client().raw("GET /healthz HTTP/1.1\r\nConnection: close\r\n\r\n"),
+                testing::StartsWith("HTTP/1.1 421 Misdirected Request\r\n"));
+    expectProblem(client().get("/healthz", {{"Origin", "http://evil.example"}}), 403,
                   "requests of other origins are refused", "Origin");
 }
 
 TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
     expectProblem(sample("NOTABLE", "{}"), 404,
                   "no such table; the tables are RMLOGENT and RMMONLOG", "table");
-    expectProblem(client().Get("/nothing"), 404, "there is nothing at this path", "");
-    const auto result = client().Get(tables + "RMMONLOG/sample");
+    expectProblem(client().get("/nothing"), 404, "there is nothing at this path", "");
+    const auto result = client().get(tables + "RMMONLOG/sample");
     expectProblem(result, 405, "this path answers POST, not this method", "");
-    EXPECT_EQ(result->get_header_value("Allow"), "POST");
-    expectProblem(client().Delete("/healthz"), 405, "this path answers GET, HEAD, not this method",
-                  "");
-    expectProblem(client().Options("/healthz"), 405, "this path answers GET, HEAD, not this method",
-                  "");
+    EXPECT_EQ(result->header("allow"), "POST");
+    expectProblem(client().ask("DELETE", "/healthz"), 405,
+                  "this path answers GET, HEAD, not this method", "");
+    expectProblem(client().ask("OPTIONS", "/healthz"), 405,
+                  "this path answers GET, HEAD, not this method", "");
 }
 
 TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
@@ -210,7 +186,7 @@ TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
     expectProblem(sample("RMMONLOG", R"({"filters":[{}]})"), 400, "write a text",
                   "filters[0].column");
     expectProblem(
-        client().Post(tables + "RMMONLOG/sample", "a=1", "application/x-www-form-urlencoded"), 415,
+        client().post(tables + "RMMONLOG/sample", "a=1", "application/x-www-form-urlencoded"), 415,
         "send the body as application/json", "Content-Type");
 }
 
@@ -220,22 +196,18 @@ TEST_F(HttpServerTest, RefusesLongBodies) {
     expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is no JSON",
                   "body");
     // A body that does not tell its length is cut off too.
-    const auto chunked = client().Post(
-        tables + "RMMONLOG/sample",
-        [](std::size_t offset, httplib::DataSink& sink) {
-            const std::string piece(8192, ' ');
-            if (offset > 4'000'000) {
-                sink.done();
-            } else {
-                sink.write(piece.data(), piece.size());
-            }
-            return true;
-        },
-        "application/json");
-    if (chunked) {
-        expectProblem(chunked, 413, tooLong, "body");
-    } // otherwise the server has ended the connection while the body was sent
-    EXPECT_EQ(client().Get("/healthz")->status, 200);
+    std::string chunks;
+    for (int count = 0; count < 500; ++count) {
+        chunks += "2000\r\n" + std::string(8192, ' ') + "\r\n";
+    }
+    const std::string answer =
+        client().raw("POST " + tables + "RMMONLOG/sample HTTP/1.1\r\nHost: localhost:" +
+                     std::to_string(server.port()) + "\r\nAuthorization: Bearer " + secret +
+                     "\r\nContent-Type: application/json\r\nTransfer-Encoding: chunked\r\n\r\n" +
+                     chunks + "0\r\n\r\n");
+    EXPECT_THAT(answer,
+                testing::AllOf(testing::StartsWith("HTTP/1.1 413 "), testing::HasSubstr(tooLong)));
+    EXPECT_EQ(client().get("/healthz")->status, 200);
 }
 
 TEST_F(HttpServerTest, ASampleThatFailsIsAnInternalError) {
@@ -269,7 +241,7 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
         std::unique_lock lock(mutex);
         EXPECT_TRUE(changed.wait_for(lock, 10s, [&] { return waiting == 3; }));
     }
-    EXPECT_EQ(client().Get("/healthz")->status, 200) << "others are served meanwhile";
+    EXPECT_EQ(client().get("/healthz")->status, 200) << "others are served meanwhile";
     {
         const std::lock_guard guard(mutex);
         go = true;
@@ -291,9 +263,8 @@ TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
 }
 
 TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
-    httplib::Client idle("127.0.0.1", server.port());
-    idle.set_keep_alive(true);
-    EXPECT_EQ(idle.Get("/healthz")->status, 200);
+    TestClient idle("127.0.0.1", server.port());
+    EXPECT_EQ(idle.get("/healthz")->status, 200);
     std::promise<void> begun;
     source.onTake = [&](auto, auto) {
         begun.set_value();
@@ -309,12 +280,12 @@ TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
     server.stop(begin + 30s);
     EXPECT_LT(Clock::now() - begin, 10s);
     EXPECT_EQ(answer.get(), 200);
-    EXPECT_FALSE(client().Get("/healthz"));
+    EXPECT_FALSE(client().get("/healthz"));
     server.stop(Clock::now());
 }
 
 TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
-    const int fd = connected();
+    const int fd = TestClient::connected(server.port());
     std::atomic<bool> isOver{false};
     std::thread slow([&] {
         const std::string request = "GET /healthz HTTP/1.1\r\nX-Slow: ";
@@ -326,7 +297,7 @@ TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
         close(fd);
     });
     // Another request, so that the slow one is being served by now.
-    EXPECT_EQ(client().Get("/healthz")->status, 200);
+    EXPECT_EQ(client().get("/healthz")->status, 200);
     const auto begin = Clock::now();
     server.stop(begin + 30s);
     EXPECT_LT(Clock::now() - begin, 10s);
@@ -382,9 +353,8 @@ TEST(HttpServerLife, ListensOnIpv6AndByName) {
     for (const char* const host : {"::1", "localhost"}) {
         HttpServer server(router);
         ASSERT_EQ(server.start({host, 0}, ApiToken(secret)), "");
-        httplib::Client client(host, server.port());
-        const auto result =
-            client.Get("/healthz", {{"Host", ListenAddress{host, server.port()}.text()}});
+        TestClient client(host, server.port());
+        const auto result = client.get("/healthz");
         ASSERT_TRUE(result) << host;
         EXPECT_EQ(result->status, 200) << host;
     }

@@ -1,0 +1,87 @@
+#include "host/http/ResponseText.h"
+
+#include "host/http/HttpDate.h"
+
+#include <utility>
+
+#include <boost/asio/buffer.hpp>
+#include <boost/beast/core/buffers_to_string.hpp>
+#include <boost/beast/http/chunk_encode.hpp>
+#include <boost/beast/http/empty_body.hpp>
+#include <boost/beast/http/message.hpp>
+#include <boost/beast/http/serializer.hpp>
+
+namespace {
+
+namespace http = boost::beast::http;
+
+/// Headers of every answer that does not say otherwise. Answers are given whole: without ranges.
+constexpr std::pair<const char*, const char*> usualHeaders[] = {
+    {"Cache-Control", "no-store"},
+    {"X-Content-Type-Options", "nosniff"},
+    {"Accept-Ranges", "none"},
+};
+constexpr const char* onlyTls = "max-age=31536000"; ///< a browser asks no other way for a year
+constexpr int noContent = 204;
+
+std::string text(const http::response<http::empty_body>& response) {
+    http::response_serializer<http::empty_body> serializer(response);
+    serializer.split(true); // the head alone
+    std::string head;
+    boost::beast::error_code error;
+    while (!serializer.is_header_done() && !error) {
+        serializer.next(error, [&](boost::beast::error_code&, const auto& buffers) {
+            head += boost::beast::buffers_to_string(buffers);
+            serializer.consume(boost::beast::buffer_bytes(buffers));
+        });
+    }
+    return head;
+}
+
+} // namespace
+
+std::string ResponseText::head(const HttpAnswer& answer, const Connection& connection) {
+    http::response<http::empty_body> response;
+    constexpr unsigned http11 = 11;
+    response.version(http11);
+    response.result(static_cast<unsigned>(answer.status));
+    for (const auto& [name, value] : usualHeaders) {
+        response.set(name, value);
+    }
+    if (connection.isTls) {
+        response.set(http::field::strict_transport_security, onlyTls);
+    }
+    response.set(http::field::date, HttpDate::now());
+    for (const auto& [name, value] : answer.headers) {
+        response.set(name, value); // in place of a usual one
+    }
+    if (answer.status != noContent) {
+        response.set(http::field::content_type, answer.contentType);
+    }
+    if (!answer.stream && answer.status != noContent) {
+        response.set(http::field::content_length, std::to_string(answer.body.size()));
+    } else if (answer.stream && !connection.isHttp10) {
+        response.set(http::field::transfer_encoding, "chunked");
+    }
+    if (connection.isLast) {
+        response.set(http::field::connection, "close");
+    } else if (connection.isHttp10) {
+        response.set(http::field::connection, "keep-alive");
+    }
+    return text(response);
+}
+
+std::string ResponseText::chunk(const std::string& text) {
+    return boost::beast::buffers_to_string(
+        http::make_chunk(boost::asio::const_buffer(text.data(), text.size())));
+}
+
+std::string ResponseText::lastChunk() {
+    return boost::beast::buffers_to_string(http::make_chunk_last());
+}
+
+std::string ResponseText::askForBody() {
+    http::response<http::empty_body> response;
+    response.result(http::status::continue_);
+    return text(response);
+}

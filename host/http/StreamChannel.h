@@ -1,0 +1,41 @@
+#ifndef ZRM_HOST_STREAM_CHANNEL_H
+#define ZRM_HOST_STREAM_CHANNEL_H
+
+#include "host/http/HttpAnswer.h"
+
+#include <cstddef>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <string>
+
+class HttpConnection;
+
+/// The channel of a stream over a connection, which may end before it.
+class StreamChannel : public BodyChannel {
+public:
+    /// `changed` as in HttpAnswer::Stream; may be empty.
+    StreamChannel(HttpConnection& connection, std::function<void()> changed);
+
+    void send(std::string text) override;
+    bool isReady() const override;
+    bool isOpen() const override;
+    void end() override;
+
+    // For the connection.
+
+    /// The client has taken so many bytes that were handed over.
+    void taken(std::size_t bytes);
+    /// There is nobody any more to whom this leads.
+    void close();
+
+private:
+    template <class Work> void inConnection(Work work);
+
+    mutable std::mutex m_mutex;   ///< guards what follows
+    HttpConnection* m_connection; ///< null: closed
+    std::size_t m_unsent = 0;     ///< bytes handed over and not yet taken
+    const std::function<void()> m_changed;
+};
+
+#endif
