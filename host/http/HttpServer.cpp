@@ -341,7 +341,6 @@ void HttpServer::Network::stop(Clock::time_point limit) {
 }
 
 void HttpServer::Network::abandon(Clock::time_point limit) {
-    m_context.isStopping = true;
     onEachConnection([](HttpConnection& connection) { connection.cancel(); });
     m_dispatcher.close(limit);
 }

@@ -173,7 +173,7 @@ void readFraming(const Message& message, IncomingRequest& incoming) {
     incoming.hasBody = incoming.isChunked || incoming.length.value_or(0) > 0;
 }
 
-void readMessage(const Message& message, IncomingRequest& incoming) {
+void readMessage(const Message& message, bool livesOn, IncomingRequest& incoming) {
     checkSingle(message);
     incoming.headers = {find(message, http::field::host), find(message, http::field::origin),
                         find(message, http::field::authorization)};
@@ -189,7 +189,7 @@ void readMessage(const Message& message, IncomingRequest& incoming) {
         !incoming.isHttp10 &&
         isSame(find(message, http::field::expect).value_or(""), "100-continue");
     // Nothing that stands behind chunks, whose form leaves much open, is taken for a request.
-    incoming.isLast = incoming.isChunked || !message.keep_alive();
+    incoming.isLast = incoming.isChunked || !livesOn;
 }
 
 } // namespace
@@ -229,6 +229,12 @@ std::size_t RequestParser::Engine::put(std::string_view bytes) {
     if (!m_parser.is_header_done()) {
         return putHead(bytes);
     }
+    // The parser takes it for granted that it never sees less than the end of a body in chunks when
+    // it has begun to look for that end.
+    constexpr std::size_t endOfChunks = 5;
+    if (m_parser.chunked() && bytes.size() < endOfChunks) {
+        return 0;
+    }
     boost::beast::error_code error;
     const std::size_t taken =
         m_parser.put(boost::asio::const_buffer(bytes.data(), bytes.size()), error);
@@ -247,9 +253,9 @@ std::size_t RequestParser::Engine::putHead(std::string_view bytes) {
     m_lines.add(bytes.substr(0, taken));
     constexpr std::size_t emptyLine = 4; // with the end of the line before it
     const bool isEnded = m_parser.is_header_done();
-    const std::size_t size =
-        isEnded ? m_lines.total - emptyLine : m_lines.total + bytes.size() - taken;
-    if (size > largestHead) {
+    const std::size_t seen = m_lines.total + (isEnded ? 0 : bytes.size() - taken);
+    const std::size_t end = isEnded ? emptyLine : emptyLine - 1; // of which a part may be there
+    if (seen > largestHead + end) {
         error = http::error::header_limit;
     }
     if (error && error != http::error::need_more) {
@@ -275,7 +281,7 @@ IncomingRequest RequestParser::Engine::takeHead() {
     }
     if (!incoming.problem) {
         try {
-            readMessage(message, incoming);
+            readMessage(message, m_parser.keep_alive(), incoming);
         } catch (const RequestRefused& refused) {
             incoming.problem = refused.problem();
         }

@@ -9,7 +9,6 @@
 #include "host/framework/Sample.h"
 #include "host/history/WallClock.h"
 #include "host/http/AgentResource.h"
-#include "host/http/ApiToken.h"
 #include "host/http/EventStream.h"
 #include "host/http/EventsResource.h"
 #include "host/http/HealthResource.h"
@@ -28,7 +27,6 @@
 #include <string>
 #include <system_error>
 #include <utility>
-#include <variant>
 
 namespace {
 
@@ -96,6 +94,20 @@ void Serving::tick() {
     if (m_entries) {
         m_entries->tick(WallClock::now());
     }
+    renewCredentials();
+}
+
+void Serving::renewCredentials() {
+    if (!m_credentials) {
+        return;
+    }
+    const Credentials::Change change = m_credentials->refresh();
+    if (change.isNew) {
+        m_http.renew(m_credentials->token(), m_credentials->tls());
+    }
+    if (!change.problem.empty()) {
+        say("HTTP: %s", change.problem.c_str());
+    }
 }
 
 void Serving::addResources(TableManager& entries) {
@@ -144,32 +156,19 @@ void Serving::startHttp(const HostConfig& config) {
     }
     const std::string path = config.http.tokenFile.empty() ? config.stateDirectory + "/api-token"
                                                            : config.http.tokenFile;
-    auto token = ApiToken::load(path);
-    std::string problem;
-    if (const auto* const noToken = std::get_if<std::string>(&token)) {
-        problem = *noToken;
-    } else {
-        problem = startHttp(config.http, std::move(std::get<ApiToken>(token)));
+    m_credentials.emplace(path, config.http.certificate, config.http.key);
+    std::string problem = m_credentials->load();
+    if (problem.empty()) {
+        problem = m_http.start(*config.http.listen, m_credentials->token(), m_credentials->tls());
     }
     if (!problem.empty()) {
+        m_credentials.reset();
         say("HTTP is off: %s", problem.c_str());
         return;
     }
     const ListenAddress address{config.http.listen->host, m_http.port()};
     say("HTTP at %s://%s/, token in %s", config.http.certificate.empty() ? "http" : "https",
         address.text().c_str(), path.c_str());
-}
-
-std::string Serving::startHttp(const HttpConfig& config, ApiToken token) {
-    std::shared_ptr<const TlsContext> tls;
-    if (!config.certificate.empty()) {
-        auto loaded = TlsContext::load(config.certificate, config.key);
-        if (std::string* const problem = std::get_if<std::string>(&loaded)) {
-            return std::move(*problem);
-        }
-        tls = std::get<std::shared_ptr<const TlsContext>>(std::move(loaded));
-    }
-    return m_http.start(*config.listen, std::move(token), std::move(tls));
 }
 
 void Serving::abandonHttp(Clock::time_point limit) {

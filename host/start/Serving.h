@@ -4,6 +4,7 @@
 #include "host/config/HostConfig.h"
 #include "host/events/Delivery.h"
 #include "host/history/EntryRecorder.h"
+#include "host/http/Credentials.h"
 #include "host/http/HttpServer.h"
 #include "host/http/Resource.h"
 #include "host/http/Router.h"
@@ -67,7 +68,7 @@ private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
             const RowLayout& layout);
 
-    std::string startHttp(const HttpConfig& config, ApiToken token);
+    void renewCredentials();
     void addResources(TableManager& entries);
     void addMetrics(const EventStream& stream);
     void addResource(std::unique_ptr<Resource> resource);
@@ -81,6 +82,7 @@ private:
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP
     AnalysisResource* m_analysis = nullptr;             ///< one of these
+    std::optional<Credentials> m_credentials;           ///< none: HTTP is off
     HttpServer m_http;
 };
 

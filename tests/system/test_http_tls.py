@@ -42,6 +42,14 @@ def make_certificate(directory, name="agent"):
     return certificate, key
 
 
+CERTIFICATES = {}
+
+
+def certificate_of(context):
+    """The file of the certificate that a client's context trusts."""
+    return CERTIFICATES[context]
+
+
 @pytest.fixture
 def serving(agent):
     """Starts the agent under TLS; (port, token, context of a client that trusts it)."""
@@ -56,7 +64,9 @@ def serving(agent):
         port, token_file = re.search(r"https://[\d.]+:(\d+)/, token in (.+)$", line).groups()
         with open(token_file, encoding="ascii") as stream:
             token = stream.read().strip()
-        return int(port), token, ssl.create_default_context(cafile=str(certificate))
+        context = ssl.create_default_context(cafile=str(certificate))
+        CERTIFICATES[context] = certificate
+        return int(port), token, context
 
     return start
 
@@ -114,6 +124,78 @@ def test_old_tls_and_no_tls_are_refused(serving):
         except ConnectionResetError:
             pass
     assert ask(port, token, context)[0] == 200
+
+
+def test_only_suites_with_forward_secrecy_are_spoken(serving):
+    port, token, context = serving()
+
+    def agreed(ciphers):
+        old = ssl.create_default_context(cafile=str(certificate_of(context)))
+        old.maximum_version = ssl.TLSVersion.TLSv1_2
+        old.set_ciphers(ciphers)
+        with socket.create_connection(("127.0.0.1", port), timeout=PATIENCE) as raw:
+            with old.wrap_socket(raw, server_hostname="agent.example") as secured:
+                return secured.cipher()[0]
+
+    assert agreed("ECDHE+AESGCM").startswith("ECDHE-ECDSA-AES")
+    assert "CHACHA20" in agreed("ECDHE+CHACHA20")
+    for weak in ("ECDHE-ECDSA-AES256-SHA", "ECDHE-ECDSA-AES128-SHA256", "AES256-GCM-SHA384", "AES128-SHA"):
+        with pytest.raises((ssl.SSLError, OSError)):
+            agreed(weak)
+    with socket.create_connection(("127.0.0.1", port), timeout=PATIENCE) as raw:
+        with context.wrap_socket(raw, server_hostname="agent.example") as secured:
+            assert secured.version() == "TLSv1.3", "what both know is preferred"
+
+
+def test_browsers_are_told_to_stay_with_tls(agent, serving):
+    port, token, context = serving()
+    connection = http.client.HTTPSConnection("127.0.0.1", port, context=context, timeout=PATIENCE)
+    for path in ("/healthz", "/none"):
+        connection.request("GET", path)
+        response = connection.getresponse()
+        response.read()
+        assert response.getheader("Strict-Transport-Security") == "max-age=31536000"
+    connection.close()
+
+
+def test_a_changed_token_and_certificate_are_taken_over(agent, serving):
+    port, token, context = serving()
+    kept = http.client.HTTPSConnection("127.0.0.1", port, context=context, timeout=PATIENCE)
+
+    def status(token):
+        kept.request("GET", "/api/v1/status", headers={"Authorization": f"Bearer {token}"})
+        response = kept.getresponse()
+        response.read()
+        return response.status
+
+    assert status(token) == 200
+    descriptor = kept.sock.fileno()
+    token_file = agent.directory / "state" / "api-token"
+    renewed = "x" * 64
+    token_file.write_text(renewed)
+    wait_until(lambda: status(renewed) == 200, "the new token")
+    assert status(token) == 401
+    # A broken certificate is reported once, and the one before serves on.
+    certificate, key = agent.directory / "agent.pem", agent.directory / "agent.key"
+    whole = certificate.read_text()
+    certificate.write_text("nonsense")
+    agent.wait_trace("HTTP: the certificate before goes on: cannot use the certificate")
+    assert ask(port, renewed, context)[0] == 200
+    certificate.write_text(whole)
+    make_certificate(agent.directory)
+
+    def served():
+        fresh = ssl.create_default_context(cafile=str(certificate))
+        try:
+            return ask(port, renewed, fresh)[0] == 200
+        except ssl.SSLError:
+            return False
+
+    wait_until(served, "the new certificate")
+    assert key.exists() and status(renewed) == 200
+    assert kept.sock.fileno() == descriptor, "the connection lives on"
+    assert len(agent.trace("the certificate before goes on")) == 1
+    kept.close()
 
 
 def test_clients_that_never_finish_the_handshake_hold_nobody_up(agent, serving):

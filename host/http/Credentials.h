@@ -1,0 +1,48 @@
+#ifndef ZRM_HOST_CREDENTIALS_H
+#define ZRM_HOST_CREDENTIALS_H
+
+#include "host/config/WatchedFile.h"
+#include "host/http/ApiToken.h"
+#include "host/http/TlsContext.h"
+
+#include <memory>
+#include <optional>
+#include <string>
+
+/// The API token and the certificate with its key, read from their files again when these change.
+/// What was read last serves on while a changed file cannot be used. One thread.
+class Credentials {
+public:
+    /// Paths; certificate and key are empty without TLS.
+    Credentials(std::string token, std::string certificate, std::string key);
+
+    /// Reads everything for the first time. Returns what is wrong, empty when nothing is.
+    std::string load();
+
+    /// What came of a look at the files.
+    struct Change {
+        bool isNew = false;  ///< token() or tls() is another one
+        std::string problem; ///< why a changed file is not used, once for each change; else empty
+    };
+    /// Looks whether the files have changed, and reads those that have. Called about once a second.
+    Change refresh();
+
+    /// After load.
+    const ApiToken& token() const { return *m_token; }
+    /// Null without TLS.
+    const std::shared_ptr<const TlsContext>& tls() const noexcept { return m_tls; }
+
+private:
+    std::string loadToken();
+    std::string loadTls();
+    void refreshTls(Change& change);
+
+    WatchedFile m_tokenFile;
+    WatchedFile m_certificateFile;
+    WatchedFile m_keyFile;
+    std::optional<ApiToken> m_token;
+    std::shared_ptr<const TlsContext> m_tls;
+    bool m_isTriedAgain = false; ///< certificate and key, of which one may come after the other
+};
+
+#endif
