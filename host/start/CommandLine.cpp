@@ -1,78 +1,107 @@
 #include "host/start/CommandLine.h"
 
 #include <algorithm>
-#include <array>
+#include <cstddef>
 #include <string_view>
+#include <vector>
+
+#include <CLI/CLI.hpp>
 
 namespace {
 
-struct Option {
-    std::string_view name;
-    std::string_view argument; ///< empty: the option takes none
-    std::string_view help;
+/// The values of the options.
+struct Values {
+    std::string config;
+    std::string traceFile;
+    bool version = false;
+    bool help = false;
 };
 
-enum OptionIndex { CONFIG, TRACE_FILE, VERSION, HELP };
+/// The options, in the order in which they are listed. Each may be given again; the last one
+/// counts.
+void addOptions(CLI::App& app, Values& values) {
+    app.set_help_flag(); // so that what is wrong beside --help is reported
+    app.add_option("--config", values.config,
+                   "host configuration (default /etc/zrm/zrm.toml when it exists)")
+        ->type_name("FILE")
+        ->expected(0, 1) // what is missing is reported below
+        ->take_last();
+    app.add_option("--trace-file", values.traceFile,
+                   "append the trace to FILE instead of standard error")
+        ->type_name("FILE")
+        ->expected(0, 1) // what is missing is reported below
+        ->take_last();
+    app.add_flag("--version", values.version, "print the version and end")
+        ->disable_flag_override()
+        ->take_last();
+    app.add_flag("--help", values.help, "print this help and end")
+        ->disable_flag_override()
+        ->take_last();
+}
 
-constexpr std::array<Option, 4> options = {{
-    {"--config", "FILE", "host configuration (default /etc/zrm/zrm.toml when it exists)"},
-    {"--trace-file", "FILE", "append the trace to FILE instead of standard error"},
-    {"--version", "", "print the version and end"},
-    {"--help", "", "print this help and end"},
-}};
+/// The name of an option that has no value, or an empty one; empty when all have theirs.
+std::string withoutValue(const CLI::App& app) {
+    for (const CLI::Option* const option : app.get_options()) {
+        const bool takesFile = option->get_expected_max() > 0;
+        const std::vector<std::string>& values = option->results();
+        if (takesFile && option->count() > 0 && (values.empty() || values.back().empty())) {
+            return option->get_name();
+        }
+    }
+    return "";
+}
+
+/// The name of a flag that was given a value.
+std::string flagWithValue(const CLI::App& app, std::span<const char* const> arguments) {
+    for (const CLI::Option* const option : app.get_options()) {
+        const std::string begin = option->get_name() + '=';
+        if (option->get_expected_max() == 0 &&
+            std::any_of(arguments.begin(), arguments.end(), [&](const char* argument) {
+                return std::string_view(argument).starts_with(begin);
+            })) {
+            return option->get_name();
+        }
+    }
+    return "an option";
+}
 
 } // namespace
 
 CommandLine::CommandLine(std::span<const char* const> arguments) {
-    for (std::size_t at = 0; at < arguments.size() && m_error.empty(); ++at) {
-        const std::string_view argument = arguments[at];
-        const std::size_t equals = argument.find('=');
-        const std::string_view name = argument.substr(0, equals);
-        const auto option = std::find_if(options.begin(), options.end(),
-                                         [&](const Option& known) { return known.name == name; });
-        if (option == options.end()) {
-            m_error = "unknown argument '" + std::string(argument) + "'";
-            return;
-        }
-        const bool hasValue = equals != std::string_view::npos;
-        std::string value;
-        if (option->argument.empty()) {
-            m_error = hasValue ? std::string(name) + " takes no value" : "";
-        } else if (hasValue) {
-            value = argument.substr(equals + 1);
-        } else if (at + 1 < arguments.size()) {
-            value = arguments[++at];
-        }
-        if (!option->argument.empty() && value.empty()) {
-            m_error = std::string(name) + " needs a file name";
-        }
-        switch (static_cast<OptionIndex>(option - options.begin())) {
-        case CONFIG:
-            m_config = value;
-            break;
-        case TRACE_FILE:
-            m_traceFile = value;
-            break;
-        case VERSION:
-            m_version = true;
-            break;
-        case HELP:
-            m_help = true;
-            break;
-        }
+    CLI::App app;
+    Values values;
+    addOptions(app, values);
+    try {
+        app.parse(std::vector<std::string>(arguments.rbegin(), arguments.rend())); // last one first
+        const std::string name = withoutValue(app);
+        m_error = name.empty() ? "" : name + " needs a file name";
+    } catch (const CLI::ExtrasError&) {
+        m_error = "unknown argument '" + app.remaining().front() + "'";
+    } catch (const CLI::ArgumentMismatch&) {
+        m_error = flagWithValue(app, arguments) + " takes no value";
+    } catch (const CLI::ParseError& error) {
+        m_error = error.what();
     }
+    m_config = values.config;
+    m_traceFile = values.traceFile;
+    m_version = values.version;
+    m_help = values.help;
 }
 
 std::string CommandLine::help() {
+    CLI::App app;
+    Values values;
+    addOptions(app, values);
     std::string text = "Usage: zrmagent [OPTION]...\n"
                        "Watches log files and reports their new entries as events.\n\n";
-    for (const Option& option : options) {
-        std::string left = "  " + std::string(option.name);
-        if (!option.argument.empty()) {
-            left += ' ' + std::string(option.argument);
+    for (const CLI::Option* const option : app.get_options()) {
+        constexpr std::size_t column = 22;
+        std::string left = "  " + option->get_name();
+        if (option->get_expected_max() > 0) {
+            left += ' ' + option->get_type_name();
         }
-        left.resize(std::max<std::size_t>(left.size() + 2, 22), ' ');
-        text += left + std::string(option.help) + '\n';
+        left.resize(std::max(left.size() + 2, column), ' ');
+        text += left + option->get_description() + '\n';
     }
     return text + "\nSignals: HUP re-reads the configuration of the logs, INT and TERM end the "
                   "agent.\nExit status: 0 after an orderly end, 2 for an unusable command line or "
