@@ -7,8 +7,12 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <chrono>
 #include <csignal>
+#include <memory>
 #include <mutex>
+#include <string>
+#include <thread>
 #include <vector>
 
 #include <nlohmann/json.hpp>
@@ -18,9 +22,6 @@
 using testing::ElementsAre;
 
 namespace {
-
-using httplib::Request;
-using httplib::Response;
 
 /// An agent whose stream gives what a test has scripted for each connection, and then ends it, or
 /// stays silent when that was the last. The operator presses Ctrl-C when the last event has come.
@@ -44,35 +45,37 @@ protected:
     }
 
     void addRoutes() {
-        agent.routes().Get("/api/v1/events", [this](const Request&, Response& response) {
-            response.set_content("{\"events\":[],\"newest\":" + std::to_string(newest) + "}",
-                                 "application/json");
+        agent.routes().add("GET", "/api/v1/events", [this](const HttpRequest&) {
+            return HttpAnswer::json("{\"events\":[],\"newest\":" + std::to_string(newest) + "}");
         });
-        agent.routes().Get(
-            "/api/v1/events/stream",
-            [this](const Request& request, Response& response) { stream(request, response); });
+        agent.routes().add("GET", "/api/v1/events/stream",
+                           [this](const HttpRequest& request) { return stream(request); });
     }
 
-    void stream(const Request& request, Response& response) {
+    static std::string parameter(const HttpRequest& request, const std::string& name) {
+        const auto found = request.query.find(name);
+        return found == request.query.end() ? "" : found->second;
+    }
+
+    HttpAnswer stream(const HttpRequest& request) {
         const std::lock_guard guard(mutex);
-        asked.push_back(request.get_param_value("after"));
-        situations.push_back(request.get_param_value("situation"));
+        asked.push_back(parameter(request, "after"));
+        situations.push_back(parameter(request, "situation"));
         const std::size_t number = asked.size() - 1;
         if (number < parts.size() && parts[number].status != 200) {
-            response.status = parts[number].status;
-            response.set_content(parts[number].text, "application/problem+json");
-            return;
+            return {parts[number].status, "application/problem+json", parts[number].text};
         }
         const bool isLast = number + 1 >= parts.size();
         const std::string text = number < parts.size() ? parts[number].text : "";
-        response.set_chunked_content_provider(
-            "text/event-stream", [this, text, isLast](std::size_t, httplib::DataSink& sink) {
-                sink.write(text.data(), text.size());
-                while (isLast && !ends && sink.is_writable()) {
-                    std::this_thread::sleep_for(std::chrono::milliseconds(5));
-                }
-                return false; // breaks the connection off
-            });
+        HttpAnswer answer;
+        answer.contentType = "text/event-stream";
+        answer.stream.begin = [text, isLast](const std::shared_ptr<BodyChannel>& channel) {
+            channel->send(text);
+            if (!isLast) {
+                channel->end();
+            }
+        };
+        return answer;
     }
 
     std::vector<std::uint64_t> follow(std::uint64_t after, std::uint64_t lastEvent) {
@@ -88,7 +91,6 @@ protected:
                 kill(getpid(), SIGINT);
             }
         });
-        ends = true;
         return ids;
     }
 
@@ -105,7 +107,6 @@ protected:
     std::vector<std::string> asked;
     std::vector<std::string> situations;
     std::vector<std::string> notes;
-    std::atomic<bool> ends{false};
     std::atomic<int> received{0}; ///< events
 };
 

@@ -14,8 +14,6 @@
 
 namespace {
 
-using httplib::Request;
-using httplib::Response;
 using testing::EndsWith;
 using testing::HasSubstr;
 
@@ -23,19 +21,17 @@ class ProgramTest : public testing::Test {
 protected:
     void SetUp() override {
         setenv("ZRM_TOKEN", "the-token", 1);
-        answer = [](const Request&, Response&) {};
-        const auto respond = [this](const Request& request, Response& response) {
-            answer(request, response);
-        };
-        agent.routes().Get(".*", respond).Post(".*", respond).Put(".*", respond);
+        answer = [](const HttpRequest&) { return HttpAnswer{200, "text/plain", ""}; };
+        for (const char* const method : {"GET", "POST", "PUT"}) {
+            agent.routes().add(method, "/*",
+                               [this](const HttpRequest& request) { return answer(request); });
+        }
         agent.begin();
     }
     void TearDown() override { unsetenv("ZRM_TOKEN"); }
 
     void answerWith(const std::string& body) {
-        answer = [=](const Request&, Response& response) {
-            response.set_content(body, "application/json");
-        };
+        answer = [=](const HttpRequest&) { return HttpAnswer::json(body); };
     }
     /// Runs zrmctl; its output and errors are kept.
     int run(std::vector<std::string> arguments) {
@@ -57,7 +53,7 @@ protected:
 
     TemporaryDirectory directory;
     TestAgent agent;
-    std::function<void(const Request&, Response&)> answer;
+    std::function<HttpAnswer(const HttpRequest&)> answer;
     std::string output;
     std::string errors;
 };
@@ -132,7 +128,10 @@ TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
 
 TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
     bool isAsked = false;
-    answer = [&](const Request&, Response&) { isAsked = true; };
+    answer = [&](const HttpRequest&) {
+        isAsked = true;
+        return HttpAnswer::json("{}");
+    };
     for (const std::vector<std::string>& command :
          {std::vector<std::string>{"situations", "add", "caf\xe9"},
           {"situations", "add", "x", "--text", "caf\xe9"},
@@ -148,9 +147,9 @@ TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
 
 TEST_F(ProgramTest, OneThingIsExplained) {
     std::string asked;
-    answer = [&](const Request& request, Response& response) {
+    answer = [&](const HttpRequest& request) {
         asked = request.body;
-        response.set_content(R"({"explanations":[{}]})", "application/json");
+        return HttpAnswer::json(R"({"explanations":[{}]})");
     };
     EXPECT_EQ(run({"explain", "x"}), CLI_DONE);
     EXPECT_EQ(asked, R"({"situation":"x","last":5})");
@@ -171,11 +170,11 @@ TEST_F(ProgramTest, OneThingIsExplained) {
 
 TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
     std::string put;
-    answer = [&](const Request& request, Response& response) {
+    answer = [&](const HttpRequest& request) {
         put = request.method == "PUT" ? request.body : put;
-        response.set_content(R"({"name":"x","text":"t","severity":"info","log":"/l",)"
-                             R"("when":["a"],"frequency":">= 5","period":"60s","state":"running"})",
-                             "application/json");
+        return HttpAnswer::json(
+            R"({"name":"x","text":"t","severity":"info","log":"/l",)"
+            R"("when":["a"],"frequency":">= 5","period":"60s","state":"running"})");
     };
     EXPECT_EQ(run({"situations", "set", "x", "--frequency", "", "--period", ""}), CLI_DONE);
     EXPECT_EQ(put, R"({"name":"x","text":"t","severity":"info","log":"/l","when":["a"]})");

@@ -2,46 +2,44 @@
 #define TEST_AGENT_H
 
 #include "host/cli/AgentAccess.h"
+#include "host/http/HttpServer.h"
+#include "host/http/Router.h"
 
+#include <chrono>
+#include <cstdint>
 #include <memory>
 #include <string>
-#include <thread>
 
-#include <httplib.h>
-
-/// A server that answers as a test says. Routes are added before `begin`.
+/// An agent that answers as a test says: the agent's own server with other routes, which are added
+/// before `begin`.
 class TestAgent {
 public:
     ~TestAgent() { end(); }
 
-    httplib::Server& routes() { return *m_server; }
+    Router& routes() { return *m_router; }
 
     /// Begins to serve, at the port of the time before when there was one.
     void begin() {
-        m_server->set_keep_alive_timeout(1);
-        m_port = m_port == 0 ? m_server->bind_to_any_port("127.0.0.1")
-                             : (m_server->bind_to_port("127.0.0.1", m_port) ? m_port : -1);
-        m_thread = std::thread([this] { m_server->listen_after_bind(); });
-        while (!m_server->is_running()) {
-            std::this_thread::yield();
-        }
+        m_server = std::make_unique<HttpServer>(*m_router);
+        m_server->start({"127.0.0.1", m_port}, ApiToken("the-token"));
+        m_port = m_server->port();
     }
     /// Ends, and forgets its routes.
     void end() {
-        if (m_thread.joinable()) {
-            m_server->stop();
-            m_thread.join();
+        if (m_server != nullptr) {
+            m_server->stop(HttpServer::Clock::now() + std::chrono::seconds(10));
         }
-        m_server = std::make_unique<httplib::Server>();
+        m_server.reset();
+        m_router = std::make_unique<Router>();
     }
     AgentAccess connection() const {
         return {"http://127.0.0.1:" + std::to_string(m_port), "the-token", "its file"};
     }
 
 private:
-    std::unique_ptr<httplib::Server> m_server = std::make_unique<httplib::Server>();
-    int m_port = 0;
-    std::thread m_thread;
+    std::unique_ptr<Router> m_router = std::make_unique<Router>();
+    std::unique_ptr<HttpServer> m_server;
+    std::uint16_t m_port = 0;
 };
 
 #endif
