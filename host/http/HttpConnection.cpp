@@ -17,15 +17,11 @@ TRC1_Anchor anchor{"HttpConnection.cpp"};
 
 constexpr milliseconds openTime = 10s; ///< for what goes before the first request
 constexpr milliseconds idleTime = 15s;
-constexpr milliseconds idleTimeWhenTight = 1s;  ///< where there is little room for others
-constexpr milliseconds requestTime = 10s;       ///< for head and body together
-constexpr milliseconds workerTime = 3s;         ///< until a worker takes the request
-constexpr milliseconds answerTime = 60s;        ///< for the handler, and again for the sending
-constexpr milliseconds cancelledTime = 2s;      ///< for a handler to end early
-constexpr milliseconds noProgress = 5s;         ///< for a client that takes no byte
-constexpr milliseconds noProgressAtTheEnd = 1s; ///< the same while the server stops
-constexpr milliseconds leavingTime = 1s;
-constexpr milliseconds forEver = milliseconds::max();
+constexpr milliseconds idleTimeWhenTight = 1s;       ///< where there is little room for others
+constexpr milliseconds requestTime = 10s;            ///< for head and body together
+constexpr milliseconds workerTime = 3s;              ///< until a worker takes the request
+constexpr milliseconds answerTime = 60s;             ///< for the handler
+constexpr milliseconds cancelledTime = 2s;           ///< for a handler to end early
 constexpr std::size_t mostDropped = 4 * 1024 * 1024; ///< bytes
 /// Received behind a head: a body in chunks of a few bytes each is several times as long as what it
 /// says.
@@ -151,11 +147,11 @@ void HttpConnection::stop() {
         break;
     case WRITING:
         m_isLast = true;
-        setTimer(noProgressAtTheEnd);
+        setTimer(progressTime());
         break;
     case STREAMING:
         dropChannel();
-        setTimer(noProgressAtTheEnd);
+        setTimer(progressTime());
         endStream();
         break;
     case LEAVING:
@@ -383,147 +379,4 @@ void HttpConnection::answered(const std::shared_ptr<Job>& job, HttpAnswer answer
     }
     m_job.reset();
     write(std::move(answer));
-}
-
-// -------------------------------------------------------------------------------------- sending
-
-void HttpConnection::write(HttpAnswer answer) {
-    m_isLast = m_isLast || m_context.isStopping || (answer.stream && m_isHttp10);
-    m_head = ResponseText::head(answer, {m_isLast, m_isHttp10, m_isTls});
-    m_body = m_isHead || answer.stream ? "" : std::move(answer.body);
-    m_written = 0;
-    m_writeLimit = Clock::now() + answerTime;
-    enter(WRITING, progressTime());
-    if (answer.stream && !m_isHead) {
-        writeParts([this, stream = std::move(answer.stream)] { beginStream(stream); });
-    } else {
-        writeParts([this] { afterAnswer(); });
-    }
-}
-
-milliseconds HttpConnection::progressTime() const {
-    return m_context.isStopping ? noProgressAtTheEnd : noProgress;
-}
-
-/// Sends what is left of head and body.
-void HttpConnection::writeParts(std::function<void()> whenWritten) {
-    boost::asio::const_buffer head = boost::asio::buffer(m_head);
-    boost::asio::const_buffer body = boost::asio::buffer(m_body);
-    const std::size_t inBody = m_written > head.size() ? m_written - head.size() : 0;
-    head += m_written;
-    body += inBody;
-    m_stream->write({head, body}, [self = shared_from_this(), whenWritten = std::move(whenWritten)](
-                                      const Error& error, std::size_t count) mutable {
-        self->onWritten(error, count, std::move(whenWritten));
-    });
-}
-
-void HttpConnection::onWritten(const Error& error, std::size_t count,
-                               std::function<void()> whenWritten) {
-    if (m_phase == CLOSED) {
-        return;
-    }
-    if (error) {
-        close();
-        return;
-    }
-    m_written += count;
-    if (m_written == m_head.size() + m_body.size()) {
-        whenWritten();
-    } else if (m_phase == WRITING && Clock::now() >= m_writeLimit) {
-        close();
-    } else {
-        if (m_phase != READING_BODY) { // what asks for a body does not put the end of its time off
-            setTimer(progressTime());
-        }
-        writeParts(std::move(whenWritten));
-    }
-}
-
-void HttpConnection::afterAnswer() {
-    m_head.clear();
-    m_body = {}; // it may have been large
-    if (m_isLast || m_context.isStopping) {
-        leave();
-    } else {
-        waitForRequest();
-    }
-}
-
-/// Lets the client have what was sent: says that there is no more, and throws away what it still
-/// sends, for a short time. Closing at once would take away what it has not read yet.
-void HttpConnection::leave() {
-    enter(LEAVING, leavingTime);
-    m_stream->sayFarewell([self = shared_from_this()](const Error&, std::size_t) {
-        Error ignored;
-        if (self->m_phase == LEAVING) {
-            self->m_stream->socket().shutdown(boost::asio::ip::tcp::socket::shutdown_send, ignored);
-            self->readMoreOrClose();
-        }
-    });
-}
-
-void HttpConnection::beginStream(const HttpAnswer::Stream& stream) {
-    enter(STREAMING, forEver);
-    m_isStreamOver = false;
-    m_isWritingStream = false;
-    m_channel = std::make_shared<StreamChannel>(*this, stream.changed);
-    if (m_context.isStopping) {
-        stop();
-        return;
-    }
-    readMore();
-    stream.begin(m_channel);
-}
-
-void HttpConnection::sendInStream(const std::string& text) {
-    if (m_phase != STREAMING || m_isStreamOver) {
-        return;
-    }
-    m_streamText += m_isHttp10 ? text : ResponseText::chunk(text);
-    m_streamBytes += text.size();
-    writeStream();
-}
-
-void HttpConnection::endStream() {
-    if (m_phase != STREAMING || m_isStreamOver) {
-        return;
-    }
-    m_isStreamOver = true;
-    m_streamText += m_isHttp10 ? "" : ResponseText::lastChunk();
-    writeStream();
-}
-
-void HttpConnection::writeStream() {
-    if (m_isWritingStream) {
-        return;
-    }
-    if (m_streamText.empty()) {
-        if (m_isStreamOver) {
-            dropChannel();
-            afterAnswer();
-        } else {
-            setTimer(forEver);
-        }
-        return;
-    }
-    m_isWritingStream = true;
-    m_head = std::exchange(m_streamText, {});
-    m_body.clear();
-    m_written = 0;
-    setTimer(progressTime());
-    writeParts([this, bytes = std::exchange(m_streamBytes, 0)] {
-        m_isWritingStream = false;
-        m_head.clear();
-        if (m_channel != nullptr) {
-            m_channel->taken(bytes);
-        }
-        writeStream();
-    });
-}
-
-void HttpConnection::dropChannel() {
-    if (const auto channel = std::exchange(m_channel, nullptr)) {
-        channel->close();
-    }
 }

@@ -72,6 +72,7 @@ private:
     struct Job;
     using Error = ClientStream::Error;
     using Clock = std::chrono::steady_clock;
+    static constexpr std::chrono::milliseconds forEver = std::chrono::milliseconds::max();
 
     void enter(Phase phase, std::chrono::milliseconds time);
     void setTimer(std::chrono::milliseconds time);
