@@ -36,7 +36,7 @@ def test_status_tells_how_the_agent_is(serving):
     assert answer["version"]
     assert answer["node"].endswith(":ZRM")
     assert as_iso(before - 60) <= answer["started"] <= answer["time"] <= as_iso(before + 60)
-    assert set(answer["history"]) == {"enabled", "events", "oldest", "newest", "bytes", "problem"}
+    assert set(answer["history"]) == {"enabled", "events", "oldest", "newest", "bytes", "damaged", "problem"}
     assert answer["queue"]["size"] == 0 and answer["queue"]["capacity"] > 0
     assert answer["queue"]["waits"] == 0
     (sink,) = answer["sinks"]
