@@ -7,6 +7,7 @@
 #include <cstring>
 #include <new>
 #include <string_view>
+#include <utility>
 
 namespace {
 
@@ -53,31 +54,58 @@ StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* va
     }
 }
 
-StringParser::StringParser(const char** formatPosition) {
+StringParser::StringParser(const char** formatPosition)
+    : StringParser(formatPosition, OneDirective{}) {
+    if (ObjectStatus == OBJECT_LEARNED && !learnRest(formatPosition)) {
+        destroyRest();
+        ObjectStatus = OBJECT_FAILED;
+    }
+}
+
+StringParser::StringParser(const char** formatPosition, OneDirective) {
     TraceScope trace(anchor);
     initThis();
     const char* const begin = *formatPosition;
     *formatPosition = formatNextDirective(begin);
     m_distanceToEnd = static_cast<std::size_t>(*formatPosition - begin);
-    if (ObjectStatus != OBJECT_LEARNED) {
-        return;
-    }
-    ScanOrder.reset(new (std::nothrow) StringParser(formatPosition));
-    if (!ScanOrder) {
-        trace.error()("Memory allocation for %d bytes failed.",
-                      static_cast<int>(sizeof(StringParser)));
-        ObjectStatus = OBJECT_FAILED;
-    } else if (ScanOrder->ObjectStatus != OBJECT_LEARNED) {
-        if (ScanOrder->ObjectStatus == OBJECT_FAILED) {
-            ObjectStatus = OBJECT_FAILED;
+}
+
+/// Learns the directives behind this one, node by node: a node that learned the next one would
+/// take as much stack as a format has directives. False when one of them fails.
+bool StringParser::learnRest(const char** formatPosition) {
+    TraceScope trace(anchor);
+    for (StringParser* last = this;; last = last->ScanOrder.get()) {
+        last->ScanOrder.reset(new (std::nothrow) StringParser(formatPosition, OneDirective{}));
+        if (!last->ScanOrder) {
+            trace.error()("Memory allocation for %d bytes failed.",
+                          static_cast<int>(sizeof(StringParser)));
+            return trace.result(false);
         }
-        ScanOrder.reset();
+        if (last->ScanOrder->ObjectStatus != OBJECT_LEARNED) {
+            const bool isAtEnd = last->ScanOrder->ObjectStatus == OBJECT_NO_DIRECTIVE;
+            last->ScanOrder.reset();
+            return trace.result(isAtEnd);
+        }
+    }
+}
+
+/// Destroys the nodes behind this one, the last one first and none from within another.
+void StringParser::destroyRest() noexcept {
+    std::unique_ptr<StringParser> reversed;
+    while (ScanOrder) {
+        std::unique_ptr<StringParser> rest = std::move(ScanOrder->ScanOrder);
+        ScanOrder->ScanOrder = std::move(reversed);
+        reversed = std::move(ScanOrder);
+        ScanOrder = std::move(rest);
+    }
+    while (reversed) {
+        reversed = std::move(reversed->ScanOrder);
     }
 }
 
 StringParser::~StringParser() {
     TraceScope trace(anchor);
-    ScanOrder.reset();
+    destroyRest();
     ScanDirective.reset();
     PrintDirective.reset();
     if (Value && findDataType(DataType) == nullptr) {

@@ -138,6 +138,11 @@ protected:
     std::unique_ptr<unsigned char[]> Value; ///< the receiving variable
 
 private:
+    struct OneDirective {}; ///< chooses the constructor that learns no chain
+
+    StringParser(const char** formatPosition, OneDirective);
+    bool learnRest(const char** formatPosition);
+    void destroyRest() noexcept;
     bool takeEscape(_BuildArea* area);
     int buildScanDirective(_BuildArea* area);
     bool copyScanSet(_BuildArea* area, bool& isEscapeBad);

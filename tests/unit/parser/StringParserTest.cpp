@@ -8,6 +8,9 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <string>
+
+#include <pthread.h>
 
 // A format as a whole: its beginning, the chain, the dump, the chain's end.
 
@@ -190,6 +193,46 @@ TEST(StringParser, LearnsAsManyDirectivesAsAConfigurationLineHolds) {
     const ParserProbe parser("A,\"" + directives + "%d\",day");
     EXPECT_TRUE(parser.isLearned());
     EXPECT_NE(parser.node(501), nullptr);
+}
+
+/// Runs the work on a thread with little stack, as those of requests have.
+void onASmallStack(void (*work)()) {
+    pthread_attr_t attributes;
+    ASSERT_EQ(pthread_attr_init(&attributes), 0);
+    ASSERT_EQ(pthread_attr_setstacksize(&attributes, 512 * 1024), 0);
+    pthread_t thread;
+    const auto start = [](void* argument) -> void* {
+        (*static_cast<void (**)()>(argument))();
+        return nullptr;
+    };
+    ASSERT_EQ(pthread_create(&thread, &attributes, start, &work), 0);
+    EXPECT_EQ(pthread_join(thread, nullptr), 0);
+    pthread_attr_destroy(&attributes);
+}
+
+std::string manyDirectives() {
+    std::string directives;
+    for (int i = 0; i < 20000; ++i) {
+        directives += "%*c";
+    }
+    return directives;
+}
+
+TEST(StringParser, TakesNoStackForEachDirective) {
+    onASmallStack([] {
+        const ParserProbe parser("A,\"" + manyDirectives() + "%d\",day");
+        EXPECT_TRUE(parser.isLearned());
+        EXPECT_NE(parser.node(20001), nullptr);
+    });
+}
+
+TEST(StringParser, TakesNoStackForEachDirectiveOfAFormatThatFails) {
+    onASmallStack([] {
+        const RecordingTrace trace(TRC1_ERROR);
+        EXPECT_FALSE(ParserProbe("A,\"" + manyDirectives() + "%y\",day").isLearned());
+        EXPECT_FALSE(ParserProbe("A,\"" + manyDirectives() + "%d\",nothing").isLearned());
+        EXPECT_EQ(trace.messages().size(), 2U);
+    });
 }
 
 } // namespace
