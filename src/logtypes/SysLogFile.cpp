@@ -197,7 +197,9 @@ char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     TraceScope trace(anchor);
     char now[stampLength];
     BrevanTime::generateCurrentTimestamp(now); // its year counts while monitoring
-    const bool isWhole = std::memchr(line, '\0', timeLength) == nullptr;
+    // A time that the line's end cuts short is none, the newline not its last digit.
+    const bool isWhole =
+        std::memchr(line, '\0', timeLength) == nullptr && line[timeLength - 1] != '\n';
     const unsigned month = isWhole ? monthNumber(line, twoDigits(now + yearLength)) : 0;
     if (month == 0) {
         return trace.result(line + std::strlen(line));

@@ -95,6 +95,7 @@ TEST_F(SyslogLine, TooShortForItsTimeIsLikeOneWithoutAMonth) {
     for (std::size_t length = 0; length < whole.size(); ++length) {
         SCOPED_TRACE(length);
         expectNothingTaken(rowOf(whole.substr(0, length)));
+        expectNothingTaken(rowOf(whole.substr(0, length) + "\n"));
     }
     // A NUL byte is a line's end too.
     expectNothingTaken(rowOf(std::string("Oct  5 07:0\0:09 host src: text\n", 32)));
