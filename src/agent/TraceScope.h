@@ -3,6 +3,7 @@
 
 #include "agent/framework/trace.h"
 
+#include <cstdint>
 #include <type_traits>
 
 /// Traces one operation: construction reads the source file's trace level and writes the entry
@@ -52,11 +53,12 @@ public:
     /// A record that is written whatever the level.
     Record always(int line = __builtin_LINE()) const noexcept { return {&m_anchor, line}; }
 
-    /// Remembers the operation's result for the exit event and passes it through.
+    /// Remembers the operation's result for the exit event, of a pointer the address, and passes
+    /// it through.
     template <typename Result> Result result(Result value) noexcept {
         m_hasResult = true;
         if constexpr (std::is_pointer_v<Result>) {
-            m_result = value != nullptr ? 1 : 0;
+            m_result = reinterpret_cast<std::intptr_t>(value);
         } else {
             m_result = static_cast<long>(value); // NOLINT(bugprone-signed-char-misuse): signed
         }

@@ -13,9 +13,11 @@ TRC1_Anchor anchor{"BrevanTime.cpp"};
 
 constexpr std::size_t stampLength = 16;
 
-/// The stamp of the second that the thread asked for last.
+/// The stamp of the second that the thread asked for last. It holds while the trace levels stay as
+/// they are, and not at all where the flow of operations is traced: each call is an operation then.
 struct CurrentStamp {
     std::time_t second = std::numeric_limits<std::time_t>::min();
+    unsigned generation = 0; ///< of the trace levels; 0: the stamp does not hold
     char text[stampLength] = {};
 };
 
@@ -37,9 +39,12 @@ void BrevanTime::generateTimestamp(long time, char* out) {
 
 void BrevanTime::generateCurrentTimestamp(char* out) {
     const std::time_t now = std::time(nullptr);
-    if (now != currentStamp.second) {
+    const unsigned generation = TRC1_Generation.load(std::memory_order_relaxed);
+    if (now != currentStamp.second || generation != currentStamp.generation) {
         generateTimestamp(now, currentStamp.text);
+        const bool isFlowTraced = (TRC1_Sync(anchor) & TRC1_FLOW) != 0;
         currentStamp.second = now;
+        currentStamp.generation = isFlowTraced ? 0 : generation;
     }
     std::memcpy(out, currentStamp.text, stampLength);
 }

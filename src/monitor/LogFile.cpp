@@ -232,7 +232,8 @@ void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) const {
 void LogFile::prepareRow(zrm_rmlogent_data_t* row) {
     TraceScope trace(anchor);
     char* const columns = reinterpret_cast<char*>(row);
-    if (row == &m_row && m_isRowPrepared) {
+    // With the flow of operations traced, each row has its columns filled by fillCommonColumns.
+    if (row == &m_row && m_isRowPrepared && !trace.isOn(TRC1_FLOW)) {
         constexpr std::size_t entry = offsetof(zrm_rmlogent_data_t, entrytime);
         constexpr std::size_t description = offsetof(zrm_rmlogent_data_t, entrydesc);
         constexpr std::size_t entryInUTF8 = offsetof(zrm_rmlogent_data_t, uentrysrc);

@@ -5,6 +5,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
+#include <string>
+
 namespace {
 
 TRC1_Anchor anchor{"TraceScopeTest.cpp"};
@@ -37,6 +40,22 @@ TEST(TraceScope, FlowClassWritesEntryAndExitWithTheResult) {
     { TraceScope scope(anchor); }
     EXPECT_THAT(trace.events(), ElementsAre("TraceScopeTest.cpp entry", "TraceScopeTest.cpp exit 7",
                                             "TraceScopeTest.cpp entry", "TraceScopeTest.cpp exit"));
+}
+
+const char* tracedPointer(const char* value) {
+    TraceScope trace(anchor);
+    return trace.result(value);
+}
+
+TEST(TraceScope, AnExitOfAPointerCarriesItsAddress) {
+    RecordingTrace trace(TRC1_FLOW);
+    const char* const text = "text";
+    tracedPointer(text);
+    tracedPointer(nullptr);
+    const auto address = std::to_string(reinterpret_cast<std::intptr_t>(text));
+    EXPECT_THAT(trace.events(),
+                ElementsAre("TraceScopeTest.cpp entry", "TraceScopeTest.cpp exit " + address,
+                            "TraceScopeTest.cpp entry", "TraceScopeTest.cpp exit 0"));
 }
 
 } // namespace

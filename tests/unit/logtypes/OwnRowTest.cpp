@@ -8,10 +8,12 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
 #include <random>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace {
 
@@ -77,8 +79,31 @@ std::string syslogLine(Random& random) {
     return line + "\n";
 }
 
+/// The entry and exit events of one entry in the log's own row.
+template <typename Log> std::vector<std::string> flowOf(Log& log, std::string entry) {
+    const RecordingTrace trace(TRC1_FLOW);
+    log.formatEntryAsRow(entry.data(), ownRow(log), nullptr);
+    return trace.events();
+}
+
 class OwnRowOfASyslog : public SyslogTest {};
 class OwnRowOfAUserLog : public UserLogTest {};
+
+TEST_F(OwnRowOfASyslog, HasTheSameFlowOfOperationsForEveryEntry) {
+    const std::string line = "Oct  5 11:59:59 web1 sshd[4]: text\n";
+    const std::vector<std::string> first = flowOf(*m_log, line);
+    EXPECT_EQ(std::count(first.begin(), first.end(), "LogFile.cpp entry"), 2)
+        << "the row's preparation and its common columns";
+    EXPECT_EQ(flowOf(*m_log, line), first);
+    expectSameRow(*m_log, line);
+}
+
+TEST_F(OwnRowOfAUserLog, HasTheSameFlowOfOperationsForEveryEntry) {
+    makeLog(R"(A,"%d %[^\n]", day description)");
+    const std::vector<std::string> first = flowOf(*m_log, "5 text\n");
+    EXPECT_EQ(std::count(first.begin(), first.end(), "LogFile.cpp entry"), 2);
+    EXPECT_EQ(flowOf(*m_log, "5 text\n"), first);
+}
 
 TEST_F(OwnRowOfASyslog, IsThatOfAFreshRow) {
     Random random(1);

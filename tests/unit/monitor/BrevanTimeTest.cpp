@@ -1,8 +1,10 @@
 #include "monitor/BrevanTime.h"
 
 #include "support/Faults.h"
+#include "support/RecordingTrace.h"
 #include "support/TimeZone.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -71,6 +73,25 @@ TEST(BrevanTime, TheCurrentStampAsksForLocalTimeOncePerSecond) {
     clock.set(1000000001);
     currentStamp();
     EXPECT_EQ(counter.calls(), 2);
+}
+
+TEST(BrevanTime, EachCurrentStampIsAnOperationWhereTheFlowIsTraced) {
+    const TimeZone zone("UTC0");
+    FakeClock clock(1000000000);
+    currentStamp();
+    RecordingTrace trace(TRC1_FLOW);
+    currentStamp();
+    currentStamp();
+    EXPECT_THAT(trace.events(),
+                testing::ElementsAre("BrevanTime.cpp entry", "BrevanTime.cpp exit",
+                                     "BrevanTime.cpp entry", "BrevanTime.cpp exit"));
+    trace.clear();
+    trace.setLevel(TRC1_ERROR);
+    currentStamp();
+    const Fault counter("localtime_r", 0, {.times = 0});
+    currentStamp();
+    EXPECT_EQ(counter.calls(), 0) << "without the flow a second has one";
+    EXPECT_THAT(trace.events(), testing::IsEmpty());
 }
 
 } // namespace
