@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <new>
+#include <string_view>
 
 namespace {
 
@@ -66,6 +67,26 @@ void LogBase::setLogFileName(const char* name, int isUTF8) {
         UTF8Conv::Convert_fromUTF8(buffer.get(), length + 1, LogFileNameUTF8.get(), length);
         LogFileNameLocal = newLogFileName(LogPathNameLengthLocal, buffer.get());
     }
+}
+
+bool LogBase::isNameKept(int isUTF8) const {
+    TraceScope trace(anchor);
+    const std::string_view nameUTF8 = fileNameUTF8();
+    const std::string_view nameLocal = fileNameLocal();
+    if (nameUTF8 == nameLocal || nameUTF8.empty() || nameLocal.empty()) {
+        return trace.result(true);
+    }
+    const bool isBackToUTF8 = isUTF8 == 1;
+    const std::string_view given = isBackToUTF8 ? nameUTF8 : nameLocal;
+    const std::string_view converted = isBackToUTF8 ? nameLocal : nameUTF8;
+    const std::size_t size = 3 * converted.size() + 1;
+    const std::unique_ptr<char[]> buffer = newText(trace, size);
+    if (isBackToUTF8) {
+        UTF8Conv::Convert_toUTF8(buffer.get(), size, converted.data(), converted.size(), 0);
+    } else {
+        UTF8Conv::Convert_fromUTF8(buffer.get(), size, converted.data(), converted.size());
+    }
+    return trace.result(given == buffer.get());
 }
 
 void LogBase::setLogProcedure(const char* procedure) {

@@ -23,6 +23,10 @@ public:
 
     /// Sets both names from one: UTF-8 when `isUTF8` is 1, else in the local code page.
     void setLogFileName(const char* name, int isUTF8);
+    /// False when a conversion has cut the name or put other characters into it, so that the one
+    /// name no longer stands for the file of the other: `isUTF8` says which one was given. A name
+    /// that has no other form at all, as without a code page, is not such a case.
+    bool isNameKept(int isUTF8) const;
     /// Stores a copy of the procedure; null stays null.
     void setLogProcedure(const char* procedure);
     /// Links this object in at the tail of the chain that `head` heads; null: a chain of one.

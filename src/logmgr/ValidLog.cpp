@@ -172,8 +172,19 @@ void ValidLog::takeFileName(const TraceScope& trace, const char* token) {
         Valid = false;
     } else {
         setLogFileName(token, 1);
-        Valid = LogPathNameLengthLocal != 0;
+        Valid = LogPathNameLengthLocal != 0 && isNameUsable(trace, 1);
     }
+}
+
+/// A name that its conversion has changed would be the name of another file.
+bool ValidLog::isNameUsable(const TraceScope& trace, int isUTF8) const {
+    const bool isUsable = isNameKept(isUTF8);
+    if (!isUsable) {
+        trace.error()("The name of file %s is not kept by a conversion between UTF-8 and the local "
+                      "code page. Ignoring remainder of line.",
+                      isUTF8 == 1 ? fileNameUTF8() : fileNameLocal());
+    }
+    return isUsable;
 }
 
 void ValidLog::takeType(const TraceScope& trace, const char* token) {
@@ -228,7 +239,7 @@ void ValidLog::extractFileName(char* line) {
         return;
     }
     setLogFileName(action, 2);
-    Valid = LogPathNameLengthLocal != 0;
+    Valid = LogPathNameLengthLocal != 0 && isNameUsable(trace, 2);
 }
 
 void ValidLog::checkForDups(const ValidLog* head) {

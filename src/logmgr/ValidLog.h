@@ -44,6 +44,7 @@ private:
     bool hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const;
     // The fields of a configuration line; a refused line loses Valid.
     void takeFileName(const TraceScope& trace, const char* token);
+    bool isNameUsable(const TraceScope& trace, int isUTF8) const;
     void takeField(const TraceScope& trace, int field, const char* token);
     void takeType(const TraceScope& trace, const char* token);
     void takeProcedure(const TraceScope& trace, const char* procedure);

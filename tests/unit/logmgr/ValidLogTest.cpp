@@ -262,6 +262,19 @@ TEST_F(ValidLogTest, ANameThatHasNoLocalFormIsRefused) {
                                               "No / character found in file name ."));
 }
 
+TEST_F(ValidLogTest, ANameThatItsConversionChangesIsRefused) {
+    // The conversion of the damaged character gives the name of another file, which is there.
+    const std::string other = directory.write("cafx", "");
+    const std::string damaged = directory.write("caf\xE9x", "");
+    EXPECT_FALSE(user(damaged)->isValid());
+    const std::string message = "The name of file " + damaged +
+                                " is not kept by a conversion between UTF-8 and the local code "
+                                "page. Ignoring remainder of line.";
+    EXPECT_THAT(trace.messages(), ElementsAre(message));
+    EXPECT_TRUE(user(other)->isValid());
+    EXPECT_TRUE(user(directory.write("l\xC3\xB6g", ""))->isValid());
+}
+
 TEST_F(ValidLogTest, TheActionOfASyslogLineIsALog) {
     const auto line = syslog("*.err;kern.debug \t" + log + " more");
     EXPECT_TRUE(line->isValid());
