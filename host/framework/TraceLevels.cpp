@@ -60,6 +60,18 @@ std::string_view stemOf(std::string_view unit) {
     return unit.substr(0, unit.rfind('.'));
 }
 
+/// Whether a source file is one of a class's: LogFile and LogFileTail are of LogFile,
+/// LogFiles is not.
+bool isUnitOf(std::string_view className, std::string_view stem) {
+    if (!stem.starts_with(className)) {
+        return false;
+    }
+    const std::string_view rest = stem.substr(className.size());
+    const bool goesOn =
+        !rest.empty() && ((rest[0] >= 'a' && rest[0] <= 'z') || (rest[0] >= '0' && rest[0] <= '9'));
+    return !goesOn;
+}
+
 } // namespace
 
 std::string TraceLevels::parse(std::string_view text) {
@@ -115,8 +127,15 @@ std::string TraceLevels::parseWord(std::string_view word) {
 
 unsigned TraceLevels::levelOf(std::string_view unit) const noexcept {
     const std::string_view stem = stemOf(unit);
-    const auto found = std::find_if(m_units.rbegin(), m_units.rend(), [&](const Unit& known) {
-        return known.name == unit || known.name == stem;
-    });
-    return found != m_units.rend() ? found->level : m_general;
+    unsigned level = m_general;
+    std::size_t longest = 0;
+    for (const Unit& known : m_units) {
+        const bool isNamed = known.name == unit || isUnitOf(known.name, stem);
+        const std::size_t length = std::min(known.name.size(), stem.size());
+        if (isNamed && length >= longest) {
+            longest = length;
+            level = known.level;
+        }
+    }
+    return level;
 }

@@ -8,10 +8,12 @@
 #include <vector>
 
 /// Which classes of records are written, as text tells it: words separated by commas, each one
-/// `class` for every unit or `unit=class` for one source file, named with or without its ending.
-/// Several classes are joined with a plus. Classes are error, flow, detail, fine, all, none, or a
-/// number (decimal or 0x..). Classes for every unit add up; without any, the errors are written.
-/// The last word about a unit holds. Immutable once parsed.
+/// `class` for every unit or `unit=class`, where the unit is a source file with its ending, or the
+/// name of a C++ class, which stands for all source files whose names begin with it: those of
+/// UserLogFile are UserLogFile.cpp, UserLogFileReport.cpp and UserLogFileTime.cpp. Several classes
+/// are joined with a plus. Classes are error, flow, detail, fine, all, none, or a number (decimal
+/// or 0x..). Classes for every unit add up; without any, the errors are written. The longest name
+/// that fits a source file holds, of several equal ones the last. Immutable once parsed.
 class TraceLevels {
 public:
     /// Reads the text; returns an empty text, or what is wrong with it, and leaves the levels as

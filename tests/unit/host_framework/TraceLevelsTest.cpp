@@ -50,12 +50,32 @@ TEST(TraceLevels, AUnitHasItsOwn) {
     EXPECT_EQ(level("error,ValidLog=none"), 0u);
     EXPECT_EQ(level("flow,LogBase=fine"), 0x40u);
     EXPECT_EQ(level("LogBase=fine"), 0x80u) << "the others keep the errors";
-    EXPECT_EQ(level("ValidLog=fine,ValidLog.cpp=detail"), 0x10u) << "the last word holds";
+    EXPECT_EQ(level("ValidLog=fine,ValidLog=detail"), 0x10u) << "the last word holds";
+    EXPECT_EQ(level("ValidLog=fine,ValidLog.cpp=detail"), 0x10u);
+    EXPECT_EQ(level("ValidLog.cpp=fine,ValidLog=detail"), 0x10u);
     EXPECT_EQ(level(" ValidLog = fine + 0x80 "), 0x81u);
     EXPECT_EQ(level("validlog=fine"), 0x80u) << "names are exact";
     EXPECT_EQ(level("ValidLog.h=fine"), 0x80u);
     EXPECT_EQ(level("zrm.main=fine", "zrm.main.cpp"), 0x01u);
     EXPECT_EQ(level("plain=fine", "plain"), 0x01u) << "a unit without an ending";
+}
+
+TEST(TraceLevels, AClassHasAllItsSourceFiles) {
+    EXPECT_EQ(level("UserLogFile=detail", "UserLogFile.cpp"), 0x10u);
+    EXPECT_EQ(level("UserLogFile=detail", "UserLogFileReport.cpp"), 0x10u);
+    EXPECT_EQ(level("UserLogFile=detail", "UserLogFileTime.cpp"), 0x10u);
+    EXPECT_EQ(level("zrm_rmlogent=detail", "zrm_rmlogent_report.cpp"), 0x10u);
+    EXPECT_EQ(level("UserLogFile.cpp=detail", "UserLogFileReport.cpp"), 0x80u) << "a file alone";
+    EXPECT_EQ(level("LogFile=detail", "UserLogFile.cpp"), 0x80u);
+    EXPECT_EQ(level("StringParse=detail", "StringParser.cpp"), 0x80u) << "no class";
+    EXPECT_EQ(level("UTF=detail", "UTF8Conv.cpp"), 0x80u);
+    // The longer name says more of a file, wherever it stands.
+    for (const char* text :
+         {"UserLogFile=detail,UserLogFileReport=fine", "UserLogFileReport=fine,UserLogFile=detail",
+          "UserLogFileReport.cpp=fine,UserLogFile=detail"}) {
+        EXPECT_EQ(level(text, "UserLogFileReport.cpp"), 0x01u) << text;
+        EXPECT_EQ(level(text, "UserLogFileTime.cpp"), 0x10u) << text;
+    }
 }
 
 TEST(TraceLevels, NamesTheWordThatIsWrong) {
