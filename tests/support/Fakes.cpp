@@ -28,6 +28,7 @@ std::atomic<long> g_timedWaitSeconds{0};
 std::atomic<int> g_fakeSignal{0};
 std::atomic<bool> g_unreadableStreams{false};
 std::atomic<bool> g_shortSelect{false};
+std::atomic<long> g_selected{-1};
 std::string* g_unameSystem = nullptr;
 std::string* g_unameNode = nullptr;
 
@@ -100,10 +101,15 @@ UnreadableStreams::~UnreadableStreams() {
 }
 
 ShortSelect::ShortSelect() {
+    g_selected = -1;
     g_shortSelect = true;
 }
 ShortSelect::~ShortSelect() {
     g_shortSelect = false;
+}
+
+long ShortSelect::requested() const {
+    return g_selected;
 }
 
 FakeWaitedId::FakeWaitedId(pid_t pid) {
@@ -141,6 +147,7 @@ extern "C" int __wrap_select(int count, fd_set* readable, fd_set* writable, fd_s
         return -1;
     }
     if (g_shortSelect) {
+        g_selected = limit->tv_sec * 1'000'000 + limit->tv_usec;
         *limit = {0, 2000};
     }
     return __real_select(count, readable, writable, exceptional, limit);

@@ -104,11 +104,13 @@ public:
     UnreadableStreams& operator=(const UnreadableStreams&) = delete;
 };
 
-/// While it lives, select() waits for two milliseconds at most.
+/// While it lives, select() waits for two milliseconds at most and remembers the time asked for.
 class ShortSelect {
 public:
     ShortSelect();
     ~ShortSelect();
+    /// In microseconds, of the last call; -1 before the first one.
+    long requested() const;
     ShortSelect(const ShortSelect&) = delete;
     ShortSelect& operator=(const ShortSelect&) = delete;
 };

@@ -9,7 +9,10 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstddef>
+#include <filesystem>
 #include <memory>
+#include <system_error>
 #include <vector>
 
 #include <unistd.h>
@@ -39,6 +42,16 @@ protected:
                          .bytes();
         }
         directory.write("wtmp", bytes + tail);
+    }
+
+    /// How often this process has the log open.
+    std::ptrdiff_t descriptorsOfTheLog() const {
+        std::ptrdiff_t count = 0;
+        for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+            std::error_code gone; // the directory's own descriptor
+            count += std::filesystem::read_symlink(entry.path(), gone) == log ? 1 : 0;
+        }
+        return count;
     }
 
     /// The users of the rows that a report over the window returns, in its order.
@@ -202,10 +215,11 @@ TEST_F(AdminLogFileReportTest, EndsWhenAReadFails) {
 
 TEST_F(AdminLogFileReportTest, MayBeEndedEarlyAndLeavesNothingOpen) {
     write(10);
-    const std::string before = openFilesOfAChild();
+    const std::ptrdiff_t before = descriptorsOfTheLog();
     _RequestThresholds thresholds = window("0700101000000000", "1991231000000000");
     void* state = monitor().startReportRequest(&thresholds);
     ASSERT_NE(state, nullptr);
+    EXPECT_EQ(descriptorsOfTheLog(), before + 1);
     EXPECT_EQ(openFilesOfAChild().find("wtmp"), std::string::npos);
     zrm_rmlogent_data_t row;
     EXPECT_EQ(monitor().getNextLogEntry(&row, state, &thresholds), &row);
@@ -213,6 +227,7 @@ TEST_F(AdminLogFileReportTest, MayBeEndedEarlyAndLeavesNothingOpen) {
     monitor().endReportRequest(&state);
     EXPECT_EQ(state, nullptr);
     EXPECT_EQ(lseek(fd, 0, SEEK_CUR), -1);
+    EXPECT_EQ(descriptorsOfTheLog(), before);
     monitor().endReportRequest(&state);
     EXPECT_THAT(trace.messages(), IsEmpty());
 }

@@ -5,6 +5,9 @@
 #include "logtypes/ErrLogFile.h"
 #include "logtypes/UserLogFile.h"
 
+#include <chrono>
+#include <thread>
+
 namespace {
 
 class CreateLogFile : public SyslogTest {
@@ -43,6 +46,18 @@ TEST_F(CreateLogFile, MakesEachKindByItsLetter) {
     EXPECT_TRUE(makes<UserLogFile>(" ;N ;U ;%s DESCRIPTION"));
     EXPECT_TRUE(makes<AdminLogFile>(" ;N ;A"));
     EXPECT_TRUE(makes<ErrLogFile>(" ;N ;E ;errpt -c"));
+}
+
+TEST_F(CreateLogFile, EachKindThatTailsAFileWaitsForASecondBetweenItsLooks) {
+    for (const char* fields : {" ;N ;S", " ;N ;U ;A , \"%s\" , description", " ;N ;A"}) {
+        const ShortSelect select;
+        const auto line = validLog(m_path, fields);
+        const std::unique_ptr<LogFile> log(createLogFile(*line, nullptr));
+        for (int tries = 0; tries < 5000 && select.requested() == -1; ++tries) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        }
+        EXPECT_EQ(select.requested(), 1'000'000) << fields;
+    }
 }
 
 TEST_F(CreateLogFile, GivesNothingWhenMemoryRunsOut) {

@@ -165,6 +165,7 @@ TEST_F(FormatsDoc, TheTenWorkedSpecifiersFitTheirSamples) {
         EXPECT_EQ(columnsOf(rows.back()), example.columns);
         for (std::size_t index = 0; index < lines.size(); ++index) {
             const std::string description = columnText(rows[lines.size() - 1 - index].entrydesc);
+            EXPECT_FALSE(description.empty()) << lines[index];
             EXPECT_NE(lines[index].find(description), std::string::npos) << lines[index];
             long result = -1;
             EXPECT_EQ(columnText(format(lines[index] + "\n", result).entrydesc), description);
