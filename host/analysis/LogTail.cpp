@@ -2,7 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
-#include "host/analysis/MonitoredLogs.h"
+#include "host/diagnose/MonitoredLogFile.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
 #include "tables/RequestThresholds.h"
@@ -13,12 +13,13 @@
 #include <vector>
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
 
 TRC1_Anchor anchor{"LogTail.cpp"};
+
+constexpr char errorLog = 'E'; ///< read through a command
 
 /// A descriptor that is closed at the end of its scope.
 class Descriptor {
@@ -75,23 +76,22 @@ bool LogTail::hasLines() const noexcept {
 
 std::string LogTail::read(const Entry& entry) {
     TraceScope trace(anchor);
+    if (m_log.type() == errorLog) {
+        entries(entry);
+        return "";
+    }
+    const MonitoredLogFile file(m_log.fileNameLocal(), m_log.ledger().file());
+    if (!file.problem().empty()) {
+        return file.problem();
+    }
     if (!hasLines()) {
         entries(entry);
         return "";
     }
-    // A pipe in the file's place must not hold the caller up.
-    const Descriptor file(open(m_log.fileNameLocal(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-    struct stat status {};
-    if (file.get() == -1 || fstat(file.get(), &status) == -1) {
+    if (!seekTail(file.descriptor())) {
         return because("the log cannot be read", errno);
     }
-    if (!S_ISREG(status.st_mode)) {
-        return "the log cannot be read: it is no file";
-    }
-    if (!seekTail(file.get())) {
-        return because("the log cannot be read", errno);
-    }
-    pieces(file.get(), entry);
+    pieces(file.descriptor(), entry);
     return "";
 }
 
@@ -136,7 +136,7 @@ void LogTail::entries(const Entry& entry) {
     _RequestThresholds always{};
     std::strcpy(always.startTime, "0000000000000000");
     std::strcpy(always.endTime, "1991231235959000");
-    void* report = MonitoredLogs::isReadable(m_log) ? m_log.startReportRequest(&always) : nullptr;
+    void* report = m_log.startReportRequest(&always);
     if (report == nullptr) {
         return;
     }

@@ -6,6 +6,7 @@
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/MonitoredLogFile.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
@@ -46,7 +47,11 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
     if (monitored[0].type != 'U' && monitored[0].type != 'S') {
         fields.refuse("log", "this log is no text file");
     }
-    std::optional<std::vector<std::string>> lines = LastLines::read(monitored[0].file, count);
+    const MonitoredLogFile file(monitored[0].file, monitored[0].openFile);
+    if (!file.problem().empty()) {
+        throw RequestRefused(409, file.problem(), fields.place("log"));
+    }
+    std::optional<std::vector<std::string>> lines = LastLines::read(file.descriptor(), count);
     if (!lines) {
         const ErrorText error(errno);
         throw RequestRefused(409, std::string("the log cannot be read: ") + error.text(),

@@ -4,30 +4,10 @@
 #include <cerrno>
 #include <string_view>
 
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
-
-class Descriptor {
-public:
-    // A pipe in the file's place must not hold the caller up.
-    explicit Descriptor(const char* path) : m_fd(::open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK)) {}
-    ~Descriptor() {
-        if (m_fd >= 0) {
-            const int error = errno;
-            ::close(m_fd);
-            errno = error;
-        }
-    }
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    int get() const noexcept { return m_fd; }
-
-private:
-    int m_fd;
-};
 
 /// The bytes from an offset on, as many as there are; none, with errno, on an error.
 std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
@@ -53,20 +33,14 @@ std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
 
 } // namespace
 
-std::optional<std::vector<std::string>> LastLines::read(const std::string& path,
-                                                        std::size_t count) {
-    const Descriptor file(path.c_str());
+std::optional<std::vector<std::string>> LastLines::read(int descriptor, std::size_t count) {
     struct stat status;
-    if (file.get() < 0 || ::fstat(file.get(), &status) != 0) {
-        return std::nullopt;
-    }
-    if (!S_ISREG(status.st_mode)) {
-        errno = EINVAL;
+    if (::fstat(descriptor, &status) != 0) {
         return std::nullopt;
     }
     const auto size = std::min(static_cast<std::size_t>(status.st_size), kMostBytes);
     const off_t offset = status.st_size - static_cast<off_t>(size);
-    const std::optional<std::string> text = readFrom(file.get(), offset, size);
+    const std::optional<std::string> text = readFrom(descriptor, offset, size);
     if (!text) {
         return std::nullopt;
     }

@@ -11,10 +11,10 @@ class LastLines {
 public:
     static constexpr std::size_t kMostBytes = std::size_t{4} << 20; ///< that are read at most
 
-    /// The last lines of a regular file, at most `count`, the oldest first and without their line
-    /// ends; fewer when they have more than kMostBytes. None, with errno, when it cannot be read.
-    /// Any thread.
-    static std::optional<std::vector<std::string>> read(const std::string& path, std::size_t count);
+    /// The last lines of an open regular file, at most `count`, the oldest first and without their
+    /// line ends; fewer when they have more than kMostBytes. None, with errno, when it cannot be
+    /// read. Any thread.
+    static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count);
 };
 
 #endif

@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_LOG_LEDGER_VIEW_H
 #define ZRM_HOST_LOG_LEDGER_VIEW_H
 
+#include "monitor/FileIdentity.h"
+
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -24,8 +26,9 @@ struct LogLedgerView {
         std::int64_t to;
     };
 
-    std::string log;  ///< the whole path, in UTF-8
-    std::string file; ///< the same in the process's code page
+    std::string log;                      ///< the whole path, in UTF-8
+    std::string file;                     ///< the same in the process's code page
+    std::optional<FileIdentity> openFile; ///< that the monitor reads at present
     char type = 'S';
     std::string procedure; ///< a user log's format
     std::int64_t bytesRead = 0;

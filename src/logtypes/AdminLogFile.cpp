@@ -6,6 +6,7 @@
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
+#include <optional>
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -102,6 +103,7 @@ void AdminLogFile::openAdminLog() {
         setMonitorStatus(MONITOR_ERR_OPEN);
         return;
     }
+    noteOpenFile();
     LogEOF = lseek(LogFD, 0, SEEK_END);
     if (LogEOF == -1) {
         const ErrorText error(errno);
@@ -115,6 +117,7 @@ void AdminLogFile::openAdminLog() {
 void AdminLogFile::closeAdminLog() {
     TraceScope trace(anchor);
     close(LogFD);
+    m_ledger.noteFile(std::nullopt);
     LogFD = -1;
     LogEOF = -1;
 }

@@ -78,6 +78,7 @@ protected:
     void lockLog() const;
     void unlockLog() const;
     void openLogAndSeek();
+    void noteOpenFile();
     void closeLog();
     void waitForEventLoop(timeval interval);
     /// Counts one more; the log's thread alone.

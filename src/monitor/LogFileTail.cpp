@@ -10,6 +10,7 @@
 
 #include <fcntl.h>
 #include <sys/select.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 // Following a log's growth, on the log's own thread.
@@ -44,6 +45,7 @@ void LogFile::openLogAndSeek() {
     }
     LogFD = fileno(LogFileP);
     fcntl(LogFD, F_SETFD, FD_CLOEXEC); // not for the commands that other logs run
+    noteOpenFile();
     LogEOF = lseek(LogFD, 0, SEEK_END);
     if (LogEOF < 0) {
         const ErrorText error(errno);
@@ -54,9 +56,18 @@ void LogFile::openLogAndSeek() {
     }
 }
 
+/// Notes in the ledger which file LogFD is.
+void LogFile::noteOpenFile() {
+    struct stat status;
+    if (fstat(LogFD, &status) == 0) {
+        m_ledger.noteFile(FileIdentity{status.st_dev, status.st_ino});
+    }
+}
+
 void LogFile::closeLog() {
     TraceScope trace(anchor);
     std::fclose(LogFileP);
+    m_ledger.noteFile(std::nullopt);
     LogFileP = nullptr;
     LogFD = -1;
     LogEOF = -1;

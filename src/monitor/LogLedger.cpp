@@ -46,6 +46,16 @@ template <typename Entry> std::size_t LogLedger::Latest<Entry>::copy(Entry* out)
     return kept;
 }
 
+void LogLedger::noteFile(const std::optional<FileIdentity>& file) noexcept {
+    const LedgerGuard guard(m_lock);
+    m_file = file;
+}
+
+std::optional<FileIdentity> LogLedger::file() const noexcept {
+    const LedgerGuard guard(m_lock);
+    return m_file;
+}
+
 void LogLedger::addBytes(std::int64_t count) noexcept {
     add(m_bytes, count);
 }

@@ -2,12 +2,14 @@
 #define ZRM_LOG_LEDGER_H
 
 #include "agent/framework/locks.h"
+#include "monitor/FileIdentity.h"
 
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <ctime>
 #include <memory>
+#include <optional>
 
 /// What one log's monitor has read and what it has passed over, since the log is monitored; beside
 /// the numbers of lines and of format errors, which the log itself counts. The log's thread writes,
@@ -36,6 +38,8 @@ public:
 
     // On the log's thread.
 
+    /// The log's file was opened, or, with none, closed.
+    void noteFile(const std::optional<FileIdentity>& file) noexcept;
     void addBytes(std::int64_t count) noexcept;
     /// Entries have just been read.
     void noteEntries() noexcept;
@@ -50,6 +54,8 @@ public:
 
     // On any thread.
 
+    /// The file that the monitor has open; none while it has none.
+    std::optional<FileIdentity> file() const noexcept;
     std::int64_t bytesRead() const noexcept { return m_bytes.load(std::memory_order_relaxed); }
     std::int64_t truncations() const noexcept {
         return m_truncations.load(std::memory_order_relaxed);
@@ -79,6 +85,7 @@ private:
     std::atomic<std::int64_t> m_starts{0};
     std::atomic<std::int64_t> m_lastEntry{0};
     mutable SYS1_Lock m_lock; ///< guards what follows
+    std::optional<FileIdentity> m_file;
     Latest<RejectedLine> m_rejectedLines;
     Latest<SkippedRange> m_skippedRanges;
 };

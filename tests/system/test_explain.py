@@ -302,7 +302,7 @@ def test_questions_that_cannot_be_answered(started):
     assert answer["detail"] == "the log cannot be read: No such file or directory"
     os.mkfifo(log)
     answer = started.analysis.post("explain", body, 409)
-    assert answer["detail"] == "the log cannot be read: it is no file"
+    assert answer["detail"] == "the log cannot be read: it is not a regular file"
     window = {"from": "2026-01-01", "to": "2026-01-02"}
     answer = started.analysis.post("backtest", {"definition": {"log": log}, **window})
     assert (answer["entries"], answer["truncated"]) == (0, False)

@@ -13,6 +13,7 @@ def serving(agent):
     agent.watched = agent.log(
         "user.log", b"".join(b"%d number %d\n" % (day, day) for day in range(1, 30)), ' ;N ;U ;A , "%d %s" , day type'
     )
+    agent.situations = [{"name": "any", "log": str(agent.watched)}]
     agent.start()
     agent.api = Api(agent)
     return agent
@@ -67,6 +68,22 @@ def test_the_last_lines_of_a_monitored_log(serving):
     assert [each["line"] for each in answer["lines"]] == [f"{day} number {day}" for day in (27, 28, 29)]
     assert answer["coverage"]["percent"] == 100.0
     assert answer["configuration_line"].startswith(f"{serving.watched} ;N ;U ;A")
+
+
+def test_only_the_file_that_is_monitored_is_read(serving):
+    """What has the log's name by now may be a link to anything."""
+    log = serving.watched.path
+    log.rename(log.with_suffix(".1"))
+    log.symlink_to("/etc/passwd")
+    answer = attempt(serving, 409, format='A , "%s" , type', log=str(log), last=3)
+    assert answer["field"] == "log"
+    assert "another file" in answer["detail"]
+    status, _, answer = serving.api.request("POST", "/api/v1/explain", {"situation": "any", "log": str(log), "last": 3})
+    assert status == 409 and "another file" in answer["detail"]
+    log.unlink()
+    log.symlink_to(log.with_suffix(".1"))
+    answer = attempt(serving, format='A , "%d %*s %d" , day class', log=str(log), last=1)
+    assert answer["coverage"]["percent"] == 100.0
 
 
 @pytest.mark.parametrize(

@@ -83,7 +83,7 @@ TEST_F(ExplainerTest, WaitsForNoPipeInTheLogsPlace) {
     std::filesystem::remove(directory.file("app.log"));
     ASSERT_EQ(mkfifo(directory.file("app.log").c_str(), 0600), 0);
     EXPECT_THAT(linesOf(log), IsEmpty());
-    EXPECT_EQ(problem, "the log cannot be read: it is no file");
+    EXPECT_EQ(problem, "the log cannot be read: it is not a regular file");
     EXPECT_THAT(explainer().last(binary, 2), IsEmpty());
     EXPECT_EQ(binary.reports, 0);
 }
