@@ -1,6 +1,8 @@
 #include "host/diagnose/ConfigCheck.h"
 
+#include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "host/diagnose/ConfiguredFormat.h"
 #include "host/framework/TraceCapture.h"
 #include "logmgr/LogManagerUtil.h"
 #include "logmgr/ValidLog.h"
@@ -9,6 +11,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -48,15 +51,44 @@ std::vector<Line> linesOf(std::string_view text) {
     return lines;
 }
 
+/// Whether the file is in one of the directories by its name, in which nothing leads elsewhere.
+bool isWithin(std::string_view path, const ConfigCheck::Directories& directories) {
+    std::string directory;
+    while (!path.empty()) {
+        const std::size_t length = path.find('/');
+        const std::string_view name = path.substr(0, length);
+        if (name == "." || name == "..") {
+            return false;
+        }
+        if (length == std::string_view::npos) {
+            break;
+        }
+        directory += name;
+        directory += !name.empty() || directory.empty() ? "/" : ""; // "//" is "/"
+        path.remove_prefix(length + 1);
+    }
+    return directories.contains(directory);
+}
+
 /// The valid logs so far, on one chain.
 class Chain {
 public:
+    /// `directories` is null where every file may be looked at.
+    explicit Chain(const ConfigCheck::Directories* directories) : m_directories(directories) {}
+
     /// Judges one record, which is changed.
     void judge(char* record, Line& line) {
         const std::string log(record, std::strcspn(record, "\t "));
         line.log = log[0] == '/' ? log : "";
         line.reason.clear();
         line.cause = Cause::NONE;
+        if (m_directories != nullptr && log[0] == '/' && !isWithin(log, *m_directories)) {
+            line.verdict = Verdict::OUTSIDE;
+            line.reason =
+                "The file is outside the directories of the configured logs; zrmctl check "
+                "judges it on the agent's machine.";
+            return;
+        }
         TraceCapture errors;
         auto valid = std::make_unique<ValidLog>(CONFIG_USER, record,
                                                 m_logs.empty() ? nullptr : m_logs.front().get());
@@ -65,16 +97,27 @@ public:
         if (valid->isValid() && valid->type() == 'U') {
             learnFormat(*valid, errors, line);
         }
-        if (line.verdict == Verdict::REFUSED) {
-            line.cause = isFileMissing(log) ? Cause::FILE : Cause::TEXT;
+        const std::string problem = log[0] == '/' ? ConfigCheck::problemOfFile(log) : "";
+        if (line.verdict == Verdict::REFUSED && !problem.empty()) {
+            line.cause = Cause::FILE;
+            line.reason = "The file cannot be used: " + problem + ".";
+        } else if (line.verdict == Verdict::REFUSED) {
+            line.cause = Cause::TEXT;
         }
         if (valid->isValid()) {
+            valid->LogBase::setLogProcedure(nullptr); // the chain is there for the names
             m_logs.push_back(std::move(valid));
         }
     }
 
 private:
     static void learnFormat(const ValidLog& log, TraceCapture& errors, Line& line) {
+        const std::size_t length = std::strlen(log.procedure());
+        if (length > ConfiguredFormat::kMostInLine) {
+            line.verdict = Verdict::REFUSED;
+            line.reason = ConfiguredFormat::tooLong(length);
+            return;
+        }
         const StringParser format(log.procedure(), UserLogFile::fields());
         if (format.status() != OBJECT_FORMAT_LEARNED) {
             line.verdict = Verdict::REFUSED;
@@ -86,24 +129,18 @@ private:
                            std::string(log.fileNameLocal()) + "; monitoring not started. ";
         }
     }
-    static bool isFileMissing(const std::string& log) {
-        struct stat status;
-        return log[0] == '/' && (::stat(log.c_str(), &status) != 0 || !S_ISREG(status.st_mode));
-    }
 
+    const ConfigCheck::Directories* m_directories;
     std::vector<std::unique_ptr<ValidLog>> m_logs;
 };
 
-} // namespace
-
-ConfigCheck::Result ConfigCheck::check(std::string_view text) {
-    TraceScope trace(anchor);
-    Result result{linesOf(text), 0, 0};
+ConfigCheck::Result judge(std::string_view text, const ConfigCheck::Directories* directories) {
+    ConfigCheck::Result result{linesOf(text), 0, 0};
     std::string content(text); // the stream keeps to it
     const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(
         content.empty() ? nullptr : fmemopen(content.data(), content.size(), "r"), std::fclose);
     if (stream != nullptr) {
-        Chain chain;
+        Chain chain(directories);
         std::array<char, LogManagerUtil::RECORD_SIZE> room;
         std::size_t read = 0;
         std::size_t newlines = 0;
@@ -123,8 +160,34 @@ ConfigCheck::Result ConfigCheck::check(std::string_view text) {
     return result;
 }
 
+} // namespace
+
+ConfigCheck::Result ConfigCheck::check(std::string_view text) {
+    TraceScope trace(anchor);
+    return judge(text, nullptr);
+}
+
+ConfigCheck::Result ConfigCheck::check(std::string_view text, const Directories& directories) {
+    TraceScope trace(anchor);
+    return judge(text, &directories);
+}
+
+std::string ConfigCheck::problemOfFile(const std::string& path) {
+    struct stat status;
+    if (::stat(path.c_str(), &status) != 0) {
+        const ErrorText error(errno);
+        return error.text();
+    }
+    if (!S_ISREG(status.st_mode)) {
+        return "It is not a regular file";
+    }
+    return status.st_mtime != 0 ? ""
+                                : "It was changed last at the beginning of 1970, which is how "
+                                  "the agent recognises a missing file";
+}
+
 const char* ConfigCheck::name(Verdict verdict) noexcept {
-    constexpr const char* names[] = {"accepted", "refused", "ignored"};
+    constexpr const char* names[] = {"accepted", "refused", "ignored", "outside"};
     return names[static_cast<std::size_t>(verdict)];
 }
 

@@ -2,6 +2,8 @@
 #define ZRM_HOST_CONFIG_CHECK_H
 
 #include <cstddef>
+#include <functional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -11,7 +13,12 @@
 /// working directory count as the agent's would. Stateless.
 class ConfigCheck {
 public:
-    enum class Verdict { ACCEPTED, REFUSED, IGNORED };
+    enum class Verdict {
+        ACCEPTED,
+        REFUSED,
+        IGNORED,
+        OUTSIDE, ///< not judged: the file lies in none of the directories given
+    };
     /// What has decided against a line.
     enum class Cause {
         NONE,
@@ -38,7 +45,17 @@ public:
     /// agent would list that log, but never read it. Any thread.
     static Result check(std::string_view text);
 
-    /// "accepted", "refused" or "ignored".
+    /// Directories with their last '/'.
+    using Directories = std::set<std::string, std::less<>>;
+    /// The same for whoever may not learn which files this machine has: of a line whose file lies
+    /// in none of the directories, nothing is looked at.
+    static Result check(std::string_view text, const Directories& directories);
+
+    /// Why a log cannot be read from this path, as a sentence without its full stop; empty when it
+    /// can. Names no system call: it is meant for people who write configurations.
+    static std::string problemOfFile(const std::string& path);
+
+    /// "accepted", "refused", "ignored" or "outside".
     static const char* name(Verdict verdict) noexcept;
     /// "text" or "file"; null for none.
     static const char* name(Cause cause) noexcept;

@@ -6,12 +6,27 @@ namespace {
 
 constexpr std::string_view kBlanks = "\t ";
 constexpr std::string_view kNameToken = "${@}";
+constexpr std::string_view kFields = " ;N ;U ;"; ///< between the log and the format
 
 } // namespace
 
 ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log) : m_log(log) {
     const std::size_t begin = std::min(format.find_first_not_of(kBlanks), format.size());
     m_written = format.substr(begin);
+    m_lineLength = m_log.size() + kFields.size() + m_written.size();
+    m_length = m_written.size();
+    for (std::size_t at = m_written.find(kNameToken); at != std::string::npos;
+         at = m_written.find(kNameToken, at + kNameToken.size())) {
+        m_length += m_log.size();
+        m_length -= kNameToken.size();
+    }
+    if (!isTooLong()) {
+        expand(begin);
+    }
+}
+
+/// `begin` is where the specifier begins in the original.
+void ConfiguredFormat::expand(std::size_t begin) {
     std::string configured = m_written;
     const std::size_t firstBlank = configured.find_first_of(kBlanks);
     if (firstBlank != std::string::npos && firstBlank + 1 < configured.size()) {
@@ -19,12 +34,22 @@ ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log
     }
     for (std::size_t at = 0; at < configured.size();) {
         const bool isName = configured.compare(at, kNameToken.size(), kNameToken) == 0;
-        const std::string_view piece = isName ? log : std::string_view(configured).substr(at, 1);
+        const std::string_view piece =
+            isName ? std::string_view(m_log) : std::string_view(configured).substr(at, 1);
         m_text += piece;
         m_original.insert(m_original.end(), piece.size(), begin + at);
         at += isName ? kNameToken.size() : 1;
     }
-    m_original.push_back(format.size());
+    m_original.push_back(begin + configured.size());
+}
+
+std::string ConfiguredFormat::tooLong(std::size_t length) {
+    return "With each ${@} replaced by the log's name the format has " + std::to_string(length) +
+           " characters; it may have 1022. Write the name in fewer places.";
+}
+
+std::string ConfiguredFormat::line() const {
+    return m_log + std::string(kFields) + m_written;
 }
 
 std::size_t ConfiguredFormat::original(std::size_t position) const {

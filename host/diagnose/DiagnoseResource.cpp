@@ -7,6 +7,7 @@
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/LogLedgers.h"
 #include "host/diagnose/MonitoredLogFile.h"
+#include "host/diagnose/UnmonitoredLogs.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
@@ -60,6 +61,41 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
     return std::move(*lines);
 }
 
+/// An answer holds what every directive reads in every line: how much that is, is bounded here.
+void refuseTooMuch(const JsonFields& fields, const std::string& format, std::string_view log,
+                   const std::vector<std::string>& lines) {
+    std::size_t pieces = 0;
+    for (const std::string& line : lines) {
+        pieces += FormatTrial::piecesOf(line);
+    }
+    const std::size_t directives = FormatTrial(format, log).result().directives.size();
+    if (pieces * directives > DiagnoseResource::kMostValues) {
+        fields.refuse(fields.has("last") ? "last" : "lines",
+                      "try fewer lines: with " + std::to_string(directives) +
+                          " directives there may be " +
+                          std::to_string(DiagnoseResource::kMostValues / directives) +
+                          " pieces of up to 2047 bytes");
+    }
+}
+
+/// Where the configured logs are, monitored or not: elsewhere the API says of no file that it is
+/// there.
+ConfigCheck::Directories logDirectories() {
+    ConfigCheck::Directories directories;
+    const auto add = [&directories](const std::string& path) {
+        if (path.starts_with('/')) {
+            directories.insert(path.substr(0, path.rfind('/') + 1));
+        }
+    };
+    for (const LogLedgerView& log : LogLedgers::read()) {
+        add(log.log);
+    }
+    for (const UnmonitoredLogs::Log& log : UnmonitoredLogs::read().logs) {
+        add(log.log);
+    }
+    return directories;
+}
+
 } // namespace
 
 void DiagnoseResource::addRoutes(Router& router) {
@@ -87,8 +123,9 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
         lines = loggedLines(fields, *log, static_cast<std::size_t>(*last));
     }
     const bool isNamed = log && !log->empty();
-    return HttpAnswer::json(FormatTrial::json(
-        FormatTrial::run(format, lines, isNamed ? std::string_view(*log) : FormatTrial::kSomeLog)));
+    const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::kSomeLog;
+    refuseTooMuch(fields, format, name, lines);
+    return HttpAnswer::json(FormatTrial::json(FormatTrial::run(format, lines, name)));
 }
 
 HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
@@ -100,5 +137,5 @@ HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
         kMostConfigLines) {
         fields.refuse("config", "write at most 10000 lines");
     }
-    return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config)));
+    return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config, logDirectories())));
 }

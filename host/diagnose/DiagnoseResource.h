@@ -12,6 +12,7 @@ class DiagnoseResource : public Resource {
 public:
     static constexpr std::size_t kMostLines = 1000;        ///< that a format is tried on
     static constexpr std::size_t kMostLineBytes = 16384;   ///< of such a line
+    static constexpr std::size_t kMostValues = 50000;      ///< pieces of lines times directives
     static constexpr std::size_t kMostConfigLines = 10000; ///< of a configuration
 
     void addRoutes(Router& router) override;

@@ -87,6 +87,10 @@ std::string refusal(const std::string& format, std::size_t position) {
     if (position >= format.size()) {
         return "The format ends too early: a double quote or the rest of a directive is missing.";
     }
+    if (format[position] == '\\' && position + 1 == format.size()) {
+        return "The format ends with a backslash: the character behind it and the double quote "
+               "that ends the format are missing.";
+    }
     return format[position] == '"' ? "The format has no directive between its double quotes."
                                    : "A directive, with the text in front of it, is too long: more "
                                      "than 253 characters.";
@@ -108,14 +112,15 @@ FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_form
         refuse("A configuration line holds neither line ends nor NUL characters.", lineEnd);
         return;
     }
-    const std::size_t length = m_format.line().size();
-    if (length > ConfiguredFormat::kMostInLine) {
-        refuse("The configuration line would have " + std::to_string(length) +
+    if (m_format.lineLength() > ConfiguredFormat::kMostInLine) {
+        refuse("The configuration line would have " + std::to_string(m_format.lineLength()) +
                    " characters; the agent reads lines of up to 1022.",
                std::nullopt);
-        return;
+    } else if (m_format.isTooLong()) {
+        refuse(ConfiguredFormat::tooLong(m_format.length()), std::nullopt);
+    } else {
+        learn();
     }
-    learn();
 }
 
 FormatTrial::~FormatTrial() {
@@ -241,6 +246,10 @@ FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<
         }
     }
     return result;
+}
+
+std::size_t FormatTrial::piecesOf(std::string_view line) noexcept {
+    return line.size() / kPiece + 1; // with its line end
 }
 
 double FormatTrial::percent(const Result& result) noexcept {

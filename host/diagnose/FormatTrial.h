@@ -75,6 +75,8 @@ public:
     static Result run(std::string_view format, const std::vector<std::string>& lines,
                       std::string_view log = kSomeLog);
 
+    /// How many pieces the agent reads a line in.
+    static std::size_t piecesOf(std::string_view line) noexcept;
     /// The share of lines that fit, in percent with one decimal; 0 without lines.
     static double percent(const Result& result) noexcept;
     /// A result as the JSON object that the API answers. Where a line is no UTF-8, its places are

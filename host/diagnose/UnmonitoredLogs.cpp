@@ -15,7 +15,6 @@
 #include <iterator>
 
 #include <nlohmann/json.hpp>
-#include <sys/stat.h>
 
 namespace {
 
@@ -66,26 +65,12 @@ std::string inUtf8(std::string_view name) {
     return text;
 }
 
-/// Why there is nothing to read at a path; empty when there is a file.
-std::string problemOf(const char* path) {
-    struct stat status;
-    if (::stat(path, &status) != 0) {
-        const ErrorText error(errno);
-        return error.text();
-    }
-    return S_ISREG(status.st_mode) ? "" : "It is not a regular file";
-}
-
 UnmonitoredLogs::Log logOf(const ConfigCheck::Line& line) {
     UnmonitoredLogs::Log log{inUtf8(nameIn(line.text)), line.number, line.reason,
                              ConfigCheck::name(line.cause)};
     if (line.verdict == ConfigCheck::Verdict::ACCEPTED) {
         log.reason = "The agent has not read this line yet.";
         log.cause = "refresh";
-    } else if (line.cause == ConfigCheck::Cause::FILE) {
-        // The agent's own message is one for its trace.
-        const std::string problem = problemOf(std::string(nameIn(line.text)).c_str());
-        log.reason = problem.empty() ? line.reason : "The file cannot be used: " + problem + ".";
     }
     return log;
 }
@@ -98,7 +83,7 @@ UnmonitoredLogs::Result UnmonitoredLogs::read() {
     if (path == nullptr || *path == '\0') {
         return {};
     }
-    Result result{path, problemOf(path), {}};
+    Result result{path, ConfigCheck::problemOfFile(path), {}};
     if (!result.problem.empty()) { // a pipe would hold up who opens it
         return result;
     }

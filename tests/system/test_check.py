@@ -20,7 +20,8 @@ def judge(agent, config, status=200):
 
 
 def test_every_line_has_its_verdict(serving):
-    answer = judge(serving, f"# logs\n{serving.watched} ;N ;S\n\n/none ;N\n{serving.watched}\n")
+    missing = serving.watched.path.parent / "none"
+    answer = judge(serving, f"# logs\n{serving.watched} ;N ;S\n\n{missing} ;N\n{serving.watched}\n")
     assert [(each["line"], each["verdict"], each["cause"]) for each in answer["lines"]] == [
         (1, "ignored", None),
         (2, "accepted", None),
@@ -32,10 +33,39 @@ def test_every_line_has_its_verdict(serving):
     assert answer["lines"][4]["reason"] == f"Duplicate {serving.watched} entry found; entry ignored."
 
 
+def test_a_file_outside_the_logs_directories_is_only_outside(serving):
+    """No token holder learns from the agent which files there are."""
+    inside = serving.watched.path.parent / "none.log"
+    config = f"/etc/passwd ;N\n/etc/none\n{serving.watched.path.parent}/../x\n{inside}\n"
+    answer = judge(serving, config)
+    verdicts = [(each["verdict"], each["cause"]) for each in answer["lines"]]
+    assert verdicts == [("outside", None)] * 3 + [("refused", "file")]
+    assert len({each["reason"] for each in answer["lines"][:3]}) == 1
+    assert (answer["accepted"], answer["refused"]) == (0, 1)
+
+
+def test_the_logs_name_in_many_places_costs_nothing(serving):
+    """The format is measured with the name in it, and its directives take no stack."""
+    directory = serving.watched.path.parent
+    name = directory / ("%c" * 120)
+    name.write_bytes(b"")
+    config = f'{name} ;N ;U ;A , "{"${@}" * 150}" , type\n'
+    assert len(config) < 1023
+    (line,) = judge(serving, config)["lines"]
+    assert line["verdict"] == "refused" and "it may have 1022" in line["reason"]
+    status, _, answer = serving.api.request(
+        "POST", "/api/v1/try", {"format": 'A , "' + "${@}" * 7000, "log": "/" + "%c" * 13000}
+    )
+    assert status == 200 and "would have" in answer["reason"]
+    assert serving.stop() == 0
+
+
 def test_the_agent_agrees_at_its_next_start(serving, agents):
     """The lines that are accepted are the logs that an agent of this configuration monitors."""
     other = agents()
-    names = [other.log(f"{number}.log") for number in range(4)]
+    names = [serving.watched.path.parent / f"{number}.log" for number in range(4)]
+    for name in names:
+        name.write_bytes(b"")
     config = [
         f"{names[0]} ;N ;S",
         f"{names[1]} ;Q ;X",
@@ -54,7 +84,7 @@ def test_the_agent_agrees_at_its_next_start(serving, agents):
         each["log"] for each in answer["lines"] if each["verdict"] == "accepted"
     ]
     for each in answer["lines"]:
-        if each["verdict"] == "refused":
+        if each["cause"] == "text":
             assert other.trace(each["reason"].split(". ")[-1])
 
 

@@ -86,6 +86,15 @@ def test_only_the_file_that_is_monitored_is_read(serving):
     assert answer["coverage"]["percent"] == 100.0
 
 
+def test_an_answer_has_its_bounds(serving):
+    """Each directive gives a value for each line."""
+    format = 'A , "' + "%1c" * 100 + '" , ' + " ".join(["type"] * 100)
+    assert attempt(serving, format=format, lines=["x" * 200] * 500)["coverage"]["percent"] == 100.0
+    answer = attempt(serving, 400, format=format, lines=["x" * 200] * 501)
+    assert answer["field"] == "lines" and "may be 500 pieces" in answer["detail"]
+    attempt(serving, 400, format=format, lines=["x" * 2047 * 8] * 60)
+
+
 @pytest.mark.parametrize(
     "body, field",
     [

@@ -75,8 +75,7 @@ def test_every_line_is_judged_with_number_and_reason(log):
     assert run("check", config, status=1) == (
         f"    2  accepted  {watched} ;N ;S\n"
         "    4  refused   /none ;N\n"
-        "                 stat() command failed for /none errno = 2; No such file or directory."
-        " Ignoring remainder of line.\n"
+        "                 The file cannot be used: No such file or directory.\n"
         f"    5  refused   {watched}\n"
         f"                 Duplicate {watched} entry found; entry ignored.\n"
         "    6  refused   relative.log\n"

@@ -4,6 +4,11 @@
 
 #include <gmock/gmock.h>
 
+#include <filesystem>
+#include <string>
+
+#include <utime.h>
+
 namespace {
 
 using testing::EndsWith;
@@ -68,10 +73,64 @@ TEST_F(ConfigCheckTest, AMissingFileIsTheFilesFault) {
     EXPECT_EQ(line.verdict, Verdict::REFUSED);
     EXPECT_EQ(line.cause, Cause::FILE);
     EXPECT_EQ(line.log, "/none/such.log");
-    EXPECT_EQ(line.reason, "stat() command failed for /none/such.log errno = 2; No such file or "
-                           "directory. Ignoring remainder of line.");
-    EXPECT_EQ(judge("/tmp").reason,
-              "The file /tmp is not a regular file. Ignoring remainder of line.");
+    EXPECT_EQ(line.reason, "The file cannot be used: No such file or directory.");
+    EXPECT_EQ(judge("/tmp").reason, "The file cannot be used: It is not a regular file.");
+    const utimbuf epoch{0, 0};
+    ASSERT_EQ(utime(m_path.c_str(), &epoch), 0);
+    const ConfigCheck::Line old = judge(m_path);
+    EXPECT_EQ(old.cause, Cause::FILE);
+    EXPECT_THAT(old.reason, HasSubstr("1970"));
+}
+
+TEST_F(ConfigCheckTest, ALineHasItsLengthWithTheNameInThePlacesForIt) {
+    std::string format = "A , \"";
+    for (int i = 0; i < 200; ++i) {
+        format += "${@}";
+    }
+    const ConfigCheck::Line line = judge(m_path + " ;N ;U ;" + format + "%s\" , type");
+    EXPECT_EQ(line.verdict, Verdict::REFUSED);
+    EXPECT_EQ(line.cause, Cause::TEXT);
+    const std::size_t length = std::string("A , \"%s\" , type").size() + 200 * m_path.size();
+    EXPECT_EQ(line.reason, "With each ${@} replaced by the log's name the format has " +
+                               std::to_string(length) +
+                               " characters; it may have 1022. Write the name in fewer places.");
+    EXPECT_EQ(judge(m_path + R"( ;N ;U ;A , "${@} %s" , type)").verdict, Verdict::ACCEPTED);
+}
+
+TEST_F(ConfigCheckTest, ANameThatItsConversionChangesIsRefused) {
+    // A damaged character becomes a longer one, and the name is cut where the room ends.
+    m_directory.write("caf", "");
+    const ConfigCheck::Line line = judge(m_directory.write("caf\xE9", ""));
+    EXPECT_EQ(line.verdict, Verdict::REFUSED);
+    EXPECT_THAT(line.reason, HasSubstr("is not kept by a conversion"));
+}
+
+TEST_F(ConfigCheckTest, AFileOutsideTheDirectoriesIsNotLookedAt) {
+    const std::string directory = m_directory.path().string() + "/";
+    std::filesystem::create_directory(directory + "sub");
+    m_directory.write("sub/app.log", "");
+    const auto verdictOn = [&](const std::string& path) {
+        const ConfigCheck::Result result = ConfigCheck::check(path + " ;N\n", {directory});
+        const ConfigCheck::Line& line = result.lines.at(0);
+        EXPECT_EQ(result.accepted + result.refused, line.verdict == Verdict::OUTSIDE ? 0U : 1U);
+        return std::string(ConfigCheck::name(line.verdict));
+    };
+    EXPECT_EQ(verdictOn(m_path), "accepted");
+    EXPECT_EQ(verdictOn("/" + directory + "/app.log"), "accepted");
+    EXPECT_EQ(verdictOn(directory + "none.log"), "refused");
+    EXPECT_EQ(verdictOn("relative.log"), "refused");
+    for (const std::string& outside :
+         {std::string("/etc/passwd"), std::string("/none/such.log"), std::string("/"),
+          directory.substr(0, directory.size() - 1), directory + "sub/app.log",
+          directory + "sub/../app.log", directory + "../none", directory + "./app.log",
+          directory + ".."}) {
+        EXPECT_EQ(verdictOn(outside), "outside") << outside;
+    }
+    const ConfigCheck::Result there = ConfigCheck::check("/etc/passwd ;N ;U ;x\n", {directory});
+    const ConfigCheck::Result missing = ConfigCheck::check("/etc/missing ;N ;U ;x\n", {directory});
+    EXPECT_EQ(there.lines[0].reason, missing.lines[0].reason);
+    EXPECT_EQ(there.lines[0].cause, Cause::NONE);
+    EXPECT_EQ(missing.lines[0].cause, Cause::NONE);
 }
 
 TEST_F(ConfigCheckTest, AnAcceptedLineKeepsItsWarning) {

@@ -73,6 +73,7 @@ TEST(FormatTrial, SaysWhyAndWhereAFormatIsRefused) {
         {"  A ; \"%s\" , type", 4, "Scan for start of format specifier failed"},
         {"A , %s", 4, "Scan for start of format specifier failed"},
         {"A , \"%s , type", 14, "ends too early"},
+        {"A , \"%d\\", 7, "The format ends with a backslash"},
         {"A , \"no directive\" , type", 17, "no directive between"},
         {"A , \"%d %q\" , day", 9, "Invalid convcode"},
         {"A , \"%(1000)s\" , type", 6, "Invalid column position specified: 1000)"},
@@ -112,6 +113,28 @@ TEST(FormatTrial, TheConfigurationLineMayBeTooLong) {
     EXPECT_FALSE(trial.isAccepted());
     EXPECT_EQ(trial.result().position, std::nullopt);
     EXPECT_THAT(trial.result().reason, HasSubstr("1023 characters"));
+}
+
+TEST(FormatTrial, IsMeasuredWithTheNameInThePlacesForIt) {
+    const std::string name = "/" + std::string(399, 'x');
+    EXPECT_TRUE(FormatTrial("A , \"${@}${@} %s\" , type", "/" + std::string(99, 'x')).isAccepted());
+    const FormatTrial trial("A , \"${@}%s${@}%s${@}\" , type type", name);
+    EXPECT_FALSE(trial.isAccepted());
+    EXPECT_EQ(trial.result().reason,
+              "With each ${@} replaced by the log's name the format has 1222 "
+              "characters; it may have 1022. Write the name in fewer places.");
+}
+
+TEST(FormatTrial, TakesNoMemoryForANameInManyPlaces) {
+    std::string format = "A , \"";
+    for (int i = 0; i < 250'000; ++i) {
+        format += "${@}";
+    }
+    const std::string name = "/" + std::string(1'000'000, 'x'); // 250 GB, written out
+    EXPECT_THAT(FormatTrial(format, name).result().reason, HasSubstr("would have 2000"));
+    EXPECT_THAT(
+        FormatTrial("${@}" + std::string(2000, ' '), "/" + std::string(900, '%')).result().reason,
+        HasSubstr("would have"));
 }
 
 TEST(FormatTrial, GivesFieldsAndRowOfALineThatFits) {
