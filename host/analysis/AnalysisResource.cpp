@@ -95,17 +95,19 @@ HttpAnswer AnalysisResource::explain(const HttpRequest& request) {
     if (ways != 1) {
         fields.refuse("line", "give one of line, event and last");
     }
-    const std::vector<Explanation> explained = fields.has("line")    ? explainLine(fields)
-                                               : fields.has("event") ? explainEvent(fields)
-                                                                     : explainLast(fields);
+    const Explained explained = fields.has("line")    ? explainLine(fields)
+                                : fields.has("event") ? explainEvent(fields)
+                                                      : explainLast(fields);
     Json explanations = Json::array();
-    for (const Explanation& explanation : explained) {
+    for (const Explanation& explanation : explained.explanations) {
         explanations.push_back(ExplanationJson::of(explanation));
     }
-    return HttpAnswer::json(SituationJson::text({{"explanations", std::move(explanations)}}));
+    Json answer{{"explanations", std::move(explanations)}};
+    explained.reach.addTo(answer);
+    return HttpAnswer::json(SituationJson::text(answer));
 }
 
-std::vector<Explanation> AnalysisResource::explainLine(JsonFields& fields) {
+AnalysisResource::Explained AnalysisResource::explainLine(JsonFields& fields) {
     Subject wanted = subject(fields);
     const std::string line = fields.text("line");
     if (line.size() > LogTail::longestLine || line.find('\n') != std::string::npos) {
@@ -125,10 +127,10 @@ std::vector<Explanation> AnalysisResource::explainLine(JsonFields& fields) {
     if (!explainer.problem().empty()) {
         throw RequestRefused(503, explainer.problem(), "line");
     }
-    return explanations;
+    return {std::move(explanations), explainer.reach()};
 }
 
-std::vector<Explanation> AnalysisResource::explainLast(JsonFields& fields) {
+AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
     Subject wanted = subject(fields);
     const auto number = static_cast<std::size_t>(
         fields.number("last", 1, static_cast<std::int64_t>(Explainer::mostEntries)));
@@ -142,10 +144,10 @@ std::vector<Explanation> AnalysisResource::explainLast(JsonFields& fields) {
     if (!explainer.problem().empty()) {
         throw RequestRefused(409, explainer.problem(), "log");
     }
-    return explanations;
+    return {std::move(explanations), explainer.reach()};
 }
 
-std::vector<Explanation> AnalysisResource::explainEvent(JsonFields& fields) {
+AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     const auto id = static_cast<std::uint64_t>(
         fields.number("event", 1, std::numeric_limits<std::int64_t>::max()));
     if (m_history == nullptr) {
@@ -168,7 +170,8 @@ std::vector<Explanation> AnalysisResource::explainEvent(JsonFields& fields) {
         throw RequestRefused(500, "the event has no row", "event");
     }
     const MonitoredLogs logs;
-    return {explainer.event(logs.find(event->log), entry)};
+    std::vector<Explanation> explanations{explainer.event(logs.find(event->log), entry)};
+    return {std::move(explanations), explainer.reach()};
 }
 
 HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
@@ -206,10 +209,9 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     if (result.isTruncated && logs.areWanted()) {
         throw RequestRefused(503, "the agent reads its configuration of logs again: try again", "");
     }
-    return HttpAnswer::json(SituationJson::text({{"entries", result.entries},
-                                                 {"matched", result.matched},
-                                                 {"raised", result.raised},
-                                                 {"truncated", result.isTruncated},
-                                                 {"raised_at", result.raisedAt},
-                                                 {"decision", result.decision}}));
+    Json answer{{"entries", result.entries},    {"matched", result.matched},
+                {"raised", result.raised},      {"truncated", result.isTruncated},
+                {"raised_at", result.raisedAt}, {"decision", result.decision}};
+    result.reach.addTo(answer);
+    return HttpAnswer::json(SituationJson::text(answer));
 }

@@ -2,6 +2,7 @@
 #define ZRM_HOST_ANALYSIS_RESOURCE_H
 
 #include "host/analysis/Explanation.h"
+#include "host/analysis/Reach.h"
 #include "host/config/HostConfig.h"
 #include "host/http/HttpAnswer.h"
 #include "host/http/HttpRequest.h"
@@ -35,12 +36,17 @@ private:
         bool isStopped = false;
     };
 
+    struct Explained {
+        std::vector<Explanation> explanations;
+        Reach reach; ///< of the log that they are about
+    };
+
     HttpAnswer explain(const HttpRequest& request);
     HttpAnswer backtest(const HttpRequest& request);
     Subject subject(JsonFields& fields, const std::string& otherwise = "");
-    std::vector<Explanation> explainLine(JsonFields& fields);
-    std::vector<Explanation> explainLast(JsonFields& fields);
-    std::vector<Explanation> explainEvent(JsonFields& fields);
+    Explained explainLine(JsonFields& fields);
+    Explained explainLast(JsonFields& fields);
+    Explained explainEvent(JsonFields& fields);
 
     SituationSet& m_situations;
     TableManager& m_entries;

@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "host/analysis/MonitoredLogs.h"
 #include "monitor/LogFile.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 
 #include <algorithm>
@@ -10,6 +11,7 @@
 #include <cstring>
 #include <memory>
 #include <string_view>
+#include <utility>
 
 namespace {
 
@@ -45,13 +47,19 @@ struct Backtest::Limits {
     std::chrono::steady_clock::time_point deadline = std::chrono::steady_clock::now() + patience;
 
     std::uint64_t looked = 0; ///< at entries, also at those behind the last time
+    const char* reason = "";  ///< which limit was reached
 
     bool areReached(const Result& result) {
         if (result.entries >= mostEntries || result.matched >= mostMatched) {
-            return true;
+            reason = "the backtest has read as many entries as it may";
+        } else if (looked++ % entriesPerLook == 0) {
+            if (isCancelled()) {
+                reason = "the backtest was cancelled";
+            } else if (std::chrono::steady_clock::now() >= deadline) {
+                reason = "the backtest has taken as long as it may";
+            }
         }
-        return looked++ % entriesPerLook == 0 &&
-               (isCancelled() || std::chrono::steady_clock::now() >= deadline);
+        return *reason != '\0';
     }
 };
 
@@ -81,9 +89,14 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     // error log's command is told the time instead.
     const std::string_view end = log.type() == errorLog ? std::string_view(to) : never;
     end.copy(window.endTime, sizeof window.endTime - 1);
+    const ReportOutcome outcome;
+    Reach reach;
     void* report = MonitoredLogs::isReadable(log) ? log.startReportRequest(&window) : nullptr;
     if (report == nullptr) {
-        return; // the log is empty or cannot be read
+        ReportOutcome::note(ReportEnd::notRead); // unless the log is empty
+        reach.reason = outcome.reason();
+        addReach(log, std::move(reach), result);
+        return;
     }
     const auto row = std::make_unique<zrm_rmlogent_data_t>();
     while (log.getNextLogEntry(row.get(), report, &window) != nullptr) {
@@ -95,6 +108,7 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
             continue;
         }
         ++result.entries;
+        reach.reached.assign(row->entrytime, sizeof row->entrytime);
         if (m_replay.matches(*row)) {
             ++result.matched;
             Stamp& stamp = m_matched.emplace_back();
@@ -102,6 +116,26 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         }
     }
     log.endReportRequest(&report);
+    reach.reason = result.isTruncated ? limits.reason : outcome.reason();
+    addReach(log, std::move(reach), result);
+}
+
+/// The first log that was not read whole decides; how far all were read, the one read least.
+void Backtest::addReach(const LogFile& log, Reach reach, Result& result) {
+    Reach& all = result.reach;
+    const std::string reason =
+        reach.isComplete() ? "" : std::string(log.fileNameUTF8()) + ": " + reach.reason;
+    if (all.isComplete() && reach.isComplete()) {
+        const bool isOlder = all.reached.empty() || reach.reached < all.reached;
+        if (!reach.reached.empty() && isOlder) {
+            all.reached = reach.reached;
+        }
+    } else if (all.isComplete()) {
+        all = {reach.reached, reason};
+    } else if (!reach.isComplete() && !all.reached.empty() &&
+               (reach.reached.empty() || reach.reached > all.reached)) {
+        all.reached = reach.reached;
+    }
 }
 
 void Backtest::replay(Result& result) {
@@ -137,5 +171,7 @@ std::string Backtest::decisionOf(const Result& result) const {
                std::to_string(std::abs(m_replay.frequency())) + " in " +
                std::to_string(m_replay.periodSeconds()) + " s";
     }
-    return text + (result.isTruncated ? "; older entries were not looked at." : ".");
+    return text + (result.reach.isComplete()
+                       ? "."
+                       : "; older entries were not looked at: " + result.reach.reason + '.');
 }

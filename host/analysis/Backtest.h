@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_BACKTEST_H
 #define ZRM_HOST_BACKTEST_H
 
+#include "host/analysis/Reach.h"
 #include "host/analysis/Replay.h"
 #include "host/config/HostConfig.h"
 
@@ -29,6 +30,7 @@ public:
         std::uint64_t matched = 0; ///< of these, met every condition
         std::uint64_t raised = 0;
         bool isTruncated = false;          ///< there are older entries that were not looked at
+        Reach reach;                       ///< over all logs: back to `reached` every one was read
         std::vector<std::string> raisedAt; ///< the first times, 16 characters each
         std::string decision;              ///< one sentence
     };
@@ -52,6 +54,7 @@ private:
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
               Result& result);
     void replay(Result& result);
+    static void addReach(const LogFile& log, Reach reach, Result& result);
     std::string decisionOf(const Result& result) const;
 
     Replay m_replay;

@@ -62,10 +62,19 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
     return seen;
 }
 
+std::string Explainer::read(LogFile& log,
+                            const std::function<void(std::optional<std::string_view> line,
+                                                     zrm_rmlogent_data_t* row)>& entry) {
+    LogTail tail(log);
+    std::string problem = tail.read(entry);
+    m_reach = tail.reach();
+    return problem;
+}
+
 std::vector<Explanation> Explainer::last(LogFile& log, std::size_t number) {
     TraceScope trace(anchor);
     std::deque<Seen> seen;
-    m_problem = LogTail(log).read([&](auto line, zrm_rmlogent_data_t* row) {
+    m_problem = read(log, [&](auto line, zrm_rmlogent_data_t* row) {
         seen.push_back(judge(m_replay, line, row));
         if (seen.size() > number) {
             seen.pop_front();
@@ -84,7 +93,7 @@ std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
     std::optional<Seen> found;
     Stamps matched;
     // A log that cannot be read has nothing before the line.
-    LogTail(log).read([&](auto text, zrm_rmlogent_data_t* row) {
+    read(log, [&](auto text, zrm_rmlogent_data_t* row) {
         Seen seen = judge(m_replay, text, row);
         if (seen.verdict.matches && m_replay.hasThresholds()) {
             matched.push_back(stampOf(seen.row));
@@ -129,7 +138,7 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
     std::optional<Seen> found;
     bool isExact = false;
     if (log != nullptr) {
-        LogTail(*log).read([&](auto line, zrm_rmlogent_data_t* row) {
+        read(*log, [&](auto line, zrm_rmlogent_data_t* row) {
             const bool isEntry =
                 row != nullptr && StoredRow::isSameEntry(layout(), *row, entry.row);
             Seen seen = judge(m_replay, line, row);
@@ -139,6 +148,9 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
                 found = std::move(seen);
             }
         });
+    }
+    if (log == nullptr) {
+        m_reach = {"", "the log is no longer monitored"};
     }
     if (!found) {
         found.emplace();

@@ -2,12 +2,14 @@
 #define ZRM_HOST_EXPLAINER_H
 
 #include "host/analysis/Explanation.h"
+#include "host/analysis/Reach.h"
 #include "host/analysis/Replay.h"
 #include "host/config/HostConfig.h"
 #include "tables/zrm_rmlogent_data.h"
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -50,12 +52,16 @@ public:
 
     /// What was wrong with reading the log; empty when nothing was.
     const std::string& problem() const noexcept { return m_problem; }
+    /// How far back the log was read for what was explained last.
+    const Reach& reach() const noexcept { return m_reach; }
 
 private:
     /// An entry and what was found when it was judged.
     struct Seen;
     using Stamps = std::vector<std::string>;
 
+    std::string read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
+                                                            zrm_rmlogent_data_t* row)>& entry);
     Seen judge(Replay& replay, std::optional<std::string_view> line, zrm_rmlogent_data_t* row);
     Explanation describe(Seen& seen);
     void decide(Explanation& explanation, const Seen& seen) const;
@@ -67,6 +73,7 @@ private:
     Replay m_replay;
     std::optional<ConditionJudge> m_judge; ///< of every condition but the thresholds
     std::string m_problem;
+    Reach m_reach;
 };
 
 #endif

@@ -5,6 +5,7 @@
 #include "host/diagnose/MonitoredLogFile.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 
 #include <algorithm>
@@ -76,22 +77,33 @@ bool LogTail::hasLines() const noexcept {
 
 std::string LogTail::read(const Entry& entry) {
     TraceScope trace(anchor);
+    m_reach = {};
     if (m_log.type() == errorLog) {
         entries(entry);
         return "";
     }
     const MonitoredLogFile file(m_log.fileNameLocal(), m_log.ledger().file());
-    if (!file.problem().empty()) {
-        return file.problem();
-    }
-    if (!hasLines()) {
+    m_reach.reason = file.problem();
+    if (m_reach.isComplete() && hasLines()) {
+        m_reach.reason = readLines(file.descriptor(), entry);
+    } else if (m_reach.isComplete()) {
         entries(entry);
         return "";
     }
-    if (!seekTail(file.descriptor())) {
+    std::string problem = m_reach.reason;
+    if (problem.empty() && m_isCut) {
+        m_reach.reason = "only the end of the log is read, 4 MiB";
+    }
+    return problem;
+}
+
+/// Reads the lines at the end of a file; what is wrong, empty when nothing is.
+std::string LogTail::readLines(int fd, const Entry& entry) {
+    if (!seekTail(fd)) {
         return because("the log cannot be read", errno);
     }
-    pieces(file.descriptor(), entry);
+    m_isCut = lseek(fd, 0, SEEK_CUR) > 0;
+    pieces(fd, entry);
     return "";
 }
 
@@ -124,6 +136,9 @@ void LogTail::pieces(int fd, const Entry& entry) {
         line = piece; // making the row may change it
         read += line.size() + 1;
         const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
+        if (isRow && m_reach.reached.empty()) {
+            note(row);
+        }
         if (line.ends_with('\n')) {
             line.pop_back();
         }
@@ -136,8 +151,11 @@ void LogTail::entries(const Entry& entry) {
     _RequestThresholds always{};
     std::strcpy(always.startTime, "0000000000000000");
     std::strcpy(always.endTime, "1991231235959000");
+    const ReportOutcome outcome;
     void* report = m_log.startReportRequest(&always);
     if (report == nullptr) {
+        ReportOutcome::note(ReportEnd::notRead);
+        m_reach.reason = outcome.reason();
         return;
     }
     std::vector<zrm_rmlogent_data_t> rows(1);
@@ -145,8 +163,21 @@ void LogTail::entries(const Entry& entry) {
            m_log.getNextLogEntry(&rows.back(), report, &always) != nullptr) {
         rows.emplace_back();
     }
+    if (rows.size() > mostEntries) {
+        ReportOutcome::note(ReportEnd::rowLimit);
+    }
     m_log.endReportRequest(&report);
+    m_reach.reason = outcome.reason();
     rows.pop_back();
+    if (!rows.empty()) {
+        note(rows.back());
+    }
     std::for_each(rows.rbegin(), rows.rend(),
                   [&](zrm_rmlogent_data_t& row) { entry(std::nullopt, &row); });
+}
+
+void LogTail::note(const zrm_rmlogent_data_t& oldest) {
+    if (oldest.entrytime[0] != ' ') {
+        m_reach.reached.assign(oldest.entrytime, sizeof oldest.entrytime);
+    }
 }

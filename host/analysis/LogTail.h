@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_LOG_TAIL_H
 #define ZRM_HOST_LOG_TAIL_H
 
+#include "host/analysis/Reach.h"
 #include "tables/zrm_rmlogent_data.h"
 
 #include <cstddef>
@@ -38,11 +39,19 @@ public:
     /// Reads one line, of at most `longestLine` bytes without a newline, in its pieces.
     std::string readLine(std::string_view line, const Entry& entry);
 
+    /// How far `read` has reached back.
+    const Reach& reach() const noexcept { return m_reach; }
+
 private:
+    std::string readLines(int fd, const Entry& entry);
     void pieces(int fd, const Entry& entry);
     void entries(const Entry& entry);
 
+    void note(const zrm_rmlogent_data_t& oldest);
+
     LogFile& m_log;
+    Reach m_reach;
+    bool m_isCut = false; ///< the log begins before what is read
 };
 
 #endif

@@ -38,8 +38,9 @@ int BacktestCommand::run(Context& context) {
         text += "  " + DisplayText::visible(TimeDisplay::stamp(JsonText::text(time))) + '\n';
     }
     context.print(text);
+    Context::noteReach(answer);
     if (JsonText::text(answer, "truncated") == "true") {
-        Context::note("not every entry between these times was read: begin later or end earlier");
+        Context::note("begin later or end earlier to read less");
     }
     return CLI_DONE;
 }

@@ -4,6 +4,7 @@
 #include "host/cli/CliError.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/JsonText.h"
+#include "host/cli/TimeDisplay.h"
 #include "host/cli/TimeInput.h"
 
 #include <algorithm>
@@ -53,6 +54,15 @@ void Context::note(const std::string& text) {
         from = end + 1;
     }
     std::fwrite(lines.data(), 1, lines.size(), stderr);
+}
+
+void Context::noteReach(const nlohmann::ordered_json& answer) {
+    if (JsonText::text(answer, "complete") != "false") {
+        return;
+    }
+    const std::string reached = JsonText::text(answer, "reached");
+    note("not everything was read: " + JsonText::text(answer, "reason") +
+         (reached.empty() ? "" : "; read back to " + TimeDisplay::stamp(reached)));
 }
 
 std::string Context::time(const std::string& option, const std::string& text) {

@@ -28,6 +28,9 @@ public:
     void printJson(const nlohmann::ordered_json& value) const;
     /// Tells the operator something beside the output: "zrmctl: TEXT" on standard error.
     static void note(const std::string& text);
+    /// Notes how far the logs of an answer with `complete`, `reached` and `reason` were read;
+    /// nothing where they were read whole.
+    static void noteReach(const nlohmann::ordered_json& answer);
 
     /// A time that an operator wrote, as the agent reads it. Throws CliError, naming the option.
     static std::string time(const std::string& option, const std::string& text);

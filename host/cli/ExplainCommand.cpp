@@ -105,6 +105,7 @@ int ExplainCommand::run(Context& context) {
             text += (text.empty() ? "" : "\n") + textOf(explanation, context.terminal());
         }
         context.print(text);
+        Context::noteReach(answer);
     }
     if (explanations.empty()) {
         Context::note("there is no entry to explain");

@@ -64,9 +64,10 @@ void addLedger(FactList& facts, const Json& ledger) {
         const char* key;
         const char* name;
     };
-    constexpr std::array<Row, 5> rows = {{{"lines", "lines"},
+    constexpr std::array<Row, 6> rows = {{{"lines", "lines"},
                                           {"rows", "rows"},
                                           {"format_errors", "format errors"},
+                                          {"without_time", "without a time"},
                                           {"truncations", "truncations"},
                                           {"restarts", "monitor restarts"}}};
     if (ledger.is_null()) {
@@ -90,11 +91,17 @@ std::string rejectedText(const Json& ledger, const Terminal& terminal) {
 }
 
 std::string skippedText(const Json& ledger, const Terminal& terminal) {
-    Table table(
-        {{"TIME", Table::FIXED}, {"SKIPPED FROM BYTE", Table::NUMBER}, {"TO BYTE", Table::NUMBER}});
+    Table table({{"TIME", Table::FIXED},
+                 {"SKIPPED FROM BYTE", Table::NUMBER},
+                 {"TO BYTE", Table::NUMBER},
+                 {"UNREAD BEFORE", Table::NUMBER},
+                 {"NOTICED", Table::FIXED}});
     for (const Json& range : JsonText::member(ledger, "skipped")) {
+        const std::string unread = JsonText::text(range, "unread");
+        const bool isRegrown = JsonText::text(range, "regrown") == "true";
         table.add({TimeDisplay::local(JsonText::text(range, "time")), JsonText::text(range, "from"),
-                   JsonText::text(range, "to")});
+                   JsonText::text(range, "to"), unread.empty() ? std::string("unknown") : unread,
+                   std::string(isRegrown ? "regrown" : "shorter")});
     }
     return table.empty() ? "" : '\n' + table.text(terminal);
 }

@@ -153,6 +153,8 @@ int ReportCommand::run(Context& context) {
         Context::note("the report has read " + JsonText::text(answer, "max_rows") +
                       " entries, the most that it may: older ones are missing; begin later or end "
                       "earlier");
+    } else {
+        Context::noteReach(answer);
     }
     if (rows.empty()) {
         Context::note("no entry of " + m_log + " between these times meets the conditions");

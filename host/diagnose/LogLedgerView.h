@@ -18,12 +18,13 @@ struct LogLedgerView {
         std::string line;
         std::string reason; ///< where it stops fitting and why
     };
-    /// Bytes that were not read, since the log had become shorter and was followed from its new
-    /// end on.
+    /// What a truncation has kept from the monitor.
     struct Skipped {
         std::int64_t time;
-        std::int64_t from;
+        std::int64_t from; ///< bytes of the present contents
         std::int64_t to;
+        std::optional<std::int64_t> unread; ///< bytes of the old contents; none: not known
+        bool isRegrown; ///< the file had grown past its old size again before it was noticed
     };
 
     std::string log;                      ///< the whole path, in UTF-8
@@ -37,7 +38,8 @@ struct LogLedgerView {
     std::int64_t formatErrors = 0;
     std::int64_t truncations = 0;
     std::int64_t skippedBytes = 0;
-    std::int64_t restarts = 0; ///< of the monitor
+    std::int64_t withoutTime = 0; ///< rows
+    std::int64_t restarts = 0;    ///< of the monitor
     std::optional<std::int64_t> lastEntry;
 
     // The latest, the oldest first. Only of a log that was asked for by name.

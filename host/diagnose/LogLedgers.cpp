@@ -50,6 +50,7 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.rows = view.lines - view.formatErrors;
     view.truncations = ledger.truncations();
     view.skippedBytes = ledger.skippedBytes();
+    view.withoutTime = ledger.withoutTime();
     view.restarts = ledger.restarts();
     if (const std::int64_t time = ledger.lastEntry(); time != 0) {
         view.lastEntry = time / kNanoseconds;
@@ -68,7 +69,10 @@ void addSamples(LogLedgerView& view, const LogLedger& ledger) {
     std::array<LogLedger::SkippedRange, LogLedger::KEPT> ranges;
     const std::size_t rangeCount = ledger.copySkipped(ranges.data());
     for (std::size_t i = 0; i < rangeCount; ++i) {
-        view.skipped.push_back({milliseconds(ranges[i].time), ranges[i].from, ranges[i].to});
+        const LogLedger::SkippedRange& range = ranges[i];
+        view.skipped.push_back({milliseconds(range.time), range.from, range.to,
+                                range.unread < 0 ? std::nullopt : std::optional(range.unread),
+                                range.kind == LogLedger::Truncation::regrown});
     }
 }
 
@@ -124,6 +128,7 @@ std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
         {"lines", ledger.lines},
         {"rows", ledger.rows},
         {"format_errors", ledger.formatErrors},
+        {"without_time", ledger.withoutTime},
         {"truncations", ledger.truncations},
         {"skipped_bytes", ledger.skippedBytes},
         {"restarts", ledger.restarts},
@@ -141,9 +146,15 @@ std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
         }
         object["skipped"] = nlohmann::ordered_json::array();
         for (const LogLedgerView::Skipped& skipped : ledger.skipped) {
+            nlohmann::ordered_json unread;
+            if (skipped.unread) {
+                unread = *skipped.unread;
+            }
             object["skipped"].push_back({{"time", UtcTime::text(skipped.time)},
                                          {"from", skipped.from},
-                                         {"to", skipped.to}});
+                                         {"to", skipped.to},
+                                         {"unread", unread},
+                                         {"regrown", skipped.isRegrown}});
         }
     }
     // A line may hold any bytes.

@@ -44,7 +44,7 @@ HttpAnswer ReportResource::report(const HttpRequest& request) {
     text += ",\"from\":\"" + wanted.from + "\",\"to\":\"" + wanted.to +
             "\",\"columns\":" + columnNames() + ",\"rows\":" + rows.json +
             ",\"count\":" + std::to_string(rows.count) +
-            ",\"truncated\":" + (rows.truncated ? "true" : "false") +
+            ",\"truncated\":" + (rows.truncated ? "true," : "false,") + rows.reachJson() +
             ",\"max_rows\":" + std::to_string(gMaxRows) + "}";
     return HttpAnswer::json(std::move(text));
 }

@@ -29,6 +29,6 @@ HttpAnswer SampleResource::sample(const HttpRequest& request) {
     }
     const SampleSource::Rows rows = m_source.take(table, wanted);
     return HttpAnswer::json("{\"table\":\"" + table + "\",\"rows\":" + rows.json +
-                            ",\"count\":" + std::to_string(rows.count) +
-                            ",\"truncated\":" + (rows.truncated ? "true}" : "false}"));
+                            ",\"count\":" + std::to_string(rows.count) + ",\"truncated\":" +
+                            (rows.truncated ? "true," : "false,") + rows.reachJson() + "}");
 }

@@ -1,5 +1,7 @@
 #include "host/http/SampleSource.h"
 
+#include "host/events/RowJson.h"
+
 #include <algorithm>
 #include <array>
 #include <iterator>
@@ -13,6 +15,15 @@ bool namesLog(const Condition& condition) {
 }
 
 } // namespace
+
+std::string SampleSource::Rows::reachJson() const {
+    std::string text = reason.empty() ? "\"complete\":true" : "\"complete\":false";
+    text += ",\"reached\":";
+    reached.empty() ? void(text += "null") : RowJson::appendText(text, reached);
+    text += ",\"reason\":";
+    reason.empty() ? void(text += "null") : RowJson::appendText(text, reason);
+    return text;
+}
 
 bool SampleSource::isMonitored(const std::vector<Condition>& report) {
     std::vector<Condition> log;

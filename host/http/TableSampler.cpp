@@ -4,6 +4,7 @@
 #include "agent/zrmmain.h"
 #include "host/events/RowJson.h"
 #include "host/framework/Sample.h"
+#include "monitor/ReportOutcome.h"
 
 #include <cstdint>
 #include <optional>
@@ -17,6 +18,7 @@ TRC1_Anchor anchor{"TableSampler.cpp"};
 SampleSource::Rows TableSampler::take(std::string_view table,
                                       const std::vector<Condition>& conditions) {
     TraceScope trace(anchor);
+    const ReportOutcome outcome;
     const std::optional<Sample> sample = Sample::take(table, conditions, "HTTP");
     Rows rows;
     rows.json = "[";
@@ -30,5 +32,11 @@ SampleSource::Rows TableSampler::take(std::string_view table,
     // The agent counts the rows that it reads, before the conditions.
     rows.truncated =
         sample && table == "RMLOGENT" && sample->offered() >= static_cast<std::uint64_t>(gMaxRows);
+    if (!sample) {
+        rows.reason = "the agent has as many requests as it can have";
+    } else if (!outcome.isComplete()) {
+        rows.reason = outcome.reason();
+    }
+    rows.reached = outcome.reached();
     return rows;
 }

@@ -111,7 +111,9 @@ void AdminLogFile::openAdminLog() {
                       error.number(), error.text());
         closeAdminLog();
         setMonitorStatus(MONITOR_ERR_SEEK_EOF);
+        return;
     }
+    guardEnd();
 }
 
 void AdminLogFile::closeAdminLog() {

@@ -1,6 +1,7 @@
 #include "logtypes/AdminLogFile.h"
 
 #include "agent/TraceScope.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_data.h"
 
@@ -30,6 +31,10 @@ void* AdminLogFile::startReportRequest(void* /*thresholds*/) {
         return trace.result(static_cast<void*>(nullptr));
     }
     info->bufferCount = 0;
+    if (info->bytesLeft % length != 0) {
+        // Read from its end, such a file gives no record as it was written.
+        ReportOutcome::note(ReportEnd::brokenRecord);
+    }
     trace.detail()("Read buffer of size %ld allocated for file %s.",
                    static_cast<long>(OptimumBlockSize), fileNameLocal());
     return trace.result(static_cast<void*>(info));

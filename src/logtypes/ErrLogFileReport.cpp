@@ -3,6 +3,7 @@
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 #include "logtypes/ChildProcess.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 
 #include <cerrno>
@@ -140,6 +141,7 @@ void* ErrLogFile::getNextLogEntry(void* row, void* reportState, void* /*threshol
     }
     if (formatEntryAsRow(info->line, row, nullptr) != 0) {
         trace.error()("Error while formatting line for report on file %s.", fileNameLocal());
+        ReportOutcome::note(ReportEnd::notAnEntry);
         writeToDebugLog(info->line, std::strlen(info->line), nullptr, 0);
         return trace.result(static_cast<void*>(nullptr));
     }
@@ -153,6 +155,7 @@ bool ErrLogFile::readReportLine(ErrlogBufferInfo* info) const {
     }
     const ErrorText error(errno);
     if (std::ferror(info->fp) != 0) {
+        ReportOutcome::note(ReportEnd::readError);
         // The message has a place for the command, which is not given: name, number and text each
         // stand one place further ahead, and the last place stays empty.
         trace.error()("Error while reading file %s for report on file %d. errno = %s; %s",
@@ -193,7 +196,13 @@ void ErrLogFile::waitForReportChild(const ErrlogBufferInfo* info) const {
         trace.error()("Error waiting for child report process %d to terminate for file %s.errno = "
                       "%d; %s",
                       info->pid, fileNameLocal(), error.number(), error.text());
-    } else if (ended == info->pid && (trace.isOn(TRC1_ERROR) || trace.isOn(TRC1_DETAIL))) {
+        ReportOutcome::note(ReportEnd::commandFailed);
+        return;
+    }
+    if (!WIFEXITED(status) || WEXITSTATUS(status) != 0) {
+        ReportOutcome::note(ReportEnd::commandFailed);
+    }
+    if (ended == info->pid && (trace.isOn(TRC1_ERROR) || trace.isOn(TRC1_DETAIL))) {
         printChildStatus(ended, status, info->command);
     }
 }

@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "logtypes/SyslogBufferInfo.h"
 #include "monitor/BrevanTime.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 
 #include <algorithm>
@@ -90,6 +91,7 @@ void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds
         }
         const bool isOlder = std::memcmp(time, window.startTime, stampLength) < 0;
         if (isOlder || formatEntryAsRow(line, row, reportState) != 0) {
+            ReportOutcome::note(time[0] == ' ' ? ReportEnd::noTime : ReportEnd::complete);
             break; // what stands before an older entry is older still
         }
         return trace.result(row);
@@ -142,6 +144,7 @@ bool SysLogFile::cutLongLine(SyslogBufferInfo& state) {
         blockStart + lastNewline(state.pBuffer, 0, state.bufferCount - longestLine - 1);
     const std::int64_t lastTooLongEnd = newline + longestLine + 2;
     if (blockStart == 0 || (lastTooLongEnd < lineEnd && lastTooLongEnd <= state.blockSize)) {
+        ReportOutcome::note(ReportEnd::longLine);
         return trace.result(false);
     }
     state.bufferCount = lastTooLongEnd - 1 - blockStart;

@@ -4,6 +4,7 @@
 #include "agent/TraceScope.h"
 #include "logtypes/EntryTime.h"
 #include "logtypes/UserlogBufferInfo.h"
+#include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_data.h"
 
@@ -100,6 +101,7 @@ void* UserLogFile::getNextLogEntry(void* row, void* bufferInfo, void* thresholds
                 trace.error()("Error: more than %d consecutive errors have occurred while trying "
                               "to build report for log %s. Report request is terminating.",
                               MOST_ERRORS, fileNameLocal());
+                ReportOutcome::note(ReportEnd::formatErrors);
                 break;
             }
             continue;
@@ -109,6 +111,8 @@ void* UserLogFile::getNextLogEntry(void* row, void* bufferInfo, void* thresholds
             continue;
         }
         if (std::strncmp(columns->entrytime, window.startTime, stampLength) < 0) {
+            ReportOutcome::note(columns->entrytime[0] == ' ' ? ReportEnd::noTime
+                                                             : ReportEnd::complete);
             break;
         }
         return trace.result(row);
@@ -159,6 +163,7 @@ char* UserLogFile::endAtLongLine(UserlogBufferInfo& info, std::int64_t limit) co
     TraceScope trace(anchor);
     trace.error()("Line in file %s exceeds %d characters. Remaining contents ignored.",
                   fileNameLocal(), static_cast<int>(limit));
+    ReportOutcome::note(ReportEnd::longLine);
     info.bufferCount = info.bytesLeft = 0;
     return nullptr;
 }

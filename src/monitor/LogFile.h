@@ -6,6 +6,7 @@
 #include "monitor/LogBufferInfo.h"
 #include "monitor/LogLedger.h"
 #include "monitor/MonitorStatus.h"
+#include "monitor/ReadGuard.h"
 #include "tables/zrm_rmlogent_data.h"
 
 #include <atomic>
@@ -80,6 +81,8 @@ protected:
     void openLogAndSeek();
     void noteOpenFile();
     void closeLog();
+    /// Remembers the bytes in front of LogEOF; the log's thread.
+    void guardEnd() noexcept;
     void waitForEventLoop(timeval interval);
     /// Counts one more; the log's thread alone.
     static void count(std::atomic<std::int64_t>& counter) noexcept;
@@ -135,6 +138,7 @@ private:
     void fillChangingColumns(zrm_rmlogent_data_t* row) const;
     bool checkForChange();
     bool readGrowth();
+    void noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind);
     void pushBack(_LogBufferInfo* info);
     std::FILE* debugLogStream() const;
     void writeRecord(std::FILE* stream, const void* data1, unsigned long length1, const void* data2,
@@ -144,6 +148,7 @@ private:
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
     // The thread's.
     LineReader m_lineReader;
+    ReadGuard m_guard;
     zrm_rmlogent_data_t m_row{};
     bool m_isRowPrepared = false;        ///< m_row's common columns stand
     std::size_t m_descriptionLength = 0; ///< characters of m_row's ENTRYDESC that may not be blank

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "monitor/ReportOutcome.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -51,6 +52,7 @@ long LogFile::openLogForReport(_LogBufferInfo* info) {
         closeLogForReport(info->fd);
         info->fd = -1;
         if (info->bytesLeft == 0) {
+            ReportOutcome::note(ReportEnd::complete);
             trace.detail()("Log %s is empty; report request terminating.", fileNameLocal());
         } else {
             trace.error()("Error while seeking EOF for report on file %s. errno = %d; %s",
@@ -72,6 +74,7 @@ void LogFile::pushBack(_LogBufferInfo* info) {
         trace.error()("Error while pushing %d bytes onto buffer for file %s. errno = %d; %s",
                       static_cast<int>(info->bufferCount), fileNameLocal(), error.number(),
                       error.text());
+        ReportOutcome::note(ReportEnd::readError);
         info->bytesLeft = 0;
         return;
     }
@@ -94,6 +97,7 @@ long LogFile::fillReportBuffer(_LogBufferInfo* info) {
         const ErrorText error(errno);
         trace.error()("Error while seeking start of read for report on file %s. errno = %d; %s",
                       fileNameLocal(), error.number(), error.text());
+        ReportOutcome::note(ReportEnd::readError);
         return trace.result(0L);
     }
     info->bufferCount = read(info->fd, info->pBuffer, static_cast<std::size_t>(length));
@@ -101,6 +105,7 @@ long LogFile::fillReportBuffer(_LogBufferInfo* info) {
         trace.error()("Error while reading file %s. Bytes requested = %ld. Bytes received = %d.",
                       fileNameLocal(), static_cast<long>(length),
                       static_cast<int>(info->bufferCount));
+        ReportOutcome::note(ReportEnd::readError);
         return trace.result(0L);
     }
     const off_t offset = lseek(info->fd, static_cast<off_t>(-length), SEEK_CUR);
@@ -108,6 +113,7 @@ long LogFile::fillReportBuffer(_LogBufferInfo* info) {
         const ErrorText error(errno);
         trace.error()("Error while resetting file pointer after read for file %s. errno = %d; %s",
                       fileNameLocal(), error.number(), error.text());
+        ReportOutcome::note(ReportEnd::readError);
         return trace.result(0L);
     }
     if (LogType == syslogFile || LogType == userLog) {

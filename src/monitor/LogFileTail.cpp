@@ -53,7 +53,13 @@ void LogFile::openLogAndSeek() {
                       error.number(), error.text());
         closeLog();
         setMonitorStatus(MONITOR_ERR_SEEK_EOF);
+        return;
     }
+    guardEnd();
+}
+
+void LogFile::guardEnd() noexcept {
+    m_guard.take(LogFD, LogEOF);
 }
 
 /// Notes in the ledger which file LogFD is.
@@ -103,6 +109,10 @@ bool LogFile::checkForChange() {
     TraceScope trace(anchor);
     const std::int64_t newEOF = lseek(LogFD, 0, SEEK_END);
     if (newEOF > LogEOF) {
+        if (!m_guard.holds(LogFD)) {
+            // What is read stays what it is; the ledger alone knows.
+            noteTruncated(LogEOF, LogLedger::Truncation::regrown);
+        }
         return trace.result(readGrowth());
     }
     if (newEOF < 0) {
@@ -115,10 +125,17 @@ bool LogFile::checkForChange() {
     if (newEOF < LogEOF) {
         trace.error()("Warning: log file %s truncated. Resetting EOF to offset %ld.",
                       fileNameLocal(), static_cast<long>(newEOF));
+        noteTruncated(newEOF, LogLedger::Truncation::seen);
         LogEOF = newEOF;
-        m_ledger.noteTruncated(newEOF);
+        m_guard.take(LogFD, newEOF);
     }
     return trace.result(true);
+}
+
+/// The file holds other bytes than those that were read; it is followed from `newEnd` on.
+void LogFile::noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind) {
+    TraceScope trace(anchor);
+    m_ledger.noteTruncated(kind, newEnd, m_guard.unreadInCopy(LogFD, fileNameLocal()));
 }
 
 bool LogFile::readGrowth() {
@@ -150,6 +167,7 @@ bool LogFile::readGrowth() {
     }
     m_ledger.addBytes(consumed - LogEOF);
     LogEOF = consumed;
+    m_guard.take(LogFD, consumed);
     return trace.result(true);
 }
 
@@ -160,6 +178,7 @@ long LogFile::readLog() {
         count(NumEvents);
         const bool isRow = formatEntryAsRow(line, &m_row, nullptr) == 0;
         if (isRow) {
+            m_ledger.noteTime(m_row.entrytime[0]);
             zrm_rmlogent_manager::EventArrived(&m_row, 1);
         } else {
             count(NumFormatErrors);

@@ -77,12 +77,12 @@ void LogLedger::noteRejected(const char* line) noexcept {
     }
 }
 
-void LogLedger::noteTruncated(std::int64_t newEnd) noexcept {
+void LogLedger::noteTruncated(Truncation kind, std::int64_t from, std::int64_t unread) noexcept {
     add(m_truncations, 1);
-    add(m_skipped, newEnd);
+    add(m_skipped, from + std::max<std::int64_t>(unread, 0));
     const LedgerGuard guard(m_lock);
     if (SkippedRange* const skipped = m_skippedRanges.next()) {
-        *skipped = {now(), 0, newEnd};
+        *skipped = {now(), 0, from, unread, kind};
     }
 }
 

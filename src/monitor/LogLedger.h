@@ -24,11 +24,18 @@ public:
         std::size_t length;
         char text[2048];
     };
-    /// Bytes of a truncated log that the monitor does not read: those in front of the new end.
+    enum class Truncation {
+        seen,    ///< the file was shorter than before
+        regrown, ///< it was not, but no longer held the bytes read last
+    };
+    /// What a truncation keeps from the monitor: the bytes in front of the place from which the
+    /// file is followed now, and those that were appended before it and never read.
     struct SkippedRange {
-        std::timespec time; ///< when the truncation was seen
+        std::timespec time; ///< when the truncation was noticed
         std::int64_t from;
-        std::int64_t to; ///< behind the last byte
+        std::int64_t to;     ///< behind the last byte
+        std::int64_t unread; ///< bytes of the old contents; -1: not known
+        Truncation kind;
     };
     static constexpr std::size_t KEPT = 16; ///< lines and ranges that are kept, the latest
 
@@ -45,8 +52,16 @@ public:
     void noteEntries() noexcept;
     /// A line did not fit.
     void noteRejected(const char* line) noexcept;
-    /// The log has become shorter; reading goes on at the new end.
-    void noteTruncated(std::int64_t newEnd) noexcept;
+    /// A row has this first character in its ENTRYTIME.
+    void noteTime(char first) noexcept {
+        if (first == ' ') {
+            m_withoutTime.store(m_withoutTime.load(std::memory_order_relaxed) + 1,
+                                std::memory_order_relaxed);
+        }
+    }
+    /// The log was truncated; reading goes on at `from`, and `unread` bytes of the old contents are
+    /// lost (-1: not known).
+    void noteTruncated(Truncation kind, std::int64_t from, std::int64_t unread) noexcept;
 
     // On the thread that starts the monitor.
 
@@ -59,6 +74,10 @@ public:
     std::int64_t bytesRead() const noexcept { return m_bytes.load(std::memory_order_relaxed); }
     std::int64_t truncations() const noexcept {
         return m_truncations.load(std::memory_order_relaxed);
+    }
+    /// Rows without a time.
+    std::int64_t withoutTime() const noexcept {
+        return m_withoutTime.load(std::memory_order_relaxed);
     }
     std::int64_t skippedBytes() const noexcept { return m_skipped.load(std::memory_order_relaxed); }
     /// How often the monitor was started again.
@@ -82,6 +101,7 @@ private:
     std::atomic<std::int64_t> m_bytes{0};
     std::atomic<std::int64_t> m_truncations{0};
     std::atomic<std::int64_t> m_skipped{0};
+    std::atomic<std::int64_t> m_withoutTime{0};
     std::atomic<std::int64_t> m_starts{0};
     std::atomic<std::int64_t> m_lastEntry{0};
     mutable SYS1_Lock m_lock; ///< guards what follows

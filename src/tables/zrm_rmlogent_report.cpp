@@ -5,6 +5,7 @@
 #include "agent/zrmmain.h"
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
+#include "monitor/ReportOutcome.h"
 #include "monitor/UTF8Conv.h"
 #include "tables/zrm_rmlogent_agent.h"
 
@@ -59,26 +60,32 @@ void zrm_rmlogent_agent::TakeSample() {
     count = 0;
     if (pTheLogManager == nullptr) {
         trace.error()("Log Manager not found. Request terminating.");
+        ReportOutcome::note(ReportEnd::notRead);
         return;
     }
     logFile = validateFileName();
     if (logFile == nullptr) {
         trace.error()("A valid file name was not found.  Request terminating.");
+        ReportOutcome::note(ReportEnd::notRead);
         return;
     }
     reportRows.reset(new (std::nothrow) zrm_rmlogent_data_t[static_cast<std::size_t>(batch)]());
     if (!reportRows) {
         trace.error()("Memory allocation for %d bytes failed. Request terminating.",
                       batch * static_cast<int>(sizeof(zrm_rmlogent_data_t)));
+        ReportOutcome::note(ReportEnd::notRead);
         return;
     }
     if (!getEntrytimeThresholds()) {
+        ReportOutcome::note(ReportEnd::notRead);
         return; // the next sample replaces the rows
     }
     reportHandle = logFile->startReportRequest(&thresholds);
     if (reportHandle != nullptr) {
         insertReportRows(batch);
         logFile->endReportRequest(&reportHandle);
+    } else {
+        ReportOutcome::note(ReportEnd::notRead);
     }
     reportRows.reset();
 }
@@ -94,6 +101,7 @@ void zrm_rmlogent_agent::insertReportRows(int batch) {
         }
         total += read;
         if (total >= gMaxRows) {
+            ReportOutcome::note(ReportEnd::rowLimit);
             trace.detail()("Maximum report row limit of %d reached. Request terminating.",
                            gMaxRows);
             return;
@@ -109,6 +117,9 @@ int zrm_rmlogent_agent::getLogEntries(long maxRows) {
            logFile->getNextLogEntry(&reportRows[static_cast<std::size_t>(filled)], reportHandle,
                                     &thresholds) != nullptr) {
         ++filled;
+    }
+    if (filled > 0) {
+        ReportOutcome::noteReached(reportRows[static_cast<std::size_t>(filled - 1)].entrytime);
     }
     return trace.result(filled);
 }

@@ -160,6 +160,8 @@ WRAP_ERRNO(struct tm*, localtime_r, nullptr, (const time_t* time, struct tm* res
 WRAP_ERRNO(off_t, lseek, -1, (int fd, off_t offset, int whence), (fd, offset, whence))
 WRAP_ERRNO(long, pathconf, -1, (const char* path, int name), (path, name))
 WRAP_ERRNO(int, pipe, -1, (int* fds), (fds))
+WRAP_ERRNO(ssize_t, pread, -1, (int fd, void* data, size_t size, off_t offset),
+           (fd, data, size, offset))
 WRAP_CODE(pthread_attr_destroy, (pthread_attr_t * attributes), (attributes))
 WRAP_CODE(pthread_attr_init, (pthread_attr_t * attributes), (attributes))
 WRAP_CODE(pthread_attr_setdetachstate, (pthread_attr_t * attributes, int state),

@@ -402,6 +402,9 @@ def test_a_backtest_of_a_past_that_was_not_monitored(agent):
         "truncated": False,
         "raised_at": [],
         "decision": "Would not have been raised: there are no entries between these times.",
+        "complete": True,
+        "reached": None,
+        "reason": None,
     }
     assert agent.stop() == 0
 

@@ -33,6 +33,7 @@ def test_a_new_ledger_is_empty(serving):
         "lines": 0,
         "rows": 0,
         "format_errors": 0,
+        "without_time": 0,
         "truncations": 0,
         "skipped_bytes": 0,
         "restarts": 0,
@@ -74,7 +75,53 @@ def test_a_truncation_shows_the_bytes_that_it_skipped(serving):
     wait_until(lambda: ledger_of(serving, serving.syslog)["truncations"] == 1, "the truncation")
     ledger = ledger_of(serving, serving.syslog)
     assert ledger["skipped_bytes"] == 10
-    assert [(each["from"], each["to"]) for each in ledger["skipped"]] == [(0, 10)]
+    assert without_times(ledger["skipped"]) == [
+        {"from": 0, "to": 10, "unread": None, "regrown": False}
+    ]
+
+
+def without_times(ranges):
+    assert all(each.pop("time").endswith("Z") for each in ranges)
+    return ranges
+
+
+def test_a_rotation_by_copying_shows_what_it_has_taken_away(serving):
+    log = serving.syslog
+    log.append(syslog_line("read"))
+    wait_until(lambda: ledger_of(serving, log)["lines"] == 1, "the line")
+    unread = syslog_line("written before the truncation").encode()
+    copy = log.path.with_name(log.path.name + ".1")
+    copy.write_bytes(log.path.read_bytes() + unread)
+    os.truncate(log.path, 0)
+    wait_until(lambda: ledger_of(serving, log)["truncations"] == 1, "the truncation")
+    ledger = ledger_of(serving, log)
+    assert ledger["skipped_bytes"] == len(unread)
+    assert without_times(ledger["skipped"]) == [
+        {"from": 0, "to": 0, "unread": len(unread), "regrown": False}
+    ]
+
+
+def test_a_truncation_that_nobody_could_see_is_noticed(serving):
+    log = serving.syslog
+    log.append(syslog_line("read"))
+    wait_until(lambda: ledger_of(serving, log)["lines"] == 1, "the line")
+    size = log.path.stat().st_size
+    # Shorter and longer again between two looks: without a moment in which the file is short.
+    with open(log.path, "r+b", buffering=0) as stream:
+        stream.write("".join(syslog_line(f"new {n}") for n in range(100)).encode())
+    wait_until(lambda: ledger_of(serving, log)["truncations"] == 1, "the truncation")
+    assert serving.trace("truncated") == []
+    ledger = ledger_of(serving, log)
+    assert ledger["skipped_bytes"] == size
+    assert without_times(ledger["skipped"]) == [
+        {"from": 0, "to": size, "unread": None, "regrown": True}
+    ]
+
+
+def test_rows_without_a_time_are_counted(serving):
+    serving.syslog.append(syslog_line("one") + "2026-11-20T07:03:09.412000+01:00 web1 cron[1]: two\n")
+    wait_until(lambda: ledger_of(serving, serving.syslog)["lines"] == 2, "the lines")
+    assert ledger_of(serving, serving.syslog)["without_time"] == 1
 
 
 def test_a_ledger_lasts_through_refreshes_that_keep_the_log(serving):

@@ -1,10 +1,17 @@
 // What a situation makes of an entry, in words.
 
 import { h, table } from "./dom.js";
-import { stamp } from "./format.js";
+import { reachText, stamp } from "./format.js";
+
+/** The explanations of an answer, and how far the log was read for them. */
+export function explained(answer, options) {
+  const reach = reachText(answer);
+  return [reach && h("p", { className: "why warn" }, reach),
+    ...answer.explanations.map((one) => explanation(one, options))];
+}
 
 /** Without its columns where they stand beside it. */
-export function explanation(one, { withColumns = true } = {}) {
+function explanation(one, { withColumns = true } = {}) {
   if (!one.row) {
     return h("div", { className: "stack" }, h("p", { className: "verdict fails" }, "No entry"),
       one.line && h("pre", {}, one.line), h("p", {}, one.reason || one.decision));

@@ -45,6 +45,13 @@ export function stamp(value) {
   return `${century === "1" ? 20 : 19}${year}-${month}-${day} ${hour}:${minute}:${second}`;
 }
 
+/** How far an answer has read the logs; empty where it has read everything. */
+export function reachText({ complete, reached, reason }) {
+  if (complete) return "";
+  const missing = reached ? ` Entries before ${stamp(reached)} are missing.` : "";
+  return `Not everything was read: ${reason}.${missing}`;
+}
+
 /** By how many minutes the agent's clock on the wall is before UTC, of one moment as 16-digit stamp and in UTC. */
 export function offsetOf(value, utc) {
   const shown = Date.parse(`${stamp(value).replace(" ", "T")}Z`);

@@ -36,7 +36,7 @@ export function judge({ row, ledger }) {
     const share = lines > 0 ? Math.min(100, Math.round((errors / lines) * 100)) : 100;
     return { level: "warn", state: "Rejects", why: `${number(errors)} ${errors === 1 ? "line does" : "lines do"} not fit the format${lines > 0 ? ` (${share < 1 ? "under 1" : share} %)` : ""}.`, more: "Open the log to see which and why." };
   }
-  if (ledger?.skipped_bytes > 0) return { level: "warn", state: "Skipped", why: `${number(ledger.skipped_bytes)} bytes were skipped when the file was cut short.` };
+  if (ledger?.skipped_bytes > 0) return { level: "warn", state: "Skipped", why: `${number(ledger.skipped_bytes)} bytes were skipped when the file was truncated.` };
   return { level: "good", state: "Running", why: "" };
 }
 

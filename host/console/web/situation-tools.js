@@ -2,8 +2,8 @@
 
 import { get, post } from "./api.js";
 import { button, failure, field, fill, h, select } from "./dom.js";
-import { explanation } from "./explain.js";
-import { number, plural, stamp } from "./format.js";
+import { explained } from "./explain.js";
+import { number, plural, reachText, stamp } from "./format.js";
 
 const DAY = 24 * 3600 * 1000;
 
@@ -38,7 +38,7 @@ function drawPreview(result, answer) {
   fill(result,
     h("p", { className: "verdict" }, `Would have been raised ${plural(answer.raised, "time")} in the last 24 hours`),
     h("p", { className: "quiet" }, `${number(answer.matched)} of ${plural(answer.entries, "entry", "entries")} met the conditions.`,
-      answer.truncated && " The log holds more than was read, so there may be more."),
+      !answer.complete && ` ${reachText(answer)}`),
     times.length > 0 && h("details", {}, h("summary", {}, "When"), h("ul", {}, times.slice(0, 50).map((one) => h("li", {}, stamp(one))),
       times.length > 50 && h("li", { className: "quiet" }, `and ${number(answer.raised - 50)} more`))));
 }
@@ -70,7 +70,8 @@ export function explainPanel(subject, log) {
     fill(result, h("p", { className: "quiet" }, "Asking …"));
     try {
       const answer = await post("/api/v1/explain", { ...subject(), log: path, ...what });
-      fill(result, answer.explanations.length > 0 ? answer.explanations.map((one) => explanation(one)) : h("p", {}, "The log holds no entry yet."));
+      fill(result, explained(answer),
+        answer.explanations.length === 0 && h("p", {}, "The log holds no entry yet."));
     } catch (error) {
       fill(result, failure(error));
     }

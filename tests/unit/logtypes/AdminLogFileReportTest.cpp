@@ -2,6 +2,7 @@
 
 #include "AccountingRecords.h"
 #include "LogTypeTest.h"
+#include "monitor/ReportOutcome.h"
 #include "support/TestValidLog.h"
 #include "support/TimeZone.h"
 
@@ -155,6 +156,20 @@ TEST_F(AdminLogFileReportTest, TakesTheLast40BytesOfAFileThatEndsWithinARecord) 
     write(0, std::string(39, 'x'));
     EXPECT_THAT(wholeReport(), IsEmpty());
     EXPECT_THAT(trace.messages(), ElementsAre(endMessage(39)));
+}
+
+TEST_F(AdminLogFileReportTest, SaysWhyItEnds) {
+    const auto endOf = [this](int count, const std::string& tail) {
+        write(count, tail);
+        const ReportOutcome outcome;
+        wholeReport();
+        return outcome.end();
+    };
+    EXPECT_EQ(endOf(0, ""), ReportEnd::complete) << "an empty log";
+    EXPECT_EQ(endOf(10, ""), ReportEnd::complete);
+    EXPECT_EQ(endOf(10, "x"), ReportEnd::brokenRecord);
+    const Fault fault("read", EIO);
+    EXPECT_EQ(endOf(10, ""), ReportEnd::readError);
 }
 
 TEST_F(AdminLogFileReportTest, OfAnEmptyLogDoesNotStart) {

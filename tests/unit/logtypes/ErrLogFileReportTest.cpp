@@ -1,6 +1,7 @@
 #include "logtypes/ErrLogFile.h"
 
 #include "ErrLogTest.h"
+#include "monitor/ReportOutcome.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -154,6 +155,21 @@ TEST_F(ErrLogFileReportTest, EndsAtALineThatIsNotAnEntry) {
                 ElementsAre("Error while formatting line for report on file " + log + "."));
     EXPECT_THAT(DebugLogRecorder::records(),
                 ElementsAre(DebugLogRecorder::Record{"no entry\n", ""}));
+}
+
+TEST_F(ErrLogFileReportTest, SaysWhyItEnds) {
+    const auto endOf = [this](const std::string& output) {
+        installOutput(output);
+        const ReportOutcome outcome;
+        report();
+        return outcome.end();
+    };
+    EXPECT_EQ(endOf(std::string(header) + entry), ReportEnd::complete);
+    EXPECT_EQ(endOf(std::string(header) + entry + "no entry\n"), ReportEnd::notAnEntry);
+    installErrpt("exit 3");
+    const ReportOutcome outcome;
+    report();
+    EXPECT_EQ(outcome.end(), ReportEnd::commandFailed);
 }
 
 TEST_F(ErrLogFileReportTest, TakesTheRestOfALongLineForALine) {

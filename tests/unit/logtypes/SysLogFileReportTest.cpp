@@ -1,5 +1,7 @@
 #include "SyslogReportTest.h"
 
+#include "monitor/ReportOutcome.h"
+
 #include <gmock/gmock.h>
 
 #include <filesystem>
@@ -56,6 +58,24 @@ TEST_F(SyslogReport, EndsAtALineWithoutAMonth) {
     EXPECT_THAT(report("1061005000000000", farFuture), ElementsAre("two"));
     m_directory.append("messages", "\n"); // an empty line
     EXPECT_THAT(report("1061005000000000", farFuture), IsEmpty());
+}
+
+TEST_F(SyslogReport, SaysWhyItEnds) {
+    const std::string old = "Oct  5 07:00:00 h s: one\n";
+    const std::string last = "Oct  5 08:00:00 h s: two\n";
+    const auto endOf = [this](const std::string& content) {
+        m_directory.write("messages", content);
+        const ReportOutcome outcome;
+        report("1061005000000000", farFuture);
+        return outcome.end();
+    };
+    EXPECT_EQ(endOf(old + last), ReportEnd::complete);
+    EXPECT_EQ(endOf("Oct  4 07:00:00 h s: before\n" + last), ReportEnd::complete);
+    EXPECT_EQ(endOf(old + "no time at all\n" + last), ReportEnd::noTime);
+    EXPECT_EQ(endOf(old + "Oct  5 07:30:00 h s: " + std::string(2000, 'x') + "\n" + last),
+              ReportEnd::longLine);
+    const Fault fault("read", EIO);
+    EXPECT_EQ(endOf(old + last), ReportEnd::readError);
 }
 
 TEST_F(SyslogReport, AWindowOpenToThePastHasTheLinesWithoutAMonth) {

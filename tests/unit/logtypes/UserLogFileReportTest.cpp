@@ -1,6 +1,7 @@
 #include "UserLogTest.h"
 
 #include "ReportFile.h"
+#include "monitor/ReportOutcome.h"
 
 #include <gmock/gmock.h>
 
@@ -185,6 +186,29 @@ TEST_F(UserLogReport, BadLinesAreDroppedUpToTenInARow) {
               "Error: more than 10 consecutive errors have occurred while trying to build report "
               "for log " +
                   m_path + ". Report request is terminating.");
+}
+
+TEST_F(UserLogReport, SaysWhyItEnds) {
+    makeLog(R"(A,"%d %[^\n]",day description)");
+    const auto endOf = [this](const std::string& content) {
+        write(content);
+        const ReportOutcome outcome;
+        report();
+        return outcome.end();
+    };
+    std::string bad;
+    for (int line = 0; line < 11; ++line) {
+        bad += "bad\n";
+    }
+    EXPECT_EQ(endOf("1 one\n2 two\n"), ReportEnd::complete);
+    EXPECT_EQ(endOf("1 one\n" + bad.substr(4) + "2 two\n"), ReportEnd::complete);
+    EXPECT_EQ(endOf("1 one\n" + bad + "2 two\n"), ReportEnd::formatErrors);
+    EXPECT_EQ(endOf("1 one\n2 " + std::string(2046, 'x') + "\n3 three\n"), ReportEnd::longLine);
+    EXPECT_EQ(endOf("1 one\n2 " + std::string(20000, 'x') + "\n3 three\n"), ReportEnd::longLine);
+    {
+        const Fault fault("read", EIO, {.times = 1});
+        EXPECT_EQ(endOf("1 one\n"), ReportEnd::readError);
+    }
 }
 
 TEST_F(UserLogReport, SkippedRowsEndARunOfErrors) {

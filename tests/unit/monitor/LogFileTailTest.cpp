@@ -8,6 +8,7 @@
 #include <thread>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 
 namespace {
 
@@ -184,6 +185,78 @@ TEST_F(Tail, ATruncatedLogIsFollowedFromItsNewEnd) {
     EXPECT_THAT(trace.messages(), ElementsAre("Warning: log file " + m_path +
                                               " truncated. Resetting EOF to offset 4."));
     EXPECT_EQ(m_log.eof(), 10);
+}
+
+// The reading is the same as that of a log that has only grown; the ledger knows better.
+TEST_F(Tail, ALogThatIsTruncatedAndGrowsPastItsOldEndIsInTheLedger) {
+    append("first\n");
+    open();
+    stopAfter(1);
+    append("old\n");
+    m_log.follow();
+    m_directory.write("messages.1", "first\nold\nnever read\n");
+    m_directory.write("messages", "new line 1\nnew line 2\n");
+    stopAfter(2);
+    RecordingTrace trace(TRC1_ERROR);
+    m_log.follow();
+    EXPECT_THAT(m_log.lines, ElementsAre("old\n", "\n", "new line 2\n"));
+    EXPECT_THAT(trace.messages(), IsEmpty());
+    EXPECT_EQ(m_log.ledger().truncations(), 1);
+    EXPECT_EQ(m_log.ledger().skippedBytes(), 10 + 11);
+    LogLedger::SkippedRange ranges[LogLedger::KEPT];
+    ASSERT_EQ(m_log.ledger().copySkipped(ranges), 1U);
+    EXPECT_EQ(ranges[0].to, 10);
+    EXPECT_EQ(ranges[0].unread, 11);
+    EXPECT_EQ(ranges[0].kind, LogLedger::Truncation::regrown);
+}
+
+TEST_F(Tail, TheOldEndThatATruncationTakesAwayIsInTheLedger) {
+    append("first\n");
+    open();
+    m_directory.write("messages.1", "first\nnever read\n");
+    m_directory.write("messages", "new\n");
+    const Fault end("select", EINVAL);
+    m_log.follow();
+    EXPECT_EQ(m_log.ledger().truncations(), 1);
+    EXPECT_EQ(m_log.ledger().skippedBytes(), 4 + 11);
+}
+
+TEST_F(Tail, AGrowingLogIsNeverTakenForATruncatedOne) {
+    append(std::string(5000, 'x') + "\n");
+    open();
+    for (std::size_t count = 1; count <= 50; ++count) {
+        append("line " + std::to_string(count) + "\n");
+        stopAfter(count);
+        m_log.follow();
+    }
+    EXPECT_THAT(m_log.lines, SizeIs(50));
+    EXPECT_EQ(m_log.ledger().truncations(), 0);
+}
+
+TEST_F(Tail, AnIdleLogCostsOneSeekPerLook) {
+    append("first\n");
+    open();
+    const Fault reads("pread", EIO, {.times = 0});
+    const Fault seeks("lseek", EIO, {.times = 0});
+    const Fault waits("select", EINVAL, {.skip = 20});
+    m_log.follow();
+    EXPECT_EQ(waits.calls(), 21);
+    EXPECT_EQ(seeks.calls(), 21);
+    EXPECT_EQ(reads.calls(), 0);
+}
+
+TEST_F(Tail, TheLedgerKnowsTheFileAsLongAsItIsFollowed) {
+    open();
+    stopAfter(1);
+    append("one\n");
+    m_log.follow();
+    struct stat status;
+    ASSERT_EQ(fstat(m_log.fd(), &status), 0);
+    EXPECT_EQ(m_log.ledger().file(), (FileIdentity{status.st_dev, status.st_ino}));
+    m_log.closeLog();
+    m_log.startThread();
+    m_log.stopThread();
+    EXPECT_EQ(m_log.ledger().file(), std::nullopt);
 }
 
 TEST_F(Tail, TheWarningOfATruncationIsOfTheErrorClass) {

@@ -43,6 +43,14 @@ TEST(LogLedger, BeginsEmpty) {
     EXPECT_THAT(skippedBy(ledger), IsEmpty());
 }
 
+TEST(LogLedger, CountsRowsWithoutATime) {
+    LogLedger ledger;
+    ledger.noteTime('1');
+    ledger.noteTime(' ');
+    ledger.noteTime(' ');
+    EXPECT_EQ(ledger.withoutTime(), 2);
+}
+
 TEST(LogLedger, KeepsTheLatestLinesTheOldestFirst) {
     LogLedger ledger;
     std::vector<std::string> expected;
@@ -69,15 +77,17 @@ TEST(LogLedger, KeepsTheLongestPieceOfALineWhole) {
 TEST(LogLedger, KeepsTheLatestRangesAndCountsAll) {
     LogLedger ledger;
     for (int i = 1; i <= 20; ++i) {
-        ledger.noteTruncated(i);
+        ledger.noteTruncated(LogLedger::Truncation::seen, i, i == 20 ? 100 : -1);
     }
     EXPECT_EQ(ledger.truncations(), 20);
-    EXPECT_EQ(ledger.skippedBytes(), 210);
+    EXPECT_EQ(ledger.skippedBytes(), 310) << "where it is known, with the old end";
     const auto ranges = skippedBy(ledger);
     ASSERT_THAT(ranges, SizeIs(LogLedger::KEPT));
     EXPECT_EQ(ranges.front().from, 0);
     EXPECT_EQ(ranges.front().to, 5);
     EXPECT_EQ(ranges.back().to, 20);
+    EXPECT_EQ(ranges.front().unread, -1);
+    EXPECT_EQ(ranges.back().unread, 100);
     EXPECT_NEAR(static_cast<double>(ranges.back().time.tv_sec),
                 static_cast<double>(std::time(nullptr)), 5.0);
 }
@@ -90,7 +100,7 @@ TEST(LogLedger, IsReadWhileItIsWritten) {
             ledger.addBytes(10);
             ledger.noteEntries();
             ledger.noteRejected("a line\n");
-            ledger.noteTruncated(3);
+            ledger.noteTruncated(LogLedger::Truncation::seen, 3, -1);
             ledger.noteStart();
         }
         ends = true;

@@ -1,5 +1,6 @@
 // Log Entries reports: which log they read, over which window, and the rows they return.
 
+#include "monitor/ReportOutcome.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include "agent/zrmmain.h"
@@ -337,6 +338,34 @@ TEST_F(Report, EndsAtTheRowLimit) {
     EXPECT_EQ(m_log.places[20], 0);
     EXPECT_EQ(m_log.places[24], 4 * 2864);
     EXPECT_EQ(m_log.ends, 1);
+}
+
+TEST_F(Report, SaysHowFarItReachedAndWhyItEnded) {
+    nameAndWindow();
+    m_log.entries = 30;
+    {
+        const ReportOutcome outcome;
+        sample(0);
+        EXPECT_TRUE(outcome.isComplete());
+        EXPECT_EQ(outcome.reached(), "1261120073000000");
+    }
+    gMaxRows = 25;
+    {
+        const ReportOutcome outcome;
+        sample(0);
+        EXPECT_EQ(outcome.end(), ReportEnd::rowLimit);
+    }
+    m_log.canReport = false;
+    const ReportOutcome outcome;
+    sample(0);
+    EXPECT_EQ(outcome.end(), ReportEnd::notRead);
+    EXPECT_EQ(outcome.reached(), "");
+}
+
+TEST_F(Report, WhatCannotBeReportedIsNotComplete) {
+    const ReportOutcome outcome;
+    sample(0);
+    EXPECT_EQ(outcome.end(), ReportEnd::notRead);
 }
 
 TEST_F(Report, ALimitBelowOneBatchShrinksTheBatch) {

@@ -3,7 +3,7 @@
 import { get, post, withQuery } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
 import { briefTime, number, plural, SEVERITIES, time } from "../format.js";
-import { explanation, rowList } from "../explain.js";
+import { explained, rowList } from "../explain.js";
 import { EventStream } from "../stream.js";
 import { WindowedList } from "../windowed.js";
 
@@ -250,7 +250,7 @@ class EventsPage {
       fill(why, h("p", { className: "loading" }, "Asking …"));
       try {
         const answer = await post("/api/v1/explain", { situation: event.situation, event: event.id });
-        fill(why, answer.explanations.map((one) => explanation(one, { withColumns: false })));
+        fill(why, explained(answer, { withColumns: false }));
       } catch (error) {
         fill(why, failure(error));
       }

@@ -8,6 +8,11 @@ import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
 const EVERY = 10000;
 const CHART_EVERY = 60000;
+const SKIPPED = [
+  { label: "Time", className: "fit" }, { label: "From byte", className: "num" },
+  { label: "To byte", className: "num" }, { label: "Unread before", className: "num" },
+  { label: "Noticed", className: "wide" },
+];
 
 export async function show(element, path) {
   const report = h("a", { className: "button", href: withQuery("#/reports", { log: path }), hidden: true }, "Report on this log");
@@ -78,7 +83,7 @@ function drawState(element, log, configuration) {
   const pairs = [
     ["Kind", kindOf(row)], ["Status", row.MONSTATUS], ["Monitored since", stamp(row.MONTIME)], ["File changed", stamp(row.LOGMODDATE)], ["Size", bytes(row.LOGSIZE)],
     ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`], ["Entries", number(ledger.rows ?? row.NUMEVENTS)], ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
-    ["Truncations", number(ledger.truncations)], ["Skipped", bytes(ledger.skipped_bytes)], ["Restarts of the monitor", number(ledger.restarts)],
+    ["Without a time", number(ledger.without_time)], ["Truncations", number(ledger.truncations)], ["Skipped", bytes(ledger.skipped_bytes)], ["Restarts of the monitor", number(ledger.restarts)],
     ["Last entry", time(ledger.last_entry)], ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
   ];
   if (row.FORMATTER) pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
@@ -100,7 +105,10 @@ function drawLedger(element, log) {
       ? h("p", { className: "loading" }, "Every line fitted.")
       : table("Rejected lines", [{ label: "Time", className: "fit" }, { label: "Line", className: "wide" }, { label: "Reason", className: "wide" }],
         [...rejected].reverse().map((one) => [time(one.time), h("pre", {}, one.line), h("span", { className: "why bad" }, one.reason)]), { className: "cards" })),
-    skipped.length > 0 && h("section", { className: "panel flush" }, h("h2", {}, "Skipped when the file was cut short"),
-      table("Skipped ranges", [{ label: "Time", className: "fit" }, { label: "From byte", className: "num" }, { label: "To byte", className: "num" }],
-        [...skipped].reverse().map((one) => [time(one.time), number(one.from), number(one.to)]), { className: "cards" })));
+    skipped.length > 0 && h("section", { className: "panel flush" }, h("h2", {}, "Skipped by truncations"),
+      table("Skipped ranges", SKIPPED, [...skipped].reverse().map((one) => [
+        time(one.time), number(one.from), number(one.to),
+        one.unread === null ? "unknown" : number(one.unread),
+        one.regrown ? "after it had grown again" : "when it was shorter",
+      ]), { className: "cards" })));
 }

@@ -3,7 +3,7 @@
 import { get, post } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { button, empty, failure, field, fill, h, loading, select } from "../dom.js";
-import { offsetOf, plural, stamp } from "../format.js";
+import { offsetOf, plural, reachText, stamp } from "../format.js";
 
 const HOUR = 3600 * 1000;
 const PRESETS = [
@@ -133,11 +133,12 @@ class ReportPage {
   }
 
   #draw() {
-    const { rows, truncated, max_rows: most } = this.answer;
+    const { rows, truncated, max_rows: most, complete } = this.answer;
     if (rows.length === 0) {
       fill(this.result, h("div", { className: "panel" }, empty("No entries", truncated
         ? `None of the newest ${most} entries of this time meets the conditions; a report reads no more than that. Choose a shorter time.`
-        : "The log has no entry of this time that meets the conditions.")));
+        : complete ? "The log has no entry of this time that meets the conditions."
+          : `No entry that was read meets the conditions. ${reachText(this.answer)}`)));
       return;
     }
     const all = h("input", { type: "checkbox", onchange: () => this.#drawTable(all.checked) });
@@ -145,6 +146,7 @@ class ReportPage {
     fill(this.result,
       h("div", { className: "head" }, h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
         truncated && h("p", { className: "why warn" }, `Only the newest ${most} entries of the time were read. Choose a shorter time for the rest.`),
+        !truncated && !complete && h("p", { className: "why warn" }, reachText(this.answer)),
         h("div", { className: "push" }, h("label", { className: "check" }, all, "All columns"),
           button("CSV", () => this.#download("csv", "text/csv", this.#csv()), { "aria-label": "Download as CSV" }),
           button("JSON", () => this.#download("json", "application/json", `${JSON.stringify(this.answer.rows, null, 2)}\n`), { "aria-label": "Download as JSON" }))),

@@ -105,7 +105,34 @@ TEST_F(BacktestTest, EndsEarlyWhenItIsCancelledAndSaysSo) {
     EXPECT_TRUE(run({}).isTruncated);
     EXPECT_EQ(first.ends, first.reports) << "the report is closed";
     EXPECT_EQ(second.reports, 0);
-    EXPECT_THAT(run({}).decision, testing::EndsWith("; older entries were not looked at."));
+    EXPECT_THAT(run({}).decision,
+                testing::EndsWith("; older entries were not looked at: " +
+                                  directory.file("first.log") + ": the backtest was cancelled."));
+}
+
+TEST_F(BacktestTest, SaysHowFarItReached) {
+    first.entries = {{0, "x"}, {100, "x"}};
+    second.entries = {{50, "x"}};
+    Backtest::Result result = run({});
+    EXPECT_TRUE(result.reach.isComplete());
+    EXPECT_EQ(result.reach.reached, stampAt(0));
+    second.canReport = false;
+    result = run({});
+    EXPECT_FALSE(result.isTruncated);
+    EXPECT_EQ(result.reach.reason, directory.file("second.log") + ": the log cannot be read");
+    EXPECT_EQ(result.reach.reached, "") << "of that log nothing was read";
+    EXPECT_THAT(result.decision, testing::EndsWith("; older entries were not looked at: " +
+                                                   result.reach.reason + "."));
+}
+
+TEST_F(BacktestTest, SaysWhyAReportEndedEarly) {
+    first.entries = {{0, "x"}, {100, "x"}};
+    second.entries = {{50, "x"}};
+    first.endsWith = ReportEnd::formatErrors;
+    second.endsWith = ReportEnd::longLine;
+    const Backtest::Result result = run({});
+    EXPECT_THAT(result.reach.reason, testing::StartsWith(directory.file("first.log") + ": eleven"));
+    EXPECT_EQ(result.reach.reached, stampAt(50)) << "from there on both were read";
 }
 
 TEST_F(BacktestTest, EndsEarlyAlsoBeforeTheFirstEntryBetweenTheTimes) {

@@ -77,6 +77,39 @@ TEST_F(ExplainerTest, ReadsTheLogsLines) {
     EXPECT_EQ(problem, "the log cannot be read: No such file or directory");
 }
 
+TEST_F(ExplainerTest, SaysHowFarBackItRead) {
+    write("nonsense\n1 a\n2 b\n");
+    Explainer whole = explainer();
+    whole.last(log, 1);
+    EXPECT_TRUE(whole.reach().isComplete());
+    EXPECT_EQ(whole.reach().reached, stampAt(1));
+    write("1 front\n" + std::string(LogTail::longest, 'y') + "\n3 end\n");
+    Explainer tail = explainer();
+    tail.last(log, 1);
+    EXPECT_EQ(tail.reach().reason, "only the end of the log is read, 4 MiB");
+    EXPECT_EQ(tail.reach().reached, stampAt(3));
+    std::filesystem::remove(directory.file("app.log"));
+    Explainer gone = explainer();
+    gone.line(log, "5 hit");
+    EXPECT_EQ(gone.reach().reason, "the log cannot be read: No such file or directory");
+    EXPECT_EQ(gone.reach().reached, "");
+}
+
+TEST_F(ExplainerTest, SaysHowFarBackItReadALogWithoutLines) {
+    TestLog logins(directory.write("wtmp", ""), " ;N ;A");
+    logins.entries = {{1, "a"}, {2, "b"}};
+    Explainer whole = explainer();
+    whole.last(logins, 1);
+    EXPECT_TRUE(whole.reach().isComplete());
+    EXPECT_EQ(whole.reach().reached, stampAt(1));
+    logins.endsWith = ReportEnd::brokenRecord;
+    whole.last(logins, 1);
+    EXPECT_EQ(whole.reach().reason, "the log does not consist of whole records");
+    logins.canReport = false;
+    whole.last(logins, 1);
+    EXPECT_EQ(whole.reach().reason, "the log cannot be read");
+}
+
 TEST_F(ExplainerTest, WaitsForNoPipeInTheLogsPlace) {
     TestLog binary(directory.file("app.log"), " ;N ;A");
     binary.entries = {{0, "hit"}};

@@ -2,6 +2,7 @@
 #define ZRM_TESTS_ANALYSIS_TEST_LOG_H
 
 #include "monitor/LogFile.h"
+#include "monitor/ReportOutcome.h"
 #include "support/TestValidLog.h"
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_data.h"
@@ -55,6 +56,7 @@ public:
                 return row;
             }
         }
+        ReportOutcome::note(endsWith);
         return nullptr;
     }
     void endReportRequest(void** report) override {
@@ -81,6 +83,7 @@ public:
 
     std::vector<std::pair<int, std::string>> entries;
     bool canReport = true;
+    ReportEnd endsWith = ReportEnd::complete; ///< why a report ends
     int reports = 0;
     int ends = 0;
 

@@ -1,0 +1,55 @@
+#include "monitor/ReportOutcome.h"
+
+namespace {
+
+thread_local ReportOutcome* current = nullptr;
+
+} // namespace
+
+ReportOutcome::ReportOutcome() noexcept : m_outer(current) {
+    current = this;
+    m_reached.reserve(stampLength);
+}
+
+ReportOutcome::~ReportOutcome() {
+    current = m_outer;
+}
+
+void ReportOutcome::note(ReportEnd end) noexcept {
+    if (current != nullptr && !current->m_isNoted) {
+        current->m_isNoted = true;
+        current->m_end = end;
+    }
+}
+
+void ReportOutcome::noteReached(const char* entryTime) noexcept {
+    if (current != nullptr) {
+        current->m_reached.assign(entryTime, stampLength); // its room was reserved
+    }
+}
+
+const char* ReportOutcome::reason() const noexcept {
+    switch (m_end) {
+    case ReportEnd::complete:
+        break;
+    case ReportEnd::notRead:
+        return "the log cannot be read";
+    case ReportEnd::formatErrors:
+        return "eleven lines in a row do not fit the log's format, and a report ends there";
+    case ReportEnd::longLine:
+        return "a line is too long, and a report ends there";
+    case ReportEnd::noTime:
+        return "an entry has no time, and a report ends there";
+    case ReportEnd::readError:
+        return "reading the log failed";
+    case ReportEnd::brokenRecord:
+        return "the log does not consist of whole records";
+    case ReportEnd::notAnEntry:
+        return "the log's command wrote a line that is not an entry";
+    case ReportEnd::commandFailed:
+        return "the log's command failed";
+    case ReportEnd::rowLimit:
+        return "the report has read as many entries as it may";
+    }
+    return "";
+}
