@@ -11,36 +11,20 @@
 
 namespace {
 
-/// The character of a valid sequence.
-char32_t decoded(std::string_view sequence) {
-    const auto first = static_cast<unsigned char>(sequence[0]);
-    if (sequence.size() == 1) {
-        return first;
-    }
-    char32_t character = first & (0x7fu >> sequence.size());
-    for (const char next : sequence.substr(1)) {
-        character = (character << 6) | (static_cast<unsigned char>(next) & 0x3fu);
-    }
-    return character;
-}
-
 struct Range {
     char32_t first;
     char32_t last;
 };
 
-/// Controls of terminals, and of the order in which text is shown.
-constexpr std::array<Range, 6> hidden = {{{0x00, 0x1f},
-                                          {0x7f, 0x9f},
-                                          {0x200b, 0x200f},
-                                          {0x2028, 0x202e},
-                                          {0x2060, 0x206f},
-                                          {0xfeff, 0xfeff}}};
+/// Characters without a width, behind which other text could hide.
+constexpr std::array<Range, 4> invisible = {
+    {{0x200b, 0x200f}, {0x2060, 0x2065}, {0x206a, 0x206f}, {0xfeff, 0xfeff}}};
 
 bool isHidden(char32_t character) {
-    return std::any_of(hidden.begin(), hidden.end(), [&](const Range& range) {
-        return character >= range.first && character <= range.last;
-    });
+    return Utf8::isSteering(character) ||
+           std::any_of(invisible.begin(), invisible.end(), [&](const Range& range) {
+               return character >= range.first && character <= range.last;
+           });
 }
 
 std::string escaped(char32_t character) {
@@ -77,7 +61,7 @@ private:
 };
 
 std::size_t columnsOf(std::string_view sequence) {
-    const char32_t character = decoded(sequence);
+    const char32_t character = Utf8::character(sequence);
     if (character < 0x80) {
         return 1;
     }
@@ -95,7 +79,7 @@ std::string DisplayText::visible(std::string_view text) {
         const std::string_view bytes = text.substr(0, sequence.length);
         if (!sequence.valid) {
             result += Utf8::kReplacement;
-        } else if (const char32_t character = decoded(bytes); isHidden(character)) {
+        } else if (const char32_t character = Utf8::character(bytes); isHidden(character)) {
             result += escaped(character);
         } else {
             result += bytes;

@@ -1,5 +1,7 @@
 #include "host/cli/JsonText.h"
 
+#include "host/framework/SteeringText.h"
+
 #include <nlohmann/json.hpp>
 
 namespace {
@@ -29,24 +31,8 @@ JsonText::Json JsonText::parse(std::string_view text) {
 }
 
 std::string JsonText::dump(const Json& value, bool onOneLine) {
-    const std::string text =
-        value.dump(onOneLine ? -1 : 2, ' ', false, nlohmann::json::error_handler_t::replace);
-    // The library escapes the ASCII controls; the others stand within strings, too.
-    std::string result;
-    std::size_t from = 0;
-    for (std::size_t at = 0; at < text.size(); ++at) {
-        const auto byte = static_cast<unsigned char>(text[at]);
-        const auto next = static_cast<unsigned char>(at + 1 < text.size() ? text[at + 1] : 0);
-        if (byte == 0x7f || (byte == 0xc2 && next < 0xa0)) {
-            constexpr const char* digits = "0123456789abcdef";
-            const unsigned char code = byte == 0x7f ? byte : next;
-            result.append(text, from, at - from);
-            result += std::string("\\u00") + digits[code >> 4] + digits[code & 0x0f];
-            at += byte == 0x7f ? 0 : 1;
-            from = at + 1;
-        }
-    }
-    return result.append(text, from);
+    return SteeringText::escapedInJson(
+        value.dump(onOneLine ? -1 : 2, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 
 std::string JsonText::text(const Json& value) {

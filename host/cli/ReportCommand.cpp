@@ -86,15 +86,25 @@ std::string tableText(const Json& rows, const std::vector<std::string>& columns,
     return table.text(terminal);
 }
 
-/// Comma-separated values, as they are; on a terminal without what could steer it.
-std::string csvText(const Json& rows, const std::vector<std::string>& columns,
-                    const Terminal& terminal) {
+/// A value as a field: times are readable, nothing steers a terminal, and no spreadsheet takes a
+/// text for a formula.
+std::string csvField(const Json& row, const std::string& column) {
+    const std::string text = JsonText::text(row, column);
+    if (isTime(column)) {
+        return TimeDisplay::stamp(text);
+    }
+    const std::string visible = DisplayText::visible(text);
+    const bool isFormula = JsonText::member(row, column).is_string() && !visible.empty() &&
+                           std::string_view("=+-@").find(visible.front()) != std::string_view::npos;
+    return isFormula ? '\'' + visible : visible;
+}
+
+std::string csvText(const Json& rows, const std::vector<std::string>& columns) {
     std::string text = CsvText::record(columns);
     for (const Json& row : rows) {
         std::vector<std::string> fields;
         for (const std::string& column : columns) {
-            const std::string value = JsonText::text(row, column);
-            fields.push_back(terminal.isTerminal ? DisplayText::visible(value) : value);
+            fields.push_back(csvField(row, column));
         }
         text += CsvText::record(fields);
     }
@@ -141,7 +151,7 @@ int ReportCommand::run(Context& context) {
         if (columns.empty()) {
             columns = known.get<std::vector<std::string>>();
         }
-        context.print(csvText(rows, columns, context.terminal()));
+        context.print(csvText(rows, columns));
     } else if (!rows.empty()) {
         if (columns.empty()) {
             std::copy_if(usualColumns.begin(), usualColumns.end(), std::back_inserter(columns),

@@ -1,6 +1,7 @@
 #include "host/events/RowJson.h"
 
 #include "host/events/RowText.h"
+#include "host/framework/SteeringText.h"
 #include "host/framework/Utf8.h"
 
 #include <array>
@@ -68,13 +69,22 @@ void appendEscaped(std::string& out, char c) {
     }
 }
 
+/// A character beyond ASCII.
+void appendCharacter(std::string& out, std::string_view sequence) {
+    if (const char32_t character = Utf8::character(sequence); Utf8::isSteering(character)) {
+        SteeringText::appendEscape(out, character);
+    } else {
+        out += sequence;
+    }
+}
+
 /// Takes the first sequence, which does not stand as it is in ASCII, off the text.
 void appendSpecial(std::string& out, std::string_view& text) {
     const Utf8::Sequence sequence = Utf8::firstSequence(text);
     if (!sequence.valid) {
         out += Utf8::kReplacement;
     } else if (sequence.length > 1) {
-        out += text.substr(0, sequence.length);
+        appendCharacter(out, text.substr(0, sequence.length));
     } else {
         appendEscaped(out, text.front());
     }

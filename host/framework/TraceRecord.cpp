@@ -1,9 +1,22 @@
 #include "host/framework/TraceRecord.h"
 
 #include "host/framework/TraceClock.h"
+#include "host/framework/Utf8.h"
 
 #include <algorithm>
 #include <cstdio>
+#include <cstring>
+
+namespace {
+
+constexpr std::size_t longestEscape = 6;
+
+/// Whether a byte is shown by every terminal as it is, or is a line end or tab.
+bool isPlain(char c) {
+    return (c >= ' ' && c < 0x7f) || c == '\n' || c == '\t';
+}
+
+} // namespace
 
 TraceRecord::TraceRecord(const std::timespec& moment, long thread, const char* unit,
                          int line) noexcept {
@@ -30,5 +43,35 @@ std::string_view TraceRecord::finish() noexcept {
     if (m_text[m_size - 1] != '\n') {
         m_text[m_size++] = '\n';
     }
-    return {m_text, m_size};
+    return std::all_of(m_text, m_text + m_size, isPlain) ? std::string_view(m_text, m_size)
+                                                         : escaped();
+}
+
+/// The record with escapes in the place of what steers a terminal, cut where it becomes too long.
+std::string_view TraceRecord::escaped() noexcept {
+    std::size_t size = 0;
+    for (std::string_view rest(m_text, m_size - 1); !rest.empty();) {
+        const Utf8::Sequence sequence = Utf8::firstSequence(rest);
+        const std::string_view bytes = rest.substr(0, sequence.length);
+        rest.remove_prefix(sequence.length);
+        // A byte that belongs to no character may be a control in the terminal's own code page.
+        const char32_t character =
+            sequence.valid ? Utf8::character(bytes) : static_cast<unsigned char>(bytes.front());
+        const bool isShown =
+            (bytes.size() == 1 && isPlain(bytes.front())) || !Utf8::isSteering(character);
+        if (size + std::max<std::size_t>(bytes.size(), longestEscape) >= kMaxSize) {
+            break;
+        }
+        if (isShown) {
+            std::memcpy(m_escaped + size, bytes.data(), bytes.size());
+            size += bytes.size();
+        } else {
+            size += static_cast<std::size_t>(
+                std::snprintf(m_escaped + size, longestEscape + 1,
+                              character < 0x80 || !sequence.valid ? "\\x%02x" : "\\u%04x",
+                              static_cast<unsigned>(character)));
+        }
+    }
+    m_escaped[size++] = '\n';
+    return {m_escaped, size};
 }

@@ -7,8 +7,9 @@
 #include <string_view>
 
 /// One trace record: local time with microseconds, thread, unit and line, text, and one newline at
-/// its end. What does not fit is cut. Lives on the stack of one thread; neither locks nor
-/// allocates.
+/// its end. Characters that steer a terminal are escaped, line ends and tabs excepted, which the
+/// agent's own texts have. What does not fit is cut. Lives on the stack of one thread; neither
+/// locks nor allocates.
 class TraceRecord {
 public:
     static constexpr std::size_t kMaxSize = 16384; ///< bytes, with the newline
@@ -24,8 +25,11 @@ public:
     std::string_view finish() noexcept;
 
 private:
+    std::string_view escaped() noexcept;
+
     std::size_t m_size = 0;
     char m_text[kMaxSize];
+    char m_escaped[kMaxSize]; ///< used where something is to be escaped
 };
 
 #endif

@@ -117,6 +117,26 @@ std::size_t Utf8::validPrefix(std::string_view text) noexcept {
     }
 }
 
+char32_t Utf8::character(std::string_view sequence) noexcept {
+    const auto first = static_cast<unsigned char>(sequence[0]);
+    if (sequence.size() == 1) {
+        return first;
+    }
+    char32_t character = first & (0x7fu >> sequence.size());
+    for (const char next : sequence.substr(1)) {
+        character = (character << 6) | (static_cast<unsigned char>(next) & 0x3fu);
+    }
+    return character;
+}
+
+bool Utf8::isSteering(char32_t character) noexcept {
+    const auto isBetween = [character](char32_t first, char32_t last) {
+        return character >= first && character <= last;
+    };
+    return character < 0x20 || isBetween(0x7f, 0x9f) || character == 0x061c ||
+           isBetween(0x200e, 0x200f) || isBetween(0x2028, 0x202e) || isBetween(0x2066, 0x2069);
+}
+
 std::string_view Utf8::prefix(std::string_view text, std::size_t size) noexcept {
     if (size >= text.size()) {
         return text;

@@ -29,6 +29,13 @@ struct Sequence {
 /// beginning of a character that was broken off, or one byte.
 Sequence firstSequence(std::string_view text) noexcept;
 
+/// The character of a valid sequence.
+char32_t character(std::string_view sequence) noexcept;
+
+/// Whether a character steers how text is shown instead of showing something: the controls of
+/// terminals (C0, delete, C1), separators of lines, and what changes the direction of text.
+bool isSteering(char32_t character) noexcept;
+
 /// The longest beginning of at most `size` bytes that does not cut a character.
 std::string_view prefix(std::string_view text, std::size_t size) noexcept;
 

@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_HTTP_ANSWER_H
 #define ZRM_HOST_HTTP_ANSWER_H
 
+#include "host/framework/SteeringText.h"
+
 #include <functional>
 #include <memory>
 #include <string>
@@ -43,8 +45,10 @@ struct HttpAnswer {
     std::vector<std::pair<std::string, std::string>> headers = {}; ///< further ones
     Stream stream = {};                                            ///< in place of `body`
 
-    /// An answer of status 200 with a JSON text.
-    static HttpAnswer json(std::string text) { return {200, "application/json", std::move(text)}; }
+    /// An answer of status 200 with a JSON text, in which nothing steers how it is shown.
+    static HttpAnswer json(std::string text) {
+        return {200, "application/json", SteeringText::escapedInJson(std::move(text))};
+    }
 };
 
 #endif

@@ -1,5 +1,6 @@
 #include "host/sinks/AlertmanagerSink.h"
 
+#include "host/framework/SteeringText.h"
 #include "host/framework/UtcTime.h"
 #include "host/sinks/EventRow.h"
 
@@ -44,5 +45,5 @@ std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const 
         }
         alerts.push_back(std::move(alert));
     }
-    return alerts.dump(-1, ' ', false, Json::error_handler_t::replace);
+    return SteeringText::escapedInJson(alerts.dump(-1, ' ', false, Json::error_handler_t::replace));
 }

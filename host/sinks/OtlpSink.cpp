@@ -1,6 +1,7 @@
 #include "host/sinks/OtlpSink.h"
 
 #include "agent/TraceScope.h"
+#include "host/framework/SteeringText.h"
 #include "host/sinks/EventRow.h"
 #include "host/sinks/SeverityCodes.h"
 
@@ -102,7 +103,7 @@ std::string OtlpSink::bodyOf(std::span<const EventRecord> events) const {
          Json::array({{{"resource", {{"attributes", std::move(resource)}}},
                        {"scopeLogs", Json::array({{{"scope", {{"name", "zrmagent"}}},
                                                    {"logRecords", std::move(records)}}})}}})}};
-    return body.dump(-1, ' ', false, Json::error_handler_t::replace);
+    return SteeringText::escapedInJson(body.dump(-1, ' ', false, Json::error_handler_t::replace));
 }
 
 void OtlpSink::taken(std::size_t events, const std::string& text) const {

@@ -1,7 +1,9 @@
 #include "host/sinks/SyslogMessage.h"
 
 #include "host/config/SyslogFacilities.h"
+#include "host/framework/SteeringText.h"
 #include "host/framework/UtcTime.h"
+#include "host/framework/Utf8.h"
 #include "host/sinks/EventRow.h"
 #include "host/sinks/SeverityCodes.h"
 
@@ -16,6 +18,26 @@ constexpr std::string_view byteOrderMark = "\xef\xbb\xbf";
 
 bool isControl(char c) {
     return static_cast<unsigned char>(c) < ' ' || c == 0x7f;
+}
+
+/// The text on one line, in which nothing steers how it is shown: a blank for each control of
+/// ASCII, other characters by number.
+std::string visible(std::string_view text) {
+    std::string result;
+    result.reserve(text.size());
+    while (!text.empty()) {
+        const Utf8::Sequence sequence = Utf8::firstSequence(text);
+        const std::string_view bytes = text.substr(0, sequence.length);
+        if (sequence.length == 1) {
+            result += isControl(bytes.front()) ? ' ' : bytes.front();
+        } else if (sequence.valid && Utf8::isSteering(Utf8::character(bytes))) {
+            SteeringText::appendEscape(result, Utf8::character(bytes));
+        } else {
+            result += bytes;
+        }
+        text.remove_prefix(sequence.length);
+    }
+    return result;
 }
 
 bool isAscii(std::string_view text) {
@@ -35,11 +57,11 @@ void appendParameter(std::string& data, const char* name, std::string_view value
     data += ' ';
     data += name;
     data += "=\"";
-    for (const char c : value) {
+    for (const char c : visible(value)) {
         if (c == '"' || c == '\\' || c == ']') {
             data += '\\';
         }
-        data += isControl(c) ? ' ' : c;
+        data += c;
     }
     data += '"';
 }
@@ -48,8 +70,7 @@ void appendParameter(std::string& data, const char* name, std::string_view value
 /// many bytes.
 std::string messageText(std::string_view description, std::size_t most) {
     std::string text(isAscii(description) ? "" : byteOrderMark);
-    text += description;
-    std::replace_if(text.begin(), text.end(), isControl, ' ');
+    text += visible(description);
     if (text.size() > most) {
         // Not within a character: those behind its first byte begin with the bits 10.
         while (most > 0 && (static_cast<unsigned char>(text[most]) & 0xc0) == 0x80) {

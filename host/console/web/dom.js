@@ -6,6 +6,7 @@ export function h(tag, properties = {}, ...children) {
   for (const [name, value] of Object.entries(properties)) {
     if (value === null || value === undefined || value === false) continue;
     if (name.startsWith("on")) element.addEventListener(name.slice(2), value);
+    else if (name === "title") element.title = visible(String(value));
     else if (name in element && !name.includes("-") && !fixed.has(name)) element[name] = value;
     else element.setAttribute(name, value === true ? "" : value);
   }
@@ -15,8 +16,15 @@ export function h(tag, properties = {}, ...children) {
 
 const fixed = new Set(["list", "form", "role"]);
 
+// Controls, and what changes the direction of text: they would not show, but change what does.
+const STEERING = /[\u0000-\u0008\u000b-\u001f\u007f-\u009f\u061c\u200e\u200f\u2028-\u202e\u2066-\u2069]/g;
+
+/** A text with such characters written by number. */
+export const visible = (text) => text.replace(STEERING, (one) => `\\u${one.charCodeAt(0).toString(16).padStart(4, "0")}`);
+
 function nodes(children) {
-  return children.flat(Infinity).filter((child) => child !== null && child !== undefined && child !== false);
+  return children.flat(Infinity).filter((child) => child !== null && child !== undefined && child !== false)
+    .map((child) => (typeof child === "string" ? visible(child) : child));
 }
 
 /** Replaces what an element holds. */

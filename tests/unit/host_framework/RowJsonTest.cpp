@@ -1,5 +1,7 @@
 #include "host/events/RowJson.h"
 
+#include "host/framework/SteeringText.h"
+
 #include "host/framework/Utf8.h"
 #include "unit/host_framework/TestTable.h"
 
@@ -91,6 +93,21 @@ TEST(RowJson, AgreesWithTheJsonLibraryOnRandomBytes) {
             ASSERT_EQ(written, nlohmann::json(text).dump(-1, ' ', false, replace));
         }
     }
+}
+
+TEST(RowJson, WhatSteersHowTextIsShownIsEscaped) {
+    std::string text;
+    RowJson::appendText(text, "\xc2\x9b"
+                              "31m \xe2\x80\xae \xd8\x9c \xe2\x81\xa9 \xc2\xa0 \xe2\x82\xac");
+    EXPECT_EQ(text, "\"\\u009b31m \\u202e \\u061c \\u2069 \xc2\xa0 \xe2\x82\xac\"");
+}
+
+TEST(RowJson, ADocumentKeepsItsMeaningWhenItsTextsAreEscaped) {
+    EXPECT_EQ(SteeringText::escapedInJson(
+                  "{\"a\": \"x\x7f\xc2\x85y\xe2\x80\xa8\xe2\x82\xac\xc3\xa4\"}\n"),
+              "{\"a\": \"x\\u007f\\u0085y\\u2028\xe2\x82\xac\xc3\xa4\"}\n");
+    EXPECT_EQ(SteeringText::escapedInJson("{}"), "{}");
+    EXPECT_EQ(SteeringText::escapedInJson("\"\xe2\x80"), "\"\xe2\x80");
 }
 
 } // namespace

@@ -72,6 +72,16 @@ TEST(SyslogMessage, HasNoControlCharacters) {
                        "a b c d e"));
 }
 
+TEST(SyslogMessage, WhatSteersATerminalOrTheDirectionOfTextIsWrittenByNumber) {
+    EXPECT_EQ(messageOf({.description = "a\xc2\x9b"
+                                        "31m\xe2\x80\xae"
+                                        "b",
+                         .log = "/\xe2\x81\xa7"}),
+              expected(26, " situation=\"ssh-bruteforce\" severity=\"critical\" log=\"/\\\\u2067\"",
+                       "\xef\xbb\xbf"
+                       "a\\u009b31m\\u202eb"));
+}
+
 TEST(SyslogMessage, IsCutAtTheEndOfACharacter) {
     const std::size_t front = messageOf({.description = "x"}).size() - 1;
     const std::size_t room = SyslogMessage::kLongest - front;
