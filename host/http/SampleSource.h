@@ -16,8 +16,8 @@ public:
         std::string json; ///< a JSON list of one object per row
         std::size_t count = 0;
         bool truncated = false; ///< as many rows were read as a report may read: there may be more
-        std::string reached;    ///< ENTRYTIME of a report's oldest entry read; empty: none was
-        std::string reason;     ///< why the report ended early, a clause; empty: it is complete
+        std::string reached = {}; ///< ENTRYTIME of a report's oldest entry read; empty: none was
+        std::string reason = {};  ///< why the report ended early, a clause; empty: it is complete
 
         /// `"complete":..,"reached":..,"reason":..`, members of a JSON object.
         std::string reachJson() const;
