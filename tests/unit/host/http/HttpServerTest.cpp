@@ -116,7 +116,8 @@ TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
     EXPECT_EQ(result->status, 200);
     EXPECT_EQ(
         result->body,
-        R"({"table":"RMMONLOG","rows":[{"LOGTYPE":"S"},{"LOGTYPE":"S"}],"count":2,"truncated":false})");
+        R"({"table":"RMMONLOG","rows":[{"LOGTYPE":"S"},{"LOGTYPE":"S"}],"count":2,"truncated":false,)"
+        R"("complete":true,"reached":null,"reason":null})");
     EXPECT_EQ(result->header("content-type"), "application/json");
     EXPECT_EQ(result->header("cache-control"), "no-store");
 }
@@ -124,11 +125,13 @@ TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
 TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
     source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
         EXPECT_EQ(conditions.size(), table == "RMLOGENT" ? 4u : 2u);
-        return SampleSource::Rows{"[{}]", 1, true};
+        return SampleSource::Rows{"[{}]", 1, true, "1261120070309000", "it read enough"};
     };
     const auto result = sample("RMLOGENT", report());
     ASSERT_TRUE(result);
-    EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[{}],"count":1,"truncated":true})");
+    EXPECT_EQ(result->body,
+              R"({"table":"RMLOGENT","rows":[{}],"count":1,"truncated":true,)"
+              R"("complete":false,"reached":"1261120070309000","reason":"it read enough"})");
 }
 
 TEST_F(HttpServerTest, AReportOnALogThatIsNotMonitoredIsAProblem) {
@@ -144,7 +147,8 @@ TEST_F(HttpServerTest, AReportOnALogThatIsNotMonitoredIsAProblem) {
     monitored = 1;
     const auto result = sample("RMLOGENT", report());
     ASSERT_TRUE(result);
-    EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[],"count":0,"truncated":false})");
+    EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[],"count":0,"truncated":false,)"
+                            R"("complete":true,"reached":null,"reason":null})");
 }
 
 TEST_F(HttpServerTest, RefusesRequestsWithoutTheToken) {
