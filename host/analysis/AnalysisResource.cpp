@@ -7,6 +7,8 @@
 #include "host/analysis/MonitoredLogs.h"
 #include "host/analysis/StoredRow.h"
 #include "host/config/TimeText.h"
+#include "host/diagnose/LogWarnings.h"
+#include "host/diagnose/LogWatch.h"
 #include "host/framework/TraceCapture.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/EventQuery.h"
@@ -15,6 +17,7 @@
 #include "host/http/Router.h"
 #include "host/situations/SituationBody.h"
 #include "host/situations/SituationJson.h"
+#include "monitor/LogFile.h"
 
 #include <limits>
 #include <optional>
@@ -104,6 +107,10 @@ HttpAnswer AnalysisResource::explain(const HttpRequest& request) {
     }
     Json answer{{"explanations", std::move(explanations)}};
     explained.reach.addTo(answer);
+    answer["warnings"] = Json::array();
+    for (const LogWarning& warning : m_watch.of(explained.log)) {
+        answer["warnings"].push_back(LogWarnings::json(warning));
+    }
     return HttpAnswer::json(SituationJson::text(answer));
 }
 
@@ -127,7 +134,7 @@ AnalysisResource::Explained AnalysisResource::explainLine(JsonFields& fields) {
     if (!explainer.problem().empty()) {
         throw RequestRefused(503, explainer.problem(), "line");
     }
-    return {std::move(explanations), explainer.reach()};
+    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
 }
 
 AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
@@ -144,7 +151,7 @@ AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
     if (!explainer.problem().empty()) {
         throw RequestRefused(409, explainer.problem(), "log");
     }
-    return {std::move(explanations), explainer.reach()};
+    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
 }
 
 AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
@@ -171,7 +178,7 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     }
     const MonitoredLogs logs;
     std::vector<Explanation> explanations{explainer.event(logs.find(event->log), entry)};
-    return {std::move(explanations), explainer.reach()};
+    return {std::move(explanations), explainer.reach(), event->log};
 }
 
 HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {

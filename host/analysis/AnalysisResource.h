@@ -16,14 +16,16 @@
 
 class HistoryReader;
 class JsonFields;
+class LogWatch;
 class TableManager;
 
 /// `POST /api/v1/explain` and `POST /api/v1/backtest`.
 class AnalysisResource : public Resource {
 public:
     /// All outlive the object; the history is null when it is off.
-    AnalysisResource(SituationSet& situations, TableManager& entries, HistoryReader* history)
-        : m_situations(situations), m_entries(entries), m_history(history) {}
+    AnalysisResource(SituationSet& situations, TableManager& entries, const LogWatch& watch,
+                     HistoryReader* history)
+        : m_situations(situations), m_entries(entries), m_watch(watch), m_history(history) {}
 
     void addRoutes(Router& router) override;
 
@@ -38,7 +40,8 @@ private:
 
     struct Explained {
         std::vector<Explanation> explanations;
-        Reach reach; ///< of the log that they are about
+        Reach reach;     ///< of the log that they are about
+        std::string log; ///< its path
     };
 
     HttpAnswer explain(const HttpRequest& request);
@@ -50,6 +53,7 @@ private:
 
     SituationSet& m_situations;
     TableManager& m_entries;
+    const LogWatch& m_watch;
     HistoryReader* const m_history;
     std::counting_semaphore<2> m_room{2}; ///< of backtests at a time
     std::atomic<bool> m_isCancelled{false};

@@ -106,6 +106,9 @@ int ExplainCommand::run(Context& context) {
         }
         context.print(text);
         Context::noteReach(answer);
+        for (const Json& warning : JsonText::member(answer, "warnings")) {
+            Context::note("this log: " + JsonText::text(warning, "text"));
+        }
     }
     if (explanations.empty()) {
         Context::note("there is no entry to explain");

@@ -35,8 +35,12 @@ std::string kindOf(const Json& row) {
     return letter;
 }
 
-Table::Cell statusCell(const Json& row) {
+Table::Cell statusCell(const Json& row, const Json& ledger) {
     const std::string status = JsonText::text(row, "MONSTATUS");
+    if (status == "Running" && ledger.is_object() &&
+        !JsonText::member(ledger, "warnings").empty()) {
+        return {"Running (!)", Colour::NOTICE};
+    }
     if (status == "Running") {
         return {status, Colour::GOOD};
     }
@@ -79,6 +83,9 @@ void addLedger(FactList& facts, const Json& ledger) {
     }
     facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
     facts.add("last entry", lastEntry(ledger));
+    for (const Json& warning : JsonText::member(ledger, "warnings")) {
+        facts.add("warning", JsonText::text(warning, "text"), Colour::NOTICE);
+    }
 }
 
 std::string rejectedText(const Json& ledger, const Terminal& terminal) {
@@ -115,8 +122,12 @@ void noteConfiguration(const Json& answer) {
     }
 }
 
-/// Whether the agent reads the log, and the log has a file.
+/// Whether the agent reads the log, and the log has a file and no warning.
 bool isMonitored(const Json& log) {
+    const Json& ledger = JsonText::member(log, "ledger");
+    if (ledger.is_object() && !JsonText::member(ledger, "warnings").empty()) {
+        return false;
+    }
     const Json& row = JsonText::member(log, "row");
     const Json& size = JsonText::member(row, "LOGSIZE");
     return JsonText::text(row, "MONSTATUS") == "Running" && size.is_number() &&
@@ -130,6 +141,16 @@ bool isSomethingWrong(const Json& answer) {
     return logs.empty() || !std::all_of(logs.begin(), logs.end(), isMonitored) ||
            !JsonText::member(answer, "unmonitored").empty() ||
            !JsonText::text(configuration, "problem").empty();
+}
+
+void noteWarnings(const Json& answer) {
+    for (const Json& log : JsonText::member(answer, "logs")) {
+        const Json& ledger = JsonText::member(log, "ledger");
+        for (const Json& warning :
+             ledger.is_object() ? JsonText::member(ledger, "warnings") : Json()) {
+            Context::note(JsonText::text(log, "log") + ": " + JsonText::text(warning, "text"));
+        }
+    }
 }
 
 std::string unmonitoredText(const Json& answer, const Terminal& terminal) {
@@ -178,11 +199,13 @@ int LogsCommand::list(Context& context) {
                  {"CHANGED", Table::FIXED}});
     for (const Json& log : JsonText::member(answer, "logs")) {
         const Json& row = JsonText::member(log, "row");
-        table.add({JsonText::text(log, "log"), kindOf(row), statusCell(row),
+        table.add({JsonText::text(log, "log"), kindOf(row),
+                   statusCell(row, JsonText::member(log, "ledger")),
                    JsonText::text(row, "NUMEVENTS"), countCell(row, "NUMERRORS"), sizeText(row),
                    TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE"))});
     }
     noteConfiguration(answer);
+    noteWarnings(answer);
     const std::string unmonitored = unmonitoredText(answer, context.terminal());
     if (table.empty()) {
         Context::note("the agent monitors no log");
@@ -213,7 +236,7 @@ int LogsCommand::show(Context& context) {
     }
     const Json& row = JsonText::member(logs.front(), "row");
     const Json& ledger = JsonText::member(logs.front(), "ledger");
-    const Table::Cell status = statusCell(row);
+    const Table::Cell status = statusCell(row, ledger);
     FactList facts;
     facts.add("log", JsonText::text(logs.front(), "log"));
     facts.add("type", kindOf(row));

@@ -114,5 +114,8 @@ int StatusCommand::run(Context& context) {
     if (!sinks.empty()) {
         context.print('\n' + sinks.text(context.terminal()));
     }
+    for (const Json& warning : JsonText::member(status, "warnings")) {
+        Context::note(JsonText::text(warning, "log") + ": " + JsonText::text(warning, "text"));
+    }
     return outcome;
 }

@@ -3,6 +3,7 @@
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 #include "host/diagnose/ConfiguredFormat.h"
+#include "host/diagnose/LogWarnings.h"
 #include "host/framework/TraceCapture.h"
 #include "logmgr/LogManagerUtil.h"
 #include "logmgr/ValidLog.h"
@@ -97,6 +98,7 @@ public:
         if (valid->isValid() && valid->type() == 'U') {
             learnFormat(*valid, errors, line);
         }
+        warnOfContents(*valid, line);
         const std::string problem = log[0] == '/' ? ConfigCheck::problemOfFile(log) : "";
         if (line.verdict == Verdict::REFUSED && !problem.empty()) {
             line.cause = Cause::FILE;
@@ -128,6 +130,17 @@ private:
             line.reason += "Error occurred while interpreting format command for file " +
                            std::string(log.fileNameLocal()) + "; monitoring not started. ";
         }
+    }
+    /// An accepted log whose file does not look like one of its type gets a warning.
+    static void warnOfContents(const ValidLog& log, Line& line) {
+        std::string warning;
+        if (log.isValid() && log.type() == 'S') {
+            warning = LogWarnings::ofSyslogFile(log.fileNameLocal());
+        } else if (log.isValid() && log.type() == 'A') {
+            warning = LogWarnings::ofAccountingFile(log.fileNameLocal());
+        }
+        line.reason += line.reason.empty() || warning.empty() ? "" : " ";
+        line.reason += warning;
     }
 
     const ConfigCheck::Directories* m_directories;

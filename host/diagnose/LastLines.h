@@ -12,9 +12,10 @@ public:
     static constexpr std::size_t kMostBytes = std::size_t{4} << 20; ///< that are read at most
 
     /// The last lines of an open regular file, at most `count`, the oldest first and without their
-    /// line ends; fewer when they have more than kMostBytes. None, with errno, when it cannot be
+    /// line ends; fewer when they have more than `mostBytes`. None, with errno, when it cannot be
     /// read. Any thread.
-    static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count);
+    static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count,
+                                                        std::size_t mostBytes = kMostBytes);
 };
 
 #endif

@@ -8,6 +8,13 @@
 #include <string>
 #include <vector>
 
+/// Something about a log, monitored without an error, that wants an operator's attention.
+struct LogWarning {
+    std::string kind;   ///< missing, replaced, without_time or not_records
+    std::int64_t since; ///< when it was first noticed
+    std::string text;   ///< what is wrong and the cure, in sentences
+};
+
 /// What the monitor of one log has read and what it has passed over, since the log is monitored,
 /// at one moment. A refresh that changes the log's type or procedure begins a new one. Times are
 /// in milliseconds since 1970-01-01 UTC.
@@ -41,6 +48,8 @@ struct LogLedgerView {
     std::int64_t withoutTime = 0; ///< rows
     std::int64_t restarts = 0;    ///< of the monitor
     std::optional<std::int64_t> lastEntry;
+
+    std::vector<LogWarning> warnings; ///< none unless LogWatch was asked
 
     // The latest, the oldest first. Only of a log that was asked for by name.
     std::vector<Rejected> rejected;

@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "agent/zrmmain.h"
 #include "host/diagnose/FormatTrial.h"
+#include "host/diagnose/LogWarnings.h"
 #include "host/framework/UtcTime.h"
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
@@ -136,6 +137,10 @@ std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
     };
     if (ledger.lastEntry) {
         object["last_entry"] = UtcTime::text(*ledger.lastEntry);
+    }
+    object["warnings"] = nlohmann::ordered_json::array();
+    for (const LogWarning& warning : ledger.warnings) {
+        object["warnings"].push_back(LogWarnings::json(warning));
     }
     if (withSamples) {
         object["rejected"] = nlohmann::ordered_json::array();

@@ -2,11 +2,13 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "agent/zrmmain.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/LogLedgers.h"
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
 #include "host/framework/Utf8.h"
+#include "logmgr/LogManager.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -15,6 +17,7 @@
 #include <iterator>
 
 #include <nlohmann/json.hpp>
+#include <sys/stat.h>
 
 namespace {
 
@@ -65,12 +68,26 @@ std::string inUtf8(std::string_view name) {
     return text;
 }
 
-UnmonitoredLogs::Log logOf(const ConfigCheck::Line& line) {
+/// Whether the agent remembers the configuration's modification time, which counts in seconds.
+bool isTakenOver(const char* path) {
+    struct stat status;
+    const LogManager* const manager = pTheLogManager;
+    return manager != nullptr && ::stat(path, &status) == 0 &&
+           manager->isConfigTakenOver(status.st_mtime);
+}
+
+UnmonitoredLogs::Log logOf(const ConfigCheck::Line& line, bool isTakenOver) {
     UnmonitoredLogs::Log log{inUtf8(nameIn(line.text)), line.number, line.reason,
                              ConfigCheck::name(line.cause)};
     if (line.verdict == ConfigCheck::Verdict::ACCEPTED) {
         log.reason = "The agent has not read this line yet.";
         log.cause = "refresh";
+        if (isTakenOver) {
+            log.reason += " A refresh alone does not help: it takes the configuration for "
+                          "unchanged, since its modification time, in whole seconds, is the one "
+                          "that the agent has seen. Touch the configuration, then refresh.";
+            log.cause = "touch";
+        }
     }
     return log;
 }
@@ -98,19 +115,20 @@ UnmonitoredLogs::Result UnmonitoredLogs::read() {
     for (const LogLedgerView& log : LogLedgers::read()) {
         monitored.insert(log.file);
     }
-    result.logs = find(text, monitored);
+    result.logs = find(text, monitored, isTakenOver(path));
     return result;
 }
 
 std::vector<UnmonitoredLogs::Log> UnmonitoredLogs::find(std::string_view text,
-                                                        const std::set<std::string>& monitored) {
+                                                        const std::set<std::string>& monitored,
+                                                        bool isTakenOver) {
     TraceScope trace(anchor);
     std::vector<Log> logs;
     for (const ConfigCheck::Line& line : ConfigCheck::check(others(text, monitored)).lines) {
         if (line.verdict == ConfigCheck::Verdict::IGNORED) {
             continue;
         }
-        Log log = logOf(line);
+        Log log = logOf(line, isTakenOver);
         const bool isKnown = std::any_of(logs.begin(), logs.end(),
                                          [&](const Log& other) { return other.log == log.log; });
         if (!isKnown) {

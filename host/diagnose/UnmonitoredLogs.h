@@ -16,7 +16,8 @@ public:
         std::string log; ///< as the configuration names it, so not always a whole path
         std::size_t line;
         std::string reason;
-        const char* cause; ///< "file", "text", or "refresh" when only that is missing
+        const char* cause; ///< "file", "text", or "refresh" when only that is missing; "touch":
+                           ///< and a refresh would take the configuration for unchanged
     };
 
     struct Result {
@@ -31,7 +32,9 @@ public:
 
     /// The logs that a configuration's text names and that are not among `monitored`, which are
     /// local names. Any thread.
-    static std::vector<Log> find(std::string_view text, const std::set<std::string>& monitored);
+    /// `isTakenOver`: a refresh would take the configuration for unchanged.
+    static std::vector<Log> find(std::string_view text, const std::set<std::string>& monitored,
+                                 bool isTakenOver = false);
 
     /// A log as the JSON object that the API answers.
     static std::string json(const Log& log);

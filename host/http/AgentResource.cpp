@@ -4,6 +4,8 @@
 #include "agent/framework/agent_calls.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
+#include "host/diagnose/LogWarnings.h"
+#include "host/diagnose/LogWatch.h"
 #include "host/events/Delivery.h"
 #include "host/framework/TraceControl.h"
 #include "host/framework/UtcTime.h"
@@ -93,6 +95,19 @@ ordered_json sinksOf(const Delivery& delivery) {
     return sinks;
 }
 
+/// What is wrong with logs that are monitored without an error.
+ordered_json warningsOf(const LogWatch& watch) {
+    ordered_json list = ordered_json::array();
+    for (const auto& [log, warnings] : watch.all()) {
+        for (const LogWarning& warning : warnings) {
+            ordered_json one{{"log", log}};
+            one.update(LogWarnings::json(warning));
+            list.push_back(std::move(one));
+        }
+    }
+    return list;
+}
+
 HttpAnswer setTrace(const HttpRequest& request) {
     TraceScope trace(anchor);
     JsonFields fields(request.body);
@@ -135,7 +150,8 @@ HttpAnswer refresh(const HttpRequest& request) {
 
 } // namespace
 
-AgentResource::AgentResource(Delivery& delivery) : m_delivery(delivery), m_started(now()) {}
+AgentResource::AgentResource(Delivery& delivery, const LogWatch& watch)
+    : m_delivery(delivery), m_watch(watch), m_started(now()) {}
 
 void AgentResource::addRoutes(Router& router) {
     router.add("GET", "/api/v1/status",
@@ -154,5 +170,6 @@ HttpAnswer AgentResource::status(const HttpRequest& request) {
                        {"history", historyOf(m_delivery)},
                        {"queue", queueOf(m_delivery)},
                        {"sinks", sinksOf(m_delivery)},
+                       {"warnings", warningsOf(m_watch)},
                        {"trace", TraceControl::levels()}});
 }

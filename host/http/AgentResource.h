@@ -8,13 +8,14 @@
 #include <cstdint>
 
 class Delivery;
+class LogWatch;
 
 /// The agent as a whole: `GET /api/v1/status`, `PUT /api/v1/trace`, `GET /api/v1/columns` and
 /// `POST /api/v1/refresh`.
 class AgentResource : public Resource {
 public:
-    /// `delivery` outlives the object.
-    explicit AgentResource(Delivery& delivery);
+    /// Both outlive the object.
+    AgentResource(Delivery& delivery, const LogWatch& watch);
 
     void addRoutes(Router& router) override;
 
@@ -22,6 +23,7 @@ private:
     HttpAnswer status(const HttpRequest& request);
 
     Delivery& m_delivery;
+    const LogWatch& m_watch;
     const std::int64_t m_started; ///< milliseconds since 1970-01-01 UTC
 };
 

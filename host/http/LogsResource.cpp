@@ -3,6 +3,7 @@
 #include "agent/TraceScope.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/LogWatch.h"
 #include "host/diagnose/UnmonitoredLogs.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowJson.h"
@@ -58,7 +59,9 @@ std::vector<UnmonitoredLogs::Log> chosen(std::vector<UnmonitoredLogs::Log> logs,
     return logs;
 }
 
-HttpAnswer logs(const HttpRequest& request) {
+} // namespace
+
+HttpAnswer LogsResource::logs(const HttpRequest& request) {
     TraceScope trace(anchor);
     QueryFields query(request);
     const std::optional<std::string> log = query.text("log");
@@ -70,7 +73,10 @@ HttpAnswer logs(const HttpRequest& request) {
     if (log && count == 0 && unmonitored.empty()) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
-    const std::vector<LogLedgerView> ledgers = LogLedgers::read(log.value_or(""));
+    std::vector<LogLedgerView> ledgers = LogLedgers::read(log.value_or(""));
+    for (LogLedgerView& ledger : ledgers) {
+        ledger.warnings = m_watch.of(ledger.log);
+    }
     std::string text = "{\"logs\":[";
     for (std::size_t index = 0; index < count; ++index) {
         text += index == 0 ? "{\"log\":" : ",{\"log\":";
@@ -91,8 +97,6 @@ HttpAnswer logs(const HttpRequest& request) {
         ",\"time\":\"" + now() + "\"}");
 }
 
-} // namespace
-
 void LogsResource::addRoutes(Router& router) {
-    router.add("GET", "/api/v1/logs", logs);
+    router.add("GET", "/api/v1/logs", [this](const HttpRequest& request) { return logs(request); });
 }

@@ -1,12 +1,24 @@
 #ifndef ZRM_HOST_LOGS_RESOURCE_H
 #define ZRM_HOST_LOGS_RESOURCE_H
 
+#include "host/http/HttpAnswer.h"
+#include "host/http/HttpRequest.h"
 #include "host/http/Resource.h"
+
+class LogWatch;
 
 /// `GET /api/v1/logs`: the monitored logs as they are now.
 class LogsResource : public Resource {
 public:
+    /// `watch` outlives the object.
+    explicit LogsResource(const LogWatch& watch) : m_watch(watch) {}
+
     void addRoutes(Router& router) override;
+
+private:
+    HttpAnswer logs(const HttpRequest& request);
+
+    const LogWatch& m_watch;
 };
 
 #endif

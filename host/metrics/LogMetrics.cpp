@@ -1,6 +1,7 @@
 #include "host/metrics/LogMetrics.h"
 
 #include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/LogWatch.h"
 #include "host/diagnose/UnmonitoredLogs.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowText.h"
@@ -112,6 +113,15 @@ void collectTimes(MetricText& text, const Logs& logs) {
     }
 }
 
+void collectWarnings(MetricText& text, const LogWatch& watch) {
+    text.gauge("zrm_log_warning", "1 for each warning about a log that is monitored.");
+    for (const auto& [log, warnings] : watch.all()) {
+        for (const LogWarning& warning : warnings) {
+            text.add(1.0, {{"log", log}, {"warning", warning.kind}});
+        }
+    }
+}
+
 void collectSizes(MetricText& text, const Logs& logs) {
     text.gauge("zrm_log_size_bytes", "Size of the log, where the system tells it.");
     for (const auto& [path, log] : logs) {
@@ -136,4 +146,5 @@ void LogMetrics::collect(MetricText& text) {
     text.counter("zrm_logs_without_descriptor_total",
                  "Times that a log could not be opened for want of a descriptor.");
     text.add(DescriptorReserve::failures());
+    collectWarnings(text, m_watch);
 }

@@ -3,10 +3,18 @@
 
 #include "host/metrics/MetricSource.h"
 
+class LogWatch;
+
 /// The monitored logs: what the agent tells of each in the Monitored Logs table.
 class LogMetrics : public MetricSource {
 public:
+    /// `watch` outlives the object.
+    explicit LogMetrics(const LogWatch& watch) : m_watch(watch) {}
+
     void collect(MetricText& text) override;
+
+private:
+    const LogWatch& m_watch;
 };
 
 #endif

@@ -5,6 +5,7 @@
 #include "host/analysis/AnalysisResource.h"
 #include "host/console/ConsoleResource.h"
 #include "host/diagnose/DiagnoseResource.h"
+#include "host/diagnose/LogLedgers.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/history/WallClock.h"
@@ -91,6 +92,7 @@ void Serving::apply(const std::vector<SituationConfig>& situations, bool removes
 
 void Serving::tick() {
     m_descriptors.tick();
+    m_watch.tick(Clock::now(), [] { return LogLedgers::read(); });
     if (m_entries) {
         m_entries->tick(WallClock::now());
     }
@@ -113,14 +115,15 @@ void Serving::renewCredentials() {
 void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<HealthResource>());
     addResource(std::make_unique<ConsoleResource>());
-    addResource(std::make_unique<AgentResource>(m_delivery));
-    addResource(std::make_unique<LogsResource>());
+    addResource(std::make_unique<AgentResource>(m_delivery, m_watch));
+    addResource(std::make_unique<LogsResource>(m_watch));
     addResource(std::make_unique<SampleResource>(m_sampler));
     addResource(std::make_unique<DiagnoseResource>());
     addResource(std::make_unique<ReportResource>(m_sampler));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
-    auto analysis = std::make_unique<AnalysisResource>(m_situations, entries, m_delivery.history());
+    auto analysis =
+        std::make_unique<AnalysisResource>(m_situations, entries, m_watch, m_delivery.history());
     m_analysis = analysis.get();
     addResource(std::move(analysis));
     auto stream = std::make_unique<EventStream>(m_delivery.history());
@@ -132,7 +135,7 @@ void Serving::addMetrics(const EventStream& stream) {
     auto metrics = std::make_unique<MetricsResource>();
     metrics->add(std::make_unique<ProcessMetrics>());
     metrics->add(std::make_unique<ConfigMetrics>(m_reload));
-    metrics->add(std::make_unique<LogMetrics>());
+    metrics->add(std::make_unique<LogMetrics>(m_watch));
     metrics->add(std::make_unique<SituationMetrics>(m_situations));
     metrics->add(std::make_unique<DeliveryMetrics>(m_delivery));
     metrics->add(std::make_unique<HttpMetrics>(m_http, stream));

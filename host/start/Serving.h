@@ -2,6 +2,7 @@
 #define ZRM_HOST_SERVING_H
 
 #include "host/config/HostConfig.h"
+#include "host/diagnose/LogWatch.h"
 #include "host/events/Delivery.h"
 #include "host/history/EntryRecorder.h"
 #include "host/http/Credentials.h"
@@ -12,6 +13,7 @@
 #include "host/metrics/ConfigMetrics.h"
 #include "host/situations/SituationSet.h"
 #include "host/start/Descriptors.h"
+#include "host/start/Say.h"
 
 #include <chrono>
 #include <memory>
@@ -78,6 +80,7 @@ private:
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
     ConfigReload m_reload;
+    LogWatch m_watch{[](const std::string& line) { say("%s", line.c_str()); }};
     TableSampler m_sampler;
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP

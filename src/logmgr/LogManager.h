@@ -43,6 +43,10 @@ public:
     LogFile* getNextLogObject(LogFile* current, unsigned index);
     /// The monitored log of this local name, or null. Between beginRequest and endRequest.
     LogFile* findLogObject(const char* localName);
+    /// True when a refresh now would take the log configuration for unchanged. Any thread.
+    bool isConfigTakenOver(std::time_t lastModified) const noexcept {
+        return lastModified == ConfigFileLastChanged.load();
+    }
     std::uint32_t numLogs() const noexcept { return NumLogs.load(); }
     /// The open debug log, or null. Any thread; it stays open as long as any log exists.
     std::FILE* debugLogStream() const noexcept { return DebugLogP.load(); }

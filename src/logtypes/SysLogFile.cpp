@@ -148,6 +148,10 @@ SysLogFile::SysLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, c
     startThread();
 }
 
+SysLogFile::SysLogFile(const ValidLog& log, Unmonitored) : LogFile(log, nullptr) {
+    const TraceScope trace(anchor);
+}
+
 SysLogFile::~SysLogFile() {
     TraceScope trace(anchor);
     stopThread();

@@ -23,6 +23,10 @@ public:
     void processLogData() override;
 
 protected:
+    /// Prepares a log that is not monitored: no thread is started. For lines that are only tried.
+    struct Unmonitored {};
+    SysLogFile(const ValidLog& log, Unmonitored);
+
     /// Writes the 16 characters of ENTRYTIME, in the current year or, for a report, in the year
     /// that reading backwards has reached. Returns where the host field begins; the line's end,
     /// with `out` left as it was, when the line begins with no month or is too short for a time.

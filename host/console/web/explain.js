@@ -6,7 +6,8 @@ import { reachText, stamp } from "./format.js";
 /** The explanations of an answer, and how far the log was read for them. */
 export function explained(answer, options) {
   const reach = reachText(answer);
-  return [reach && h("p", { className: "why warn" }, reach),
+  return [answer.warnings.map(({ text }) => h("p", { className: "why warn" }, text)),
+    reach && h("p", { className: "why warn" }, reach),
     ...answer.explanations.map((one) => explanation(one, options))];
 }
 

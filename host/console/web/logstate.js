@@ -17,6 +17,10 @@ const WHY = [
   ["pipe", "The command of this log could not be started."],
 ];
 
+const WARNED = {
+  missing: "No file", replaced: "Replaced", without_time: "No times", not_records: "Wrong type",
+};
+
 /** {level: "bad" | "warn" | "idle" | "good", state, why, more: where to look} of a log of /api/v1/logs. */
 export function judge({ row, ledger }) {
   const status = row.MONSTATUS;
@@ -27,6 +31,14 @@ export function judge({ row, ledger }) {
   }
   if (status === "Stopped") return { level: "bad", state: "Stopped", why: "The monitor has stopped. The agent's trace says why." };
   if (status !== "Running") return { level: "idle", state: status || "Unknown", why: "" };
+  const warnings = ledger?.warnings ?? [];
+  if (warnings.length > 0) {
+    return {
+      level: "warn",
+      state: WARNED[warnings[0].kind] ?? "Warning",
+      why: warnings.map(({ text }) => text).join(" "),
+    };
+  }
   if (row.LOGSIZE === -1 && row.LOGTYPE !== "E") {
     return { level: "warn", state: "No file", why: "The file is not there now. It may have been moved away." };
   }
@@ -43,7 +55,7 @@ export function judge({ row, ledger }) {
 /** The same of a log that is configured and not monitored. */
 export function judgeUnmonitored({ line, reason, cause }) {
   const cures = {
-    file: "Make the file, or mend the path.", text: `Mend line ${line} of the log configuration.`, refresh: "",
+    file: "Make the file, or mend the path.", text: `Mend line ${line} of the log configuration.`, refresh: "", touch: "",
   };
   return { level: "bad", state: "Not read", why: [reason, cures[cause]].filter(Boolean).join(" ") };
 }

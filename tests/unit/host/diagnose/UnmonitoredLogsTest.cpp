@@ -52,6 +52,12 @@ TEST_F(UnmonitoredLogsTest, ALogThatOnlyWaitsForARefreshIsOneToo) {
                 ElementsAre("1 " + m_there + " refresh: The agent has not read this line yet."));
 }
 
+TEST_F(UnmonitoredLogsTest, ALogThatARefreshWouldNotTakeUpSaysWhatHelps) {
+    const auto logs = UnmonitoredLogs::find(m_there + "\n", {}, true);
+    EXPECT_THAT(describe(logs), ElementsAre(testing::StartsWith("1 " + m_there + " touch: ")));
+    EXPECT_THAT(logs[0].reason, testing::EndsWith("Touch the configuration, then refresh."));
+}
+
 TEST_F(UnmonitoredLogsTest, ALogIsNamedOnce) {
     const std::string line = m_gone + " ;N ;S\n";
     EXPECT_THAT(UnmonitoredLogs::find(line + line, {}), SizeIs(1));

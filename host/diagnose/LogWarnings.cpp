@@ -1,0 +1,178 @@
+#include "host/diagnose/LogWarnings.h"
+
+#include "agent/TraceScope.h"
+#include "host/diagnose/LastLines.h"
+#include "host/diagnose/MonitoredLogFile.h"
+#include "host/framework/TraceCapture.h"
+#include "host/framework/UtcTime.h"
+#include "logmgr/ValidLog.h"
+#include "logtypes/AdminLogFile.h"
+#include "logtypes/SysLogFile.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <ctime>
+#include <memory>
+#include <optional>
+#include <string_view>
+
+#include <nlohmann/json.hpp>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+TRC1_Anchor anchor{"LogWarnings.cpp"};
+
+constexpr std::size_t linesTried = 20;
+constexpr std::size_t mostBytes = 64 * 1024; ///< of the file's end that are read
+constexpr std::size_t recordsTried = 50;
+
+constexpr const char* syslogCure =
+    "Describe the file as a text log with a format, or let the system logger write traditional "
+    "times (RSYSLOG_TraditionalFileFormat).";
+constexpr const char* accountingCure =
+    "Linux's wtmp has other records and cannot be read as type A: take its line out of the log "
+    "configuration.";
+
+/// A syslog file that nobody monitors.
+class TrialSyslog : public SysLogFile {
+public:
+    explicit TrialSyslog(const ValidLog& line) : SysLogFile(line, Unmonitored{}) {}
+};
+
+/// What the name of an open file has become; none while it still names it.
+std::optional<LogWarning> ofName(const LogLedgerView& log) {
+    constexpr const char* cure =
+        " Rotate with copytruncate. To have the new file read, restart the agent, or take the "
+        "log's line out of the log configuration, refresh, put it back, and refresh again.";
+    struct stat status;
+    if (!log.openFile) {
+        return std::nullopt;
+    }
+    if (::stat(log.file.c_str(), &status) != 0) {
+        if (errno != ENOENT && errno != ENOTDIR) {
+            return std::nullopt;
+        }
+        return LogWarning{"missing", 0,
+                          "No file has this log's name any more. The agent goes on reading the "
+                          "file that it has opened, and will not read a new one of this name." +
+                              std::string(cure)};
+    }
+    if (FileIdentity{status.st_dev, status.st_ino} == *log.openFile) {
+        return std::nullopt;
+    }
+    return LogWarning{"replaced", 0,
+                      "Another file has this log's name by now, and is not read: the agent goes on "
+                      "reading the file that it has opened." +
+                          std::string(cure)};
+}
+
+bool isText(const char* text, std::size_t size) {
+    return std::all_of(text, text + strnlen(text, size), [](char character) {
+        const auto code = static_cast<unsigned char>(character);
+        return code >= ' ' && code != 0x7f;
+    });
+}
+
+bool isPlausible(const AdminLogFile::utmp& record, std::time_t now) {
+    constexpr std::int64_t day = 24 * 60 * 60;
+    constexpr int mostTypes = 10;
+    return record.ut_type >= 0 && record.ut_type < mostTypes && record.ut_time >= 0 &&
+           record.ut_time <= now + day && isText(record.ut_user, sizeof record.ut_user) &&
+           isText(record.ut_id, sizeof record.ut_id) &&
+           isText(record.ut_line, sizeof record.ut_line);
+}
+
+} // namespace
+
+std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
+    TraceScope trace(anchor);
+    std::vector<LogWarning> warnings;
+    if (std::optional<LogWarning> warning = ofName(log)) {
+        warnings.push_back(std::move(*warning));
+    }
+    if (log.type == 'S' && log.withoutTime > 0 && log.withoutTime * 2 > log.rows) {
+        warnings.push_back({"without_time", 0,
+                            std::to_string(log.withoutTime) + " of " + std::to_string(log.rows) +
+                                " entries have no time: their lines do not begin like \"Oct  5 "
+                                "07:03:09\". " +
+                                syslogCure});
+    }
+    if (log.type == 'A') {
+        if (std::string text = ofAccountingFile(log.file, log.openFile); !text.empty()) {
+            warnings.push_back({"not_records", 0, std::move(text)});
+        }
+    }
+    return warnings;
+}
+
+std::string LogWarnings::ofAccountingFile(const std::string& path,
+                                          const std::optional<FileIdentity>& opened) {
+    TraceScope trace(anchor);
+    constexpr std::size_t length = AdminLogFile::recordLength;
+    struct stat status {};
+    std::array<AdminLogFile::utmp, recordsTried> records;
+    ssize_t count = 0;
+    const MonitoredLogFile file(path, opened);
+    if (file.problem().empty() && ::fstat(file.descriptor(), &status) == 0) {
+        const off_t from = std::max<off_t>(0, status.st_size - static_cast<off_t>(sizeof records));
+        count =
+            ::pread(file.descriptor(), records.data(), sizeof records, from - from % off_t{length});
+    }
+    if (count <= 0) {
+        return "";
+    }
+    if (status.st_size % off_t{length} != 0) {
+        return "The file does not consist of login records of 40 bytes: its size, " +
+               std::to_string(status.st_size) + " bytes, is not a multiple of 40. " +
+               accountingCure;
+    }
+    const std::time_t now = std::time(nullptr);
+    const AdminLogFile::utmp* const first = records.data();
+    const AdminLogFile::utmp* const end = first + static_cast<std::size_t>(count) / length;
+    const bool isRight = std::all_of(
+        first, end, [now](const AdminLogFile::utmp& record) { return isPlausible(record, now); });
+    return isRight ? ""
+                   : std::string("The file does not consist of login records of 40 bytes: what it "
+                                 "holds cannot be such records. ") +
+                         accountingCure;
+}
+
+std::string LogWarnings::ofSyslogFile(const std::string& path) {
+    TraceScope trace(anchor);
+    const MonitoredLogFile file(path, std::nullopt);
+    const auto lines = file.problem().empty()
+                           ? LastLines::read(file.descriptor(), linesTried, mostBytes)
+                           : std::nullopt;
+    if (!lines) {
+        return "";
+    }
+    const TraceCapture quiet;
+    char noLine[] = "";
+    const ValidLog unnamed(CONFIG_USER, noLine, nullptr);
+    TrialSyslog syslog(unnamed);
+    const auto row = std::make_unique<zrm_rmlogent_data_t>();
+    std::size_t tried = 0;
+    for (const std::string& line : *lines) {
+        std::string piece = line + '\n';
+        if (line.empty() || syslog.formatEntryAsRow(piece.data(), row.get(), nullptr) != 0) {
+            continue;
+        }
+        if (row->entrytime[0] != ' ') {
+            return "";
+        }
+        ++tried;
+    }
+    return tried == 0 ? ""
+                      : std::string("None of the file's last lines begins with a time like \"Oct  "
+                                    "5 07:03:09\", so its entries would have none. ") +
+                            syslogCure;
+}
+
+nlohmann::ordered_json LogWarnings::json(const LogWarning& warning) {
+    return {
+        {"kind", warning.kind}, {"since", UtcTime::text(warning.since)}, {"text", warning.text}};
+}

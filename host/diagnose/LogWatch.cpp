@@ -1,0 +1,135 @@
+#include "host/diagnose/LogWatch.h"
+
+#include "agent/TraceScope.h"
+#include "host/diagnose/LogWarnings.h"
+#include "host/history/WallClock.h"
+
+#include <algorithm>
+#include <condition_variable>
+#include <mutex>
+#include <optional>
+#include <system_error>
+#include <thread>
+#include <utility>
+
+namespace {
+
+TRC1_Anchor anchor{"LogWatch.cpp"};
+
+using Warnings = std::map<std::string, std::vector<LogWarning>>;
+
+/// When a warning began, by the warnings of the look before.
+std::optional<std::int64_t> beginOf(const Warnings& before, const std::string& log,
+                                    const std::string& kind) {
+    const auto found = before.find(log);
+    if (found == before.end()) {
+        return std::nullopt;
+    }
+    const auto same = std::find_if(found->second.begin(), found->second.end(),
+                                   [&](const LogWarning& one) { return one.kind == kind; });
+    return same == found->second.end() ? std::nullopt : std::optional(same->since);
+}
+
+} // namespace
+
+struct LogWatch::Shared {
+    std::mutex mutex; ///< guards what follows
+    std::condition_variable changed;
+    bool isEnded = false;
+    std::optional<std::vector<LogLedgerView>> logs; ///< to be looked at
+    Warnings warnings;
+
+    Announce announce; ///< the thread's
+};
+
+LogWatch::LogWatch(Announce announce) : m_shared(std::make_shared<Shared>()) {
+    m_shared->announce = std::move(announce);
+}
+
+LogWatch::~LogWatch() {
+    const std::lock_guard guard(m_shared->mutex);
+    m_shared->isEnded = true;
+    m_shared->changed.notify_all();
+}
+
+void LogWatch::tick(Clock::time_point now,
+                    const std::function<std::vector<LogLedgerView>()>& read) {
+    TraceScope trace(anchor);
+    if (now < m_next || !begin()) {
+        return;
+    }
+    {
+        const std::lock_guard guard(m_shared->mutex);
+        if (m_shared->logs) {
+            return; // a file system holds the last look up
+        }
+    }
+    m_next = now + interval;
+    std::vector<LogLedgerView> logs = read();
+    const std::lock_guard guard(m_shared->mutex);
+    m_shared->logs = std::move(logs);
+    m_shared->changed.notify_all();
+}
+
+/// Starts the thread, later where there is no room for one now.
+bool LogWatch::begin() {
+    if (!m_hasThread) {
+        try {
+            std::thread(run, m_shared).detach();
+            m_hasThread = true;
+        } catch (const std::system_error&) {
+            return false;
+        }
+    }
+    return true;
+}
+
+void LogWatch::run(const std::shared_ptr<Shared>& shared) {
+    std::unique_lock lock(shared->mutex);
+    for (;;) {
+        shared->changed.wait(lock, [&] { return shared->isEnded || shared->logs; });
+        if (shared->isEnded) {
+            return;
+        }
+        const std::vector<LogLedgerView> logs = *shared->logs;
+        const Warnings before = shared->warnings;
+        lock.unlock();
+        Warnings found;
+        std::vector<std::string> lines;
+        for (const LogLedgerView& log : logs) {
+            std::vector<LogWarning> warnings = LogWarnings::of(log);
+            for (LogWarning& warning : warnings) {
+                const std::optional<std::int64_t> begin = beginOf(before, log.log, warning.kind);
+                warning.since = begin.value_or(WallClock::now());
+                if (!begin) {
+                    lines.push_back(log.log + ": " + warning.text);
+                }
+            }
+            if (!warnings.empty()) {
+                found.emplace(log.log, std::move(warnings));
+            }
+        }
+        lock.lock();
+        if (shared->isEnded) {
+            return;
+        }
+        shared->warnings = std::move(found);
+        shared->logs.reset();
+        lock.unlock();
+        for (const std::string& line : lines) {
+            shared->announce(line);
+        }
+        lock.lock();
+    }
+}
+
+std::vector<LogWarning> LogWatch::of(const std::string& log) const {
+    const std::lock_guard guard(m_shared->mutex);
+    const auto found = m_shared->warnings.find(log);
+    return found == m_shared->warnings.end() ? std::vector<LogWarning>() : found->second;
+}
+
+std::map<std::string, std::vector<LogWarning>> LogWatch::all() const {
+    const std::lock_guard guard(m_shared->mutex);
+    return m_shared->warnings;
+}

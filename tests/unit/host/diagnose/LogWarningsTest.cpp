@@ -1,0 +1,111 @@
+#include "host/diagnose/LogWarnings.h"
+
+#include "support/TemporaryDirectory.h"
+
+#include <cstring>
+#include <ctime>
+#include <filesystem>
+#include <string>
+
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class LogWarningsTest : public testing::Test {
+protected:
+    static std::vector<std::string> kindsOf(const LogLedgerView& log) {
+        std::vector<std::string> kinds;
+        for (const LogWarning& warning : LogWarnings::of(log)) {
+            kinds.push_back(warning.kind);
+        }
+        return kinds;
+    }
+    /// The ledger of a log that has opened its file.
+    LogLedgerView opened() const {
+        LogLedgerView log;
+        log.file = m_path;
+        struct stat status {};
+        EXPECT_EQ(stat(m_path.c_str(), &status), 0);
+        log.openFile = FileIdentity{status.st_dev, status.st_ino};
+        return log;
+    }
+    static std::string record(std::time_t time, const char* user) {
+        std::string bytes(40, '\0');
+        std::memcpy(bytes.data(), user, std::strlen(user));
+        const std::int64_t seconds = time;
+        std::memcpy(bytes.data() + 32, &seconds, sizeof seconds);
+        return bytes;
+    }
+    std::string accounting(const std::string& content) const {
+        return LogWarnings::ofAccountingFile(m_directory.write("wtmp", content));
+    }
+    std::string syslog(const std::string& content) const {
+        return LogWarnings::ofSyslogFile(m_directory.write("messages", content));
+    }
+
+    TemporaryDirectory m_directory;
+    std::string m_path = m_directory.write("app.log", "");
+};
+
+TEST_F(LogWarningsTest, TheNameOfAnOpenFileIsLookedAt) {
+    LogLedgerView log = opened();
+    EXPECT_THAT(kindsOf(log), IsEmpty());
+    std::filesystem::rename(m_path, m_directory.file("app.log.1"));
+    EXPECT_THAT(kindsOf(log), ElementsAre("missing"));
+    m_directory.write("app.log", "");
+    EXPECT_THAT(kindsOf(log), ElementsAre("replaced"));
+    EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("copytruncate"));
+    log.openFile.reset(); // its monitor has ended, which its status says
+    EXPECT_THAT(kindsOf(log), IsEmpty());
+}
+
+TEST_F(LogWarningsTest, ASyslogFileMostOfWhoseEntriesHaveNoTimeIsOfAnotherForm) {
+    LogLedgerView log = opened();
+    log.rows = 10;
+    log.withoutTime = 5;
+    EXPECT_THAT(kindsOf(log), IsEmpty());
+    log.withoutTime = 6;
+    EXPECT_THAT(kindsOf(log), ElementsAre("without_time"));
+    log.type = 'U';
+    EXPECT_THAT(kindsOf(log), IsEmpty()) << "a format may have no time";
+}
+
+TEST_F(LogWarningsTest, AccountingFilesConsistOfRecords) {
+    const std::time_t now = std::time(nullptr);
+    EXPECT_EQ(accounting(""), "");
+    EXPECT_EQ(accounting(record(now, "root") + record(now - 100, "")), "");
+    EXPECT_THAT(accounting(record(now, "root") + "x"), HasSubstr("its size, 41 bytes"));
+    EXPECT_THAT(accounting(record(now, "r\1ot")), HasSubstr("cannot be such records"));
+    EXPECT_THAT(accounting(record(now + 1000000, "root")), HasSubstr("cannot be such records"));
+    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.file("none")), "");
+    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.path()), "");
+    // Five records of Linux have the size of 48 of these.
+    std::string linux;
+    for (int i = 0; i < 5; ++i) {
+        std::string one(384, '\0');
+        one[0] = 7; // type
+        const auto seconds = static_cast<std::int32_t>(now);
+        std::memcpy(one.data() + 340, &seconds, sizeof seconds);
+        std::memcpy(one.data() + 8, "pts/0", 5);
+        std::memcpy(one.data() + 44, "root", 4);
+        linux += one;
+    }
+    EXPECT_THAT(accounting(linux), HasSubstr("cannot be such records"));
+}
+
+TEST_F(LogWarningsTest, SyslogFilesHaveTimes) {
+    const std::string iso = "2026-11-20T07:03:09.412000+01:00 web1 cron[1]: text\n";
+    EXPECT_EQ(syslog(""), "");
+    EXPECT_EQ(syslog("\n\n"), "");
+    EXPECT_EQ(syslog("Oct  5 07:03:09 web1 cron: text\n"), "");
+    EXPECT_EQ(syslog(iso + "Oct  5 07:03:09 web1 cron: text\n" + iso), "") << "some have";
+    EXPECT_THAT(syslog(iso + iso), HasSubstr("RSYSLOG_TraditionalFileFormat"));
+    EXPECT_EQ(LogWarnings::ofSyslogFile(m_directory.file("none")), "");
+}
+
+} // namespace
