@@ -1,6 +1,7 @@
 #include "host/framework/TraceOutput.h"
 
 #include "host/framework/ForkedChild.h"
+#include "host/framework/PatientWrite.h"
 
 #include <atomic>
 #include <cerrno>
@@ -29,7 +30,7 @@ const TraceFile* g_opened = nullptr; ///< the latest file, also when standard er
 std::atomic<std::time_t> g_lastCheck{0};
 
 int openToAppend(const char* path) noexcept {
-    return ::open(path, O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NOCTTY, 0640);
+    return ::open(path, O_WRONLY | O_APPEND | O_CREAT | O_NONBLOCK | O_CLOEXEC | O_NOCTTY, 0640);
 }
 
 /// Puts `fd` in the place of `target`, which writers go on using, and returns `target`.
@@ -87,12 +88,9 @@ void TraceOutput::write(std::string_view record, std::time_t now) noexcept {
     if (file != nullptr) {
         reopenWhenMovedAway(*file, now);
     }
-    const int fd = file != nullptr ? file->fd : STDERR_FILENO;
-    while (!record.empty()) {
-        const ssize_t written = ::write(fd, record.data(), record.size());
-        if (written < 0 && errno != EINTR) {
-            return;
-        }
-        record.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
+    if (file != nullptr) {
+        PatientWrite::toFile(file->fd, record);
+    } else {
+        PatientWrite::toStandardError(record);
     }
 }

@@ -1,11 +1,11 @@
 #include "host/start/Say.h"
 
+#include "host/framework/PatientWrite.h"
+
 #include <algorithm>
 #include <cstdarg>
 #include <cstddef>
 #include <cstdio>
-
-#include <unistd.h>
 
 void say(const char* format, ...) {
     char line[8192];
@@ -16,6 +16,5 @@ void say(const char* format, ...) {
     va_end(arguments);
     length = std::min(length + static_cast<std::size_t>(std::max(added, 0)), sizeof line - 1);
     line[length++] = '\n';
-    // One write, so that lines of several threads do not mix; nobody is left to tell of a failure.
-    [[maybe_unused]] const ssize_t written = write(STDERR_FILENO, line, length);
+    PatientWrite::toStandardError({line, length});
 }
