@@ -2,6 +2,7 @@
 
 #include "agent/TraceScope.h"
 #include "host/events/QueueSource.h"
+#include "host/framework/EventRoomControl.h"
 #include "host/sinks/SinkFactory.h"
 #include "host/start/Say.h"
 
@@ -38,6 +39,7 @@ std::unique_ptr<History> openHistory(const HostConfig& config, std::string& prob
 Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize)
     : m_format(layout), m_history(openHistory(config, m_historyProblem)),
       m_queue(queuedEvents, rowSize, m_history == nullptr ? 0 : m_history->newest()) {
+    m_queue.onFull(EventRoomControl::setFull);
     for (const SinkConfig& sink : config.sinks) {
         m_sinks.push_back(
             std::make_unique<SinkThread>(source(sink), SinkFactory::make(sink), sink.type));
@@ -45,6 +47,7 @@ Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_
 }
 
 Delivery::~Delivery() {
+    EventRoomControl::setFull(false);
     m_sinks.clear();
     if (m_history != nullptr) {
         m_history->finish(EventQueue::Clock::now());

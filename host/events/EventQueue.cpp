@@ -1,5 +1,7 @@
 #include "host/events/EventQueue.h"
 
+#include "host/framework/EventRoomControl.h"
+
 #include <algorithm>
 #include <cstring>
 
@@ -31,56 +33,70 @@ std::uint64_t EventQueue::slowest() const {
     return slowest == m_cursor.end() ? m_next : *slowest;
 }
 
-bool EventQueue::waitForRoom(std::unique_lock<std::mutex>& lock) {
-    if (m_closed || !full()) {
-        return !m_closed;
-    }
-    ++m_waits;
-    const Clock::time_point begin = Clock::now();
-    ++m_pushesWaiting;
-    const bool hasRoom = waitWhileFull(lock);
-    --m_pushesWaiting;
-    m_waited += Clock::now() - begin;
-    return hasRoom;
-}
-
-bool EventQueue::waitWhileFull(std::unique_lock<std::mutex>& lock) {
-    while (!m_closed && full()) {
-        if (m_waitLimit == Clock::time_point::max()) {
-            m_roomMade.wait(lock);
-        } else if (Clock::now() >= m_waitLimit) {
-            return false;
-        } else {
-            m_roomMade.wait_until(lock, m_waitLimit);
-        }
-    }
-    return !m_closed;
-}
-
 bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row) {
     using std::chrono::system_clock;
-    bool isAwaited = false;
+    bool isReaderAwaiting = false;
     {
-        std::unique_lock lock(m_mutex);
-        if (!waitForRoom(lock)) {
+        const std::lock_guard guard(m_mutex);
+        if (m_closed) {
             return false;
         }
-        const std::size_t slot = m_next % m_events.size();
-        Event& event = m_events[slot];
-        event.id = m_last + m_next + 1;
+        Event event;
+        event.id = m_last + m_next + m_aside.size() + 1;
         event.raised = std::chrono::duration_cast<std::chrono::milliseconds>(
                            system_clock::now().time_since_epoch())
                            .count();
         event.situation = situation;
-        std::memcpy(m_rows.get() + slot * m_rowSize, row, m_rowSize);
-        ++m_next;
-        isAwaited = std::any_of(m_awaited.begin(), m_awaited.end(),
-                                [this](std::uint64_t awaited) { return m_next >= awaited; });
+        if (m_aside.empty() && hasSlot()) {
+            put(event, row);
+        } else {
+            auto copy = std::make_unique_for_overwrite<char[]>(m_rowSize);
+            std::memcpy(copy.get(), row, m_rowSize);
+            m_aside.push_back({std::move(event), std::move(copy)});
+        }
+        noteRoom();
+        isReaderAwaiting = isAwaited();
     }
-    if (isAwaited) {
+    if (isReaderAwaiting) {
         m_changed.notify_all();
     }
     return true;
+}
+
+/// Puts an event into the next slot of the ring, which is free.
+void EventQueue::put(const Event& event, const char* row) {
+    const std::size_t number = m_next % m_events.size();
+    Event& slot = m_events[number];
+    slot.id = event.id;
+    slot.raised = event.raised;
+    slot.situation = event.situation;
+    std::memcpy(m_rows.get() + number * m_rowSize, row, m_rowSize);
+    ++m_next;
+}
+
+void EventQueue::takeFromAside() {
+    while (!m_aside.empty() && hasSlot()) {
+        put(m_aside.front().event, m_aside.front().row.get());
+        m_aside.pop_front();
+    }
+}
+
+/// Who waits for room is woken when there is room for many.
+void EventQueue::noteRoom() {
+    const std::uint64_t used = m_next - slowest();
+    const bool isFull =
+        m_isFull ? !m_aside.empty() || used > m_events.size() - quarter() : !hasSlot();
+    if (isFull != m_isFull) {
+        m_isFull = isFull;
+        if (m_listener) {
+            m_listener(isFull);
+        }
+    }
+}
+
+bool EventQueue::isAwaited() const {
+    return std::any_of(m_awaited.begin(), m_awaited.end(),
+                       [this](std::uint64_t awaited) { return m_next >= awaited; });
 }
 
 void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader,
@@ -114,38 +130,32 @@ std::span<const Event> EventQueue::read(Reader reader, std::size_t most, Clock::
 }
 
 void EventQueue::release(Reader reader, std::size_t count) {
-    {
-        const std::lock_guard guard(m_mutex);
-        m_cursor[reader] += count;
-        // A thread that waits for room is woken when there is room for many.
-        if (m_pushesWaiting == 0 || m_next - slowest() > m_events.size() - quarter()) {
-            return;
+    const std::lock_guard guard(m_mutex);
+    m_cursor[reader] += count;
+    if (m_isFull) {
+        takeFromAside();
+        noteRoom();
+        if (isAwaited()) {
+            m_changed.notify_all(); // another reader, which waits for what stood aside
         }
     }
-    m_roomMade.notify_all();
 }
 
 bool EventQueue::ended(Reader reader) const {
     const std::lock_guard guard(m_mutex);
-    return m_closed && m_cursor[reader] == m_next;
+    return m_closed && m_cursor[reader] == m_next && m_aside.empty();
 }
 
 std::size_t EventQueue::backlog(Reader reader) const {
     const std::lock_guard guard(m_mutex);
-    return static_cast<std::size_t>(m_next - m_cursor[reader]);
+    return static_cast<std::size_t>(m_next - m_cursor[reader]) + m_aside.size();
 }
 
 QueueState EventQueue::state() const {
     const std::lock_guard guard(m_mutex);
-    return {static_cast<std::size_t>(m_next - slowest()), m_events.size(), m_waits, m_waited};
-}
-
-void EventQueue::limitWaits(Clock::time_point limit) {
-    {
-        const std::lock_guard guard(m_mutex);
-        m_waitLimit = std::min(m_waitLimit, limit);
-    }
-    m_roomMade.notify_all();
+    const EventRoomControl::Waits waits = EventRoomControl::waits();
+    return {static_cast<std::size_t>(m_next - slowest()) + m_aside.size(), m_events.size(),
+            waits.count, waits.waited};
 }
 
 void EventQueue::close() {
@@ -154,5 +164,4 @@ void EventQueue::close() {
         m_closed = true;
     }
     m_changed.notify_all();
-    m_roomMade.notify_all();
 }

@@ -9,19 +9,24 @@
 #include <condition_variable>
 #include <cstddef>
 #include <cstdint>
+#include <deque>
+#include <functional>
 #include <limits>
 #include <memory>
 #include <mutex>
 #include <span>
+#include <utility>
 #include <vector>
 
 /// The bounded way of events from the log threads to the sinks: one ring of rows with a cursor per
 /// reader, so that every reader gets every event in order and the memory does not grow with their
-/// number. A full ring makes the log thread wait until a quarter of it is free: the log file is
-/// the buffer and nothing is dropped. Nothing is allocated per event.
+/// number. A push never waits: log threads ask whether there is room before they offer a row, and
+/// wait while the ring is full, until a quarter of it is free. The log file is the buffer and
+/// nothing is dropped. What one row raises beyond the ring's end is kept aside. Nothing is
+/// allocated per event otherwise.
 ///
-/// Readers are added before the first push. Afterwards push may be called on any thread, and
-/// read and release of one reader on that reader's thread alone; the rest on any.
+/// Readers and the listener are added before the first push. Afterwards push may be called on any
+/// thread, and read and release of one reader on that reader's thread alone; the rest on any.
 class EventQueue {
 public:
     using Clock = std::chrono::steady_clock;
@@ -35,8 +40,10 @@ public:
     /// Adds a reader, which gets every event from here on.
     Reader addReader();
 
-    /// Copies one row in; waits while the ring is full. False when the row was not taken because
-    /// the queue is closed or the limit of the waits has passed.
+    /// Is told whenever the ring becomes full, or has room again; quick, and calls nothing here.
+    void onFull(std::function<void(bool isFull)> listener) { m_listener = std::move(listener); }
+
+    /// Copies one row in. False when the row was not taken because the queue is closed.
     bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
 
     /// Waits for events, until the limit, and a few milliseconds for more once the first has come.
@@ -58,21 +65,24 @@ public:
     /// How the queue stands. Any thread.
     QueueState state() const;
 
-    /// From now on nobody waits for room beyond this time; a waiting push gives up then. The
-    /// earliest limit that was set holds.
-    void limitWaits(Clock::time_point limit);
-
-    /// Takes no more events; readers get what is left. Waiting pushes give up. Any number of times.
+    /// Takes no more events; readers get what is left. Any number of times.
     void close();
 
 private:
+    struct Aside {
+        Event event;
+        std::unique_ptr<char[]> row;
+    };
+
     std::uint64_t slowest() const;
     void waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader, Clock::time_point limit);
     std::size_t quarter() const { return std::max<std::size_t>(m_events.size() / 4, 1); }
-    bool waitWhileFull(std::unique_lock<std::mutex>& lock);
     static constexpr std::uint64_t nobody = std::numeric_limits<std::uint64_t>::max();
-    bool full() const { return m_next - slowest() >= m_events.size(); }
-    bool waitForRoom(std::unique_lock<std::mutex>& lock);
+    bool hasSlot() const { return m_next - slowest() < m_events.size(); }
+    void put(const Event& event, const char* row);
+    void takeFromAside();
+    void noteRoom();
+    bool isAwaited() const;
 
     const std::size_t m_rowSize;
     const std::uint64_t m_last;     ///< id before the first event's
@@ -81,14 +91,12 @@ private:
 
     mutable std::mutex m_mutex;
     std::condition_variable m_changed;    ///< events came, or the queue was closed
-    std::condition_variable m_roomMade;   ///< a reader moved on, or the waits have a new limit
     std::vector<std::uint64_t> m_cursor;  ///< per reader: the next event it will release
     std::vector<std::uint64_t> m_awaited; ///< per reader: when m_next is so far, it is woken
     std::uint64_t m_next = 0;             ///< the next event to be pushed
-    Clock::time_point m_waitLimit = Clock::time_point::max();
-    unsigned m_pushesWaiting = 0;        ///< threads that wait for room
-    std::uint64_t m_waits = 0;           ///< pushes that had to wait
-    std::chrono::nanoseconds m_waited{}; ///< for how long, those under way excepted
+    std::deque<Aside> m_aside;            ///< events behind those of the ring, in order
+    std::function<void(bool)> m_listener;
+    bool m_isFull = false; ///< what the listener was told last
     bool m_closed = false;
 };
 

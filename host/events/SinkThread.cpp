@@ -13,6 +13,7 @@ TRC1_Anchor anchor{"SinkThread.cpp"};
 
 constexpr std::size_t batch = 256;            ///< events per delivery
 constexpr std::chrono::seconds stallLimit{5}; ///< a wait that is longer is worth a word
+constexpr std::chrono::seconds givingUpTime{1};
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{30'000};
 
@@ -25,9 +26,13 @@ SinkThread::SinkThread(std::unique_ptr<EventSource> source, std::unique_ptr<Sink
 
 SinkThread::~SinkThread() {
     finish(Clock::now());
+    if (m_thread.joinable()) {
+        m_thread.join();
+    }
 }
 
 void SinkThread::start() {
+    m_ended = false;
     m_thread = std::thread(&SinkThread::run, this);
 }
 
@@ -126,10 +131,15 @@ std::uint64_t SinkThread::finish(Clock::time_point limit) {
         {
             std::unique_lock lock(m_mutex);
             m_changed.wait_until(lock, limit, [&] { return m_ended; });
-            m_giveUp.request_stop();
         }
+        m_giveUp.request_stop();
         m_changed.notify_all();
-        m_thread.join();
+        std::unique_lock lock(m_mutex);
+        if (m_changed.wait_until(lock, std::max(limit, Clock::now()) + givingUpTime,
+                                 [&] { return m_ended; })) {
+            lock.unlock();
+            m_thread.join();
+        }
     }
     return trace.result(m_source->backlog());
 }

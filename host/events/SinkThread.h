@@ -40,8 +40,9 @@ public:
     void beginFinish();
 
     /// Does that, and ends the thread when it has delivered everything, at the latest at the
-    /// limit. Returns the number of events that were not delivered. Not on the sink's own thread;
-    /// any number of times.
+    /// limit, or a second later when it does not give up at once. One that does not give up at all,
+    /// since the system does not let it, is left alone until the object is destroyed. Returns the
+    /// number of events that were not delivered. Not on the sink's own thread; any number of times.
     std::uint64_t finish(Clock::time_point limit);
 
     std::string name() const { return m_sink->name(); }
@@ -70,7 +71,7 @@ private:
     SinkState m_state;             ///< without what belongs to the source or to the moment
     Clock::time_point m_nextTry{}; ///< while a pause runs; else the beginning of time
     bool m_finishing = false;      ///< finish was called: pauses stay short
-    bool m_ended = false;          ///< the thread's work is done
+    bool m_ended = true;           ///< the thread's work is done
     std::stop_source m_giveUp;
     std::thread m_thread;
 };

@@ -14,6 +14,8 @@ namespace {
 TRC1_Anchor anchor{"HistoryWriter.cpp"};
 
 constexpr std::size_t batchSize = 512; ///< events per transaction, at most
+/// For the thread, to see that its time is over.
+constexpr std::chrono::seconds givingUpTime{1};
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{10'000};
 constexpr std::chrono::seconds housekeepingInterval{1};
@@ -36,6 +38,9 @@ HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& dire
 
 HistoryWriter::~HistoryWriter() {
     finish(Clock::now());
+    if (m_thread.joinable()) {
+        m_thread.join();
+    }
 }
 
 void HistoryWriter::start(EventQueue& queue, EventJson format) {
@@ -291,13 +296,23 @@ std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
             m_giveUp = true;
         }
         m_changed.notify_all();
-        m_thread.join();
         m_left = m_queue->backlog(m_reader);
+        std::unique_lock lock(m_mutex);
+        if (m_changed.wait_for(lock, givingUpTime, [&] { return m_ended; })) {
+            lock.unlock();
+            m_thread.join();
+            m_left = m_queue->backlog(m_reader);
+        }
     }
     return trace.result(m_left);
 }
 
 void HistoryWriter::storeRest() {
+    if (m_thread.joinable()) {
+        say("the history %s does not answer; sinks may get events twice",
+            m_directory.file().c_str());
+        return;
+    }
     const bool stored = attempt([&] {
         storeCursors();
         storeEntries();

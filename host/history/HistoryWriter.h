@@ -40,7 +40,9 @@ public:
     void start(EventQueue& queue, EventJson format);
 
     /// Ends the thread when everything in the queue, which is closed, is stored; at the latest at
-    /// the limit. Returns the number of events that were not. Any number of times.
+    /// the limit, or a second later when it does not give up at once. One that the system does not
+    /// let give up is left alone until the object is destroyed. Returns the number of events that
+    /// were not stored. Any number of times.
     std::uint64_t finish(Clock::time_point limit);
 
     /// Stores the cursors and the entries once more; after finish. Says so when that fails.

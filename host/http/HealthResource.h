@@ -3,10 +3,21 @@
 
 #include "host/http/Resource.h"
 
-/// `GET /healthz`: the process serves HTTP. Needs no token.
+#include <functional>
+#include <string>
+#include <utility>
+
+/// `GET /healthz`: the process serves HTTP and monitors logs. Needs no token.
 class HealthResource : public Resource {
 public:
+    /// `problem` gives what keeps the agent from monitoring; empty: nothing. Any thread.
+    explicit HealthResource(std::function<std::string()> problem = [] { return std::string(); })
+        : m_problem(std::move(problem)) {}
+
     void addRoutes(Router& router) override;
+
+private:
+    const std::function<std::string()> m_problem;
 };
 
 #endif

@@ -46,7 +46,7 @@ struct SituationRefusal {
 class SituationSet {
 public:
     static constexpr std::size_t mostMade = 1000; ///< situations made through the API
-    static constexpr std::chrono::seconds patience{5};
+    static constexpr std::chrono::seconds patience{3};
 
     using Change = std::variant<SituationStatus, SituationRefusal>;
 
@@ -62,6 +62,10 @@ public:
     /// Makes these the situations of the file. One that is as it was goes on undisturbed, with the
     /// entry times that it has counted; one that has changed begins anew.
     void apply(const std::vector<SituationConfig>& configs);
+
+    /// Waits until every situation that is to run is open, at most so long; false when the time is
+    /// up.
+    bool waitUntilOpen(std::chrono::milliseconds limit) { return m_runner.settle(limit); }
 
     /// Those of the file first, each by name.
     std::vector<SituationStatus> list() const;

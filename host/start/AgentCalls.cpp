@@ -38,6 +38,10 @@ void AGF_SetVersionUsingProduct(const char* product, char* version, int size) {
     trace.detail()("Product %s has version %s.", product, version);
 }
 
+void AGF_Stopping() {
+    Host::instance().noteStopping();
+}
+
 void AGF_Shutdown(int /*reason*/) {
     Host::instance().shutdown();
 }

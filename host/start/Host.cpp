@@ -2,6 +2,7 @@
 
 #include "agent/TraceScope.h"
 #include "host/config/ConfigFile.h"
+#include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
 #include "host/start/Say.h"
 
@@ -63,6 +64,10 @@ int Host::run() {
         m_mainThread = std::this_thread::get_id();
         m_state = STARTING;
     }
+    if (!m_watchdog.start([this] { requestStop(); })) {
+        say("no thread can be started: raise the limit of processes, or of memory");
+        return trace.result(failureStatus);
+    }
     // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
     if (std::atexit([] { Host::instance().processEnds(); }) != 0) {
         trace.error()("Error establishing the host's exit routine.");
@@ -87,7 +92,7 @@ bool Host::begin() {
         trace.error()("The agent has not registered its Log Entries table.");
         return false;
     }
-    std::unique_ptr<Serving> serving = Serving::begin(m_config, *entries);
+    std::unique_ptr<Serving> serving = Serving::begin(m_config, *entries, m_watchdog);
     if (serving == nullptr) {
         return false;
     }
@@ -99,6 +104,7 @@ bool Host::begin() {
     }
     m_changed.notify_all();
     m_serving->startHttp(m_config);
+    m_watchdog.noteStage("serving");
     m_notifier.ready();
     return true;
 }
@@ -171,24 +177,24 @@ void Host::stop() {
     TraceScope trace(anchor);
     m_notifier.stopping();
     m_serving->stop(Clock::now() + endLimit);
+    m_watchdog.noteStage("waiting for the agent's threads");
     setState(ENDED);
 }
 
 void Host::requestStop() {
     TraceScope trace(anchor);
+    m_watchdog.noteStopping();
     {
         const std::lock_guard guard(m_mutex);
         m_stopRequested = true;
-        // The main thread may itself wait for a log thread that waits for room.
-        if (m_serving != nullptr) {
-            m_serving->limitWaits(Clock::now() + endLimit);
-        }
     }
     m_changed.notify_all();
 }
 
 void Host::processEnds() {
     const Clock::time_point limit = Clock::now() + endLimit;
+    m_watchdog.noteStopping();
+    EventRoomControl::close();
     std::unique_lock lock(m_mutex);
     const bool isMain = std::this_thread::get_id() == m_mainThread;
     m_processEnds = true;
@@ -197,7 +203,6 @@ void Host::processEnds() {
         m_changed.wait_until(lock, limit, [&] { return m_state != STARTING; });
     }
     if (m_state == SERVING) {
-        m_serving->limitWaits(limit);
         m_changed.wait_until(lock, limit, [&] { return isMain || !m_isBusy; });
         lock.unlock();
         m_serving->abandonHttp(limit);

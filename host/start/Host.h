@@ -5,6 +5,7 @@
 #include "host/config/WatchedFile.h"
 #include "host/start/ServiceNotifier.h"
 #include "host/start/Serving.h"
+#include "host/start/Watchdog.h"
 
 #include <condition_variable>
 #include <memory>
@@ -36,6 +37,9 @@ public:
     /// the process's status. Main thread.
     int run();
 
+    /// The agent has begun to end, perhaps before everything is served. Any thread.
+    void noteStopping() noexcept { m_watchdog.noteStopping(); }
+
     /// Makes run return soon. Any thread.
     void requestStop();
 
@@ -57,6 +61,7 @@ private:
     void stop();
     void setState(State state);
 
+    Watchdog m_watchdog;
     HostConfig m_config;
     WatchedFile m_file{""};
     ServiceNotifier m_notifier;

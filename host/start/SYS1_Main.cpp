@@ -2,6 +2,7 @@
 #include "host/config/ConfigFile.h"
 #include "host/config/ConfigSecrets.h"
 #include "host/config/WatchedFile.h"
+#include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
 #include "host/start/CommandLine.h"
 #include "host/start/Descriptors.h"
@@ -77,6 +78,7 @@ void setTrace(const std::string& file) {
 void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
     StandardStreams::fill();
     Descriptors::raiseLimit();
+    EventRoomControl::hold(); // until the situations are open
     const CommandLine commandLine = readCommandLine(*argc, argv);
     std::string path = commandLine.config();
     if (path.empty() && access(defaultConfig, F_OK) == 0) {

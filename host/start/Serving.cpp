@@ -6,6 +6,8 @@
 #include "host/console/ConsoleResource.h"
 #include "host/diagnose/DiagnoseResource.h"
 #include "host/diagnose/LogLedgers.h"
+#include "host/framework/EventRoomControl.h"
+#include "host/framework/PulseRegistry.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/history/WallClock.h"
@@ -24,7 +26,9 @@
 #include "host/metrics/SituationMetrics.h"
 #include "host/situations/SituationsResource.h"
 #include "host/start/Say.h"
+#include "host/start/Watchdog.h"
 
+#include <cinttypes>
 #include <string>
 #include <system_error>
 #include <utility>
@@ -32,6 +36,11 @@
 namespace {
 
 TRC1_Anchor anchor{"Serving.cpp"};
+
+/// For the opening of the situations at the start; nothing else waits for it longer.
+constexpr std::chrono::seconds openingLimit{30};
+/// For the logs' threads, to count what they leave behind.
+constexpr std::chrono::milliseconds countingLimit{800};
 
 /// The receiver of a request that is opened only to learn its table's rows.
 class NoRows : public RowReceiver {
@@ -42,7 +51,8 @@ public:
 
 } // namespace
 
-std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& entries) {
+std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& entries,
+                                        Watchdog& watchdog) {
     TraceScope trace(anchor);
     NoRows receiver;
     RequestDetail detail;
@@ -55,7 +65,8 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
     }
     std::unique_ptr<Serving> serving;
     try {
-        serving.reset(new Serving(config, entries, *request.get(), RowLayout(*request.get())));
+        serving.reset(
+            new Serving(config, entries, *request.get(), RowLayout(*request.get()), watchdog));
         serving->m_delivery.start();
     } catch (const std::system_error& error) {
         static_cast<void>(
@@ -69,13 +80,17 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
         say("%s", message.c_str());
     }
     serving->m_situations.apply(config.situations);
+    if (!serving->m_situations.waitUntilOpen(openingLimit)) {
+        say("some situations are still being opened: entries until then raise nothing for them");
+    }
+    EventRoomControl::open();
     countLogs(); // the first sample tells the log manager that requests are served
     return serving;
 }
 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
-                 const RowLayout& layout)
-    : m_delivery(config, layout, request.rowSize),
+                 const RowLayout& layout, Watchdog& watchdog)
+    : m_watchdog(watchdog), m_delivery(config, layout, request.rowSize),
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
     if (History* const history = m_delivery.history()) {
@@ -113,7 +128,7 @@ void Serving::renewCredentials() {
 }
 
 void Serving::addResources(TableManager& entries) {
-    addResource(std::make_unique<HealthResource>());
+    addResource(std::make_unique<HealthResource>([this] { return m_watchdog.problem(); }));
     addResource(std::make_unique<ConsoleResource>());
     addResource(std::make_unique<AgentResource>(m_delivery, m_watch));
     addResource(std::make_unique<LogsResource>(m_watch));
@@ -181,13 +196,21 @@ void Serving::abandonHttp(Clock::time_point limit) {
 
 void Serving::stop(Clock::time_point limit) {
     TraceScope trace(anchor);
-    // Released first, so that none holds the table's lock when the situations are closed.
-    limitWaits(limit);
+    m_watchdog.noteStage("ending the reading of logs");
+    EventRoomControl::close();
+    PulseRegistry::waitUntilAllRest(Clock::now() + countingLimit);
+    m_watchdog.noteStage("ending HTTP");
     m_analysis->cancel();
     m_http.stop(limit);
+    m_watchdog.noteStage("closing the situations");
     m_situations.close();
     if (m_entries) {
         m_entries->finish();
     }
+    m_watchdog.noteStage("delivering events");
     m_delivery.finish(limit);
+    if (const std::uint64_t entries = EventRoomControl::passedOver(); entries > 0) {
+        say("%" PRIu64 " lines that waited in the logs were not looked at; reports find them",
+            entries);
+    }
 }

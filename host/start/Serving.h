@@ -23,6 +23,7 @@
 class AnalysisResource;
 class EventStream;
 class TableManager;
+class Watchdog;
 
 /// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
 /// Begun and stopped by the main thread.
@@ -32,7 +33,9 @@ public:
 
     /// Begins to deliver events, opens the situations on the Log Entries table, and lets the log
     /// manager know that requests are served. Null when the table opens no request.
-    static std::unique_ptr<Serving> begin(const HostConfig& config, TableManager& entries);
+    /// The watchdog outlives the object.
+    static std::unique_ptr<Serving> begin(const HostConfig& config, TableManager& entries,
+                                          Watchdog& watchdog);
 
     Serving(const Serving&) = delete;
     Serving& operator=(const Serving&) = delete;
@@ -59,8 +62,6 @@ public:
 
     // For an end of the process of which the main thread does not know. Any thread.
 
-    /// Lets no log thread wait for a full queue beyond the limit.
-    void limitWaits(Clock::time_point limit) { m_delivery.queue().limitWaits(limit); }
     /// Begins no further samples and waits for those under way, at most until the limit.
     void abandonHttp(Clock::time_point limit);
     /// Delivers what is queued, at the latest until the limit.
@@ -68,13 +69,14 @@ public:
 
 private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
-            const RowLayout& layout);
+            const RowLayout& layout, Watchdog& watchdog);
 
     void renewCredentials();
     void addResources(TableManager& entries);
     void addMetrics(const EventStream& stream);
     void addResource(std::unique_ptr<Resource> resource);
 
+    Watchdog& m_watchdog;
     Delivery m_delivery;
     Descriptors m_descriptors;
     std::optional<EntryRecorder> m_entries; ///< none: the history is off

@@ -1,6 +1,7 @@
 #ifndef ZRM_LOG_MANAGER_H
 #define ZRM_LOG_MANAGER_H
 
+#include "agent/framework/Pulse.h"
 #include "logmgr/ValidLog.h"
 
 #include <atomic>
@@ -80,11 +81,18 @@ private:
     void discardValidLogs();
     void buildLogObjects(unsigned validCount);
     void buildLogObject(const ValidLog& log);
-    void deleteMarkedLogs();
+    void retireMarkedLogs();
+    /// Ends the monitoring of what was taken off the chain. Without the lock: a thread takes up to
+    /// a second to end, and requests need the lock meanwhile.
+    void deleteRetiredLogs();
     /// Deletes the chain from its tail to `log`, which is its member number `depth`; the manager
     /// gives the head and 1.
     void deleteNextLog(LogFile* log, unsigned depth);
     void deleteLogObject(LogFile* log);
+    /// Takes the log off the chain, which does not wait.
+    void retireLogObject(LogFile* log);
+    /// Waits like sleep, but for a signal that ends the agent, which it takes.
+    void sleepUnlessStopped(unsigned seconds);
 
     void lockManager();
     void unlockManager();
@@ -108,6 +116,8 @@ private:
     std::atomic<std::uint32_t> NumLogs{0};
     std::atomic<std::int32_t> UseCount{0};
     std::atomic<bool> RefreshWaiting{false};
+    LogFile* RetiredLogs = nullptr; ///< owns a chain of logs to delete; the manager thread's
+    Pulse ManagerPulse{"the log manager"};
     /// Owns the circular chain of valid logs, which exists from the reading of the configuration
     /// to the building of the objects.
     std::atomic<ValidLog*> FirstValidLog{nullptr};

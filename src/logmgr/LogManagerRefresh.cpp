@@ -3,14 +3,11 @@
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 #include "logmgr/LogManager.h"
-#include "logmgr/ManagerCancellation.h"
 #include "logtypes/createLogFile.h"
 #include "monitor/LogFile.h"
 
 #include <cstdlib>
 #include <cstring>
-
-#include <unistd.h>
 
 namespace {
 
@@ -27,6 +24,7 @@ bool canMonitor(const LogFile& object, const ValidLog& log) {
 
 std::uint32_t LogManager::refresh() {
     TraceScope trace(anchor);
+    ManagerPulse.work("reads the configuration");
     if (DebugLog && DebugLogP == nullptr) {
         openDebugLog();
     }
@@ -36,6 +34,7 @@ std::uint32_t LogManager::refresh() {
         waitForRequests();
         buildLogObjects(validCount);
         unlockManager();
+        deleteRetiredLogs();
         if (trace.isOn(TRC1_DETAIL)) {
             printSelf();
         }
@@ -44,8 +43,7 @@ std::uint32_t LogManager::refresh() {
     }
     if (NumLogs == 0) {
         trace.error()("Agent has no work to do.  Exiting...");
-        const ManagerCancellation allowed;
-        sleep(noWorkSeconds);
+        sleepUnlessStopped(noWorkSeconds);
     }
     return trace.result(NumLogs.load());
 }
@@ -57,6 +55,7 @@ void LogManager::waitForRequests() {
         return;
     }
     RefreshWaiting = true;
+    ManagerPulse.work("waits for requests to end");
     while (UseCount != 0) {
         trace.detail()("Refresh suspended pending completion of outstanding requests.");
         if (const int code = waitFor(ManagerNotInUse, nullptr)) {
@@ -67,6 +66,7 @@ void LogManager::waitForRequests() {
         }
     }
     RefreshWaiting = false;
+    ManagerPulse.work("refreshes the logs");
     trace.detail()("Refresh resuming.");
 }
 
@@ -82,7 +82,7 @@ void LogManager::buildLogObjects(unsigned validCount) {
         buildLogObject(*log);
         log = log->next();
     }
-    deleteMarkedLogs();
+    retireMarkedLogs();
     if (NumLogs != validCount) {
         trace.error()("Fatal error during refresh processing. No. of valid logs = %d: No. of "
                       "actual logs = %d. Agent is terminating.",
@@ -118,22 +118,31 @@ void LogManager::buildLogObject(const ValidLog& log) {
     ++NumLogs;
 }
 
-void LogManager::deleteMarkedLogs() {
+void LogManager::retireMarkedLogs() {
     TraceScope trace(anchor);
     LogFile* object = FirstLogObject;
-    // All are asked before the first is waited for: together they take as long as one.
-    for (std::uint32_t left = NumLogs; left > 0; --left, object = object->next()) {
-        if (object->isMarked()) {
-            object->askToStop();
-        }
-    }
     for (std::uint32_t left = NumLogs; left > 0; --left) {
         LogFile* const next = object->next();
         if (object->isMarked()) {
-            deleteLogObject(object);
+            // All are asked before the first is waited for: together they take as long as one.
+            object->askToStop();
+            retireLogObject(object);
+            object->addToChain(RetiredLogs);
+            RetiredLogs = RetiredLogs == nullptr ? object : RetiredLogs;
         }
         object = next;
     }
+}
+
+void LogManager::deleteRetiredLogs() {
+    TraceScope trace(anchor);
+    ManagerPulse.work("ends the monitoring of logs");
+    while (RetiredLogs != nullptr) {
+        LogFile* const log = RetiredLogs;
+        RetiredLogs = log->next() == log ? nullptr : log->next();
+        delete log;
+    }
+    ManagerPulse.rest();
 }
 
 void LogManager::discardValidLogs() {
@@ -181,6 +190,12 @@ void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
 
 void LogManager::deleteLogObject(LogFile* log) {
     TraceScope trace(anchor);
+    retireLogObject(log);
+    delete log;
+}
+
+void LogManager::retireLogObject(LogFile* log) {
+    TraceScope trace(anchor);
     std::uint32_t count = 0;
     const LogFile* member = FirstLogObject;
     do {
@@ -197,6 +212,7 @@ void LogManager::deleteLogObject(LogFile* log) {
         FirstLogObject = NumLogs == 1 ? nullptr : log->next();
     }
     trace.detail()("Deleting log object for file %s.", log->fileNameLocal());
-    delete log;
+    log->removeFromChain();
+    log->addToChain(nullptr); // its destructor finds nobody to unlink it from
     --NumLogs;
 }

@@ -11,6 +11,7 @@
 
 #include <signal.h>
 #include <time.h>
+#include <unistd.h>
 
 namespace {
 
@@ -128,6 +129,7 @@ bool LogManager::waitForSignal() {
         sigaddset(&signals, number);
     }
     trace.detail()("Manager thread waiting for a signal.");
+    ManagerPulse.rest();
     for (;;) {
         int received = 0;
         int code = 0;
@@ -162,8 +164,26 @@ bool LogManager::waitForSignal() {
     }
 }
 
+void LogManager::sleepUnlessStopped(unsigned seconds) {
+    TraceScope trace(anchor);
+    ManagerPulse.rest();
+    for (; seconds > 0; --seconds) {
+        sigset_t pending;
+        sigemptyset(&pending);
+        sigpending(&pending);
+        if (sigismember(&pending, SIGINT) == 1 || sigismember(&pending, SIGTERM) == 1 ||
+            sigismember(&pending, SIGQUIT) == 1) {
+            waitForSignal();
+            return;
+        }
+        const ManagerCancellation allowed;
+        sleep(1);
+    }
+}
+
 void LogManager::terminateFramework() {
     TraceScope trace(anchor);
+    AGF_Stopping();
     trace.detail()("Log manager terminating framework.");
     waitForServer();
     unsigned status = 0;

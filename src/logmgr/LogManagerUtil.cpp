@@ -60,7 +60,8 @@ std::FILE* LogManagerUtil::openStream(const char* path, const char* mode) {
     // What the agent writes holds log lines, and goes where the configuration says: others get no
     // permission, and a link put in the file's place leads nowhere.
     const int flags = appending ? O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW : O_RDONLY;
-    const int fd = ::open(path, flags | O_CLOEXEC, 0640);
+    // Neither the opening nor a write waits for whoever is at the other end of a pipe.
+    const int fd = ::open(path, flags | O_NONBLOCK | O_CLOEXEC, 0640);
     if (fd == -1) {
         return nullptr;
     }

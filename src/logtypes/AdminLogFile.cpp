@@ -3,9 +3,10 @@
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
 #include "monitor/DescriptorReserve.h"
-#include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
+#include <chrono>
+#include <cstdint>
 #include <optional>
 
 #include <fcntl.h>
@@ -16,6 +17,9 @@ namespace {
 TRC1_Anchor anchor{"AdminLogFile.cpp"};
 
 constexpr std::size_t recordLength = AdminLogFile::recordLength;
+
+/// How long records are counted that the end of the process leaves in the log.
+constexpr std::chrono::milliseconds countingTime{500};
 
 /// Reads whole records, many with one call. The outcome is that of reading them one by one: a
 /// record whose end is missing when its turn comes has what there is by then, and those bytes are
@@ -62,6 +66,15 @@ private:
     char m_buffer[1024 * recordLength];
 };
 
+std::uint64_t countRest(RecordReader& reader) {
+    std::uint64_t records = 0;
+    const auto limit = std::chrono::steady_clock::now() + countingTime;
+    while (reader.next() != nullptr && std::chrono::steady_clock::now() < limit) {
+        ++records;
+    }
+    return records;
+}
+
 } // namespace
 
 AdminLogFile::AdminLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
@@ -88,7 +101,7 @@ void AdminLogFile::processLogData() {
 
 void AdminLogFile::openAdminLog() {
     TraceScope trace(anchor);
-    int fd = open(fileNameLocal(), O_RDONLY | O_CLOEXEC);
+    int fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     if (fd >= 0 && DescriptorReserve::has(fd)) {
         close(fd);
         fd = -1;
@@ -128,7 +141,13 @@ long AdminLogFile::readLog() {
     TraceScope trace(anchor);
     RecordReader reader(LogFD);
     while (char* const record = reader.next()) {
-        deliverRecord(record);
+        if (isReadingOver()) {
+            return trace.result(0L);
+        }
+        if (!deliverRecord(record)) {
+            notePassedOver(monitorStatus() == MONITOR_RUNNING ? countRest(reader) : 0);
+            return trace.result(0L);
+        }
     }
     const ErrorText error(errno);
     const ssize_t outcome = reader.outcome();
@@ -145,14 +164,18 @@ long AdminLogFile::readLog() {
     return trace.result(-1L);
 }
 
-void AdminLogFile::deliverRecord(char* record) {
+/// False when the log or the process is to end before the record's row could be offered.
+bool AdminLogFile::deliverRecord(char* record) {
     count(NumEvents);
     zrm_rmlogent_data_t* const row = ownRow();
     if (formatEntryAsRow(record, row, nullptr) == 0) {
-        zrm_rmlogent_manager::EventArrived(row, 1);
+        if (!offer(row)) {
+            return false;
+        }
         writeToDebugLog(record, recordLength, row, sizeof *row);
     } else {
         count(NumFormatErrors);
         writeToDebugLog(record, recordLength, nullptr, 0);
     }
+    return true;
 }

@@ -51,7 +51,7 @@ public:
 private:
     void openAdminLog();
     void closeAdminLog();
-    void deliverRecord(char* record);
+    bool deliverRecord(char* record);
     bool allocateReportBuffers(_LogBufferInfo** reportState);
     static void deallocateReportBuffers(_LogBufferInfo** reportState);
 

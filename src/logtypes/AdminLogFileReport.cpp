@@ -1,6 +1,7 @@
 #include "logtypes/AdminLogFile.h"
 
 #include "agent/TraceScope.h"
+#include "agent/framework/cancellation.h"
 #include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
 #include "tables/zrm_rmlogent_data.h"
@@ -75,6 +76,9 @@ void* AdminLogFile::getNextLogEntry(void* row, void* reportState, void* threshol
     const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
     const auto* const columns = static_cast<const zrm_rmlogent_data_t*>(row);
     for (;;) {
+        if (CTX1_IsCancelled()) {
+            return trace.result(static_cast<void*>(nullptr));
+        }
         if (info->bufferCount < length && fillReportBuffer(info) < length) {
             trace.error()("Incomplete record found while building report for file %s. "
                           "Record length = %d; expected length = %d.",

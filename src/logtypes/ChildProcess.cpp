@@ -1,12 +1,19 @@
 #include "logtypes/ChildProcess.h"
 
 #include <cerrno>
+#include <chrono>
 #include <csignal>
 
 #include <fcntl.h>
+#include <poll.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 namespace {
+
+/// How long a child may take that has been asked to end.
+constexpr std::chrono::seconds patience{2};
+constexpr int lookInterval = 10; // milliseconds
 
 constexpr int standardOutput = 1;
 constexpr int firstOther = 3;    // behind the standard descriptors
@@ -22,6 +29,24 @@ int ChildProcess::openPipe(int fds[2]) {
     fcntl(fds[0], F_SETFD, FD_CLOEXEC);
     fcntl(fds[1], F_SETFD, FD_CLOEXEC);
     return 0;
+}
+
+pid_t ChildProcess::waitFor(pid_t pid, int* status) {
+    using Clock = std::chrono::steady_clock;
+    const Clock::time_point limit = Clock::now() + patience;
+    for (;;) {
+        const pid_t ended = waitpid(pid, status, WNOHANG);
+        if (ended > 0 || (ended < 0 && errno != EINTR)) {
+            return ended;
+        }
+        if (ended == 0 && Clock::now() >= limit) {
+            kill(-pid, SIGKILL); // of a group that it leads
+            kill(pid, SIGKILL);
+        }
+        if (ended == 0) {
+            poll(nullptr, 0, lookInterval);
+        }
+    }
 }
 
 void ChildProcess::redirectOutput(const int fds[2]) {

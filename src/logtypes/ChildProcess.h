@@ -3,6 +3,8 @@
 
 #include "agent/ErrorText.h"
 
+#include <sys/types.h>
+
 /// The system's side of running a command whose standard output the agent reads through a pipe.
 ///
 /// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
@@ -12,6 +14,10 @@ namespace ChildProcess {
 
 /// Makes a pipe whose ends close on exec. As pipe(): 0, or -1 and errno. Any thread.
 int openPipe(int fds[2]);
+
+/// Waits for the end of a child that has been asked to end, or whose output nobody reads any more.
+/// One that has not ended after two seconds is killed. As waitpid(). Any thread.
+pid_t waitFor(pid_t pid, int* status);
 
 /// In the child: makes the pipe's write end its standard output and closes both ends. The command
 /// will find nothing else of the agent's open than standard input and error.

@@ -2,7 +2,6 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
-#include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
 #include <cstring>
@@ -70,7 +69,9 @@ void ErrLogFile::processLogData() {
 void ErrLogFile::waitForEventLoop() {
     TraceScope trace(anchor);
     while (monitorStatus() == MONITOR_RUNNING) {
+        m_pulse.rest();
         const int ready = waitForData(m_readFd);
+        m_pulse.work("reads the log's command");
         if (ready > 0) {
             if (readLog() != 0) {
                 setMonitorStatus(MONITOR_ERR_READ);
@@ -140,7 +141,9 @@ void ErrLogFile::deliverLine() {
     m_ledger.noteEntries();
     zrm_rmlogent_data_t row;
     if (formatEntryAsRow(m_line, &row, nullptr) == 0) {
-        zrm_rmlogent_manager::EventArrived(&row, 1);
+        if (!offer(&row)) {
+            return;
+        }
         writeToDebugLog(m_line, std::strlen(m_line), &row, sizeof row);
     } else {
         ++NumFormatErrors;

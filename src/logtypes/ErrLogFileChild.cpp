@@ -160,7 +160,7 @@ void ErrLogFile::killChild() {
     // What the shell has started. Before the wait: afterwards the group's number is free.
     kill(-pid, SIGTERM);
     int status = 0;
-    const pid_t ended = waitpid(pid, &status, 0);
+    const pid_t ended = ChildProcess::waitFor(pid, &status);
     if (ended < 0) {
         const ErrorText error(errno);
         trace.error()("Wait system called failed for file %s; pid = %d. errno = %d; %s",

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "agent/framework/cancellation.h"
 #include "logtypes/ChildProcess.h"
 #include "monitor/ReportOutcome.h"
 #include "tables/RequestThresholds.h"
@@ -10,6 +11,8 @@
 #include <cstring>
 #include <new>
 
+#include <fcntl.h>
+#include <poll.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -17,6 +20,7 @@ namespace {
 
 TRC1_Anchor anchor{"ErrLogFileReport.cpp"};
 
+constexpr int lookInterval = 200; ///< milliseconds between looks whether the report is wanted
 constexpr std::size_t commandLength = 34;
 constexpr std::size_t argumentLength = 13; // option, ten digits, terminator
 constexpr int execFailed = 255;            // the low byte of exit(-1)
@@ -69,6 +73,7 @@ void ErrLogFile::createChildForReport(ErrlogBufferInfo* info,
     }
     trace.detail()("Child process created for report on file %s. pid = %d.", fileNameLocal(),
                    info->pid);
+    fcntl(info->pipeFds[0], F_SETFL, O_NONBLOCK);
     info->fp = fdopen(info->pipeFds[0], "r");
     if (info->fp == nullptr) {
         const ErrorText error(errno);
@@ -150,10 +155,28 @@ void* ErrLogFile::getNextLogEntry(void* row, void* reportState, void* /*threshol
 
 bool ErrLogFile::readReportLine(ErrlogBufferInfo* info) const {
     TraceScope trace(anchor);
-    if (std::fgets(info->line, sizeof info->line, info->fp) != nullptr) {
-        return trace.result(true);
+    // As fgets does, but the command may be silent for longer than the report is wanted.
+    std::size_t length = 0;
+    int character = 0;
+    while (length < sizeof info->line - 1 && character != '\n') {
+        character = getc_unlocked(info->fp);
+        if (character != EOF) {
+            info->line[length++] = static_cast<char>(character);
+        } else if (std::ferror(info->fp) == 0 || errno != EAGAIN) {
+            break;
+        } else if (CTX1_IsCancelled()) {
+            return trace.result(false);
+        } else {
+            std::clearerr(info->fp);
+            pollfd output{fileno(info->fp), POLLIN, 0};
+            poll(&output, 1, lookInterval);
+        }
     }
     const ErrorText error(errno);
+    info->line[length] = '\0';
+    if (length > 0 && std::ferror(info->fp) == 0) {
+        return trace.result(true);
+    }
     if (std::ferror(info->fp) != 0) {
         ReportOutcome::note(ReportEnd::readError);
         // The message has a place for the command, which is not given: name, number and text each
@@ -187,10 +210,7 @@ void ErrLogFile::endReportRequest(void** reportState) {
 void ErrLogFile::waitForReportChild(const ErrlogBufferInfo* info) const {
     TraceScope trace(anchor);
     int status = 0;
-    pid_t ended;
-    do {
-        ended = waitpid(info->pid, &status, 0);
-    } while (ended < 0 && errno == EINTR);
+    const pid_t ended = ChildProcess::waitFor(info->pid, &status);
     if (ended < 0) {
         const ErrorText error(errno);
         trace.error()("Error waiting for child report process %d to terminate for file %s.errno = "

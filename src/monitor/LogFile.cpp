@@ -156,7 +156,10 @@ void* logThread(void* logFile) {
     // startThread holds the lock until the status is Running.
     log.lockLog();
     log.unlockLog();
+    log.m_end = {};
+    log.m_pulse.work("opens the log");
     log.processLogData();
+    log.m_pulse.rest();
     if (log.LogFileP != nullptr) {
         log.printSelf();
     }

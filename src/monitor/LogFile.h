@@ -1,6 +1,7 @@
 #ifndef ZRM_LOG_FILE_H
 #define ZRM_LOG_FILE_H
 
+#include "agent/framework/Pulse.h"
 #include "logmgr/LogBase.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogBufferInfo.h"
@@ -10,6 +11,7 @@
 #include "tables/zrm_rmlogent_data.h"
 
 #include <atomic>
+#include <chrono>
 #include <cstdint>
 #include <cstdio>
 #include <ctime>
@@ -84,6 +86,15 @@ protected:
     /// Remembers the bytes in front of LogEOF; the log's thread.
     void guardEnd() noexcept;
     void waitForEventLoop(timeval interval);
+    /// Offers a row to the situations, once the framework has room. False when the log is to end or
+    /// the process is ending before it has: then nothing was offered, and the entry counts as
+    /// passed over.
+    bool offer(zrm_rmlogent_data_t* row);
+    /// Further entries were passed over since the process is ending; counts them if it is.
+    static void notePassedOver(std::uint64_t entries) noexcept;
+    /// True when the log is to end and has had a second for what stood in it: a log may grow faster
+    /// than it is read. For every loop over entries.
+    bool isReadingOver() noexcept;
     /// Counts one more; the log's thread alone.
     static void count(std::atomic<std::int64_t>& counter) noexcept;
     /// Fills the columns that all kinds of logs share, in a row that is blank there.
@@ -129,6 +140,7 @@ protected:
     std::atomic<std::int64_t> OptimumBlockSize{0};
 
     static pthread_mutex_t m_debugFileLock;
+    Pulse m_pulse{fileNameUTF8(), &NumEvents};
     LogLedger m_ledger; ///< lives as long as the object: through every refresh that keeps it
 
 private:
@@ -145,8 +157,12 @@ private:
                      unsigned long length2);
     void traceEntry() const;
 
+    void passOverRest();
+    bool hasWaitedEnough() noexcept;
+
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
     // The thread's.
+    std::chrono::steady_clock::time_point m_end{}; ///< of reading a log that is to end
     LineReader m_lineReader;
     ReadGuard m_guard;
     zrm_rmlogent_data_t m_row{};

@@ -2,6 +2,7 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "agent/framework/cancellation.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>
@@ -39,7 +40,7 @@ unsigned char LogFile::determineOptimumBlockSize() {
 
 long LogFile::openLogForReport(_LogBufferInfo* info) {
     TraceScope trace(anchor);
-    info->fd = open(fileNameLocal(), O_RDONLY | O_CLOEXEC);
+    info->fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     if (info->fd < 0) {
         const ErrorText error(errno);
         trace.error()("Error opening file %s for report.  errno = %d; %s", fileNameLocal(),
@@ -85,6 +86,10 @@ void LogFile::pushBack(_LogBufferInfo* info) {
 
 long LogFile::fillReportBuffer(_LogBufferInfo* info) {
     TraceScope trace(anchor);
+    if (CTX1_IsCancelled()) {
+        trace.detail()("Report on file %s is no longer wanted.", fileNameLocal());
+        return trace.result(0L);
+    }
     if (info->bufferCount > 0 && info->bytesLeft > 0) {
         pushBack(info);
     }

@@ -2,7 +2,9 @@
 
 #include "agent/ErrorText.h"
 #include "agent/TraceScope.h"
+#include "agent/framework/EventRoom.h"
 #include "monitor/DescriptorReserve.h"
+#include "tables/TableDescription.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
@@ -19,6 +21,9 @@ namespace {
 
 TRC1_Anchor anchor{"LogFileTail.cpp"};
 
+/// How long lines are counted that the end of the process leaves in a log.
+constexpr std::chrono::milliseconds countingTime{500};
+
 } // namespace
 
 /// Counts without a locked instruction: only the log's thread writes the counter.
@@ -28,23 +33,26 @@ void LogFile::count(std::atomic<std::int64_t>& counter) noexcept {
 
 void LogFile::openLogAndSeek() {
     TraceScope trace(anchor);
-    std::FILE* file = std::fopen(fileNameLocal(), "r");
-    if (file != nullptr && DescriptorReserve::has(fileno(file))) {
-        std::fclose(file);
-        file = nullptr;
+    // Nothing waits here: a pipe in the log's place has no end to seek.
+    int fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (fd >= 0 && DescriptorReserve::has(fd)) {
+        close(fd);
+        fd = -1;
         errno = EMFILE;
     }
-    LogFileP = file;
+    LogFileP = fd < 0 ? nullptr : fdopen(fd, "r");
     if (LogFileP == nullptr) {
         const ErrorText error(errno);
         DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s.  errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
+        if (fd >= 0) {
+            close(fd);
+        }
         setMonitorStatus(MONITOR_ERR_OPEN);
         return;
     }
-    LogFD = fileno(LogFileP);
-    fcntl(LogFD, F_SETFD, FD_CLOEXEC); // not for the commands that other logs run
+    LogFD = fd;
     noteOpenFile();
     LogEOF = lseek(LogFD, 0, SEEK_END);
     if (LogEOF < 0) {
@@ -90,9 +98,11 @@ void LogFile::waitForEventLoop(timeval interval) {
     FD_ZERO(&writable);
     FD_ZERO(&exceptional);
     while (monitorStatus() == MONITOR_RUNNING) {
+        m_pulse.work("looks at the log");
         if (!checkForChange()) {
             return;
         }
+        m_pulse.rest();
         timeval timeOut = interval;
         if (select(0, &readable, &writable, &exceptional, &timeOut) < 0 && errno != EINTR) {
             const ErrorText error(errno);
@@ -171,15 +181,66 @@ bool LogFile::readGrowth() {
     return trace.result(true);
 }
 
+bool LogFile::offer(zrm_rmlogent_data_t* row) {
+    for (;;) {
+        if (EventRoom::mayOffer() && zrm_rmlogent_manager::EventArrived(row, 1) != TABLE_NO_ROOM)
+            [[likely]] {
+            return true;
+        }
+        m_pulse.work("waits for room in the queue of events");
+        EventRoom::wait([this] { return monitorStatus() == MONITOR_RUNNING; });
+        if (!EventRoom::mayOffer() &&
+            (monitorStatus() != MONITOR_RUNNING || EventRoom::now() == EventRoom::State::CLOSED)) {
+            notePassedOver(1);
+            return false;
+        }
+        m_pulse.work("reads the log");
+    }
+}
+
+bool LogFile::isReadingOver() noexcept {
+    return monitorStatus() == MONITOR_STOPPED && hasWaitedEnough();
+}
+
+bool LogFile::hasWaitedEnough() noexcept {
+    using Clock = std::chrono::steady_clock;
+    if (m_end == Clock::time_point{}) {
+        m_end = Clock::now() + std::chrono::seconds(1);
+    }
+    return Clock::now() >= m_end;
+}
+
+void LogFile::notePassedOver(std::uint64_t entries) noexcept {
+    if (EventRoom::now() == EventRoom::State::CLOSED) {
+        EventRoom::notePassedOver(entries);
+    }
+}
+
+/// Counts the lines behind one that nobody takes any more since the process is ending.
+void LogFile::passOverRest() {
+    std::uint64_t entries = 0;
+    const auto limit = std::chrono::steady_clock::now() + countingTime;
+    while (EventRoom::now() == EventRoom::State::CLOSED && m_lineReader.next() != nullptr &&
+           (++entries % 1024 != 0 || std::chrono::steady_clock::now() < limit)) {
+    }
+    notePassedOver(entries);
+}
+
 long LogFile::readLog() {
     TraceScope trace(anchor);
     m_lineReader.start(LogFD);
     while (char* const line = m_lineReader.next()) {
+        if (isReadingOver()) {
+            return trace.result(0L);
+        }
         count(NumEvents);
         const bool isRow = formatEntryAsRow(line, &m_row, nullptr) == 0;
         if (isRow) {
             m_ledger.noteTime(m_row.entrytime[0]);
-            zrm_rmlogent_manager::EventArrived(&m_row, 1);
+            if (!offer(&m_row)) {
+                passOverRest();
+                return trace.result(0L);
+            }
         } else {
             count(NumFormatErrors);
             m_ledger.noteRejected(line);

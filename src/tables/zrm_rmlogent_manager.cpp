@@ -1,6 +1,7 @@
 #include "tables/zrm_rmlogent_manager.h"
 
 #include "agent/TraceScope.h"
+#include "agent/framework/EventRoom.h"
 #include "tables/TableOperations.h"
 #include "tables/zrm_rmlogent_agent.h"
 
@@ -37,6 +38,10 @@ unsigned zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t* rows, int count
 unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
     const TableLock lock(*this);
+    // Asked under the lock, so that what one row raises is all that comes behind the last room.
+    if (!EventRoom::mayOffer()) {
+        return trace.result(TABLE_NO_ROOM);
+    }
     if (count != 1 || areOffersTraced()) {
         return trace.result(offerRowsTo<zrm_rmlogent_base>(requests(), rows, count));
     }

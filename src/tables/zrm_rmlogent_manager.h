@@ -14,6 +14,7 @@ public:
     /// Hands `count` fresh rows, back to back, to every open situation; called by the threads of
     /// all logs. The thresholds' columns of the rows are written in place. Returns 0, or the last
     /// non-zero status of a dispatch; 0 and nothing else before the table was registered.
+    /// TABLE_NO_ROOM when nothing was offered, since the framework has no room (EventRoom).
     static unsigned EventArrived(zrm_rmlogent_data_t* rows, int count);
 
     unsigned AddDataToEvent(zrm_rmlogent_data_t* rows, int count);

@@ -24,6 +24,10 @@ void AGF_SetAffinity(const char* affinity);
 /// receives its text, terminated.
 void AGF_SetVersionUsingProduct(const char* product, char* version, int size);
 
+/// Tells the framework that the agent has begun to end, before it waits for the framework's server.
+/// Returns at once. Any thread.
+void AGF_Stopping();
+
 /// Tells the framework that the agent is ending: its threads are stopped, its queues delivered.
 void AGF_Shutdown(int reason);
 

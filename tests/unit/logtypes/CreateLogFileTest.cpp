@@ -17,7 +17,7 @@ protected:
     template <typename Kind> bool makes(const std::string& fields) {
         const FakeUname aix("AIX");
         const auto line = validLog(m_path, fields);
-        const Fault noFile("fopen", EACCES);
+        const Fault noFile("open", EACCES);
         const Fault noDescriptor("open", EACCES);
         const Fault noPipe("pipe", EMFILE);
         const std::unique_ptr<LogFile> log(createLogFile(*line, nullptr));
@@ -34,7 +34,7 @@ TEST_F(CreateLogFile, KnowsTheKindsOfLogs) {
 }
 
 TEST_F(CreateLogFile, MakesARunningObjectOfTheLinesKindOnTheChain) {
-    const Fault fault("fopen", EACCES); // its monitor ends at once
+    const Fault fault("open", EACCES); // its monitor ends at once
     const std::unique_ptr<LogFile> log(createLogFile(*m_line, m_log.get()));
     EXPECT_NE(dynamic_cast<SysLogFile*>(log.get()), nullptr);
     EXPECT_EQ(m_log->next(), log.get());

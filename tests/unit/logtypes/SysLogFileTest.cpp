@@ -367,7 +367,7 @@ TEST(SysLogFileMonitor, ALogThatCannotBeOpenedEndsTheThread) {
     const TemporaryDirectory directory;
     const std::string path = directory.write("messages", "");
     RecordingTrace trace(TRC1_ERROR);
-    const Fault fault("fopen", ENOENT);
+    const Fault fault("open", ENOENT);
     SysLogFile log(*validLog(path), nullptr);
     log.stopThread();
     EXPECT_EQ(log.monitorStatus(), MONITOR_ERR_OPEN);

@@ -29,7 +29,7 @@ protected:
         LocaleDouble::reset();
         EventRecorder::clear();
         gSystemName = m_systemName;
-        const Fault fault("fopen", EACCES);
+        const Fault fault("open", EACCES);
         m_log = std::make_unique<SysLogFile>(*m_line, nullptr);
         while (m_log->monitorStatus() == MONITOR_RUNNING) {
             std::this_thread::yield();

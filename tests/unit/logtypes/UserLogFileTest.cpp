@@ -166,7 +166,7 @@ TEST_F(UserLog, TheFormatIsLearnedOnce) {
     const StringParser* const learned = ((*m_log).*(&UserLogMembers::SPAnchor)).get();
     ASSERT_NE(learned, nullptr);
     EXPECT_EQ(m_log->monitorStatus(), MONITOR_ERR_OPEN);
-    const Fault fault("fopen", EACCES);
+    const Fault fault("open", EACCES);
     *m_log = *m_line; // restarts the monitor
     waitForEnd(*m_log);
     EXPECT_EQ(((*m_log).*(&UserLogMembers::SPAnchor)).get(), learned);

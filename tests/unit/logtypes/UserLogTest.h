@@ -56,7 +56,7 @@ protected:
     void makeLogOfLine(const std::string& fields) {
         m_log.reset();
         m_line = validLog(m_path, fields);
-        const Fault fault("fopen", EACCES);
+        const Fault fault("open", EACCES);
         m_log = std::make_unique<UserLogFile>(*m_line, nullptr);
         waitForEnd(*m_log);
     }

@@ -64,7 +64,7 @@ TEST_F(Tail, OpensAtThePresentEnd) {
 TEST_F(Tail, ALogThatCannotBeOpenedHasItsStatus) {
     RecordingTrace trace(TRC1_ERROR);
     {
-        const Fault fault("fopen", EACCES);
+        const Fault fault("open", EACCES);
         m_log.openLogAndSeek();
     }
     EXPECT_THAT(trace.messages(),

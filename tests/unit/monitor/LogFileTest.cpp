@@ -324,7 +324,7 @@ TEST_F(LogFileTest, ReconfigurationRestartsAMonitorThatFailed) {
 TEST_F(LogFileTest, StoppingAFailedMonitorLeavesItsStatus) {
     TestLog log(*m_line);
     {
-        const Fault fault("fopen", EACCES);
+        const Fault fault("open", EACCES);
         log.startThread();
         ASSERT_TRUE(waitUntil([&] { return log.monitorStatus() != MONITOR_RUNNING; }));
     }

@@ -1,7 +1,10 @@
 #include "host/start/Serving.h"
 
+#include "agent/framework/EventRoom.h"
 #include "agent/framework/locks.h"
+#include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
+#include "host/start/Watchdog.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "unit/host_framework/TestTable.h"
@@ -62,10 +65,11 @@ protected:
     TestManager entries{"RMLOGENT"};
     TestManager logs{"RMMONLOG"};
     int logSamples = 0;
+    Watchdog watchdog; // not started: it looks after a whole process
 };
 
 TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     ASSERT_NE(serving, nullptr);
     EXPECT_EQ(arrive(), 0u);
     EXPECT_EQ(arrive(), 0u);
@@ -76,7 +80,7 @@ TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
 }
 
 TEST_F(ServingTest, TakesASampleOfTheLogsAtOnce) {
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     EXPECT_EQ(logSamples, 1);
     serving->stop(Clock::now() + 10s);
 }
@@ -84,7 +88,7 @@ TEST_F(ServingTest, TakesASampleOfTheLogsAtOnce) {
 TEST_F(ServingTest, ATableThatOpensNoRequestIsAFailure) {
     trace.setLevel(TRC1_ERROR);
     entries.gives = false;
-    EXPECT_EQ(Serving::begin(config, entries), nullptr);
+    EXPECT_EQ(Serving::begin(config, entries, watchdog), nullptr);
     EXPECT_THAT(trace.messages(), testing::ElementsAre("The Log Entries table opens no request."));
 }
 
@@ -104,31 +108,34 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
 TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
     config.history.enabled = false; // the queue is all the room there is
     config.sinks = {SinkConfig::jsonl("/dev/full")};
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     std::atomic<int> taken{0};
     std::thread log([&] {
-        while (arrive() == 0) {
+        while (EventRoom::wait([] { return true; }) != EventRoom::State::CLOSED) {
+            EXPECT_EQ(arrive(), 0u);
             ++taken;
         }
+        EventRoom::notePassedOver(7);
     });
-    // The queue is full when the log stands still.
-    for (int before = -1; before != taken || taken == 0;) {
-        before = taken;
-        std::this_thread::sleep_for(20ms);
+    while (EventRoomControl::waits().count == 0) { // the queue is full, and the log stands still
+        std::this_thread::sleep_for(1ms);
     }
     testing::internal::CaptureStderr();
     const auto begin = Clock::now();
     serving->stop(begin + 200ms);
     EXPECT_LT(Clock::now() - begin, 5s);
     log.join();
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "zrmagent: " + std::to_string(taken) + " events were not delivered to /dev/full\n");
+    EXPECT_EQ(
+        testing::internal::GetCapturedStderr(),
+        "zrmagent: " + std::to_string(taken) +
+            " events were not delivered to /dev/full\n"
+            "zrmagent: 7 lines that waited in the logs were not looked at; reports find them\n");
 }
 
 TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     arrive();
-    serving->limitWaits(Clock::now());
+    EventRoomControl::close();
     serving->abandonHttp(Clock::now() + 10s);
     EXPECT_EQ(arrive(), 0u) << "there is room";
     serving->deliverRest(Clock::now() + 10s);
@@ -138,7 +145,7 @@ TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
 
 TEST_F(ServingTest, SaysWhereHttpIs) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_THAT(testing::internal::GetCapturedStderr(),
@@ -151,7 +158,7 @@ TEST_F(ServingTest, SaysWhereHttpIs) {
 TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     config.http.tokenFile = directory.file("no/such/token");
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
@@ -165,7 +172,7 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
 TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
     const std::vector<SinkConfig> good = config.sinks;
     config.sinks = {SinkConfig::jsonl(directory.file("no/such/directory/events.jsonl"))};
-    auto serving = Serving::begin(config, entries);
+    auto serving = Serving::begin(config, entries, watchdog);
     EXPECT_EQ(arrive(), 0u);
     testing::internal::CaptureStderr();
     serving->stop(Clock::now() + 50ms);
@@ -175,7 +182,7 @@ TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
                   "; it gets them when the agent runs again\n");
     serving.reset();
     std::filesystem::create_directories(directory.file("no/such/directory"));
-    serving = Serving::begin(config, entries);
+    serving = Serving::begin(config, entries, watchdog);
     EXPECT_EQ(arrive(), 0u);
     serving->stop(Clock::now() + 10s);
     std::ifstream stream(directory.file("no/such/directory/events.jsonl"));
@@ -183,7 +190,7 @@ TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
 }
 
 TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     const int before = logSamples;
     serving->tick();
     EXPECT_EQ(logSamples, before) << "no minute is over yet";
@@ -192,7 +199,7 @@ TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
 }
 
 TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
-    const auto serving = Serving::begin(config, entries);
+    const auto serving = Serving::begin(config, entries, watchdog);
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
