@@ -1,12 +1,16 @@
 #include "host/http/RequestDispatcher.h"
 
 #include "agent/TraceScope.h"
+#include "host/framework/RequestLimit.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
+#include "host/http/TimedWork.h"
 #include "host/http/UrlText.h"
 
 #include <algorithm>
+#include <chrono>
 #include <exception>
+#include <iterator>
 #include <string_view>
 #include <utility>
 
@@ -62,6 +66,30 @@ void checkBody(const IncomingRequest& incoming) {
     if (!isJson(incoming.contentType)) {
         throw RequestRefused(415, "send the body as application/json", "Content-Type");
     }
+}
+
+/// What may read a whole log takes longer than the rest, and is ended then.
+bool mayBeLong(std::string_view pattern) {
+    constexpr std::string_view patterns[] = {"/api/v1/reports", "/api/v1/explain",
+                                             "/api/v1/backtest", "/api/v1/tables/{table}/sample"};
+    return std::ranges::find(patterns, pattern) != std::end(patterns);
+}
+
+/// Ends what the handler reads when the time is over or nobody waits for it any more.
+HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& request,
+                        std::string_view pattern) {
+    const std::chrono::milliseconds limit =
+        mayBeLong(pattern) ? RequestDispatcher::longLimit : RequestDispatcher::limit;
+    const auto work = [&handler, request, limit] {
+        RequestLimit reading(RequestLimit::Clock::now() + limit,
+                             [&] { return request.cancelled.stop_requested(); });
+        HttpAnswer answer = handler(request);
+        if (reading.wasReached()) {
+            throw RequestRefused(503, "the request took too long and was ended: ask for less", "");
+        }
+        return answer;
+    };
+    return TimedWork::answer(work, limit + RequestDispatcher::endingTime);
 }
 
 /// The answer to a request that has no handler.
@@ -187,7 +215,9 @@ HttpAnswer RequestDispatcher::answer(Admission& admission) {
         if (!active) {
             throw RequestRefused(503, "the agent is ending", "");
         }
-        return (*admission.handler)(request);
+        return admission.lane == Router::QUICK
+                   ? (*admission.handler)(request)
+                   : answerInTime(*admission.handler, request, admission.route);
     });
     count(admission, *answer);
     return std::move(*answer);

@@ -21,6 +21,12 @@
 class RequestDispatcher {
 public:
     /// The largest body: bytes.
+    /// For an answer; requests that may read a whole log have longLimit. What does not end then
+    /// gets endingTime, and is left behind (TimedWork).
+    static constexpr std::chrono::milliseconds limit{4000};
+    static constexpr std::chrono::milliseconds longLimit{32'000};
+    static constexpr std::chrono::milliseconds endingTime{800};
+
     static constexpr std::size_t largestBody = 1024 * 1024;
 
     /// A request whose head was held against the rules. What may wait comes after that: the body,
