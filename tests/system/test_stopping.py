@@ -1,0 +1,385 @@
+"""Whatever a thread of the agent waits for: it ends when it is told to, and answers meanwhile."""
+
+import http.client
+import json
+import os
+import socket
+import subprocess
+import threading
+import time
+from pathlib import Path
+from signal import SIGINT, SIGQUIT, SIGTERM
+
+import pytest
+from api import Api
+from conftest import descriptions, syslog_line, wait_until
+
+pytestmark = pytest.mark.slow
+
+END = 10  # seconds from the signal to the end, at most
+ANSWER = 5  # seconds to any answer, at most
+FLOOD = 6000  # lines, each an event: more than fit into the queue
+
+
+def flood(log, count=FLOOD):
+    log.append("".join(syslog_line(f"number {i}") for i in range(count)))
+
+
+def stop(agent, number=SIGTERM):
+    """The exit status of an agent that ends in time."""
+    begin = time.monotonic()
+    agent.send(number)
+    agent.wait_end(END + 20)
+    took = time.monotonic() - begin
+    assert took < END, f"the end took {took:.1f} s\n{agent.stderr.text()[-2000:]}"
+    return agent.process.returncode
+
+
+def answers(api):
+    """Every quick resource answers in time, with what it knows or that it is busy."""
+    for path in ("/api/v1/logs", "/metrics", "/api/v1/status", "/api/v1/situations", "/healthz"):
+        begin = time.monotonic()
+        if path == "/metrics":
+            status = status_of_text(api, path)
+        else:
+            status, _, _ = api.request("GET", path)
+        took = time.monotonic() - begin
+        assert took < ANSWER, f"{path} took {took:.1f} s"
+        assert status in (200, 503), path
+
+
+def status_of_text(api, path):
+    connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=30)
+    try:
+        connection.request("GET", path, headers={"Authorization": f"Bearer {api.token}"})
+        response = connection.getresponse()
+        response.read()
+        return response.status
+    finally:
+        connection.close()
+
+
+def queue_is_full(api):
+    _, _, status = api.request("GET", "/api/v1/status")
+    return status["queue"]["size"] >= status["queue"]["capacity"]
+
+
+def queue_stands_still(api):
+    """True when the queue is full, and not just for the moment."""
+    for _ in range(20):
+        if not queue_is_full(api):
+            return False
+        time.sleep(0.05)
+    return True
+
+
+# ------------------------------------------------------------------ sinks that take nothing
+
+
+def stuck_webhook(agent):
+    listener = socket.create_server(("127.0.0.1", 0))  # accepts, and never answers
+    agent.sink = None
+    agent.more_sinks = [{"type": "webhook", "url": f"http://127.0.0.1:{listener.getsockname()[1]}/"}]
+    return listener
+
+
+def stuck_syslog(agent):
+    listener = socket.create_server(("127.0.0.1", 0), backlog=0)
+    address = listener.getsockname()
+    waiting = [socket.socket() for _ in range(3)]  # nobody accepts them, nor whoever comes next
+    for client in waiting:
+        client.setblocking(False)
+        client.connect_ex(address)
+    agent.sink = None
+    agent.more_sinks = [{"type": "syslog", "address": f"127.0.0.1:{address[1]}"}]
+    return listener, waiting
+
+
+def stuck_fifo(agent):
+    path = agent.directory / "events.fifo"
+    os.mkfifo(path)
+    agent.sink = path
+    return os.open(path, os.O_RDWR)  # a reader that never reads
+
+
+STUCK = {"webhook": stuck_webhook, "syslog": stuck_syslog, "fifo": stuck_fifo}
+
+
+def full_queue(agent, sink, logs=2):
+    """An agent without a history whose sink takes nothing and whose logs wait for room."""
+    kept = STUCK[sink](agent)
+    agent.history = {"enabled": False}
+    agent.listen = "127.0.0.1:0"
+    made = [agent.log(f"app{i}.log") for i in range(logs)]
+    agent.situation()
+    agent.start()
+    api = Api(agent)
+    for log in made:
+        flood(log)
+    wait_until(lambda: queue_stands_still(api), "a full queue")
+    return api, made, kept
+
+
+@pytest.mark.parametrize("number", (SIGTERM, SIGINT))
+@pytest.mark.parametrize("refresh", ("nothing", "drop", "replace"))
+@pytest.mark.parametrize("sink", STUCK)
+def test_a_full_queue_keeps_neither_signals_nor_requests_waiting(agent, sink, refresh, number):
+    api, logs, kept = full_queue(agent, sink)
+    if refresh == "drop":
+        agent.configure(str(logs[0]))
+    elif refresh == "replace":
+        agent.configure(str(logs[0]), f'{logs[1]} ;N ;U ;A,"%255[^\\n]" , description')
+    if refresh != "nothing":
+        agent.refresh()
+        agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+    answers(api)
+    assert stop(agent, number) == 0
+    text = agent.stderr.text()
+    assert " events were not delivered to " in text
+    assert " lines that waited in the logs were not looked at" in text
+    assert kept is not None
+
+
+@pytest.mark.parametrize("sink", STUCK)
+def test_quit_aborts_an_agent_whose_queue_is_full(agent, sink):
+    api, _, kept = full_queue(agent, sink)
+    begin = time.monotonic()
+    agent.send(SIGQUIT)
+    agent.wait_end(END)
+    assert agent.process.returncode == -6
+    assert time.monotonic() - begin < 3
+    assert kept is not None and api is not None
+
+
+def test_a_refresh_lets_go_of_a_log_and_the_others_lose_and_double_nothing(agent):
+    log, dropped = agent.log("stays.log"), agent.log("goes.log")
+    agent.situation(log=log)
+    agent.situation("other", log=dropped)
+    agent.history = {"enabled": False}
+    agent.sink = agent.directory / "events.fifo"
+    agent.listen = "127.0.0.1:0"
+    os.mkfifo(agent.sink)
+    reader = os.open(agent.sink, os.O_RDONLY | os.O_NONBLOCK)
+    agent.start()
+    api = Api(agent)
+    flood(log)
+    flood(dropped)
+    wait_until(lambda: queue_is_full(api), "a full queue")
+    agent.configure(str(log))
+    begin = time.monotonic()
+    agent.refresh()
+    agent.wait_trace("Manager thread waiting for a signal.", 2)
+    assert time.monotonic() - begin < END
+    data = bytearray()
+
+    def all_of_it():
+        try:
+            data.extend(os.read(reader, 1 << 20))
+        except BlockingIOError:
+            pass
+        return data.count(b'"situation":"every-entry"') >= FLOOD
+
+    wait_until(all_of_it, lambda: f"{data.count(bytes([10]))} events read")
+    stays = [line for line in bytes(data).split(b"\n") if b'"situation":"every-entry"' in line]
+    numbers = [json.loads(line)["row"]["ENTRYDESC"] for line in stays[:FLOOD]]
+    assert numbers == [f"number {i}" for i in range(FLOOD)]
+    os.close(reader)
+    assert stop(agent) == 0
+
+
+def test_a_log_that_waits_for_room_turns_health_red_and_green_again(agent):
+    api, logs, kept = full_queue(agent, "fifo", logs=1)
+    status, _, answer = wait_until(
+        lambda: (lambda a: a if a[0] == 503 else None)(api.request("GET", "/healthz")),
+        "a red health",
+        20,
+    )
+    assert "the thread of a log has not moved for" in answer["detail"]
+    assert str(logs[0]) not in answer["detail"], "names are not for everybody"
+    agent.wait_trace(f"zrmagent: the thread of {logs[0]} has not moved for ")
+    ended = threading.Event()
+
+    def read():
+        os.set_blocking(kept, False)
+        while not ended.is_set():
+            try:
+                os.read(kept, 1 << 16)
+            except BlockingIOError:
+                time.sleep(0.01)
+
+    reader = threading.Thread(target=read, daemon=True)
+    reader.start()
+    wait_until(lambda: api.request("GET", "/healthz")[0] == 200, "a green health")
+    assert stop(agent) == 0
+    ended.set()
+
+
+# ------------------------------------------------------------------ disks
+
+
+@pytest.fixture(scope="session")
+def disk(tmp_path_factory):
+    """A library to preload: writes of the database fail or wait while a file exists."""
+    library = tmp_path_factory.mktemp("preload") / "disk.so"
+    for name in ("full_disk", "frozen_disk"):
+        subprocess.run(
+            ["cc", "-shared", "-fPIC", "-o", library.with_name(name + ".so"),
+             Path(__file__).with_name(name + ".c"), "-ldl"],
+            check=True,
+        )  # fmt: skip
+    return library.parent
+
+
+@pytest.mark.parametrize("kind", ("full", "frozen"))
+@pytest.mark.parametrize("refresh", (False, True))
+def test_a_disk_that_takes_nothing_keeps_neither_signals_nor_requests_waiting(
+    agent, disk, kind, refresh
+):
+    flag = agent.directory / "flag"
+    agent.environment = {
+        "LD_PRELOAD": str(disk / f"{kind}_disk.so"),
+        f"{kind.upper()}_DISK": str(flag),
+        "ASAN_OPTIONS": "verify_asan_link_order=0",
+    }
+    agent.listen = "127.0.0.1:0"
+    log, other = agent.log(), agent.log("other.log")
+    agent.situation()
+    agent.start()
+    api = Api(agent)
+    flag.touch()
+    flood(log, 10_000)
+    wait_until(lambda: queue_is_full(api), "a full queue")
+    if refresh:
+        agent.configure(str(other))
+        agent.refresh()
+        agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+    answers(api)
+    begin = time.monotonic()
+    api.request("GET", "/api/v1/events")
+    assert time.monotonic() - begin < ANSWER
+    stop(agent)
+    text = agent.stderr.text()
+    assert "2048 events were not stored in the history" in text
+    if not refresh:
+        assert "7952 lines that waited in the logs were not looked at" in text
+
+
+# ------------------------------------------------------------------ files that are none
+
+
+def test_a_log_that_became_a_pipe_holds_up_neither_reports_nor_its_restart(serving, agent):
+    log, api = serving("Jan  1 00:00:00 web1 old: line\n")
+    log.path.unlink()
+    os.mkfifo(log.path)
+    begin = time.monotonic()
+    api.report(log, "1260101000000000", "1991231235959000")
+    answers(api)
+    assert time.monotonic() - begin < 3 * ANSWER
+    assert stop(agent) == 0
+
+
+def test_a_report_over_a_huge_hole_ends_with_its_client(serving, agent):
+    log, api = serving("Jan  1 00:00:00 web1 old: line\n")
+    os.truncate(log.path, 1 << 40)
+    body = json.dumps({"log": str(log), "from": "2026-01-01T00:00:00", "to": "2099-01-01T00:00:00"})
+    connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=60)
+    headers = {"Authorization": f"Bearer {api.token}", "Content-Type": "application/json"}
+    connection.request("POST", "/api/v1/reports", body, headers)
+    time.sleep(1)
+    answers(api)
+    connection.close()
+    assert stop(agent) == 0
+
+
+def test_a_log_that_grows_by_a_terabyte_of_zeros_can_be_dropped_and_stopped(agent):
+    log, other = agent.log(), agent.log("other.log")
+    agent.situation()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    os.truncate(log.path, 1 << 40)
+    wait_until(lambda: api.logs()["app.log"]["NUMEVENTS"] > 1000, "the reading of zeros")
+    answers(api)
+    agent.configure(str(other))
+    agent.refresh()
+    agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+    assert list(api.logs()) == ["other.log"]
+    os.truncate(other.path, 1 << 40)
+    wait_until(lambda: api.logs()["other.log"]["NUMEVENTS"] > 1000, "the reading of zeros")
+    assert stop(agent) == 0
+
+
+def test_a_debug_log_that_is_a_pipe_holds_up_nothing(agent):
+    path = agent.directory / "debug.fifo"
+    os.mkfifo(path)
+    agent.environment["AGENT_DEBUG_LOG"] = str(path)
+    agent.listen = "127.0.0.1:0"
+    log = agent.log(fields=";Y ;S")
+    agent.situation(log=log)
+    agent.start()
+    api = Api(agent)
+    agent.wait_trace(f'Error opening debug log "{path}"; errno = 6; ')
+    reader = os.open(path, os.O_RDWR)  # never reads: the next refresh opens it
+    agent.refresh()
+    agent.wait_trace("Manager thread waiting for a signal.", 2)
+    flood(log, 200)
+    assert len(agent.wait_events(200)) == 200
+    answers(api)
+    assert stop(agent) == 0
+    os.close(reader)
+
+
+# ------------------------------------------------------------------ standard error, starts
+
+
+def test_a_standard_error_that_nobody_reads_holds_up_nothing(agent):
+    log = agent.log()
+    agent.sink = agent.directory / "events.jsonl"
+    agent.situation(log=log)
+    agent._write_toml()
+    environment = {**os.environ, "QFW_TRC1": "all"}
+    reader, writer = os.pipe()
+    process = subprocess.Popen(
+        [os.environ.get("ZRM_AGENT", str(Path(__file__).resolve().parents[2] / "build/dev/bin/zrmagent")),
+         "--config", str(agent.zrm_toml)],
+        stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=writer, env=environment,
+    )  # fmt: skip
+    try:
+        os.close(writer)
+        time.sleep(4)  # the pipe is full long before
+        deadline = time.monotonic() + 30
+        while not (agent.sink.exists() and agent.sink.stat().st_size):
+            log.append(syslog_line("nobody reads"))
+            time.sleep(0.5)
+            assert time.monotonic() < deadline, "no event"
+        begin = time.monotonic()
+        process.send_signal(SIGTERM)
+        assert process.wait(30) == 0
+        assert time.monotonic() - begin < END
+    finally:
+        process.kill()
+        process.wait()
+        os.close(reader)
+
+
+@pytest.mark.parametrize("number", (SIGTERM, SIGINT, SIGQUIT))
+def test_a_start_without_usable_logs_can_be_stopped(agent, number):
+    agent.configure("/no/such/log")
+    agent.start(wait=False)
+    agent.wait_trace("Agent has no work to do.  Exiting...")
+    status = stop(agent, number)
+    assert status == (-6 if number == SIGQUIT else 0)
+
+
+def test_entries_that_come_before_the_situations_are_open_are_judged(agent):
+    """Every line that is written from the moment a log is being read is raised."""
+    log = agent.log()
+    for number in range(200):  # they take a while to open
+        agent.situation(f"pattern-{number}", log=log, when=[f"ENTRYDESC matches '(a|b){{{number % 20}}}x{number}'"])
+    agent.situation(log=log)
+    agent.start(wait=False)
+    agent.wait_open(log.path)
+    log.append(syslog_line("at once"))
+    events = [e for e in agent.wait_events(1) if e["situation"] == "every-entry"]
+    assert descriptions(events) == ["at once"]
+    assert stop(agent) == 0
