@@ -176,7 +176,7 @@ extern "C" pid_t __wrap_waitpid(pid_t pid, int* status, int options) {
     }
     const pid_t result = __real_waitpid(pid, status, options);
     const pid_t waitedId = g_waitedId;
-    return waitedId != 0 ? waitedId : result;
+    return waitedId != 0 && result != 0 ? waitedId : result; // 0: the child still runs
 }
 
 extern "C" int __real_pthread_cond_timedwait(pthread_cond_t* condition, pthread_mutex_t* mutex,
