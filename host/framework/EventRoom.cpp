@@ -81,7 +81,10 @@ void EventRoomControl::hold() {
 }
 
 void EventRoomControl::open() {
-    change([](Room& all) { all.isHeld = all.isClosed = false; });
+    change([](Room& all) {
+        all.isHeld = all.isClosed = false;
+        all.passedOver = 0;
+    });
 }
 
 void EventRoomControl::close() {
