@@ -7,7 +7,7 @@ from urllib.parse import quote
 
 import pytest
 
-from api import Api, stamp
+from api import stamp
 from conftest import syslog_line, wait_until
 
 

@@ -233,6 +233,7 @@ def test_a_full_queue_holds_no_change_up_for_long(agent):
     api = Situations(agent)
     api.add("flood", log=str(log.path))
     log.append(syslog_line("x" * 200) * 60000)
+
     def stuck():
         before = api.get("flood")["counts"]["raised"]
         time.sleep(0.5)

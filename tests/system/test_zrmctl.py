@@ -292,10 +292,10 @@ def test_following_goes_on_over_restarts_of_the_agent(followed):
     agent.wait_events(1)
     follower = follow()
     follower.wait(1)
-    for number, signal in enumerate((SIGTERM, SIGKILL), 1):
+    for number, ending in enumerate((SIGTERM, SIGKILL), 1):
         log.append(syslog_line("one") + syslog_line("two"))
         follower.wait(3 * number)
-        agent.send(signal)
+        agent.send(ending)
         agent.wait_end()
         wait_until(lambda: len(follower.errors()) == 2 * number - 1, "the loss to be told")
         agent.start()
