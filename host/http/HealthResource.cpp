@@ -6,9 +6,9 @@
 void HealthResource::addRoutes(Router& router) {
     router.add(
         "GET", "/healthz",
-        [this](const HttpRequest&) {
-            if (std::string problem = m_problem(); !problem.empty()) {
-                throw RequestRefused(503, std::move(problem), "");
+        [problem = m_problem](const HttpRequest&) {
+            if (std::string reason = problem(); !reason.empty()) {
+                throw RequestRefused(503, std::move(reason), "");
             }
             return HttpAnswer::json(R"({"status":"ok"})");
         },
