@@ -77,10 +77,15 @@ bool mayBeLong(std::string_view pattern) {
 
 /// Ends what the handler reads when the time is over or nobody waits for it any more.
 HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& request,
-                        std::string_view pattern) {
+                        std::string_view pattern, ActiveRequests& active) {
     const std::chrono::milliseconds limit =
         mayBeLong(pattern) ? RequestDispatcher::longLimit : RequestDispatcher::limit;
-    const auto work = [&handler, request, limit] {
+    const auto work = [&handler, request, limit, &active] {
+        // On this thread: a handler that ends the process must not wait for itself.
+        const ActiveRequests::Guard guard(active);
+        if (!guard) {
+            throw RequestRefused(503, "the agent is ending", "");
+        }
         RequestLimit reading(RequestLimit::Clock::now() + limit,
                              [&] { return request.cancelled.stop_requested(); });
         HttpAnswer answer = handler(request);
@@ -211,13 +216,9 @@ HttpAnswer RequestDispatcher::answer(Admission& admission) {
     TraceScope trace(anchor);
     const HttpRequest& request = admission.request;
     std::optional<HttpAnswer> answer = problemOf(request, [&]() -> std::optional<HttpAnswer> {
-        const ActiveRequests::Guard active(m_active);
-        if (!active) {
-            throw RequestRefused(503, "the agent is ending", "");
-        }
         return admission.lane == Router::QUICK
                    ? (*admission.handler)(request)
-                   : answerInTime(*admission.handler, request, admission.route);
+                   : answerInTime(*admission.handler, request, admission.route, m_active);
     });
     count(admission, *answer);
     return std::move(*answer);
