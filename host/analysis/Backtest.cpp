@@ -1,10 +1,10 @@
 #include "host/analysis/Backtest.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "logs/RequestThresholds.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
 
 #include <algorithm>
 #include <cstdlib>

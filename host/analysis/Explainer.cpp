@@ -1,6 +1,6 @@
 #include "host/analysis/Explainer.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/StoredRow.h"
 #include "host/events/RowJson.h"

@@ -5,7 +5,7 @@
 #include "host/analysis/Reach.h"
 #include "host/analysis/Replay.h"
 #include "host/config/HostConfig.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -1,12 +1,12 @@
 #include "host/analysis/LogTail.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "host/diagnose/MonitoredLogFile.h"
+#include "logs/RequestThresholds.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
 
 #include <algorithm>
 #include <cerrno>

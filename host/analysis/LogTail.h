@@ -2,7 +2,7 @@
 #define ZRM_HOST_LOG_TAIL_H
 
 #include "host/analysis/Reach.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
 #include <functional>

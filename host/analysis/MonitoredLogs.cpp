@@ -1,6 +1,5 @@
 #include "host/analysis/MonitoredLogs.h"
 
-#include "agent/zrmmain.h"
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
 

@@ -1,6 +1,6 @@
 #include "host/analysis/Replay.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/framework/ContextInfo.h"
 #include "host/framework/RequestDetail.h"
 #include "tables/zrm_rmlogent_agent.h"

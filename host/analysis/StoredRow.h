@@ -2,7 +2,7 @@
 #define ZRM_HOST_STORED_ROW_H
 
 #include "host/framework/RowLayout.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <string_view>
 

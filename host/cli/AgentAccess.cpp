@@ -1,6 +1,6 @@
 #include "host/cli/AgentAccess.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 #include "host/cli/CliError.h"
 #include "host/config/ConfigFile.h"
 

@@ -1,6 +1,6 @@
 #include "host/cli/Context.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 #include "host/cli/CliError.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/JsonText.h"

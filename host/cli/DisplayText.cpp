@@ -1,6 +1,6 @@
 #include "host/cli/DisplayText.h"
 
-#include "host/framework/Utf8.h"
+#include "host/base/Utf8.h"
 
 #include <algorithm>
 #include <array>

@@ -1,6 +1,6 @@
 #include "host/cli/InputFile.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 #include "host/cli/CliError.h"
 
 #include <cerrno>

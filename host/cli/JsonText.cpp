@@ -1,6 +1,6 @@
 #include "host/cli/JsonText.h"
 
-#include "host/framework/SteeringText.h"
+#include "host/base/SteeringText.h"
 
 #include <nlohmann/json.hpp>
 

@@ -1,6 +1,6 @@
 #include "host/cli/TimeInput.h"
 
-#include "host/config/TimeText.h"
+#include "host/base/TimeText.h"
 
 #include <array>
 #include <charconv>

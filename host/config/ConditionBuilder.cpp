@@ -1,6 +1,6 @@
 #include "host/config/ConditionBuilder.h"
 
-#include "host/config/TimeText.h"
+#include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <array>

@@ -1,6 +1,6 @@
 #include "host/config/ConfigFile.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
 #include "host/config/SinkReader.h"

@@ -1,9 +1,9 @@
 #ifndef ZRM_HOST_HOST_CONFIG_H
 #define ZRM_HOST_HOST_CONFIG_H
 
+#include "host/base/ListenAddress.h"
 #include "host/config/SinkConfig.h"
 #include "host/framework/Condition.h"
-#include "host/http/ListenAddress.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -1,6 +1,6 @@
 #include "host/config/HttpUrl.h"
 
-#include "host/http/ListenAddress.h"
+#include "host/base/ListenAddress.h"
 
 #include <algorithm>
 #include <array>

@@ -1,6 +1,6 @@
 #include "host/config/Thresholds.h"
 
-#include "host/config/DurationText.h"
+#include "host/base/DurationText.h"
 
 #include <algorithm>
 #include <array>

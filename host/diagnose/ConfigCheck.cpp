@@ -1,12 +1,12 @@
 #include "host/diagnose/ConfigCheck.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "host/diagnose/ConfiguredFormat.h"
 #include "host/diagnose/LogWarnings.h"
 #include "host/framework/TraceCapture.h"
-#include "logmgr/LogManagerUtil.h"
-#include "logmgr/ValidLog.h"
+#include "logs/LogManagerUtil.h"
+#include "logs/ValidLog.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 

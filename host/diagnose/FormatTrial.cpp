@@ -1,10 +1,10 @@
 #include "host/diagnose/FormatTrial.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/diagnose/TrialLog.h"
 #include "host/events/RowText.h"
 #include "host/framework/TraceCapture.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <array>

@@ -1,7 +1,7 @@
 // The result of FormatTrial as JSON.
 
+#include "host/base/Utf8.h"
 #include "host/diagnose/FormatTrial.h"
-#include "host/framework/Utf8.h"
 
 #include <nlohmann/json.hpp>
 

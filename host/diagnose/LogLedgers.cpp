@@ -1,10 +1,9 @@
 #include "host/diagnose/LogLedgers.h"
 
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
+#include "base/TraceScope.h"
+#include "host/base/UtcTime.h"
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
-#include "host/framework/UtcTime.h"
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
 

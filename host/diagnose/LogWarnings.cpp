@@ -1,11 +1,11 @@
 #include "host/diagnose/LogWarnings.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/UtcTime.h"
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "host/framework/TraceCapture.h"
-#include "host/framework/UtcTime.h"
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/SysLogFile.h"
 

@@ -1,8 +1,8 @@
 #include "host/diagnose/LogWatch.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/WallClock.h"
 #include "host/diagnose/LogWarnings.h"
-#include "host/history/WallClock.h"
 
 #include <algorithm>
 #include <condition_variable>

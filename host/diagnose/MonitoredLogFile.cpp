@@ -1,6 +1,6 @@
 #include "host/diagnose/MonitoredLogFile.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 
 #include <cerrno>
 

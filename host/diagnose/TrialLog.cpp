@@ -1,6 +1,6 @@
 #include "host/diagnose/TrialLog.h"
 
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 
 std::unique_ptr<ValidLog> TrialLog::noLine() {
     char line[] = "";

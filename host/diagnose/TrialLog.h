@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_TRIAL_LOG_H
 #define ZRM_HOST_TRIAL_LOG_H
 
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 

@@ -1,13 +1,12 @@
 #include "host/diagnose/UnmonitoredLogs.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "host/base/Utf8.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/LogLedgers.h"
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
-#include "host/framework/Utf8.h"
 #include "logmgr/LogManager.h"
 
 #include <algorithm>

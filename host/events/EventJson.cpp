@@ -1,8 +1,8 @@
 #include "host/events/EventJson.h"
 
+#include "host/base/UtcTime.h"
 #include "host/events/LogPath.h"
 #include "host/events/RowJson.h"
-#include "host/framework/UtcTime.h"
 
 #include <charconv>
 #include <utility>

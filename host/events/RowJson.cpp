@@ -1,8 +1,8 @@
 #include "host/events/RowJson.h"
 
+#include "host/base/SteeringText.h"
+#include "host/base/Utf8.h"
 #include "host/events/RowText.h"
-#include "host/framework/SteeringText.h"
-#include "host/framework/Utf8.h"
 
 #include <array>
 #include <charconv>

@@ -1,8 +1,8 @@
 #include "host/events/RowText.h"
 
+#include "host/base/Utf8.h"
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
-#include "host/framework/Utf8.h"
 
 namespace {
 

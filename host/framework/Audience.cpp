@@ -1,9 +1,7 @@
 #include "host/framework/Audience.h"
 
-#include "agent/framework/ctreq.h"
 #include "host/framework/ColumnText.h"
-#include "host/framework/ConditionSet.h"
-#include "host/framework/RequestCounts.h"
+#include "host/framework/RequestState.h"
 
 #include <algorithm>
 #include <bit>
@@ -46,7 +44,7 @@ LinkedList& Audience::of(char* row, std::size_t rowSize) {
     findMet(row);
     for (const std::uint32_t index : m_met) {
         ctreq* const request = m_members[index].request;
-        request->counts().countOffered();
+        request->framework().counts.countOffered();
         m_chosen.Add(request);
     }
     return m_chosen;
@@ -161,12 +159,12 @@ void Audience::learnRequests(std::size_t rowSize) {
 }
 
 void Audience::learnMember(ctreq& request, std::size_t rowSize) {
-    request.counts().joinAudience(m_offered);
+    request.framework().counts.joinAudience(m_offered);
     Member member;
     member.request = &request;
     member.firstCheck = static_cast<std::uint32_t>(m_checks.size());
     const auto index = static_cast<std::uint32_t>(m_members.size());
-    for (const CompiledCondition& condition : request.conditions().all()) {
+    for (const CompiledCondition& condition : request.framework().conditionsOf(request).all()) {
         if (condition.isOnLog() || condition.neverHolds()) {
             m_logConditions.emplace_back(index, &condition);
         } else if (condition.isOnText()) {

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_AUDIENCE_H
 #define ZRM_HOST_AUDIENCE_H
 
-#include "agent/framework/LinkedList.h"
+#include "framework/LinkedList.h"
 
 #include <array>
 #include <atomic>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_CODE_PAGES_H
 #define ZRM_HOST_CODE_PAGES_H
 
-#include "agent/framework/locale.h"
+#include "framework/locale.h"
 
 #include <cstdint>
 #include <string_view>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_COMPARISON_H
 #define ZRM_HOST_COMPARISON_H
 
-#include "agent/framework/filters.h"
+#include "framework/filters.h"
 
 #include <cstdint>
 #include <optional>

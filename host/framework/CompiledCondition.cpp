@@ -1,12 +1,12 @@
 #include "host/framework/CompiledCondition.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/ctreq.h"
-#include "agent/framework/locale.h"
+#include "base/TraceScope.h"
+#include "framework/ctreq.h"
+#include "framework/locale.h"
+#include "host/base/Utf8.h"
 #include "host/framework/ColumnText.h"
 #include "host/framework/Comparison.h"
 #include "host/framework/Condition.h"
-#include "host/framework/Utf8.h"
 
 #include <algorithm>
 #include <cstring>

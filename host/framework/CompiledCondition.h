@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_COMPILED_CONDITION_H
 #define ZRM_HOST_COMPILED_CONDITION_H
 
-#include "agent/framework/filters.h"
+#include "framework/filters.h"
 #include "host/framework/RowLayout.h"
 
 #include <cstdint>

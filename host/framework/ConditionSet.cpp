@@ -1,6 +1,6 @@
 #include "host/framework/ConditionSet.h"
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 #include "host/framework/FilterList.h"
 
 #include <algorithm>

@@ -1,7 +1,7 @@
 #include "host/framework/Converter.h"
 
+#include "host/base/Utf8.h"
 #include "host/framework/IconvCache.h"
-#include "host/framework/Utf8.h"
 
 #include <algorithm>
 #include <cerrno>

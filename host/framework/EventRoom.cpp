@@ -1,5 +1,5 @@
 // The host's implementation of EventRoom.h, and its own side of it.
-#include "agent/framework/EventRoom.h"
+#include "framework/EventRoom.h"
 
 #include "host/framework/EventRoomControl.h"
 

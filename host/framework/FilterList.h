@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_FILTER_LIST_H
 #define ZRM_HOST_FILTER_LIST_H
 
-#include "agent/framework/filters.h"
+#include "framework/filters.h"
 #include "host/framework/Condition.h"
 
 #include <string>

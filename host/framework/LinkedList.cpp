@@ -1,4 +1,4 @@
-#include "agent/framework/LinkedList.h"
+#include "framework/LinkedList.h"
 
 #include <algorithm>
 

@@ -1,5 +1,5 @@
 // The managed-system name of agent_calls.h.
-#include "agent/framework/agent_calls.h"
+#include "framework/agent_calls.h"
 
 #include "host/framework/NodeType.h"
 

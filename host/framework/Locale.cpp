@@ -1,10 +1,10 @@
 // The host's implementation of locale.h.
-#include "agent/framework/locale.h"
+#include "framework/locale.h"
 
+#include "host/base/Utf8.h"
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
 #include "host/framework/Status.h"
-#include "host/framework/Utf8.h"
 
 #include <cstring>
 

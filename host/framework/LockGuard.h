@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_LOCK_GUARD_H
 #define ZRM_HOST_LOCK_GUARD_H
 
-#include "agent/framework/locks.h"
+#include "framework/locks.h"
 
 /// Holds a lock of the framework for a scope.
 class LockGuard {

@@ -1,8 +1,8 @@
 // The host's implementation of locks.h.
-#include "agent/framework/locks.h"
+#include "framework/locks.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 
 #include <cstdlib>
 

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_PULSE_REGISTRY_H
 #define ZRM_HOST_PULSE_REGISTRY_H
 
-#include "agent/framework/Pulse.h"
+#include "framework/Pulse.h"
 
 #include <chrono>
 #include <string>

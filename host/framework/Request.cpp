@@ -1,6 +1,6 @@
 #include "host/framework/Request.h"
 
-#include "agent/framework/TableManager.h"
+#include "framework/TableManager.h"
 #include "host/framework/HandleTable.h"
 #include "host/framework/LockGuard.h"
 #include "host/framework/RequestCounts.h"

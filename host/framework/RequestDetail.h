@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_REQUEST_DETAIL_H
 #define ZRM_HOST_REQUEST_DETAIL_H
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 #include "host/framework/Condition.h"
 
 #include <string>

@@ -1,6 +1,6 @@
 #include "host/framework/RequestLimit.h"
 
-#include "agent/framework/cancellation.h"
+#include "framework/cancellation.h"
 
 #include <utility>
 

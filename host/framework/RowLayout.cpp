@@ -1,6 +1,6 @@
 #include "host/framework/RowLayout.h"
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 #include "host/framework/ColumnText.h"
 
 #include <algorithm>

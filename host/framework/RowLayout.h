@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_ROW_LAYOUT_H
 #define ZRM_HOST_ROW_LAYOUT_H
 
-#include "agent/framework/filters.h"
+#include "framework/filters.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -1,7 +1,7 @@
 #include "host/framework/Sample.h"
 
-#include "agent/framework/ctreq.h"
 #include "host/framework/Request.h"
+#include "host/framework/RequestState.h"
 #include "host/framework/Tables.h"
 
 #include <algorithm>
@@ -52,5 +52,6 @@ std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition
     sampled.TakeSample();
     // The table leaves its rows with the request.
     sampled.Dispatch();
-    return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows(), sampled.judged());
+    return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows(),
+                  sampled.framework().counts.judged());
 }

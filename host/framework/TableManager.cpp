@@ -1,12 +1,18 @@
-#include "agent/framework/TableManager.h"
+#include "framework/TableManager.h"
 
 #include "host/framework/Audience.h"
 #include "host/framework/Status.h"
 #include "host/framework/Tables.h"
 
+class TableManager::Framework {
+public:
+    explicit Framework(LinkedList& requests) : audience(requests) {}
+    Audience audience;
+};
+
 TableManager::TableManager(const char* application, const char* table)
     : m_application(application), m_table(table),
-      m_audience(std::make_unique<Audience>(m_requests)) {}
+      m_framework(std::make_unique<Framework>(m_requests)) {}
 
 TableManager::~TableManager() {
     Tables::remove(this);
@@ -17,7 +23,7 @@ unsigned TableManager::Shutdown(unsigned /*reason*/) {
 }
 
 LinkedList& TableManager::requestsFor(char* row, unsigned rowSize) {
-    return m_audience->of(row, rowSize);
+    return m_framework->audience.of(row, rowSize);
 }
 
 unsigned TableManager::RegisterWithManager(TableManager* manager) {

@@ -1,6 +1,6 @@
 #include "host/framework/Tables.h"
 
-#include "agent/framework/TableManager.h"
+#include "framework/TableManager.h"
 #include "host/framework/Status.h"
 
 #include <atomic>

@@ -1,5 +1,5 @@
 // The host's implementation of trace.h.
-#include "agent/framework/trace.h"
+#include "framework/trace.h"
 
 #include "host/framework/CancellationOff.h"
 #include "host/framework/TraceCapture.h"

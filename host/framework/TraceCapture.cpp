@@ -1,6 +1,6 @@
 #include "host/framework/TraceCapture.h"
 
-#include "agent/framework/trace.h"
+#include "framework/trace.h"
 
 #include <atomic>
 #include <cstdio>

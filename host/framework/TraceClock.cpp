@@ -1,6 +1,6 @@
 #include "host/framework/TraceClock.h"
 
-#include "host/framework/ForkedChild.h"
+#include "host/base/ForkedChild.h"
 
 #include <atomic>
 #include <chrono>

@@ -1,7 +1,7 @@
 #include "host/framework/TraceControl.h"
 
-#include "agent/ErrorText.h"
-#include "agent/framework/trace.h"
+#include "base/ErrorText.h"
+#include "framework/trace.h"
 #include "host/framework/TraceLevels.h"
 #include "host/framework/TraceOutput.h"
 

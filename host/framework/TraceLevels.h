@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_TRACE_LEVELS_H
 #define ZRM_HOST_TRACE_LEVELS_H
 
-#include "agent/framework/trace.h"
+#include "framework/trace.h"
 
 #include <string>
 #include <string_view>

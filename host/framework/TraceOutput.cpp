@@ -1,7 +1,7 @@
 #include "host/framework/TraceOutput.h"
 
-#include "host/framework/ForkedChild.h"
-#include "host/framework/PatientWrite.h"
+#include "host/base/ForkedChild.h"
+#include "host/base/PatientWrite.h"
 
 #include <atomic>
 #include <cerrno>

@@ -1,7 +1,7 @@
 #include "host/framework/TraceRecord.h"
 
+#include "host/base/Utf8.h"
 #include "host/framework/TraceClock.h"
-#include "host/framework/Utf8.h"
 
 #include <algorithm>
 #include <cstdio>

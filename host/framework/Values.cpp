@@ -1,5 +1,5 @@
 // The host's implementation of values.h.
-#include "agent/framework/values.h"
+#include "framework/values.h"
 
 #include "host/framework/ColumnText.h"
 #include "host/framework/HandleTable.h"

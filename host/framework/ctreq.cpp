@@ -1,13 +1,9 @@
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/TableManager.h"
-#include "host/framework/ConditionSet.h"
-#include "host/framework/ContextInfo.h"
-#include "host/framework/FilterList.h"
+#include "base/TraceScope.h"
+#include "framework/TableManager.h"
 #include "host/framework/HandleTable.h"
-#include "host/framework/RequestCounts.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/RequestState.h"
 #include "host/framework/Status.h"
 
 #include <algorithm>
@@ -15,7 +11,6 @@
 #include <cstdint>
 #include <cstring>
 #include <new>
-#include <optional>
 
 namespace {
 
@@ -24,22 +19,6 @@ TRC1_Anchor anchor{"ctreq.cpp"};
 std::atomic<unsigned> g_lastIdentifier{0};
 
 } // namespace
-
-class ctreq::Framework {
-public:
-    Framework(const RequestDetail& detail, ContextInfo& context)
-        : filters(detail.conditions), receiver(context.receiver()),
-          counts(context.counts() != nullptr ? *context.counts() : ownCounts) {}
-
-    FilterList filters;
-    /// Built when the first row is judged: only then the table's columns can be asked for.
-    std::optional<ConditionSet> conditions;
-    RowReceiver& receiver;
-    std::atomic<bool> stopped{false};
-    RequestCounts ownCounts;
-    RequestCounts& counts;
-    std::size_t capacity = 0; ///< rows that fit into the memory of the data array
-};
 
 ctreq::ctreq(RequestDetail* detail, ContextInfo* context, TableManager* manager)
     : m_manager(manager), m_name(detail->name.c_str()), m_sampleType(detail->sampleType),
@@ -101,26 +80,11 @@ unsigned ctreq::CheckForException(char* row) {
         return 0;
     }
     m_framework->counts.countJudged();
-    if (!conditions().holds(row)) {
+    if (!m_framework->conditionsOf(*this).holds(row)) {
         return 0;
     }
     m_framework->counts.countMatched();
     return 1;
-}
-
-const ConditionSet& ctreq::conditions() {
-    if (!m_framework->conditions) {
-        m_framework->conditions.emplace(m_framework->filters, *this);
-    }
-    return *m_framework->conditions;
-}
-
-RequestCounts& ctreq::counts() noexcept {
-    return m_framework->counts;
-}
-
-std::uint64_t ctreq::judged() const noexcept {
-    return m_framework->counts.judged();
 }
 
 unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,

@@ -1,6 +1,6 @@
 #include "host/history/Database.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 #include "host/history/Statement.h"
 
 #include <sqlite3.h>

@@ -1,6 +1,6 @@
 #include "host/history/EntryRecorder.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/events/EventJson.h"
 #include "host/framework/Sample.h"
 

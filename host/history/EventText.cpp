@@ -1,6 +1,6 @@
 #include "host/history/EventText.h"
 
-#include "host/framework/Utf8.h"
+#include "host/base/Utf8.h"
 
 #include <algorithm>
 #include <cstddef>

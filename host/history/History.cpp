@@ -1,10 +1,10 @@
 #include "host/history/History.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/Say.h"
 #include "host/history/HistoryQuery.h"
 #include "host/history/HistorySource.h"
 #include "host/history/Schema.h"
-#include "host/start/Say.h"
 
 #include <algorithm>
 #include <cinttypes>

@@ -1,8 +1,8 @@
 #include "host/history/HistoryDirectory.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "host/start/Say.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "host/base/Say.h"
 
 #include <algorithm>
 #include <array>

@@ -1,7 +1,7 @@
 #include "host/history/HistoryFile.h"
 
+#include "host/base/WallClock.h"
 #include "host/history/Schema.h"
-#include "host/history/WallClock.h"
 
 #include <algorithm>
 #include <optional>

@@ -1,9 +1,9 @@
 #include "host/history/HistorySource.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/Say.h"
 #include "host/history/Statement.h"
 #include "host/history/StoredEventRow.h"
-#include "host/start/Say.h"
 
 #include <algorithm>
 #include <chrono>

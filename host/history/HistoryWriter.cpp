@@ -1,8 +1,8 @@
 #include "host/history/HistoryWriter.h"
 
-#include "agent/TraceScope.h"
-#include "host/history/WallClock.h"
-#include "host/start/Say.h"
+#include "base/TraceScope.h"
+#include "host/base/Say.h"
+#include "host/base/WallClock.h"
 
 #include <algorithm>
 #include <cinttypes>

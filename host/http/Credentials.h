@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_CREDENTIALS_H
 #define ZRM_HOST_CREDENTIALS_H
 
-#include "host/config/WatchedFile.h"
+#include "host/base/WatchedFile.h"
 #include "host/http/ApiToken.h"
 #include "host/http/TlsContext.h"
 

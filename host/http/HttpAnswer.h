@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_HTTP_ANSWER_H
 #define ZRM_HOST_HTTP_ANSWER_H
 
-#include "host/framework/SteeringText.h"
+#include "host/base/SteeringText.h"
 
 #include <functional>
 #include <memory>

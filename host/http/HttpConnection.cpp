@@ -1,6 +1,6 @@
 #include "host/http/HttpConnection.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/http/ResponseText.h"
 #include "host/http/StreamChannel.h"
 

@@ -1,6 +1,6 @@
 #include "host/http/HttpServer.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/http/ConnectionShares.h"
 #include "host/http/DescriptorRoom.h"
 #include "host/http/HttpConnection.h"

@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_HTTP_SERVER_H
 #define ZRM_HOST_HTTP_SERVER_H
 
+#include "host/base/ListenAddress.h"
 #include "host/http/ApiToken.h"
-#include "host/http/ListenAddress.h"
 #include "host/http/TlsContext.h"
 
 #include <chrono>

@@ -1,6 +1,6 @@
 #include "host/http/QueryFields.h"
 
-#include "host/config/TimeText.h"
+#include "host/base/TimeText.h"
 #include "host/http/RequestRefused.h"
 
 #include <algorithm>

@@ -1,11 +1,11 @@
 #include "host/http/RequestDispatcher.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/UrlText.h"
 #include "host/framework/RequestLimit.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/TimedWork.h"
-#include "host/http/UrlText.h"
 
 #include <algorithm>
 #include <chrono>

@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_REQUEST_GUARD_H
 #define ZRM_HOST_REQUEST_GUARD_H
 
+#include "host/base/ListenAddress.h"
 #include "host/http/ApiToken.h"
-#include "host/http/ListenAddress.h"
 #include "host/http/Problem.h"
 #include "host/http/TlsContext.h"
 

@@ -1,6 +1,6 @@
 #include "host/http/TlsContext.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 
 #include <openssl/err.h>
 #include <openssl/ssl.h>

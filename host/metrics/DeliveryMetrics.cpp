@@ -1,6 +1,6 @@
 #include "host/metrics/DeliveryMetrics.h"
 
-#include "host/events/Delivery.h"
+#include "host/delivery/Delivery.h"
 #include "host/history/HistoryReader.h"
 #include "host/metrics/MetricText.h"
 

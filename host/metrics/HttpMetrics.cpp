@@ -1,6 +1,6 @@
 #include "host/metrics/HttpMetrics.h"
 
-#include "host/http/EventStream.h"
+#include "host/api/EventStream.h"
 #include "host/http/HttpServer.h"
 #include "host/http/RequestStatistics.h"
 #include "host/metrics/MetricText.h"

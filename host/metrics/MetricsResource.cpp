@@ -1,6 +1,6 @@
 #include "host/metrics/MetricsResource.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/http/QueryFields.h"
 #include "host/http/Router.h"
 #include "host/metrics/MetricText.h"

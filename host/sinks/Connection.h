@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_CONNECTION_H
 #define ZRM_HOST_CONNECTION_H
 
+#include "host/base/ListenAddress.h"
 #include "host/client/NameLookup.h"
-#include "host/http/ListenAddress.h"
 
 #include <chrono>
 #include <cstddef>

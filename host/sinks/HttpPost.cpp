@@ -1,6 +1,6 @@
 #include "host/sinks/HttpPost.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/client/HttpClient.h"
 #include "host/config/HttpUrl.h"
 #include "host/sinks/HeadersFile.h"

@@ -1,6 +1,6 @@
 #include "host/sinks/JsonPostSink.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 
 namespace {
 

@@ -1,7 +1,7 @@
 #include "host/sinks/JsonlSink.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 
 #include <algorithm>
 #include <cerrno>

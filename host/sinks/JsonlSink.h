@@ -2,7 +2,7 @@
 #define ZRM_HOST_JSONL_SINK_H
 
 #include "host/config/SinkConfig.h"
-#include "host/events/Sink.h"
+#include "host/sinks/Sink.h"
 
 #include <atomic>
 #include <chrono>

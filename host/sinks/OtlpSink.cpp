@@ -1,7 +1,7 @@
 #include "host/sinks/OtlpSink.h"
 
-#include "agent/TraceScope.h"
-#include "host/framework/SteeringText.h"
+#include "base/TraceScope.h"
+#include "host/base/SteeringText.h"
 #include "host/sinks/EventRow.h"
 #include "host/sinks/SeverityCodes.h"
 

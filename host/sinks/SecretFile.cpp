@@ -1,6 +1,6 @@
 #include "host/sinks/SecretFile.h"
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 
 #include <cerrno>
 

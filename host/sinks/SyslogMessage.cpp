@@ -1,9 +1,9 @@
 #include "host/sinks/SyslogMessage.h"
 
+#include "host/base/SteeringText.h"
+#include "host/base/UtcTime.h"
+#include "host/base/Utf8.h"
 #include "host/config/SyslogFacilities.h"
-#include "host/framework/SteeringText.h"
-#include "host/framework/UtcTime.h"
-#include "host/framework/Utf8.h"
 #include "host/sinks/EventRow.h"
 #include "host/sinks/SeverityCodes.h"
 

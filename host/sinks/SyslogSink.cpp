@@ -1,6 +1,6 @@
 #include "host/sinks/SyslogSink.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 
 #include <utility>
 

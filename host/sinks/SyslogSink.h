@@ -2,8 +2,8 @@
 #define ZRM_HOST_SYSLOG_SINK_H
 
 #include "host/config/SinkConfig.h"
-#include "host/events/Sink.h"
 #include "host/sinks/Connection.h"
+#include "host/sinks/Sink.h"
 #include "host/sinks/SyslogMessage.h"
 
 #include <cstddef>

@@ -1,6 +1,6 @@
 #include "host/sinks/WebhookSink.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/sinks/HmacSha256.h"
 #include "host/sinks/SecretFile.h"
 

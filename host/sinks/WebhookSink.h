@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_WEBHOOK_SINK_H
 #define ZRM_HOST_WEBHOOK_SINK_H
 
-#include "host/events/Sink.h"
 #include "host/sinks/HttpPost.h"
+#include "host/sinks/Sink.h"
 
 #include <cstddef>
 #include <optional>

@@ -1,7 +1,7 @@
 #include "host/situations/Situation.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/ctreq.h"
+#include "base/TraceScope.h"
+#include "framework/ctreq.h"
 #include "host/framework/Status.h"
 
 #include <chrono>

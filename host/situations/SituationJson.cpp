@@ -1,6 +1,6 @@
 #include "host/situations/SituationJson.h"
 
-#include "host/framework/UtcTime.h"
+#include "host/base/UtcTime.h"
 #include "host/situations/SituationStatus.h"
 
 #include <nlohmann/json.hpp>

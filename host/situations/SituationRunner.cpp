@@ -1,6 +1,6 @@
 #include "host/situations/SituationRunner.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 
 #include <utility>
 

@@ -1,6 +1,6 @@
 #include "host/situations/SituationSet.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/config/PatternBudget.h"
 
 #include <algorithm>

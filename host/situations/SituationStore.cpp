@@ -1,7 +1,7 @@
 #include "host/situations/SituationStore.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "host/config/SituationValidator.h"
 #include "host/situations/SituationJson.h"
 

@@ -1,6 +1,6 @@
-#include "agent/framework/agent_calls.h"
+#include "framework/agent_calls.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/framework/NodeType.h"
 #include "host/start/Host.h"
 

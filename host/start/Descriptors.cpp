@@ -1,6 +1,6 @@
 #include "host/start/Descriptors.h"
 
-#include "host/start/Say.h"
+#include "host/base/Say.h"
 #include "monitor/DescriptorReserve.h"
 
 #include <algorithm>

@@ -1,10 +1,10 @@
 #include "host/start/Host.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
+#include "host/base/Say.h"
 #include "host/config/ConfigFile.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
-#include "host/start/Say.h"
 
 #include <algorithm>
 #include <cstdlib>

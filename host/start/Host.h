@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_HOST_H
 #define ZRM_HOST_HOST_H
 
+#include "host/base/WatchedFile.h"
 #include "host/config/HostConfig.h"
-#include "host/config/WatchedFile.h"
 #include "host/start/ServiceNotifier.h"
 #include "host/start/Serving.h"
 #include "host/start/Watchdog.h"

@@ -1,7 +1,7 @@
 #include "host/start/ServiceNotifier.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 
 #include <cerrno>
 #include <cstddef>

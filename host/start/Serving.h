@@ -1,19 +1,19 @@
 #ifndef ZRM_HOST_SERVING_H
 #define ZRM_HOST_SERVING_H
 
+#include "host/api/TableSampler.h"
+#include "host/base/Say.h"
 #include "host/config/HostConfig.h"
+#include "host/delivery/Delivery.h"
 #include "host/diagnose/LogWatch.h"
-#include "host/events/Delivery.h"
 #include "host/history/EntryRecorder.h"
 #include "host/http/Credentials.h"
 #include "host/http/HttpServer.h"
 #include "host/http/Resource.h"
 #include "host/http/Router.h"
-#include "host/http/TableSampler.h"
 #include "host/metrics/ConfigMetrics.h"
 #include "host/situations/SituationSet.h"
 #include "host/start/Descriptors.h"
-#include "host/start/Say.h"
 
 #include <chrono>
 #include <memory>

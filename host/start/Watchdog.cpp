@@ -1,7 +1,7 @@
 #include "host/start/Watchdog.h"
 
+#include "host/base/Say.h"
 #include "host/framework/PulseRegistry.h"
-#include "host/start/Say.h"
 
 #include <cstdlib>
 #include <system_error>

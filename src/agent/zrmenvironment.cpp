@@ -1,9 +1,10 @@
 // The environment of the process as start-up finds it: what the agent takes from it, and the limits
 // of the system for the trace.
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
 #include "agent/zrmmain.h"
+#include "base/ErrorText.h"
+#include "base/ProcessValues.h"
+#include "base/TraceScope.h"
 
 #include <cerrno>
 #include <clocale>

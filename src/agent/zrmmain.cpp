@@ -1,9 +1,11 @@
 #include "agent/zrmmain.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/agent_calls.h"
+#include "base/ErrorText.h"
+#include "base/ProcessValues.h"
+#include "base/TraceScope.h"
+#include "framework/agent_calls.h"
 #include "logmgr/LogManager.h"
+#include "monitor/LogFile.h"
 #include "tables/zrm_rmlogent_manager.h"
 #include "tables/zrm_rmmonlog_manager.h"
 
@@ -64,6 +66,7 @@ int zrmMain(int argc, char** argv) {
         std::exit(-1);
     }
     getSystemName();
+    LogFile::setRowReceiver(zrm_rmlogent_manager::EventArrived);
     auto* const logManager = new (std::nothrow) LogManager;
     if (logManager == nullptr) {
         endWithoutMemory(trace, sizeof(LogManager));

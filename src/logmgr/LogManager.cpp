@@ -1,8 +1,8 @@
 #include "logmgr/LogManager.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "logmgr/LogManagerUtil.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "logs/LogManagerUtil.h"
 #include "monitor/LogFile.h"
 
 #include <cerrno>
@@ -229,10 +229,12 @@ void LogManager::openDebugLog() {
     }
     std::setvbuf(stream, nullptr, _IOLBF, BUFSIZ);
     DebugLogP = stream;
+    LogFile::setDebugLog(stream);
 }
 
 void LogManager::closeDebugLog() {
     TraceScope trace(anchor);
+    LogFile::setDebugLog(nullptr);
     if (std::fclose(DebugLogP.exchange(nullptr)) != 0) {
         const ErrorText error(errno);
         trace.error()("Error closing debug log \"%s\"; errno = %d; %s", textOf(DebugLog),

@@ -1,8 +1,8 @@
 #ifndef ZRM_LOG_MANAGER_H
 #define ZRM_LOG_MANAGER_H
 
-#include "agent/framework/Pulse.h"
-#include "logmgr/ValidLog.h"
+#include "framework/Pulse.h"
+#include "logs/ValidLog.h"
 
 #include <atomic>
 #include <cstddef>
@@ -122,6 +122,10 @@ private:
     /// to the building of the objects.
     std::atomic<ValidLog*> FirstValidLog{nullptr};
 };
+
+/// The one log manager; null until start-up created it. Atomic, since its own threads already run
+/// when start-up stores it. Never cleared.
+extern std::atomic<LogManager*> pTheLogManager;
 
 /// The manager thread's start routine; its argument is the LogManager.
 void* managerThread(void* manager);

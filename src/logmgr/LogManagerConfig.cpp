@@ -1,9 +1,9 @@
 // The configuration of LogManager: the chain of valid logs is read from the log configuration or,
 // where that has none, from the syslog configuration.
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
-#include "logmgr/LogManagerUtil.h"
+#include "logs/LogManagerUtil.h"
 
 #include <cstdlib>
 #include <new>

@@ -1,7 +1,7 @@
 // The refresh of LogManager: monitoring objects are built and deleted to fit the configuration.
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
 #include "logtypes/createLogFile.h"
 #include "monitor/LogFile.h"

@@ -1,11 +1,11 @@
 // The manager thread of LogManager: its start and stop, its loop, signals and waits.
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/agent_calls.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "framework/agent_calls.h"
 #include "logmgr/LogManager.h"
-#include "logmgr/LogManagerUtil.h"
 #include "logmgr/ManagerCancellation.h"
+#include "logs/LogManagerUtil.h"
 
 #include <cstdlib>
 

@@ -1,7 +1,7 @@
 #include "logtypes/AdminLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "monitor/DescriptorReserve.h"
 
 #include <cerrno>

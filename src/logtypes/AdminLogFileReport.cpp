@@ -1,10 +1,10 @@
 #include "logtypes/AdminLogFile.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/cancellation.h"
+#include "base/TraceScope.h"
+#include "framework/cancellation.h"
+#include "logs/RequestThresholds.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <cstring>

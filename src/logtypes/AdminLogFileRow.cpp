@@ -1,11 +1,11 @@
 #include "logtypes/AdminLogFile.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/locale.h"
-#include "monitor/BrevanTime.h"
-#include "monitor/RowBytes.h"
-#include "monitor/UTF8Conv.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "base/BrevanTime.h"
+#include "base/RowBytes.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <charconv>

@@ -1,7 +1,7 @@
 #ifndef ZRM_CHILD_PROCESS_H
 #define ZRM_CHILD_PROCESS_H
 
-#include "agent/ErrorText.h"
+#include "base/ErrorText.h"
 
 #include <sys/types.h>
 

@@ -1,6 +1,6 @@
 #include "logtypes/EntryTime.h"
 
-#include "parser/DigitPairs.h"
+#include "base/DigitPairs.h"
 
 #include <cstdio>
 #include <cstring>

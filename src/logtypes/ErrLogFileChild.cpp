@@ -1,7 +1,7 @@
 #include "logtypes/ErrLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "logtypes/ChildProcess.h"
 
 #include <cerrno>

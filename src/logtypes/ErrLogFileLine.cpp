@@ -1,10 +1,10 @@
 #include "logtypes/ErrLogFile.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/locale.h"
-#include "agent/zrmmain.h"
-#include "monitor/UTF8Conv.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "base/ProcessValues.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <cctype>

@@ -1,11 +1,11 @@
 #include "logtypes/ErrLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/cancellation.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "framework/cancellation.h"
+#include "logs/RequestThresholds.h"
 #include "logtypes/ChildProcess.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
 
 #include <cerrno>
 #include <cstring>

@@ -1,7 +1,7 @@
 #include "logtypes/QuarterHour.h"
 
-#include "monitor/BrevanTime.h"
-#include "parser/DigitPairs.h"
+#include "base/BrevanTime.h"
+#include "base/DigitPairs.h"
 
 #include <cstring>
 

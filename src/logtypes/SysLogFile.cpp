@@ -1,13 +1,13 @@
 #include "logtypes/SysLogFile.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/locale.h"
-#include "logmgr/ValidLog.h"
+#include "base/BrevanTime.h"
+#include "base/RowBytes.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
+#include "logs/ValidLog.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SyslogBufferInfo.h"
-#include "monitor/BrevanTime.h"
-#include "monitor/RowBytes.h"
-#include "monitor/UTF8Conv.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <array>

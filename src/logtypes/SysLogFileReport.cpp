@@ -1,10 +1,10 @@
 #include "logtypes/SysLogFile.h"
 
-#include "agent/TraceScope.h"
+#include "base/BrevanTime.h"
+#include "base/TraceScope.h"
+#include "logs/RequestThresholds.h"
 #include "logtypes/SyslogBufferInfo.h"
-#include "monitor/BrevanTime.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
 
 #include <algorithm>
 #include <cstdint>

@@ -1,13 +1,13 @@
 #include "logtypes/UserLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/locale.h"
-#include "logmgr/ValidLog.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
+#include "logs/ValidLog.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/EntryTimeBuffers.h"
-#include "monitor/UTF8Conv.h"
 #include "parser/StringParser.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <cerrno>
 #include <iterator>

@@ -1,7 +1,7 @@
 #ifndef ZRM_USER_LOG_FILE_H
 #define ZRM_USER_LOG_FILE_H
 
-#include "agent/framework/locks.h"
+#include "framework/locks.h"
 #include "monitor/LogFile.h"
 
 #include <cstdint>

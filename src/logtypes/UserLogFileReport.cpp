@@ -1,12 +1,12 @@
 #include "logtypes/UserLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "logs/RequestThresholds.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/EntryTime.h"
 #include "logtypes/UserlogBufferInfo.h"
 #include "monitor/ReportOutcome.h"
-#include "tables/RequestThresholds.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <cerrno>

@@ -1,7 +1,7 @@
 #include "logtypes/UserLogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "logtypes/EntryTime.h"
 #include "logtypes/EntryTimeBuffers.h"
 #include "logtypes/UserlogBufferInfo.h"

@@ -1,6 +1,6 @@
 #include "logtypes/createLogFile.h"
 
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/ErrLogFile.h"
 #include "logtypes/SysLogFile.h"

@@ -1,12 +1,12 @@
 #include "monitor/LogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
-#include "logmgr/LogManagerUtil.h"
-#include "logmgr/ValidLog.h"
-#include "monitor/BrevanTime.h"
-#include "monitor/RowBytes.h"
+#include "base/BrevanTime.h"
+#include "base/ErrorText.h"
+#include "base/ProcessValues.h"
+#include "base/RowBytes.h"
+#include "base/TraceScope.h"
+#include "logs/LogManagerUtil.h"
+#include "logs/ValidLog.h"
 
 #include <algorithm>
 #include <cstdlib>

@@ -1,14 +1,14 @@
 #ifndef ZRM_LOG_FILE_H
 #define ZRM_LOG_FILE_H
 
-#include "agent/framework/Pulse.h"
-#include "logmgr/LogBase.h"
+#include "framework/Pulse.h"
+#include "logs/LogBase.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogBufferInfo.h"
 #include "monitor/LogLedger.h"
 #include "monitor/MonitorStatus.h"
 #include "monitor/ReadGuard.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <atomic>
 #include <chrono>
@@ -27,6 +27,17 @@ class ValidLog;
 /// constructors end with startThread, their destructors begin with stopThread.
 class LogFile : public LogBase {
 public:
+    /// Takes fresh rows of a log, `count` of them, back to back, on the log's thread. It may write
+    /// the columns of the thresholds. Returns TABLE_NO_ROOM when nothing was offered, since the
+    /// framework has no room; other statuses do not concern the log.
+    using RowReceiver = unsigned (*)(zrm_rmlogent_data_t* rows, int count);
+    /// Names the receiver of the rows of all logs; with null they go nowhere. Called while no log
+    /// has a thread.
+    static void setRowReceiver(RowReceiver receiver) noexcept { m_rowReceiver = receiver; }
+    /// Names the open debug log of all logs, or null. The stream stays open as long as a log that
+    /// may write to it.
+    static void setDebugLog(std::FILE* stream) noexcept;
+
     /// Copies the configuration line and joins the chain of logs behind `chainHead` (null: none).
     LogFile(const ValidLog& log, LogFile* chainHead);
     LogFile(const LogFile&) = delete;
@@ -141,6 +152,7 @@ protected:
 
     static pthread_mutex_t m_debugFileLock;
     Pulse m_pulse{fileNameUTF8(), &NumEvents};
+    static std::atomic<std::FILE*> m_debugLog;
     LogLedger m_ledger; ///< lives as long as the object: through every refresh that keeps it
 
 private:
@@ -159,6 +171,8 @@ private:
 
     void passOverRest();
     bool hasWaitedEnough() noexcept;
+
+    static inline RowReceiver m_rowReceiver = nullptr;
 
     bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
     // The thread's.

@@ -1,9 +1,7 @@
 #include "monitor/LogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
-#include "logmgr/LogManager.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "monitor/DebugLogLoss.h"
 
 #include <atomic>
@@ -46,6 +44,11 @@ std::uint64_t DebugLogLoss::records() noexcept {
 }
 
 pthread_mutex_t LogFile::m_debugFileLock = PTHREAD_MUTEX_INITIALIZER;
+std::atomic<std::FILE*> LogFile::m_debugLog{nullptr};
+
+void LogFile::setDebugLog(std::FILE* stream) noexcept {
+    m_debugLog = stream;
+}
 
 void LogFile::lockDebugFile(const char* who) {
     TraceScope trace(anchor);
@@ -76,8 +79,7 @@ std::FILE* LogFile::debugLogStream() const {
     if (debugMode() != 'Y') {
         return nullptr;
     }
-    const LogManager* const logManager = pTheLogManager;
-    return logManager != nullptr ? logManager->debugLogStream() : nullptr;
+    return m_debugLog.load();
 }
 
 void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const void* data2,

@@ -1,8 +1,8 @@
 #include "monitor/LogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/cancellation.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "framework/cancellation.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>

@@ -1,11 +1,9 @@
 #include "monitor/LogFile.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/framework/EventRoom.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "framework/EventRoom.h"
 #include "monitor/DescriptorReserve.h"
-#include "tables/TableDescription.h"
-#include "tables/zrm_rmlogent_manager.h"
 
 #include <cerrno>
 #include <cstring>
@@ -183,8 +181,8 @@ bool LogFile::readGrowth() {
 
 bool LogFile::offer(zrm_rmlogent_data_t* row) {
     for (;;) {
-        if (EventRoom::mayOffer() && zrm_rmlogent_manager::EventArrived(row, 1) != TABLE_NO_ROOM)
-            [[likely]] {
+        if (EventRoom::mayOffer() &&
+            (m_rowReceiver == nullptr || m_rowReceiver(row, 1) != TABLE_NO_ROOM)) [[likely]] {
             return true;
         }
         m_pulse.work("waits for room in the queue of events");

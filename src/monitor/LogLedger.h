@@ -1,7 +1,7 @@
 #ifndef ZRM_LOG_LEDGER_H
 #define ZRM_LOG_LEDGER_H
 
-#include "agent/framework/locks.h"
+#include "framework/locks.h"
 #include "monitor/FileIdentity.h"
 
 #include <atomic>

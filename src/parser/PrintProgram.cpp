@@ -1,6 +1,6 @@
 #include "parser/PrintProgram.h"
 
-#include "parser/DigitPairs.h"
+#include "base/DigitPairs.h"
 #include "parser/DirectiveRules.h"
 
 #include <algorithm>

@@ -1,6 +1,6 @@
 #include "parser/StringParser.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "parser/DirectiveRules.h"
 
 #include <cstdio>

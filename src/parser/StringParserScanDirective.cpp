@@ -1,7 +1,7 @@
 #include "parser/StringParser.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
 #include "parser/DirectiveRules.h"
 
 #include <cerrno>

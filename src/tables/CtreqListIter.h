@@ -1,7 +1,7 @@
 #ifndef ZRM_CTREQ_LIST_ITER_H
 #define ZRM_CTREQ_LIST_ITER_H
 
-#include "agent/framework/LinkedList.h"
+#include "framework/LinkedList.h"
 
 /// Walks a table manager's open requests, while its lock is held.
 class CtreqListIter : public LinkedListIter {

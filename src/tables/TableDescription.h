@@ -1,7 +1,7 @@
 #ifndef ZRM_TABLE_DESCRIPTION_H
 #define ZRM_TABLE_DESCRIPTION_H
 
-#include "agent/framework/filters.h"
+#include "framework/filters.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -11,9 +11,6 @@
 // Statuses that the tables give to the framework.
 inline constexpr unsigned TABLE_NO_MANAGER = 0x21060002;
 inline constexpr unsigned TABLE_NO_SUCH_COLUMN = 0x21060007;
-/// The framework has no room now: nothing was offered. To the logs alone.
-inline constexpr unsigned TABLE_NO_ROOM = 0x21060008;
-
 /// One column of a table's row record.
 struct TableColumn {
     std::string_view name;    ///< upper-case name, by which conditions refer to the column

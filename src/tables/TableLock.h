@@ -1,7 +1,7 @@
 #ifndef ZRM_TABLE_LOCK_H
 #define ZRM_TABLE_LOCK_H
 
-#include "agent/framework/TableManager.h"
+#include "framework/TableManager.h"
 
 /// Holds a table manager's lock; lives on the stack of one thread.
 class TableLock {

@@ -1,9 +1,9 @@
 #ifndef ZRM_TABLE_OPERATIONS_H
 #define ZRM_TABLE_OPERATIONS_H
 
-#include "agent/framework/TableManager.h"
-#include "agent/framework/ctreq.h"
-#include "agent/framework/values.h"
+#include "framework/TableManager.h"
+#include "framework/ctreq.h"
+#include "framework/values.h"
 #include "tables/CtreqListIter.h"
 #include "tables/TableDescription.h"
 #include "tables/TableLock.h"

@@ -1,7 +1,7 @@
 #include "tables/TableRequest.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/TableManager.h"
+#include "base/TraceScope.h"
+#include "framework/TableManager.h"
 
 #include <cstring>
 

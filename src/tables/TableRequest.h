@@ -1,8 +1,8 @@
 #ifndef ZRM_TABLE_REQUEST_H
 #define ZRM_TABLE_REQUEST_H
 
-#include "agent/framework/ctreq.h"
-#include "agent/framework/trace.h"
+#include "framework/ctreq.h"
+#include "framework/trace.h"
 #include "tables/TableDescription.h"
 
 /// What the row holders of both tables share: everything that follows from the description of the

@@ -1,7 +1,6 @@
 #include "tables/zrm_rmlogent_agent.h"
 
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
+#include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
 
 #include <cstdlib>

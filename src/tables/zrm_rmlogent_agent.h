@@ -1,8 +1,8 @@
 #ifndef ZRM_RMLOGENT_AGENT_H
 #define ZRM_RMLOGENT_AGENT_H
 
-#include "monitor/Timestamp.h"
-#include "tables/RequestThresholds.h"
+#include "logs/RequestThresholds.h"
+#include "tables/Timestamp.h"
 #include "tables/zrm_rmlogent_base.h"
 
 #include <memory>

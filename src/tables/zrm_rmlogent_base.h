@@ -1,8 +1,8 @@
 #ifndef ZRM_RMLOGENT_BASE_H
 #define ZRM_RMLOGENT_BASE_H
 
+#include "logs/zrm_rmlogent_data.h"
 #include "tables/TableRequest.h"
-#include "tables/zrm_rmlogent_data.h"
 
 /// Row holder of the Log Entries table: describes the table and filters the rows that are offered
 /// to a request. Owned by the framework; its rows arrive on the logs' threads, one at a time under

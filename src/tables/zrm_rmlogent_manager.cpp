@@ -1,7 +1,7 @@
 #include "tables/zrm_rmlogent_manager.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/EventRoom.h"
+#include "base/TraceScope.h"
+#include "framework/EventRoom.h"
 #include "tables/TableOperations.h"
 #include "tables/zrm_rmlogent_agent.h"
 

@@ -1,8 +1,8 @@
 #ifndef ZRM_RMLOGENT_MANAGER_H
 #define ZRM_RMLOGENT_MANAGER_H
 
-#include "agent/framework/TableManager.h"
-#include "tables/zrm_rmlogent_data.h"
+#include "framework/TableManager.h"
+#include "logs/zrm_rmlogent_data.h"
 
 /// Manager of the Log Entries table: creates its request objects and hands fresh rows to every
 /// open situation. One per process, never destroyed.

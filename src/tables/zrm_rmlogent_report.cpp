@@ -1,12 +1,12 @@
 // The report side of a Log Entries request: which log, which time window, and the rows.
 
-#include "agent/TraceScope.h"
-#include "agent/framework/values.h"
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/values.h"
 #include "logmgr/LogManager.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
-#include "monitor/UTF8Conv.h"
 #include "tables/zrm_rmlogent_agent.h"
 
 #include <algorithm>

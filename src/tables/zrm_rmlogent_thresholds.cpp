@@ -1,6 +1,6 @@
 // The frequency and period thresholds of a situation, read from its conditions.
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "tables/zrm_rmlogent_agent.h"
 
 #include <algorithm>

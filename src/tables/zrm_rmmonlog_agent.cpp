@@ -1,10 +1,10 @@
 #include "tables/zrm_rmmonlog_agent.h"
 
-#include "agent/ErrorText.h"
-#include "agent/TraceScope.h"
-#include "agent/zrmmain.h"
+#include "base/BrevanTime.h"
+#include "base/ErrorText.h"
+#include "base/ProcessValues.h"
+#include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
-#include "monitor/BrevanTime.h"
 #include "monitor/LogFile.h"
 
 #include <algorithm>

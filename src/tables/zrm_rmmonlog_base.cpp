@@ -1,6 +1,6 @@
 #include "tables/zrm_rmmonlog_base.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 
 namespace {
 

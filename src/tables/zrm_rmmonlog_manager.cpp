@@ -1,6 +1,6 @@
 #include "tables/zrm_rmmonlog_manager.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "tables/TableOperations.h"
 #include "tables/zrm_rmmonlog_agent.h"
 

@@ -1,7 +1,7 @@
 #ifndef ZRM_RMMONLOG_MANAGER_H
 #define ZRM_RMMONLOG_MANAGER_H
 
-#include "agent/framework/TableManager.h"
+#include "framework/TableManager.h"
 #include "tables/zrm_rmmonlog_data.h"
 
 /// Manager of the Monitored Logs table: creates its request objects. One per process, never

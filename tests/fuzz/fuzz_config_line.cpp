@@ -1,5 +1,5 @@
-#include "logmgr/LogManagerUtil.h"
-#include "logmgr/ValidLog.h"
+#include "logs/LogManagerUtil.h"
+#include "logs/ValidLog.h"
 
 #include <cstdint>
 #include <cstdlib>

@@ -1,8 +1,8 @@
 // Lines of the error log's command: the fields go into a row on the heap, where a step past it is
 // found.
 
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/ErrLogFile.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <cstddef>

@@ -1,8 +1,8 @@
-#include "agent/zrmmain.h"
-#include "logmgr/ValidLog.h"
+#include "base/ProcessValues.h"
+#include "logs/ValidLog.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/UserLogFile.h"
 #include "logtypes/UserlogBufferInfo.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <cstdint>
 #include <cstdlib>

@@ -1,4 +1,4 @@
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
 #include "host/diagnose/FormatTrial.h"
 
 #include <cstdint>

@@ -1,4 +1,4 @@
-#include "host/http/ReportRequest.h"
+#include "host/api/ReportRequest.h"
 #include "host/http/RequestRefused.h"
 
 #include <cstdint>

@@ -1,4 +1,4 @@
-#include "host/http/SampleRequest.h"
+#include "host/api/SampleRequest.h"
 
 #include <cstdint>
 #include <cstdlib>

@@ -1,7 +1,7 @@
+#include "host/api/SituationBody.h"
 #include "host/config/ConfigFile.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
-#include "host/situations/SituationBody.h"
 #include "host/situations/SituationJson.h"
 
 #include <cstdint>

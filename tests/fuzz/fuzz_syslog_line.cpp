@@ -1,7 +1,7 @@
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
 #include "logtypes/SyslogBufferInfo.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <cstdint>
 #include <cstdio>

@@ -1,4 +1,4 @@
-#include "host/config/TimeText.h"
+#include "host/base/TimeText.h"
 
 #include <cstdint>
 #include <cstdlib>

@@ -1,5 +1,5 @@
-#include "monitor/BrevanTime.h"
-#include "monitor/Timestamp.h"
+#include "base/BrevanTime.h"
+#include "tables/Timestamp.h"
 
 #include <algorithm>
 #include <cstdint>

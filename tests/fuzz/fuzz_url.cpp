@@ -1,6 +1,6 @@
-#include "host/framework/Utf8.h"
+#include "host/base/UrlText.h"
+#include "host/base/Utf8.h"
 #include "host/http/Router.h"
-#include "host/http/UrlText.h"
 
 #include <cstdint>
 #include <cstdlib>

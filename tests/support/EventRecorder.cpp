@@ -1,5 +1,7 @@
 #include "support/EventRecorder.h"
 
+#include "monitor/LogFile.h"
+
 #include <chrono>
 #include <condition_variable>
 #include <mutex>
@@ -18,6 +20,33 @@ Recorder& recorder() {
     static auto* const theRecorder = new Recorder; // log threads may outlive main's objects
     return *theRecorder;
 }
+
+unsigned receive(zrm_rmlogent_data_t* rows, int count) {
+    std::function<void(std::size_t)> action;
+    std::size_t rowCount = 0;
+    bool writesThresholds = false;
+    {
+        const std::lock_guard guard(recorder().mutex);
+        recorder().rows.insert(recorder().rows.end(), rows, rows + count);
+        rowCount = recorder().rows.size();
+        action = recorder().action;
+        writesThresholds = recorder().writesThresholds;
+    }
+    for (int i = 0; i < count && writesThresholds; ++i) {
+        rows[i].freqthresh = 5;
+        rows[i].periodthrs = 60;
+    }
+    recorder().changed.notify_all();
+    if (action) {
+        action(rowCount);
+    }
+    return 0;
+}
+
+[[maybe_unused]] const bool isInstalled = [] {
+    LogFile::setRowReceiver(receive);
+    return true;
+}();
 
 } // namespace
 
@@ -48,32 +77,4 @@ std::vector<zrm_rmlogent_data_t> EventRecorder::waitForRows(std::size_t count, i
     recorder().changed.wait_for(lock, std::chrono::seconds(seconds),
                                 [&] { return recorder().rows.size() >= count; });
     return recorder().rows;
-}
-
-// zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t*, int) under its linker name.
-extern "C" unsigned
-__wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlogent_data_t* rows,
-                                                                       int count);
-extern "C" unsigned
-__wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(zrm_rmlogent_data_t* rows,
-                                                                       int count) {
-    std::function<void(std::size_t)> action;
-    std::size_t rowCount = 0;
-    bool writesThresholds = false;
-    {
-        const std::lock_guard guard(recorder().mutex);
-        recorder().rows.insert(recorder().rows.end(), rows, rows + count);
-        rowCount = recorder().rows.size();
-        action = recorder().action;
-        writesThresholds = recorder().writesThresholds;
-    }
-    for (int i = 0; i < count && writesThresholds; ++i) {
-        rows[i].freqthresh = 5;
-        rows[i].periodthrs = 60;
-    }
-    recorder().changed.notify_all();
-    if (action) {
-        action(rowCount);
-    }
-    return 0;
 }

@@ -1,7 +1,7 @@
 #ifndef ZRM_TESTS_EVENT_RECORDER_H
 #define ZRM_TESTS_EVENT_RECORDER_H
 
-#include "tables/zrm_rmlogent_data.h"
+#include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
 #include <functional>
@@ -9,8 +9,8 @@
 #include <string_view>
 #include <vector>
 
-/// Stands in for zrm_rmlogent_manager::EventArrived in the programs that are linked with
-/// zrm_record_events(): keeps a copy of every row that a log's thread hands over.
+/// The receiver of the rows of all logs in the programs that are linked with zrm_record_events():
+/// keeps a copy of every row that a log's thread hands over.
 namespace EventRecorder {
 
 void clear();

@@ -1,7 +1,7 @@
 #ifndef ZRM_TESTS_RECORDING_TRACE_H
 #define ZRM_TESTS_RECORDING_TRACE_H
 
-#include "agent/framework/trace.h"
+#include "framework/trace.h"
 
 #include <string>
 #include <vector>

@@ -1,7 +1,7 @@
 #ifndef ZRM_TESTS_TEST_VALID_LOG_H
 #define ZRM_TESTS_TEST_VALID_LOG_H
 
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 
 #include <memory>
 #include <stdexcept>

@@ -1,6 +1,5 @@
 #include "FrameworkDouble.h"
 
-#include "agent/zrmmain.h"
 #include "logmgr/LogManager.h"
 
 #include <gtest/gtest.h>

@@ -2,7 +2,8 @@
 
 #include "agent/zrmmain.h"
 
-#include "agent/framework/trace.h"
+#include "base/ProcessValues.h"
+#include "framework/trace.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 

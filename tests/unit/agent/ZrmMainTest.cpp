@@ -4,7 +4,8 @@
 #include "agent/zrmmain.h"
 
 #include "FrameworkDouble.h"
-#include "agent/framework/trace.h"
+#include "base/ProcessValues.h"
+#include "framework/trace.h"
 #include "logmgr/LogManager.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"

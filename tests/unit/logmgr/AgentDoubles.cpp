@@ -1,6 +1,6 @@
 #include "AgentDoubles.h"
 
-#include "logmgr/ValidLog.h"
+#include "logs/ValidLog.h"
 #include "monitor/LogFile.h"
 
 #include <atomic>
@@ -108,11 +108,4 @@ extern "C" void __wrap__Z13RPC1_ShutdownPj(unsigned* status);
 extern "C" void __wrap__Z13RPC1_ShutdownPj(unsigned* status) {
     ++g_shutdowns;
     *status = 0;
-}
-
-extern "C" unsigned __wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(void*,
-                                                                                           int);
-extern "C" unsigned __wrap__ZN20zrm_rmlogent_manager12EventArrivedEP19zrm_rmlogent_data_ti(void*,
-                                                                                           int) {
-    return 0;
 }

@@ -1,8 +1,8 @@
 #include "LogManagerFixture.h"
 
 #include "AgentDoubles.h"
-#include "LocaleDouble.h"
 #include "logtypes/createLogFile.h"
+#include "support/LocaleDouble.h"
 
 #include <algorithm>
 #include <chrono>

@@ -3,7 +3,7 @@
 
 #include "logmgr/LogManager.h"
 
-#include "agent/framework/trace.h"
+#include "framework/trace.h"
 #include "monitor/LogFile.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"

@@ -2,14 +2,14 @@
 #define ZRM_TESTS_LOG_TYPE_TEST_H
 
 #include "DebugLogRecorder.h"
-#include "LocaleDouble.h"
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
+#include "logs/RequestThresholds.h"
 #include "monitor/LogFile.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
+#include "support/LocaleDouble.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
-#include "tables/RequestThresholds.h"
 
 #include <gtest/gtest.h>
 

@@ -1,6 +1,6 @@
 #include "logtypes/QuarterHour.h"
 
-#include "monitor/BrevanTime.h"
+#include "base/BrevanTime.h"
 #include "support/Faults.h"
 #include "support/TimeZone.h"
 

@@ -3,8 +3,8 @@
 
 #include "SyslogTest.h"
 
+#include "logs/RequestThresholds.h"
 #include "logtypes/SyslogBufferInfo.h"
-#include "tables/RequestThresholds.h"
 
 #include <cstring>
 #include <string>

@@ -3,10 +3,10 @@
 
 #include "logtypes/SysLogFile.h"
 
-#include "LocaleDouble.h"
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
+#include "support/LocaleDouble.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TestValidLog.h"

@@ -3,17 +3,17 @@
 
 #include "logtypes/UserLogFile.h"
 
-#include "LocaleDouble.h"
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
+#include "logs/RequestThresholds.h"
 #include "logtypes/EntryTimeBuffers.h"
 #include "logtypes/UserlogBufferInfo.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
+#include "support/LocaleDouble.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TestValidLog.h"
 #include "support/TimeZone.h"
-#include "tables/RequestThresholds.h"
 
 #include <gtest/gtest.h>
 

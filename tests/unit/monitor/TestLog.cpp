@@ -1,6 +1,6 @@
 #include "TestLog.h"
 
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
 
 #include <algorithm>
 #include <chrono>

@@ -3,9 +3,9 @@
 
 #include "monitor/LogFile.h"
 
-#include "LocaleDouble.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
+#include "support/LocaleDouble.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TestValidLog.h"

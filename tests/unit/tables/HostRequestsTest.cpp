@@ -3,10 +3,10 @@
 #include "tables/zrm_rmlogent_manager.h"
 #include "tables/zrm_rmmonlog_manager.h"
 
+#include "base/BrevanTime.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
 #include "host/framework/Tables.h"
-#include "monitor/BrevanTime.h"
 
 #include "AllocationCount.h"
 #include "TestLogs.h"

@@ -1,6 +1,6 @@
 // A locale whose code page is ISO 8859-1, so that a conversion shows against a copy.
 
-#include "agent/framework/locale.h"
+#include "framework/locale.h"
 
 #include <cstring>
 #include <string>

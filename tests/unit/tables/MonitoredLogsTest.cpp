@@ -3,7 +3,7 @@
 #include "tables/zrm_rmmonlog_agent.h"
 #include "tables/zrm_rmmonlog_manager.h"
 
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
 
 #include "TestLogs.h"
 #include "TestRequest.h"

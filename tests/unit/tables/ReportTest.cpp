@@ -3,7 +3,7 @@
 #include "monitor/ReportOutcome.h"
 #include "tables/zrm_rmlogent_manager.h"
 
-#include "agent/zrmmain.h"
+#include "base/ProcessValues.h"
 
 #include "TestLogs.h"
 #include "TestRequest.h"

@@ -3,8 +3,8 @@
 #include "tables/zrm_rmlogent_base.h"
 #include "tables/zrm_rmlogent_manager.h"
 
-#include "monitor/BrevanTime.h"
-#include "monitor/Timestamp.h"
+#include "base/BrevanTime.h"
+#include "tables/Timestamp.h"
 
 #include "TestLogs.h"
 #include "TestRequest.h"

@@ -1,7 +1,7 @@
 #include "TestLogs.h"
 
-#include "agent/zrmmain.h"
-#include "logmgr/ValidLog.h"
+#include "base/ProcessValues.h"
+#include "logs/ValidLog.h"
 
 #include <cstring>
 

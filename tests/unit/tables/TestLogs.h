@@ -2,9 +2,9 @@
 #define ZRM_TESTS_TEST_LOGS_H
 
 #include "logmgr/LogManager.h"
+#include "logs/RequestThresholds.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "monitor/LogFile.h"
-#include "tables/RequestThresholds.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <memory>
 #include <string>

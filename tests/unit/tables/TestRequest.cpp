@@ -1,10 +1,8 @@
 #include "TestRequest.h"
 
-#include "agent/TraceScope.h"
-#include "agent/framework/TableManager.h"
-#include "host/framework/ConditionSet.h"
-#include "host/framework/FilterList.h"
-#include "host/framework/RequestCounts.h"
+#include "base/TraceScope.h"
+#include "framework/TableManager.h"
+#include "host/framework/Tables.h"
 
 #include <algorithm>
 #include <cstring>
@@ -122,18 +120,6 @@ unsigned ctreq::InsertRow(char* row) {
     return 0;
 }
 
-const ConditionSet& ctreq::conditions() {
-    // None that the framework could judge by itself: every request is offered every row.
-    static const FilterList noFilters({});
-    static const ConditionSet none(noFilters, *this);
-    return none;
-}
-
-RequestCounts& ctreq::counts() noexcept {
-    static RequestCounts counts;
-    return counts;
-}
-
 unsigned ctreq::CheckForException(char* row) {
     const TestRequest& test = m_framework->test;
     return !test.accepts || test.accepts(row) ? 1 : 0;
@@ -202,18 +188,33 @@ ctreq* ctreq::UseHandle(unsigned handle) {
     return request;
 }
 
-// RSC1_Drop and TableManager::RegisterWithManager by their linker names: the first belongs to the
-// handles of the double, the second can be told to fail.
+// The table managers of a framework that offers every row to every request.
+
+class TableManager::Framework {};
+
+TableManager::TableManager(const char* application, const char* table)
+    : m_application(application), m_table(table) {}
+
+TableManager::~TableManager() {
+    Tables::remove(this);
+}
+
+unsigned TableManager::Shutdown(unsigned /*reason*/) {
+    return 0;
+}
+
+LinkedList& TableManager::requestsFor(char* /*row*/, unsigned /*rowSize*/) {
+    return m_requests;
+}
+
+unsigned TableManager::RegisterWithManager(TableManager* manager) {
+    return TestCalls::registrationStatus() != 0 ? TestCalls::registrationStatus()
+                                                : Tables::add(manager);
+}
+
+// By its linker name, since the handles are the double's.
 
 extern "C" void __wrap__Z9RSC1_Dropj(unsigned handle);
 extern "C" void __wrap__Z9RSC1_Dropj(unsigned handle) {
     TestCalls::all().push_back(std::string(liveRequests().at(handle)->name()) + " drop");
-}
-
-extern "C" unsigned __real__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager);
-extern "C" unsigned __wrap__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager);
-extern "C" unsigned __wrap__ZN12TableManager19RegisterWithManagerEPS_(TableManager* manager) {
-    return TestCalls::registrationStatus() != 0
-               ? TestCalls::registrationStatus()
-               : __real__ZN12TableManager19RegisterWithManagerEPS_(manager);
 }

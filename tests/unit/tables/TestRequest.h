@@ -1,7 +1,7 @@
 #ifndef ZRM_TESTS_TEST_REQUEST_H
 #define ZRM_TESTS_TEST_REQUEST_H
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 #include "host/framework/RequestDetail.h"
 
 #include <cstdint>

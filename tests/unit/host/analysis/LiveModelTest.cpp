@@ -4,7 +4,7 @@
 #include "host/analysis/ConditionVerdict.h"
 #include "host/analysis/Replay.h"
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
 #include "host/config/ConditionParser.h"
 #include "host/config/SituationValidator.h"
 #include "host/events/EventQueue.h"

@@ -1,11 +1,11 @@
 #ifndef ZRM_TESTS_ANALYSIS_TEST_LOG_H
 #define ZRM_TESTS_ANALYSIS_TEST_LOG_H
 
+#include "logs/RequestThresholds.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
 #include "support/TestValidLog.h"
-#include "tables/RequestThresholds.h"
-#include "tables/zrm_rmlogent_data.h"
 
 #include <cstddef>
 #include <cstring>

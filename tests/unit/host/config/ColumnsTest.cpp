@@ -1,14 +1,14 @@
 #include "host/config/Columns.h"
 
-#include "agent/framework/ctreq.h"
 #include "agent/zrmmain.h"
+#include "framework/ctreq.h"
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "logmgr/LogManager.h"
 #include "support/RecordingTrace.h"
 #include "tables/zrm_rmlogent_manager.h"
 #include "tables/zrm_rmmonlog_base.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gtest/gtest.h>
 

@@ -1,6 +1,6 @@
 #include "host/framework/TraceCapture.h"
 
-#include "agent/TraceScope.h"
+#include "base/TraceScope.h"
 #include "host/framework/TraceControl.h"
 #include "support/TemporaryDirectory.h"
 

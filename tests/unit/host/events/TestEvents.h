@@ -5,7 +5,7 @@
 #include "host/events/EventRecord.h"
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <deque>
 #include <memory>

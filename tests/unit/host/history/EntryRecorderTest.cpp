@@ -3,7 +3,7 @@
 #include "host/framework/Tables.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

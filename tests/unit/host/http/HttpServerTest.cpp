@@ -1,9 +1,9 @@
 #include "host/http/HttpServer.h"
 
-#include "host/http/HealthResource.h"
+#include "host/api/HealthResource.h"
+#include "host/api/SampleResource.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
-#include "host/http/SampleResource.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
 #include "unit/host/http/TestClient.h"

@@ -1,10 +1,10 @@
 #ifndef ZRM_TESTS_TEST_ROUTER_H
 #define ZRM_TESTS_TEST_ROUTER_H
 
+#include "host/base/UrlText.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Resource.h"
 #include "host/http/Router.h"
-#include "host/http/UrlText.h"
 
 #include <string>
 

@@ -4,10 +4,10 @@
 #include "host/situations/SituationSet.h"
 
 #include "host/events/EventQueue.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
-#include "tables/zrm_rmlogent_data.h"
 #include "tables/zrm_rmlogent_manager.h"
 
 #include <gmock/gmock.h>

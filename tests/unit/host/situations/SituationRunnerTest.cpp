@@ -2,10 +2,10 @@
 
 #include "host/events/EventQueue.h"
 #include "host/framework/LockGuard.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "support/RecordingTrace.h"
-#include "tables/zrm_rmlogent_data.h"
 #include "tables/zrm_rmlogent_manager.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gtest/gtest.h>
 

@@ -1,10 +1,10 @@
 #include "host/situations/SituationSet.h"
 
-#include "agent/framework/ctreq.h"
+#include "framework/ctreq.h"
+#include "logs/zrm_rmlogent_data.h"
 #include "support/RecordingTrace.h"
-#include "tables/zrm_rmlogent_data.h"
 #include "tables/zrm_rmlogent_manager.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,8 +1,8 @@
-#include "agent/framework/agent_calls.h"
+#include "framework/agent_calls.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,13 +1,13 @@
 #include "host/start/Serving.h"
 
-#include "agent/framework/EventRoom.h"
-#include "agent/framework/locks.h"
+#include "framework/EventRoom.h"
+#include "framework/locks.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
 #include "host/start/Watchdog.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
-#include "unit/host_framework/TestTable.h"
+#include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,0 +1,224 @@
+#include "host/api/AnalysisResource.h"
+
+#include "host/analysis/Backtest.h"
+#include "host/analysis/Explainer.h"
+#include "host/analysis/ExplanationJson.h"
+#include "host/analysis/LogTail.h"
+#include "host/analysis/MonitoredLogs.h"
+#include "host/analysis/StoredRow.h"
+#include "host/api/EventQuery.h"
+#include "host/api/SituationBody.h"
+#include "host/base/TimeText.h"
+#include "host/diagnose/LogWarnings.h"
+#include "host/diagnose/LogWatch.h"
+#include "host/framework/TraceCapture.h"
+#include "host/history/HistoryReader.h"
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+#include "host/situations/SituationJson.h"
+#include "monitor/LogFile.h"
+
+#include <limits>
+#include <optional>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+/// The log that a body names, or else the situation's.
+LogFile& logOf(const MonitoredLogs& logs, JsonFields& fields, const SituationConfig& situation) {
+    const std::optional<std::string> path = fields.optionalText("log");
+    if (!path && !situation.log) {
+        fields.refuse("log", "is missing; the situation is not on one log alone");
+    }
+    LogFile* const log = logs.find(path ? *path : *situation.log);
+    if (log == nullptr) {
+        throw RequestRefused(404, "the agent does not monitor this log", "log");
+    }
+    return *log;
+}
+
+void requireOpen(bool isOpen) {
+    if (!isOpen) {
+        throw RequestRefused(503, "there are as many requests as there can be: try again", "");
+    }
+}
+
+std::string timeOf(JsonFields& fields, const char* key) {
+    const std::optional<std::string> stamp = TimeText::toStamp(fields.text(key));
+    if (!stamp) {
+        fields.refuse(key,
+                      "write a time like 2026-11-20T07:03:09, with Z or +01:00 behind it where "
+                      "it is not local, or a 16-digit time stamp");
+    }
+    return *stamp;
+}
+
+} // namespace
+
+void AnalysisResource::addRoutes(Router& router) {
+    router.add("POST", "/api/v1/explain",
+               [this](const HttpRequest& request) { return explain(request); });
+    router.add("POST", "/api/v1/backtest",
+               [this](const HttpRequest& request) { return backtest(request); });
+}
+
+/// The situation that a body names or defines; `otherwise` is the name where it does neither.
+AnalysisResource::Subject AnalysisResource::subject(JsonFields& fields,
+                                                    const std::string& otherwise) {
+    std::optional<std::string> name = fields.optionalText("situation");
+    std::optional<JsonFields> definition = fields.optionalObject("definition");
+    if (!name && !definition && !otherwise.empty()) {
+        name = otherwise;
+    }
+    if (name.has_value() == definition.has_value()) {
+        fields.refuse("situation", "give the name of a situation, or a definition");
+    }
+    if (definition) {
+        return {SituationBody::situation(*definition, "definition")};
+    }
+    const std::optional<SituationStatus> status = m_situations.find(*name);
+    if (!status) {
+        throw RequestRefused(404, "there is no situation '" + *name + "'", "situation");
+    }
+    if (status->state == SituationStatus::FAILED) {
+        throw RequestRefused(409, "the situation has failed: " + status->problem, "situation");
+    }
+    return {status->config, status->state == SituationStatus::STOPPED};
+}
+
+HttpAnswer AnalysisResource::explain(const HttpRequest& request) {
+    JsonFields fields(request.body);
+    const int ways =
+        (fields.has("line") ? 1 : 0) + (fields.has("event") ? 1 : 0) + (fields.has("last") ? 1 : 0);
+    if (ways != 1) {
+        fields.refuse("line", "give one of line, event and last");
+    }
+    const Explained explained = fields.has("line")    ? explainLine(fields)
+                                : fields.has("event") ? explainEvent(fields)
+                                                      : explainLast(fields);
+    Json explanations = Json::array();
+    for (const Explanation& explanation : explained.explanations) {
+        explanations.push_back(ExplanationJson::of(explanation));
+    }
+    Json answer{{"explanations", std::move(explanations)}};
+    explained.reach.addTo(answer);
+    answer["warnings"] = Json::array();
+    for (const LogWarning& warning : m_watch.of(explained.log)) {
+        answer["warnings"].push_back(LogWarnings::json(warning));
+    }
+    return HttpAnswer::json(SituationJson::text(answer));
+}
+
+AnalysisResource::Explained AnalysisResource::explainLine(JsonFields& fields) {
+    Subject wanted = subject(fields);
+    const std::string line = fields.text("line");
+    if (line.size() > LogTail::longestLine || line.find('\n') != std::string::npos) {
+        fields.refuse("line", "write one line of at most " + std::to_string(LogTail::longestLine) +
+                                  " bytes");
+    }
+    const TraceSilence silence;
+    const MonitoredLogs logs;
+    LogFile& log = logOf(logs, fields, wanted.situation);
+    fields.refuseUnknown();
+    if (!LogTail(log).hasLines()) {
+        fields.refuse("line", "the log has no lines; use last");
+    }
+    Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
+    requireOpen(explainer.isOpen());
+    std::vector<Explanation> explanations = explainer.line(log, line);
+    if (!explainer.problem().empty()) {
+        throw RequestRefused(503, explainer.problem(), "line");
+    }
+    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
+}
+
+AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
+    Subject wanted = subject(fields);
+    const auto number = static_cast<std::size_t>(
+        fields.number("last", 1, static_cast<std::int64_t>(Explainer::mostEntries)));
+    const TraceSilence silence;
+    const MonitoredLogs logs;
+    LogFile& log = logOf(logs, fields, wanted.situation);
+    fields.refuseUnknown();
+    Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
+    requireOpen(explainer.isOpen());
+    std::vector<Explanation> explanations = explainer.last(log, number);
+    if (!explainer.problem().empty()) {
+        throw RequestRefused(409, explainer.problem(), "log");
+    }
+    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
+}
+
+AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
+    const auto id = static_cast<std::uint64_t>(
+        fields.number("event", 1, std::numeric_limits<std::int64_t>::max()));
+    if (m_history == nullptr) {
+        throw RequestRefused(409, "the history is off", "event");
+    }
+    const std::optional<StoredEvent> event =
+        EventQuery::reading([&] { return m_history->event(id); });
+    if (!event) {
+        throw RequestRefused(404, "the history holds no such event", "event");
+    }
+    const bool isNamed = !fields.has("definition");
+    Subject wanted = subject(fields, event->situation);
+    fields.refuseUnknown();
+    const bool isOwn = isNamed && wanted.situation.name == event->situation;
+    const TraceSilence silence;
+    Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
+    requireOpen(explainer.isOpen());
+    Explainer::EventEntry entry{id, isOwn, {}};
+    if (!StoredRow::fill(entry.row, explainer.layout(), event->json)) {
+        throw RequestRefused(500, "the event has no row", "event");
+    }
+    const MonitoredLogs logs;
+    std::vector<Explanation> explanations{explainer.event(logs.find(event->log), entry)};
+    return {std::move(explanations), explainer.reach(), event->log};
+}
+
+HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
+    JsonFields fields(request.body);
+    const Subject wanted = subject(fields);
+    const std::string from = timeOf(fields, "from");
+    const std::string to = timeOf(fields, "to");
+    fields.refuseUnknown();
+    if (from > to) {
+        fields.refuse("to", "lies before from");
+    }
+    if (!m_room.try_acquire()) {
+        throw RequestRefused(503, "two backtests are under way already: try again", "");
+    }
+    struct Release {
+        std::counting_semaphore<2>& room;
+        ~Release() { room.release(); }
+    } const release{m_room};
+    const TraceSilence silence;
+    const MonitoredLogs logs;
+    std::vector<LogFile*> read;
+    if (wanted.situation.log) {
+        read.push_back(logs.find(*wanted.situation.log));
+        if (read.front() == nullptr) {
+            throw RequestRefused(404, "the agent does not monitor the situation's log", "log");
+        }
+    } else {
+        read = logs.all();
+    }
+    Backtest test(wanted.situation, m_entries);
+    requireOpen(test.isOpen());
+    const Backtest::Result result = test.run(read, from, to, [&] {
+        return m_isCancelled.load(std::memory_order_relaxed) || logs.areWanted();
+    });
+    if (result.isTruncated && logs.areWanted()) {
+        throw RequestRefused(503, "the agent reads its configuration of logs again: try again", "");
+    }
+    Json answer{{"entries", result.entries},    {"matched", result.matched},
+                {"raised", result.raised},      {"truncated", result.isTruncated},
+                {"raised_at", result.raisedAt}, {"decision", result.decision}};
+    result.reach.addTo(answer);
+    return HttpAnswer::json(SituationJson::text(answer));
+}

@@ -1,0 +1,141 @@
+#include "host/api/DiagnoseResource.h"
+
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "host/diagnose/ConfigCheck.h"
+#include "host/diagnose/FormatTrial.h"
+#include "host/diagnose/LastLines.h"
+#include "host/diagnose/LogLedgers.h"
+#include "host/diagnose/MonitoredLogFile.h"
+#include "host/diagnose/UnmonitoredLogs.h"
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace {
+
+TRC1_Anchor anchor{"DiagnoseResource.cpp"};
+
+std::vector<std::string> givenLines(JsonFields& fields) {
+    std::vector<std::string> lines = fields.texts("lines", DiagnoseResource::kMostLines);
+    for (std::size_t i = 0; i < lines.size(); ++i) {
+        if (lines[i].size() > DiagnoseResource::kMostLineBytes) {
+            throw RequestRefused(400, "write lines of at most 16384 bytes",
+                                 fields.place("lines", i));
+        }
+        if (lines[i].find('\n') != std::string::npos) {
+            throw RequestRefused(400, "write each line by itself, without its line end",
+                                 fields.place("lines", i));
+        }
+    }
+    return lines;
+}
+
+/// The last lines of a monitored log: the API shows no other file.
+std::vector<std::string> loggedLines(const JsonFields& fields, const std::string& log,
+                                     std::size_t count) {
+    const std::vector<LogLedgerView> monitored = LogLedgers::read(log);
+    if (log.empty() || monitored.empty()) {
+        fields.refuse("log", "this log is not monitored");
+    }
+    if (monitored[0].type != 'U' && monitored[0].type != 'S') {
+        fields.refuse("log", "this log is no text file");
+    }
+    const MonitoredLogFile file(monitored[0].file, monitored[0].openFile);
+    if (!file.problem().empty()) {
+        throw RequestRefused(409, file.problem(), fields.place("log"));
+    }
+    std::optional<std::vector<std::string>> lines = LastLines::read(file.descriptor(), count);
+    if (!lines) {
+        const ErrorText error(errno);
+        throw RequestRefused(409, std::string("the log cannot be read: ") + error.text(),
+                             fields.place("log"));
+    }
+    return std::move(*lines);
+}
+
+/// An answer holds what every directive reads in every line: how much that is, is bounded here.
+void refuseTooMuch(const JsonFields& fields, const std::string& format, std::string_view log,
+                   const std::vector<std::string>& lines) {
+    std::size_t pieces = 0;
+    for (const std::string& line : lines) {
+        pieces += FormatTrial::piecesOf(line);
+    }
+    const std::size_t directives = FormatTrial(format, log).result().directives.size();
+    if (pieces * directives > DiagnoseResource::kMostValues) {
+        fields.refuse(fields.has("last") ? "last" : "lines",
+                      "try fewer lines: with " + std::to_string(directives) +
+                          " directives there may be " +
+                          std::to_string(DiagnoseResource::kMostValues / directives) +
+                          " pieces of up to 2047 bytes");
+    }
+}
+
+/// Where the configured logs are, monitored or not: elsewhere the API says of no file that it is
+/// there.
+ConfigCheck::Directories logDirectories() {
+    ConfigCheck::Directories directories;
+    const auto add = [&directories](const std::string& path) {
+        if (path.starts_with('/')) {
+            directories.insert(path.substr(0, path.rfind('/') + 1));
+        }
+    };
+    for (const LogLedgerView& log : LogLedgers::read()) {
+        add(log.log);
+    }
+    for (const UnmonitoredLogs::Log& log : UnmonitoredLogs::read().logs) {
+        add(log.log);
+    }
+    return directories;
+}
+
+} // namespace
+
+void DiagnoseResource::addRoutes(Router& router) {
+    router.add("POST", "/api/v1/try", tryFormat);
+    router.add("POST", "/api/v1/check", checkConfig);
+}
+
+HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields fields(request.body);
+    const std::string format = fields.text("format");
+    const std::optional<std::string> log = fields.optionalText("log");
+    const auto last =
+        fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::kMostLines));
+    const bool hasLines = fields.has("lines");
+    std::vector<std::string> lines = givenLines(fields);
+    fields.refuseUnknown();
+    if (hasLines && last) {
+        fields.refuse("last", "write either lines, or log and last");
+    }
+    if (last && !log) {
+        fields.refuse("log", "is missing: last counts the lines of a log");
+    }
+    if (last) {
+        lines = loggedLines(fields, *log, static_cast<std::size_t>(*last));
+    }
+    const bool isNamed = log && !log->empty();
+    const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::kSomeLog;
+    refuseTooMuch(fields, format, name, lines);
+    return HttpAnswer::json(FormatTrial::json(FormatTrial::run(format, lines, name)));
+}
+
+HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    JsonFields fields(request.body);
+    const std::string config = fields.text("config");
+    fields.refuseUnknown();
+    if (static_cast<std::size_t>(std::count(config.begin(), config.end(), '\n')) >
+        kMostConfigLines) {
+        fields.refuse("config", "write at most 10000 lines");
+    }
+    return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config, logDirectories())));
+}

@@ -1,0 +1,170 @@
+#include "host/api/EventsResource.h"
+
+#include "base/TraceScope.h"
+#include "host/api/EventQuery.h"
+#include "host/base/UtcTime.h"
+#include "host/events/RowJson.h"
+#include "host/history/HistoryReader.h"
+#include "host/http/QueryFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+
+#include <algorithm>
+#include <charconv>
+#include <chrono>
+#include <limits>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace {
+
+TRC1_Anchor anchor{"EventsResource.cpp"};
+
+/// The largest id that the history can hold.
+constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max();
+constexpr std::uint64_t defaultEvents = 100;
+constexpr std::uint64_t mostEvents = 1000;
+constexpr std::int64_t minute = 60'000; ///< milliseconds
+constexpr std::int64_t day = 24 * 60 * minute;
+constexpr std::int64_t mostSteps = 2 * 24 * 60;
+
+bool isNewestFirst(QueryFields& query) {
+    const std::string order = query.text("order").value_or("desc");
+    if (order != "asc" && order != "desc") {
+        throw RequestRefused(400, "write asc or desc", "order");
+    }
+    return order == "desc";
+}
+
+EventFilter filterOf(const HttpRequest& request) {
+    QueryFields query(request);
+    EventFilter filter;
+    filter.after = query.number("after", 0, mostId).value_or(0);
+    filter.before = query.number("before", 0, mostId);
+    filter.from = query.time("from");
+    filter.to = query.time("to");
+    EventQuery::readKinds(query, filter);
+    filter.limit = query.number("limit", 1, mostEvents).value_or(defaultEvents);
+    filter.newestFirst = isNewestFirst(query);
+    query.refuseUnknown();
+    return filter;
+}
+
+void append(std::string& text, const LogRates::Counts& counts) {
+    text += '[';
+    for (std::size_t at = 0; at < counts.size(); ++at) {
+        text += at == 0 ? "" : ",";
+        text += counts[at] ? std::to_string(*counts[at]) : "null";
+    }
+    text += ']';
+}
+
+/// The window of rates and its steps: milliseconds.
+struct Window {
+    std::int64_t from;
+    std::int64_t to;
+    std::int64_t step;
+    std::optional<std::string> log; ///< only this one
+};
+
+Window windowOf(const HttpRequest& request) {
+    const auto now = std::chrono::duration_cast<std::chrono::milliseconds>(
+                         std::chrono::system_clock::now().time_since_epoch())
+                         .count();
+    QueryFields query(request);
+    Window window{};
+    window.to = query.time("to").value_or(now);
+    window.from = query.time("from").value_or(window.to - day);
+    window.step = static_cast<std::int64_t>(query.number("step", 60, 86'400).value_or(60)) * 1000;
+    window.log = query.text("log");
+    query.refuseUnknown();
+    if (window.step % minute != 0) {
+        throw RequestRefused(400, "write a multiple of 60 seconds", "step");
+    }
+    if (window.from > window.to) {
+        throw RequestRefused(400, "lies before from", "to");
+    }
+    if ((window.to - window.from) / window.step > mostSteps) {
+        throw RequestRefused(400, "the window has more than 2880 steps", "step");
+    }
+    return window;
+}
+
+} // namespace
+
+void EventsResource::addRoutes(Router& router) {
+    router.add("GET", "/api/v1/events",
+               [this](const HttpRequest& request) { return events(request); });
+    router.add("GET", "/api/v1/events/{id}",
+               [this](const HttpRequest& request) { return event(request); });
+    router.add("GET", "/api/v1/rates",
+               [this](const HttpRequest& request) { return rates(request); });
+}
+
+HttpAnswer EventsResource::events(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    EventFilter filter = filterOf(request);
+    const std::size_t limit = filter.limit++; // one more tells whether there are more
+    const EventPage page = EventQuery::reading([&] { return history.query(filter); });
+    const HistoryState state = EventQuery::reading([&] { return history.state(); });
+    const std::size_t count = std::min(limit, page.events.size());
+    std::string text = "{\"events\":[";
+    for (std::size_t at = 0; at < count; ++at) {
+        text += at == 0 ? "" : ",";
+        text += page.events[at].json;
+    }
+    const std::optional<std::uint64_t> next =
+        page.events.size() > limit ? std::optional(page.events[count - 1].id) : page.reached;
+    text += "],\"next\":" + (next ? std::to_string(*next) : "null") +
+            ",\"oldest\":" + std::to_string(state.oldest) +
+            ",\"newest\":" + std::to_string(state.newest) + ",\"damaged\":[";
+    for (std::size_t at = 0; at < page.damaged.size(); ++at) {
+        text += (at == 0 ? "" : ",") + std::to_string(page.damaged[at]);
+    }
+    return HttpAnswer::json(text + "]}");
+}
+
+HttpAnswer EventsResource::event(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    QueryFields(request).refuseUnknown();
+    const std::string& text = request.captures.front();
+    std::uint64_t id = 0;
+    const char* const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, id);
+    if (error != std::errc() || stop != end || id > mostId) {
+        throw RequestRefused(404, "an event's id is a whole number", "id");
+    }
+    const std::optional<StoredEvent> event = EventQuery::reading([&] { return history.event(id); });
+    if (!event) {
+        throw RequestRefused(404, "the history does not hold this event", "id");
+    }
+    return HttpAnswer::json(event->json);
+}
+
+HttpAnswer EventsResource::rates(const HttpRequest& request) {
+    TraceScope trace(anchor);
+    HistoryReader& history = EventQuery::history(m_history);
+    const Window window = windowOf(request);
+    const Rates rates =
+        EventQuery::reading([&] { return history.rates(window.from, window.to, window.step); });
+    std::string text = "{\"start\":\"" + UtcTime::text(rates.start) +
+                       "\",\"step\":" + std::to_string(rates.step / 1000) + ",\"logs\":[";
+    bool isFirst = true;
+    for (const LogRates& log : rates.logs) {
+        if (window.log && log.log != *window.log) {
+            continue;
+        }
+        text += std::exchange(isFirst, false) ? "{\"log\":" : ",{\"log\":";
+        RowJson::appendText(text, log.log);
+        text += ",\"entries\":";
+        append(text, log.entries);
+        text += ",\"events\":";
+        append(text, log.events);
+        text += '}';
+    }
+    return HttpAnswer::json(text + "]}");
+}

@@ -1,0 +1,32 @@
+#include "host/api/SituationBody.h"
+
+#include "host/http/JsonFields.h"
+#include "host/http/RequestRefused.h"
+
+#include <optional>
+
+SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
+    SituationText text;
+    text.name = fields.optionalText("name");
+    if (!text.name && !name.empty()) {
+        text.name = name;
+    }
+    text.text = fields.optionalText("text");
+    text.severity = fields.optionalText("severity");
+    text.log = fields.optionalText("log");
+    text.when = fields.texts("when", SituationValidator::mostConditions);
+    text.frequency = fields.optionalText("frequency");
+    text.period = fields.optionalText("period");
+    fields.refuseUnknown();
+    return text;
+}
+
+SituationConfig SituationBody::situation(JsonFields& fields, const std::string& name) {
+    SituationConfig situation;
+    const auto problems = SituationValidator::check(text(fields, name), situation);
+    if (!problems.empty()) {
+        const SituationProblem& first = problems.front();
+        throw RequestRefused(400, first.what + "; " + first.cure, fields.place(first.fieldText()));
+    }
+    return situation;
+}

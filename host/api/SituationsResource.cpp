@@ -1,0 +1,162 @@
+#include "host/api/SituationsResource.h"
+
+#include "host/api/SituationBody.h"
+#include "host/http/JsonFields.h"
+#include "host/http/QueryFields.h"
+#include "host/http/RequestRefused.h"
+#include "host/http/Router.h"
+#include "host/situations/SituationJson.h"
+
+#include <optional>
+#include <string>
+#include <utility>
+#include <variant>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+[[noreturn]] void refuse(const SituationRefusal& refusal) {
+    int status = 503;
+    const char* field = "";
+    switch (refusal.reason) {
+    case SituationRefusal::UNKNOWN:
+        status = 404;
+        field = "name";
+        break;
+    case SituationRefusal::EXISTS:
+    case SituationRefusal::FROM_FILE:
+        status = 409;
+        field = "name";
+        break;
+    case SituationRefusal::TOO_MANY:
+        status = 409;
+        break;
+    case SituationRefusal::NOT_SAVED:
+    case SituationRefusal::BUSY:
+        break;
+    }
+    throw RequestRefused(status, refusal.detail, field);
+}
+
+HttpAnswer answerOf(const SituationSet::Change& change) {
+    if (const auto* const refusal = std::get_if<SituationRefusal>(&change)) {
+        refuse(*refusal);
+    }
+    const Json status = SituationJson::status(std::get<SituationStatus>(change));
+    return HttpAnswer::json(SituationJson::text(status));
+}
+
+/// A name as one part of a path.
+std::string encoded(const std::string& name) {
+    constexpr const char* digits = "0123456789ABCDEF";
+    constexpr std::string_view unreserved =
+        "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-._~";
+    std::string text;
+    for (const char c : name) {
+        if (unreserved.find(c) != std::string_view::npos) {
+            text += c;
+        } else {
+            const auto byte = static_cast<unsigned char>(c);
+            text += {'%', digits[byte >> 4], digits[byte & 0x0f]};
+        }
+    }
+    return text;
+}
+
+} // namespace
+
+void SituationsResource::addRoutes(Router& router) {
+    const auto answer = [&](const char* method, const char* pattern, auto handler) {
+        router.add(method, pattern, std::move(handler));
+    };
+    answer("GET", "/api/v1/situations", [this](const HttpRequest& request) {
+        QueryFields(request).refuseUnknown();
+        return list();
+    });
+    answer("POST", "/api/v1/situations",
+           [this](const HttpRequest& request) { return add(request); });
+    answer("POST", "/api/v1/situations/validate", &SituationsResource::validate);
+    answer("GET", "/api/v1/situations/{name}",
+           [this](const HttpRequest& request) { return show(request); });
+    answer("PUT", "/api/v1/situations/{name}",
+           [this](const HttpRequest& request) { return replace(request); });
+    answer("DELETE", "/api/v1/situations/{name}",
+           [this](const HttpRequest& request) { return remove(request); });
+    answer("POST", "/api/v1/situations/{name}/start", [this](const HttpRequest& request) {
+        JsonFields(request.body).refuseUnknown();
+        return answerOf(m_situations.start(request.captures.front()));
+    });
+    answer("POST", "/api/v1/situations/{name}/stop", [this](const HttpRequest& request) {
+        JsonFields(request.body).refuseUnknown();
+        return answerOf(m_situations.stop(request.captures.front()));
+    });
+}
+
+HttpAnswer SituationsResource::list() const {
+    Json situations = Json::array();
+    for (const SituationStatus& status : m_situations.list()) {
+        situations.push_back(SituationJson::status(status));
+    }
+    return HttpAnswer::json(SituationJson::text({{"situations", std::move(situations)}}));
+}
+
+HttpAnswer SituationsResource::show(const HttpRequest& request) const {
+    QueryFields(request).refuseUnknown();
+    const std::string& name = request.captures.front();
+    const std::optional<SituationStatus> status = m_situations.find(name);
+    if (!status) {
+        throw RequestRefused(404, "there is no situation '" + name + "'", "name");
+    }
+    return HttpAnswer::json(SituationJson::text(SituationJson::status(*status)));
+}
+
+HttpAnswer SituationsResource::add(const HttpRequest& request) {
+    JsonFields fields(request.body);
+    const SituationConfig situation = SituationBody::situation(fields);
+    HttpAnswer answer = answerOf(m_situations.add(situation));
+    answer.status = 201;
+    answer.headers.emplace_back("Location", "/api/v1/situations/" + encoded(situation.name));
+    return answer;
+}
+
+HttpAnswer SituationsResource::replace(const HttpRequest& request) {
+    const std::string& name = request.captures.front();
+    JsonFields fields(request.body);
+    const SituationConfig situation = SituationBody::situation(fields, name);
+    if (situation.name != name) {
+        throw RequestRefused(400,
+                             "a situation keeps its name: leave it out, or make a new situation "
+                             "and remove this one",
+                             "name");
+    }
+    return answerOf(m_situations.replace(situation));
+}
+
+HttpAnswer SituationsResource::remove(const HttpRequest& request) {
+    JsonFields(request.body).refuseUnknown();
+    if (const auto refusal = m_situations.remove(request.captures.front())) {
+        refuse(*refusal);
+    }
+    return {204, "", ""};
+}
+
+HttpAnswer SituationsResource::validate(const HttpRequest& request) {
+    JsonFields fields(request.body);
+    Json problems = Json::array();
+    try {
+        SituationConfig situation;
+        const SituationText text = SituationBody::text(fields);
+        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+            problems.push_back(
+                {{"field", problem.fieldText()}, {"detail", problem.what + "; " + problem.cure}});
+        }
+    } catch (const RequestRefused& refused) {
+        // A member of the wrong type keeps the others from being read.
+        problems.push_back(
+            {{"field", refused.problem().field}, {"detail", refused.problem().detail}});
+    }
+    return HttpAnswer::json(SituationJson::text({{"problems", std::move(problems)}}));
+}

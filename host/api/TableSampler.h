@@ -1,0 +1,12 @@
+#ifndef ZRM_HOST_TABLE_SAMPLER_H
+#define ZRM_HOST_TABLE_SAMPLER_H
+
+#include "host/api/SampleSource.h"
+
+/// Takes samples of the tables that the agent has registered.
+class TableSampler : public SampleSource {
+public:
+    Rows take(std::string_view table, const std::vector<Condition>& conditions) override;
+};
+
+#endif

@@ -1,0 +1,20 @@
+#include "host/base/Say.h"
+
+#include "host/base/PatientWrite.h"
+
+#include <algorithm>
+#include <cstdarg>
+#include <cstddef>
+#include <cstdio>
+
+void say(const char* format, ...) {
+    char line[8192];
+    std::size_t length = static_cast<std::size_t>(std::snprintf(line, sizeof line, "zrmagent: "));
+    std::va_list arguments;
+    va_start(arguments, format);
+    const int added = std::vsnprintf(line + length, sizeof line - length, format, arguments);
+    va_end(arguments);
+    length = std::min(length + static_cast<std::size_t>(std::max(added, 0)), sizeof line - 1);
+    line[length++] = '\n';
+    PatientWrite::toStandardError({line, length});
+}

@@ -1,0 +1,42 @@
+#ifndef ZRM_HOST_REQUEST_STATE_H
+#define ZRM_HOST_REQUEST_STATE_H
+
+#include "framework/ctreq.h"
+#include "host/framework/ConditionSet.h"
+#include "host/framework/ContextInfo.h"
+#include "host/framework/FilterList.h"
+#include "host/framework/RequestCounts.h"
+#include "host/framework/RequestDetail.h"
+
+#include <atomic>
+#include <cstddef>
+#include <optional>
+
+/// What the host keeps with a request. Used by the thread that uses the request.
+class ctreq::Framework {
+    std::optional<ConditionSet> m_conditions;
+    RequestCounts m_ownCounts;
+
+public:
+    /// Both outlive the object, and so do the context's counts where it has any.
+    Framework(const RequestDetail& detail, ContextInfo& context)
+        : filters(detail.conditions), receiver(context.receiver()),
+          counts(context.counts() != nullptr ? *context.counts() : m_ownCounts) {}
+
+    /// The conditions of the request, ready for evaluation. The table's columns must be known by
+    /// now: they are asked for at the first call.
+    const ConditionSet& conditionsOf(ctreq& request) {
+        if (!m_conditions) {
+            m_conditions.emplace(filters, request);
+        }
+        return *m_conditions;
+    }
+
+    FilterList filters;
+    RowReceiver& receiver;
+    RequestCounts& counts;
+    std::atomic<bool> stopped{false};
+    std::size_t capacity = 0; ///< rows that fit into the memory of the data array
+};
+
+#endif

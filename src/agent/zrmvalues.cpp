@@ -1,9 +1,0 @@
-// The process-wide values stand apart from start-up, so that a program can use parts of the agent
-// without the framework's main loop.
-
-#include "agent/zrmmain.h"
-
-std::atomic<LogManager*> pTheLogManager{nullptr};
-char* gSystemName = nullptr;
-char* gHostName = nullptr;
-std::int32_t gMaxRows = 1000;

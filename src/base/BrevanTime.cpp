@@ -1,0 +1,50 @@
+#include "base/BrevanTime.h"
+
+#include "base/TraceScope.h"
+
+#include <cstdio>
+#include <cstring>
+#include <ctime>
+#include <limits>
+
+namespace {
+
+TRC1_Anchor anchor{"BrevanTime.cpp"};
+
+constexpr std::size_t stampLength = 16;
+
+/// The stamp of the second that the thread asked for last. It holds while the trace levels stay as
+/// they are, and not at all where the flow of operations is traced: each call is an operation then.
+struct CurrentStamp {
+    std::time_t second = std::numeric_limits<std::time_t>::min();
+    unsigned generation = 0; ///< of the trace levels; 0: the stamp does not hold
+    char text[stampLength] = {};
+};
+
+constinit thread_local CurrentStamp currentStamp;
+
+} // namespace
+
+void BrevanTime::generateTimestamp(long time, char* out) {
+    TraceScope trace(anchor);
+    const std::time_t seconds = time;
+    std::tm parts{};
+    localtime_r(&seconds, &parts);
+    // Room for any int in each place: years beyond 2899 need a fourth digit and are cut below.
+    char text[96];
+    std::snprintf(text, sizeof text, "%03d%02d%02d%02d%02d%02d000", parts.tm_year, parts.tm_mon + 1,
+                  parts.tm_mday, parts.tm_hour, parts.tm_min, parts.tm_sec);
+    std::memcpy(out, text, stampLength);
+}
+
+void BrevanTime::generateCurrentTimestamp(char* out) {
+    const std::time_t now = std::time(nullptr);
+    const unsigned generation = TRC1_Generation.load(std::memory_order_relaxed);
+    if (now != currentStamp.second || generation != currentStamp.generation) {
+        generateTimestamp(now, currentStamp.text);
+        const bool isFlowTraced = (TRC1_Sync(anchor) & TRC1_FLOW) != 0;
+        currentStamp.second = now;
+        currentStamp.generation = isFlowTraced ? 0 : generation;
+    }
+    std::memcpy(out, currentStamp.text, stampLength);
+}

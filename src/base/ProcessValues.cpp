@@ -1,0 +1,8 @@
+// The process-wide values stand apart from start-up, so that a program can use parts of the agent
+// without the framework's main loop.
+
+#include "base/ProcessValues.h"
+
+char* gSystemName = nullptr;
+char* gHostName = nullptr;
+std::int32_t gMaxRows = 1000;

@@ -1,0 +1,11 @@
+#include "base/RowBytes.h"
+
+#include <cstring>
+
+void RowBytes::blank(char* bytes, std::size_t length) noexcept {
+    std::memset(bytes, ' ', length);
+}
+
+void RowBytes::copy(char* bytes, const char* from, std::size_t length) noexcept {
+    std::memcpy(bytes, from, length);
+}

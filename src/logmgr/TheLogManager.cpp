@@ -1,0 +1,5 @@
+// The one log manager stands apart from its class, so that a test can put its own in its place.
+
+#include "logmgr/LogManager.h"
+
+std::atomic<LogManager*> pTheLogManager{nullptr};

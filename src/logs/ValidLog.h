@@ -1,0 +1,56 @@
+#ifndef ZRM_VALID_LOG_H
+#define ZRM_VALID_LOG_H
+
+#include "logs/LogBase.h"
+
+class TraceScope;
+
+/// Where a line comes from.
+enum WhenceConfig : char {
+    CONFIG_USER = 'U',    ///< a line of the log configuration file
+    CONFIG_DEFAULT = 'D', ///< a line of the syslog configuration file
+};
+
+/// One accepted line of the log configuration, or, while isValid() is false, a refused one. Lives
+/// on the log manager's chain of valid logs until the monitoring objects are built. Manager thread
+/// only.
+class ValidLog : public LogBase {
+public:
+    /// Parses `line` (and modifies it), checks it against the chain that starts at `head` (null for
+    /// an empty one) and, when it is valid, joins that chain.
+    ValidLog(WhenceConfig whence, char* line, ValidLog* head);
+    ValidLog(const ValidLog&) = delete;
+    /// Leaves the chain when valid.
+    ~ValidLog() override;
+
+    bool isValid() const noexcept { return Valid; }
+    /// Replaces each "${@}" by the local file name and stores the result. Ends the process when
+    /// memory runs out.
+    void setLogProcedure(const char* procedure);
+    /// Writes the records of LogBase and of this class, whatever the level.
+    void printSelf() const;
+
+    ValidLog* next() const noexcept { return static_cast<ValidLog*>(Next); }
+    ValidLog* prev() const noexcept { return static_cast<ValidLog*>(Prev); }
+
+private:
+    /// Parses a line of the log configuration file: name ;debug ;type ;procedure.
+    void extractTokens(char* line);
+    /// Parses a line of the syslog configuration file: selector, action.
+    void extractFileName(char* line);
+    /// Refuses this line when its log is already on the chain.
+    void checkForDups(const ValidLog* head);
+
+    bool hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const;
+    // The fields of a configuration line; a refused line loses Valid.
+    void takeFileName(const TraceScope& trace, const char* token);
+    bool isNameUsable(const TraceScope& trace, int isUTF8) const;
+    void takeField(const TraceScope& trace, int field, const char* token);
+    void takeType(const TraceScope& trace, const char* token);
+    void takeProcedure(const TraceScope& trace, const char* procedure);
+    bool isErrorLogSystem(const TraceScope& trace) const;
+
+    bool Valid = true;
+};
+
+#endif

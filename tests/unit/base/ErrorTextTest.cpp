@@ -1,0 +1,16 @@
+#include "base/ErrorText.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <cstring>
+
+TEST(ErrorText, GivesTheSystemsTextAndTheNumber) {
+    const ErrorText error(ENOENT);
+    EXPECT_EQ(error.number(), ENOENT);
+    EXPECT_STREQ(error.text(), "No such file or directory");
+}
+
+TEST(ErrorText, NamesNumbersThatTheSystemDoesNotKnow) {
+    EXPECT_NE(std::strstr(ErrorText(99999).text(), "Unknown error"), nullptr);
+}

@@ -1,0 +1,25 @@
+#include "host/base/Say.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace {
+
+std::string said(const std::string& text) {
+    testing::internal::CaptureStderr();
+    say("%s", text.c_str());
+    return testing::internal::GetCapturedStderr();
+}
+
+TEST(Say, WritesOneLineToStandardError) {
+    EXPECT_EQ(said("no log to monitor"), "zrmagent: no log to monitor\n");
+}
+
+TEST(Say, CutsWhatIsTooLong) {
+    const std::string line = said(std::string(10'000, 'x'));
+    EXPECT_EQ(line.size(), 8192u);
+    EXPECT_TRUE(line.ends_with("xx\n"));
+}
+
+} // namespace

@@ -1,0 +1,41 @@
+#include "host/framework/RequestLimit.h"
+
+#include "framework/cancellation.h"
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <thread>
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = RequestLimit::Clock;
+
+TEST(RequestLimit, IsReachedWhenTheTimeIsOverOrNobodyWants) {
+    EXPECT_FALSE(CTX1_IsCancelled());
+    bool isUnwanted = false;
+    const RequestLimit limit(Clock::now() + 1h, [&] { return isUnwanted; });
+    EXPECT_FALSE(CTX1_IsCancelled());
+    EXPECT_FALSE(limit.wasReached());
+    isUnwanted = true;
+    EXPECT_FALSE(limit.wasReached()); // nothing has asked
+    EXPECT_TRUE(CTX1_IsCancelled());
+    isUnwanted = false;
+    EXPECT_TRUE(CTX1_IsCancelled()); // once ended, it stays so
+    EXPECT_TRUE(limit.wasReached());
+    const RequestLimit overdue(Clock::now(), {});
+    EXPECT_TRUE(CTX1_IsCancelled());
+}
+
+TEST(RequestLimit, TheLatestOfAThreadCountsAndOthersHaveNone) {
+    const RequestLimit outer(Clock::now(), {});
+    {
+        const RequestLimit inner(Clock::now() + 1h, {});
+        EXPECT_FALSE(CTX1_IsCancelled());
+    }
+    EXPECT_TRUE(CTX1_IsCancelled());
+    std::thread([] { EXPECT_FALSE(CTX1_IsCancelled()); }).join();
+}
+
+} // namespace
