@@ -13,16 +13,24 @@ constexpr std::chrono::milliseconds lookInterval{5};
 
 } // namespace
 
+/// The list of all pulses.
+class Pulse::Framework {
+public:
+    static void add(Pulse& pulse);
+    static void remove(Pulse& pulse);
+    static std::vector<PulseRegistry::Working> look(PulseRegistry::Clock::time_point now);
+};
+
 Pulse::Pulse(const char* subject, const std::atomic<std::int64_t>* progress)
     : m_subject(subject), m_progress(progress) {
-    PulseRegistry::add(*this);
+    Framework::add(*this);
 }
 
 Pulse::~Pulse() {
-    PulseRegistry::remove(*this);
+    Framework::remove(*this);
 }
 
-void PulseRegistry::add(Pulse& pulse) {
+void Pulse::Framework::add(Pulse& pulse) {
     const std::lock_guard guard(listMutex);
     pulse.m_next = first;
     if (first != nullptr) {
@@ -31,7 +39,7 @@ void PulseRegistry::add(Pulse& pulse) {
     first = &pulse;
 }
 
-void PulseRegistry::remove(Pulse& pulse) {
+void Pulse::Framework::remove(Pulse& pulse) {
     const std::lock_guard guard(listMutex);
     (pulse.m_previous != nullptr ? pulse.m_previous->m_next : first) = pulse.m_next;
     if (pulse.m_next != nullptr) {
@@ -39,8 +47,8 @@ void PulseRegistry::remove(Pulse& pulse) {
     }
 }
 
-std::vector<PulseRegistry::Working> PulseRegistry::look(Clock::time_point now) {
-    std::vector<Working> working;
+std::vector<PulseRegistry::Working> Pulse::Framework::look(PulseRegistry::Clock::time_point now) {
+    std::vector<PulseRegistry::Working> working;
     const std::lock_guard guard(listMutex);
     for (Pulse* pulse = first; pulse != nullptr; pulse = pulse->m_next) {
         const std::int64_t progress = pulse->progress();
@@ -55,6 +63,10 @@ std::vector<PulseRegistry::Working> PulseRegistry::look(Clock::time_point now) {
         }
     }
     return working;
+}
+
+std::vector<PulseRegistry::Working> PulseRegistry::look(Clock::time_point now) {
+    return Pulse::Framework::look(now);
 }
 
 bool PulseRegistry::waitUntilAllRest(Clock::time_point limit) {

@@ -25,11 +25,6 @@ public:
 
     /// Waits until every thread rests, at most until the limit; false when the time is up.
     static bool waitUntilAllRest(Clock::time_point limit);
-
-private:
-    friend class Pulse;
-    static void add(Pulse& pulse);
-    static void remove(Pulse& pulse);
 };
 
 #endif

@@ -25,9 +25,9 @@ public:
     /// The thread waits for something to do: it need not move.
     void rest() noexcept { work(nullptr); }
 
-private:
-    friend class PulseRegistry; ///< the framework's
+    class Framework; ///< who looks: the framework's own matter
 
+private:
     std::int64_t progress() const noexcept {
         return m_beats.load(std::memory_order_acquire) +
                (m_progress != nullptr ? m_progress->load(std::memory_order_relaxed) : 0);
