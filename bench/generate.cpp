@@ -15,20 +15,20 @@
 
 namespace {
 
-constexpr long kPerSecond = 1000;
-constexpr long kPerMatch = 100;
+constexpr long perSecond = 1000;
+constexpr long perMatch = 100;
 
-constexpr std::array<std::string_view, 4> kSources = {"app[1402]", "cron[77]", "nginx[901]",
-                                                      "kernel"};
+constexpr std::array<std::string_view, 4> sources = {"app[1402]", "cron[77]", "nginx[901]",
+                                                     "kernel"};
 
 void writeSyslogLine(long number, const char* stamp) {
-    if (number % kPerMatch == kPerMatch - 1) {
+    if (number % perMatch == perMatch - 1) {
         std::printf("%s web1 sshd[2140]: Failed password for invalid user admin%07ld from "
                     "203.0.113.7 port 50122 ssh2\n",
                     stamp, number);
         return;
     }
-    const std::string_view source = kSources[static_cast<std::size_t>(number) % kSources.size()];
+    const std::string_view source = sources[static_cast<std::size_t>(number) % sources.size()];
     std::printf("%s web1 %.*s: request %07ld from 192.0.2.%ld answered with 200 after %ld ms, "
                 "worker %ld done\n",
                 stamp, static_cast<int>(source.size()), source.data(), number, number % 250,
@@ -36,7 +36,7 @@ void writeSyslogLine(long number, const char* stamp) {
 }
 
 void writeUserLine(long number, const char* stamp) {
-    const bool fails = number % kPerMatch == kPerMatch - 1;
+    const bool fails = number % perMatch == perMatch - 1;
     std::printf("%s %s order %07ld of customer %06ld %s after %ld ms on worker %ld, attempt 1, "
                 "queue main\n",
                 stamp, fails ? "ERROR" : "INFO", number, number % 99991,
@@ -67,22 +67,22 @@ struct Kind {
     void (*writeLine)(long number, const char* stamp);
 };
 
-constexpr Kind kKinds[] = {
+constexpr Kind kinds[] = {
     {"syslog", "%b %e %H:%M:%S", writeSyslogLine},
     {"user", "%Y-%m-%d %H:%M:%S", writeUserLine},
     {"accounting", nullptr, nullptr},
 };
 
 void write(const Kind& kind, long count) {
-    const std::time_t begin = std::time(nullptr) - count / kPerSecond;
+    const std::time_t begin = std::time(nullptr) - count / perSecond;
     std::array<char, 64> stamp{};
     for (long number = 0; number < count; ++number) {
-        const std::time_t now = begin + number / kPerSecond;
+        const std::time_t now = begin + number / perSecond;
         if (kind.stamp == nullptr) {
             writeRecord(number, now);
             continue;
         }
-        if (number % kPerSecond == 0) {
+        if (number % perSecond == 0) {
             std::tm parts{};
             localtime_r(&now, &parts);
             std::strftime(stamp.data(), stamp.size(), kind.stamp, &parts);
@@ -94,7 +94,7 @@ void write(const Kind& kind, long count) {
 } // namespace
 
 int main(int argc, char** argv) {
-    for (const Kind& kind : kKinds) {
+    for (const Kind& kind : kinds) {
         if (argc == 3 && kind.name == argv[1]) {
             write(kind, std::strtol(argv[2], nullptr, 10));
             return std::fflush(stdout) == 0 ? 0 : 1;

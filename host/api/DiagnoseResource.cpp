@@ -24,9 +24,9 @@ namespace {
 TRC1_Anchor anchor{"DiagnoseResource.cpp"};
 
 std::vector<std::string> givenLines(JsonFields& fields) {
-    std::vector<std::string> lines = fields.texts("lines", DiagnoseResource::kMostLines);
+    std::vector<std::string> lines = fields.texts("lines", DiagnoseResource::mostLines);
     for (std::size_t i = 0; i < lines.size(); ++i) {
-        if (lines[i].size() > DiagnoseResource::kMostLineBytes) {
+        if (lines[i].size() > DiagnoseResource::mostLineBytes) {
             throw RequestRefused(400, "write lines of at most 16384 bytes",
                                  fields.place("lines", i));
         }
@@ -69,11 +69,11 @@ void refuseTooMuch(const JsonFields& fields, const std::string& format, std::str
         pieces += FormatTrial::piecesOf(line);
     }
     const std::size_t directives = FormatTrial(format, log).result().directives.size();
-    if (pieces * directives > DiagnoseResource::kMostValues) {
+    if (pieces * directives > DiagnoseResource::mostValues) {
         fields.refuse(fields.has("last") ? "last" : "lines",
                       "try fewer lines: with " + std::to_string(directives) +
                           " directives there may be " +
-                          std::to_string(DiagnoseResource::kMostValues / directives) +
+                          std::to_string(DiagnoseResource::mostValues / directives) +
                           " pieces of up to 2047 bytes");
     }
 }
@@ -109,7 +109,7 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
     const std::string format = fields.text("format");
     const std::optional<std::string> log = fields.optionalText("log");
     const auto last =
-        fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::kMostLines));
+        fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::mostLines));
     const bool hasLines = fields.has("lines");
     std::vector<std::string> lines = givenLines(fields);
     fields.refuseUnknown();
@@ -123,7 +123,7 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
         lines = loggedLines(fields, *log, static_cast<std::size_t>(*last));
     }
     const bool isNamed = log && !log->empty();
-    const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::kSomeLog;
+    const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::someLog;
     refuseTooMuch(fields, format, name, lines);
     return HttpAnswer::json(FormatTrial::json(FormatTrial::run(format, lines, name)));
 }
@@ -134,7 +134,7 @@ HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
     const std::string config = fields.text("config");
     fields.refuseUnknown();
     if (static_cast<std::size_t>(std::count(config.begin(), config.end(), '\n')) >
-        kMostConfigLines) {
+        mostConfigLines) {
         fields.refuse("config", "write at most 10000 lines");
     }
     return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config, logDirectories())));

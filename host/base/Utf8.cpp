@@ -5,7 +5,7 @@
 
 namespace {
 
-constexpr std::uint64_t kHighBits = 0x8080808080808080;
+constexpr std::uint64_t highBits = 0x8080808080808080;
 
 /// The form of the characters that begin with one of these bytes: the range of the second byte
 /// keeps out over-long forms, surrogates and what lies beyond the last character.
@@ -17,7 +17,7 @@ struct Form {
     unsigned char secondLast;
 };
 
-constexpr Form kForms[] = {
+constexpr Form forms[] = {
     {0xC2, 0xDF, 2, 0x80, 0xBF}, {0xE0, 0xE0, 3, 0xA0, 0xBF}, {0xE1, 0xEC, 3, 0x80, 0xBF},
     {0xED, 0xED, 3, 0x80, 0x9F}, {0xEE, 0xEF, 3, 0x80, 0xBF}, {0xF0, 0xF0, 4, 0x90, 0xBF},
     {0xF1, 0xF3, 4, 0x80, 0xBF}, {0xF4, 0xF4, 4, 0x80, 0x8F},
@@ -36,11 +36,11 @@ bool isContinuation(unsigned char byte) {
 } // namespace
 
 bool Utf8::isAscii(std::string_view text) noexcept {
-    constexpr std::size_t kBlock = 4 * sizeof kHighBits;
+    constexpr std::size_t block = 4 * sizeof highBits;
     const char* position = text.data();
     const char* const end = position + text.size();
     std::uint64_t seen = 0;
-    for (; static_cast<std::size_t>(end - position) >= kBlock; position += kBlock) {
+    for (; static_cast<std::size_t>(end - position) >= block; position += block) {
         std::uint64_t words[4];
         std::memcpy(words, position, sizeof words);
         seen |= words[0] | words[1] | words[2] | words[3];
@@ -55,22 +55,22 @@ bool Utf8::isAscii(std::string_view text) noexcept {
             seen |= static_cast<unsigned char>(*position);
         }
     }
-    return (seen & kHighBits) == 0;
+    return (seen & highBits) == 0;
 }
 
 std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
     std::size_t position = 0;
-    constexpr std::size_t kBlock = 4 * sizeof kHighBits;
-    for (; position + kBlock <= text.size(); position += kBlock) {
+    constexpr std::size_t block = 4 * sizeof highBits;
+    for (; position + block <= text.size(); position += block) {
         std::uint64_t words[4];
         std::memcpy(words, text.data() + position, sizeof words);
-        if (((words[0] | words[1] | words[2] | words[3]) & kHighBits) != 0) {
+        if (((words[0] | words[1] | words[2] | words[3]) & highBits) != 0) {
             break;
         }
     }
-    while (position + sizeof kHighBits <= text.size() &&
-           (wordAt(text.data() + position) & kHighBits) == 0) {
-        position += sizeof kHighBits;
+    while (position + sizeof highBits <= text.size() &&
+           (wordAt(text.data() + position) & highBits) == 0) {
+        position += sizeof highBits;
     }
     while (position < text.size() && static_cast<unsigned char>(text[position]) < 0x80) {
         ++position;
@@ -86,7 +86,7 @@ Utf8::Sequence Utf8::firstSequence(std::string_view text) noexcept {
     if (lead < 0x80) {
         return {1, true};
     }
-    for (const Form& form : kForms) {
+    for (const Form& form : forms) {
         if (lead < form.first || lead > form.last) {
             continue;
         }

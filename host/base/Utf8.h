@@ -8,7 +8,7 @@
 namespace Utf8 {
 
 /// What the replacement character looks like in UTF-8.
-inline constexpr std::string_view kReplacement = "\xEF\xBF\xBD";
+inline constexpr std::string_view replacement = "\xEF\xBF\xBD";
 
 /// Whether all of the text is ASCII. Looks at every byte, so it is for short texts that mostly are.
 bool isAscii(std::string_view text) noexcept;

@@ -78,7 +78,7 @@ std::string DisplayText::visible(std::string_view text) {
         const Utf8::Sequence sequence = Utf8::firstSequence(text);
         const std::string_view bytes = text.substr(0, sequence.length);
         if (!sequence.valid) {
-            result += Utf8::kReplacement;
+            result += Utf8::replacement;
         } else if (const char32_t character = Utf8::character(bytes); isHidden(character)) {
             result += escaped(character);
         } else {

@@ -37,7 +37,7 @@ void InputFile::throwIfFailed() const {
 std::optional<std::string> InputFile::line() {
     std::string line;
     int character = EOF;
-    while (line.size() < kMostLine && (character = std::getc(m_stream.get())) != EOF &&
+    while (line.size() < mostLine && (character = std::getc(m_stream.get())) != EOF &&
            character != '\n') {
         line += static_cast<char>(character);
     }
@@ -52,7 +52,7 @@ std::string InputFile::text() {
     std::string text;
     int character = EOF;
     while ((character = std::getc(m_stream.get())) != EOF) {
-        if (text.size() == kMostText) {
+        if (text.size() == mostText) {
             throw CliError(CLI_USAGE,
                            m_path + " has more than 16 MiB, which is the most that is read");
         }

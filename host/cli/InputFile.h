@@ -14,14 +14,14 @@ public:
     explicit InputFile(const std::string& path);
 
     /// The next line without its line end, or none behind the last one. Of a line of more than
-    /// kMostLine bytes each such part is a line. Throws CliError when the file cannot be read.
+    /// mostLine bytes each such part is a line. Throws CliError when the file cannot be read.
     std::optional<std::string> line();
 
-    /// What is left. Throws CliError when that is more than kMostText bytes, or cannot be read.
+    /// What is left. Throws CliError when that is more than mostText bytes, or cannot be read.
     std::string text();
 
-    static constexpr std::size_t kMostLine = 65536;
-    static constexpr std::size_t kMostText = 16 * 1024 * 1024;
+    static constexpr std::size_t mostLine = 65536;
+    static constexpr std::size_t mostText = 16 * 1024 * 1024;
 
 private:
     void throwIfFailed() const;

@@ -12,12 +12,13 @@
 /// the widest first; what still does not fit is cut at the edge.
 class Table {
 public:
-    enum Kind {
+    enum class Kind {
         FIXED,  ///< keeps its width as long as it can
         NUMBER, ///< the same, and stands at the right
         TEXT,   ///< shrinks
         PATH,   ///< shrinks at its beginning: the names of files differ at their ends
     };
+    using enum Kind;
     struct Column {
         std::string heading;
         Kind kind = TEXT;

@@ -100,7 +100,7 @@ std::string coverageOf(const FormatTrial::Result& result, const Terminal& termin
 std::string logOf(const std::string& file) {
     std::error_code error;
     const std::filesystem::path path = std::filesystem::absolute(file, error);
-    return file == "-" || error ? std::string(FormatTrial::kSomeLog)
+    return file == "-" || error ? std::string(FormatTrial::someLog)
                                 : path.lexically_normal().string();
 }
 

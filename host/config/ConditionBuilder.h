@@ -15,7 +15,8 @@
 
 /// What is wrong with a condition, and where.
 struct ConditionProblem {
-    enum Part { COLUMN, OPERATOR, VALUE };
+    enum class Part { COLUMN, OPERATOR, VALUE };
+    using enum Part;
     Part part;
     std::string what;
     std::string cure;

@@ -9,7 +9,7 @@
 /// says.
 struct SinkOption {
     /// What its value is, and so how it is read and checked.
-    enum Kind {
+    enum class Kind {
         TEXT,       ///< of at most so many bytes as the bound says
         NUMBER,     ///< within the bounds
         DURATION,   ///< "10s"; within the bounds, which are seconds
@@ -22,7 +22,9 @@ struct SinkOption {
         LABELS,     ///< a table of texts with names as metrics have them
         ATTRIBUTES, ///< a table of texts with any names
     };
-    enum Need { REQUIRED, OPTIONAL };
+    using enum Kind;
+    enum class Need { REQUIRED, OPTIONAL };
+    using enum Need;
 
     std::string_view name;
     Kind kind;

@@ -115,7 +115,7 @@ public:
 private:
     static void learnFormat(const ValidLog& log, TraceCapture& errors, Line& line) {
         const std::size_t length = std::strlen(log.procedure());
-        if (length > ConfiguredFormat::kMostInLine) {
+        if (length > ConfiguredFormat::mostInLine) {
             line.verdict = Verdict::REFUSED;
             line.reason = ConfiguredFormat::tooLong(length);
             return;
@@ -154,7 +154,7 @@ ConfigCheck::Result judge(std::string_view text, const ConfigCheck::Directories*
         content.empty() ? nullptr : fmemopen(content.data(), content.size(), "r"), std::fclose);
     if (stream != nullptr) {
         Chain chain(directories);
-        std::array<char, LogManagerUtil::RECORD_SIZE> room;
+        std::array<char, LogManagerUtil::recordSize> room;
         std::size_t read = 0;
         std::size_t newlines = 0;
         while (char* const record = LogManagerUtil::nextRecord(stream.get(), room.data())) {

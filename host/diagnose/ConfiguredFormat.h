@@ -21,7 +21,7 @@ public:
     std::size_t lineLength() const noexcept { return m_lineLength; }
     /// Characters of what the agent learns, also where it is too long.
     std::size_t length() const noexcept { return m_length; }
-    bool isTooLong() const noexcept { return m_lineLength > kMostInLine || m_length > kMostInLine; }
+    bool isTooLong() const noexcept { return m_lineLength > mostInLine || m_length > mostInLine; }
 
     /// Why a format that has so many characters once it has the log's name is refused.
     static std::string tooLong(std::size_t length);
@@ -34,7 +34,7 @@ public:
 
     /// Most characters of a line of the log configuration, without its newline, and of the format
     /// in it once it has the log's name.
-    static constexpr std::size_t kMostInLine = 1022;
+    static constexpr std::size_t mostInLine = 1022;
 
 private:
     void expand(std::size_t begin);

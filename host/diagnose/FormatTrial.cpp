@@ -17,9 +17,9 @@ TRC1_Anchor anchor{"FormatTrial.cpp"};
 
 using Row = zrm_rmlogent_data_t;
 
-constexpr std::size_t kPiece = 2047;     ///< bytes that the agent reads as one line at most
-constexpr std::size_t kMostValue = 2048; ///< bytes of a printed value that are shown
-constexpr std::string_view kCount = "%n";
+constexpr std::size_t longestPiece = 2047; ///< bytes that the agent reads as one line at most
+constexpr std::size_t mostValue = 2048;    ///< bytes of a printed value that are shown
+constexpr std::string_view countDirective = "%n";
 
 /// The column of each field name, in the order of the names.
 constexpr const char* columnOfField[] = {
@@ -51,8 +51,8 @@ struct Parts {
         }
         literal = directive.substr(0, at);
         conversion = directive.substr(at);
-        if (conversion.ends_with(kCount)) {
-            conversion.remove_suffix(kCount.size());
+        if (conversion.ends_with(countDirective)) {
+            conversion.remove_suffix(countDirective.size());
         }
     }
     std::string_view literal;
@@ -112,7 +112,7 @@ FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_form
         refuse("A configuration line holds neither line ends nor NUL characters.", lineEnd);
         return;
     }
-    if (m_format.lineLength() > ConfiguredFormat::kMostInLine) {
+    if (m_format.lineLength() > ConfiguredFormat::mostInLine) {
         refuse("The configuration line would have " + std::to_string(m_format.lineLength()) +
                    " characters; the agent reads lines of up to 1022.",
                std::nullopt);
@@ -167,7 +167,7 @@ void FormatTrial::describeDirectives() {
 }
 
 FormatTrial::Line FormatTrial::scan(std::string_view line) {
-    return scanPiece((std::string(line) + '\n').substr(0, kPiece));
+    return scanPiece((std::string(line) + '\n').substr(0, longestPiece));
 }
 
 /// `piece` is a line as the agent reads it, with its line end where it has one.
@@ -205,7 +205,7 @@ void FormatTrial::explain(const char* text, Line& line) const {
     }
     std::size_t position = 0;
     std::size_t index = 0;
-    std::string value(kMostValue, '\0');
+    std::string value(mostValue, '\0');
     for (const StringParser* node = m_log->format().next(); node != nullptr;
          node = node->next(), ++index) {
         const StringParser::Place place = node->locate(text, position);
@@ -240,8 +240,8 @@ FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<
     }
     for (const std::string& line : lines) {
         const std::string whole = line + '\n';
-        for (std::size_t at = 0; at < whole.size(); at += kPiece) {
-            result.lines.push_back(trial.scanPiece(whole.substr(at, kPiece)));
+        for (std::size_t at = 0; at < whole.size(); at += longestPiece) {
+            result.lines.push_back(trial.scanPiece(whole.substr(at, longestPiece)));
             result.matched += result.lines.back().matched ? 1 : 0;
         }
     }
@@ -249,7 +249,7 @@ FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<
 }
 
 std::size_t FormatTrial::piecesOf(std::string_view line) noexcept {
-    return line.size() / kPiece + 1; // with its line end
+    return line.size() / longestPiece + 1; // with its line end
 }
 
 double FormatTrial::percent(const Result& result) noexcept {

@@ -57,7 +57,7 @@ public:
 
     /// Learns a format as it stands in a configuration line behind its third ';'. `log` is the
     /// log's path, for the configuration line.
-    explicit FormatTrial(std::string_view format, std::string_view log = kSomeLog);
+    explicit FormatTrial(std::string_view format, std::string_view log = someLog);
     FormatTrial(const FormatTrial&) = delete;
     FormatTrial& operator=(const FormatTrial&) = delete;
     ~FormatTrial();
@@ -73,7 +73,7 @@ public:
     /// Learns a format and tries it on lines. A line of more than 2046 bytes becomes several, as
     /// it does when it is monitored.
     static Result run(std::string_view format, const std::vector<std::string>& lines,
-                      std::string_view log = kSomeLog);
+                      std::string_view log = someLog);
 
     /// How many pieces the agent reads a line in.
     static std::size_t piecesOf(std::string_view line) noexcept;
@@ -83,7 +83,7 @@ public:
     /// those of the text shown.
     static std::string json(const Result& result);
 
-    static constexpr std::string_view kSomeLog = "/path/to/the.log";
+    static constexpr std::string_view someLog = "/path/to/the.log";
 
 private:
     void learn();

@@ -18,7 +18,7 @@ public:
             for (std::size_t i = 0; i < sequence.length; ++i) {
                 m_places.push_back(text.size() + (sequence.valid ? i : 0));
             }
-            text += sequence.valid ? line.substr(0, sequence.length) : Utf8::kReplacement;
+            text += sequence.valid ? line.substr(0, sequence.length) : Utf8::replacement;
             line.remove_prefix(sequence.length);
         }
         m_places.push_back(text.size());

@@ -9,13 +9,13 @@
 /// The end of a text file. Stateless.
 class LastLines {
 public:
-    static constexpr std::size_t kMostBytes = std::size_t{4} << 20; ///< that are read at most
+    static constexpr std::size_t defaultMostBytes = std::size_t{4} << 20; ///< that are read at most
 
     /// The last lines of an open regular file, at most `count`, the oldest first and without their
     /// line ends; fewer when they have more than `mostBytes`. None, with errno, when it cannot be
     /// read. Any thread.
     static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count,
-                                                        std::size_t mostBytes = kMostBytes);
+                                                        std::size_t mostBytes = defaultMostBytes);
 };
 
 #endif

@@ -17,7 +17,7 @@ namespace {
 
 TRC1_Anchor anchor{"LogLedgers.cpp"};
 
-constexpr std::int64_t kNanoseconds = 1'000'000;
+constexpr std::int64_t nanoseconds = 1'000'000;
 
 /// Holds the chain of logs still.
 class ChainOfLogs {
@@ -32,7 +32,7 @@ private:
 };
 
 std::int64_t milliseconds(const std::timespec& time) {
-    return std::int64_t{time.tv_sec} * 1000 + time.tv_nsec / kNanoseconds;
+    return std::int64_t{time.tv_sec} * 1000 + time.tv_nsec / nanoseconds;
 }
 
 LogLedgerView numbersOf(const LogFile& log) {
@@ -53,20 +53,20 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.withoutTime = ledger.withoutTime();
     view.restarts = ledger.restarts();
     if (const std::int64_t time = ledger.lastEntry(); time != 0) {
-        view.lastEntry = time / kNanoseconds;
+        view.lastEntry = time / nanoseconds;
     }
     return view;
 }
 
 void addSamples(LogLedgerView& view, const LogLedger& ledger) {
-    const auto lines = std::make_unique<std::array<LogLedger::RejectedLine, LogLedger::KEPT>>();
+    const auto lines = std::make_unique<std::array<LogLedger::RejectedLine, LogLedger::mostKept>>();
     const std::size_t lineCount = ledger.copyRejected(lines->data());
     for (std::size_t i = 0; i < lineCount; ++i) {
         const LogLedger::RejectedLine& line = (*lines)[i];
         view.rejected.push_back(
             {milliseconds(line.time), std::string(line.text, line.length), std::string()});
     }
-    std::array<LogLedger::SkippedRange, LogLedger::KEPT> ranges;
+    std::array<LogLedger::SkippedRange, LogLedger::mostKept> ranges;
     const std::size_t rangeCount = ledger.copySkipped(ranges.data());
     for (std::size_t i = 0; i < rangeCount; ++i) {
         const LogLedger::SkippedRange& range = ranges[i];

@@ -22,11 +22,11 @@ namespace {
 
 TRC1_Anchor anchor{"UnmonitoredLogs.cpp"};
 
-constexpr std::string_view kSpaces = " \t\v\f\r";
+constexpr std::string_view spaces = " \t\v\f\r";
 
 /// The log that a line names.
 std::string_view nameIn(std::string_view line) {
-    line.remove_prefix(std::min(line.find_first_not_of(kSpaces), line.size()));
+    line.remove_prefix(std::min(line.find_first_not_of(spaces), line.size()));
     return line.substr(0, line.find_first_of(" \t"));
 }
 

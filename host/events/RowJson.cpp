@@ -11,21 +11,21 @@
 
 namespace {
 
-constexpr std::uint64_t kEach = 0x0101010101010101;
-constexpr std::uint64_t kHighBits = kEach * 0x80;
+constexpr std::uint64_t each = 0x0101010101010101;
+constexpr std::uint64_t highBits = each * 0x80;
 
 /// True when a byte of the word is less than `limit`, which is at most 128.
 constexpr bool hasByteBelow(std::uint64_t word, unsigned limit) {
-    return ((word - kEach * limit) & ~word & kHighBits) != 0;
+    return ((word - each * limit) & ~word & highBits) != 0;
 }
 
 constexpr bool hasByte(std::uint64_t word, char c) {
-    return hasByteBelow(word ^ (kEach * static_cast<unsigned char>(c)), 1);
+    return hasByteBelow(word ^ (each * static_cast<unsigned char>(c)), 1);
 }
 
 /// True for eight bytes of ASCII that stand in a JSON string as they are.
 bool isPlain(std::uint64_t word) {
-    return (word & kHighBits) == 0 && !hasByteBelow(word, ' ') && !hasByte(word, '"') &&
+    return (word & highBits) == 0 && !hasByteBelow(word, ' ') && !hasByte(word, '"') &&
            !hasByte(word, '\\');
 }
 
@@ -54,18 +54,18 @@ std::size_t plainPrefix(std::string_view text) {
 /// The control characters, the quote and the backslash. Those without a letter of their own are
 /// written by number.
 void appendEscaped(std::string& out, char c) {
-    constexpr std::string_view kShort = "\"\\\b\f\n\r\t";
-    constexpr std::string_view kLetters = "\"\\bfnrt";
-    constexpr char kDigits[] = "0123456789abcdef";
-    const std::size_t index = kShort.find(c);
+    constexpr std::string_view shortText = "\"\\\b\f\n\r\t";
+    constexpr std::string_view letters = "\"\\bfnrt";
+    constexpr char hexDigits[] = "0123456789abcdef";
+    const std::size_t index = shortText.find(c);
     if (index != std::string_view::npos) {
         out += '\\';
-        out += kLetters[index];
+        out += letters[index];
     } else {
         const auto byte = static_cast<unsigned char>(c);
         out += "\\u00";
-        out += kDigits[byte >> 4];
-        out += kDigits[byte & 15];
+        out += hexDigits[byte >> 4];
+        out += hexDigits[byte & 15];
     }
 }
 
@@ -82,7 +82,7 @@ void appendCharacter(std::string& out, std::string_view sequence) {
 void appendSpecial(std::string& out, std::string_view& text) {
     const Utf8::Sequence sequence = Utf8::firstSequence(text);
     if (!sequence.valid) {
-        out += Utf8::kReplacement;
+        out += Utf8::replacement;
     } else if (sequence.length > 1) {
         appendCharacter(out, text.substr(0, sequence.length));
     } else {

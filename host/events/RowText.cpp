@@ -7,7 +7,7 @@
 namespace {
 
 /// No character of one byte takes more bytes in UTF-8, and no longer one takes more for each.
-constexpr std::size_t kMaxGrowth = 3;
+constexpr std::size_t maxGrowth = 3;
 
 const LOC2_Locale& codeSetOf(const RowColumn& column) {
     const LOC2_Locale* const local = LOC2_GetLocale(0, 0, 0, nullptr);
@@ -23,7 +23,7 @@ std::string_view RowText::of(const RowColumn& column, const char* row, std::stri
         return text;
     }
     const LOC2_Locale& utf8 = *CodePages::byNumber(LOC2_UTF8);
-    room.resize(text.size() * kMaxGrowth);
+    room.resize(text.size() * maxGrowth);
     Converted converted =
         Converter::convert(utf8, room.data(), room.size(), codeSetOf(column), text);
     if (!converted.supported) {

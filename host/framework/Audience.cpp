@@ -9,20 +9,20 @@
 
 namespace {
 
-constexpr std::size_t kWord = sizeof(std::uint64_t);
+constexpr std::size_t wordSize = sizeof(std::uint64_t);
 
 /// Logs come and go; what is known of those that went is forgotten once there are so many.
-constexpr std::size_t kMostLogs = 8192;
+constexpr std::size_t mostLogs = 8192;
 
 /// A word whose first `length` bytes in memory are those of the text, the others 0.
 std::uint64_t wordOf(std::string_view text, std::size_t length) noexcept {
-    char bytes[kWord] = {};
+    char bytes[wordSize] = {};
     std::memcpy(bytes, text.data(), length);
     return std::bit_cast<std::uint64_t>(bytes);
 }
 
 std::uint64_t maskOf(std::size_t length) noexcept {
-    char bytes[kWord] = {};
+    char bytes[wordSize] = {};
     std::memset(bytes, 0xff, length);
     return std::bit_cast<std::uint64_t>(bytes);
 }
@@ -113,7 +113,7 @@ const Audience::Logs::value_type& Audience::findLog(char* row) {
     if (const auto known = m_logs.find(log); known != m_logs.end()) {
         return *known;
     }
-    if (m_logs.size() == kMostLogs) {
+    if (m_logs.size() == mostLogs) {
         m_logs.clear();
         m_recent.fill(nullptr);
     }
@@ -178,8 +178,8 @@ void Audience::learnMember(ctreq& request, std::size_t rowSize) {
 void Audience::addCheck(const CompiledCondition& condition, Member& member, std::size_t rowSize) {
     const std::string_view prefix = condition.prefix();
     Beginning& beginning = member.beginning;
-    if (beginning.mask == 0 && !prefix.empty() && condition.offset() + kWord <= rowSize) {
-        const std::size_t length = std::min({prefix.size(), kWord, condition.width()});
+    if (beginning.mask == 0 && !prefix.empty() && condition.offset() + wordSize <= rowSize) {
+        const std::size_t length = std::min({prefix.size(), wordSize, condition.width()});
         beginning = {maskOf(length), wordOf(prefix, length), condition.offset()};
     }
     m_checks.push_back({&condition, textOf(condition)});

@@ -9,7 +9,7 @@
 namespace {
 
 /// Most columns are mostly padding, so eight blanks are taken at a time.
-constexpr std::uint64_t kBlanks = 0x2020202020202020;
+constexpr std::uint64_t blanks = 0x2020202020202020;
 
 std::uint64_t wordAt(const char* bytes) noexcept {
     std::uint64_t word;
@@ -17,13 +17,13 @@ std::uint64_t wordAt(const char* bytes) noexcept {
     return word;
 }
 
-constexpr std::size_t kBlock = 4 * sizeof kBlanks;
+constexpr std::size_t block = 4 * sizeof blanks;
 
 bool isBlankBlock(const char* bytes) noexcept {
     std::uint64_t words[4];
     std::memcpy(words, bytes, sizeof words);
-    return ((words[0] ^ kBlanks) | (words[1] ^ kBlanks) | (words[2] ^ kBlanks) |
-            (words[3] ^ kBlanks)) == 0;
+    return ((words[0] ^ blanks) | (words[1] ^ blanks) | (words[2] ^ blanks) |
+            (words[3] ^ blanks)) == 0;
 }
 
 /// Difference of the text's first byte that is not a blank from a blank; 0 when there is none.
@@ -37,11 +37,11 @@ int compareWithBlanks(std::string_view text) noexcept {
 
 std::string_view ColumnText::withoutTrailingBlanks(std::string_view text) noexcept {
     std::size_t size = text.size();
-    while (size >= kBlock && isBlankBlock(text.data() + size - kBlock)) {
-        size -= kBlock;
+    while (size >= block && isBlankBlock(text.data() + size - block)) {
+        size -= block;
     }
-    while (size >= sizeof kBlanks && wordAt(text.data() + size - sizeof kBlanks) == kBlanks) {
-        size -= sizeof kBlanks;
+    while (size >= sizeof blanks && wordAt(text.data() + size - sizeof blanks) == blanks) {
+        size -= sizeof blanks;
     }
     while (size > 0 && text[size - 1] == ' ') {
         --size;
@@ -55,11 +55,11 @@ std::string_view ColumnText::unpadded(const char* field, std::size_t width) noex
 
 bool ColumnText::isPadding(const char* rest, std::size_t width) noexcept {
     std::size_t position = 0;
-    while (position + kBlock <= width && isBlankBlock(rest + position)) {
-        position += kBlock;
+    while (position + block <= width && isBlankBlock(rest + position)) {
+        position += block;
     }
-    while (position + sizeof kBlanks <= width && wordAt(rest + position) == kBlanks) {
-        position += sizeof kBlanks;
+    while (position + sizeof blanks <= width && wordAt(rest + position) == blanks) {
+        position += sizeof blanks;
     }
     while (position < width && rest[position] == ' ') {
         ++position;

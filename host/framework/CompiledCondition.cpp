@@ -24,12 +24,12 @@ constexpr std::int64_t patternMemory = 2 * 1024 * 1024;
 
 /// The columns that name a log. Most situations are on one log, and most rows are another's; names
 /// differ more than directories do.
-constexpr std::pair<std::string_view, int> kLogColumns[] = {
+constexpr std::pair<std::string_view, int> logColumns[] = {
     {"LOGNAME", 1}, {"ULOGNAME", 1}, {"LOGPATH", 2}, {"ULOGPATH", 2}};
 
 /// 0 for columns that do not name a log.
 int logRank(std::string_view column) {
-    for (const auto& [name, rank] : kLogColumns) {
+    for (const auto& [name, rank] : logColumns) {
         if (column == name) {
             return rank;
         }

@@ -10,7 +10,7 @@ namespace {
 
 std::string_view substituteOf(const LOC2_Locale& codeSet) noexcept {
     if (codeSet.codePage == LOC2_UTF8) {
-        return Utf8::kReplacement;
+        return Utf8::replacement;
     }
     return codeSet.singleByte ? "\x1A" : "?";
 }
@@ -97,9 +97,9 @@ std::size_t refusedLength(const LOC2_Locale& from, std::string_view source, int 
 /// holds back. Returns 0, or errno.
 int step(iconv_t converter, Target& target, std::string_view* source) noexcept {
     // A character that does not fit may have been begun: what it has overwritten is put back.
-    constexpr std::size_t kMaxCharacter = 8;
-    char saved[kMaxCharacter];
-    const std::size_t savedSize = std::min(target.room(), kMaxCharacter);
+    constexpr std::size_t maxCharacter = 8;
+    char saved[maxCharacter];
+    const std::size_t savedSize = std::min(target.room(), maxCharacter);
     char* const limit = target.end() + target.room();
     std::copy_n(limit - savedSize, savedSize, saved);
 

@@ -7,8 +7,8 @@
 namespace {
 
 /// The agent takes a time stamp as 16 bytes, whatever the length of the value.
-constexpr std::size_t kReadable = 16;
-constexpr std::size_t kMaxLength = std::numeric_limits<std::int16_t>::max();
+constexpr std::size_t readable = 16;
+constexpr std::size_t maxLength = std::numeric_limits<std::int16_t>::max();
 
 std::string numberValue(std::int64_t number) {
     std::string value(sizeof number, '\0');
@@ -32,7 +32,7 @@ std::string valueOf(const Condition& condition) {
         return numberValue(condition.number);
     }
     std::string value = condition.op == INTF_IN ? joined(condition.values) : condition.text;
-    value.resize(std::min(std::strlen(value.c_str()), kMaxLength));
+    value.resize(std::min(std::strlen(value.c_str()), maxLength));
     return value;
 }
 
@@ -46,7 +46,7 @@ FilterList::FilterList(const std::vector<Condition>& conditions) {
         std::string& value = m_values.emplace_back(valueOf(condition));
         const auto length = static_cast<std::int16_t>(value.size());
         // With NULs: ColumnIsException is handed a value without its length.
-        value.resize(std::max(value.size(), kReadable));
+        value.resize(std::max(value.size(), readable));
         const bool isNumber = condition.isNumber && condition.op != INTF_IN;
         m_filters.push_back({condition.column.c_str(), condition.op,
                              isNumber ? SEL1_INTEGER : SEL1_CHARACTER, length, value.c_str()});

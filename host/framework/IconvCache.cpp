@@ -5,7 +5,7 @@
 namespace {
 
 // A process converts between UTF-8 and its own code set, one way and the other.
-constexpr unsigned kEntries = 4;
+constexpr unsigned entries = 4;
 
 struct Entry {
     std::uint32_t to;
@@ -13,7 +13,7 @@ struct Entry {
     iconv_t converter;
 };
 
-thread_local Entry t_entries[kEntries];
+thread_local Entry t_entries[entries];
 thread_local unsigned t_used = 0;
 thread_local unsigned t_oldest = 0;
 
@@ -33,11 +33,11 @@ struct Closer {
 thread_local Closer t_closer;
 
 Entry& entryToFill() noexcept {
-    if (t_used < kEntries) {
+    if (t_used < entries) {
         return t_entries[t_used++];
     }
     Entry& oldest = t_entries[t_oldest];
-    t_oldest = (t_oldest + 1) % kEntries;
+    t_oldest = (t_oldest + 1) % entries;
     iconv_close(oldest.converter);
     return oldest;
 }

@@ -11,7 +11,7 @@
 
 namespace {
 
-constexpr int kMaxHostName = 255;
+constexpr int maxHostName = 255;
 
 /// Length of the host name without its domain; a name that begins with a dot is taken whole.
 int shortLength(const char* host) {
@@ -26,8 +26,8 @@ void DetermineLocalHost(char* name, int size) {
         return;
     }
     // gethostname need not terminate a name that it cuts.
-    char host[kMaxHostName + 1] = "";
-    if (gethostname(host, kMaxHostName) != 0 || *host == '\0') {
+    char host[maxHostName + 1] = "";
+    if (gethostname(host, maxHostName) != 0 || *host == '\0') {
         std::strcpy(host, "unknown");
     }
     // The node type tells systems of one host apart, so where room is short the host name gives.

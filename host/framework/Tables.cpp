@@ -9,8 +9,8 @@ namespace {
 
 // Far more than the agent has. Constant-initialised and without a destructor, since requests may
 // be asked for while the process exits.
-constexpr unsigned kMaxTables = 16;
-std::atomic<TableManager*> g_tables[kMaxTables];
+constexpr unsigned maxTables = 16;
+std::atomic<TableManager*> g_tables[maxTables];
 
 } // namespace
 

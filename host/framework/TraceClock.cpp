@@ -10,7 +10,7 @@
 
 namespace {
 
-constexpr std::int64_t kQuarter = 15 * 60;
+constexpr std::int64_t quarterHour = 15 * 60;
 
 /// What was learnt last: the quarter (counted from the epoch) in the upper half, the offset from
 /// UTC in seconds in the lower. 0 is midnight of the epoch, at UTC.
@@ -31,7 +31,7 @@ std::int64_t offsetOf(std::uint64_t learnt) noexcept {
 
 std::int64_t offsetAt(std::time_t seconds) noexcept {
     const std::uint64_t learnt = g_learnt.load(std::memory_order_relaxed);
-    const std::int64_t quarter = seconds / kQuarter;
+    const std::int64_t quarter = seconds / quarterHour;
     if (quarterOf(learnt) == quarter || ForkedChild::isCaller()) {
         return offsetOf(learnt);
     }

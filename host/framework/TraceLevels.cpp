@@ -7,17 +7,17 @@
 
 namespace {
 
-constexpr unsigned kAll = TRC1_ERROR | TRC1_FLOW | TRC1_DETAIL | TRC1_FINE;
-constexpr unsigned kMaxLevel = 0xff;
+constexpr unsigned all = TRC1_ERROR | TRC1_FLOW | TRC1_DETAIL | TRC1_FINE;
+constexpr unsigned maxLevel = 0xff;
 
 struct ClassName {
     std::string_view name;
     unsigned level;
 };
 
-constexpr ClassName kClasses[] = {
+constexpr ClassName traceClasses[] = {
     {"error", TRC1_ERROR}, {"flow", TRC1_FLOW}, {"detail", TRC1_DETAIL},
-    {"fine", TRC1_FINE},   {"all", kAll},       {"none", 0},
+    {"fine", TRC1_FINE},   {"all", all},        {"none", 0},
 };
 
 std::string_view trimmed(std::string_view text) {
@@ -42,7 +42,7 @@ std::optional<unsigned> numberOf(std::string_view text) {
     unsigned value = 0;
     const char* const end = text.data() + text.size();
     const auto result = std::from_chars(text.data(), end, value, isHexadecimal ? 16 : 10);
-    if (result.ec != std::errc() || result.ptr != end || value > kMaxLevel) {
+    if (result.ec != std::errc() || result.ptr != end || value > maxLevel) {
         return std::nullopt;
     }
     return value;
@@ -50,9 +50,9 @@ std::optional<unsigned> numberOf(std::string_view text) {
 
 std::optional<unsigned> classOf(std::string_view name) {
     const auto* const found =
-        std::find_if(std::begin(kClasses), std::end(kClasses),
+        std::find_if(std::begin(traceClasses), std::end(traceClasses),
                      [name](const ClassName& known) { return known.name == name; });
-    return found != std::end(kClasses) ? found->level : numberOf(name);
+    return found != std::end(traceClasses) ? found->level : numberOf(name);
 }
 
 /// The unit's name without the ending of the source file.

@@ -33,7 +33,7 @@ void TraceRecord::add(const char* format, ...) noexcept {
 }
 
 void TraceRecord::addList(const char* format, std::va_list arguments) noexcept {
-    const std::size_t room = kMaxSize - m_size;
+    const std::size_t room = maxSize - m_size;
     const int length = std::vsnprintf(m_text + m_size, room, format, arguments);
     // The place of the terminator is the newline's at last.
     m_size += std::min(static_cast<std::size_t>(std::max(length, 0)), room - 1);
@@ -59,7 +59,7 @@ std::string_view TraceRecord::escaped() noexcept {
             sequence.valid ? Utf8::character(bytes) : static_cast<unsigned char>(bytes.front());
         const bool isShown =
             (bytes.size() == 1 && isPlain(bytes.front())) || !Utf8::isSteering(character);
-        if (size + std::max<std::size_t>(bytes.size(), longestEscape) >= kMaxSize) {
+        if (size + std::max<std::size_t>(bytes.size(), longestEscape) >= maxSize) {
             break;
         }
         if (isShown) {

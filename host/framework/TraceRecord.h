@@ -12,7 +12,7 @@
 /// locks nor allocates.
 class TraceRecord {
 public:
-    static constexpr std::size_t kMaxSize = 16384; ///< bytes, with the newline
+    static constexpr std::size_t maxSize = 16384; ///< bytes, with the newline
 
     TraceRecord(const std::timespec& moment, long thread, const char* unit, int line) noexcept;
 
@@ -28,8 +28,8 @@ private:
     std::string_view escaped() noexcept;
 
     std::size_t m_size = 0;
-    char m_text[kMaxSize];
-    char m_escaped[kMaxSize]; ///< used where something is to be escaped
+    char m_text[maxSize];
+    char m_escaped[maxSize]; ///< used where something is to be escaped
 };
 
 #endif

@@ -17,10 +17,11 @@ public:
     using Handler = std::function<HttpAnswer(const HttpRequest&)>;
 
     /// Who may ask.
-    enum Access {
+    enum class Access {
         TOKEN,  ///< who carries the API token
         PUBLIC, ///< anyone that reaches this server
     };
+    using enum Access;
 
     /// Where a handler runs.
     enum Lane {

@@ -14,7 +14,8 @@
 /// is over or when giving up is requested. Used by one thread.
 class Connection {
 public:
-    enum Transport { TCP, UDP };
+    enum class Transport { TCP, UDP };
+    using enum Transport;
 
     /// Not open yet. `timeout` is for each wait.
     Connection(ListenAddress receiver, Transport transport, std::chrono::milliseconds timeout);

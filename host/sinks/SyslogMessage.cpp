@@ -100,5 +100,5 @@ std::string SyslogMessage::text(const EventRecord& event) const {
     appendParameter(text, "severity", event.severity);
     appendParameter(text, "log", event.log);
     text += "] ";
-    return text + messageText(row.description(), kLongest - std::min(text.size(), kLongest));
+    return text + messageText(row.description(), longest - std::min(text.size(), longest));
 }

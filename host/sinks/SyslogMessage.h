@@ -11,7 +11,7 @@
 class SyslogMessage {
 public:
     /// The size that every receiver should take, and beyond which a text is cut.
-    static constexpr std::size_t kLongest = 2048;
+    static constexpr std::size_t longest = 2048;
 
     /// `facility` is one of syslogFacilities.
     explicit SyslogMessage(std::string_view facility);

@@ -9,8 +9,8 @@ namespace {
 
 TRC1_Anchor anchor{"SituationSet.cpp"};
 
-constexpr auto FILE_SOURCE = SituationStatus::FILE;
-constexpr auto API_SOURCE = SituationStatus::API;
+constexpr auto fileSource = SituationStatus::FILE;
+constexpr auto apiSource = SituationStatus::API;
 
 SituationRefusal unknown(const std::string& name) {
     return {SituationRefusal::UNKNOWN, "there is no situation '" + name + "'"};
@@ -29,7 +29,7 @@ SituationRefusal missing(bool isInFile, const std::string& name) {
 
 /// The key under which the runner has a situation.
 std::string runnerKey(SituationStatus::Source source, const std::string& name) {
-    return (source == FILE_SOURCE ? "file " : "API ") + name;
+    return (source == fileSource ? "file " : "API ") + name;
 }
 
 } // namespace
@@ -68,7 +68,7 @@ std::string SituationSet::load() {
     SituationStore::Content content = m_store.load(message);
     const std::lock_guard guard(m_mutex);
     for (SituationStore::Made& made : content.made) {
-        const Key key{API_SOURCE, made.config.name};
+        const Key key{apiSource, made.config.name};
         Record& record = m_records[key];
         record.config = std::move(made.config);
         record.isStopped = made.isStopped;
@@ -89,7 +89,7 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
         }
         for (auto record = m_records.begin(); record != m_records.end();) {
             const auto& [source, name] = record->first;
-            if (source == FILE_SOURCE && !names.contains(name)) {
+            if (source == fileSource && !names.contains(name)) {
                 m_runner.stop(runnerKey(source, name));
                 record = m_records.erase(record);
             } else {
@@ -99,7 +99,7 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
         std::erase_if(m_stoppedFiles,
                       [&](const std::string& name) { return !names.contains(name); });
         for (const SituationConfig& config : configs) {
-            const Key key{FILE_SOURCE, config.name};
+            const Key key{fileSource, config.name};
             const auto found = m_records.find(key);
             if (found == m_records.end() || found->second.config != config) {
                 Record record{config};
@@ -110,7 +110,7 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
         }
         // What the file has come to name, or names no more, shadows others or does not.
         for (const auto& [key, record] : m_records) {
-            if (key.first == API_SOURCE) {
+            if (key.first == apiSource) {
                 runAgain(key, record);
             }
         }
@@ -156,7 +156,7 @@ std::optional<SituationStatus> SituationSet::find(const std::string& name) const
 SituationSet::Changed SituationSet::orTooLarge(const Records& records, const Key& key) {
     PatternBudget budget(PatternBudget::ofSource);
     for (const auto& [one, record] : records) {
-        if (one.first == API_SOURCE) {
+        if (one.first == apiSource) {
             budget.spend(record.config.patternSize);
         }
     }
@@ -177,13 +177,13 @@ SituationSet::Change SituationSet::add(const SituationConfig& config) {
         }
         const auto made =
             std::count_if(draft.records.begin(), draft.records.end(),
-                          [](const auto& one) { return one.first.first == API_SOURCE; });
+                          [](const auto& one) { return one.first.first == apiSource; });
         if (static_cast<std::size_t>(made) >= mostMade) {
             return SituationRefusal{SituationRefusal::TOO_MANY,
                                     "there are " + std::to_string(mostMade) +
                                         " situations made through the API: remove one first"};
         }
-        const Key key{API_SOURCE, config.name};
+        const Key key{apiSource, config.name};
         draft.records.emplace(key, Record{config});
         return orTooLarge(draft.records, key);
     }));
@@ -191,7 +191,7 @@ SituationSet::Change SituationSet::add(const SituationConfig& config) {
 
 SituationSet::Change SituationSet::replace(const SituationConfig& config) {
     return statusAfter(change([&](Draft& draft) -> Changed {
-        const Key key{API_SOURCE, config.name};
+        const Key key{apiSource, config.name};
         const auto found = draft.records.find(key);
         if (found == draft.records.end()) {
             return missing(named(draft.records, config.name) != nullptr, config.name);
@@ -208,7 +208,7 @@ SituationSet::Change SituationSet::replace(const SituationConfig& config) {
 
 std::optional<SituationRefusal> SituationSet::remove(const std::string& name) {
     Changed changed = change([&](Draft& draft) -> Changed {
-        const Key key{API_SOURCE, name};
+        const Key key{apiSource, name};
         if (draft.records.erase(key) == 0) {
             return missing(named(draft.records, name) != nullptr, name);
         }
@@ -234,9 +234,9 @@ SituationSet::Change SituationSet::setStopped(const std::string& name, bool isSt
         }
         const Key key = found->first;
         draft.records[key].isStopped = isStopped;
-        if (key.first == FILE_SOURCE && isStopped) {
+        if (key.first == fileSource && isStopped) {
             draft.stoppedFiles.insert(name);
-        } else if (key.first == FILE_SOURCE) {
+        } else if (key.first == fileSource) {
             draft.stoppedFiles.erase(name);
         }
         return key;
@@ -286,7 +286,7 @@ void SituationSet::publish(const Key& key, const Draft& draft) {
         m_runner.stop(runnerKey(key.first, key.second));
         return;
     }
-    if (key.first == FILE_SOURCE) {
+    if (key.first == fileSource) {
         if (found != m_records.end()) {
             if (drafted->second.isStopped) {
                 m_stoppedFiles.insert(key.second);
@@ -323,7 +323,7 @@ SituationSet::Change SituationSet::statusAfter(const Changed& changed) const {
 /// The one that a name stands for in the API: the file's situation hides one made through it.
 const SituationSet::Records::value_type* SituationSet::named(const Records& records,
                                                              const std::string& name) {
-    for (const auto source : {FILE_SOURCE, API_SOURCE}) {
+    for (const auto source : {fileSource, apiSource}) {
         const auto found = records.find({source, name});
         if (found != records.end()) {
             return &*found;
@@ -333,7 +333,7 @@ const SituationSet::Records::value_type* SituationSet::named(const Records& reco
 }
 
 bool SituationSet::isShadowed(const Key& key) const {
-    return key.first == API_SOURCE && m_records.contains({FILE_SOURCE, key.second});
+    return key.first == apiSource && m_records.contains({fileSource, key.second});
 }
 
 /// Lets a record that is new or has changed run, or not.
@@ -360,7 +360,7 @@ void SituationSet::runAgain(const Key& key, const Record& record) {
 std::optional<SituationRefusal> SituationSet::save(const Draft& draft) {
     SituationStore::Content content;
     for (const auto& [key, record] : draft.records) {
-        if (key.first == API_SOURCE) {
+        if (key.first == apiSource) {
             content.made.push_back({record.config, record.isStopped});
         }
     }

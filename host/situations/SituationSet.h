@@ -23,7 +23,7 @@
 
 /// Why the situations were not changed.
 struct SituationRefusal {
-    enum Reason {
+    enum class Reason {
         UNKNOWN,   ///< there is none of this name
         EXISTS,    ///< the name is taken
         FROM_FILE, ///< the situation belongs to the configuration file
@@ -31,6 +31,7 @@ struct SituationRefusal {
         NOT_SAVED, ///< the change could not be made to last
         BUSY,      ///< other changes take too long
     };
+    using enum Reason;
     Reason reason;
     std::string detail; ///< what is wrong and what to do about it
 };

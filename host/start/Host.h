@@ -51,7 +51,8 @@ public:
 
 private:
     using Clock = Serving::Clock;
-    enum State { BEFORE, STARTING, SERVING, STOPPING, ENDED };
+    enum class State { BEFORE, STARTING, SERVING, STOPPING, ENDED };
+    using enum State;
 
     Host() = default;
     bool begin();

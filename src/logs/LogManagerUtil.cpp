@@ -36,10 +36,10 @@ bool Reader::open(const TraceScope& trace, const char* path) {
         trace.error()("Error opening file %s; errno = %d", path, errno);
         return false;
     }
-    line = new (std::nothrow) char[LogManagerUtil::RECORD_SIZE];
+    line = new (std::nothrow) char[LogManagerUtil::recordSize];
     if (line == nullptr) {
         trace.error()("Memory allocation for %d bytes failed; errno = %d",
-                      LogManagerUtil::RECORD_SIZE, errno);
+                      LogManagerUtil::recordSize, errno);
         close();
         return false;
     }
@@ -92,7 +92,7 @@ std::time_t LogManagerUtil::fileLastModified(const char* path) {
 
 char* LogManagerUtil::nextRecord(std::FILE* stream, char* line) {
     bool tooLong = false;
-    while (std::fgets(line, RECORD_SIZE, stream) != nullptr) {
+    while (std::fgets(line, recordSize, stream) != nullptr) {
         if (line[0] == '#') {
             continue;
         }

@@ -16,9 +16,9 @@ std::FILE* openStream(const char* path, const char* mode);
 std::time_t fileLastModified(const char* path);
 
 /// Bytes of a line of a configuration file, with newline and terminator.
-inline constexpr int RECORD_SIZE = 1024;
+inline constexpr int recordSize = 1024;
 
-/// Reads the next record of an open configuration file into `line`, which has RECORD_SIZE bytes,
+/// Reads the next record of an open configuration file into `line`, which has recordSize bytes,
 /// and returns it without leading white space and newline; null at the end of the file or on an
 /// error. Comments, blank lines, lines that are too long and a last line without a newline are
 /// passed over. Any thread that owns stream and line.

@@ -36,6 +36,6 @@ static_assert(offsetof(zrm_rmlogent_data_t, ulogpath) == 848);
 static_assert(offsetof(zrm_rmlogent_data_t, uentrydesc) == 2096);
 
 /// The framework has no room now: nothing was offered. To the logs alone.
-inline constexpr unsigned TABLE_NO_ROOM = 0x21060008;
+inline constexpr unsigned tableNoRoom = 0x21060008;
 
 #endif

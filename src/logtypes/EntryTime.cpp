@@ -9,7 +9,7 @@
 
 namespace {
 
-constexpr long YEARS_OF_CENTURY = 100;
+constexpr long yearsOfCentury = 100;
 
 /// The local time of the second that the thread asked for last.
 struct LocalTime {
@@ -37,8 +37,8 @@ const std::tm* currentTime() {
 }
 
 void setYear(EntryTime& time, int yearsSince1900) {
-    time.century = yearsSince1900 < YEARS_OF_CENTURY ? 0 : 1;
-    time.year = yearsSince1900 - time.century * YEARS_OF_CENTURY;
+    time.century = yearsSince1900 < yearsOfCentury ? 0 : 1;
+    time.year = yearsSince1900 - time.century * yearsOfCentury;
 }
 
 bool isDigitPair(long number) {
@@ -57,11 +57,11 @@ bool EntryTime::completeFromClock() noexcept {
     if (now == nullptr) {
         return false;
     }
-    if (year == UNKNOWN) {
+    if (year == unknown) {
         setYear(*this, now->tm_year);
     }
     const auto complete = [](long& part, int current) {
-        if (part == UNKNOWN) {
+        if (part == unknown) {
             part = current;
         }
     };
@@ -77,7 +77,7 @@ bool EntryTime::today(EntryTime& date) noexcept {
     if (now == nullptr) {
         return false;
     }
-    date.year = now->tm_year % YEARS_OF_CENTURY;
+    date.year = now->tm_year % yearsOfCentury;
     date.century = date.year < 70 ? 1 : 0;
     date.month = now->tm_mon + 1;
     date.day = now->tm_mday;
@@ -95,13 +95,13 @@ int EntryTime::write(char* out) const noexcept {
         for (const long pair : pairs) {
             out = writePair(out, pair);
         }
-        return TEXT_LENGTH;
+        return textLength;
     }
     char text[7 * 24];
     const int length = std::snprintf(text, sizeof text, "%ld%02ld%02ld%02ld%02ld%02ld%02ld00",
                                      century, year, month, day, hour, minute, second);
-    if (length == TEXT_LENGTH) {
-        std::memcpy(out, text, TEXT_LENGTH);
+    if (length == textLength) {
+        std::memcpy(out, text, textLength);
     }
     return length;
 }

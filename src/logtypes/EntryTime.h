@@ -3,20 +3,20 @@
 
 /// The parts of a user log entry's time, as far as they are known.
 struct EntryTime {
-    static constexpr long UNKNOWN = -1;
-    static constexpr int TEXT_LENGTH = 15; ///< characters that write() must give
+    static constexpr long unknown = -1;
+    static constexpr int textLength = 15; ///< characters that write() must give
 
-    long century = UNKNOWN; ///< 1 for the years 2000 to 2069, 0 for 1970 to 1999
-    long year = UNKNOWN;    ///< two digits
-    long month = UNKNOWN;   ///< 1 to 12
-    long day = UNKNOWN;
-    long hour = UNKNOWN; ///< 24 may occur
-    long minute = UNKNOWN;
+    long century = unknown; ///< 1 for the years 2000 to 2069, 0 for 1970 to 1999
+    long year = unknown;    ///< two digits
+    long month = unknown;   ///< 1 to 12
+    long day = unknown;
+    long hour = unknown; ///< 24 may occur
+    long minute = unknown;
     long second = 0;
 
     bool isComplete() const noexcept {
-        return year != UNKNOWN && month != UNKNOWN && day != UNKNOWN && hour != UNKNOWN &&
-               minute != UNKNOWN;
+        return year != unknown && month != unknown && day != unknown && hour != unknown &&
+               minute != unknown;
     }
     /// Takes what is unknown from the current local time. False, with errno, when that cannot be
     /// told. Asks the system for the time zone once per second and thread.

@@ -3,14 +3,14 @@
 
 /// The texts of one entry's time fields, terminated; an empty one was not in the entry.
 struct _EntryTimeBuffers {
-    static constexpr int ROOM = 7; ///< characters of each
+    static constexpr int room = 7; ///< characters of each
 
-    char year[ROOM + 1];
-    char month[ROOM + 1];
-    char day[ROOM + 1];
-    char hour[ROOM + 1];
-    char minute[ROOM + 1];
-    char second[ROOM + 1];
+    char year[room + 1];
+    char month[room + 1];
+    char day[room + 1];
+    char hour[room + 1];
+    char minute[room + 1];
+    char second[room + 1];
 };
 
 #endif

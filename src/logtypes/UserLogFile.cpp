@@ -116,12 +116,12 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     prepareRow(columns);
     _EntryTimeBuffers times{};
     _FormatBuffer buffers[] = {
-        {times.year, _EntryTimeBuffers::ROOM},
-        {times.month, _EntryTimeBuffers::ROOM},
-        {times.day, _EntryTimeBuffers::ROOM},
-        {times.hour, _EntryTimeBuffers::ROOM},
-        {times.minute, _EntryTimeBuffers::ROOM},
-        {times.second, _EntryTimeBuffers::ROOM},
+        {times.year, _EntryTimeBuffers::room},
+        {times.month, _EntryTimeBuffers::room},
+        {times.day, _EntryTimeBuffers::room},
+        {times.hour, _EntryTimeBuffers::room},
+        {times.minute, _EntryTimeBuffers::room},
+        {times.second, _EntryTimeBuffers::room},
         {columns->entrysys, sizeof columns->entrysys},
         {columns->entrysrc, sizeof columns->entrysrc},
         {columns->entrytype, sizeof columns->entrytype},

@@ -17,8 +17,8 @@ namespace {
 
 TRC1_Anchor anchor{"UserLogFileReport.cpp"};
 
-constexpr std::int64_t LONGEST_LINE = 2047; ///< the pieces in which monitoring reads lines
-constexpr int MOST_ERRORS = 10;             ///< bad lines in a row
+constexpr std::int64_t longestLine = 2047; ///< the pieces in which monitoring reads lines
+constexpr int mostErrors = 10;             ///< bad lines in a row
 
 } // namespace
 
@@ -97,10 +97,10 @@ void* UserLogFile::getNextLogEntry(void* row, void* bufferInfo, void* thresholds
     int errors = 0;
     while (char* const line = previousLine(info)) {
         if (formatEntryAsRow(line, row, &info) != 0) {
-            if (++errors > MOST_ERRORS) {
+            if (++errors > mostErrors) {
                 trace.error()("Error: more than %d consecutive errors have occurred while trying "
                               "to build report for log %s. Report request is terminating.",
-                              MOST_ERRORS, fileNameLocal());
+                              mostErrors, fileNameLocal());
                 ReportOutcome::note(ReportEnd::formatErrors);
                 break;
             }
@@ -131,14 +131,14 @@ char* UserLogFile::previousLine(UserlogBufferInfo& info) {
     // the last character.
     std::int64_t position = info.bufferCount - 2;
     for (;;) {
-        const std::int64_t tooFar = std::max<std::int64_t>(info.bufferCount - LONGEST_LINE - 2, -1);
+        const std::int64_t tooFar = std::max<std::int64_t>(info.bufferCount - longestLine - 2, -1);
         while (position > tooFar && info.pBuffer[position] != '\n') {
             --position;
         }
         const std::int64_t length = info.bufferCount - position - 1;
         const bool isWhole = position >= 0 || info.bytesLeft < 1;
-        if (length > LONGEST_LINE) {
-            return trace.result(endAtLongLine(info, LONGEST_LINE + 1));
+        if (length > longestLine) {
+            return trace.result(endAtLongLine(info, longestLine + 1));
         }
         if (isWhole) {
             break;

@@ -71,7 +71,7 @@ long monthByName(const char* text) {
 /// Dates an entry of a report without a year by the entry read before it, which is newer: a later
 /// day of the year means that a new year was crossed going backwards.
 void takeYearFromReport(EntryTime& time, UserlogBufferInfo& context) {
-    const bool isDateKnown = time.month != EntryTime::UNKNOWN && time.day != EntryTime::UNKNOWN;
+    const bool isDateKnown = time.month != EntryTime::unknown && time.day != EntryTime::unknown;
     if (isDateKnown) {
         if (time.month > context.month || (time.month == context.month && time.day > context.day)) {
             if (context.year >= 1) {
@@ -99,7 +99,7 @@ long UserLogFile::formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, voi
     readHour(texts->hour, time);
     readMinute(texts->minute, time);
     readSecond(texts->second, time);
-    if (reportContext != nullptr && time.year == EntryTime::UNKNOWN) {
+    if (reportContext != nullptr && time.year == EntryTime::unknown) {
         takeYearFromReport(time, *static_cast<UserlogBufferInfo*>(reportContext));
     }
     if (!time.isComplete() && !time.completeFromClock()) {
@@ -110,13 +110,13 @@ long UserLogFile::formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, voi
         return trace.result(-1L);
     }
     const int length = time.write(entryTime);
-    if (length != EntryTime::TEXT_LENGTH) {
+    if (length != EntryTime::textLength) {
         trace.error()("Error: formatting of entrytime into table row failed; expected to write %d "
                       "characters but wrote %d.",
-                      EntryTime::TEXT_LENGTH, length);
+                      EntryTime::textLength, length);
         return trace.result(-1L);
     }
-    entryTime[EntryTime::TEXT_LENGTH] = '0';
+    entryTime[EntryTime::textLength] = '0';
     return trace.result(0L);
 }
 
@@ -178,7 +178,7 @@ void UserLogFile::readDay(const char* text, EntryTime& time) const {
         return;
     }
     const Number number(text);
-    const long last = time.month == EntryTime::UNKNOWN ? mostDays : daysOfMonth[time.month - 1];
+    const long last = time.month == EntryTime::unknown ? mostDays : daysOfMonth[time.month - 1];
     if (!number.isWhole || number.value < 1 || number.value > last) {
         TraceScope trace(anchor);
         trace.error()("Error: invalid day found in event entrytime; '%s'", text);

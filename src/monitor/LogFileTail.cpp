@@ -182,7 +182,7 @@ bool LogFile::readGrowth() {
 bool LogFile::offer(zrm_rmlogent_data_t* row) {
     for (;;) {
         if (EventRoom::mayOffer() &&
-            (m_rowReceiver == nullptr || m_rowReceiver(row, 1) != TABLE_NO_ROOM)) [[likely]] {
+            (m_rowReceiver == nullptr || m_rowReceiver(row, 1) != tableNoRoom)) [[likely]] {
             return true;
         }
         m_pulse.work("waits for room in the queue of events");

@@ -33,15 +33,15 @@ void add(std::atomic<std::int64_t>& counter, std::int64_t count) noexcept {
 /// The place of the next entry, that of the oldest one once KEPT are there; null without memory.
 template <typename Entry> Entry* LogLedger::Latest<Entry>::next() noexcept {
     if (!entries) {
-        entries.reset(new (std::nothrow) Entry[KEPT]);
+        entries.reset(new (std::nothrow) Entry[mostKept]);
     }
-    return entries ? &entries[count++ % KEPT] : nullptr;
+    return entries ? &entries[count++ % mostKept] : nullptr;
 }
 
 template <typename Entry> std::size_t LogLedger::Latest<Entry>::copy(Entry* out) const noexcept {
-    const std::size_t kept = std::min(count, KEPT);
+    const std::size_t kept = std::min(count, mostKept);
     for (std::size_t i = 0; i < kept; ++i) {
-        out[i] = entries[(count - kept + i) % KEPT];
+        out[i] = entries[(count - kept + i) % mostKept];
     }
     return kept;
 }
@@ -61,9 +61,9 @@ void LogLedger::addBytes(std::int64_t count) noexcept {
 }
 
 void LogLedger::noteEntries() noexcept {
-    constexpr std::int64_t NANOSECONDS = 1'000'000'000;
+    constexpr std::int64_t nanoseconds = 1'000'000'000;
     const std::timespec time = now();
-    m_lastEntry.store(time.tv_sec * NANOSECONDS + time.tv_nsec, std::memory_order_relaxed);
+    m_lastEntry.store(time.tv_sec * nanoseconds + time.tv_nsec, std::memory_order_relaxed);
 }
 
 void LogLedger::noteRejected(const char* line) noexcept {

@@ -37,7 +37,7 @@ public:
         std::int64_t unread; ///< bytes of the old contents; -1: not known
         Truncation kind;
     };
-    static constexpr std::size_t KEPT = 16; ///< lines and ranges that are kept, the latest
+    static constexpr std::size_t mostKept = 16; ///< lines and ranges that are kept, the latest
 
     LogLedger() = default;
     LogLedger(const LogLedger&) = delete;

@@ -7,7 +7,7 @@
 /// Where one directive is put together while it is learned: the place in the format text and the
 /// directive built so far. One thread, one directive.
 struct _BuildArea {
-    static constexpr std::size_t LIMIT = 255; ///< characters of a directive; one more terminates it
+    static constexpr std::size_t limit = 255; ///< characters of a directive; one more terminates it
 
     explicit _BuildArea(const char* start) noexcept : position(start) {}
 
@@ -19,7 +19,7 @@ struct _BuildArea {
     }
     /// Inserts all of the characters in front of the one at `index`, or none and returns false.
     bool insert(std::size_t index, const char* text, std::size_t length) noexcept {
-        if (count + length > LIMIT) {
+        if (count + length > limit) {
             return false;
         }
         std::memmove(buffer + index + length, buffer + index, count - index);
@@ -34,7 +34,7 @@ struct _BuildArea {
     int length() const noexcept { return static_cast<int>(count); }
 
     const char* position; ///< in the format text
-    char buffer[LIMIT + 1] = "";
+    char buffer[limit + 1] = "";
     std::size_t count = 0; ///< characters in the buffer
 };
 

@@ -66,17 +66,17 @@ inline constexpr Escape escapes[] = {
     {'b', '\b'}, {'n', '\n'},  {'r', '\r'}, {'t', '\t'},  {'v', '\v'},
 };
 
-inline constexpr int MAX_COLUMN = 1023;         ///< last column that a field may start at
-inline constexpr int MAX_COLUMN_CHARACTERS = 4; ///< digits and ')': columns end at 999 in fact
-inline constexpr int MAX_SCAN_WIDTH = 1023;     ///< most characters that a field may take
-inline constexpr int MAX_SCAN_WIDTH_DIGITS = 4;
-inline constexpr int MAX_PRINT_WIDTH = 256; ///< largest minimum width of a printed field
-inline constexpr int MAX_PRINT_WIDTH_DIGITS = 3;
-inline constexpr int MAX_PRECISION = 256;
-inline constexpr int MAX_PRECISION_CHARACTERS = 3; ///< the point included: two digits in fact
-inline constexpr unsigned DEFAULT_TEXT_SIZE = 31;  ///< most characters of a text without a width
-inline constexpr std::string_view DEFAULT_TEXT_WIDTH = "31";
-inline constexpr std::string_view CONSUMED_COUNT = "%n"; ///< ends each scan directive
+inline constexpr int maxColumn = 1023;        ///< last column that a field may start at
+inline constexpr int maxColumnCharacters = 4; ///< digits and ')': columns end at 999 in fact
+inline constexpr int maxScanWidth = 1023;     ///< most characters that a field may take
+inline constexpr int maxScanWidthDigits = 4;
+inline constexpr int maxPrintWidth = 256; ///< largest minimum width of a printed field
+inline constexpr int maxPrintWidthDigits = 3;
+inline constexpr int maxPrecision = 256;
+inline constexpr int maxPrecisionCharacters = 3; ///< the point included: two digits in fact
+inline constexpr unsigned defaultTextSize = 31;  ///< most characters of a text without a width
+inline constexpr std::string_view defaultTextWidth = "31";
+inline constexpr std::string_view consumedCount = "%n"; ///< ends each scan directive
 
 /// White space as the C library's scanner knows it in the "C" locale.
 constexpr bool isWhiteSpace(char character) noexcept {

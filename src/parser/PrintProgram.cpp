@@ -12,7 +12,7 @@ namespace {
 
 /// Holds the longest text that a directive can give: a long double has up to 4933 digits, which
 /// thousands grouping stretches by a third, and the directive's own text adds 255.
-constexpr std::size_t WORK_SIZE = 8192;
+constexpr std::size_t workSize = 8192;
 
 template <typename Type> Type valueAt(const void* value) {
     Type result;
@@ -37,10 +37,10 @@ bool isInteger(Receiver receiver) {
            receiver == Receiver::INTEGER8;
 }
 
-constexpr std::size_t SMALL_LENGTH = 4;
+constexpr std::size_t smallLength = 4;
 
 /// Prints a number that is small and needs no padding, as the parts of a time do; false, with
-/// nothing printed, for others. There is room for SMALL_LENGTH characters.
+/// nothing printed, for others. There is room for smallLength characters.
 inline bool printSmall(std::uint32_t number, std::size_t width, _FormatBuffer& buffer) {
     if (number < 10 && width <= 1) {
         *buffer.position = static_cast<char>('0' + number);
@@ -52,10 +52,10 @@ inline bool printSmall(std::uint32_t number, std::size_t width, _FormatBuffer& b
         buffer.advance(2);
         return true;
     }
-    if (number >= 1000 && number < 10000 && width <= SMALL_LENGTH) {
+    if (number >= 1000 && number < 10000 && width <= smallLength) {
         DigitPairs::put(buffer.position, number / 100);
         DigitPairs::put(buffer.position + 2, number % 100);
-        buffer.advance(SMALL_LENGTH);
+        buffer.advance(smallLength);
         return true;
     }
     return false;
@@ -115,7 +115,7 @@ PrintProgram::Kind PrintProgram::classify(const char* conversion) noexcept {
 
 bool PrintProgram::run(const void* value, _FormatBuffer& buffer) const noexcept {
     // A negative number is a large one here.
-    if (m_isBareInteger && buffer.room >= static_cast<long>(SMALL_LENGTH) &&
+    if (m_isBareInteger && buffer.room >= static_cast<long>(smallLength) &&
         printSmall(valueAt<std::uint32_t>(value), m_width, buffer)) {
         return true;
     }
@@ -160,7 +160,7 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
     }
     length = std::max(length, m_width);
     // Written from its right end, at its place when it fits there; else cut afterwards.
-    char cut[MAX_PRINT_WIDTH + 1];
+    char cut[maxPrintWidth + 1];
     const bool fits = buffer.room >= static_cast<long>(length);
     char* const begin = fits ? buffer.position : cut;
     char* next = begin + length;
@@ -185,7 +185,7 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
 }
 
 bool PrintProgram::printByLibrary(const void* value, _FormatBuffer& buffer) const noexcept {
-    char work[WORK_SIZE];
+    char work[workSize];
     int length = -1;
     switch (m_receiver) {
     case Receiver::INTEGER2:

@@ -16,12 +16,12 @@ constexpr unsigned char byteOf(char character) {
     return static_cast<unsigned char>(character);
 }
 
-constexpr unsigned char NO_DIGIT = 255;
+constexpr unsigned char noDigit = 255;
 
-/// The value of each digit, NO_DIGIT for characters that are none.
+/// The value of each digit, noDigit for characters that are none.
 constexpr auto digitValues = [] {
     std::array<unsigned char, 256> values{};
-    values.fill(NO_DIGIT);
+    values.fill(noDigit);
     for (unsigned char digit = 0; digit < 10; ++digit) {
         values[byteOf('0') + digit] = digit;
     }
@@ -55,9 +55,9 @@ constexpr IntegerCode integerCodes[] = {
 template <unsigned Base>
 const char* readDigits(const char* position, unsigned width, std::uint64_t& magnitude,
                        bool& overflowed) {
-    constexpr std::uint64_t MAX = std::numeric_limits<std::uint64_t>::max();
-    constexpr unsigned SAFE_DIGITS = 16; // so few digits never overflow
-    unsigned safe = width < SAFE_DIGITS ? width : SAFE_DIGITS;
+    constexpr std::uint64_t most = std::numeric_limits<std::uint64_t>::max();
+    constexpr unsigned safeDigits = 16; // so few digits never overflow
+    unsigned safe = width < safeDigits ? width : safeDigits;
     unsigned left = width - safe;
     unsigned digit = 0;
     while (safe > 0 && (digit = digitValues[byteOf(*position)]) < Base) {
@@ -66,8 +66,8 @@ const char* readDigits(const char* position, unsigned width, std::uint64_t& magn
         --safe;
     }
     while (safe == 0 && left > 0 && (digit = digitValues[byteOf(*position)]) < Base) {
-        overflowed =
-            overflowed || magnitude > MAX / Base || (magnitude == MAX / Base && digit > MAX % Base);
+        overflowed = overflowed || magnitude > most / Base ||
+                     (magnitude == most / Base && digit > most % Base);
         magnitude = magnitude * Base + digit;
         ++position;
         --left;
@@ -117,9 +117,9 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
                   : m_kind == Kind::TEXT && textWidth > 0 ? textWidth
                                                           : UINT_MAX;
     }
-    constexpr unsigned MOST_DIGITS = 9; // these fit into 32 bits of either sign
-    m_fewDigits = std::min(m_width, MOST_DIGITS);
-    m_isCounted = CONSUMED_COUNT == position;
+    constexpr unsigned mostDigits = 9; // these fit into 32 bits of either sign
+    m_fewDigits = std::min(m_width, mostDigits);
+    m_isCounted = consumedCount == position;
 }
 
 /// Returns the position behind the conversion.
@@ -268,10 +268,10 @@ int ScanProgram::scan(const char* text, void* value) const noexcept {
         }
     }
     if (outcome == Outcome::END) {
-        return END_OF_INPUT;
+        return endOfInput;
     }
     return outcome == Outcome::MATCHED && m_isCounted ? static_cast<int>(position - text)
-                                                      : MISMATCH;
+                                                      : mismatch;
 }
 
 ScanProgram::Place ScanProgram::findValue(const char* text) const noexcept {
@@ -365,8 +365,8 @@ void ScanProgram::storeInteger(std::uint64_t magnitude, bool isNegative, bool ov
                                void* value) const noexcept {
     std::uint64_t bits = isNegative ? 0 - magnitude : magnitude;
     if (m_isSigned) {
-        constexpr std::uint64_t LARGEST = std::numeric_limits<std::int64_t>::max();
-        const std::uint64_t limit = isNegative ? LARGEST + 1 : LARGEST;
+        constexpr std::uint64_t largest = std::numeric_limits<std::int64_t>::max();
+        const std::uint64_t limit = isNegative ? largest + 1 : largest;
         if (overflowed || magnitude > limit) {
             bits = limit;
         }

@@ -13,8 +13,8 @@
 /// run it into values of their own.
 class ScanProgram {
 public:
-    static constexpr int END_OF_INPUT = -1; ///< the text ended before the conversion had anything
-    static constexpr int MISMATCH = 0;
+    static constexpr int endOfInput = -1; ///< the text ended before the conversion had anything
+    static constexpr int mismatch = 0;
 
     ScanProgram() = default;
     ScanProgram(const ScanProgram&) = delete;
@@ -26,7 +26,7 @@ public:
 
     /// Scans `text` into `value`, the receiving variable of the directive's data type; a suppressed
     /// directive uses none. Texts are terminated, single characters are not. Returns the number
-    /// of characters that the directive took, MISMATCH or END_OF_INPUT. A directive without its
+    /// of characters that the directive took, MISMATCH or endOfInput. A directive without its
     /// "%n" cannot say how many it took and gives MISMATCH.
     int run(const char* text, void* value) const noexcept;
 

@@ -13,7 +13,7 @@ namespace {
 
 TRC1_Anchor anchor{"StringParser.cpp"};
 
-constexpr char START_PATTERN[] = " %*1[Aa] , \"%n";
+constexpr char startPattern[] = " %*1[Aa] , \"%n";
 
 /// Where a specifier without the right beginning goes wrong.
 std::size_t findBadStart(const char* text) {
@@ -38,11 +38,11 @@ StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* va
     const char* const text = formatSpecifier != nullptr ? formatSpecifier : "";
     int length = 0;
     // Only the count tells: the pattern stores nothing.
-    static_cast<void>(std::sscanf(text, START_PATTERN, &length));
+    static_cast<void>(std::sscanf(text, startPattern, &length));
     if (length == 0) {
         trace.error()(
             "Scan for start of format specifier failed; looking for \"%s\" but found:  %s",
-            START_PATTERN, text);
+            startPattern, text);
         ObjectStatus = OBJECT_FAILED;
         m_learnedTo = findBadStart(text);
         return;
@@ -156,8 +156,8 @@ const char* StringParser::convertType2Char(_DataType type) noexcept {
 /// Characters of the scan directive without its "%n", for messages.
 int StringParser::scanDirectiveLength() const noexcept {
     const std::string_view directive = scanDirective();
-    const bool isCounted = directive.ends_with(CONSUMED_COUNT);
-    return static_cast<int>(directive.size() - (isCounted ? CONSUMED_COUNT.size() : 0));
+    const bool isCounted = directive.ends_with(consumedCount);
+    return static_cast<int>(directive.size() - (isCounted ? consumedCount.size() : 0));
 }
 
 void StringParser::printChain() const {

@@ -120,10 +120,10 @@ protected:
     bool validateKeywordTable(const _KeywordFields* validFields);
     const char* getFieldName(const char* text, const _KeywordFields* validFields);
 
-    static constexpr std::size_t FIELD_NAME_SIZE = 16;
+    static constexpr std::size_t fieldNameSize = 16;
 
     bool Suppressed = false;
-    char FieldName[FIELD_NAME_SIZE] = "";
+    char FieldName[fieldNameSize] = "";
     std::unique_ptr<char[]> PrintDirective;
     std::unique_ptr<char[]> ScanDirective;
     _DataType DataType = DATATYPE_BASE_NONE;

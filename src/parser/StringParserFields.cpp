@@ -10,7 +10,7 @@ namespace {
 
 TRC1_Anchor anchor{"StringParserFields.cpp"};
 
-constexpr char START_PATTERN[] = "\" , %n";
+constexpr char startPattern[] = "\" , %n";
 
 /// Length of the field name that the text begins with when it names `keyword` by at least its
 /// minimum; 0 when it does not.
@@ -26,10 +26,10 @@ std::size_t matchKeyword(const char* text, const _KeywordFields& keyword) {
 int StringParser::parseFieldNames(const char* text, const _KeywordFields* validFields) {
     TraceScope trace(anchor);
     int length = 0;
-    static_cast<void>(std::sscanf(text, START_PATTERN, &length));
+    static_cast<void>(std::sscanf(text, startPattern, &length));
     if (length == 0) {
         trace.error()("Error found in format command; expected \"%s\", found \"%s\". ",
-                      START_PATTERN, text);
+                      startPattern, text);
         return trace.result(0);
     }
     if (!validateKeywordTable(validFields)) {
@@ -61,10 +61,10 @@ bool StringParser::validateKeywordTable(const _KeywordFields* validFields) {
     int number = 1;
     for (const _KeywordFields* entry = validFields; entry != nullptr && entry->minimum > 0;
          ++entry, ++number) {
-        if (number > _KeywordFields::MAX_KEYWORDS) {
+        if (number > _KeywordFields::maxKeywords) {
             trace.error()(
                 "Internal error: number of entries in keyword table exceeds maximum of %d.",
-                _KeywordFields::MAX_KEYWORDS);
+                _KeywordFields::maxKeywords);
             return trace.result(false);
         }
         if (entry->keyword == nullptr || *entry->keyword == '\0') {

@@ -13,8 +13,8 @@ namespace {
 
 TRC1_Anchor anchor{"StringParserPrintDirective.cpp"};
 
-constexpr char OPENING_PATTERN[] = "= \"%n";
-constexpr int OPENING_LENGTH = 3; ///< characters of the pattern that the text must hold
+constexpr char openingPattern[] = "= \"%n";
+constexpr int openingLength = 3; ///< characters of the pattern that the text must hold
 
 } // namespace
 
@@ -27,10 +27,10 @@ const char* StringParser::getPrintDirective(const char* text) {
         }
     } else {
         int length = 0;
-        static_cast<void>(std::sscanf(area.position, OPENING_PATTERN, &length));
+        static_cast<void>(std::sscanf(area.position, openingPattern, &length));
         if (length == 0) {
             trace.error()("Error in print directive for field %s. Expected \"%.*s\"; found \"%s\"",
-                          FieldName, OPENING_LENGTH, OPENING_PATTERN, area.position);
+                          FieldName, openingLength, openingPattern, area.position);
             return trace.result<const char*>(nullptr);
         }
         area.position += length - 1;
@@ -162,9 +162,9 @@ int StringParser::extractMinFieldWidth(_BuildArea* area) {
     int width = 0;
     int length = 0;
     static_cast<void>(std::sscanf(area->position, "%d%n", &width, &length));
-    if (width < 1 || width > MAX_PRINT_WIDTH || length > MAX_PRINT_WIDTH_DIGITS) {
+    if (width < 1 || width > maxPrintWidth || length > maxPrintWidthDigits) {
         trace.error()("Invalid minimum field width specified: %.*s; ZERO < min width <= %d.",
-                      length, area->position, MAX_PRINT_WIDTH);
+                      length, area->position, maxPrintWidth);
         return trace.result(-1);
     }
     if (!area->append(area->position, static_cast<std::size_t>(length))) {
@@ -186,10 +186,10 @@ int StringParser::extractPrecision(_BuildArea* area) {
     }
     // The reading also takes a sign or white space before the digits, which no directive may hold.
     const bool isWritten = length == 1 || isDigit(text[1]);
-    if (!isWritten || precision < 0 || precision > MAX_PRECISION ||
-        length > MAX_PRECISION_CHARACTERS) {
+    if (!isWritten || precision < 0 || precision > maxPrecision ||
+        length > maxPrecisionCharacters) {
         trace.error()("Invalid precision specified for field %s: %s; ZERO <= precision <= %d.",
-                      FieldName, text, MAX_PRECISION);
+                      FieldName, text, maxPrecision);
         return trace.result(-1);
     }
     if (!area->append(text, static_cast<std::size_t>(length))) {

@@ -8,7 +8,7 @@ namespace {
 
 TRC1_Anchor anchor{"StringParserScan.cpp"};
 
-constexpr std::size_t NOT_MEASURED = static_cast<std::size_t>(-1);
+constexpr std::size_t notMeasured = static_cast<std::size_t>(-1);
 
 } // namespace
 
@@ -24,11 +24,11 @@ int StringParser::scanInput(const char* line) {
         return trace.result(-1);
     }
     const char* position = line;
-    std::size_t length = NOT_MEASURED;
+    std::size_t length = notMeasured;
     int count = 0;
     for (StringParser* node = ScanOrder.get(); node != nullptr; node = node->ScanOrder.get()) {
         if (node->HasColumn) {
-            length = length == NOT_MEASURED ? std::strlen(line) : length;
+            length = length == notMeasured ? std::strlen(line) : length;
             if (node->Offset >= length) {
                 trace.error()("Error: offset of %d for column '%s' exceeds string length of %d. "
                               "Scan terminated.",
@@ -39,14 +39,14 @@ int StringParser::scanInput(const char* line) {
             position = line + node->Offset;
         }
         const int consumed = node->m_scan.run(position, node->Value.get());
-        if (consumed == ScanProgram::END_OF_INPUT) {
+        if (consumed == ScanProgram::endOfInput) {
             trace.error()("Error: end of input found while scanning for variable #%d; %s. Looking "
                           "for %.*s. Scan terminated.",
                           count + 1, node->FieldName, node->scanDirectiveLength(),
                           node->scanDirective());
             return trace.result(-1);
         }
-        if (consumed == ScanProgram::MISMATCH) {
+        if (consumed == ScanProgram::mismatch) {
             trace.error()("Error: scan failed for variable #%d; %s. Looking for %.*s; found %s. "
                           "Scan terminated.",
                           count + 1, node->FieldName, node->scanDirectiveLength(),
@@ -92,8 +92,7 @@ StringParser::Place StringParser::locate(const char* line, std::size_t position)
     const char* const begin = line + position;
     const ScanProgram::Place place = m_scan.findValue(begin);
     const int consumed = m_scan.run(begin, Value.get());
-    const bool isMatched =
-        consumed != ScanProgram::END_OF_INPUT && consumed != ScanProgram::MISMATCH;
+    const bool isMatched = consumed != ScanProgram::endOfInput && consumed != ScanProgram::mismatch;
     return {true, place.isLiteralMatched, isMatched,
             static_cast<std::size_t>(place.position - line),
             isMatched ? position + static_cast<std::size_t>(consumed) : 0};

@@ -51,7 +51,7 @@ int StringParser::buildScanDirective(_BuildArea* area) {
         return trace.result(-1);
     }
     // A directive that leaves no room for the count is learned all the same and matches no line.
-    area->append(CONSUMED_COUNT.data(), CONSUMED_COUNT.size());
+    area->append(consumedCount.data(), consumedCount.size());
     if (allocateVariableStorage(area, widthPosition) != 0 ||
         !storeDirective(*area, ScanDirective)) {
         return trace.result(-1);
@@ -121,9 +121,9 @@ int StringParser::extractOffset(_BuildArea* area) {
                       area->position);
         return trace.result(-1);
     }
-    if (column < 1 || column > MAX_COLUMN || length > MAX_COLUMN_CHARACTERS) {
+    if (column < 1 || column > maxColumn || length > maxColumnCharacters) {
         trace.error()("Invalid column position specified: %.*s; ZERO < column <= %d.", length, text,
-                      MAX_COLUMN);
+                      maxColumn);
         return trace.result(-1);
     }
     Offset = static_cast<unsigned>(column - 1);
@@ -143,12 +143,12 @@ int StringParser::extractMaxFieldWidth(_BuildArea* area) {
     const std::size_t length = std::strspn(text, "0123456789");
     const std::size_t digits = length - zeros;
     int width = 0;
-    if (digits <= static_cast<std::size_t>(MAX_SCAN_WIDTH_DIGITS)) {
+    if (digits <= static_cast<std::size_t>(maxScanWidthDigits)) {
         width = static_cast<int>(std::strtol(text, nullptr, 10));
     }
-    if (width < 1 || width > MAX_SCAN_WIDTH) {
+    if (width < 1 || width > maxScanWidth) {
         trace.error()("Invalid field width specified: %.*s; ZERO < width <= %d.",
-                      static_cast<int>(length), text, MAX_SCAN_WIDTH);
+                      static_cast<int>(length), text, maxScanWidth);
         return trace.result(-1);
     }
     if (!area->append(text + zeros, digits)) {
@@ -237,10 +237,10 @@ int StringParser::allocateVariableStorage(_BuildArea* area, long widthPosition) 
     std::size_t size = receiverSize(info->receiver);
     if (info->receiver == Receiver::TEXT) {
         if (MaxFieldSize == 0) {
-            MaxFieldSize = DEFAULT_TEXT_SIZE;
+            MaxFieldSize = defaultTextSize;
             // Without room for it the directive's text lacks the width; scanning keeps to it.
-            area->insert(static_cast<std::size_t>(widthPosition), DEFAULT_TEXT_WIDTH.data(),
-                         DEFAULT_TEXT_WIDTH.size());
+            area->insert(static_cast<std::size_t>(widthPosition), defaultTextWidth.data(),
+                         defaultTextWidth.size());
         }
         size = MaxFieldSize + 1;
     } else if (info->receiver == Receiver::CHARACTER) {

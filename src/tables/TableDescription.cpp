@@ -12,7 +12,7 @@ const TableColumn* TableDescription::find(std::string_view name) const noexcept 
 unsigned TableDescription::describe(ColumnInfo* info, int index) const noexcept {
     // The framework's probe for the end of the columns, one behind the last, is no error.
     if (index < 0 || index > numColumns()) {
-        return TABLE_NO_SUCH_COLUMN;
+        return tableNoSuchColumn;
     }
     if (index < numColumns()) {
         const TableColumn& column = columns[static_cast<std::size_t>(index)];

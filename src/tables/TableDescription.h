@@ -9,8 +9,8 @@
 #include <string_view>
 
 // Statuses that the tables give to the framework.
-inline constexpr unsigned TABLE_NO_MANAGER = 0x21060002;
-inline constexpr unsigned TABLE_NO_SUCH_COLUMN = 0x21060007;
+inline constexpr unsigned tableNoManager = 0x21060002;
+inline constexpr unsigned tableNoSuchColumn = 0x21060007;
 /// One column of a table's row record.
 struct TableColumn {
     std::string_view name;    ///< upper-case name, by which conditions refer to the column
@@ -33,7 +33,7 @@ struct TableDescription {
     /// The column of this upper-case name, letter by letter; null when there is none.
     const TableColumn* find(std::string_view name) const noexcept;
 
-    /// Describes column `index` and returns 0. An index out of range gives TABLE_NO_SUCH_COLUMN;
+    /// Describes column `index` and returns 0. An index out of range gives tableNoSuchColumn;
     /// the one right behind the last column gives 0. Both leave `info` as it was.
     unsigned describe(ColumnInfo* info, int index) const noexcept;
 

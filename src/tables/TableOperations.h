@@ -14,13 +14,13 @@
 // What the managers of both tables do alike.
 
 /// Creates the table's manager, keeps it in `singleton` for the rest of the process and registers
-/// it. Returns TABLE_NO_MANAGER when memory runs out, else the framework's status.
+/// it. Returns tableNoManager when memory runs out, else the framework's status.
 template <typename Manager>
 unsigned registerTable(std::atomic<Manager*>& singleton, const char* table) {
     auto* const manager = new (std::nothrow) Manager("ZRM", table);
     singleton.store(manager, std::memory_order_release);
     if (manager == nullptr) {
-        return TABLE_NO_MANAGER;
+        return tableNoManager;
     }
     return TableManager::RegisterWithManager(manager);
 }

@@ -40,7 +40,7 @@ unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int cou
     const TableLock lock(*this);
     // Asked under the lock, so that what one row raises is all that comes behind the last room.
     if (!EventRoom::mayOffer()) {
-        return trace.result(TABLE_NO_ROOM);
+        return trace.result(tableNoRoom);
     }
     if (count != 1 || areOffersTraced()) {
         return trace.result(offerRowsTo<zrm_rmlogent_base>(requests(), rows, count));

@@ -41,7 +41,7 @@ void compareWithLibrary(const StringParser& node, const std::string& line) {
     const int fields = node.isSuppressed()
                            ? std::sscanf(line.c_str(), directive.c_str(), &count)
                            : std::sscanf(line.c_str(), directive.c_str(), theirs.data(), &count);
-    const int expected = fields == EOF ? ScanProgram::END_OF_INPUT : count;
+    const int expected = fields == EOF ? ScanProgram::endOfInput : count;
     // A long double has bytes that hold nothing.
     const DataTypeInfo* type = findDataType(node.dataType());
     const bool isPadded = type != nullptr && type->receiver == Receiver::LONG_DOUBLE;

@@ -13,7 +13,7 @@ std::atomic<int> g_lookups{0};
 std::atomic<int> g_waiting{0};
 std::string g_address;
 
-constexpr useconds_t kSlice = 1000;
+constexpr useconds_t slice = 1000;
 
 } // namespace
 
@@ -28,7 +28,7 @@ FakeResolver::~FakeResolver() {
     g_isActive = false;
     answer();
     while (g_waiting > 0) {
-        usleep(kSlice);
+        usleep(slice);
     }
 }
 
@@ -53,7 +53,7 @@ extern "C" int __wrap_getaddrinfo(const char* node, const char* service, const a
     ++g_waiting;
     ++g_lookups;
     while (!g_answers) {
-        usleep(kSlice);
+        usleep(slice);
     }
     const int result = __real_getaddrinfo(g_address.c_str(), service, hints, found);
     --g_waiting;

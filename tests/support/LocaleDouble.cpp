@@ -7,7 +7,7 @@
 namespace {
 
 std::atomic<bool> g_hasLocale{true};
-std::atomic<std::uint32_t> g_codePage{LocaleDouble::LATIN1};
+std::atomic<std::uint32_t> g_codePage{LocaleDouble::latin1Page};
 std::atomic<int> g_lookups{0};
 std::mutex g_mutex;
 
@@ -60,7 +60,7 @@ int LocaleDouble::lookups() {
 
 void LocaleDouble::reset() {
     g_hasLocale = true;
-    g_codePage = LATIN1;
+    g_codePage = latin1Page;
     const std::lock_guard guard(g_mutex);
     recorded().clear();
 }

@@ -11,7 +11,7 @@
 /// ISO-8859-1 (819) unless a test says otherwise. Translation between 819 and 1208 is real.
 namespace LocaleDouble {
 
-inline constexpr std::uint32_t LATIN1 = 819;
+inline constexpr std::uint32_t latin1Page = 819;
 
 /// One call of LOC2_TranslateString.
 struct Translation {

@@ -32,7 +32,7 @@ TEST_F(UTF8ConvTest, ConvertsFromTheLocalCodePageWithTheCallersFlags) {
     const auto translations = LocaleDouble::translations();
     ASSERT_EQ(translations.size(), 2U);
     EXPECT_EQ(translations[0].targetCodePage, LOC2_UTF8);
-    EXPECT_EQ(translations[0].sourceCodePage, LocaleDouble::LATIN1);
+    EXPECT_EQ(translations[0].sourceCodePage, LocaleDouble::latin1Page);
     EXPECT_EQ(translations[0].targetSize, sizeof out);
     EXPECT_EQ(translations[0].source, "gr\xFC\xDF");
     EXPECT_EQ(translations[0].flags, 0);
@@ -46,7 +46,7 @@ TEST_F(UTF8ConvTest, ConvertsToTheLocalCodePageWithATerminator) {
 
     const auto translations = LocaleDouble::translations();
     ASSERT_EQ(translations.size(), 1U);
-    EXPECT_EQ(translations[0].targetCodePage, LocaleDouble::LATIN1);
+    EXPECT_EQ(translations[0].targetCodePage, LocaleDouble::latin1Page);
     EXPECT_EQ(translations[0].sourceCodePage, LOC2_UTF8);
     EXPECT_EQ(translations[0].targetSize, 7U);
     EXPECT_EQ(translations[0].source, "gr\xC3\xBC\xC3\x9F");

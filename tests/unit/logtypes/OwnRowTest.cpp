@@ -115,7 +115,7 @@ TEST_F(OwnRowOfASyslog, IsThatOfAFreshRow) {
 TEST_F(OwnRowOfASyslog, IsThatOfAFreshRowWhenNothingCanBeConverted) {
     Random random(2);
     for (int i = 0; i < 400 && !HasFailure(); ++i) {
-        LocaleDouble::setCodePage(random.upTo(1) == 0 ? 0 : LocaleDouble::LATIN1);
+        LocaleDouble::setCodePage(random.upTo(1) == 0 ? 0 : LocaleDouble::latin1Page);
         expectSameRow(*m_log, syslogLine(random));
     }
     LocaleDouble::reset();

@@ -203,7 +203,7 @@ TEST_F(Tail, ALogThatIsTruncatedAndGrowsPastItsOldEndIsInTheLedger) {
     EXPECT_THAT(trace.messages(), IsEmpty());
     EXPECT_EQ(m_log.ledger().truncations(), 1);
     EXPECT_EQ(m_log.ledger().skippedBytes(), 10 + 11);
-    LogLedger::SkippedRange ranges[LogLedger::KEPT];
+    LogLedger::SkippedRange ranges[LogLedger::mostKept];
     ASSERT_EQ(m_log.ledger().copySkipped(ranges), 1U);
     EXPECT_EQ(ranges[0].to, 10);
     EXPECT_EQ(ranges[0].unread, 11);

@@ -17,7 +17,7 @@ using testing::IsEmpty;
 using testing::SizeIs;
 
 std::vector<std::string> rejectedBy(const LogLedger& ledger) {
-    const auto lines = std::make_unique<std::array<LogLedger::RejectedLine, LogLedger::KEPT>>();
+    const auto lines = std::make_unique<std::array<LogLedger::RejectedLine, LogLedger::mostKept>>();
     const std::size_t count = ledger.copyRejected(lines->data());
     std::vector<std::string> texts;
     for (std::size_t i = 0; i < count; ++i) {
@@ -27,7 +27,7 @@ std::vector<std::string> rejectedBy(const LogLedger& ledger) {
 }
 
 std::vector<LogLedger::SkippedRange> skippedBy(const LogLedger& ledger) {
-    std::vector<LogLedger::SkippedRange> ranges(LogLedger::KEPT);
+    std::vector<LogLedger::SkippedRange> ranges(LogLedger::mostKept);
     ranges.resize(ledger.copySkipped(ranges.data()));
     return ranges;
 }
@@ -57,7 +57,7 @@ TEST(LogLedger, KeepsTheLatestLinesTheOldestFirst) {
     for (int i = 0; i < 20; ++i) {
         const std::string line = "line " + std::to_string(i);
         ledger.noteRejected((line + "\n").c_str());
-        if (i >= 20 - static_cast<int>(LogLedger::KEPT)) {
+        if (i >= 20 - static_cast<int>(LogLedger::mostKept)) {
             expected.push_back(line);
         }
     }
@@ -82,7 +82,7 @@ TEST(LogLedger, KeepsTheLatestRangesAndCountsAll) {
     EXPECT_EQ(ledger.truncations(), 20);
     EXPECT_EQ(ledger.skippedBytes(), 310) << "where it is known, with the old end";
     const auto ranges = skippedBy(ledger);
-    ASSERT_THAT(ranges, SizeIs(LogLedger::KEPT));
+    ASSERT_THAT(ranges, SizeIs(LogLedger::mostKept));
     EXPECT_EQ(ranges.front().from, 0);
     EXPECT_EQ(ranges.front().to, 5);
     EXPECT_EQ(ranges.back().to, 20);

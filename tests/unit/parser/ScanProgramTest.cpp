@@ -61,7 +61,7 @@ Result scannedByLibrary(std::string directive, const std::string& text) {
     } else {
         fields = std::sscanf(text.c_str(), directive.c_str(), result.value.data(), &count);
     }
-    result.consumed = fields == EOF ? ScanProgram::END_OF_INPUT : count;
+    result.consumed = fields == EOF ? ScanProgram::endOfInput : count;
     return result;
 }
 
@@ -131,7 +131,7 @@ TEST(ScanProgram, ReadsTheBaseFromThePrefix) {
 
 TEST(ScanProgram, StopsAtTheWidth) {
     EXPECT_EQ(value<std::int32_t>(scanned("%4d%n", "20261120")), 2026);
-    EXPECT_EQ(scanned("%1d%n", "-5").consumed, ScanProgram::MISMATCH);
+    EXPECT_EQ(scanned("%1d%n", "-5").consumed, ScanProgram::mismatch);
     EXPECT_EQ(text(scanned("%3s%n", "abcdef")), "abc");
     EXPECT_EQ(text(scanned("%s%n", std::string(40, 'x'))), std::string(31, 'x'));
     EXPECT_EQ(text(scanned("%[x]%n", std::string(40, 'x'))), std::string(31, 'x'));
@@ -159,16 +159,16 @@ TEST(ScanProgram, TakesCharactersAsTheyAre) {
 }
 
 TEST(ScanProgram, TellsTheEndOfInputFromAMismatch) {
-    EXPECT_EQ(scanned("%d%n", "").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("%d%n", " \t\n").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("ab%d%n", "a").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("%[a]%n", "").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("%c%n", "").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("%d%n", "x").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%d%n", "-").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%f%n", "+").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("ab%d%n", "ac1").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%[a]%n", "b").consumed, ScanProgram::MISMATCH);
+    EXPECT_EQ(scanned("%d%n", "").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("%d%n", " \t\n").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("ab%d%n", "a").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("%[a]%n", "").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("%c%n", "").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("%d%n", "x").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%d%n", "-").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%f%n", "+").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("ab%d%n", "ac1").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%[a]%n", "b").consumed, ScanProgram::mismatch);
 }
 
 TEST(ScanProgram, ReadsFloatingPointNumbersOfAnyLength) {
@@ -182,9 +182,9 @@ TEST(ScanProgram, ReadsFloatingPointNumbersOfAnyLength) {
                   ? value<long double>(scannedByLibrary("%Lf%n", "1" + std::string(600, '0') + "1"))
                   : 0.0L);
     EXPECT_EQ(scanned("%3f%n", "1.25").consumed, 3);
-    EXPECT_EQ(scanned("%f%n", "0x").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%f%n", "infin").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%f%n", ".").consumed, ScanProgram::MISMATCH);
+    EXPECT_EQ(scanned("%f%n", "0x").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%f%n", "infin").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%f%n", ".").consumed, ScanProgram::mismatch);
     EXPECT_EQ(scanned("%f%n", "1e+").consumed, 3) << "the lone exponent belongs to the field";
 }
 
@@ -201,10 +201,10 @@ TEST(ScanProgram, PercentSignsAndWhiteSpaceOfTheLiteral) {
 }
 
 TEST(ScanProgram, ADirectiveWithoutItsCountMatchesNothing) {
-    EXPECT_EQ(scanned("%d", "12").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%d", "").consumed, ScanProgram::END_OF_INPUT);
-    EXPECT_EQ(scanned("no conversion", "no conversion").consumed, ScanProgram::MISMATCH);
-    EXPECT_EQ(scanned("%hs%n", "x").consumed, ScanProgram::MISMATCH);
+    EXPECT_EQ(scanned("%d", "12").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%d", "").consumed, ScanProgram::endOfInput);
+    EXPECT_EQ(scanned("no conversion", "no conversion").consumed, ScanProgram::mismatch);
+    EXPECT_EQ(scanned("%hs%n", "x").consumed, ScanProgram::mismatch);
 }
 
 } // namespace

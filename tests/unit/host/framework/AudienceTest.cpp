@@ -64,10 +64,10 @@ Condition onLog(std::string name) {
     return textCondition("LOGNAME", INTF_EQUAL, std::move(name));
 }
 
-const TestRow kRow("/var/log/", "messages", "Failed password for root", 7);
+const TestRow rowBytes("/var/log/", "messages", "Failed password for root", 7);
 
 TEST_F(AudienceTest, WithoutSituationsIsEmpty) {
-    EXPECT_THAT(audienceOf(TestRow(kRow)), IsEmpty());
+    EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
 }
 
 TEST_F(AudienceTest, HasTheSituationsOfTheLogInTheirOrder) {
@@ -76,7 +76,7 @@ TEST_F(AudienceTest, HasTheSituationsOfTheLogInTheirOrder) {
     open({});
     open({textCondition("LOGPATH", INTF_EQUAL, "/var/log/"), onLog("messages")});
     open({textCondition("LOGPATH", INTF_EQUAL, "/var/log"), onLog("messages")});
-    EXPECT_THAT(audienceOf(TestRow(kRow)), ElementsAre(0, 2, 3));
+    EXPECT_THAT(audienceOf(TestRow(rowBytes)), ElementsAre(0, 2, 3));
     EXPECT_THAT(audienceOf(TestRow("/var/log/", "syslog", "", 0)), ElementsAre(1, 2));
     EXPECT_THAT(audienceOf(TestRow("/var/log/", "other", "", 0)), ElementsAre(2));
 }
@@ -84,7 +84,7 @@ TEST_F(AudienceTest, HasTheSituationsOfTheLogInTheirOrder) {
 TEST_F(AudienceTest, FollowsARowWhoseLogChangesAtOneAddress) {
     open({onLog("messages")});
     open({onLog("syslog")});
-    TestRow row = kRow;
+    TestRow row = rowBytes;
     EXPECT_THAT(audienceOf(row), ElementsAre(0));
     std::memcpy(row.logname, "syslog      ", sizeof row.logname);
     EXPECT_THAT(audienceOf(row), ElementsAre(1));
@@ -95,7 +95,7 @@ TEST_F(AudienceTest, FollowsARowWhoseLogChangesAtOneAddress) {
 }
 
 TEST_F(AudienceTest, FollowsTheListOfSituations) {
-    TestRow row = kRow;
+    TestRow row = rowBytes;
     open({onLog("messages")});
     EXPECT_THAT(audienceOf(row), ElementsAre(0));
     open({onLog("messages")});
@@ -151,20 +151,20 @@ TEST_F(AudienceTest, PassesOverWhatTheTextRefuses) {
     open({textCondition("TEXT", INTF_GREATER, "G")});
     open({textCondition("TEXT", INTF_STARTS, "Failed"),
           textCondition("TEXT", INTF_CONTAINS, "secret")});
-    EXPECT_THAT(audienceOf(TestRow(kRow)), ElementsAre(0, 2, 4, 6, 9, 11));
+    EXPECT_THAT(audienceOf(TestRow(rowBytes)), ElementsAre(0, 2, 4, 6, 9, 11));
     EXPECT_THAT(audienceOf(TestRow("/", "a", "", 0)), ElementsAre(8, 11));
 }
 
 TEST_F(AudienceTest, LeavesTheJudgementOfNumbersAndUnknownColumnsToTheTable) {
     open({numberCondition("NUMBER", INTF_EQUAL, 99)});
     open({textCondition("UNKNOWN", INTF_EQUAL, "x")});
-    EXPECT_THAT(audienceOf(TestRow(kRow)), ElementsAre(0, 1));
+    EXPECT_THAT(audienceOf(TestRow(rowBytes)), ElementsAre(0, 1));
 }
 
 TEST_F(AudienceTest, PassesOverAConditionThatMakesNoSense) {
     open({textCondition("NUMBER", INTF_EQUAL, "seven")});
     open({textCondition("TEXT", static_cast<_IntfOper>(77), "x")});
-    EXPECT_THAT(audienceOf(TestRow(kRow)), IsEmpty());
+    EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
     // It is on no log's columns, so that such a row is not taken for a new log's.
     for (int number = 0; number < 20'000; ++number) {
         ASSERT_THAT(audienceOf(TestRow("/", "a", std::to_string(number), number)), IsEmpty());
@@ -182,7 +182,7 @@ TEST_F(AudienceTest, CountsRowsThatItSparesARequestAsJudged) {
         }
     };
     for (int count = 0; count < 3; ++count) {
-        offer(kRow);
+        offer(rowBytes);
     }
     Situation& late = open({onLog("syslog")});
     offer(TestRow("/var/log/", "syslog", "axb", 1));
@@ -195,12 +195,12 @@ TEST_F(AudienceTest, CountsRowsThatItSparesARequestAsJudged) {
     EXPECT_EQ(late.counts.matched(), 2U);
     // Closed, a situation keeps its counts and counts no more.
     mine.request.reset();
-    offer(kRow);
+    offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 5U);
     EXPECT_EQ(other.counts.judged(), 6U);
     // And goes on with them when it is opened again.
     mine.request = std::make_unique<Request>(manager, RequestDetail(), receiver, &mine.counts);
-    offer(kRow);
+    offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 6U);
 }
 

@@ -36,29 +36,29 @@ std::string randomText(Random& random, std::size_t maxSize) {
     return text;
 }
 
-constexpr _IntfOper kRelational[] = {INTF_EQUAL,         INTF_NOT_EQUAL, INTF_GREATER_OR_EQUAL,
-                                     INTF_LESS_OR_EQUAL, INTF_LESS,      INTF_GREATER};
-constexpr _IntfOper kTextual[] = {INTF_CONTAINS, INTF_STARTS, INTF_IN, INTF_MATCHES};
-const std::string kPatterns[] = {"^a", "b$", "a.*b", "^$", "[aB]b", "a{2}", "^[^b]*$"};
+constexpr _IntfOper relational[] = {INTF_EQUAL,         INTF_NOT_EQUAL, INTF_GREATER_OR_EQUAL,
+                                    INTF_LESS_OR_EQUAL, INTF_LESS,      INTF_GREATER};
+constexpr _IntfOper textual[] = {INTF_CONTAINS, INTF_STARTS, INTF_IN, INTF_MATCHES};
+const std::string patterns[] = {"^a", "b$", "a.*b", "^$", "[aB]b", "a{2}", "^[^b]*$"};
 
 Condition randomCondition(Random& random) {
     static const std::string texts[] = {"LOGPATH", "LOGNAME", "TEXT"};
     if (random() % 4 == 0) {
         return random() % 4 == 0
                    ? listCondition("NUMBER", {std::to_string(random() % 4), "-1"}, true)
-                   : numberCondition("NUMBER", pick(random, kRelational),
+                   : numberCondition("NUMBER", pick(random, relational),
                                      static_cast<int>(random() % 5) - 1);
     }
     const std::string column = pick(random, texts);
     if (random() % 2 == 0) {
-        return textCondition(column, pick(random, kRelational), randomText(random, 36));
+        return textCondition(column, pick(random, relational), randomText(random, 36));
     }
-    const _IntfOper op = pick(random, kTextual);
+    const _IntfOper op = pick(random, textual);
     if (op == INTF_IN) {
         return listCondition(column, {randomText(random, 4), randomText(random, 36)});
     }
     return textCondition(column, op,
-                         op == INTF_MATCHES ? pick(random, kPatterns) : randomText(random, 3));
+                         op == INTF_MATCHES ? pick(random, patterns) : randomText(random, 3));
 }
 
 std::string trimmed(std::string text) {

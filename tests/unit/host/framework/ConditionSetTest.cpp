@@ -39,10 +39,10 @@ protected:
     std::function<unsigned(char*, std::string, _IntfOper, char*)> onForeignColumn;
 };
 
-const TestRow kRow("/var/log/", "messages", "Failed password for root", 7);
+const TestRow rowBytes("/var/log/", "messages", "Failed password for root", 7);
 
 TEST_F(ConditionSetTest, WithoutConditionsEveryRowIsMeant) {
-    EXPECT_TRUE(holds({}, kRow));
+    EXPECT_TRUE(holds({}, rowBytes));
 }
 
 TEST_F(ConditionSetTest, AllConditionsMustHold) {
@@ -50,10 +50,10 @@ TEST_F(ConditionSetTest, AllConditionsMustHold) {
     const auto name = textCondition("LOGNAME", INTF_EQUAL, "messages");
     const auto text = textCondition("TEXT", INTF_CONTAINS, "password");
     const auto number = numberCondition("NUMBER", INTF_GREATER_OR_EQUAL, 7);
-    EXPECT_TRUE(holds({path, name, text, number}, kRow));
-    EXPECT_FALSE(holds({path, name, text, numberCondition("NUMBER", INTF_GREATER, 7)}, kRow));
-    EXPECT_FALSE(holds({path, textCondition("LOGNAME", INTF_EQUAL, "message"), text}, kRow));
-    EXPECT_FALSE(holds({textCondition("LOGPATH", INTF_EQUAL, "/var/log"), name}, kRow));
+    EXPECT_TRUE(holds({path, name, text, number}, rowBytes));
+    EXPECT_FALSE(holds({path, name, text, numberCondition("NUMBER", INTF_GREATER, 7)}, rowBytes));
+    EXPECT_FALSE(holds({path, textCondition("LOGNAME", INTF_EQUAL, "message"), text}, rowBytes));
+    EXPECT_FALSE(holds({textCondition("LOGPATH", INTF_EQUAL, "/var/log"), name}, rowBytes));
 }
 
 TEST_F(ConditionSetTest, ContainsStartsMatchesAndIn) {
@@ -98,17 +98,18 @@ TEST_F(ConditionSetTest, NumbersCompareWholly) {
     EXPECT_TRUE(numberHolds(INTF_EQUAL, -1, -1));
     EXPECT_FALSE(numberHolds(INTF_EQUAL, 0xffffffff, -1));
     EXPECT_TRUE(numberHolds(INTF_LESS, 0x100000000, 0x7fffffff));
-    EXPECT_TRUE(holds({textCondition("NUMBER", INTF_EQUAL, "7")}, kRow)) << "digits are a number";
+    EXPECT_TRUE(holds({textCondition("NUMBER", INTF_EQUAL, "7")}, rowBytes))
+        << "digits are a number";
 }
 
 TEST_F(ConditionSetTest, WhatMakesNoSenseNeverHolds) {
-    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_EQUAL, "seven")}, kRow));
-    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_NOT_EQUAL, "7 ")}, kRow));
-    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_CONTAINS, "7")}, kRow));
-    EXPECT_FALSE(holds({numberCondition("TEXT", INTF_NOT_EQUAL, 7)}, kRow));
-    EXPECT_FALSE(holds({textCondition("TEXT", static_cast<_IntfOper>(55), "x")}, kRow));
-    EXPECT_FALSE(holds({numberCondition("NUMBER", static_cast<_IntfOper>(0), 7)}, kRow));
-    EXPECT_FALSE(holds({textCondition("NOCOLUMN", INTF_NOT_EQUAL, "x")}, kRow));
+    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_EQUAL, "seven")}, rowBytes));
+    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_NOT_EQUAL, "7 ")}, rowBytes));
+    EXPECT_FALSE(holds({textCondition("NUMBER", INTF_CONTAINS, "7")}, rowBytes));
+    EXPECT_FALSE(holds({numberCondition("TEXT", INTF_NOT_EQUAL, 7)}, rowBytes));
+    EXPECT_FALSE(holds({textCondition("TEXT", static_cast<_IntfOper>(55), "x")}, rowBytes));
+    EXPECT_FALSE(holds({numberCondition("NUMBER", static_cast<_IntfOper>(0), 7)}, rowBytes));
+    EXPECT_FALSE(holds({textCondition("NOCOLUMN", INTF_NOT_EQUAL, "x")}, rowBytes));
 }
 
 TEST_F(ConditionSetTest, ABadPatternNeverHoldsAndIsTold) {
@@ -135,7 +136,7 @@ TEST_F(ConditionSetTest, PatternsFollowTheCodePageOfTheColumn) {
 
 TEST_F(ConditionSetTest, AsksTheTableAboutColumnsThatItDoesNotDescribe) {
     std::vector<std::string> asked;
-    TestRow row = kRow;
+    TestRow row = rowBytes;
     onForeignColumn = [&](char* bytes, std::string column, _IntfOper op, char* value) {
         EXPECT_EQ(bytes, row.bytes());
         asked.push_back(column + ' ' + std::to_string(op) + ' ' + std::string(value, 3));
@@ -156,12 +157,12 @@ TEST_F(ConditionSetTest, TheLogIsLookedAtFirst) {
         return 1u;
     };
     const auto foreign = textCondition("FOREIGN", INTF_EQUAL, "x");
-    EXPECT_FALSE(holds({foreign, textCondition("LOGNAME", INTF_EQUAL, "auth.log")}, kRow));
-    EXPECT_FALSE(holds({foreign, textCondition("LOGPATH", INTF_EQUAL, "/var/")}, kRow));
-    EXPECT_FALSE(holds({foreign, textCondition("TEXT", INTF_MATCHES, "nothing")}, kRow));
-    EXPECT_FALSE(holds({foreign, textCondition("NUMBER", INTF_EQUAL, "x")}, kRow));
+    EXPECT_FALSE(holds({foreign, textCondition("LOGNAME", INTF_EQUAL, "auth.log")}, rowBytes));
+    EXPECT_FALSE(holds({foreign, textCondition("LOGPATH", INTF_EQUAL, "/var/")}, rowBytes));
+    EXPECT_FALSE(holds({foreign, textCondition("TEXT", INTF_MATCHES, "nothing")}, rowBytes));
+    EXPECT_FALSE(holds({foreign, textCondition("NUMBER", INTF_EQUAL, "x")}, rowBytes));
     EXPECT_EQ(asked, 0);
-    EXPECT_TRUE(holds({foreign, textCondition("LOGNAME", INTF_EQUAL, "messages")}, kRow));
+    EXPECT_TRUE(holds({foreign, textCondition("LOGNAME", INTF_EQUAL, "messages")}, rowBytes));
     EXPECT_EQ(asked, 1);
 }
 

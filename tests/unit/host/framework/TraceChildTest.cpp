@@ -99,7 +99,7 @@ private:
 };
 
 TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
-    constexpr int kChildren = 100;
+    constexpr int children = 100;
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
     TRC1_Printf(anchor, 1, "parent %d", 0);
@@ -107,7 +107,7 @@ TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
         // Standard error's lock is held all the time.
         flockfile(stderr);
         const BusyLocks busy;
-        for (int index = 0; index < kChildren; ++index) {
+        for (int index = 0; index < children; ++index) {
             const pid_t child = fork();
             if (child == 0) {
                 TRC1_Sync(anchor);
@@ -127,7 +127,7 @@ TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
     EXPECT_EQ(
         linesIn(directory.file("trace"), std::regex("\\S+ \\S+ \\d+ TraceChildTest.cpp:\\d+ "
                                                     "(parent 0|child \\d+ of the parent: text 7)")),
-        kChildren + 1);
+        children + 1);
 }
 
 TEST(TraceChild, LeavesAMovedFileToItsParent) {

@@ -33,12 +33,12 @@ TEST(TraceRecord, EverythingElseIsShownAsItIs) {
 }
 
 TEST(TraceRecord, EscapesThatDoNotFitAreCut) {
-    for (std::size_t size = TraceRecord::kMaxSize / 4 - 30; size < TraceRecord::kMaxSize / 4 + 30;
+    for (std::size_t size = TraceRecord::maxSize / 4 - 30; size < TraceRecord::maxSize / 4 + 30;
          ++size) {
         const std::string text = shown(std::string(size, '\033'));
-        EXPECT_LT(text.size(), TraceRecord::kMaxSize);
+        EXPECT_LT(text.size(), TraceRecord::maxSize);
         EXPECT_EQ(text.size() % 4, 0u);
-        EXPECT_GE(text.size(), std::min(size * 4, TraceRecord::kMaxSize - 100));
+        EXPECT_GE(text.size(), std::min(size * 4, TraceRecord::maxSize - 100));
     }
     shown(std::string(100'000, '\033'));
 }

@@ -179,14 +179,14 @@ TEST(Trace, AChangedLevelHoldsFromTheNextOperationOn) {
 // level behind under the latest generation.
 TEST(Trace, NoThreadLeavesAnOlderLevelBehind) {
     static TRC1_Anchor shared{"Shared.cpp"};
-    constexpr int kThreads = 3;
-    constexpr int kRounds = 1500;
+    constexpr int threadCount = 3;
+    constexpr int rounds = 1500;
     std::atomic<int> round{0};
     std::atomic<int> finished{0};
     std::vector<std::thread> threads;
-    for (int i = 0; i < kThreads; ++i) {
+    for (int i = 0; i < threadCount; ++i) {
         threads.emplace_back([&] {
-            for (int next = 1; next <= kRounds; ++next) {
+            for (int next = 1; next <= rounds; ++next) {
                 while (round < next) {
                     std::this_thread::yield();
                 }
@@ -197,11 +197,11 @@ TEST(Trace, NoThreadLeavesAnOlderLevelBehind) {
         });
     }
     int latest = 0;
-    for (int next = 1; next <= kRounds; ++next) {
+    for (int next = 1; next <= rounds; ++next) {
         const unsigned level = static_cast<unsigned>(next) % 256;
         round = next;
         ASSERT_EQ(TraceControl::configure(std::to_string(level)), "");
-        while (finished < next * kThreads) {
+        while (finished < next * threadCount) {
             std::this_thread::yield();
         }
         if (shared.generation == TRC1_Generation) {
@@ -251,12 +251,12 @@ TEST(Trace, IsNoCancellationPoint) {
 TEST(Trace, RecordsOfManyThreadsStayWhole) {
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
-    constexpr int kThreads = 16;
-    constexpr int kRecords = 200;
+    constexpr int threadCount = 16;
+    constexpr int recordCount = 200;
     std::vector<std::thread> threads;
-    for (int index = 0; index < kThreads; ++index) {
+    for (int index = 0; index < threadCount; ++index) {
         threads.emplace_back([index] {
-            for (int record = 0; record < kRecords; ++record) {
+            for (int record = 0; record < recordCount; ++record) {
                 const std::string text(static_cast<std::size_t>(record * 7),
                                        static_cast<char>('a' + index));
                 TRC1_Printf(anchor, index, "%d <%s>", record, text.c_str());
@@ -268,7 +268,7 @@ TEST(Trace, RecordsOfManyThreadsStayWhole) {
     }
     ASSERT_EQ(TraceControl::openFile(""), "");
     std::ifstream file(directory.file("trace"));
-    std::vector<int> next(kThreads, 0);
+    std::vector<int> next(threadCount, 0);
     int lines = 0;
     for (std::string line; std::getline(file, line); ++lines) {
         std::istringstream words(line);
@@ -282,7 +282,7 @@ TEST(Trace, RecordsOfManyThreadsStayWhole) {
                                   static_cast<char>('a' + index));
         ASSERT_EQ(text, '<' + content + '>');
     }
-    EXPECT_EQ(lines, kThreads * kRecords);
+    EXPECT_EQ(lines, threadCount * recordCount);
 }
 
 } // namespace

@@ -33,14 +33,14 @@ public:
         std::string log = "/var/log/auth.log";
         std::string text = {}; ///< of the situation
     };
-    static constexpr std::int64_t kRaised = 1'795'158'189'412; ///< of the first event
+    static constexpr std::int64_t raisedAt = 1'795'158'189'412; ///< of the first event
 
     /// Adds an event; its texts are valid in JSON as they are.
     void add(const Entry& entry) {
         m_entries.push_back(entry);
         const Entry& kept = m_entries.back();
         const std::uint64_t id = m_records.size() + 1;
-        const std::int64_t raised = kRaised + 1000 * static_cast<std::int64_t>(id - 1);
+        const std::int64_t raised = raisedAt + 1000 * static_cast<std::int64_t>(id - 1);
         m_texts.push_back(
             R"({"id":)" + std::to_string(id) + R"(,"situation":")" + kept.situation +
             R"(","severity":")" + kept.severity + R"(","raised":")" + UtcTime::text(raised) +

@@ -84,7 +84,7 @@ TEST(SyslogMessage, WhatSteersATerminalOrTheDirectionOfTextIsWrittenByNumber) {
 
 TEST(SyslogMessage, IsCutAtTheEndOfACharacter) {
     const std::size_t front = messageOf({.description = "x"}).size() - 1;
-    const std::size_t room = SyslogMessage::kLongest - front;
+    const std::size_t room = SyslogMessage::longest - front;
     const std::string whole(room, 'x');
     EXPECT_EQ(messageOf({.description = whole}), expected(26, usualData, whole));
     EXPECT_EQ(messageOf({.description = whole + "y"}), expected(26, usualData, whole));
@@ -112,7 +112,7 @@ TEST(SyslogMessage, AnUnknownHostIsADashAndAnOddOneHasQuestionMarks) {
     const auto host = [](const std::string& node) {
         const std::string json = R"({"row":{"ORIGINNODE":")" + node + R"("}})";
         const std::string message =
-            SyslogMessage("daemon").text({1, EntryEvents::kRaised, "a", "info", "/a", json});
+            SyslogMessage("daemon").text({1, EntryEvents::raisedAt, "a", "info", "/a", json});
         const std::size_t begin = message.find("Z ") + 2;
         return message.substr(begin, message.find(" zrmagent") - begin);
     };
