@@ -13,6 +13,8 @@
 #include <string_view>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Backtest.cpp"};
@@ -175,3 +177,5 @@ std::string Backtest::decisionOf(const Result& result) const {
                        ? "."
                        : "; older entries were not looked at: " + result.reach.reason + '.');
 }
+
+} // namespace zrm::host

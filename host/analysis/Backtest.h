@@ -12,8 +12,13 @@
 #include <string>
 #include <vector>
 
-class LogFile;
 class TableManager;
+
+namespace zrm {
+class LogFile;
+} // namespace zrm
+
+namespace zrm::host {
 
 /// Runs a situation over what logs hold between two times, by the logs' reports, without their
 /// limit of rows. Holds the times of the entries that meet the conditions, and no rows. One
@@ -60,5 +65,7 @@ private:
     Replay m_replay;
     std::vector<Stamp> m_matched; ///< newest first within a log, logs one behind the other
 };
+
+} // namespace zrm::host
 
 #endif

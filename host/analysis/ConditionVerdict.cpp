@@ -7,6 +7,8 @@
 #include <iterator>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 std::string quoted(const std::string& text) {
@@ -101,3 +103,5 @@ ConditionVerdict ConditionJudge::verdict(std::size_t index, char* row) const {
     }
     return verdict;
 }
+
+} // namespace zrm::host

@@ -12,6 +12,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// What became of one condition on one entry.
 struct ConditionVerdict {
     std::string condition;                         ///< as operators write it
@@ -42,5 +44,7 @@ private:
     const FilterList m_filters;
     std::vector<CompiledCondition> m_compiled;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <optional>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Explainer.cpp"};
@@ -224,3 +226,5 @@ void Explainer::decide(Explanation& explanation, const Seen& seen) const {
         would + (explanation.isRaised && m_isStopped ? " if the situation were started" : "") +
         ": " + because + '.';
 }
+
+} // namespace zrm::host

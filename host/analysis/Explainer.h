@@ -16,8 +16,13 @@
 #include <string_view>
 #include <vector>
 
-class LogFile;
 class TableManager;
+
+namespace zrm {
+class LogFile;
+} // namespace zrm
+
+namespace zrm::host {
 
 /// Explains what a situation makes of entries. The entries that a log holds before them are
 /// counted for the thresholds, as far back as LogTail reads. One thread; it holds the logs still
@@ -75,5 +80,7 @@ private:
     std::string m_problem;
     Reach m_reach;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Why a situation is raised by an entry, or why not.
 struct Explanation {
     struct Window {
@@ -26,5 +28,7 @@ struct Explanation {
     bool isRaised = false;
     std::string decision; ///< one sentence
 };
+
+} // namespace zrm::host
 
 #endif

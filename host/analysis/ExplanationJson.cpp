@@ -2,6 +2,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -21,7 +23,7 @@ Json of(const ConditionVerdict& verdict) {
 Json ExplanationJson::of(const Explanation& explanation) {
     Json conditions = Json::array();
     for (const ConditionVerdict& verdict : explanation.conditions) {
-        conditions.push_back(::of(verdict));
+        conditions.push_back(zrm::host::of(verdict));
     }
     Json window;
     if (explanation.window) {
@@ -39,3 +41,5 @@ Json ExplanationJson::of(const Explanation& explanation) {
             {"raised", explanation.isRaised},
             {"decision", explanation.decision}};
 }
+
+} // namespace zrm::host

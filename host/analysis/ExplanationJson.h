@@ -5,10 +5,14 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 /// Explanations as JSON objects. Stateless.
 class ExplanationJson {
 public:
     static nlohmann::ordered_json of(const Explanation& explanation);
 };
+
+} // namespace zrm::host
 
 #endif

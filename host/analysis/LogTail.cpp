@@ -16,6 +16,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"LogTail.cpp"};
@@ -181,3 +183,5 @@ void LogTail::note(const zrm_rmlogent_data_t& oldest) {
         m_reach.reached.assign(oldest.entrytime, sizeof oldest.entrytime);
     }
 }
+
+} // namespace zrm::host

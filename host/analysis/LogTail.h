@@ -10,7 +10,11 @@
 #include <string>
 #include <string_view>
 
+namespace zrm {
 class LogFile;
+} // namespace zrm
+
+namespace zrm::host {
 
 /// Reads what a log holds last, and lines that it might hold, as its monitor would: in the same
 /// pieces and by the log's own operation that makes rows. The monitor goes on undisturbed: rows
@@ -53,5 +57,7 @@ private:
     Reach m_reach;
     bool m_isCut = false; ///< the log begins before what is read
 };
+
+} // namespace zrm::host
 
 #endif

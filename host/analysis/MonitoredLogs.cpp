@@ -5,6 +5,8 @@
 
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 MonitoredLogs::MonitoredLogs() : m_manager(pTheLogManager) {
     if (m_manager != nullptr) {
         m_manager->beginRequest();
@@ -45,3 +47,5 @@ LogFile* MonitoredLogs::find(std::string_view path) const {
     }
     return nullptr;
 }
+
+} // namespace zrm::host

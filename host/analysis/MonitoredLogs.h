@@ -4,8 +4,12 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm {
 class LogFile;
 class LogManager;
+} // namespace zrm
+
+namespace zrm::host {
 
 /// The monitored logs, held as they are while the object lives: a refresh waits for its end. To be
 /// constructed may itself wait for a refresh. Any thread, which holds no lock that a log's thread
@@ -30,5 +34,7 @@ public:
 private:
     LogManager* const m_manager; ///< null while the process ends
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// How far logs were read and why the reading ended.
 struct Reach {
     std::string reached; ///< ENTRYTIME of the oldest entry read; empty: there was none
@@ -14,5 +16,7 @@ struct Reach {
     /// Adds `complete`, `reached` and `reason` to a JSON object.
     void addTo(nlohmann::ordered_json& object) const;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Replay.cpp"};
@@ -111,3 +113,5 @@ Replay::Verdict Replay::take() {
     m_request->count = 0;
     return verdict;
 }
+
+} // namespace zrm::host

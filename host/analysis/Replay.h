@@ -9,7 +9,12 @@
 #include <optional>
 
 class TableManager;
+
+namespace zrm {
 struct zrm_rmlogent_data_t;
+} // namespace zrm
+
+namespace zrm::host {
 
 /// Judges entries as a situation would, without being one: a request of the agent's own, which no
 /// log offers anything to and which raises nothing. Conditions and thresholds are judged by the
@@ -56,5 +61,7 @@ private:
     std::unique_ptr<Request> m_request;
     std::optional<RowLayout> m_layout;
 };
+
+} // namespace zrm::host
 
 #endif

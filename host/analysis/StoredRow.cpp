@@ -9,6 +9,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 bool StoredRow::fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::string_view event) {
     constexpr bool throwsErrors = false;
     const auto document = nlohmann::json::parse(event, nullptr, throwsErrors);
@@ -53,3 +55,5 @@ bool StoredRow::isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& 
                                   RowText::of(column, rightBytes, rightRoom);
                        });
 }
+
+} // namespace zrm::host

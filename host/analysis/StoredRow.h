@@ -6,6 +6,8 @@
 
 #include <string_view>
 
+namespace zrm::host {
+
 /// Log Entries rows from the JSON of events. Stateless.
 class StoredRow {
 public:
@@ -17,5 +19,7 @@ public:
     static bool isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
                             const zrm_rmlogent_data_t& right);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -22,6 +22,8 @@
 #include <signal.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 using nlohmann::ordered_json;
@@ -173,3 +175,5 @@ HttpAnswer AgentResource::status(const HttpRequest& request) {
                        {"warnings", warningsOf(m_watch)},
                        {"trace", TraceControl::levels()}});
 }
+
+} // namespace zrm::host

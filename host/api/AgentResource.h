@@ -7,6 +7,8 @@
 
 #include <cstdint>
 
+namespace zrm::host {
+
 class Delivery;
 class LogWatch;
 
@@ -26,5 +28,7 @@ private:
     const LogWatch& m_watch;
     const std::int64_t m_started; ///< milliseconds since 1970-01-01 UTC
 };
+
+} // namespace zrm::host
 
 #endif

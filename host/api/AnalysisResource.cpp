@@ -25,6 +25,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -222,3 +224,5 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     result.reach.addTo(answer);
     return HttpAnswer::json(SituationJson::text(answer));
 }
+
+} // namespace zrm::host

@@ -14,10 +14,13 @@
 #include <string>
 #include <vector>
 
+class TableManager;
+
+namespace zrm::host {
+
 class HistoryReader;
 class JsonFields;
 class LogWatch;
-class TableManager;
 
 /// `POST /api/v1/explain` and `POST /api/v1/backtest`.
 class AnalysisResource : public Resource {
@@ -58,5 +61,7 @@ private:
     std::counting_semaphore<2> m_room{2}; ///< of backtests at a time
     std::atomic<bool> m_isCancelled{false};
 };
+
+} // namespace zrm::host
 
 #endif

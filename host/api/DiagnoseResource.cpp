@@ -19,6 +19,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"DiagnoseResource.cpp"};
@@ -139,3 +141,5 @@ HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {
     }
     return HttpAnswer::json(ConfigCheck::json(ConfigCheck::check(config, logDirectories())));
 }
+
+} // namespace zrm::host

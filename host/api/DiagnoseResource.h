@@ -7,6 +7,8 @@
 
 #include <cstddef>
 
+namespace zrm::host {
+
 /// `POST /api/v1/try`: tries a format on lines. `POST /api/v1/check`: judges a log configuration.
 class DiagnoseResource : public Resource {
 public:
@@ -21,5 +23,7 @@ private:
     static HttpAnswer tryFormat(const HttpRequest& request);
     static HttpAnswer checkConfig(const HttpRequest& request);
 };
+
+} // namespace zrm::host
 
 #endif

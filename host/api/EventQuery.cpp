@@ -4,6 +4,8 @@
 #include <array>
 #include <string>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::array severities = {"info", "minor", "warning", "major", "critical"};
@@ -46,3 +48,5 @@ void EventQuery::readKinds(QueryFields& query, EventFilter& filter) {
         }
     }
 }
+
+} // namespace zrm::host

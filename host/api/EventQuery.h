@@ -8,6 +8,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// What the routes of the history have in common. Stateless.
 class EventQuery {
 public:
@@ -29,5 +31,7 @@ public:
     /// which one must hold, and the text that they must have.
     static void readKinds(QueryFields& query, EventFilter& filter);
 };
+
+} // namespace zrm::host
 
 #endif

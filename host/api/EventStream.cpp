@@ -21,6 +21,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 using Clock = std::chrono::steady_clock;
@@ -273,3 +275,5 @@ HttpAnswer EventStream::open(const HttpRequest& request) {
     answer.stream.changed = [followers = m_followers] { followers->wake(); };
     return answer;
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 #include <cstddef>
 #include <memory>
 
+namespace zrm::host {
+
 class HistoryReader;
 
 /// `GET /api/v1/events/stream`: events as they are committed, as server-sent events. One thread,
@@ -40,5 +42,7 @@ private:
     HistoryReader* const m_history;
     const std::shared_ptr<Followers> m_followers; ///< shared with the answers, which may end later
 };
+
+} // namespace zrm::host
 
 #endif

@@ -18,6 +18,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"EventsResource.cpp"};
@@ -168,3 +170,5 @@ HttpAnswer EventsResource::rates(const HttpRequest& request) {
     }
     return HttpAnswer::json(text + "]}");
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 #include "host/http/HttpRequest.h"
 #include "host/http/Resource.h"
 
+namespace zrm::host {
+
 class HistoryReader;
 
 /// What the history holds: `GET /api/v1/events`, `GET /api/v1/events/{id}` and
@@ -23,5 +25,7 @@ private:
 
     HistoryReader* const m_history;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
 
+namespace zrm::host {
+
 void HealthResource::addRoutes(Router& router) {
     router.add(
         "GET", "/healthz",
@@ -14,3 +16,5 @@ void HealthResource::addRoutes(Router& router) {
         },
         Router::PUBLIC, Router::QUICK);
 }
+
+} // namespace zrm::host

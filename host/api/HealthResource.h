@@ -7,6 +7,8 @@
 #include <string>
 #include <utility>
 
+namespace zrm::host {
+
 /// `GET /healthz`: the process serves HTTP and monitors logs. Needs no token.
 class HealthResource : public Resource {
 public:
@@ -19,5 +21,7 @@ public:
 private:
     const std::function<std::string()> m_problem;
 };
+
+} // namespace zrm::host
 
 #endif

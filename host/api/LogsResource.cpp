@@ -20,6 +20,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"LogsResource.cpp"};
@@ -100,3 +102,5 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
 void LogsResource::addRoutes(Router& router) {
     router.add("GET", "/api/v1/logs", [this](const HttpRequest& request) { return logs(request); });
 }
+
+} // namespace zrm::host

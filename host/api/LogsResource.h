@@ -5,6 +5,8 @@
 #include "host/http/HttpRequest.h"
 #include "host/http/Resource.h"
 
+namespace zrm::host {
+
 class LogWatch;
 
 /// `GET /api/v1/logs`: the monitored logs as they are now.
@@ -20,5 +22,7 @@ private:
 
     const LogWatch& m_watch;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 #include <utility>
 #include <variant>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t mostConditions = 100;
@@ -72,3 +74,5 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     }
     return report;
 }
+
+} // namespace zrm::host

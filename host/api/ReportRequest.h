@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// What a report is asked for.
 struct ReportRequest {
     std::string log;  ///< whole path
@@ -19,5 +21,7 @@ struct ReportRequest {
     /// Throws RequestRefused.
     static ReportRequest parse(std::string_view body);
 };
+
+} // namespace zrm::host
 
 #endif

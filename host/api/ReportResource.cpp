@@ -10,6 +10,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"ReportResource.cpp"};
@@ -48,3 +50,5 @@ HttpAnswer ReportResource::report(const HttpRequest& request) {
             ",\"max_rows\":" + std::to_string(gMaxRows) + "}";
     return HttpAnswer::json(std::move(text));
 }
+
+} // namespace zrm::host

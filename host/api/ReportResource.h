@@ -6,6 +6,8 @@
 #include "host/http/HttpRequest.h"
 #include "host/http/Resource.h"
 
+namespace zrm::host {
+
 /// `POST /api/v1/reports`: what a log holds between two times, where conditions hold.
 class ReportResource : public Resource {
 public:
@@ -19,5 +21,7 @@ private:
 
     SampleSource& m_source;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -13,6 +13,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using nlohmann::json;
@@ -158,3 +160,5 @@ std::variant<Conditions, Problem> SampleRequest::parse(std::string_view table,
         return refused.problem();
     }
 }
+
+} // namespace zrm::host

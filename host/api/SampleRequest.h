@@ -8,6 +8,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// Reads the body of a sample request. Stateless.
 class SampleRequest {
 public:
@@ -17,5 +19,7 @@ public:
     static std::variant<std::vector<Condition>, Problem> parse(std::string_view table,
                                                                std::string_view body);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 #include <string>
 #include <variant>
 
+namespace zrm::host {
+
 void SampleResource::addRoutes(Router& router) {
     router.add("POST", "/api/v1/tables/{table}/sample",
                [this](const HttpRequest& request) { return sample(request); });
@@ -32,3 +34,5 @@ HttpAnswer SampleResource::sample(const HttpRequest& request) {
                             ",\"count\":" + std::to_string(rows.count) + ",\"truncated\":" +
                             (rows.truncated ? "true," : "false,") + rows.reachJson() + "}");
 }
+
+} // namespace zrm::host

@@ -8,6 +8,8 @@
 
 #include <vector>
 
+namespace zrm::host {
+
 /// `POST /api/v1/tables/{table}/sample`: the rows of one sample of a table.
 class SampleResource : public Resource {
 public:
@@ -21,5 +23,7 @@ private:
 
     SampleSource& m_source;
 };
+
+} // namespace zrm::host
 
 #endif

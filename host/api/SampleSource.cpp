@@ -6,6 +6,8 @@
 #include <array>
 #include <iterator>
 
+namespace zrm::host {
+
 namespace {
 
 /// True for the conditions that name a log, in either table.
@@ -30,3 +32,5 @@ bool SampleSource::isMonitored(const std::vector<Condition>& report) {
     std::copy_if(report.begin(), report.end(), std::back_inserter(log), namesLog);
     return take("RMMONLOG", log).count > 0;
 }
+
+} // namespace zrm::host

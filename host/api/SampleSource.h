@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// The one entry through which a sample of a table is asked.
 class SampleSource {
 public:
@@ -31,5 +33,7 @@ public:
     /// True when the log that a report's conditions name is monitored now.
     bool isMonitored(const std::vector<Condition>& report);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <optional>
 
+namespace zrm::host {
+
 SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
     SituationText text;
     text.name = fields.optionalText("name");
@@ -30,3 +32,5 @@ SituationConfig SituationBody::situation(JsonFields& fields, const std::string& 
     }
     return situation;
 }
+
+} // namespace zrm::host

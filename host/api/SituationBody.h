@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 class JsonFields;
 
 /// Reads situations out of the bodies of requests. What is wrong is thrown as RequestRefused.
@@ -19,5 +21,7 @@ public:
     /// The situation of an object; the first thing that is wrong with it is the one refused.
     static SituationConfig situation(JsonFields& fields, const std::string& name = "");
 };
+
+} // namespace zrm::host
 
 #endif

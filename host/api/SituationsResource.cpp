@@ -14,6 +14,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -160,3 +162,5 @@ HttpAnswer SituationsResource::validate(const HttpRequest& request) {
     }
     return HttpAnswer::json(SituationJson::text({{"problems", std::move(problems)}}));
 }
+
+} // namespace zrm::host

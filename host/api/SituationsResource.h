@@ -6,6 +6,8 @@
 #include "host/http/Resource.h"
 #include "host/situations/SituationSet.h"
 
+namespace zrm::host {
+
 /// `/api/v1/situations` and what lies under it: shows the situations and changes them.
 class SituationsResource : public Resource {
 public:
@@ -24,5 +26,7 @@ private:
 
     SituationSet& m_situations;
 };
+
+} // namespace zrm::host
 
 #endif

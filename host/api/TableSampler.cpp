@@ -11,6 +11,8 @@
 #include <optional>
 #include <semaphore>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"TableSampler.cpp"};
@@ -66,3 +68,5 @@ SampleSource::Rows TableSampler::take(std::string_view table,
     rows.reached = outcome.reached();
     return rows;
 }
+
+} // namespace zrm::host

@@ -3,10 +3,14 @@
 
 #include "host/api/SampleSource.h"
 
+namespace zrm::host {
+
 /// Takes samples of the tables that the agent has registered.
 class TableSampler : public SampleSource {
 public:
     Rows take(std::string_view table, const std::vector<Condition>& conditions) override;
 };
+
+} // namespace zrm::host
 
 #endif

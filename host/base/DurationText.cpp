@@ -6,6 +6,8 @@
 #include <limits>
 #include <system_error>
 
+namespace zrm::host {
+
 std::optional<std::chrono::seconds> DurationText::parse(std::string_view text) {
     struct Unit {
         std::string_view name;
@@ -26,3 +28,5 @@ std::optional<std::chrono::seconds> DurationText::parse(std::string_view text) {
     }
     return std::nullopt;
 }
+
+} // namespace zrm::host

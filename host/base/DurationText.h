@@ -5,6 +5,8 @@
 #include <optional>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Lengths of time as operators write them. Stateless.
 class DurationText {
 public:
@@ -12,5 +14,7 @@ public:
     /// and for one of more than 2147483647 seconds.
     static std::optional<std::chrono::seconds> parse(std::string_view text);
 };
+
+} // namespace zrm::host
 
 #endif

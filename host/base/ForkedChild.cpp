@@ -4,6 +4,8 @@
 
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 std::atomic<pid_t> g_process{0};
@@ -16,3 +18,5 @@ bool ForkedChild::isCaller() noexcept {
     return !g_process.compare_exchange_strong(expected, self, std::memory_order_relaxed) &&
            expected != self;
 }
+
+} // namespace zrm::host

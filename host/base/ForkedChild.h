@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_FORKED_CHILD_H
 #define ZRM_HOST_FORKED_CHILD_H
 
+namespace zrm::host {
+
 /// Tells a forked child, which must stay with async-signal-safe calls until its exec, from the
 /// process that the host was started as.
 namespace ForkedChild {
@@ -9,5 +11,7 @@ namespace ForkedChild {
 bool isCaller() noexcept;
 
 } // namespace ForkedChild
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <arpa/inet.h>
 #include <netinet/in.h>
 
+namespace zrm::host {
+
 std::optional<ListenAddress> ListenAddress::parse(std::string_view text) {
     const std::size_t colon = text.rfind(':');
     if (colon == std::string_view::npos) {
@@ -47,3 +49,5 @@ std::string ListenAddress::text() const {
     const bool isV6 = host.find(':') != std::string::npos;
     return (isV6 ? '[' + host + ']' : host) + ':' + std::to_string(port);
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Where the HTTP server listens.
 struct ListenAddress {
     std::string host;       ///< name or number, without brackets
@@ -22,5 +24,7 @@ struct ListenAddress {
 
     bool operator==(const ListenAddress&) const = default;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -14,6 +14,8 @@
 #include <sys/types.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr int patience = 1000; // milliseconds
@@ -124,3 +126,5 @@ void PatientWrite::toStandardError(std::string_view record) noexcept {
 void PatientWrite::toFile(int fd, std::string_view record) noexcept {
     writeRecord(fd, Kind::WAITING, record);
 }
+
+} // namespace zrm::host

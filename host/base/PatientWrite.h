@@ -3,6 +3,8 @@
 
 #include <string_view>
 
+namespace zrm::host {
+
 /// Writes of records to a descriptor at whose other end somebody may not read. Any thread; neither
 /// locks nor allocates.
 namespace PatientWrite {
@@ -17,5 +19,7 @@ void toStandardError(std::string_view record) noexcept;
 void toFile(int fd, std::string_view record) noexcept;
 
 } // namespace PatientWrite
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstdint>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr int cutDivisor = 4;
@@ -25,3 +27,5 @@ RetryPause::Duration RetryPause::next() {
     std::uniform_int_distribution<Duration::rep> cut(0, whole.count() / cutDivisor);
     return whole - Duration(cut(m_random));
 }
+
+} // namespace zrm::host

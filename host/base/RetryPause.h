@@ -4,6 +4,8 @@
 #include <chrono>
 #include <random>
 
+namespace zrm::host {
+
 /// The pauses between tries at something that fails: each twice as long as the one before, up to a
 /// longest, and each cut by a random part, at most a quarter. Many agents whose receiver was down
 /// for all of them would otherwise come back to it at the same moments. One thread's.
@@ -25,5 +27,7 @@ private:
     Duration m_whole; ///< of the next pause, uncut
     std::minstd_rand m_random;
 };
+
+} // namespace zrm::host
 
 #endif

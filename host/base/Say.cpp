@@ -7,6 +7,8 @@
 #include <cstddef>
 #include <cstdio>
 
+namespace zrm::host {
+
 void say(const char* format, ...) {
     char line[8192];
     std::size_t length = static_cast<std::size_t>(std::snprintf(line, sizeof line, "zrmagent: "));
@@ -18,3 +20,5 @@ void say(const char* format, ...) {
     line[length++] = '\n';
     PatientWrite::toStandardError({line, length});
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 #include <string_view>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 /// Whether a character that steers may begin with the byte; C0 controls are escaped in every JSON.
@@ -41,3 +43,5 @@ std::string SteeringText::escapedInJson(std::string document) {
     }
     return from == 0 ? std::move(document) : result.append(document, from);
 }
+
+} // namespace zrm::host

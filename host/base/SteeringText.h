@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// Characters that steer how text is shown (Utf8::isSteering), made visible. Any thread.
 namespace SteeringText {
 
@@ -14,5 +16,7 @@ void appendEscape(std::string& text, char32_t character);
 std::string escapedInJson(std::string document);
 
 } // namespace SteeringText
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstdio>
 #include <ctime>
 
+namespace zrm::host {
+
 namespace {
 
 struct Moment {
@@ -229,3 +231,5 @@ std::optional<std::int64_t> TimeText::toMilliseconds(std::string_view text) {
         iso->east ? secondsOf(iso->at, *iso->east) : localSecondsOf(iso->at);
     return seconds * second + fractionOf(text);
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Times as operators write them. Stateless.
 class TimeText {
 public:
@@ -18,5 +20,7 @@ public:
     /// The same time in milliseconds since 1970-01-01 UTC, with its fraction. Any thread.
     static std::optional<std::int64_t> toMilliseconds(std::string_view text);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <charconv>
 
+namespace zrm::host {
+
 std::optional<std::string> UrlText::decode(std::string_view encoded) {
     std::string text;
     for (std::size_t at = 0; at < encoded.size(); ++at) {
@@ -47,3 +49,5 @@ std::optional<std::multimap<std::string, std::string>> UrlText::query(std::strin
     }
     return query;
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Reads the texts of a URL strictly. Stateless.
 class UrlText {
 public:
@@ -17,5 +19,7 @@ public:
     /// be decoded.
     static std::optional<std::multimap<std::string, std::string>> query(std::string_view encoded);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <cstdio>
 #include <ctime>
 
+namespace zrm::host {
+
 namespace {
 
 void appendUnusual(std::string& text, const std::tm& utc, int millisecond) {
@@ -46,3 +48,5 @@ std::string UtcTime::text(std::int64_t milliseconds) {
     append(text, milliseconds);
     return text;
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// Times of the host as other systems read them. Stateless.
 class UtcTime {
 public:
@@ -14,5 +16,7 @@ public:
     /// The same as a text of its own.
     static std::string text(std::int64_t milliseconds);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <cstdint>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::uint64_t highBits = 0x8080808080808080;
@@ -149,3 +151,5 @@ std::string_view Utf8::prefix(std::string_view text, std::size_t size) noexcept 
     }
     return text.substr(0, size);
 }
+
+} // namespace zrm::host

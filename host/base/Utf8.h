@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Examination of text that should be UTF-8. Any thread; neither locks nor allocates.
 namespace Utf8 {
 
@@ -40,5 +42,7 @@ bool isSteering(char32_t character) noexcept;
 std::string_view prefix(std::string_view text, std::size_t size) noexcept;
 
 } // namespace Utf8
+
+} // namespace zrm::host
 
 #endif

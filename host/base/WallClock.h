@@ -4,6 +4,8 @@
 #include <chrono>
 #include <cstdint>
 
+namespace zrm::host {
+
 /// The time of day in the form in which the host stores it.
 namespace WallClock {
 
@@ -15,5 +17,7 @@ inline std::int64_t now() {
 }
 
 } // namespace WallClock
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 WatchedFile::WatchedFile(std::string path)
     : m_path(std::move(path)), m_known(look()), m_seen(m_known) {}
 
@@ -27,3 +29,5 @@ bool WatchedFile::hasChanged() {
     m_known = now;
     return true;
 }
+
+} // namespace zrm::host

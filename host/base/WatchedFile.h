@@ -7,6 +7,8 @@
 #include <sys/types.h>
 #include <time.h>
 
+namespace zrm::host {
+
 /// Notices that a file was written or replaced. Used by one thread.
 class WatchedFile {
 public:
@@ -34,5 +36,7 @@ private:
     std::optional<Version> m_known; ///< none: the file was not there
     std::optional<Version> m_seen;  ///< at the last look
 };
+
+} // namespace zrm::host
 
 #endif

@@ -15,6 +15,8 @@
 
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr const char* defaultConfig = "/etc/zrm/zrm.toml";
@@ -176,3 +178,5 @@ AgentAccess AgentAccess::find(const CommonOptions& options) {
     }
     return found;
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Options of every command.
 struct CommonOptions {
     std::string config;    ///< empty: the default configuration
@@ -28,5 +30,7 @@ struct AgentAccess {
     /// unencrypted to another machine.
     static AgentAccess find(const CommonOptions& options);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -14,6 +14,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using namespace std::chrono_literals;
@@ -241,3 +243,5 @@ std::string AgentClient::pathPart(std::string_view text) {
     }
     return part;
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 /// Requests to the agent's HTTP API. One thread, except stop. Failures are thrown as CliError:
 /// no answer, a token that the agent does not accept, or what a problem document says.
 class AgentClient {
@@ -42,5 +44,7 @@ private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 BacktestCommand::BacktestCommand(CLI::App& program)
     : m_command(
           program.add_subcommand("backtest", "Run a situation over what its log holds already")) {
@@ -44,3 +46,5 @@ int BacktestCommand::run(Context& context) {
     }
     return CLI_DONE;
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl backtest SITUATION`: how often a situation would have been raised, and when.
 class BacktestCommand : public Command {
 public:
@@ -20,5 +22,7 @@ private:
     std::string m_from = "-24h";
     std::string m_to = "now";
 };
+
+} // namespace zrm::host
 
 #endif

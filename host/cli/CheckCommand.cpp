@@ -15,6 +15,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -109,3 +111,5 @@ int CheckCommand::checkHost(Context& context) const {
     }
     return problems.empty() ? CLI_DONE : CLI_REFUSED;
 }
+
+} // namespace zrm::host

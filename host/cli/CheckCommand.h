@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl check CONFIG`, `zrmctl check --host FILE`: judges a configuration of logs, or the
 /// agent's own configuration, as the agent would. Needs no agent.
 class CheckCommand : public Command {
@@ -22,5 +24,7 @@ private:
     std::string m_config;
     std::string m_host;
 };
+
+} // namespace zrm::host
 
 #endif

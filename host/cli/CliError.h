@@ -4,6 +4,8 @@
 #include <stdexcept>
 #include <string>
 
+namespace zrm::host {
+
 /// The exit statuses of zrmctl.
 enum CliStatus {
     CLI_DONE = 0,
@@ -23,5 +25,7 @@ public:
 private:
     CliStatus m_status;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -1,11 +1,13 @@
 #ifndef ZRM_HOST_CLI_COMMAND_H
 #define ZRM_HOST_CLI_COMMAND_H
 
-class Context;
-
 namespace CLI {
 class App;
 }
+
+namespace zrm::host {
+
+class Context;
 
 /// One command of zrmctl. Its constructor declares the command and its options.
 class Command {
@@ -18,5 +20,7 @@ public:
     /// Does it. Returns a CliStatus, or throws CliError.
     virtual int run(Context& context) = 0;
 };
+
+} // namespace zrm::host
 
 #endif

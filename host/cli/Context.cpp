@@ -15,6 +15,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 Context::Context(const CommonOptions& options, const Terminal& terminal)
     : m_options(options), m_terminal(terminal) {}
 
@@ -73,3 +75,5 @@ std::string Context::time(const std::string& option, const std::string& text) {
     }
     return *time;
 }
+
+} // namespace zrm::host

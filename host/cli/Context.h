@@ -9,6 +9,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// What a command works with: the agent, standard output and standard error. One thread.
 class Context {
 public:
@@ -41,5 +43,7 @@ private:
     std::unique_ptr<AgentAccess> m_access;
     std::unique_ptr<AgentClient> m_client;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -1,5 +1,7 @@
 #include "host/cli/CsvText.h"
 
+namespace zrm::host {
+
 std::string CsvText::record(const std::vector<std::string>& fields) {
     std::string text;
     for (const std::string& field : fields) {
@@ -18,3 +20,5 @@ std::string CsvText::record(const std::vector<std::string>& fields) {
     }
     return text + "\r\n";
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Comma-separated values as RFC 4180 has them. Stateless.
 class CsvText {
 public:
@@ -12,5 +14,7 @@ public:
     /// quotes.
     static std::string record(const std::vector<std::string>& fields);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 
 #include <locale.h>
 
+namespace zrm::host {
+
 namespace {
 
 struct Range {
@@ -145,3 +147,5 @@ std::string DisplayText::shortenedPath(std::string_view visible, std::size_t col
     }
     return std::string(ellipsis) + std::string(visible);
 }
+
+} // namespace zrm::host

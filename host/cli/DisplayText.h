@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Texts of logs made fit for a terminal. Any thread.
 namespace DisplayText {
 
@@ -25,5 +27,7 @@ std::string shortened(std::string_view visible, std::size_t columns, std::string
 std::string shortenedPath(std::string_view visible, std::size_t columns, std::string_view ellipsis);
 
 } // namespace DisplayText
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using namespace std::chrono_literals;
@@ -84,3 +86,5 @@ void EventFollower::adoptNewHistory() {
         m_last = 0;
     }
 }
+
+} // namespace zrm::host

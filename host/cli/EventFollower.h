@@ -10,6 +10,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// Follows the agent's live stream of events until it is stopped: each event behind the given one
 /// once and in order, also when the connection is lost on the way.
 class EventFollower {
@@ -37,5 +39,7 @@ private:
     std::uint64_t m_last = 0; ///< the latest event that was handed over
     bool m_isLost = false;    ///< and the operator knows
 };
+
+} // namespace zrm::host
 
 #endif

@@ -19,6 +19,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -236,3 +238,5 @@ int EventsCommand::follow(Context& context) {
 int EventsCommand::run(Context& context) {
     return m_follow ? follow(context) : list(context);
 }
+
+} // namespace zrm::host

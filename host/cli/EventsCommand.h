@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// `zrmctl events [-f]`: what was raised, and what is.
 class EventsCommand : public Command {
 public:
@@ -32,5 +34,7 @@ private:
     std::string m_text;
     unsigned m_limit = 0; ///< 0: not given
 };
+
+} // namespace zrm::host
 
 #endif

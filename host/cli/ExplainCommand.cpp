@@ -8,6 +8,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -116,3 +118,5 @@ int ExplainCommand::run(Context& context) {
     }
     return CLI_DONE;
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl explain SITUATION`: why a line, an event or the last entries of a log raise it or not.
 class ExplainCommand : public Command {
 public:
@@ -26,5 +28,7 @@ private:
     std::uint64_t m_event = 0;
     unsigned m_last = 0;
 };
+
+} // namespace zrm::host
 
 #endif

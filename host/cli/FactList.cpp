@@ -4,6 +4,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 void FactList::add(std::string name, const std::string& value, Colour colour) {
     if (!value.empty()) {
         m_facts.push_back({std::move(name), DisplayText::visible(value), colour});
@@ -23,3 +25,5 @@ std::string FactList::text(const Terminal& terminal) const {
     }
     return text;
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// Names and what they are, one below the other.
 class FactList {
 public:
@@ -24,5 +26,7 @@ private:
     };
     std::vector<Fact> m_facts;
 };
+
+} // namespace zrm::host
 
 #endif

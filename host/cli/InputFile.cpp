@@ -5,6 +5,8 @@
 
 #include <cerrno>
 
+namespace zrm::host {
+
 namespace {
 
 int leaveOpen(std::FILE*) {
@@ -61,3 +63,5 @@ std::string InputFile::text() {
     throwIfFailed();
     return text;
 }
+
+} // namespace zrm::host

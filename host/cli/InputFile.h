@@ -7,6 +7,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// A file that a command line names; "-" is standard input. One thread.
 class InputFile {
 public:
@@ -29,5 +31,7 @@ private:
     std::string m_path;
     std::unique_ptr<std::FILE, int (*)(std::FILE*)> m_stream;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr int deepestNesting = 64;
@@ -59,3 +61,5 @@ const JsonText::Json& JsonText::member(const Json& object, std::string_view key)
     const auto found = object.find(std::string(key));
     return found == object.end() ? none : *found;
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 /// JSON of the agent, read without surprise and written without harm. Stateless.
 class JsonText {
 public:
@@ -30,5 +32,7 @@ public:
     /// The member; a null value when there is none.
     static const Json& member(const Json& object, std::string_view key);
 };
+
+} // namespace zrm::host
 
 #endif

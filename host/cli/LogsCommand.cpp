@@ -13,6 +13,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -252,3 +254,5 @@ int LogsCommand::show(Context& context) {
                   skippedText(ledger, context.terminal()));
     return exitStatus;
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl logs [LOG]`: the monitored logs, or everything about one.
 class LogsCommand : public Command {
 public:
@@ -22,5 +24,7 @@ private:
     std::string m_log;
     bool m_check = false;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t narrowest = 10; ///< columns of the text that are shown at least
@@ -33,3 +35,5 @@ std::string MarkedText::of(std::string_view text, std::size_t at, std::size_t in
     return blanks + before + rest + '\n' + blanks + std::string(DisplayText::width(before), ' ') +
            terminal.coloured("^", Colour::BAD) + '\n';
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// A text with a caret under one of its places. Stateless.
 class MarkedText {
 public:
@@ -16,5 +18,7 @@ public:
     static std::string of(std::string_view text, std::size_t at, std::size_t indent,
                           const Terminal& terminal);
 };
+
+} // namespace zrm::host
 
 #endif

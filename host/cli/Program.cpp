@@ -20,6 +20,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 /// What is wrong with a command line, with the word that stands where a command should.
@@ -112,3 +114,5 @@ int Program::runCommand() {
     }
     return CLI_USAGE;
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <memory>
 #include <vector>
 
+namespace zrm::host {
+
 /// zrmctl: its commands, and the way from a command line to one of them.
 class Program {
 public:
@@ -25,5 +27,7 @@ private:
     std::unique_ptr<CLI::App> m_app;
     std::vector<std::unique_ptr<Command>> m_commands;
 };
+
+} // namespace zrm::host
 
 #endif

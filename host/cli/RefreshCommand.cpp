@@ -6,6 +6,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 RefreshCommand::RefreshCommand(CLI::App& program)
     : m_command(program.add_subcommand("refresh",
                                        "Let the agent re-read the configuration of the logs")) {}
@@ -21,3 +23,5 @@ int RefreshCommand::run(Context& context) {
     }
     return CLI_DONE;
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "host/cli/Command.h"
 
+namespace zrm::host {
+
 /// `zrmctl refresh`: the agent re-reads the configuration of the logs.
 class RefreshCommand : public Command {
 public:
@@ -14,5 +16,7 @@ public:
 private:
     CLI::App* m_command;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -18,6 +18,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -172,3 +174,5 @@ int ReportCommand::run(Context& context) {
     }
     return CLI_DONE;
 }
+
+} // namespace zrm::host

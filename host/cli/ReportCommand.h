@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// `zrmctl report LOG`: what a log held between two times.
 class ReportCommand : public Command {
 public:
@@ -23,5 +25,7 @@ private:
     std::vector<std::string> m_columns;
     std::string m_format = "table";
 };
+
+} // namespace zrm::host
 
 #endif

@@ -11,6 +11,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = SituationOptions::Json;
@@ -94,3 +96,5 @@ Json SituationOptions::definition(const Json& base) const {
     }
     return definition;
 }
+
+} // namespace zrm::host

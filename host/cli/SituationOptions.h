@@ -11,6 +11,8 @@ class App;
 class Option;
 } // namespace CLI
 
+namespace zrm::host {
+
 /// The options in which a command line describes a situation.
 class SituationOptions {
 public:
@@ -46,5 +48,7 @@ private:
     std::string m_frequency;
     std::string m_period;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -11,6 +11,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -191,3 +193,5 @@ int SituationsCommand::validate(Context& context) {
     }
     return problems.empty() ? CLI_DONE : CLI_REFUSED;
 }
+
+} // namespace zrm::host

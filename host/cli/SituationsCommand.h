@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// `zrmctl situations [list|show|add|set|remove|start|stop|validate]`.
 class SituationsCommand : public Command {
 public:
@@ -42,5 +44,7 @@ private:
     std::string m_name;
     SituationOptions m_options;
 };
+
+} // namespace zrm::host
 
 #endif

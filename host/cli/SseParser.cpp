@@ -4,6 +4,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t longestEvent = 1024 * 1024; ///< bytes
@@ -46,3 +48,5 @@ void SseParser::line(std::string_view line) {
     m_data += line;
     m_hasData = true;
 }
+
+} // namespace zrm::host

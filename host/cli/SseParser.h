@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Server-sent events out of the pieces in which they arrive.
 class SseParser {
 public:
@@ -25,5 +27,7 @@ private:
     std::string m_data;
     bool m_hasData = false;
 };
+
+} // namespace zrm::host
 
 #endif

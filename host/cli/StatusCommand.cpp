@@ -10,6 +10,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = JsonText::Json;
@@ -119,3 +121,5 @@ int StatusCommand::run(Context& context) {
     }
     return outcome;
 }
+
+} // namespace zrm::host

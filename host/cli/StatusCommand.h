@@ -3,6 +3,8 @@
 
 #include "host/cli/Command.h"
 
+namespace zrm::host {
+
 /// `zrmctl status`: how the agent itself fares.
 class StatusCommand : public Command {
 public:
@@ -15,5 +17,7 @@ private:
     CLI::App* m_command;
     bool m_check = false;
 };
+
+} // namespace zrm::host
 
 #endif

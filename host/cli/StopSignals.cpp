@@ -5,6 +5,8 @@
 
 #include <pthread.h>
 
+namespace zrm::host {
+
 StopSignals::StopSignals() {
     sigemptyset(&m_signals);
     sigaddset(&m_signals, SIGINT);
@@ -46,3 +48,5 @@ void StopSignals::onStop(std::function<void()> action) {
         m_action();
     }
 }
+
+} // namespace zrm::host

@@ -10,6 +10,8 @@
 
 #include <signal.h>
 
+namespace zrm::host {
+
 /// Ctrl-C (and SIGTERM) as a wish instead of a sudden end, as long as the object lives. Made
 /// before other threads are, so that they block the signals, too.
 class StopSignals {
@@ -40,5 +42,7 @@ private:
     std::function<void()> m_action;
     std::thread m_thread;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <limits>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t gap = 2;        ///< blanks between columns
@@ -86,3 +88,5 @@ std::string Table::text(const Terminal& terminal) const {
     }
     return result;
 }
+
+} // namespace zrm::host

@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Rows of text under headings, made to fit a terminal: columns that may shrink are shortened,
 /// the widest first; what still does not fit is cut at the edge.
 class Table {
@@ -49,5 +51,7 @@ private:
     std::vector<Column> m_columns;
     std::vector<std::vector<Cell>> m_rows;
 };
+
+} // namespace zrm::host
 
 #endif

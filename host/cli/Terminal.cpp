@@ -8,6 +8,8 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t usualWidth = 80;
@@ -68,3 +70,5 @@ std::string Terminal::coloured(std::string_view text, Colour colour) const {
     }
     return sequenceOf(colour) + std::string(text) + "\033[0m";
 }
+
+} // namespace zrm::host

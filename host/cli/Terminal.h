@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Colours by what they mean.
 enum class Colour { NONE, GOOD, NOTICE, BAD, FAINT, HEADING };
 
@@ -24,5 +26,7 @@ struct Terminal {
     /// What stands for the rest of a text that is cut.
     std::string_view ellipsis() const noexcept { return isUtf8 ? "…" : "..."; }
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <optional>
 
+namespace zrm::host {
+
 namespace {
 
 std::optional<std::time_t> parsed(std::string_view iso) {
@@ -87,3 +89,5 @@ std::string TimeDisplay::bytes(std::uint64_t count) {
                   units[unit]);
     return text;
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Times and amounts as people read them. Stateless.
 class TimeDisplay {
 public:
@@ -24,5 +26,7 @@ public:
     /// "512 B", "4.2 kB", "81 MB", "3.1 GB".
     static std::string bytes(std::uint64_t count);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <array>
 #include <charconv>
 
+namespace zrm::host {
+
 namespace {
 
 struct Unit {
@@ -91,3 +93,5 @@ std::optional<std::string> TimeInput::toIso(std::string_view text, std::time_t n
     }
     return TimeText::toStamp(text) ? std::optional(std::string(text)) : std::nullopt;
 }
+
+} // namespace zrm::host

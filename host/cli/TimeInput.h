@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Times as an operator writes them on a command line. Stateless.
 class TimeInput {
 public:
@@ -19,5 +21,7 @@ public:
     static constexpr const char* forms = "-2h (s, m, h, d, w), now, today, yesterday, 07:30, "
                                          "2026-11-20, 2026-11-20T07:30:00 or with a zone";
 };
+
+} // namespace zrm::host
 
 #endif

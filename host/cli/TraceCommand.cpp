@@ -8,6 +8,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 TraceCommand::TraceCommand(CLI::App& program)
     : m_command(program.add_subcommand("trace", "Show or set what the agent traces")) {
     m_command->add_option("LEVELS", m_levels,
@@ -31,3 +33,5 @@ int TraceCommand::run(Context& context) {
     }
     return CLI_DONE;
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl trace LEVELS`: what the agent traces from now on.
 class TraceCommand : public Command {
 public:
@@ -17,5 +19,7 @@ private:
     CLI::App* m_command;
     std::string m_levels;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -21,6 +21,8 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -151,3 +153,5 @@ int TryCommand::run(Context& context) {
     }
     return status;
 }
+
+} // namespace zrm::host

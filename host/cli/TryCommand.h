@@ -6,6 +6,8 @@
 #include <cstddef>
 #include <string>
 
+namespace zrm::host {
+
 /// `zrmctl try FORMAT FILE`: what a format specifier makes of the lines of a file, or where they
 /// stop fitting. Needs no agent.
 class TryCommand : public Command {
@@ -21,5 +23,7 @@ private:
     std::string m_file;
     std::size_t m_lines = 100;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <cstdlib>
 #include <string>
 
+using namespace zrm::host;
+
 int main(int argc, char** argv) {
     std::setlocale(LC_CTYPE, ""); // whether the terminal takes UTF-8
     // The agent's code traces where it is used here; an operator sees that only on demand.

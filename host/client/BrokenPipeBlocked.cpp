@@ -3,6 +3,8 @@
 #include <pthread.h>
 #include <time.h>
 
+namespace zrm::host {
+
 BrokenPipeBlocked::BrokenPipeBlocked() {
     sigemptyset(&m_pipe);
     sigaddset(&m_pipe, SIGPIPE);
@@ -18,3 +20,5 @@ BrokenPipeBlocked::~BrokenPipeBlocked() {
     sigtimedwait(&m_pipe, nullptr, &atOnce);
     pthread_sigmask(SIG_SETMASK, &m_before, nullptr);
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include <signal.h>
 
+namespace zrm::host {
+
 /// While it lives, writing to a connection that the other side has closed does not signal the
 /// process, whose action for SIGPIPE stays as it is: children inherit that. One thread's, made and
 /// destroyed on it.
@@ -17,5 +19,7 @@ private:
     sigset_t m_pipe{};
     sigset_t m_before{};
 };
+
+} // namespace zrm::host
 
 #endif

@@ -16,6 +16,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 using Clock = std::chrono::steady_clock;
@@ -365,3 +367,5 @@ HttpClient::~HttpClient() = default;
 HttpClientAnswer HttpClient::send(const HttpClientRequest& request, const std::stop_token& giveUp) {
     return m_implementation->send(request, giveUp);
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// How long the parts of one request may take. None of them begins anew while a server sends a
 /// byte now and then, except `silence`.
 struct HttpLimits {
@@ -85,5 +87,7 @@ private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;
 };
+
+} // namespace zrm::host
 
 #endif

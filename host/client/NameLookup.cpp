@@ -9,6 +9,8 @@
 #include <netdb.h>
 #include <netinet/in.h>
 
+namespace zrm::host {
+
 struct NameLookup::Answer {
     int code = 0; ///< of getaddrinfo
     std::vector<SocketAddress> addresses;
@@ -81,3 +83,5 @@ std::vector<SocketAddress> NameLookup::find(Clock::time_point limit,
     }
     return std::move(lookup->answer.addresses);
 }
+
+} // namespace zrm::host

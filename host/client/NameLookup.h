@@ -10,6 +10,8 @@
 
 #include <sys/socket.h>
 
+namespace zrm::host {
+
 /// Where a receiver can be reached.
 struct SocketAddress {
     sockaddr_storage address{};
@@ -53,5 +55,7 @@ private:
     std::shared_ptr<Lookup> m_underWay; ///< shared with the thread
     std::string m_error;
 };
+
+} // namespace zrm::host
 
 #endif

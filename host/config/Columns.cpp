@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <array>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr Column text(std::string_view name, int width) {
@@ -48,3 +50,5 @@ const Column* findColumn(std::span<const Column> columns, std::string_view name)
                                     [&](const Column& column) { return column.name == name; });
     return found == columns.end() ? nullptr : &*found;
 }
+
+} // namespace zrm::host

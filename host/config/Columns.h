@@ -4,6 +4,8 @@
 #include <span>
 #include <string_view>
 
+namespace zrm::host {
+
 /// What conditions need to know of a column before the agent has registered its tables.
 struct Column {
     std::string_view name; ///< upper-case
@@ -17,5 +19,7 @@ std::span<const Column> columnsOf(std::string_view table) noexcept;
 
 /// The column of this upper-case name, or null.
 const Column* findColumn(std::span<const Column> columns, std::string_view name) noexcept;
+
+} // namespace zrm::host
 
 #endif

@@ -11,6 +11,8 @@
 
 #include <re2/re2.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t longestPattern = 4096; ///< bytes
@@ -292,3 +294,5 @@ ConditionBuilder::ofLog(std::string_view path) {
     }
     return conditions;
 }
+
+} // namespace zrm::host

@@ -13,6 +13,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// What is wrong with a condition, and where.
 struct ConditionProblem {
     enum class Part { COLUMN, OPERATOR, VALUE };
@@ -64,5 +66,7 @@ private:
 
     std::span<const Column> m_columns;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <string>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr const char* form = "write COLUMN OP VALUE, for example ENTRYDESC contains 'failed'";
@@ -153,3 +155,5 @@ ConditionBuilder::Result ConditionParser::parse(std::string_view text,
     }
     return std::move(*problem);
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <string_view>
 
+namespace zrm::host {
+
 /// Reads one condition of the condition language: COLUMN OP VALUE. Text stands in single quotes,
 /// in which two quotes in a row are one; numbers stand bare; `in` takes a list in brackets.
 /// Immutable.
@@ -24,5 +26,7 @@ public:
 private:
     ConditionBuilder m_builder;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -21,6 +21,8 @@
 
 #include <toml++/toml.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t largestFile = 4 * 1024 * 1024; ///< bytes
@@ -277,3 +279,5 @@ ConfigFile::Result ConfigFile::reload(const std::string& path) {
     }
     return result;
 }
+
+} // namespace zrm::host

@@ -8,6 +8,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// Reads host configuration files. Stateless.
 class ConfigFile {
 public:
@@ -28,5 +30,7 @@ public:
     /// Reads the text of a file that is called `path` in messages.
     static Result parse(std::string_view text, const std::string& path);
 };
+
+} // namespace zrm::host
 
 #endif

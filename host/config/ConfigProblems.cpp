@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+namespace zrm::host {
+
 ConfigProblems::ConfigProblems(std::string file) : m_file(std::move(file)) {}
 
 void ConfigProblems::add(unsigned line, const std::string& key, const std::string& what,
@@ -37,3 +39,5 @@ std::vector<std::string> ConfigProblems::texts() const {
     }
     return texts;
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// What is wrong with a host configuration file: all of it, so that one look at the messages is
 /// enough to put the file right.
 class ConfigProblems {
@@ -32,5 +34,7 @@ private:
     std::vector<Problem> m_problems;
     std::size_t m_more = 0; ///< that are only counted
 };
+
+} // namespace zrm::host
 
 #endif

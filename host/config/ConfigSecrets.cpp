@@ -6,6 +6,8 @@
 
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 namespace {
 
 bool holdsSecret(const SinkConfig& sink) {
@@ -28,3 +30,5 @@ std::string warningOfSecrets(const HostConfig& config, const std::string& path) 
            "(secret_file, headers_file), or take the others' permissions away (chmod o= " +
            path + ')';
 }
+
+} // namespace zrm::host

@@ -5,8 +5,12 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// A warning when a configuration, read from the file of this path, holds a secret of a sink and
 /// every user can read the file; else empty.
 std::string warningOfSecrets(const HostConfig& config, const std::string& path);
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 namespace {
 
 unsigned lineOf(const toml::source_region& source) {
@@ -177,3 +179,5 @@ void ConfigSection::refuseUnknownKeys() {
         }
     }
 }
+
+} // namespace zrm::host

@@ -12,6 +12,8 @@
 
 #include <toml++/toml.h>
 
+namespace zrm::host {
+
 /// One table of a configuration file while it is read: gives values by key and type, notes every
 /// problem, and knows which keys nobody asked for.
 class ConfigSection {
@@ -57,5 +59,7 @@ private:
     ConfigProblems& m_problems;
     std::vector<std::string> m_known; ///< keys that were asked for, in that order
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <array>
 #include <string>
 
+namespace zrm::host {
+
 namespace {
 
 std::string lowerCase(std::string_view name) {
@@ -39,3 +41,5 @@ bool isSecretHeader(std::string_view name) {
         return lower.find(part) != std::string::npos;
     });
 }
+
+} // namespace zrm::host

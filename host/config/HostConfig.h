@@ -11,6 +11,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// An environment variable of the agent that the configuration sets where it is unset.
 struct EnvironmentSetting {
     std::string variable;
@@ -60,5 +62,7 @@ struct HostConfig {
     std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
     std::vector<SituationConfig> situations;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <array>
 
+namespace zrm::host {
+
 namespace {
 
 struct Scheme {
@@ -62,3 +64,5 @@ std::string HttpUrl::withPath(std::string_view path) const {
     }
     return whole.insert(end, path);
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// The URL of something that is asked over HTTP.
 struct HttpUrl {
     bool isSecure = false;  ///< https
@@ -25,5 +27,7 @@ struct HttpUrl {
 
     bool operator==(const HttpUrl&) const = default;
 };
+
+} // namespace zrm::host
 
 #endif

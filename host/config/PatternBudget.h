@@ -4,6 +4,8 @@
 #include <algorithm>
 #include <cstddef>
 
+namespace zrm::host {
+
 /// How large the regular expressions of several conditions may be together, in instructions of
 /// their programs. Compiling costs microseconds for each instruction, and a few bytes of memory for
 /// as long as the condition is in force; a pattern of a few bytes can have hundreds of thousands.
@@ -31,5 +33,7 @@ private:
     std::size_t m_most;
     std::size_t m_used = 0;
 };
+
+} // namespace zrm::host
 
 #endif

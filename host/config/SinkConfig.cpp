@@ -1,5 +1,7 @@
 #include "host/config/SinkConfig.h"
 
+namespace zrm::host {
+
 namespace {
 
 /// The option's value, or an empty one when it is missing.
@@ -29,3 +31,5 @@ std::chrono::milliseconds SinkConfig::duration(std::string_view option) const {
 SinkConfig::Texts SinkConfig::texts(std::string_view option) const {
     return valueOf<Texts>(*this, option);
 }
+
+} // namespace zrm::host

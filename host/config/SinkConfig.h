@@ -8,6 +8,8 @@
 #include <string_view>
 #include <variant>
 
+namespace zrm::host {
+
 /// One [[sink]] of a configuration.
 struct SinkConfig {
     using Texts = std::map<std::string, std::string>;
@@ -33,5 +35,7 @@ struct SinkConfig {
 
     bool operator==(const SinkConfig&) const = default;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <charconv>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 bool isControl(char c) {
@@ -202,3 +204,5 @@ SinkOptionReader::Value SinkOptionReader::readTexts(const SinkOption& option) {
     }
     return texts;
 }
+
+} // namespace zrm::host

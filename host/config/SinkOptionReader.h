@@ -10,6 +10,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Reads and checks the value of one option of a sink. The references that it is made of outlive
 /// it.
 class SinkOptionReader {
@@ -32,5 +34,7 @@ private:
     ConfigSection& m_section;
     ConfigProblems& m_problems;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 /// What a sink is called that was given no name. It holds nothing of a URL but host and port: the
@@ -79,3 +81,5 @@ void SinkReader::checkUnique(ConfigSection& section, const SinkType& type, const
                         "give each sink a name of its own");
     }
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 #include <map>
 #include <string>
 
+namespace zrm::host {
+
 /// Reads the [[sink]] tables of a configuration file.
 class SinkReader {
 public:
@@ -26,5 +28,7 @@ private:
     std::map<std::string, unsigned> m_names;   ///< line of each sink's name
     std::map<std::string, unsigned> m_targets; ///< line of the place to which each sink delivers
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <array>
 
+namespace zrm::host {
+
 namespace {
 
 using Option = SinkOption;
@@ -199,3 +201,5 @@ const SinkType* SinkTypes::find(std::string_view name) noexcept {
                                     [&](const SinkType& type) { return type.name == name; });
     return found == types.end() ? nullptr : &*found;
 }
+
+} // namespace zrm::host

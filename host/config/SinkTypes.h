@@ -5,6 +5,8 @@
 #include <span>
 #include <string_view>
 
+namespace zrm::host {
+
 /// One key of a [[sink]]: what the reader of configurations accepts and what the documentation
 /// says.
 struct SinkOption {
@@ -56,5 +58,7 @@ public:
     /// The type of this name, or null.
     static const SinkType* find(std::string_view name) noexcept;
 };
+
+} // namespace zrm::host
 
 #endif

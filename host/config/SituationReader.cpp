@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 /// Takes the fields of a situation out of its table.
@@ -80,3 +82,5 @@ void SituationReader::noteName(ConfigSection& section, const std::string& name) 
                         "give each situation a name of its own");
     }
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 #include <map>
 #include <string>
 
+namespace zrm::host {
+
 /// Reads the [[situation]] tables of a configuration file.
 class SituationReader {
 public:
@@ -25,5 +27,7 @@ private:
     PatternBudget m_patterns{PatternBudget::ofSource};
     std::map<std::string, unsigned> m_names; ///< line of each situation's name
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 #include <utility>
 #include <variant>
 
+namespace zrm::host {
+
 namespace {
 
 using Problems = std::vector<SituationProblem>;
@@ -228,3 +230,5 @@ std::vector<SituationProblem> SituationValidator::check(const SituationText& tex
     addThresholds(text, situation, problems);
     return problems;
 }
+
+} // namespace zrm::host

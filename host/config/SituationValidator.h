@@ -10,6 +10,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// A situation as somebody wrote it; none where a field was left out.
 struct SituationText {
     std::optional<std::string> name;
@@ -46,5 +48,7 @@ public:
                                                SituationConfig& situation,
                                                PatternBudget budget = PatternBudget());
 };
+
+} // namespace zrm::host
 
 #endif

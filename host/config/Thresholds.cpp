@@ -8,6 +8,8 @@
 #include <cstdint>
 #include <limits>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::int64_t largest = std::numeric_limits<std::int32_t>::max();
@@ -84,3 +86,5 @@ bool Thresholds::isFrequency(const Condition& condition) noexcept {
 bool Thresholds::isPeriod(const Condition& condition) noexcept {
     return condition.op == INTF_EQUAL && condition.number >= 1;
 }
+
+} // namespace zrm::host

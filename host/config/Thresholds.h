@@ -6,6 +6,8 @@
 #include <optional>
 #include <string_view>
 
+namespace zrm::host {
+
 /// The event-rate thresholds of a situation as operators write them. Stateless.
 class Thresholds {
 public:
@@ -20,5 +22,7 @@ public:
     static bool isFrequency(const Condition& condition) noexcept;
     static bool isPeriod(const Condition& condition) noexcept;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 namespace {
 
 /// Walks over a text, from one of its brackets, dots and line ends to the next.
@@ -102,3 +104,5 @@ private:
 std::optional<unsigned> TomlNesting::tooDeepAt(std::string_view text) {
     return Walker(text).tooDeepAt();
 }
+
+} // namespace zrm::host

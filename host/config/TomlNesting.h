@@ -4,6 +4,8 @@
 #include <optional>
 #include <string_view>
 
+namespace zrm::host {
+
 /// How deep a TOML text goes. The parser takes names of any number of parts, and what it makes of
 /// them is freed recursively, so a text is looked at before it is parsed. Stateless.
 class TomlNesting {
@@ -15,5 +17,7 @@ public:
     /// is not TOML may be misread, but only behind the place at which the parser refuses it.
     static std::optional<unsigned> tooDeepAt(std::string_view text);
 };
+
+} // namespace zrm::host
 
 #endif

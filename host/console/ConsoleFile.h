@@ -3,6 +3,8 @@
 
 #include <string_view>
 
+namespace zrm::host {
+
 /// A file of the console, as it is in the program. What it refers to lives as long as the process.
 struct ConsoleFile {
     std::string_view name; ///< below /console/, for example views/logs.js
@@ -11,5 +13,7 @@ struct ConsoleFile {
     /// The file of a name; null when the console has none.
     static const ConsoleFile* find(std::string_view name);
 };
+
+} // namespace zrm::host
 
 #endif

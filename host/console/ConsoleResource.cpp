@@ -8,6 +8,8 @@
 #include <string_view>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::pair<std::string_view, const char*> contentTypes[] = {
@@ -60,3 +62,5 @@ void ConsoleResource::addRoutes(Router& router) {
         },
         Router::PUBLIC);
 }
+
+} // namespace zrm::host

@@ -20,6 +20,8 @@ file(WRITE ${OUTPUT} "#include \"host/console/ConsoleFile.h\"
 
 #include <cstddef>
 
+namespace zrm::host {
+
 namespace {
 
 ${arrays}
@@ -40,4 +42,6 @@ const ConsoleFile* ConsoleFile::find(std::string_view name) {
     }
     return nullptr;
 }
+
+} // namespace zrm::host
 ")

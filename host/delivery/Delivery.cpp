@@ -10,6 +10,8 @@
 #include <utility>
 #include <variant>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Delivery.cpp"};
@@ -106,3 +108,5 @@ std::vector<SinkState> Delivery::sinkStates() const {
     }
     return states;
 }
+
+} // namespace zrm::host

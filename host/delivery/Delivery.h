@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// The way of events out of the process: the queue, the history, and one thread per sink. With a
 /// history the sinks get what it has committed, each from a place of its own; without one they
 /// get what is in the queue. start and finish are called by one thread at a time, the rest by any.
@@ -56,5 +58,7 @@ private:
     std::vector<std::unique_ptr<SinkThread>> m_sinks;
     bool m_finished = false;
 };
+
+} // namespace zrm::host
 
 #endif

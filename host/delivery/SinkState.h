@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// How the delivery to one sink stands.
 struct SinkState {
     enum class Condition {
@@ -30,5 +32,7 @@ struct SinkState {
                                                  : "starting";
     }
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <optional>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"SinkThread.cpp"};
@@ -171,3 +173,5 @@ SinkState SinkThread::state() const {
     state.lag = m_source->backlog();
     return state;
 }
+
+} // namespace zrm::host

@@ -18,6 +18,8 @@
 #include <string>
 #include <thread>
 
+namespace zrm::host {
+
 /// Carries events from their source to one sink, on a thread of its own. A delivery that fails is
 /// tried again after growing pauses, and nothing is passed over: while a sink is down its events
 /// stay where they are.
@@ -75,5 +77,7 @@ private:
     std::stop_source m_giveUp;
     std::thread m_thread;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -21,6 +21,8 @@
 #include <nlohmann/json.hpp>
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"ConfigCheck.cpp"};
@@ -225,3 +227,5 @@ std::string ConfigCheck::json(const Result& result) {
     const Json object{{"lines", lines}, {"accepted", result.accepted}, {"refused", result.refused}};
     return object.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

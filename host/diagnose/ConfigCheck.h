@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Judges the lines of a log configuration as the agent does when it starts on this machine, with
 /// the agent's own code, and monitors nothing. Works without an agent; the process's locale and
 /// working directory count as the agent's would. Stateless.
@@ -63,5 +65,7 @@ public:
     /// A result as the JSON object that the API answers.
     static std::string json(const Result& result);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::string_view blanks = "\t ";
@@ -55,3 +57,5 @@ std::string ConfiguredFormat::line() const {
 std::size_t ConfiguredFormat::original(std::size_t position) const {
     return m_original[std::min(position, m_original.size() - 1)];
 }
+
+} // namespace zrm::host

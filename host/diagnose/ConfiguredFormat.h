@@ -6,6 +6,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// A format specifier as the agent gets it when it stands in a line of the log configuration: the
 /// blanks in front are gone, a tab behind its first word is a blank, and "${@}" is the log's name.
 /// Remembers where each of its characters stood in the original.
@@ -46,5 +48,7 @@ private:
     std::string m_text;
     std::vector<std::size_t> m_original; ///< of each character, and of the end
 };
+
+} // namespace zrm::host
 
 #endif

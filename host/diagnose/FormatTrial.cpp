@@ -11,6 +11,8 @@
 #include <cmath>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"FormatTrial.cpp"};
@@ -261,3 +263,5 @@ double FormatTrial::percent(const Result& result) noexcept {
                       static_cast<double>(result.lines.size())) /
            10.0;
 }
+
+} // namespace zrm::host

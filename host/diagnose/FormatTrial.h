@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 class TrialLog;
 
 /// Tries a format specifier on lines: the agent's own parser learns and scans, so what it says is
@@ -96,5 +98,7 @@ private:
     std::unique_ptr<TrialLog> m_log;
     Result m_result;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -94,3 +96,5 @@ std::string FormatTrial::json(const Result& result) {
                       {"configuration_line", orNull(result.configurationLine)}};
     return object.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

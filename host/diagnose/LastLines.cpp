@@ -7,6 +7,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// The bytes from an offset on, as many as there are; none, with errno, on an error.
@@ -66,3 +68,5 @@ std::optional<std::vector<std::string>> LastLines::read(int descriptor, std::siz
     std::reverse(lines.begin(), lines.end());
     return lines;
 }
+
+} // namespace zrm::host

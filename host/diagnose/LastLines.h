@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// The end of a text file. Stateless.
 class LastLines {
 public:
@@ -17,5 +19,7 @@ public:
     static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count,
                                                         std::size_t mostBytes = defaultMostBytes);
 };
+
+} // namespace zrm::host
 
 #endif

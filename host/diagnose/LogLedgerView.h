@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Something about a log, monitored without an error, that wants an operator's attention.
 struct LogWarning {
     std::string kind;   ///< missing, replaced, without_time or not_records
@@ -55,5 +57,7 @@ struct LogLedgerView {
     std::vector<Rejected> rejected;
     std::vector<Skipped> skipped;
 };
+
+} // namespace zrm::host
 
 #endif

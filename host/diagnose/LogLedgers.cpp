@@ -13,6 +13,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"LogLedgers.cpp"};
@@ -164,3 +166,5 @@ std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
     // A line may hold any bytes.
     return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

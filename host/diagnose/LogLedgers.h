@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Reads the ledgers of the monitored logs. Stateless.
 class LogLedgers {
 public:
@@ -18,5 +20,7 @@ public:
     /// A ledger as a JSON object; `withSamples` adds "rejected" and "skipped".
     static std::string json(const LogLedgerView& ledger, bool withSamples);
 };
+
+} // namespace zrm::host
 
 #endif

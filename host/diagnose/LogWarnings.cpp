@@ -22,6 +22,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"LogWarnings.cpp"};
@@ -176,3 +178,5 @@ nlohmann::ordered_json LogWarnings::json(const LogWarning& warning) {
     return {
         {"kind", warning.kind}, {"since", UtcTime::text(warning.since)}, {"text", warning.text}};
 }
+
+} // namespace zrm::host

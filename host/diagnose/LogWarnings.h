@@ -9,6 +9,8 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 /// What an operator should know about a log that is monitored without an error. Stateless; any
 /// thread.
 class LogWarnings {
@@ -29,5 +31,7 @@ public:
     /// A warning as a JSON object.
     static nlohmann::ordered_json json(const LogWarning& warning);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -12,6 +12,8 @@
 #include <thread>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"LogWatch.cpp"};
@@ -133,3 +135,5 @@ std::map<std::string, std::vector<LogWarning>> LogWatch::all() const {
     const std::lock_guard guard(m_shared->mutex);
     return m_shared->warnings;
 }
+
+} // namespace zrm::host

@@ -10,6 +10,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Looks at all monitored logs every few seconds and keeps the warnings about each, so that asking
 /// for them never waits for a file system. The looking is done on a thread of its own, which knows
 /// nothing of the agent's objects: one that a file system holds up for ever is left behind.
@@ -45,5 +47,7 @@ private:
     bool m_hasThread = false;
     Clock::time_point m_next{};
 };
+
+} // namespace zrm::host
 
 #endif

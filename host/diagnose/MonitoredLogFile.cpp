@@ -8,6 +8,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 std::string problemOf(int descriptor, const std::optional<FileIdentity>& monitored) {
@@ -43,3 +45,5 @@ MonitoredLogFile::~MonitoredLogFile() {
         ::close(m_descriptor);
     }
 }
+
+} // namespace zrm::host

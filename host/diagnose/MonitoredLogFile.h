@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// The file of a monitored log, opened to look at. What has the log's name at present may be
 /// another file: its successor after a rotation, or whatever somebody has made a link to. Only the
 /// file that the monitor has open is opened; while it has none, the file of this name, unless the
@@ -28,5 +30,7 @@ private:
     int m_descriptor;
     std::string m_problem;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 #include <string>
 #include <utility>
 
+namespace zrm::host {
+
 /// A user log that nobody monitors: lines become rows as those of a monitored one do. One thread.
 class TrialLog : public UserLogFile {
 public:
@@ -26,5 +28,7 @@ private:
     /// A configuration line that names no log.
     static std::unique_ptr<ValidLog> noLine();
 };
+
+} // namespace zrm::host
 
 #endif

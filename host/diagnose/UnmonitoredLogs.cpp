@@ -18,6 +18,8 @@
 #include <nlohmann/json.hpp>
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"UnmonitoredLogs.cpp"};
@@ -153,3 +155,5 @@ std::string UnmonitoredLogs::configurationJson(const Result& result) {
     }
     return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Finds the logs that the log configuration names and the agent does not monitor. The agent
 /// passes over a line that it cannot use, and its tables have no row for it; who runs the agent
 /// wants to see it all the same. Stateless.
@@ -41,5 +43,7 @@ public:
     /// The file and its problem, as the API answers them; null where nothing is set.
     static std::string configurationJson(const Result& result);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <memory>
 
+namespace zrm::host {
+
 /// One event in the queue.
 struct Event {
     std::uint64_t id = 0;    ///< counted from 1 in the order of arrival
@@ -13,5 +15,7 @@ struct Event {
     std::shared_ptr<const SituationLabel> situation;
     const char* row = nullptr; ///< the row's bytes, owned by the queue
 };
+
+} // namespace zrm::host
 
 #endif

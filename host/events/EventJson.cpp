@@ -7,6 +7,8 @@
 #include <charconv>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 void appendNumber(std::string& text, std::uint64_t number) {
@@ -36,3 +38,5 @@ void EventJson::append(std::string& text, const Event& event) const {
 void EventJson::appendLog(std::string& text, const Event& event) const {
     LogPath::append(text, m_layout, event.row);
 }
+
+} // namespace zrm::host

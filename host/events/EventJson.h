@@ -6,6 +6,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}. Immutable, so
 /// any thread.
 class EventJson {
@@ -22,5 +24,7 @@ public:
 private:
     RowLayout m_layout;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 /// How long a reader that was woken lets more events gather, unless many have come before.
@@ -165,3 +167,5 @@ void EventQueue::close() {
     }
     m_changed.notify_all();
 }
+
+} // namespace zrm::host

@@ -18,6 +18,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// The bounded way of events from the log threads to the sinks: one ring of rows with a cursor per
 /// reader, so that every reader gets every event in order and the memory does not grow with their
 /// number. A push never waits: log threads ask whether there is room before they offer a row, and
@@ -99,5 +101,7 @@ private:
     bool m_isFull = false; ///< what the listener was told last
     bool m_closed = false;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string_view>
 
+namespace zrm::host {
+
 /// One event in the form in which it leaves the process. The texts belong to whoever gave the
 /// record, and stay as they are for as long as that says.
 struct EventRecord {
@@ -15,5 +17,7 @@ struct EventRecord {
     std::string_view json;      ///< the event as one JSON object, on one line, without a newline
     std::string_view text = {}; ///< the situation's description for people; may be empty
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <cstdint>
 #include <span>
 
+namespace zrm::host {
+
 /// Where one sink's events come from, in order and with a place that is the sink's own. read and
 /// release are called by the sink's thread, the others by any.
 class EventSource {
@@ -26,5 +28,7 @@ public:
     /// Nobody adds events any more: a read gives what is left, and does not wait.
     virtual void end() = 0;
 };
+
+} // namespace zrm::host
 
 #endif

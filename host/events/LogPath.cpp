@@ -4,6 +4,8 @@
 
 #include <string_view>
 
+namespace zrm::host {
+
 namespace {
 
 void appendColumn(std::string& text, const RowLayout& layout, const char* row,
@@ -31,3 +33,5 @@ std::string LogPath::of(const RowLayout& layout, const char* row) {
     append(text, layout, row);
     return text;
 }
+
+} // namespace zrm::host

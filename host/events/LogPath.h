@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// The whole path of the log of a row, of either table. Any thread.
 class LogPath {
 public:
@@ -15,5 +17,7 @@ public:
     /// The same as a text of its own.
     static std::string of(const RowLayout& layout, const char* row);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 QueueSource::QueueSource(EventQueue& queue, EventJson format)
     : m_queue(queue), m_reader(queue.addReader()), m_format(std::move(format)) {}
 
@@ -25,3 +27,5 @@ std::span<const EventRecord> QueueSource::read(std::size_t most) {
     }
     return m_records;
 }
+
+} // namespace zrm::host

@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Events straight from the queue, for a sink without a history: what the sink has not taken stays
 /// in the queue.
 class QueueSource : public EventSource {
@@ -28,5 +30,7 @@ private:
     std::vector<std::string> m_logs;  ///< of one read: the logs
     std::vector<EventRecord> m_records;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 #include <cstdint>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::uint64_t each = 0x0101010101010101;
@@ -129,3 +131,5 @@ void RowJson::append(std::string& out, const RowLayout& layout, const char* row)
     }
     out += layout.columns().empty() ? "{}" : "}";
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Writes rows as JSON, at the speed of events. Any thread.
 class RowJson {
 public:
@@ -16,5 +18,7 @@ public:
     /// Appends a text as a JSON string; bytes that are not UTF-8 become U+FFFD.
     static void appendText(std::string& out, std::string_view text);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
 
+namespace zrm::host {
+
 namespace {
 
 /// No character of one byte takes more bytes in UTF-8, and no longer one takes more for each.
@@ -31,3 +33,5 @@ std::string_view RowText::of(const RowColumn& column, const char* row, std::stri
     }
     return {room.data(), converted.written};
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Character columns as people and other systems read them. Any thread.
 class RowText {
 public:
@@ -15,5 +17,7 @@ public:
     /// replaced by U+FFFD.
     static std::string_view of(const RowColumn& column, const char* row, std::string& room);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// What a situation writes on its events. Immutable; shared by the situation and by its events that
 /// are still on their way.
 struct SituationLabel {
@@ -10,5 +12,7 @@ struct SituationLabel {
     std::string severity;  ///< info, minor, warning, major or critical
     std::string text = {}; ///< its description for people; may be empty
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <bit>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t wordSize = sizeof(std::uint64_t);
@@ -214,3 +216,5 @@ void Audience::learnLogColumns() {
         }
     }
 }
+
+} // namespace zrm::host

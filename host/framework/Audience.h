@@ -12,8 +12,11 @@
 #include <unordered_map>
 #include <vector>
 
-class CompiledCondition;
 class ctreq;
+
+namespace zrm::host {
+
+class CompiledCondition;
 
 /// Finds the open situations that a fresh row may concern, at a small part of what it costs to
 /// offer it to each. Two things are used. The columns that name a log are the same in all rows of
@@ -105,5 +108,7 @@ private:
     std::uint64_t m_row = 0; ///< rows seen
     std::atomic<std::uint64_t> m_offered{0};
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 
 #include <pthread.h>
 
+namespace zrm::host {
+
 /// While it lives, the calling thread is not cancelled. Operations that must not be unwound, since
 /// they are declared not to throw, put one around the system calls that are cancellation points.
 /// Neither locks nor allocates.
@@ -19,5 +21,7 @@ public:
 private:
     int m_before = PTHREAD_CANCEL_ENABLE;
 };
+
+} // namespace zrm::host
 
 #endif

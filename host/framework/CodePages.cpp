@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <iterator>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr bool singleByteSet = true;
@@ -123,3 +125,5 @@ const LOC2_Locale* CodePages::byNumber(std::uint32_t codePage) noexcept {
                      [codePage](const LOC2_Locale& known) { return known.codePage == codePage; });
     return found != std::end(codeSets) ? found : nullptr;
 }
+
+} // namespace zrm::host

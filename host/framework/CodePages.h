@@ -16,6 +16,8 @@ struct LOC2_Locale {
     bool singleByte;          ///< every character is one byte
 };
 
+namespace zrm::host {
+
 /// The code sets and their code page numbers.
 namespace CodePages {
 
@@ -32,5 +34,7 @@ inline bool isKnown(std::uint32_t codePage) noexcept {
 }
 
 } // namespace CodePages
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <string.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// Most columns are mostly padding, so eight blanks are taken at a time.
@@ -75,3 +77,5 @@ int ColumnText::compare(const char* field, std::size_t width, std::string_view v
     }
     return compareWithBlanks(text.substr(common)) - compareWithBlanks(value.substr(common));
 }
+
+} // namespace zrm::host

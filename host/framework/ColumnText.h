@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string_view>
 
+namespace zrm::host {
+
 /// The text of a fixed-width character field: what stands before its first NUL, or before the
 /// field's end, without trailing blanks. The one rule by which the host reads, compares and shows
 /// character columns. Any thread.
@@ -23,5 +25,7 @@ bool isPadding(const char* rest, std::size_t width) noexcept;
 int compare(const char* field, std::size_t width, std::string_view value) noexcept;
 
 } // namespace ColumnText
+
+} // namespace zrm::host
 
 #endif

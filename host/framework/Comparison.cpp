@@ -2,6 +2,8 @@
 
 #include <charconv>
 
+namespace zrm::host {
+
 bool Comparison::isRelational(_IntfOper op) noexcept {
     return op >= INTF_EQUAL && op <= INTF_GREATER;
 }
@@ -33,3 +35,5 @@ std::optional<std::int64_t> Comparison::number(std::string_view text) noexcept {
     }
     return value;
 }
+
+} // namespace zrm::host

@@ -7,6 +7,8 @@
 #include <optional>
 #include <string_view>
 
+namespace zrm::host {
+
 /// The meaning of the operators. Any thread; neither locks nor allocates.
 namespace Comparison {
 
@@ -26,5 +28,7 @@ inline int order(std::int64_t left, std::int64_t right) noexcept {
 }
 
 } // namespace Comparison
+
+} // namespace zrm::host
 
 #endif

@@ -15,6 +15,8 @@
 #include <re2/re2.h>
 #include <string.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"CompiledCondition.cpp"};
@@ -257,3 +259,5 @@ bool CompiledCondition::matches(const char* field) const {
     return m_pattern->Match(re2::StringPiece(text.data(), text.size()), 0, text.size(),
                             re2::RE2::UNANCHORED, nullptr, 0);
 }
+
+} // namespace zrm::host

@@ -10,10 +10,13 @@
 #include <string_view>
 #include <vector>
 
-class ctreq;
 namespace re2 {
 class RE2;
 }
+
+class ctreq;
+
+namespace zrm::host {
 
 /// One condition made ready for evaluation: the column found, numbers read, the pattern compiled.
 /// A column compares without its padding; a value longer than the column is cut to the column's
@@ -90,5 +93,7 @@ private:
     std::unique_ptr<re2::RE2> m_pattern;    ///< of MATCHES
     const SEL1_FILTERINFO* m_filter;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// The host's own operators, beside those of _IntfOper.
 inline constexpr _IntfOper INTF_CONTAINS = static_cast<_IntfOper>(101);
 inline constexpr _IntfOper INTF_STARTS = static_cast<_IntfOper>(102);
@@ -32,5 +34,7 @@ struct Condition {
 inline bool isThresholdColumn(std::string_view column) noexcept {
     return column == "FREQTHRESH" || column == "PERIODTHRS";
 }
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 ConditionSet::ConditionSet(const FilterList& filters, ctreq& request) : m_request(request) {
     const RowLayout layout(request);
     m_conditions.reserve(filters.all().size());
@@ -27,3 +29,5 @@ bool ConditionSet::holds(char* row) const {
                            return condition.holds(&m_request, row);
                        });
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <vector>
 
+namespace zrm::host {
+
 class FilterList;
 
 /// The conditions of one request on its rows, ready for evaluation, in the order in which a row is
@@ -25,5 +27,7 @@ private:
     ctreq& m_request;
     std::vector<CompiledCondition> m_conditions;
 };
+
+} // namespace zrm::host
 
 #endif

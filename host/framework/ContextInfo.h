@@ -1,8 +1,11 @@
 #ifndef ZRM_HOST_CONTEXT_INFO_H
 #define ZRM_HOST_CONTEXT_INFO_H
 
-class RequestCounts;
 class ctreq;
+
+namespace zrm::host {
+
+class RequestCounts;
 
 /// Receives what a request dispatches. For a situation this is called on a log's thread under the
 /// table manager's lock and may wait while the event queue is full; for a report on the thread
@@ -17,18 +20,21 @@ public:
     virtual void stopped(const ctreq& request, unsigned reason) = 0;
 };
 
+} // namespace zrm::host
+
 /// The surroundings of a request: where its rows go and where it counts. Outlives the request.
 class ContextInfo {
 public:
     /// Without counts of its opener's, which outlive it, the request keeps its own.
-    explicit ContextInfo(RowReceiver& receiver, RequestCounts* counts = nullptr)
+    explicit ContextInfo(zrm::host::RowReceiver& receiver,
+                         zrm::host::RequestCounts* counts = nullptr)
         : m_receiver(receiver), m_counts(counts) {}
-    RowReceiver& receiver() const noexcept { return m_receiver; }
-    RequestCounts* counts() const noexcept { return m_counts; }
+    zrm::host::RowReceiver& receiver() const noexcept { return m_receiver; }
+    zrm::host::RequestCounts* counts() const noexcept { return m_counts; }
 
 private:
-    RowReceiver& m_receiver;
-    RequestCounts* m_counts;
+    zrm::host::RowReceiver& m_receiver;
+    zrm::host::RequestCounts* m_counts;
 };
 
 #endif

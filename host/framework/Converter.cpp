@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <cerrno>
 
+namespace zrm::host {
+
 namespace {
 
 std::string_view substituteOf(const LOC2_Locale& codeSet) noexcept {
@@ -166,3 +168,5 @@ Converted Converter::convert(const LOC2_Locale& to, char* target, std::size_t ta
     }
     return {out.written(), complete};
 }
+
+} // namespace zrm::host

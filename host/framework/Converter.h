@@ -6,6 +6,8 @@
 #include <cstddef>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Outcome of a conversion.
 struct Converted {
     std::size_t written;   ///< bytes
@@ -23,5 +25,7 @@ public:
     static Converted convert(const LOC2_Locale& to, char* target, std::size_t targetSize,
                              const LOC2_Locale& from, std::string_view source) noexcept;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <condition_variable>
 #include <mutex>
 
+using namespace zrm::host;
+
 namespace {
 
 using Clock = std::chrono::steady_clock;

@@ -4,6 +4,8 @@
 #include <chrono>
 #include <cstdint>
 
+namespace zrm::host {
+
 /// The host's side of EventRoom: who decides whether there is room. Any thread.
 namespace EventRoomControl {
 
@@ -28,5 +30,7 @@ Waits waits();
 std::uint64_t passedOver() noexcept;
 
 } // namespace EventRoomControl
+
+} // namespace zrm::host
 
 #endif

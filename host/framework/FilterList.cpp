@@ -4,6 +4,8 @@
 #include <cstring>
 #include <limits>
 
+namespace zrm::host {
+
 namespace {
 
 /// The agent takes a time stamp as 16 bytes, whatever the length of the value.
@@ -56,3 +58,5 @@ FilterList::FilterList(const std::vector<Condition>& conditions) {
 SEL1_FILTERINFO* FilterList::next() noexcept {
     return m_position < m_filters.size() ? &m_filters[m_position++] : nullptr;
 }
+
+} // namespace zrm::host

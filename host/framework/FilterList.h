@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Data type of text filter values.
 inline constexpr std::int16_t SEL1_CHARACTER = 452;
 
@@ -33,5 +35,7 @@ private:
     std::vector<SEL1_FILTERINFO> m_filters;
     std::size_t m_position = 0;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <mutex>
 #include <new>
 
+namespace zrm::host {
+
 namespace {
 
 // A slot's state: generation in the upper 16 bits, the closed flag, the number of pins. One 32-bit
@@ -152,3 +154,5 @@ void HandleTable::close(unsigned handle) noexcept {
     const std::lock_guard guard(g_mutex);
     pushFree(handle & 0xffff);
 }
+
+} // namespace zrm::host

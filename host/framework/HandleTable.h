@@ -3,6 +3,8 @@
 
 class ctreq;
 
+namespace zrm::host {
+
 /// The handles of the open requests and their pins. A handle is an index with a generation, so a
 /// handle that outlived its request finds nothing: it is given out again only after 65535 other
 /// uses of its index, and freed indexes are taken oldest first. Any thread; pinning and unpinning
@@ -23,5 +25,7 @@ void unpin(unsigned handle) noexcept;
 void close(unsigned handle) noexcept;
 
 } // namespace HandleTable
+
+} // namespace zrm::host
 
 #endif

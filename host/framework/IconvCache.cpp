@@ -2,6 +2,8 @@
 
 #include "host/framework/CancellationOff.h"
 
+namespace zrm::host {
+
 namespace {
 
 // A process converts between UTF-8 and its own code set, one way and the other.
@@ -61,3 +63,5 @@ iconv_t IconvCache::find(const LOC2_Locale& to, const LOC2_Locale& from) noexcep
     }
     return converter;
 }
+
+} // namespace zrm::host

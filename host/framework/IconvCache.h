@@ -5,6 +5,8 @@
 
 #include <iconv.h>
 
+namespace zrm::host {
+
 /// The calling thread's open converters. They close when the thread ends; a conversion that a
 /// thread makes later still, while the process exits, opens its converter afresh.
 namespace IconvCache {
@@ -18,5 +20,7 @@ inline iconv_t none() noexcept {
 iconv_t find(const LOC2_Locale& to, const LOC2_Locale& from) noexcept;
 
 } // namespace IconvCache
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 constexpr int maxHostName = 255;

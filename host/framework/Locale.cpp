@@ -10,6 +10,8 @@
 
 #include <langinfo.h>
 
+using namespace zrm::host;
+
 namespace {
 
 void report(std::uint32_t* status, std::uint32_t value) noexcept {

@@ -3,6 +3,8 @@
 
 #include "framework/locks.h"
 
+namespace zrm::host {
+
 /// Holds a lock of the framework for a scope.
 class LockGuard {
 public:
@@ -14,5 +16,7 @@ public:
 private:
     SYS1_Lock* m_lock;
 };
+
+} // namespace zrm::host
 
 #endif

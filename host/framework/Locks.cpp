@@ -6,6 +6,8 @@
 
 #include <cstdlib>
 
+using namespace zrm;
+
 namespace {
 
 TRC1_Anchor anchor{"Locks.cpp"};

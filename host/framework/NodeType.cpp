@@ -3,6 +3,8 @@
 #include <cstdio>
 #include <cstdlib>
 
+namespace zrm::host {
+
 namespace {
 
 char g_nodeType[32] = "";
@@ -20,3 +22,5 @@ const char* NodeType::get() noexcept {
     const char* const configured = std::getenv("CTREQ_NODETYPE");
     return configured != nullptr && *configured != '\0' ? configured : "ZRM";
 }
+
+} // namespace zrm::host

@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_NODE_TYPE_H
 #define ZRM_HOST_NODE_TYPE_H
 
+namespace zrm::host {
+
 /// The node type of the managed system: the part of its name behind the colon. Set on the initial
 /// thread before any other thread exists, read-only afterwards.
 namespace NodeType {
@@ -13,5 +15,7 @@ void set(const char* nodeType) noexcept;
 const char* get() noexcept;
 
 } // namespace NodeType
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <mutex>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 // Constant-initialised and without destructors: logs may be destroyed while the process exits.

@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// The pulses of the agent's threads, as the host sees them. Any thread; holds its lock for
 /// moments.
 class PulseRegistry {
@@ -26,5 +28,7 @@ public:
     /// Waits until every thread rests, at most until the limit; false when the time is up.
     static bool waitUntilAllRest(Clock::time_point limit);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 Request::Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver,
                  RequestCounts* counts)
     : m_manager(manager), m_detail(std::move(detail)), m_context(receiver, counts),
@@ -35,3 +37,5 @@ Request::~Request() {
     // Waits for the pins while the object is still whole.
     HandleTable::close(m_request->handle());
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 class TableManager;
 class ctreq;
 
+namespace zrm::host {
+
 /// One open request on a table, from its creation to its destruction. A situation receives rows
 /// from construction on; a report is sampled through get()->TakeSample(). Opened, used and closed
 /// by one thread at a time; many requests may be opened and closed at once.
@@ -43,5 +45,7 @@ private:
     ContextInfo m_context;
     std::unique_ptr<ctreq> m_request;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <atomic>
 #include <cstdint>
 
+namespace zrm::host {
+
 /// What a request has judged so far. One thread counts at a time, the one that the request is used
 /// by; any thread reads.
 class RequestCounts {
@@ -55,5 +57,7 @@ private:
     std::atomic<std::uint64_t> m_judged{0};
     std::atomic<std::uint64_t> m_matched{0};
 };
+
+} // namespace zrm::host
 
 #endif

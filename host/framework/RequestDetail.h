@@ -13,8 +13,8 @@ class RequestDetail {
 public:
     std::string name; ///< the situation's name, or the report's label
     SampleType sampleType = SAMPLE_SITUATION;
-    unsigned interval = 0;             ///< sampling interval, seconds; 0: event-driven
-    std::vector<Condition> conditions; ///< all must hold
+    unsigned interval = 0;                        ///< sampling interval, seconds; 0: event-driven
+    std::vector<zrm::host::Condition> conditions; ///< all must hold
 };
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <utility>
 
+using namespace zrm::host;
+
 namespace {
 
 thread_local RequestLimit* latest = nullptr;

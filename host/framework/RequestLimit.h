@@ -4,6 +4,8 @@
 #include <chrono>
 #include <functional>
 
+namespace zrm::host {
+
 /// While it lives, what the constructing thread has the agent read ends early when the time is over
 /// or the work is no longer wanted (CTX1_IsCancelled). Of several on a thread the latest counts.
 class RequestLimit {
@@ -30,5 +32,7 @@ private:
     bool m_isReached = false;
     RequestLimit* const m_outer; ///< counts again when this one ends
 };
+
+} // namespace zrm::host
 
 #endif

@@ -14,8 +14,8 @@
 
 /// What the host keeps with a request. Used by the thread that uses the request.
 class ctreq::Framework {
-    std::optional<ConditionSet> m_conditions;
-    RequestCounts m_ownCounts;
+    std::optional<zrm::host::ConditionSet> m_conditions;
+    zrm::host::RequestCounts m_ownCounts;
 
 public:
     /// Both outlive the object, and so do the context's counts where it has any.
@@ -25,16 +25,16 @@ public:
 
     /// The conditions of the request, ready for evaluation. The table's columns must be known by
     /// now: they are asked for at the first call.
-    const ConditionSet& conditionsOf(ctreq& request) {
+    const zrm::host::ConditionSet& conditionsOf(ctreq& request) {
         if (!m_conditions) {
             m_conditions.emplace(filters, request);
         }
         return *m_conditions;
     }
 
-    FilterList filters;
-    RowReceiver& receiver;
-    RequestCounts& counts;
+    zrm::host::FilterList filters;
+    zrm::host::RowReceiver& receiver;
+    zrm::host::RequestCounts& counts;
     std::atomic<bool> stopped{false};
     std::size_t capacity = 0; ///< rows that fit into the memory of the data array
 };

@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 /// The tables give internal names, which are the public ones in lower case.
@@ -47,3 +49,5 @@ const RowColumn* RowLayout::find(std::string_view name) const noexcept {
                      [name](const RowColumn& column) { return column.name == name; });
     return found != m_columns.end() ? &*found : nullptr;
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 
 class ctreq;
 
+namespace zrm::host {
+
 /// One column of a table's rows.
 struct RowColumn {
     std::string name; ///< upper-case, as conditions and outputs name it
@@ -38,5 +40,7 @@ public:
 private:
     std::vector<RowColumn> m_columns;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <algorithm>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 /// Keeps the rows that a report dispatches.
@@ -55,3 +57,5 @@ std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition
     return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows(),
                   sampled.framework().counts.judged());
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// The rows of one sample of a table, in the order in which the table gave them.
 class Sample {
 public:
@@ -35,5 +37,7 @@ private:
     std::vector<char> m_rows;
     std::uint64_t m_offered;
 };
+
+} // namespace zrm::host
 
 #endif

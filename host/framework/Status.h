@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_STATUS_H
 #define ZRM_HOST_STATUS_H
 
+namespace zrm::host {
+
 /// The host's own status codes, beside those that the tables return. 0 is success everywhere.
 enum Status : unsigned {
     STATUS_OK = 0,
@@ -12,5 +14,7 @@ enum Status : unsigned {
     STATUS_NO_CONVERSION = 0x21070006,    ///< no way from the one code page to the other
     STATUS_DUPLICATE = 0x21070007,        ///< the name is taken
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include "host/framework/Status.h"
 #include "host/framework/Tables.h"
 
+using namespace zrm::host;
+
 class TableManager::Framework {
 public:
     explicit Framework(LinkedList& requests) : audience(requests) {}

@@ -5,6 +5,8 @@
 
 #include <atomic>
 
+namespace zrm::host {
+
 namespace {
 
 // Far more than the agent has. Constant-initialised and without a destructor, since requests may
@@ -53,3 +55,5 @@ void Tables::clear() noexcept {
         table.store(nullptr);
     }
 }
+
+} // namespace zrm::host

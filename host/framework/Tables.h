@@ -5,6 +5,8 @@
 
 class TableManager;
 
+namespace zrm::host {
+
 /// The tables that the agent has registered. Any thread; neither locks nor allocates.
 namespace Tables {
 
@@ -21,5 +23,7 @@ TableManager* find(std::string_view table) noexcept;
 void clear() noexcept;
 
 } // namespace Tables
+
+} // namespace zrm::host
 
 #endif

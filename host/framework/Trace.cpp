@@ -12,6 +12,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 std::atomic<unsigned> TRC1_Generation{1};
 
 unsigned TRC1_Sync(TRC1_Anchor& anchor) noexcept {

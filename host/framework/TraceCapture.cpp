@@ -7,6 +7,8 @@
 #include <new>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 thread_local TraceCapture* t_current = nullptr;
@@ -65,3 +67,5 @@ TraceSilence::~TraceSilence() {
 bool TraceSilence::isOn() noexcept {
     return t_silences != 0;
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <cstdarg>
 #include <string>
 
+namespace zrm::host {
+
 /// While it lives, the errors that the constructing thread traces are kept here and not written,
 /// whatever the trace levels are; other threads trace as always. For what is only tried: the agent
 /// says why it refuses something, and the operator's trace stays free of it. Of several on
@@ -45,5 +47,7 @@ public:
     /// Whether the calling thread has one. For the trace facility.
     static bool isOn() noexcept;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 
 #include <time.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::int64_t quarterHour = 15 * 60;
@@ -59,3 +61,5 @@ TraceClock::Time TraceClock::local(const std::timespec& moment) noexcept {
             static_cast<int>(time.seconds().count()),
             moment.tv_nsec / 1000};
 }
+
+} // namespace zrm::host

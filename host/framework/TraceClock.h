@@ -3,6 +3,8 @@
 
 #include <ctime>
 
+namespace zrm::host {
+
 /// Local time of trace records, without the C library's time-zone lock where that could be held by
 /// a thread that a forked child does not have. The offset from UTC is remembered and learnt afresh
 /// each quarter of an hour, since zones change at no other moments; a forked child uses what its
@@ -23,5 +25,7 @@ struct Time {
 Time local(const std::timespec& moment) noexcept;
 
 } // namespace TraceClock
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <mutex>
 #include <thread>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr const char* defaultLevels = "error";
@@ -93,3 +95,5 @@ unsigned TraceControl::levelOf(const char* unit) noexcept {
     const Setting* const setting = reader.setting();
     return setting != nullptr ? setting->levels.levelOf(unit) : static_cast<unsigned>(TRC1_ERROR);
 }
+
+} // namespace zrm::host

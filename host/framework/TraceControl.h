@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// What the host sets of the trace facility. Any thread, at any time.
 namespace TraceControl {
 
@@ -23,5 +25,7 @@ std::string openFile(const std::string& path);
 unsigned levelOf(const char* unit) noexcept;
 
 } // namespace TraceControl
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <iterator>
 #include <optional>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr unsigned all = TRC1_ERROR | TRC1_FLOW | TRC1_DETAIL | TRC1_FINE;
@@ -139,3 +141,5 @@ unsigned TraceLevels::levelOf(std::string_view unit) const noexcept {
     }
     return level;
 }
+
+} // namespace zrm::host

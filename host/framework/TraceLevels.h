@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Which classes of records are written, as text tells it: words separated by commas, each one
 /// `class` for every unit or `unit=class`, where the unit is a source file with its ending, or the
 /// name of a C++ class, which stands for all source files whose names begin with it: those of
@@ -35,5 +37,7 @@ private:
     unsigned m_general = TRC1_ERROR;
     std::vector<Unit> m_units;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -13,6 +13,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// A file that was opened. Never destroyed, since a thread may be writing to it; the chain keeps
@@ -94,3 +96,5 @@ void TraceOutput::write(std::string_view record, std::time_t now) noexcept {
         PatientWrite::toStandardError(record);
     }
 }
+
+} // namespace zrm::host

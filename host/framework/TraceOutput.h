@@ -4,6 +4,8 @@
 #include <ctime>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Where trace records go: standard error until a file was opened. Any thread.
 namespace TraceOutput {
 
@@ -17,5 +19,7 @@ int open(const char* path);
 void write(std::string_view record, std::time_t now) noexcept;
 
 } // namespace TraceOutput
+
+} // namespace zrm::host
 
 #endif

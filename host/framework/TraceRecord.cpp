@@ -7,6 +7,8 @@
 #include <cstdio>
 #include <cstring>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t longestEscape = 6;
@@ -75,3 +77,5 @@ std::string_view TraceRecord::escaped() noexcept {
     m_escaped[size++] = '\n';
     return {m_escaped, size};
 }
+
+} // namespace zrm::host

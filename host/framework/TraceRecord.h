@@ -6,6 +6,8 @@
 #include <ctime>
 #include <string_view>
 
+namespace zrm::host {
+
 /// One trace record: local time with microseconds, thread, unit and line, text, and one newline at
 /// its end. Characters that steer a terminal are escaped, line ends and tabs excepted, which the
 /// agent's own texts have. What does not fit is cut. Lives on the stack of one thread; neither
@@ -31,5 +33,7 @@ private:
     char m_text[maxSize];
     char m_escaped[maxSize]; ///< used where something is to be escaped
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <cstring>
 
+using namespace zrm::host;
+
 void AGF_CopyUnpad(char* destination, const char* source, int length) {
     const std::size_t width = length > 0 ? static_cast<std::size_t>(length) : 0;
     const std::string_view text = ColumnText::unpadded(source, width);

@@ -12,6 +12,9 @@
 #include <cstring>
 #include <new>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 TRC1_Anchor anchor{"ctreq.cpp"};

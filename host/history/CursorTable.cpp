@@ -1,5 +1,7 @@
 #include "host/history/CursorTable.h"
 
+namespace zrm::host {
+
 CursorTable::CursorTable(Database& database)
     : m_find(database, "SELECT event FROM cursors WHERE sink = ?"),
       m_keep(database, "INSERT INTO cursors (sink, event, used) VALUES (?, ?, ?)"
@@ -23,3 +25,5 @@ void CursorTable::keep(std::string_view sink, std::uint64_t event, std::int64_t 
 void CursorTable::removeUnusedSince(std::int64_t time) {
     m_remove.bind(1, time).run();
 }
+
+} // namespace zrm::host

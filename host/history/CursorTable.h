@@ -7,6 +7,8 @@
 #include <optional>
 #include <string_view>
 
+namespace zrm::host {
+
 /// How far each sink has got, as the history keeps it. Used by one thread at a time. Throws
 /// DatabaseError.
 class CursorTable {
@@ -28,5 +30,7 @@ private:
     Statement m_keep;
     Statement m_remove;
 };
+
+} // namespace zrm::host
 
 #endif

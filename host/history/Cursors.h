@@ -10,6 +10,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// How far one sink has got; moved by its thread, looked at by any.
 using Cursor = std::atomic<std::uint64_t>;
 
@@ -62,5 +64,7 @@ private:
     };
     std::deque<Entry> m_entries;
 };
+
+} // namespace zrm::host
 
 #endif

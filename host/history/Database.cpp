@@ -5,6 +5,8 @@
 
 #include <sqlite3.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// For other programs that have the file open; the agent's own connections never keep each other
@@ -80,3 +82,5 @@ void Transaction::commit() {
     m_database.run("COMMIT");
     m_open = false;
 }
+
+} // namespace zrm::host

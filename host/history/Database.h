@@ -7,6 +7,8 @@
 
 struct sqlite3;
 
+namespace zrm::host {
+
 /// A call of the database that failed; what() is its text with that of the system's error.
 class DatabaseError : public std::runtime_error {
 public:
@@ -60,5 +62,7 @@ private:
     Database& m_database;
     bool m_open = true;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"EntryRecorder.cpp"};
@@ -61,3 +63,5 @@ void EntryRecorder::record() {
     m_counts = std::move(counts);
     m_history.addEntries(std::move(minute));
 }
+
+} // namespace zrm::host

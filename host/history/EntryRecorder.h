@@ -8,6 +8,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// Gives the history, once a minute, the entries that the minute brought, log by log: what the
 /// Monitored Logs table counts, less what it counted before. One thread.
 class EntryRecorder {
@@ -29,5 +31,7 @@ private:
     std::optional<std::int64_t> m_minute;         ///< the current one, since 1970
     std::map<std::string, std::int32_t> m_counts; ///< per log, as last sampled
 };
+
+} // namespace zrm::host
 
 #endif

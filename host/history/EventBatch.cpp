@@ -1,5 +1,7 @@
 #include "host/history/EventBatch.h"
 
+namespace zrm::host {
+
 EventBatch::Piece EventBatch::sameOr(std::string_view text, Piece Places::*which) {
     if (!m_places.empty() && at(m_places.back().*which) == text) {
         return m_places.back().*which;
@@ -53,3 +55,5 @@ void EventBatch::seal() {
     }
     m_places = {};
 }
+
+} // namespace zrm::host

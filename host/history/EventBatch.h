@@ -11,6 +11,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Events in a row, with their texts in one piece of memory. Filled by one thread; sealed, it no
 /// longer changes and any thread reads it.
 class EventBatch {
@@ -71,5 +73,7 @@ private:
     std::vector<Places> m_places;
     std::vector<EventRecord> m_records;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <xxhash.h>
 
+namespace zrm::host {
+
 std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t label,
                            std::string_view json) noexcept {
     // Odd multipliers: no two values of one number give the same seed, on whatever machine.
@@ -10,3 +12,5 @@ std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t la
                                static_cast<std::uint64_t>(label) * 0x165667b19e3779f9;
     return static_cast<std::int64_t>(XXH3_64bits_withSeed(json.data(), json.size(), seed));
 }
+
+} // namespace zrm::host

@@ -4,9 +4,13 @@
 #include <cstdint>
 #include <string_view>
 
+namespace zrm::host {
+
 /// The checksum stored beside an event: a reader recomputes it, so that what a disk has altered is
 /// noticed and not served. It covers the event's id, time, label and JSON.
 std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t label,
                            std::string_view json) noexcept;
+
+} // namespace zrm::host
 
 #endif

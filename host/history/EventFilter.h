@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Which events of the history a reader wants; everything that is set must hold.
 struct EventFilter {
     std::uint64_t after = 0;                            ///< only ids above this one
@@ -21,5 +23,7 @@ struct EventFilter {
     std::size_t limit = 100;                       ///< at most so many events
     bool newestFirst = true;                       ///< by descending id, else by ascending id
 };
+
+} // namespace zrm::host
 
 #endif

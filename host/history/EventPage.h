@@ -7,6 +7,8 @@
 #include <optional>
 #include <vector>
 
+namespace zrm::host {
+
 /// What one query of the history found.
 struct EventPage {
     std::vector<StoredEvent> events; ///< in the filter's order
@@ -15,5 +17,7 @@ struct EventPage {
     /// Set when the search for a text stopped before its end: the id of the last event looked at.
     std::optional<std::uint64_t> reached = std::nullopt;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 EventTable::EventTable(Database& database)
     : m_database(database),
       m_insert(database, "INSERT INTO events (id, raised, label, json, checksum)"
@@ -80,3 +82,5 @@ void EventTable::removeUntil(std::uint64_t id) {
     // than its events.
     m_removeMarks.bind(1, (id + 1) / partSize).run();
 }
+
+} // namespace zrm::host

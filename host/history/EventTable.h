@@ -10,6 +10,8 @@
 #include <span>
 #include <vector>
 
+namespace zrm::host {
+
 /// The events of a history, as the writer sees them: appended at one end and removed at the other.
 /// Used by the writer's thread. Throws DatabaseError.
 class EventTable {
@@ -54,5 +56,7 @@ private:
     Statement m_remove;
     Statement m_removeMarks;
 };
+
+} // namespace zrm::host
 
 #endif

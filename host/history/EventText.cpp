@@ -8,6 +8,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using nlohmann::json;
@@ -113,3 +115,5 @@ bool EventText::isIn(std::string_view log, std::string_view document) const {
     }
     return false;
 }
+
+} // namespace zrm::host

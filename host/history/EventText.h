@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// A text that readers look for in events. Letters A to Z are found in either case. Immutable, so
 /// any thread.
 class EventText {
@@ -36,5 +38,7 @@ private:
     Pattern m_whole;
     Pattern m_plain; ///< its longest part that JSON never escapes
 };
+
+} // namespace zrm::host
 
 #endif

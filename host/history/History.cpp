@@ -10,6 +10,8 @@
 #include <cinttypes>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"History.cpp"};
@@ -195,3 +197,5 @@ HistoryState History::state() {
 Rates History::rates(std::int64_t from, std::int64_t to, std::int64_t step) {
     return reading([&](Database& database) { return RateTable::read(database, from, to, step); });
 }
+
+} // namespace zrm::host

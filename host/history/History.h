@@ -18,6 +18,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// The history of events: a SQLite file in a directory of its own, one writer, any number of
 /// readers, and a cursor for each sink. Set up, started and finished by one thread at a time; as a
 /// reader used by any.
@@ -73,5 +75,7 @@ private:
     mutable std::mutex m_mutex;        ///< guards what follows
     std::set<std::uint64_t> m_damaged; ///< events that were found damaged
 };
+
+} // namespace zrm::host
 
 #endif

@@ -17,6 +17,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"HistoryDirectory.cpp"};
@@ -188,3 +190,5 @@ std::string HistoryDirectory::moveAside(const std::string& why) const {
         why.c_str(), aside.c_str());
     return makeFile();
 }
+
+} // namespace zrm::host

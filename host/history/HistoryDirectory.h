@@ -6,6 +6,8 @@
 #include <string>
 #include <variant>
 
+namespace zrm::host {
+
 /// The directory in which a history lives, locked against other processes as long as the object
 /// lives. Used by one thread at a time, but file and bytes by any.
 class HistoryDirectory {
@@ -54,5 +56,7 @@ private:
     const std::string m_file;
     int m_lock; ///< descriptor of the file that is locked
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <optional>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::int64_t millisecondsPerMinute = 60'000;
@@ -167,3 +169,5 @@ bool HistoryFile::shrink() {
     }
     return true;
 }
+
+} // namespace zrm::host

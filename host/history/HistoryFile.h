@@ -15,6 +15,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// How far one sink has got.
 struct CursorValue {
     std::string sink;
@@ -90,5 +92,7 @@ private:
     std::uint64_t m_newest = 0;
     std::vector<std::int64_t> m_labelIds; ///< of one batch
 };
+
+} // namespace zrm::host
 
 #endif

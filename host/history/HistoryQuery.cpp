@@ -11,6 +11,8 @@
 #include <string_view>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr auto noBound = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
@@ -163,3 +165,5 @@ bool HistoryQuery::isWanted(const EventRecord& event) const {
            (!m_filter.to || event.raised <= *m_filter.to) &&
            (m_text.isEmpty() || m_text.isIn(event.log, event.json));
 }
+
+} // namespace zrm::host

@@ -13,6 +13,8 @@
 #include <cstdint>
 #include <vector>
 
+namespace zrm::host {
+
 /// One query of the events of a history. Its work grows with what it gives, not with what the
 /// history holds; the search for a text, which looks at every event that the rest of the filter
 /// lets through, is limited in time. Used once, by one thread. Throws DatabaseError.
@@ -49,5 +51,7 @@ private:
     std::size_t m_looked = 0; ///< at so many events
     EventPage m_found;
 };
+
+} // namespace zrm::host
 
 #endif

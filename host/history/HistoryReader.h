@@ -12,6 +12,8 @@
 #include <stdexcept>
 #include <stop_token>
 
+namespace zrm::host {
+
 /// The history could not be read; what() says why.
 class HistoryError : public std::runtime_error {
     using std::runtime_error::runtime_error;
@@ -48,5 +50,7 @@ public:
     /// than a day is forgotten.
     virtual Rates rates(std::int64_t from, std::int64_t to, std::int64_t step) = 0;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <cinttypes>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"HistorySource.cpp"};
@@ -153,3 +155,5 @@ std::uint64_t HistorySource::backlog() const {
     const std::uint64_t newest = m_recent.newest();
     return newest > cursor ? newest - cursor : 0;
 }
+
+} // namespace zrm::host

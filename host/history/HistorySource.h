@@ -11,6 +11,8 @@
 #include <memory>
 #include <string>
 
+namespace zrm::host {
+
 class StoredEventRow;
 
 /// The committed events of the history behind a sink's cursor: from memory where the sink keeps
@@ -41,5 +43,7 @@ private:
     std::size_t m_position = 0; ///< in the batch: the next event
     bool m_failing = false;     ///< the last reading of the file failed
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// What the history holds, and how it is.
 struct HistoryState {
     std::uint64_t events = 0;  ///< number of events held
@@ -13,5 +15,7 @@ struct HistoryState {
     std::uint64_t damaged = 0; ///< number of events that readers found damaged since the start
     std::string problem;       ///< what keeps it from taking events now; empty: nothing
 };
+
+} // namespace zrm::host
 
 #endif

@@ -9,6 +9,8 @@
 #include <stdexcept>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"HistoryWriter.cpp"};
@@ -333,3 +335,5 @@ std::string HistoryWriter::problem() const {
     const std::lock_guard guard(m_mutex);
     return m_problem;
 }
+
+} // namespace zrm::host

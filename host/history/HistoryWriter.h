@@ -19,6 +19,8 @@
 #include <thread>
 #include <vector>
 
+namespace zrm::host {
+
 /// The one writer of the history, on a thread of its own: takes events from the queue, stores them
 /// in batches and makes them known; keeps the sinks' cursors and the rates; lets events expire, a
 /// few at a time. A failure is told once and tried again after growing pauses, with the events held
@@ -102,5 +104,7 @@ private:
     bool m_ended = false;                ///< the thread's work is done
     std::thread m_thread;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <sqlite3.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// What makes a label.
@@ -97,3 +99,5 @@ void LabelTable::removeUnused() {
                    " NOT EXISTS (SELECT 1 FROM rates WHERE rates.log = logs.id)");
     forget();
 }
+
+} // namespace zrm::host

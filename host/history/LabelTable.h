@@ -9,6 +9,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Numbers for what many events have in common: a situation's name, severity and text, and a log.
 /// Used by the writer's thread. Throws DatabaseError.
 class LabelTable {
@@ -45,5 +47,7 @@ private:
     std::string m_key;                                  ///< of the last event
     Label m_last;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 OpenFiles::OpenFiles(std::string path) : m_path(std::move(path)) {
     for (std::size_t which = 0; which < endings.size(); ++which) {
         m_opened[which] = identity(which);
@@ -41,3 +43,5 @@ void OpenFiles::removeLog() const {
         }
     }
 }
+
+} // namespace zrm::host

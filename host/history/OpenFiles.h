@@ -7,6 +7,8 @@
 
 #include <sys/types.h>
 
+namespace zrm::host {
+
 /// The files of an open database, as they were when it was opened: its own, the write-ahead log and
 /// the log's index. Tells whether the names still lead to them. Immutable.
 class OpenFiles {
@@ -38,5 +40,7 @@ private:
     std::string m_path;
     std::array<std::optional<Identity>, endings.size()> m_opened;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::int64_t millisecondsPerMinute = 60'000;
@@ -88,3 +90,5 @@ Rates RateTable::read(Database& database, std::int64_t from, std::int64_t to, st
     }
     return rates;
 }
+
+} // namespace zrm::host

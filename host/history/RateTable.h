@@ -6,6 +6,8 @@
 
 #include <cstdint>
 
+namespace zrm::host {
+
 /// Entries and events per minute and log, of the last day. Minutes are counted since 1970, UTC.
 /// Used by one thread at a time. Throws DatabaseError.
 class RateTable {
@@ -28,5 +30,7 @@ private:
     Statement m_forgetMinutes;
     Statement m_forgetRates;
 };
+
+} // namespace zrm::host
 
 #endif

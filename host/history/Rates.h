@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// How much came in of one log, step by step. A step of which nothing is known, because no agent
 /// ran, has no value.
 struct LogRates {
@@ -22,5 +24,7 @@ struct Rates {
     std::int64_t step = 0;      ///< milliseconds
     std::vector<LogRates> logs; ///< by path; each has as many counts as the window has steps
 };
+
+} // namespace zrm::host
 
 #endif

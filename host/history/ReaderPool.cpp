@@ -2,6 +2,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t mostIdle = 4;
@@ -67,3 +69,5 @@ void ReaderPool::resume() {
     }
     m_changed.notify_all();
 }
+
+} // namespace zrm::host

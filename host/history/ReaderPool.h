@@ -11,6 +11,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// Connections for those who read the history, opened on demand and used again. Any thread.
 class ReaderPool {
 public:
@@ -58,5 +60,7 @@ private:
     std::size_t m_leased = 0;
     bool m_suspended = false;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+namespace zrm::host {
+
 RecentEvents::RecentEvents(std::size_t bytes, std::uint64_t newest)
     : m_mostBytes(bytes), m_newest(newest) {}
 
@@ -57,3 +59,5 @@ void RecentEvents::end() {
     }
     m_changed.notify_all();
 }
+
+} // namespace zrm::host

@@ -12,6 +12,8 @@
 #include <mutex>
 #include <stop_token>
 
+namespace zrm::host {
+
 /// The newest committed events, in memory: who keeps up reads them here and not from the file.
 /// Tells everyone who waits that there is more. Any thread.
 class RecentEvents {
@@ -55,5 +57,7 @@ private:
     std::deque<std::shared_ptr<const EventBatch>> m_batches; ///< by id
     std::size_t m_bytes = 0;                                 ///< of the batches
 };
+
+} // namespace zrm::host
 
 #endif

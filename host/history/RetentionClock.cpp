@@ -1,5 +1,7 @@
 #include "host/history/RetentionClock.h"
 
+namespace zrm::host {
+
 namespace {
 
 using namespace std::chrono_literals;
@@ -27,3 +29,5 @@ std::int64_t RetentionClock::now(std::int64_t wall, Clock::time_point steady) {
     m_steady = steady;
     return wall;
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <optional>
 
+namespace zrm::host {
+
 /// The time of day by which events expire. A clock that leaps ahead would expire everything at
 /// once, so a leap is believed only when it has lasted for an hour. One thread.
 class RetentionClock {
@@ -20,5 +22,7 @@ private:
     Clock::time_point m_steady;                 ///< at that moment
     std::optional<Clock::time_point> m_leaptAt; ///< when the leap under way was first seen
 };
+
+} // namespace zrm::host
 
 #endif

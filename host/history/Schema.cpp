@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+namespace zrm::host {
+
 namespace {
 
 /// Each entry makes, of the version before it, the version that is its place in the table.
@@ -59,3 +61,5 @@ void Schema::bringUpToDate(Database& database) {
         transaction.commit();
     }
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <stdexcept>
 
+namespace zrm::host {
+
 /// The file was written by a later version of this program.
 class SchemaTooNew : public std::runtime_error {
     using std::runtime_error::runtime_error;
@@ -21,5 +23,7 @@ extern const int version;
 void bringUpToDate(Database& database);
 
 } // namespace Schema
+
+} // namespace zrm::host
 
 #endif

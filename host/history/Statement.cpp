@@ -4,6 +4,8 @@
 
 #include <sqlite3.h>
 
+namespace zrm::host {
+
 Statement::Statement(Database& database, const std::string& sql) : m_database(&database) {
     if (const int code =
             sqlite3_prepare_v2(database.handle(), sql.c_str(), -1, &m_statement, nullptr);
@@ -78,3 +80,5 @@ std::string_view Statement::text(int column) const noexcept {
 bool Statement::isNull(int column) const noexcept {
     return sqlite3_column_type(m_statement, column) == SQLITE_NULL;
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 
 struct sqlite3_stmt;
 
+namespace zrm::host {
+
 /// A prepared statement. Used by its connection's thread; the connection outlives it. Parameters
 /// and columns are counted as SQLite counts them: parameters from 1, columns from 0. Every failure
 /// throws DatabaseError.
@@ -46,5 +48,7 @@ private:
     Database* m_database;
     sqlite3_stmt* m_statement = nullptr;
 };
+
+} // namespace zrm::host
 
 #endif

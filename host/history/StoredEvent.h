@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// One event as the history gives it to a reader, which owns the texts.
 struct StoredEvent {
     std::uint64_t id = 0;
@@ -14,5 +16,7 @@ struct StoredEvent {
     std::string json;        ///< the event as one JSON object, on one line, without a newline
     bool operator==(const StoredEvent&) const = default;
 };
+
+} // namespace zrm::host
 
 #endif

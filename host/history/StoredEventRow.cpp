@@ -4,6 +4,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 enum Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, LABEL, CHECKSUM };
@@ -30,3 +32,5 @@ bool StoredEventRow::isIntact() const {
                : m_row.integer(CHECKSUM) == eventChecksum(m_row.integer(ID), m_row.integer(RAISED),
                                                           m_row.integer(LABEL), m_row.text(JSON));
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 
 #include <cstdint>
 
+namespace zrm::host {
+
 /// The current row of a statement that begins with `select`: one event as the file has it. Its
 /// texts last until the statement's next step or reset.
 class StoredEventRow {
@@ -25,5 +27,7 @@ public:
 private:
     const Statement& m_row;
 };
+
+} // namespace zrm::host
 
 #endif

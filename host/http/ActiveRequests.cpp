@@ -1,5 +1,7 @@
 #include "host/http/ActiveRequests.h"
 
+namespace zrm::host {
+
 namespace {
 
 /// Requests of this thread: the thread that ends the process does not wait for itself.
@@ -33,3 +35,5 @@ void ActiveRequests::close(std::chrono::steady_clock::time_point limit) {
     m_isClosed = true;
     m_ended.wait_until(lock, limit, [&] { return m_count <= ownRequests; });
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 #include <condition_variable>
 #include <mutex>
 
+namespace zrm::host {
+
 /// Counts the requests under way, so that the end of the process can wait for them. Any thread.
 class ActiveRequests {
 public:
@@ -31,5 +33,7 @@ private:
     int m_count = 0;
     bool m_isClosed = false;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -16,6 +16,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"ApiToken.cpp"};
@@ -136,3 +138,5 @@ bool ApiToken::matches(std::string_view presented) const noexcept {
     }
     return difference == 0;
 }
+
+} // namespace zrm::host

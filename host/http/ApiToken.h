@@ -5,6 +5,8 @@
 #include <string_view>
 #include <variant>
 
+namespace zrm::host {
+
 /// The secret that a client of the API presents. Immutable.
 class ApiToken {
 public:
@@ -21,5 +23,7 @@ public:
 private:
     std::string m_token;
 };
+
+} // namespace zrm::host
 
 #endif

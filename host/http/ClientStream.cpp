@@ -7,6 +7,8 @@
 #include <boost/asio/ssl/stream.hpp>
 #include <openssl/ssl.h>
 
+namespace zrm::host {
+
 namespace {
 
 namespace asio = boost::asio;
@@ -74,3 +76,5 @@ std::unique_ptr<ClientStream> ClientStream::make(tcp::socket socket,
     }
     return std::make_unique<PlainStream>(std::move(socket));
 }
+
+} // namespace zrm::host

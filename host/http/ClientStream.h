@@ -11,6 +11,8 @@
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/ip/tcp.hpp>
 
+namespace zrm::host {
+
 /// The bytes that go to and from one client, in the clear or under TLS. One thread; at most one
 /// operation of a kind at a time. What is done is called on the thread of the socket's executor.
 class ClientStream {
@@ -33,5 +35,7 @@ public:
     virtual void sayFarewell(Done done) = 0;
     virtual boost::asio::ip::tcp::socket& socket() = 0;
 };
+
+} // namespace zrm::host
 
 #endif

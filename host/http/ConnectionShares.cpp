@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 std::size_t ConnectionShares::share(bool isLoopback) const noexcept {
     constexpr std::size_t least = 4;
     return isLoopback ? m_most * 3 / 4 : std::max(m_most / 8, least);
@@ -54,3 +56,5 @@ bool ConnectionShares::waitForNone(Clock::time_point limit) {
     std::unique_lock lock(m_mutex);
     return m_changed.wait_until(lock, limit, [&] { return m_count == 0; });
 }
+
+} // namespace zrm::host

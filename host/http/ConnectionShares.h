@@ -9,6 +9,8 @@
 #include <mutex>
 #include <string>
 
+namespace zrm::host {
+
 /// Counts the open connections, in all and for each client's address, and bounds both: no address
 /// takes all places. Any thread.
 class ConnectionShares {
@@ -46,5 +48,7 @@ private:
     std::size_t m_count = 0;
     std::uint64_t m_refused = 0;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <utility>
 #include <variant>
 
+namespace zrm::host {
+
 Credentials::Credentials(std::string token, std::string certificate, std::string key)
     : m_tokenFile(std::move(token)), m_certificateFile(std::move(certificate)),
       m_keyFile(std::move(key)) {}
@@ -62,3 +64,5 @@ void Credentials::refreshTls(Change& change) {
         change.problem = "the certificate before goes on: " + problem;
     }
 }
+
+} // namespace zrm::host

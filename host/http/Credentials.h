@@ -9,6 +9,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// The API token and the certificate with its key, read from their files again when these change.
 /// What was read last serves on while a changed file cannot be used. One thread.
 class Credentials {
@@ -44,5 +46,7 @@ private:
     std::shared_ptr<const TlsContext> m_tls;
     bool m_isTriedAgain = false; ///< certificate and key, of which one may come after the other
 };
+
+} // namespace zrm::host
 
 #endif

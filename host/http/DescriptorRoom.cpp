@@ -7,6 +7,8 @@
 #include <sys/select.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// Descriptors beside those of the agent and of connections.
@@ -47,3 +49,5 @@ DescriptorRoom DescriptorRoom::make(std::size_t wanted) {
     }
     return {std::min<std::size_t>(wanted, limit.rlim_cur / 2), 0};
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include <cstddef>
 
+namespace zrm::host {
+
 /// The part of the process's descriptors that connections may take.
 struct DescriptorRoom {
     std::size_t count = 0; ///< of connections
@@ -12,5 +14,7 @@ struct DescriptorRoom {
     /// limit of descriptors where it is too low, and leaves enough of them to the agent.
     static DescriptorRoom make(std::size_t wanted);
 };
+
+} // namespace zrm::host
 
 #endif

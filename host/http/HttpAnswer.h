@@ -9,6 +9,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// The way of a body to its client while the body comes into being. Any thread; nothing here waits.
 class BodyChannel {
 public:
@@ -50,5 +52,7 @@ struct HttpAnswer {
         return {200, "application/json", SteeringText::escapedInJson(std::move(text))};
     }
 };
+
+} // namespace zrm::host
 
 #endif

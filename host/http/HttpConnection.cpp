@@ -8,6 +8,8 @@
 
 #include <boost/asio/post.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using namespace std::chrono_literals;
@@ -380,3 +382,5 @@ void HttpConnection::answered(const std::shared_ptr<Job>& job, HttpAnswer answer
     m_job.reset();
     write(std::move(answer));
 }
+
+} // namespace zrm::host

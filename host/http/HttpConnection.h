@@ -19,6 +19,8 @@
 
 #include <boost/asio/steady_timer.hpp>
 
+namespace zrm::host {
+
 class StreamChannel;
 
 /// What the connections of a server share. Outlives them.
@@ -142,5 +144,7 @@ private:
     bool m_isWritingStream = false;
     bool m_isStreamOver = false;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 // What a connection sends: answers and streams. The rest of it is in HttpConnection.cpp.
 
 namespace {
@@ -159,3 +161,5 @@ void HttpConnection::dropChannel() {
         channel->close();
     }
 }
+
+} // namespace zrm::host

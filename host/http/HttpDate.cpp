@@ -4,6 +4,8 @@
 #include <cstdio>
 #include <ctime>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr const char* days[] = {"Sun", "Mon", "Tue", "Wed", "Thu", "Fri", "Sat"};
@@ -26,3 +28,5 @@ std::string HttpDate::text(std::int64_t seconds) {
 std::string HttpDate::now() {
     return text(std::time(nullptr));
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// Times as the headers of HTTP have them, whatever the locale. Stateless.
 class HttpDate {
 public:
@@ -12,5 +14,7 @@ public:
 
     static std::string now();
 };
+
+} // namespace zrm::host
 
 #endif

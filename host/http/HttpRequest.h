@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// What a resource sees of a request, which has passed every rule of access by then.
 struct HttpRequest {
     std::string method;                ///< GET stands for HEAD too
@@ -19,5 +21,7 @@ struct HttpRequest {
     /// is never requested.
     std::stop_token cancelled;
 };
+
+} // namespace zrm::host
 
 #endif

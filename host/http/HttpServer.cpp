@@ -27,6 +27,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 namespace asio = boost::asio;
@@ -384,3 +386,5 @@ void HttpServer::stop(Clock::time_point limit) {
 void HttpServer::abandon(Clock::time_point limit) {
     m_network->abandon(limit);
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 #include <memory>
 #include <string>
 
+namespace zrm::host {
+
 class RequestStatistics;
 class Router;
 
@@ -67,5 +69,7 @@ private:
     class Network;
     std::unique_ptr<Network> m_network;
 };
+
+} // namespace zrm::host
 
 #endif

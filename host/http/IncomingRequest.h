@@ -9,6 +9,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// A request as it came, before any rule was held against it.
 struct IncomingRequest {
     HttpRequest request;  ///< without captures, query and body
@@ -23,5 +25,7 @@ struct IncomingRequest {
     std::optional<std::size_t> length; ///< of the body, where the client tells it
     std::optional<Problem> problem;    ///< what makes the request unclear; none when nothing
 };
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using nlohmann::json;
@@ -192,3 +194,5 @@ void JsonFields::refuseUnknown() const {
                                   : "unknown member; the members are " + known);
     }
 }
+
+} // namespace zrm::host

@@ -11,6 +11,8 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 /// The members of a JSON object of a request's body while they are read: gives values by key and
 /// type and knows which keys nobody asked for. Whatever is wrong is thrown as RequestRefused, with
 /// status 400 and the place in the body as its field. A member that is null counts as missing.
@@ -63,5 +65,7 @@ private:
     std::string m_prefix;             ///< stands before a key in a place
     std::vector<std::string> m_known; ///< keys that were asked for, in that order
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::array<std::pair<int, const char*>, 16> titles = {{
@@ -44,3 +46,5 @@ std::string Problem::json() const {
     // A detail may quote what the client sent: bytes that are no UTF-8 are replaced.
     return document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

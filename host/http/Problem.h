@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// Why a request over HTTP is refused: a problem document (application/problem+json).
 struct Problem {
     int status;         ///< HTTP status
@@ -12,5 +14,7 @@ struct Problem {
     /// The document's JSON text.
     std::string json() const;
 };
+
+} // namespace zrm::host
 
 #endif

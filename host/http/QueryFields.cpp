@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <charconv>
 
+namespace zrm::host {
+
 std::vector<std::string> QueryFields::texts(const std::string& name) {
     m_known.push_back(name);
     std::vector<std::string> values;
@@ -72,3 +74,5 @@ void QueryFields::refuseUnknown() const {
         }
     }
 }
+
+} // namespace zrm::host

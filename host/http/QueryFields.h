@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+namespace zrm::host {
+
 /// The parameters of a request's query while they are read. Whatever is wrong is thrown as
 /// RequestRefused, with status 400 and the parameter's name as its field.
 class QueryFields {
@@ -36,5 +38,7 @@ private:
     const std::multimap<std::string, std::string>& m_query;
     std::vector<std::string> m_known; ///< names that were asked for, in that order
 };
+
+} // namespace zrm::host
 
 #endif

@@ -16,6 +16,8 @@
 
 #include <strings.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"RequestDispatcher.cpp"};
@@ -223,3 +225,5 @@ HttpAnswer RequestDispatcher::answer(Admission& admission) {
     count(admission, *answer);
     return std::move(*answer);
 }
+
+} // namespace zrm::host

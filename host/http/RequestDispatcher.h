@@ -16,6 +16,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// Holds the rules of access against requests and lets the router's handlers answer them. What
 /// goes wrong becomes a problem document. Any thread.
 class RequestDispatcher {
@@ -84,5 +86,7 @@ private:
     ActiveRequests m_active;
     RequestStatistics m_statistics;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 // The ports that an authority may leave out.
@@ -77,3 +79,5 @@ std::optional<Problem> RequestGuard::refuse(const Headers& headers, bool isPubli
     }
     return std::nullopt;
 }
+
+} // namespace zrm::host

@@ -13,6 +13,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Decides which requests may reach the API: those that were meant for this server (a web page of
 /// another origin cannot make a browser ask it, also not through a name that it points here), and
 /// that carry the token. Immutable, so any thread.
@@ -43,5 +45,7 @@ private:
     std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
     std::uint16_t m_port;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -14,6 +14,8 @@
 #include <boost/beast/http/string_body.hpp>
 #include <strings.h>
 
+namespace zrm::host {
+
 namespace {
 
 namespace http = boost::beast::http;
@@ -324,3 +326,5 @@ const std::optional<Problem>& RequestParser::bodyProblem() const noexcept {
 std::string RequestParser::takeBody() {
     return m_engine->takeBody();
 }
+
+} // namespace zrm::host

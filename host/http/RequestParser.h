@@ -9,6 +9,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Reads one request as its bytes come in. A head that another reader, for example a proxy on the
 /// way, may understand differently is refused, so that no body is taken for a request. One thread.
 class RequestParser {
@@ -50,5 +52,7 @@ private:
     class Engine;
     std::unique_ptr<Engine> m_engine;
 };
+
+} // namespace zrm::host
 
 #endif

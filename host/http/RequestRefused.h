@@ -7,6 +7,8 @@
 #include <string>
 #include <utility>
 
+namespace zrm::host {
+
 /// Thrown where a request turns out to be refused: its problem becomes the answer.
 class RequestRefused : public std::exception {
 public:
@@ -20,5 +22,7 @@ public:
 private:
     Problem m_problem;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include <cstddef>
 
+namespace zrm::host {
+
 void RequestStatistics::count(const std::string& method, const std::string& route, int status,
                               std::chrono::duration<double> time) {
     const std::lock_guard guard(m_mutex);
@@ -23,3 +25,5 @@ std::map<std::string, RequestStatistics::Durations> RequestStatistics::durations
     const std::lock_guard guard(m_mutex);
     return m_durations;
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 #include <string>
 #include <tuple>
 
+namespace zrm::host {
+
 /// Counts the requests that were answered, by route. Any thread.
 class RequestStatistics {
 public:
@@ -44,5 +46,7 @@ private:
     std::map<Kind, std::uint64_t> m_counts;
     std::map<std::string, Durations> m_durations; ///< by route
 };
+
+} // namespace zrm::host
 
 #endif

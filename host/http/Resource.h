@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_RESOURCE_H
 #define ZRM_HOST_RESOURCE_H
 
+namespace zrm::host {
+
 class Router;
 
 /// A group of routes that belong together. Made before the server starts, and outlives it.
@@ -11,5 +13,7 @@ public:
     /// Adds the routes, once. Their handlers are called on any thread, several at a time.
     virtual void addRoutes(Router& router) = 0;
 };
+
+} // namespace zrm::host
 
 #endif

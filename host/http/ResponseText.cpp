@@ -11,6 +11,8 @@
 #include <boost/beast/http/message.hpp>
 #include <boost/beast/http/serializer.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 namespace http = boost::beast::http;
@@ -85,3 +87,5 @@ std::string ResponseText::askForBody() {
     response.result(http::status::continue_);
     return text(response);
 }
+
+} // namespace zrm::host

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 /// Answers as they go over a connection. Stateless.
 class ResponseText {
 public:
@@ -26,5 +28,7 @@ public:
     /// Asks a client that waits for it to send the body.
     static std::string askForBody();
 };
+
+} // namespace zrm::host
 
 #endif

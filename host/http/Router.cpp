@@ -4,6 +4,8 @@
 #include <iterator>
 #include <optional>
 
+namespace zrm::host {
+
 namespace {
 
 /// Where a part of a pattern stands among the alternatives for one part of a path.
@@ -110,3 +112,5 @@ std::vector<std::pair<std::string, std::string>> Router::routes() const {
     }
     return all;
 }
+
+} // namespace zrm::host

@@ -10,6 +10,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// Which handler answers which method and path. Filled before the server starts; then any thread.
 class Router {
 public:
@@ -64,5 +66,7 @@ private:
 
     std::vector<Route> m_routes;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <boost/asio/post.hpp>
 
+namespace zrm::host {
+
 StreamChannel::StreamChannel(HttpConnection& connection, std::function<void()> changed)
     : m_connection(&connection), m_changed(std::move(changed)) {}
 
@@ -70,3 +72,5 @@ void StreamChannel::close() {
         m_changed();
     }
 }
+
+} // namespace zrm::host

@@ -9,6 +9,8 @@
 #include <mutex>
 #include <string>
 
+namespace zrm::host {
+
 class HttpConnection;
 
 /// The channel of a stream over a connection, which may end before it.
@@ -37,5 +39,7 @@ private:
     std::size_t m_unsent = 0;     ///< bytes handed over and not yet taken
     const std::function<void()> m_changed;
 };
+
+} // namespace zrm::host
 
 #endif

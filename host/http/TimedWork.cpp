@@ -8,6 +8,8 @@
 #include <thread>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr int mostLeftBehind = 64;
@@ -47,3 +49,5 @@ HttpAnswer TimedWork::answer(std::function<HttpAnswer()> work, std::chrono::mill
     }
     return future.get();
 }
+
+} // namespace zrm::host

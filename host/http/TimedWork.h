@@ -6,6 +6,8 @@
 #include <chrono>
 #include <functional>
 
+namespace zrm::host {
+
 /// Answers that come in time. The work for one is done on a thread of its own, which is left behind
 /// when the system does not let it go on: a file system that does not answer holds up the request
 /// that needs it and no other. Any thread.
@@ -17,5 +19,7 @@ namespace TimedWork {
 HttpAnswer answer(std::function<HttpAnswer()> work, std::chrono::milliseconds limit);
 
 } // namespace TimedWork
+
+} // namespace zrm::host
 
 #endif

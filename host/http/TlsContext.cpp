@@ -6,6 +6,8 @@
 #include <openssl/ssl.h>
 #include <openssl/x509v3.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// What the library says of its last failure, or the system where a file cannot be read.
@@ -66,3 +68,5 @@ bool TlsContext::isFor(const std::string& host) const {
     return X509_check_host(certificate, host.data(), host.size(), 0, nullptr) == 1 ||
            X509_check_ip_asc(certificate, host.c_str(), 0) == 1;
 }
+
+} // namespace zrm::host

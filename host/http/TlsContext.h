@@ -7,6 +7,8 @@
 
 struct ssl_ctx_st;
 
+namespace zrm::host {
+
 /// A certificate and its key, for connections under TLS. Immutable, so any thread.
 class TlsContext {
 public:
@@ -29,5 +31,7 @@ private:
 
     ssl_ctx_st* const m_context;
 };
+
+} // namespace zrm::host
 
 #endif

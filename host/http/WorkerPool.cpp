@@ -3,6 +3,8 @@
 #include <system_error>
 #include <utility>
 
+namespace zrm::host {
+
 WorkerPool::~WorkerPool() {
     {
         const std::lock_guard guard(m_mutex);
@@ -55,3 +57,5 @@ void WorkerPool::run() {
         ++m_idle;
     }
 }
+
+} // namespace zrm::host

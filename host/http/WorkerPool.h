@@ -9,6 +9,8 @@
 #include <thread>
 #include <vector>
 
+namespace zrm::host {
+
 /// A bounded number of threads for work that may wait, and a queue before them. A thread is started
 /// when there is work and none is free, and stays. Any thread.
 class WorkerPool {
@@ -38,5 +40,7 @@ private:
     bool m_isEnding = false;
     std::vector<std::thread> m_threads;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -2,6 +2,8 @@
 
 #include "host/metrics/MetricText.h"
 
+namespace zrm::host {
+
 void ConfigMetrics::collect(MetricText& text) {
     text.gauge("zrm_config_last_reload_successful",
                "0 when the last change of the configuration file was not taken over, else 1.");
@@ -11,3 +13,5 @@ void ConfigMetrics::collect(MetricText& text) {
                "than half of its situations, else 0.");
     text.add(m_reload.hasRemovedMost.load() ? 1.0 : 0.0);
 }
+
+} // namespace zrm::host

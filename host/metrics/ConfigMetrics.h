@@ -5,6 +5,8 @@
 
 #include <atomic>
 
+namespace zrm::host {
+
 /// How the last change of the configuration file went. Written by one thread, read by any.
 struct ConfigReload {
     std::atomic<bool> isTakenOver{true};     ///< false: the file cannot be used as it is
@@ -22,5 +24,7 @@ public:
 private:
     const ConfigReload& m_reload;
 };
+
+} // namespace zrm::host
 
 #endif

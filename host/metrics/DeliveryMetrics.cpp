@@ -7,6 +7,8 @@
 #include <chrono>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 void collectQueue(MetricText& text, const QueueState& queue) {
@@ -68,3 +70,5 @@ void DeliveryMetrics::collect(MetricText& text) {
         collectHistory(text, history->state());
     }
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "host/metrics/MetricSource.h"
 
+namespace zrm::host {
+
 class Delivery;
 
 /// The way of events: the queue, the history, the sinks.
@@ -16,5 +18,7 @@ public:
 private:
     Delivery& m_delivery;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 
 #include <string>
 
+namespace zrm::host {
+
 void HttpMetrics::collect(MetricText& text) {
     const RequestStatistics& statistics = m_server.statistics();
     text.counter("zrm_http_requests_total", "Requests over HTTP that were answered.");
@@ -28,3 +30,5 @@ void HttpMetrics::collect(MetricText& text) {
     text.gauge("zrm_http_stream_clients", "Clients that follow the events.");
     text.add(static_cast<double>(m_stream.clients()));
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "host/metrics/MetricSource.h"
 
+namespace zrm::host {
+
 class EventStream;
 class HttpServer;
 
@@ -19,5 +21,7 @@ private:
     const HttpServer& m_server;
     const EventStream& m_stream;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -18,6 +18,8 @@
 
 #include <sys/stat.h>
 
+namespace zrm::host {
+
 namespace {
 
 struct LogState {
@@ -148,3 +150,5 @@ void LogMetrics::collect(MetricText& text) {
     text.add(DescriptorReserve::failures());
     collectWarnings(text, m_watch);
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "host/metrics/MetricSource.h"
 
+namespace zrm::host {
+
 class LogWatch;
 
 /// The monitored logs: what the agent tells of each in the Monitored Logs table.
@@ -16,5 +18,7 @@ public:
 private:
     const LogWatch& m_watch;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <prometheus/metric_family.h>
 #include <prometheus/text_serializer.h>
 
+namespace zrm::host {
+
 using prometheus::ClientMetric;
 using prometheus::MetricFamily;
 using prometheus::MetricType;
@@ -71,3 +73,5 @@ std::string MetricText::text() const {
     }
     return prometheus::TextSerializer().Serialize(families);
 }
+
+} // namespace zrm::host

@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// Metrics while they are gathered for one scrape. One thread.
 class MetricText {
 public:
@@ -39,5 +41,7 @@ private:
     struct Families;
     std::unique_ptr<Families> m_families;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include "host/http/Router.h"
 #include "host/metrics/MetricText.h"
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"MetricsResource.cpp"};
@@ -25,3 +27,5 @@ void MetricsResource::addRoutes(Router& router) {
         return answer;
     });
 }
+
+} // namespace zrm::host

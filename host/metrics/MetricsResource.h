@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// `GET /metrics`: every metric, for Prometheus.
 class MetricsResource : public Resource {
 public:
@@ -19,5 +21,7 @@ public:
 private:
     std::vector<std::unique_ptr<MetricSource>> m_sources;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -12,6 +12,8 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 double seconds(const timeval& time) {
@@ -70,3 +72,5 @@ void ProcessMetrics::collect(MetricText& text) {
     collectMemory(text);
     collectDescriptors(text);
 }
+
+} // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "host/metrics/MetricSource.h"
 
+namespace zrm::host {
+
 /// The process: version, start, processor time, memory, descriptors. What the system does not tell
 /// is left out.
 class ProcessMetrics : public MetricSource {
@@ -15,5 +17,7 @@ public:
 private:
     const double m_started; ///< seconds since 1970-01-01 UTC
 };
+
+} // namespace zrm::host
 
 #endif

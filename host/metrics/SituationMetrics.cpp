@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <vector>
 
+namespace zrm::host {
+
 namespace {
 
 /// What a situation counts.
@@ -54,3 +56,5 @@ void SituationMetrics::collect(MetricText& text) {
         }
     }
 }
+
+} // namespace zrm::host

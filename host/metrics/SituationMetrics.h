@@ -3,6 +3,8 @@
 
 #include "host/metrics/MetricSource.h"
 
+namespace zrm::host {
+
 class SituationSet;
 
 /// The situations: their states and what they have counted.
@@ -16,5 +18,7 @@ public:
 private:
     const SituationSet& m_situations;
 };
+
+} // namespace zrm::host
 
 #endif

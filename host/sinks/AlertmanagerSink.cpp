@@ -9,6 +9,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -47,3 +49,5 @@ std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const 
     }
     return SteeringText::escapedInJson(alerts.dump(-1, ' ', false, Json::error_handler_t::replace));
 }
+
+} // namespace zrm::host

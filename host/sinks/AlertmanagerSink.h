@@ -5,6 +5,8 @@
 
 #include <chrono>
 
+namespace zrm::host {
+
 /// Raises an alert at an Alertmanager (its API of version 2) for each event. An alert ends by
 /// itself some time after its event; an event that comes earlier with the same labels extends it.
 class AlertmanagerSink : public JsonPostSink {
@@ -19,5 +21,7 @@ private:
     const SinkConfig::Texts m_labels;
     const std::string m_generatorUrl;
 };
+
+} // namespace zrm::host
 
 #endif

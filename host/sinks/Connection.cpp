@@ -14,6 +14,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Connection.cpp"};
@@ -151,3 +153,5 @@ std::size_t Connection::unacknowledged() const {
                ? static_cast<std::size_t>(count)
                : 0;
 }
+
+} // namespace zrm::host

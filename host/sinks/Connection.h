@@ -10,6 +10,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// A connection to a receiver that answers nothing, over TCP or UDP. Every wait ends when its time
 /// is over or when giving up is requested. Used by one thread.
 class Connection {
@@ -54,5 +56,7 @@ private:
     int m_socket = -1;
     std::string m_error;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 EventRow::EventRow(const EventRecord& event) {
     const auto json = nlohmann::ordered_json::parse(event.json, nullptr, false);
     const auto row = json.is_object() ? json.find("row") : json.end();
@@ -43,3 +45,5 @@ std::string_view EventRow::node() const {
     const std::string_view node = text("ORIGINNODE");
     return node.substr(0, node.rfind(':'));
 }
+
+} // namespace zrm::host

@@ -10,6 +10,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// The row of an event, read back from the event's JSON for the sinks that write it in another
 /// form. Immutable, so any thread.
 class EventRow {
@@ -40,5 +42,7 @@ public:
 private:
     std::vector<Column> m_columns;
 };
+
+} // namespace zrm::host
 
 #endif

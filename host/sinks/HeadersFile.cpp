@@ -7,6 +7,8 @@
 #include <sstream>
 #include <string_view>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr const char* blanks = " \t\r";
@@ -51,3 +53,5 @@ std::optional<HeadersFile::Headers> HeadersFile::read(const std::string& path,
     }
     return headers;
 }
+
+} // namespace zrm::host

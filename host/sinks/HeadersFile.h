@@ -5,6 +5,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// Headers that are kept in a file of their own, because they are secrets: "Name: value", one per
 /// line. Stateless.
 class HeadersFile {
@@ -15,5 +17,7 @@ public:
     /// then `problem` says why, and never what the file holds.
     static std::optional<Headers> read(const std::string& path, std::string& problem);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <openssl/evp.h>
 #include <openssl/hmac.h>
 
+namespace zrm::host {
+
 std::string HmacSha256::hex(std::string_view secret, std::string_view text) {
     constexpr char digits[] = "0123456789abcdef";
     std::array<unsigned char, EVP_MAX_MD_SIZE> signature{};
@@ -19,3 +21,5 @@ std::string HmacSha256::hex(std::string_view secret, std::string_view text) {
     }
     return hex;
 }
+
+} // namespace zrm::host

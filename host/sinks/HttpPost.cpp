@@ -14,6 +14,8 @@
 #include <optional>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"HttpPost.cpp"};
@@ -197,3 +199,5 @@ const std::string& HttpPost::answer() const noexcept {
 const std::string& HttpPost::error() const noexcept {
     return m_implementation->error();
 }
+
+} // namespace zrm::host

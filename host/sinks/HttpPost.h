@@ -9,6 +9,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Sends bodies to one URL by HTTP POST, over a connection that is kept while the receiver keeps
 /// it. A request ends when its time is over or when it is told to give up, whatever the receiver
 /// does. The certificate of an https server is always verified. Used by one thread.
@@ -38,5 +40,7 @@ private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;
 };
+
+} // namespace zrm::host
 
 #endif

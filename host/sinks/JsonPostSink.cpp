@@ -2,6 +2,8 @@
 
 #include "base/TraceScope.h"
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"JsonPostSink.cpp"};
@@ -22,3 +24,5 @@ std::size_t JsonPostSink::deliver(std::span<const EventRecord> events,
     taken(events.size(), m_http.answer());
     return trace.result(events.size());
 }
+
+} // namespace zrm::host

@@ -10,6 +10,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// A sink that posts each delivery as one JSON body, taken as a whole or not at all. What the body
 /// says is the derived class's. Used by one thread.
 class JsonPostSink : public Sink {
@@ -33,5 +35,7 @@ private:
     const std::string m_name;
     HttpPost m_http;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -12,6 +12,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"JsonlSink.cpp"};
@@ -202,3 +204,5 @@ std::size_t JsonlSink::deliver(std::span<const EventRecord> events, const std::s
     }
     return trace.result(delivered);
 }
+
+} // namespace zrm::host

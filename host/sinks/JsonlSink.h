@@ -14,6 +14,8 @@
 #include <string_view>
 #include <vector>
 
+namespace zrm::host {
+
 /// Writes one JSON object per event, one per line, to standard output or to a file. The file is
 /// appended to, made when missing, and opened again when it was moved away or removed; a symbolic
 /// link is not followed. A pipe of the file system and a device are written, too. A line is
@@ -58,5 +60,7 @@ private:
     std::string m_error;
     std::atomic<Clock::rep> m_waitsSince{0}; ///< 0: it does not
 };
+
+} // namespace zrm::host
 
 #endif

@@ -14,6 +14,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"OtlpSink.cpp"};
@@ -124,3 +126,5 @@ void OtlpSink::taken(std::size_t events, const std::string& text) const {
         trace.detail()("%s says: %s", name().c_str(), why.c_str());
     }
 }
+
+} // namespace zrm::host

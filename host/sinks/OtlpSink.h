@@ -3,6 +3,8 @@
 
 #include "host/sinks/JsonPostSink.h"
 
+namespace zrm::host {
+
 /// Sends events as log records of OpenTelemetry: OTLP over HTTP in its JSON encoding. Records
 /// that the receiver takes a request without are told in the trace and not sent again, as the
 /// protocol demands.
@@ -18,5 +20,7 @@ private:
     const std::string m_serviceName;
     const SinkConfig::Texts m_attributes;
 };
+
+} // namespace zrm::host
 
 #endif

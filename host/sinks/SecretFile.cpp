@@ -8,6 +8,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t longestSecret = 4096; ///< bytes
@@ -53,3 +55,5 @@ std::optional<std::string> SecretFile::read(const std::string& path, std::string
     }
     return text;
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <optional>
 #include <string>
 
+namespace zrm::host {
+
 /// Secrets that are kept in files of their own. Stateless.
 class SecretFile {
 public:
@@ -12,5 +14,7 @@ public:
     /// why.
     static std::optional<std::string> read(const std::string& path, std::string& problem);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 #include <array>
 #include <string_view>
 
+namespace zrm::host {
+
 /// What other systems call a severity.
 struct SeverityCodes {
     std::string_view severity;
@@ -27,5 +29,7 @@ constexpr const SeverityCodes& SeverityCodes::of(std::string_view severity) noex
                      [&](const SeverityCodes& codes) { return codes.severity == severity; });
     return found == severityCodes.end() ? severityCodes[2] : *found;
 }
+
+} // namespace zrm::host
 
 #endif

@@ -10,6 +10,8 @@
 #include <stop_token>
 #include <string>
 
+namespace zrm::host {
+
 /// A place to which events are delivered. Used by one thread.
 class Sink {
 public:
@@ -33,5 +35,7 @@ public:
     /// Why the last delivery failed.
     virtual std::string error() const = 0;
 };
+
+} // namespace zrm::host
 
 #endif

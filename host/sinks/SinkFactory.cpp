@@ -10,6 +10,8 @@
 #include <array>
 #include <string_view>
 
+namespace zrm::host {
+
 namespace {
 
 struct Maker {
@@ -36,3 +38,5 @@ std::unique_ptr<Sink> SinkFactory::make(const SinkConfig& config) {
                                     [&](const Maker& known) { return known.type == config.type; });
     return maker == makers.end() ? nullptr : maker->make(config);
 }
+
+} // namespace zrm::host

@@ -6,6 +6,8 @@
 
 #include <memory>
 
+namespace zrm::host {
+
 /// Makes sinks of every type in SinkTypes. Stateless.
 class SinkFactory {
 public:
@@ -13,5 +15,7 @@ public:
     /// the process before its first delivery.
     static std::unique_ptr<Sink> make(const SinkConfig& config);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -11,6 +11,8 @@
 
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::size_t longestHostName = 255; ///< bytes
@@ -102,3 +104,5 @@ std::string SyslogMessage::text(const EventRecord& event) const {
     text += "] ";
     return text + messageText(row.description(), longest - std::min(text.size(), longest));
 }
+
+} // namespace zrm::host

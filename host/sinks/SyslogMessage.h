@@ -7,6 +7,8 @@
 #include <string>
 #include <string_view>
 
+namespace zrm::host {
+
 /// Writes events as syslog messages (RFC 5424). Immutable, so any thread.
 class SyslogMessage {
 public:
@@ -23,5 +25,7 @@ private:
     std::size_t m_facility; ///< its code
     std::string m_process;  ///< this one's number
 };
+
+} // namespace zrm::host
 
 #endif

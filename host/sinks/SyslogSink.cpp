@@ -4,6 +4,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"SyslogSink.cpp"};
@@ -75,3 +77,5 @@ std::size_t SyslogSink::deliver(std::span<const EventRecord> events,
     TraceScope trace(anchor);
     return trace.result(m_isTcp ? deliverFrames(events, giveUp) : deliverDatagrams(events, giveUp));
 }
+
+} // namespace zrm::host

@@ -12,6 +12,8 @@
 #include <stop_token>
 #include <string>
 
+namespace zrm::host {
+
 /// Sends events as syslog messages: over TCP in frames that tell their length (RFC 6587), over
 /// UDP one in each datagram. The receiver of syslog acknowledges nothing. Over TCP, what its
 /// system had not acknowledged when the connection broke, and at the least the last delivery, is
@@ -38,5 +40,7 @@ private:
     Connection m_connection;
     std::deque<std::string> m_unsure; ///< deliveries that may be lost with the connection
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <algorithm>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"WebhookSink.cpp"};
@@ -80,3 +82,5 @@ std::size_t WebhookSink::deliver(std::span<const EventRecord> events,
     }
     return trace.result(delivered);
 }
+
+} // namespace zrm::host

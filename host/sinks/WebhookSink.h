@@ -10,6 +10,8 @@
 #include <stop_token>
 #include <string>
 
+namespace zrm::host {
+
 /// Posts events as {"events": [...]} to a URL, signed when there is a secret. A request that
 /// failed is repeated as it was, so that its receiver can tell that it has it already.
 class WebhookSink : public Sink {
@@ -33,5 +35,7 @@ private:
     std::size_t m_again = 0; ///< events of the request that failed and is to be repeated
     std::string m_error;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -7,6 +7,8 @@
 #include <chrono>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Situation.cpp"};
@@ -64,3 +66,5 @@ void Situation::stopped(const ctreq& /*request*/, unsigned reason) {
     trace.error()("The agent has stopped situation %s; reason = %u.", m_config.name.c_str(),
                   reason);
 }
+
+} // namespace zrm::host

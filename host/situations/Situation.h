@@ -13,6 +13,8 @@
 
 class TableManager;
 
+namespace zrm::host {
+
 /// One running situation: an open request on Log Entries whose rows become events. Opened and
 /// closed by one thread; rows arrive on the threads of the logs.
 class Situation : private RowReceiver {
@@ -44,5 +46,7 @@ private:
     std::atomic<unsigned> m_stopReason{0};
     Request m_request; ///< last: rows may arrive while it is built
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <atomic>
 #include <cstdint>
 
+namespace zrm::host {
+
 /// What a situation has done so far; outlives its requests, so that it goes on when the situation
 /// is stopped and started. Log threads count, one at a time; any thread reads, without a lock.
 class SituationCounts {
@@ -28,5 +30,7 @@ private:
     std::atomic<std::uint64_t> m_raised{0};
     std::atomic<std::int64_t> m_lastRaised{0};
 };
+
+} // namespace zrm::host
 
 #endif

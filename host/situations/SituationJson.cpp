@@ -5,6 +5,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -45,3 +47,5 @@ Json SituationJson::status(const SituationStatus& status) {
 std::string SituationJson::text(const Json& value) {
     return value.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
+
+} // namespace zrm::host

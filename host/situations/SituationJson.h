@@ -7,6 +7,8 @@
 
 #include <nlohmann/json_fwd.hpp>
 
+namespace zrm::host {
+
 struct SituationStatus;
 
 /// Situations as JSON objects. Stateless.
@@ -21,5 +23,7 @@ public:
     /// A value as text; bytes that are not UTF-8 are replaced.
     static std::string text(const nlohmann::ordered_json& value);
 };
+
+} // namespace zrm::host
 
 #endif

@@ -4,6 +4,8 @@
 
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"SituationRunner.cpp"};
@@ -137,3 +139,5 @@ void SituationRunner::bringToState(std::unique_lock<std::mutex>& lock, const std
         }
     }
 }
+
+} // namespace zrm::host

@@ -15,8 +15,11 @@
 #include <string>
 #include <thread>
 
-class EventQueue;
 class TableManager;
+
+namespace zrm::host {
+
+class EventQueue;
 
 /// Opens and closes situations on a thread of its own. Both wait for the table manager's lock, and
 /// so for a log thread that has it and waits for room in a full queue of events: whoever asks for
@@ -81,5 +84,7 @@ private:
     std::mutex m_closing; ///< one close at a time
     std::thread m_thread;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <algorithm>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"SituationSet.cpp"};
@@ -419,3 +421,5 @@ std::size_t SituationSet::size() const {
     const std::lock_guard guard(m_mutex);
     return m_records.size();
 }
+
+} // namespace zrm::host

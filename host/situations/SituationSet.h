@@ -21,6 +21,8 @@
 #include <variant>
 #include <vector>
 
+namespace zrm::host {
+
 /// Why the situations were not changed.
 struct SituationRefusal {
     enum class Reason {
@@ -133,5 +135,7 @@ private:
 
     SituationRunner m_runner; ///< guards itself
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <string>
 
+namespace zrm::host {
+
 /// How a situation stands at one moment.
 struct SituationStatus {
     enum Source { FILE, API };
@@ -22,5 +24,7 @@ struct SituationStatus {
     std::uint64_t raised = 0;
     std::int64_t lastRaised = 0; ///< milliseconds since 1970, UTC; 0: never
 };
+
+} // namespace zrm::host
 
 #endif

@@ -19,6 +19,8 @@
 
 #include <nlohmann/json.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"SituationStore.cpp"};
@@ -241,3 +243,5 @@ std::string SituationStore::replace(std::string_view text) const {
     syncDirectory(directory);
     return "";
 }
+
+} // namespace zrm::host

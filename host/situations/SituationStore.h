@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+namespace zrm::host {
+
 /// What of the situations outlives the process: those made through the API, and which of all are
 /// stopped. One file, of a version that it names, written as a whole: to a temporary beside it that
 /// is synced and renamed, so that it is the old or the new one whenever the process or the machine
@@ -43,5 +45,7 @@ private:
     const std::string m_path;
     std::string m_blocked; ///< why nothing may be saved; empty: it may
 };
+
+} // namespace zrm::host
 
 #endif

@@ -6,6 +6,9 @@
 
 #include <cstdio>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 TRC1_Anchor anchor{"AgentCalls.cpp"};

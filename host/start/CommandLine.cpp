@@ -7,6 +7,8 @@
 
 #include <CLI/CLI.hpp>
 
+namespace zrm::host {
+
 namespace {
 
 /// The values of the options.
@@ -107,3 +109,5 @@ std::string CommandLine::help() {
                   "agent.\nExit status: 0 after an orderly end, 2 for an unusable command line or "
                   "configuration,\n255 after a failure.\n";
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <span>
 #include <string>
 
+namespace zrm::host {
+
 /// The command line of zrmagent, read.
 class CommandLine {
 public:
@@ -27,5 +29,7 @@ private:
     std::string m_traceFile;
     std::string m_error;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -8,6 +8,8 @@
 
 #include <sys/resource.h>
 
+namespace zrm::host {
+
 namespace {
 
 /// Far more logs than one agent has; a limit without an end costs memory in other programs' ways of
@@ -38,3 +40,5 @@ void Descriptors::tick() {
     }
     m_seen = failures;
 }
+
+} // namespace zrm::host

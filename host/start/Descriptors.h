@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm::host {
+
 /// The process's descriptors: one for each log, beside those of HTTP, the history and the sinks.
 class Descriptors {
 public:
@@ -18,5 +20,7 @@ private:
     std::uint64_t m_seen = 0; ///< at the last call
     std::uint64_t m_told = 0;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -13,6 +13,8 @@
 #include <utility>
 #include <variant>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Host.cpp"};
@@ -220,3 +222,5 @@ void Host::shutdown() {
         m_serving->deliverRest(Clock::now() + endLimit);
     }
 }
+
+} // namespace zrm::host

@@ -14,6 +14,8 @@
 #include <thread>
 #include <vector>
 
+namespace zrm::host {
+
 /// The standalone host of this process, behind the framework calls of the agent's start-up and
 /// end. One per process, never destroyed, so that threads which outlive main may use it.
 ///
@@ -77,5 +79,7 @@ private:
     bool m_processEnds = false; ///< the process ends without the main thread
     std::thread::id m_mainThread;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -21,6 +21,9 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 constexpr const char* defaultConfig = "/etc/zrm/zrm.toml";

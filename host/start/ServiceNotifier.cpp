@@ -12,6 +12,8 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"ServiceNotifier.cpp"};
@@ -65,3 +67,5 @@ void ServiceNotifier::send(const char* message) const {
     trace.error()("Cannot tell the service manager %s at %s. errno = %d; %s.", message,
                   m_address.c_str(), error.number(), error.text());
 }
+
+} // namespace zrm::host

@@ -4,6 +4,8 @@
 #include <string>
 #include <utility>
 
+namespace zrm::host {
+
 /// Tells the service manager that started this process how it is doing: one datagram per message
 /// to the socket that NOTIFY_SOCKET names. Without a service manager every message goes nowhere.
 /// Immutable; any thread.
@@ -30,5 +32,7 @@ private:
 
     std::string m_address;
 };
+
+} // namespace zrm::host
 
 #endif

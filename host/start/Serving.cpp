@@ -33,6 +33,8 @@
 #include <system_error>
 #include <utility>
 
+namespace zrm::host {
+
 namespace {
 
 TRC1_Anchor anchor{"Serving.cpp"};
@@ -214,3 +216,5 @@ void Serving::stop(Clock::time_point limit) {
             entries);
     }
 }
+
+} // namespace zrm::host

@@ -20,9 +20,12 @@
 #include <optional>
 #include <vector>
 
+class TableManager;
+
+namespace zrm::host {
+
 class AnalysisResource;
 class EventStream;
-class TableManager;
 class Watchdog;
 
 /// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
@@ -90,5 +93,7 @@ private:
     std::optional<Credentials> m_credentials;           ///< none: HTTP is off
     HttpServer m_http;
 };
+
+} // namespace zrm::host
 
 #endif

@@ -3,6 +3,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 void StandardStreams::fill() noexcept {
     // For reading alone: who writes to it is told so, instead of losing what was written.
     int fd = open("/dev/null", O_RDONLY);
@@ -13,3 +15,5 @@ void StandardStreams::fill() noexcept {
         close(fd);
     }
 }
+
+} // namespace zrm::host

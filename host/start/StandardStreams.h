@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_STANDARD_STREAMS_H
 #define ZRM_HOST_STANDARD_STREAMS_H
 
+namespace zrm::host {
+
 /// The descriptors 0, 1 and 2, which a program may be started without. Stateless.
 class StandardStreams {
 public:
@@ -9,5 +11,7 @@ public:
     /// written into logs and databases. Before the program opens anything.
     static void fill() noexcept;
 };
+
+} // namespace zrm::host
 
 #endif

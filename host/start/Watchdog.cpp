@@ -11,6 +11,8 @@
 #include <signal.h>
 #include <unistd.h>
 
+namespace zrm::host {
+
 namespace {
 
 constexpr std::chrono::milliseconds lookInterval{200};
@@ -115,3 +117,5 @@ void Watchdog::lookAtPulses() {
                                   : named.c_str());
     }
 }
+
+} // namespace zrm::host

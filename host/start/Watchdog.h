@@ -9,6 +9,8 @@
 #include <string>
 #include <thread>
 
+namespace zrm::host {
+
 /// Looks after the agent on a thread of its own, which waits for nothing of the agent's: that the
 /// signals which end it are obeyed although the log manager's thread, which takes them, is stuck;
 /// that an end which has begun comes to an end; and that the manager and the logs' threads move.
@@ -55,5 +57,7 @@ private:
     mutable std::mutex m_mutex; ///< guards what follows
     std::string m_problem;
 };
+
+} // namespace zrm::host
 
 #endif

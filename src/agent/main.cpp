@@ -1,5 +1,7 @@
 #include "agent/zrmmain.h"
 
+using namespace zrm;
+
 int main(int argc, char** argv) {
     return zrmMain(argc, argv);
 }

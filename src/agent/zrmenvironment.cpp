@@ -12,6 +12,8 @@
 
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrmenvironment.cpp"};
@@ -179,3 +181,5 @@ long printPathconfLimit(const char* format, int name, const char* path) {
     return trace.result(
         printLimit(trace, format, value, errno, name, "pathconf", ">> No limit <<"));
 }
+
+} // namespace zrm

@@ -18,6 +18,8 @@
 #include <signal.h>
 #include <sys/utsname.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrmmain.cpp"};
@@ -126,3 +128,5 @@ void shutDown() {
     std::fflush(stdout);
     AGF_Shutdown(1);
 }
+
+} // namespace zrm

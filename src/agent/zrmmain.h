@@ -1,6 +1,8 @@
 #ifndef ZRM_ZRMMAIN_H
 #define ZRM_ZRMMAIN_H
 
+namespace zrm {
+
 /// The life of the agent's process: starts it, gives control to the framework's main loop and
 /// returns that loop's status. Ends the process with status 255 when the start fails.
 int zrmMain(int argc, char** argv);
@@ -22,5 +24,7 @@ int loadAgents();
 /// The exit routine: destroys the log manager, if there is one, and tells the framework. On
 /// whichever thread ends the process.
 void shutDown();
+
+} // namespace zrm
 
 #endif

@@ -7,6 +7,8 @@
 #include <ctime>
 #include <limits>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"BrevanTime.cpp"};
@@ -48,3 +50,5 @@ void BrevanTime::generateCurrentTimestamp(char* out) {
     }
     std::memcpy(out, currentStamp.text, stampLength);
 }
+
+} // namespace zrm

@@ -1,6 +1,8 @@
 #ifndef ZRM_BREVAN_TIME_H
 #define ZRM_BREVAN_TIME_H
 
+namespace zrm {
+
 /// The 16-character time stamp CYYMMDDhhmmss000, in local time, of which the first three characters
 /// are the years since 1900.
 class BrevanTime {
@@ -11,5 +13,7 @@ public:
     /// The same for the current time; asks the system for the time zone once per second and thread.
     static void generateCurrentTimestamp(char* out);
 };
+
+} // namespace zrm
 
 #endif

@@ -4,6 +4,8 @@
 #include <array>
 #include <cstring>
 
+namespace zrm {
+
 /// The numbers from 0 to 99 as two digits each, which spares the per-line path its divisions.
 namespace DigitPairs {
 
@@ -22,5 +24,7 @@ inline void put(char* out, unsigned number) noexcept {
 }
 
 } // namespace DigitPairs
+
+} // namespace zrm
 
 #endif

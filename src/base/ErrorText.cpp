@@ -2,6 +2,8 @@
 
 #include <string.h>
 
+namespace zrm {
+
 namespace {
 
 // strerror_r comes in two forms; overloads take whichever the system has.
@@ -20,3 +22,5 @@ ErrorText::ErrorText(int number) noexcept : m_number(number), m_buffer{} {
         m_text = "Unknown error";
     }
 }
+
+} // namespace zrm

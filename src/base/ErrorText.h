@@ -1,6 +1,8 @@
 #ifndef ZRM_ERROR_TEXT_H
 #define ZRM_ERROR_TEXT_H
 
+namespace zrm {
+
 /// The number and text of a system error, for the "errno = %d; %s" and "Return code = %d; %s" of
 /// messages. Unlike strerror it shares no buffer between threads. The text is "Unknown error"
 /// where the system has none.
@@ -18,5 +20,7 @@ private:
     const char* m_text;
     char m_buffer[128];
 };
+
+} // namespace zrm
 
 #endif

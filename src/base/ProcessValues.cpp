@@ -3,6 +3,10 @@
 
 #include "base/ProcessValues.h"
 
+namespace zrm {
+
 char* gSystemName = nullptr;
 char* gHostName = nullptr;
 std::int32_t gMaxRows = 1000;
+
+} // namespace zrm

@@ -2,6 +2,8 @@
 
 #include <cstring>
 
+namespace zrm {
+
 void RowBytes::blank(char* bytes, std::size_t length) noexcept {
     std::memset(bytes, ' ', length);
 }
@@ -9,3 +11,5 @@ void RowBytes::blank(char* bytes, std::size_t length) noexcept {
 void RowBytes::copy(char* bytes, const char* from, std::size_t length) noexcept {
     std::memcpy(bytes, from, length);
 }
+
+} // namespace zrm

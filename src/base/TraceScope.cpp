@@ -2,6 +2,8 @@
 
 #include <cstdarg>
 
+namespace zrm {
+
 void TraceScope::Record::operator()(const char* format, ...) const noexcept {
     if (m_anchor == nullptr) {
         return;
@@ -11,3 +13,5 @@ void TraceScope::Record::operator()(const char* format, ...) const noexcept {
     TRC1_VPrintf(*m_anchor, m_line, format, arguments);
     va_end(arguments);
 }
+
+} // namespace zrm

@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <type_traits>
 
+namespace zrm {
+
 /// Traces one operation: construction reads the source file's trace level and writes the entry
 /// event, destruction writes the exit event on every return path. Lives on the stack of one
 /// thread. An operation on the per-line path pays a few instructions for it: that takes a
@@ -84,5 +86,7 @@ private:
     bool m_hasResult = false;
     long m_result = 0;
 };
+
+} // namespace zrm
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <atomic>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"UTF8Conv.cpp"};
@@ -83,3 +85,5 @@ std::int32_t UTF8Conv::Convert_fromUTF8(char* out, std::size_t outSize, const ch
     }
     return trace.result(translate(trace, codePage, out, outSize, LOC2_UTF8, in, inLength, 0));
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace zrm {
+
 /// Conversion between the process's local code page and UTF-8. Both operations return the number
 /// of bytes written, 0 when nothing was converted (no locale, no code page); then `out` is left as
 /// it was. Any thread.
@@ -17,5 +19,7 @@ public:
     static std::int32_t Convert_fromUTF8(char* out, std::size_t outSize, const char* in,
                                          std::size_t inLength);
 };
+
+} // namespace zrm
 
 #endif

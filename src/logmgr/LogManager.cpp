@@ -12,6 +12,8 @@
 
 #include <time.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogManager.cpp"};
@@ -267,3 +269,5 @@ void LogManager::printSelf() const {
         Dump<sizeof AgentServerNotUp>(&AgentServerNotUp).text(), textOf(DebugLog),
         static_cast<void*>(DebugLogP.load()));
 }
+
+} // namespace zrm

@@ -13,6 +13,8 @@
 
 #include <pthread.h>
 
+namespace zrm {
+
 class LogFile;
 
 /// The single owner of everything that is monitored. Its manager thread reads the configuration,
@@ -129,5 +131,7 @@ extern std::atomic<LogManager*> pTheLogManager;
 
 /// The manager thread's start routine; its argument is the LogManager.
 void* managerThread(void* manager);
+
+} // namespace zrm
 
 #endif

@@ -8,6 +8,8 @@
 #include <cstdlib>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogManagerConfig.cpp"};
@@ -86,3 +88,5 @@ std::uint32_t LogManager::createValidLogList(WhenceConfig whence, const char* pa
     }
     return trace.result(count);
 }
+
+} // namespace zrm

@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogManagerRefresh.cpp"};
@@ -216,3 +218,5 @@ void LogManager::retireLogObject(LogFile* log) {
     log->addToChain(nullptr); // its destructor finds nobody to unlink it from
     --NumLogs;
 }
+
+} // namespace zrm

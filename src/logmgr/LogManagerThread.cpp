@@ -13,6 +13,8 @@
 #include <time.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogManagerThread.cpp"};
@@ -228,3 +230,5 @@ int LogManager::waitFor(pthread_cond_t& condition, const timespec* limit) {
     pthread_cleanup_pop(0);
     return code;
 }
+
+} // namespace zrm

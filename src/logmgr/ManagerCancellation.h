@@ -3,6 +3,8 @@
 
 #include <pthread.h>
 
+namespace zrm {
+
 /// Lets the manager thread be cancelled while it lives: around the calls in which the thread waits.
 /// Everywhere else cancellation is forbidden, since files, locks and half-built chains would be
 /// left behind, and since a cancellation cannot unwind through the noexcept calls of the trace.
@@ -22,5 +24,7 @@ private:
         pthread_setcancelstate(state, &previous);
     }
 };
+
+} // namespace zrm
 
 #endif

@@ -2,4 +2,8 @@
 
 #include "logmgr/LogManager.h"
 
+namespace zrm {
+
 std::atomic<LogManager*> pTheLogManager{nullptr};
+
+} // namespace zrm

@@ -8,6 +8,8 @@
 #include <new>
 #include <string_view>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogBase.cpp"};
@@ -131,3 +133,5 @@ void LogBase::printSelf() const {
                    static_cast<long>(LogPathNameLengthUTF8), fileNameLocal(),
                    static_cast<long>(LogPathNameLengthLocal), debugMode(), LogType, procedure());
 }
+
+} // namespace zrm

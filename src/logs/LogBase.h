@@ -5,6 +5,8 @@
 #include <cstddef>
 #include <memory>
 
+namespace zrm {
+
 /// Returns a heap copy of `name` and sets `pathLength` to the length of its directory part with
 /// the last '/', 0 (and an error in the trace) when it has none. Ends the process when memory runs
 /// out.
@@ -62,5 +64,7 @@ protected:
     std::size_t LogPathNameLengthLocal = 0;
     std::size_t LogPathNameLengthUTF8 = 0;
 };
+
+} // namespace zrm
 
 #endif

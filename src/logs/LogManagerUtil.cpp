@@ -13,6 +13,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogManagerUtil.cpp"};
@@ -140,3 +142,5 @@ char* LogManagerUtil::xtoa(char* out, const void* /*data*/, std::size_t /*length
     *out = '\0';
     return out;
 }
+
+} // namespace zrm

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <ctime>
 
+namespace zrm {
+
 /// Helpers of the log manager.
 namespace LogManagerUtil {
 
@@ -34,5 +36,7 @@ char* getNextRec(const char* path);
 char* xtoa(char* out, const void* data, std::size_t length);
 
 } // namespace LogManagerUtil
+
+} // namespace zrm
 
 #endif

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// A report's time window and a situation's event-rate thresholds. Handed by address to the log
 /// types' report operations.
 struct _RequestThresholds {
@@ -11,5 +13,7 @@ struct _RequestThresholds {
     std::int64_t freqThreshold;   ///< N: at least N entries in the period; -N: at most N; 0: none
     std::int64_t periodThreshold; ///< seconds; 0: none
 };
+
+} // namespace zrm
 
 #endif

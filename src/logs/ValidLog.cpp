@@ -13,6 +13,8 @@
 
 #include <sys/utsname.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"ValidLog.cpp"};
@@ -295,3 +297,5 @@ void ValidLog::printSelf() const {
     LogBase::printSelf();
     trace.always()("\n\tValid\t\t\t= %d\n", static_cast<int>(Valid));
 }
+
+} // namespace zrm

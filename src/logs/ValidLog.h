@@ -3,6 +3,8 @@
 
 #include "logs/LogBase.h"
 
+namespace zrm {
+
 class TraceScope;
 
 /// Where a line comes from.
@@ -52,5 +54,7 @@ private:
 
     bool Valid = true;
 };
+
+} // namespace zrm
 
 #endif

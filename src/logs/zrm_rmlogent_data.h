@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace zrm {
+
 /// One Log Entries row. Character columns are blank-padded and not terminated; the framework reads
 /// the columns by offset and width, so the layout is fixed.
 struct zrm_rmlogent_data_t {
@@ -37,5 +39,7 @@ static_assert(offsetof(zrm_rmlogent_data_t, uentrydesc) == 2096);
 
 /// The framework has no room now: nothing was offered. To the logs alone.
 inline constexpr unsigned tableNoRoom = 0x21060008;
+
+} // namespace zrm
 
 #endif

@@ -12,6 +12,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"AdminLogFile.cpp"};
@@ -179,3 +181,5 @@ bool AdminLogFile::deliverRecord(char* record) {
     }
     return true;
 }
+
+} // namespace zrm

@@ -7,6 +7,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace zrm {
+
 /// A login accounting log: a file of 40-byte binary records, each of which becomes one row. Life
 /// and threads are those of every LogFile: the log's own thread follows the file's end, a report
 /// reads the file backwards on its request's thread.
@@ -62,5 +64,7 @@ static_assert(sizeof(AdminLogFile::utmp) == AdminLogFile::recordLength);
 static_assert(offsetof(AdminLogFile::utmp, ut_line) == 12);
 static_assert(offsetof(AdminLogFile::utmp, ut_pid) == 24);
 static_assert(offsetof(AdminLogFile::utmp, ut_time) == 32);
+
+} // namespace zrm
 
 #endif

@@ -10,6 +10,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"AdminLogFileReport.cpp"};
@@ -116,3 +118,5 @@ void AdminLogFile::deallocateReportBuffers(_LogBufferInfo** reportState) {
     }
     *reportState = nullptr;
 }
+
+} // namespace zrm

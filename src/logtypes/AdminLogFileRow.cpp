@@ -12,6 +12,8 @@
 #include <cstring>
 #include <string_view>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"AdminLogFileRow.cpp"};
@@ -111,3 +113,5 @@ void AdminLogFile::formatEntryDesc(char* dest, unsigned long room, const utmp* r
     TraceScope trace(anchor);
     Description(*record).write(dest, room, toUTF8 != 0);
 }
+
+} // namespace zrm

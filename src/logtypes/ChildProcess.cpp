@@ -9,6 +9,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 /// How long a child may take that has been asked to end.
@@ -90,3 +92,5 @@ const char* ExecErrorTexts::text(int number) const noexcept {
     }
     return "Unknown error";
 }
+
+} // namespace zrm

@@ -5,6 +5,8 @@
 
 #include <sys/types.h>
 
+namespace zrm {
+
 /// The system's side of running a command whose standard output the agent reads through a pipe.
 ///
 /// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
@@ -39,5 +41,7 @@ public:
 private:
     ErrorText m_texts[12];
 };
+
+} // namespace zrm
 
 #endif

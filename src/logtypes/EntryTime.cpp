@@ -7,6 +7,8 @@
 #include <ctime>
 #include <limits>
 
+namespace zrm {
+
 namespace {
 
 constexpr long yearsOfCentury = 100;
@@ -105,3 +107,5 @@ int EntryTime::write(char* out) const noexcept {
     }
     return length;
 }
+
+} // namespace zrm

@@ -1,6 +1,8 @@
 #ifndef ZRM_ENTRY_TIME_H
 #define ZRM_ENTRY_TIME_H
 
+namespace zrm {
+
 /// The parts of a user log entry's time, as far as they are known.
 struct EntryTime {
     static constexpr long unknown = -1;
@@ -28,5 +30,7 @@ struct EntryTime {
     /// The current local date: century, year, month and day; the rest unknown. False as above.
     static bool today(EntryTime& date) noexcept;
 };
+
+} // namespace zrm
 
 #endif

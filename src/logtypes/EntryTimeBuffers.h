@@ -1,6 +1,8 @@
 #ifndef ZRM_ENTRY_TIME_BUFFERS_H
 #define ZRM_ENTRY_TIME_BUFFERS_H
 
+namespace zrm {
+
 /// The texts of one entry's time fields, terminated; an empty one was not in the entry.
 struct _EntryTimeBuffers {
     static constexpr int room = 7; ///< characters of each
@@ -12,5 +14,7 @@ struct _EntryTimeBuffers {
     char minute[room + 1];
     char second[room + 1];
 };
+
+} // namespace zrm
 
 #endif

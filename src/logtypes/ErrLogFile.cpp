@@ -9,6 +9,8 @@
 #include <poll.h>
 #include <sys/select.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"ErrLogFile.cpp"};
@@ -151,3 +153,5 @@ void ErrLogFile::deliverLine() {
         writeToDebugLog(m_line, std::strlen(m_line), nullptr, 0);
     }
 }
+
+} // namespace zrm

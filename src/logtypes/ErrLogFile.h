@@ -10,6 +10,8 @@
 
 #include <sys/types.h>
 
+namespace zrm {
+
 class ExecErrorTexts;
 class TraceScope;
 struct _RequestThresholds;
@@ -104,5 +106,7 @@ private:
     char m_line[256]; ///< the line last read, or the part of the next one that has come so far
     std::size_t m_lineLength = 0;
 };
+
+} // namespace zrm
 
 #endif

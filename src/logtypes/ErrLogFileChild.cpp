@@ -13,6 +13,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"ErrLogFileChild.cpp"};
@@ -222,3 +224,5 @@ void ErrLogFile::closePipe(std::FILE** stream) {
     }
     *stream = nullptr;
 }
+
+} // namespace zrm

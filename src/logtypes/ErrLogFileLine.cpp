@@ -10,6 +10,8 @@
 #include <cctype>
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"ErrLogFileLine.cpp"};
@@ -105,3 +107,5 @@ void ErrLogFile::formatDescription(char* dest, const char* line, const char* res
         UTF8Conv::Convert_toUTF8(dest, size, text, length, LOC2_NO_TERMINATOR);
     }
 }
+
+} // namespace zrm

@@ -16,6 +16,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"ErrLogFileReport.cpp"};
@@ -226,3 +228,5 @@ void ErrLogFile::waitForReportChild(const ErrlogBufferInfo* info) const {
         printChildStatus(ended, status, info->command);
     }
 }
+
+} // namespace zrm

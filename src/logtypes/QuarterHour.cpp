@@ -5,6 +5,8 @@
 
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 constexpr std::int64_t length = 900;
@@ -57,3 +59,5 @@ void QuarterHour::enter(std::int64_t time) {
                   secondOfHour(last) - m_secondOfHour == length - 1;
     std::memcpy(m_hour, first, hourLength);
 }
+
+} // namespace zrm

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// Makes time stamps of times that lie close together: asks the system for the local time once per
 /// quarter of an hour, within which only minute and second change. One thread.
 class QuarterHour {
@@ -19,5 +21,7 @@ private:
     char m_hour[9];           ///< CYYMMDDhh
     int m_secondOfHour = 0;   ///< at its start
 };
+
+} // namespace zrm
 
 #endif

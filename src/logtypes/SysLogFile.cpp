@@ -18,6 +18,8 @@
 #include <cstring>
 #include <string_view>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"SysLogFile.cpp"};
@@ -242,3 +244,5 @@ char* SysLogFile::extractSource(char* out, char* text, unsigned int max, const c
     }
     return trace.result(*end != '\0' ? end + 1 : end);
 }
+
+} // namespace zrm

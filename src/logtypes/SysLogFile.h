@@ -3,6 +3,8 @@
 
 #include "monitor/LogFile.h"
 
+namespace zrm {
+
 struct SyslogBufferInfo;
 
 /// A file written by the system logger: lines of month, day, time, host, source and message, in
@@ -44,5 +46,7 @@ private:
     bool cutLongLine(SyslogBufferInfo& state);
     bool refill(SyslogBufferInfo& state);
 };
+
+} // namespace zrm
 
 #endif

@@ -12,6 +12,8 @@
 #include <ctime>
 #include <new>
 
+namespace zrm {
+
 // Reports on a syslog file, newest entry first.
 
 namespace {
@@ -177,3 +179,5 @@ void SysLogFile::deallocateReportBuffers(SyslogBufferInfo** reportState) {
     delete *reportState;
     *reportState = nullptr;
 }
+
+} // namespace zrm

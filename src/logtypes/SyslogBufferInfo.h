@@ -5,6 +5,8 @@
 
 #include <memory>
 
+namespace zrm {
+
 /// The state of one report on a syslog file.
 struct SyslogBufferInfo : _LogBufferInfo {
     /// ENTRYTIME of the entry formatted last, at first the time of the report's start: it tells
@@ -12,5 +14,7 @@ struct SyslogBufferInfo : _LogBufferInfo {
     char timestamp[16];
     std::unique_ptr<char[]> block; ///< owns what pBuffer points to
 };
+
+} // namespace zrm
 
 #endif

@@ -14,6 +14,8 @@
 #include <new>
 #include <utility>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"UserLogFile.cpp"};
@@ -147,3 +149,5 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
                      lengthInUTF8);
     return trace.result(0L);
 }
+
+} // namespace zrm

@@ -7,6 +7,8 @@
 #include <cstdint>
 #include <memory>
 
+namespace zrm {
+
 class StringParser;
 struct _KeywordFields;
 struct EntryTime;
@@ -72,5 +74,7 @@ private:
     /// Guards SPAnchor, the receiving variables of its chain, and NumericMonth.
     mutable SYS1_Lock m_chainLock;
 };
+
+} // namespace zrm
 
 #endif

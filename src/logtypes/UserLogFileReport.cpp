@@ -13,6 +13,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"UserLogFileReport.cpp"};
@@ -194,3 +196,5 @@ void UserLogFile::deallocateReportBuffers(UserlogBufferInfo** bufferInfo) {
     delete *bufferInfo;
     *bufferInfo = nullptr;
 }
+
+} // namespace zrm

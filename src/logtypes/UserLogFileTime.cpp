@@ -10,6 +10,8 @@
 #include <cstring>
 #include <iterator>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"UserLogFileTime.cpp"};
@@ -237,3 +239,5 @@ void UserLogFile::readSecond(const char* text, EntryTime& time) const {
     }
     time.second = number.value;
 }
+
+} // namespace zrm

@@ -5,6 +5,8 @@
 
 #include <memory>
 
+namespace zrm {
+
 /// The state of one report on a user log: besides the reading state a date, at first today's, then
 /// that of the entry read last. It dates the entries of a log without years.
 struct UserlogBufferInfo : _LogBufferInfo {
@@ -14,5 +16,7 @@ struct UserlogBufferInfo : _LogBufferInfo {
     long day;
     std::unique_ptr<char[]> block; ///< owns what pBuffer points to
 };
+
+} // namespace zrm
 
 #endif

@@ -8,6 +8,8 @@
 
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 template <typename Kind> LogFile* create(const ValidLog& log, LogFile* chainHead) {
@@ -44,3 +46,5 @@ bool isKnownLogType(char type) noexcept {
 LogFile* createLogFile(const ValidLog& log, LogFile* chainHead) {
     return findKind(log.type())->create(log, chainHead);
 }
+
+} // namespace zrm

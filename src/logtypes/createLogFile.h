@@ -1,6 +1,8 @@
 #ifndef ZRM_CREATE_LOG_FILE_H
 #define ZRM_CREATE_LOG_FILE_H
 
+namespace zrm {
+
 class LogFile;
 class ValidLog;
 
@@ -10,5 +12,7 @@ bool isKnownLogType(char type) noexcept;
 /// Creates the monitoring object of the log's type, linked behind `chainHead` and with its thread
 /// started; null when memory runs out. The type must be known. The caller owns the object.
 LogFile* createLogFile(const ValidLog& log, LogFile* chainHead);
+
+} // namespace zrm
 
 #endif

@@ -3,11 +3,15 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// Records that the debug log did not take whole, since the start. Any thread.
 namespace DebugLogLoss {
 
 std::uint64_t records() noexcept;
 
 } // namespace DebugLogLoss
+
+} // namespace zrm
 
 #endif

@@ -6,6 +6,8 @@
 
 #include <sys/resource.h>
 
+namespace zrm {
+
 namespace {
 
 constexpr rlim_t mostReserved = 256;
@@ -41,3 +43,5 @@ void DescriptorReserve::noteFailure(int number) noexcept {
 std::uint64_t DescriptorReserve::failures() noexcept {
     return failed.load(std::memory_order_relaxed);
 }
+
+} // namespace zrm

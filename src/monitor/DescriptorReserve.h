@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// The part of the process's descriptors that logs leave to everything else: however many logs
 /// there are, the framework can be reached, and what it stores and delivers finds descriptors. Any
 /// thread.
@@ -22,5 +24,7 @@ void noteFailure(int number) noexcept;
 std::uint64_t failures() noexcept;
 
 } // namespace DescriptorReserve
+
+} // namespace zrm
 
 #endif

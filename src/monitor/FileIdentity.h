@@ -3,6 +3,8 @@
 
 #include <sys/types.h>
 
+namespace zrm {
+
 /// Which file it is, whatever its name at present.
 struct FileIdentity {
     dev_t device;
@@ -10,5 +12,7 @@ struct FileIdentity {
 
     bool operator==(const FileIdentity&) const = default;
 };
+
+} // namespace zrm
 
 #endif

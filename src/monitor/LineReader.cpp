@@ -7,6 +7,8 @@
 
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 constexpr std::size_t blockSize = 256 * 1024;
@@ -88,3 +90,5 @@ char* LineReader::take(std::size_t length) noexcept {
     m_isTerminated = true;
     return piece;
 }
+
+} // namespace zrm

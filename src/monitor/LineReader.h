@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <memory>
 
+namespace zrm {
+
 /// Reads the lines behind a descriptor in the pieces that fgets with a buffer of 2048 bytes gives:
 /// at most 2047 characters each, the newline kept, a last line without one as it stands. Reads
 /// large blocks and terminates each piece in place, so that a line costs neither a copy nor a lock.
@@ -38,5 +40,7 @@ private:
     int m_fd = -1;
     int m_error = 0;
 };
+
+} // namespace zrm
 
 #endif

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// The reading state of one report that reads a log backwards, block by block. Owned by the log
 /// type's report state. The descriptor stands at the start of the block last read (at the file's
 /// end right after opening).
@@ -16,5 +18,7 @@ struct _LogBufferInfo {
     /// Another report may change that size while this one reads.
     std::int64_t blockSize = 0;
 };
+
+} // namespace zrm
 
 #endif

@@ -13,6 +13,8 @@
 #include <cstring>
 #include <string_view>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"LogFile.cpp"};
@@ -303,3 +305,5 @@ void LogFile::printSelf() const {
         static_cast<long>(OptimumBlockSize.load()),
         LogManagerUtil::xtoa(debugFileLock, &m_debugFileLock, sizeof m_debugFileLock));
 }
+
+} // namespace zrm

@@ -19,6 +19,8 @@
 #include <pthread.h>
 #include <sys/time.h>
 
+namespace zrm {
+
 class ValidLog;
 
 /// One monitored log with one thread of its own, which tails it and turns new entries into Log
@@ -187,5 +189,7 @@ private:
 
 /// The monitoring thread's start routine; its argument is the LogFile.
 void* logThread(void* logFile);
+
+} // namespace zrm
 
 #endif

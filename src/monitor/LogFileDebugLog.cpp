@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <utility>
 
+namespace zrm {
+
 // The debug log that all logs share: every entry as it was read, and the row built from it.
 
 namespace {
@@ -149,3 +151,5 @@ void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long le
         trace.detail()("%s monitor detected event.", fileNameLocal());
     }
 }
+
+} // namespace zrm

@@ -12,6 +12,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm {
+
 // Reading a log backwards for a report, block by block, on the thread of the report's request and
 // through a descriptor of the report's own.
 
@@ -140,3 +142,5 @@ void LogFile::closeLogForReport(int fd) {
     }
     trace.detail()("fd %d closed for report on %s.", fd, fileNameLocal());
 }
+
+} // namespace zrm

@@ -13,6 +13,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm {
+
 // Following a log's growth, on the log's own thread.
 
 namespace {
@@ -258,3 +260,5 @@ long LogFile::readLog() {
     }
     return trace.result(0L);
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 class LedgerGuard {
@@ -99,3 +101,5 @@ std::size_t LogLedger::copySkipped(SkippedRange* ranges) const noexcept {
     const LedgerGuard guard(m_lock);
     return m_skippedRanges.copy(ranges);
 }
+
+} // namespace zrm

@@ -11,6 +11,8 @@
 #include <memory>
 #include <optional>
 
+namespace zrm {
+
 /// What one log's monitor has read and what it has passed over, since the log is monitored; beside
 /// the numbers of lines and of format errors, which the log itself counts. The log's thread writes,
 /// any thread reads. Reading costs the log's thread nothing: it takes the lock only for a line that
@@ -109,5 +111,7 @@ private:
     Latest<RejectedLine> m_rejectedLines;
     Latest<SkippedRange> m_skippedRanges;
 };
+
+} // namespace zrm
 
 #endif

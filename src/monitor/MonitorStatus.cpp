@@ -2,6 +2,8 @@
 
 #include <iterator>
 
+namespace zrm {
+
 namespace {
 
 // From the lowest value to the highest, without a gap.
@@ -34,3 +36,5 @@ const char* monitorStatusText(_MonitorStatus status) noexcept {
     }
     return statusTexts[status - MONITOR_ERR_NO_MEMORY];
 }
+
+} // namespace zrm

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// State of a log's monitor. Only MONITOR_RUNNING keeps its wait loop going; negative values are
 /// error states.
 enum _MonitorStatus : std::int32_t {
@@ -27,5 +29,7 @@ enum _MonitorStatus : std::int32_t {
 
 /// The status's display text; "Error: unknown" for a value that is none of the above.
 const char* monitorStatusText(_MonitorStatus status) noexcept;
+
+} // namespace zrm
 
 #endif

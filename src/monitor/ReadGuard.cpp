@@ -10,6 +10,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace zrm {
+
 namespace {
 
 constexpr int mostCopies = 100; ///< files looked into; a directory may hold any number
@@ -97,3 +99,5 @@ std::int64_t ReadGuard::unreadInCopy(int fd, const char* path) const noexcept {
     }
     return unread;
 }
+
+} // namespace zrm

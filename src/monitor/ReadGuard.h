@@ -5,6 +5,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace zrm {
+
 /// The last bytes in front of the place to which a log has been read. They tell whether the file
 /// still holds what was read, even when it was truncated and has grown past that place again
 /// between two looks. Costs one read per look at a log that has grown, nothing per line. One
@@ -31,5 +33,7 @@ private:
     std::size_t m_length = 0;
     std::int64_t m_from = 0; ///< offset of the first byte
 };
+
+} // namespace zrm
 
 #endif

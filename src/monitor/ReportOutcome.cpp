@@ -1,5 +1,7 @@
 #include "monitor/ReportOutcome.h"
 
+namespace zrm {
+
 namespace {
 
 thread_local ReportOutcome* current = nullptr;
@@ -53,3 +55,5 @@ const char* ReportOutcome::reason() const noexcept {
     }
     return "";
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+namespace zrm {
+
 /// Why a report ended.
 enum class ReportEnd {
     complete, ///< at the beginning of the window or of the log
@@ -50,5 +52,7 @@ private:
     ReportEnd m_end = ReportEnd::complete;
     std::string m_reached;
 };
+
+} // namespace zrm
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <cstring>
 
+namespace zrm {
+
 /// Where one directive is put together while it is learned: the place in the format text and the
 /// directive built so far. One thread, one directive.
 struct _BuildArea {
@@ -37,5 +39,7 @@ struct _BuildArea {
     char buffer[limit + 1] = "";
     std::size_t count = 0; ///< characters in the buffer
 };
+
+} // namespace zrm
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <iterator>
 
+namespace zrm {
+
 namespace {
 
 using enum Receiver;
@@ -57,3 +59,5 @@ std::size_t receiverSize(Receiver receiver) noexcept {
         sizeof(double),       sizeof(long double),  sizeof(char),         sizeof(char)};
     return sizes[static_cast<std::size_t>(receiver)];
 }
+
+} // namespace zrm

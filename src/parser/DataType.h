@@ -3,6 +3,8 @@
 
 #include <cstddef>
 
+namespace zrm {
+
 /// Type of a scanned field: the base of the size modifier plus the number of the conversion code.
 enum _DataType : int {
     DATATYPE_BAD = -1, ///< the size modifier could not be read
@@ -97,5 +99,7 @@ const DataTypeInfo* findDataType(_DataType type) noexcept;
 
 /// Bytes of the receiving variable; 1 for a text, of which the width says how many it has.
 std::size_t receiverSize(Receiver receiver) noexcept;
+
+} // namespace zrm
 
 #endif

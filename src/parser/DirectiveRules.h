@@ -5,6 +5,8 @@
 
 #include <string_view>
 
+namespace zrm {
+
 // The rules that scan directives and print directives share.
 
 /// A size modifier and the base of the data types that it gives.
@@ -92,5 +94,7 @@ constexpr const char* skipWhiteSpace(const char* text) noexcept {
 constexpr bool isDigit(char character) noexcept {
     return character >= '0' && character <= '9';
 }
+
+} // namespace zrm
 
 #endif

@@ -8,6 +8,8 @@
 #include <new>
 #include <string_view>
 
+namespace zrm {
+
 namespace {
 
 constexpr char lowerCase(char character) {
@@ -145,3 +147,5 @@ bool FloatField::convert(const char* begin, const char* end, Receiver receiver,
     }
     return behind != text;
 }
+
+} // namespace zrm

@@ -3,6 +3,8 @@
 
 #include "parser/DataType.h"
 
+namespace zrm {
+
 /// Reading of one floating-point number as the C library's scanner reads it: how far the number
 /// reaches is decided here, its value by the C library. Any thread.
 namespace FloatField {
@@ -16,5 +18,7 @@ const char* findEnd(const char* text, unsigned width, const char* decimalPoint) 
 bool convert(const char* begin, const char* end, Receiver receiver, void* value) noexcept;
 
 } // namespace FloatField
+
+} // namespace zrm
 
 #endif

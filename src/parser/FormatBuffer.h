@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <cstring>
 
+namespace zrm {
+
 /// Where the texts of one keyword's fields are written, one behind the other, without terminators.
 /// The caller sets it up before each line.
 struct _FormatBuffer {
@@ -25,5 +27,7 @@ struct _FormatBuffer {
         room -= static_cast<long>(length);
     }
 };
+
+} // namespace zrm
 
 #endif

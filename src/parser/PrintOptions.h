@@ -3,6 +3,8 @@
 
 #include "parser/DataType.h"
 
+namespace zrm {
+
 /// The options of print directives, as the set in which they are remembered.
 enum PrintOptionFlag : unsigned {
     OPTION_GROUPING = 1,
@@ -51,5 +53,7 @@ inline constexpr PrintOption printOptions[] = {
     {'0', OPTION_ZERO, OptionTypes::NUMBERS, OptionRefusal::ZERO, OPTION_LEFT, true},
     {'+', OPTION_SIGN, OptionTypes::SIGNED, OptionRefusal::OPTION, OPTION_BLANK, false},
 };
+
+} // namespace zrm
 
 #endif

@@ -8,6 +8,8 @@
 #include <cstdio>
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 /// Holds the longest text that a directive can give: a long double has up to 4933 digits, which
@@ -221,3 +223,5 @@ bool PrintProgram::printByLibrary(const void* value, _FormatBuffer& buffer) cons
     buffer.append(work, written < sizeof work ? written : sizeof work - 1);
     return true;
 }
+
+} // namespace zrm

@@ -6,6 +6,8 @@
 
 #include <cstddef>
 
+namespace zrm {
+
 /// One print directive made ready for printing values of one data type. It writes what snprintf
 /// would write; the usual directives (constant text, plain texts and characters, decimal integers
 /// with or without a minimum width) do not go through it. Compiled once, then read-only.
@@ -43,5 +45,7 @@ private:
     std::size_t m_width = 0;      ///< minimum width of an integer
     bool m_isBareInteger = false; ///< of 32 bits, without text around it
 };
+
+} // namespace zrm
 
 #endif

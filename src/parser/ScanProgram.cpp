@@ -10,6 +10,8 @@
 
 #include <langinfo.h>
 
+namespace zrm {
+
 namespace {
 
 constexpr unsigned char byteOf(char character) {
@@ -448,3 +450,5 @@ ScanProgram::Outcome ScanProgram::scanCharacters(const char*& position,
     position = end;
     return Outcome::MATCHED;
 }
+
+} // namespace zrm

@@ -6,6 +6,8 @@
 #include <array>
 #include <cstdint>
 
+namespace zrm {
+
 /// One scan directive (literal text, then one conversion, then "%n") made ready for scanning. It
 /// reads a line as the C library's sscanf would with the same directive, white space and digits
 /// being those of the "C" locale and the decimal point the process's, without reading the
@@ -76,5 +78,7 @@ private:
     char m_stop = '\0';
     char m_decimalPoint[8] = ".";
 };
+
+} // namespace zrm
 
 #endif

@@ -9,6 +9,8 @@
 #include <string_view>
 #include <utility>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"StringParser.cpp"};
@@ -181,3 +183,5 @@ void StringParser::printSelf() const {
         scanDirectiveLength(), scanDirective(), printDirective(), static_cast<int>(DataType),
         static_cast<const void*>(Value.get()), Suppressed ? 1 : 0, static_cast<int>(ObjectStatus));
 }
+
+} // namespace zrm

@@ -11,6 +11,8 @@
 #include <cstddef>
 #include <memory>
 
+namespace zrm {
+
 struct PrintOption;
 
 /// How far a node of a format's chain, or the whole format, was learned.
@@ -158,5 +160,7 @@ private:
     std::size_t m_distanceToBegin = 0;
     std::size_t m_distanceToEnd = 0;
 };
+
+} // namespace zrm
 
 #endif

@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"StringParserFields.cpp"};
@@ -105,3 +107,5 @@ const char* StringParser::getFieldName(const char* text, const _KeywordFields* v
     }
     return trace.result<const char*>(nullptr);
 }
+
+} // namespace zrm

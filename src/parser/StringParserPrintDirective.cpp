@@ -9,6 +9,8 @@
 
 #include <langinfo.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"StringParserPrintDirective.cpp"};
@@ -243,3 +245,5 @@ int StringParser::defaultPrintDirective(_BuildArea* area) {
     const bool isCopied = *directive != '\0' && area->append(directive, std::strlen(directive));
     return trace.result(isCopied ? 0 : -1);
 }
+
+} // namespace zrm

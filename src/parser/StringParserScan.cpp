@@ -4,6 +4,8 @@
 
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"StringParserScan.cpp"};
@@ -102,3 +104,5 @@ bool StringParser::printValue(_FormatBuffer& buffer) const {
     TraceScope trace(anchor);
     return trace.result(m_print.isCompiled() && m_print.run(Value.get(), buffer));
 }
+
+} // namespace zrm

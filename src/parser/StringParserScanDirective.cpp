@@ -10,6 +10,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"StringParserScanDirective.cpp"};
@@ -271,3 +273,5 @@ bool StringParser::storeDirective(const _BuildArea& area,
     std::memcpy(directive.get(), area.buffer, size);
     return trace.result(true);
 }
+
+} // namespace zrm

@@ -3,10 +3,14 @@
 
 #include "framework/LinkedList.h"
 
+namespace zrm {
+
 /// Walks a table manager's open requests, while its lock is held.
 class CtreqListIter : public LinkedListIter {
 public:
     using LinkedListIter::LinkedListIter;
 };
+
+} // namespace zrm
 
 #endif

@@ -1,5 +1,7 @@
 #include "tables/TableDescription.h"
 
+namespace zrm {
+
 const TableColumn* TableDescription::find(std::string_view name) const noexcept {
     for (const TableColumn& column : columns) {
         if (column.name == name) {
@@ -23,3 +25,5 @@ unsigned TableDescription::describe(ColumnInfo* info, int index) const noexcept 
     }
     return 0;
 }
+
+} // namespace zrm

@@ -8,6 +8,8 @@
 #include <span>
 #include <string_view>
 
+namespace zrm {
+
 // Statuses that the tables give to the framework.
 inline constexpr unsigned tableNoManager = 0x21060002;
 inline constexpr unsigned tableNoSuchColumn = 0x21060007;
@@ -55,5 +57,7 @@ struct TableDescription {
         return end == rowSize && end <= INT16_MAX;
     }
 };
+
+} // namespace zrm
 
 #endif

@@ -3,6 +3,8 @@
 
 #include "framework/TableManager.h"
 
+namespace zrm {
+
 /// Holds a table manager's lock; lives on the stack of one thread.
 class TableLock {
 public:
@@ -14,5 +16,7 @@ public:
 private:
     SYS1_Lock* m_lock;
 };
+
+} // namespace zrm
 
 #endif

@@ -11,6 +11,8 @@
 #include <atomic>
 #include <new>
 
+namespace zrm {
+
 // What the managers of both tables do alike.
 
 /// Creates the table's manager, keeps it in `singleton` for the rest of the process and registers
@@ -64,5 +66,7 @@ unsigned offerRows(TableManager& manager, Row* rows, int count) {
     const TableLock lock(manager);
     return offerRowsTo<RowHolder>(manager.requests(), rows, count);
 }
+
+} // namespace zrm
 
 #endif

@@ -5,6 +5,8 @@
 
 #include <cstring>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"TableRequest.cpp"};
@@ -103,3 +105,5 @@ unsigned TableRequest::addRows(char* rows, int count) {
     }
     return trace.result(status);
 }
+
+} // namespace zrm

@@ -5,6 +5,8 @@
 #include "framework/trace.h"
 #include "tables/TableDescription.h"
 
+namespace zrm {
+
 /// What the row holders of both tables share: everything that follows from the description of the
 /// table's columns. Adds no virtual operation, so that a row holder's AddData takes the slot right
 /// behind those of ctreq. Owned by the framework; used by one thread at a time, under the table
@@ -36,5 +38,7 @@ protected:
 private:
     const TableDescription& m_table;
 };
+
+} // namespace zrm
 
 #endif

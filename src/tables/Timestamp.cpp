@@ -8,6 +8,8 @@
 #include <cstring>
 #include <ctime>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"Timestamp.cpp"};
@@ -167,3 +169,5 @@ void Timestamp::prune(Timestamp& newestOut) {
         delete first;
     }
 }
+
+} // namespace zrm

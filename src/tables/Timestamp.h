@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace zrm {
+
 /// One element of a situation's circular chain of event times, newest at the head. The owner keeps
 /// the head's address (null for an empty chain); deleting the head deletes the chain. Not locked:
 /// the table manager's lock guards a situation's chain.
@@ -49,5 +51,7 @@ private:
     Timestamp* m_newerLow = nullptr; ///< of a low
     Timestamp* m_oldestLow = this;   ///< of the head
 };
+
+} // namespace zrm
 
 #endif

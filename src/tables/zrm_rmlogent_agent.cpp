@@ -7,6 +7,8 @@
 #include <ctime>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_agent.cpp"};
@@ -154,3 +156,5 @@ void zrm_rmlogent_agent::dropTimestampChain() {
     delete timestampChain;
     timestampChain = nullptr;
 }
+
+} // namespace zrm

@@ -7,6 +7,8 @@
 
 #include <memory>
 
+namespace zrm {
+
 class LogFile;
 
 /// One request on the Log Entries table. A situation receives every log's new rows and passes on
@@ -68,5 +70,7 @@ private:
     Timestamp* timestampChain = nullptr; ///< owned; head of the chain of recent entry times
     void* reportHandle = nullptr;        ///< the log's state of a report
 };
+
+} // namespace zrm
 
 #endif

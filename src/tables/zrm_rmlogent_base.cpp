@@ -2,6 +2,8 @@
 
 #include "base/TraceScope.h"
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_base.cpp"};
@@ -51,3 +53,5 @@ unsigned zrm_rmlogent_base::AddData(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
     return trace.result(addRows(reinterpret_cast<char*>(rows), count));
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include "logs/zrm_rmlogent_data.h"
 #include "tables/TableRequest.h"
 
+namespace zrm {
+
 /// Row holder of the Log Entries table: describes the table and filters the rows that are offered
 /// to a request. Owned by the framework; its rows arrive on the logs' threads, one at a time under
 /// the table manager's lock.
@@ -19,5 +21,7 @@ protected:
     /// See zrm_rmlogent_agent.
     static bool isTraced();
 };
+
+} // namespace zrm
 
 #endif

@@ -7,6 +7,8 @@
 
 #include <atomic>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_manager.cpp"};
@@ -73,3 +75,5 @@ bool zrm_rmlogent_manager::areOffersTraced() {
     }
     return m_areOffersTraced;
 }
+
+} // namespace zrm

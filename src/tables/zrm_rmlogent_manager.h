@@ -4,6 +4,8 @@
 #include "framework/TableManager.h"
 #include "logs/zrm_rmlogent_data.h"
 
+namespace zrm {
+
 /// Manager of the Log Entries table: creates its request objects and hands fresh rows to every
 /// open situation. One per process, never destroyed.
 class zrm_rmlogent_manager : public TableManager {
@@ -29,5 +31,7 @@ private:
 
 /// Creates and registers the table's manager. Returns 0 or a framework status.
 unsigned zrm_rmlogent_init();
+
+} // namespace zrm
 
 #endif

@@ -14,6 +14,8 @@
 #include <cstring>
 #include <new>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_report.cpp"};
@@ -190,3 +192,5 @@ bool zrm_rmlogent_agent::getEntrytimeThresholds() {
                    thresholds.endTime);
     return trace.result(true);
 }
+
+} // namespace zrm

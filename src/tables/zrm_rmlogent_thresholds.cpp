@@ -8,6 +8,8 @@
 #include <cstring>
 #include <span>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_thresholds.cpp"};
@@ -125,3 +127,5 @@ void zrm_rmlogent_agent::getFreqPeriodThresholds() {
         }
     }
 }
+
+} // namespace zrm

@@ -15,6 +15,8 @@
 
 #include <sys/stat.h>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmmonlog_agent.cpp"};
@@ -128,3 +130,5 @@ void zrm_rmmonlog_agent::buildTableRow(zrm_rmmonlog_data_t* row, LogFile* log) {
     row->rowno = 0;
     BrevanTime::generateCurrentTimestamp(row->timestamp);
 }
+
+} // namespace zrm

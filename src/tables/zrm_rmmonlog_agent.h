@@ -5,6 +5,8 @@
 
 #include <memory>
 
+namespace zrm {
+
 class LogFile;
 
 /// One request on the Monitored Logs table: each sample builds one row per monitored log afresh.
@@ -28,5 +30,7 @@ private:
     unsigned buildTableRows(zrm_rmmonlog_data_t* rows, unsigned room);
     void buildTableRow(zrm_rmmonlog_data_t* row, LogFile* log);
 };
+
+} // namespace zrm
 
 #endif

@@ -2,6 +2,8 @@
 
 #include "base/TraceScope.h"
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmmonlog_base.cpp"};
@@ -44,3 +46,5 @@ unsigned zrm_rmmonlog_base::AddData(zrm_rmmonlog_data_t* rows, int count) {
     TraceScope trace(anchor);
     return trace.result(addRows(reinterpret_cast<char*>(rows), count));
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include "tables/TableRequest.h"
 #include "tables/zrm_rmmonlog_data.h"
 
+namespace zrm {
+
 /// Row holder of the Monitored Logs table: describes the table and filters the rows of a sample.
 /// Owned by the framework; used by the thread that takes the sample.
 class zrm_rmmonlog_base : public TableRequest {
@@ -14,5 +16,7 @@ public:
     /// Returns the last status of an insertion, 0 when there was none.
     virtual unsigned AddData(zrm_rmmonlog_data_t* rows, int count);
 };
+
+} // namespace zrm
 
 #endif

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace zrm {
+
 /// One Monitored Logs row. Character columns are blank-padded and not terminated; the framework
 /// reads the columns by offset and width, so the layout is fixed.
 struct zrm_rmmonlog_data_t {
@@ -35,5 +37,7 @@ static_assert(offsetof(zrm_rmmonlog_data_t, timestamp) == 785);
 static_assert(offsetof(zrm_rmmonlog_data_t, sampleno) == 804);
 static_assert(offsetof(zrm_rmmonlog_data_t, ulogpath) == 812);
 static_assert(offsetof(zrm_rmmonlog_data_t, ulogname) == 1580);
+
+} // namespace zrm
 
 #endif

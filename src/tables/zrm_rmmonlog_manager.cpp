@@ -6,6 +6,8 @@
 
 #include <atomic>
 
+namespace zrm {
+
 namespace {
 
 TRC1_Anchor anchor{"zrm_rmmonlog_manager.cpp"};
@@ -38,3 +40,5 @@ unsigned zrm_rmmonlog_manager::AddDataToEvent(zrm_rmmonlog_data_t* rows, int cou
     TraceScope trace(anchor);
     return trace.result(offerRows<zrm_rmmonlog_base>(*this, rows, count));
 }
+
+} // namespace zrm

@@ -4,6 +4,8 @@
 #include "framework/TableManager.h"
 #include "tables/zrm_rmmonlog_data.h"
 
+namespace zrm {
+
 /// Manager of the Monitored Logs table: creates its request objects. One per process, never
 /// destroyed.
 class zrm_rmmonlog_manager : public TableManager {
@@ -20,5 +22,7 @@ public:
 
 /// Creates and registers the Monitored Logs table's manager. Returns 0 or a framework status.
 unsigned zrm_rmmonlog_init();
+
+} // namespace zrm
 
 #endif

@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+using namespace zrm::host;
+
 // A body in chunks is read, refused, or not over yet. In whichever pieces its bytes come, the same
 // ones are read, with the same text; only how soon others are refused may differ. No more is taken
 // than came, and never more than is allowed.

@@ -6,6 +6,8 @@
 #include <string_view>
 #include <variant>
 
+using namespace zrm::host;
+
 // Any text gives a condition or a problem with its cure; the text of a condition, written anew from
 // what was read, gives the same condition.
 

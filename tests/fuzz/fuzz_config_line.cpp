@@ -12,6 +12,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 // Any text may stand in a log configuration ('U' before it) or a syslog configuration ('D'); '^'
 // in it stands for the name of an existing file. The records are those of a plain model of the
 // reader, and each line is refused or gives a log that can be monitored.

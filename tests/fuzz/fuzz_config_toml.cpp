@@ -7,6 +7,8 @@
 #include <variant>
 #include <vector>
 
+using namespace zrm::host;
+
 // Any text gives a configuration whose situations can be opened, or problems that each name the
 // file and a cure.
 

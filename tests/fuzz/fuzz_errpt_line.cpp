@@ -10,6 +10,8 @@
 #include <memory>
 #include <string>
 
+using namespace zrm;
+
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     constexpr std::size_t longestLine = 255;
     const std::string line(reinterpret_cast<const char*>(data), std::min(size, longestLine));

@@ -9,6 +9,8 @@
 #include <memory>
 #include <string>
 
+using namespace zrm;
+
 // Format specifiers: the first line of the input is one, the second a line of the log. What is
 // learned must scan as the C library scans and write nothing outside the buffers.
 

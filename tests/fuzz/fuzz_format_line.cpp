@@ -13,6 +13,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 // Lines of user logs: each input is a line, tried with logs of several formats while monitoring
 // and in a report. Every row must be whole: a time stamp of 16 characters or no row.
 

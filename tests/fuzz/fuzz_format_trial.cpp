@@ -5,6 +5,9 @@
 #include <cstdlib>
 #include <string>
 
+using namespace zrm;
+using namespace zrm::host;
+
 // A format and lines: the first line of an input is the format, each of the others a line. Places
 // lie within what they are places of, and what is said of a line holds together.
 

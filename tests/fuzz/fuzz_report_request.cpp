@@ -5,6 +5,8 @@
 #include <cstdlib>
 #include <string_view>
 
+using namespace zrm::host;
+
 // Any body gives a report with its log and its window, or a problem that names its place.
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {

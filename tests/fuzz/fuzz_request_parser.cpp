@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+using namespace zrm::host;
+
 // Whatever comes is a request or has a problem; what has none says clearly where its body ends. It
 // does not matter in which pieces the bytes come.
 

@@ -8,6 +8,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 // Any body gives conditions or a problem document that is valid JSON and names the field.
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {

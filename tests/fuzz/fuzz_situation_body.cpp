@@ -15,6 +15,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 // Any body gives a situation, or a problem document that is valid JSON and names the field. What a
 // situation's definition is shown as gives the same situation again, and so does the same
 // definition in a configuration file.

@@ -8,6 +8,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 // Any file of situations gives what it holds, which is the same when it is saved and read again, or
 // is moved aside whole with a message.
 

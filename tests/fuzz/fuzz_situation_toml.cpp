@@ -14,6 +14,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 // Any text of a situation in a configuration file gives situations whose definitions the API takes,
 // too, as the same situations, or problems that each name the file and a cure.
 

@@ -15,6 +15,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 // Any line gives a row, in monitoring ("M" before the line) and in a report ("R"): its time is
 // blank or ends in three zeros, its common columns are those of the log, and nothing outside the
 // row and the line is touched.

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+using namespace zrm::host;
+
 // A text that is a time gives 16 digits, which are the same time again.
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {

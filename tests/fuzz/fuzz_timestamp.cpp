@@ -6,6 +6,8 @@
 #include <cstdlib>
 #include <cstring>
 
+using namespace zrm;
+
 // Any sixteen bytes may stand in a stamp: either the element joins the chain at a time that is not
 // negative, or it stays alone. A time that was read back writes a stamp that is read as that time.
 

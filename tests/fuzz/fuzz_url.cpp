@@ -6,6 +6,8 @@
 #include <cstdlib>
 #include <string_view>
 
+using namespace zrm::host;
+
 // Any path finds a route or none, and whatever is decoded of a URL is text.
 
 namespace {

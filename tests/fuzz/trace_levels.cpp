@@ -2,6 +2,8 @@
 
 #include <cstdlib>
 
+using namespace zrm::host;
+
 // Nobody reads QFW_TRC1 for a fuzz target, which has no start of the host: without a setting, a
 // target that feeds on bad input would trace little else.
 

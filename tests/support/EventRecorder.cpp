@@ -6,6 +6,8 @@
 #include <condition_variable>
 #include <mutex>
 
+using namespace zrm;
+
 namespace {
 
 struct Recorder {

@@ -9,6 +9,8 @@
 #include <string_view>
 #include <vector>
 
+using namespace zrm;
+
 /// The receiver of the rows of all logs in the programs that are linked with zrm_record_events():
 /// keeps a copy of every row that a log's thread hands over.
 namespace EventRecorder {

@@ -7,6 +7,8 @@
 #include <stdexcept>
 #include <string>
 
+using namespace zrm;
+
 /// The accepted configuration line of an existing file; `fields` are those behind the name, for
 /// example " ;Y ;S".
 inline std::unique_ptr<ValidLog> validLog(const std::string& path, const std::string& fields = "") {

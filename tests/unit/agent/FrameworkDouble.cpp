@@ -12,6 +12,8 @@
 #include <signal.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 struct State {
@@ -140,14 +142,14 @@ extern "C" void __wrap__Z13RPC1_ShutdownPj(unsigned* status) {
     state().isStopped.notify_all();
 }
 
-extern "C" unsigned __wrap__Z17zrm_rmlogent_initv();
-extern "C" unsigned __wrap__Z17zrm_rmlogent_initv() {
+extern "C" unsigned __wrap__ZN3zrm17zrm_rmlogent_initEv();
+extern "C" unsigned __wrap__ZN3zrm17zrm_rmlogent_initEv() {
     record("zrm_rmlogent_init");
     return 1; // not looked at
 }
 
-extern "C" unsigned __wrap__Z17zrm_rmmonlog_initv();
-extern "C" unsigned __wrap__Z17zrm_rmmonlog_initv() {
+extern "C" unsigned __wrap__ZN3zrm17zrm_rmmonlog_initEv();
+extern "C" unsigned __wrap__ZN3zrm17zrm_rmmonlog_initEv() {
     record("zrm_rmmonlog_init");
     return 1; // not looked at
 }

@@ -10,6 +10,8 @@
 #include <cstring>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 std::string stampOf(long time) {

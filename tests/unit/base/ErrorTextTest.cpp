@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <cstring>
 
+using namespace zrm;
+
 TEST(ErrorText, GivesTheSystemsTextAndTheNumber) {
     const ErrorText error(ENOENT);
     EXPECT_EQ(error.number(), ENOENT);

@@ -8,6 +8,8 @@
 #include <cstdint>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 TRC1_Anchor anchor{"TraceScopeTest.cpp"};

@@ -10,6 +10,8 @@
 #include <cstdlib>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

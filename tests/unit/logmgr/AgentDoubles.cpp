@@ -8,6 +8,8 @@
 #include <mutex>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 std::atomic<bool> g_typesKnown{true};
@@ -84,15 +86,15 @@ int AgentDoubles::shutdowns() {
 
 // The functions below replace those of other parts under their linker names.
 
-extern "C" bool __wrap__Z14isKnownLogTypec(char type);
-extern "C" bool __wrap__Z14isKnownLogTypec(char /*type*/) {
+extern "C" bool __wrap__ZN3zrm14isKnownLogTypeEc(char type);
+extern "C" bool __wrap__ZN3zrm14isKnownLogTypeEc(char /*type*/) {
     return g_typesKnown;
 }
 
-extern "C" LogFile* __wrap__Z13createLogFileRK8ValidLogP7LogFile(const ValidLog& log,
-                                                                 LogFile* chainHead);
-extern "C" LogFile* __wrap__Z13createLogFileRK8ValidLogP7LogFile(const ValidLog& log,
-                                                                 LogFile* chainHead) {
+extern "C" LogFile* __wrap__ZN3zrm13createLogFileERKNS_8ValidLogEPNS_7LogFileE(const ValidLog& log,
+                                                                               LogFile* chainHead);
+extern "C" LogFile* __wrap__ZN3zrm13createLogFileERKNS_8ValidLogEPNS_7LogFileE(const ValidLog& log,
+                                                                               LogFile* chainHead) {
     if (!g_logsCreatable) {
         return nullptr;
     }

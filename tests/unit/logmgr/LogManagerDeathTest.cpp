@@ -11,6 +11,8 @@
 #include <cerrno>
 #include <cstdlib>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ExitedWithCode;

@@ -13,6 +13,8 @@
 #include <unistd.h>
 #include <utime.h>
 
+using namespace zrm;
+
 LogManagerFixture::LogManagerFixture() {
     LocaleDouble::reset();
     AgentDoubles::reset();

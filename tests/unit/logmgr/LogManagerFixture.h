@@ -17,6 +17,8 @@
 
 #include <signal.h>
 
+using namespace zrm;
+
 /// A log manager over a configuration in a temporary directory, with the signals that it takes
 /// blocked as start-up blocks them. Unless a test configures otherwise, all three environment
 /// variables are unset.

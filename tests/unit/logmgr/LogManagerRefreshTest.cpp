@@ -13,6 +13,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::Contains;

@@ -17,6 +17,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::Contains;

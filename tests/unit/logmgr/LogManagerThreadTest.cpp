@@ -11,6 +11,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

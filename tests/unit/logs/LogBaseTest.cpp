@@ -12,6 +12,8 @@
 #include <cstdio>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

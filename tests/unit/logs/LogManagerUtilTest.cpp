@@ -19,6 +19,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

@@ -16,6 +16,8 @@
 
 #include <utime.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

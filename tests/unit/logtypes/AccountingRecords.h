@@ -7,6 +7,8 @@
 #include <cstring>
 #include <string>
 
+using namespace zrm;
+
 /// The fields of one accounting record; texts longer than their field are cut.
 struct AccountingRecord {
     std::string user = {};

@@ -18,6 +18,8 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

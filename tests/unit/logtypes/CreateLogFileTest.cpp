@@ -8,6 +8,8 @@
 #include <chrono>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 class CreateLogFile : public SyslogTest {

@@ -6,6 +6,8 @@
 #include <condition_variable>
 #include <mutex>
 
+using namespace zrm;
+
 namespace {
 
 struct Recorder {
@@ -44,20 +46,21 @@ std::vector<DebugLogRecorder::Record> DebugLogRecorder::waitForRecords(std::size
 }
 
 // LogFile::writeToDebugLog under its linker name.
-extern "C" void __real__ZN7LogFile15writeToDebugLogEPKvmS1_m(LogFile*, const void*, unsigned long,
-                                                             const void*, unsigned long);
-extern "C" void __wrap__ZN7LogFile15writeToDebugLogEPKvmS1_m(LogFile* log, const void* data1,
-                                                             unsigned long length1,
-                                                             const void* data2,
-                                                             unsigned long length2);
-extern "C" void __wrap__ZN7LogFile15writeToDebugLogEPKvmS1_m(LogFile* log, const void* data1,
-                                                             unsigned long length1,
-                                                             const void* data2,
-                                                             unsigned long length2) {
+extern "C" void __real__ZN3zrm7LogFile15writeToDebugLogEPKvmS2_m(LogFile*, const void*,
+                                                                 unsigned long, const void*,
+                                                                 unsigned long);
+extern "C" void __wrap__ZN3zrm7LogFile15writeToDebugLogEPKvmS2_m(LogFile* log, const void* data1,
+                                                                 unsigned long length1,
+                                                                 const void* data2,
+                                                                 unsigned long length2);
+extern "C" void __wrap__ZN3zrm7LogFile15writeToDebugLogEPKvmS2_m(LogFile* log, const void* data1,
+                                                                 unsigned long length1,
+                                                                 const void* data2,
+                                                                 unsigned long length2) {
     {
         const std::lock_guard guard(recorder().mutex);
         recorder().records.push_back({bytes(data1, length1), bytes(data2, length2)});
     }
     recorder().changed.notify_all();
-    __real__ZN7LogFile15writeToDebugLogEPKvmS1_m(log, data1, length1, data2, length2);
+    __real__ZN3zrm7LogFile15writeToDebugLogEPKvmS2_m(log, data1, length1, data2, length2);
 }

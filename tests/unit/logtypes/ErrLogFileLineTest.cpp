@@ -7,6 +7,8 @@
 
 #include <cstring>
 
+using namespace zrm;
+
 namespace {
 
 class ErrLogFileLineTest : public ErrLogTest {

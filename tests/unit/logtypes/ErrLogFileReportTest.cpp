@@ -15,6 +15,8 @@
 #include <sstream>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 using testing::Contains;

@@ -12,6 +12,8 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::Contains;

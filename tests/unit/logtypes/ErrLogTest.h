@@ -15,6 +15,8 @@
 
 #include <sys/wait.h>
 
+using namespace zrm;
+
 /// What the tests of the error log share. The process calls itself AIX, or no configuration line
 /// would be accepted.
 class ErrLogTest : public LogTypeTest {

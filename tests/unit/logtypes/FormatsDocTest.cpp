@@ -7,6 +7,8 @@
 #include <map>
 #include <sstream>
 
+using namespace zrm;
+
 // What docs/formats.md says of formats is run: the examples of its tables, and the ten worked
 // specifiers with their sample lines.
 

@@ -19,6 +19,8 @@
 #include <string>
 #include <thread>
 
+using namespace zrm;
+
 /// What the tests of the log types share: a directory, doubles that remember, and the agent's
 /// names.
 class LogTypeTest : public testing::Test {

@@ -15,6 +15,8 @@
 #include <string_view>
 #include <vector>
 
+using namespace zrm;
+
 namespace {
 
 class Members : public LogFile {

@@ -11,6 +11,8 @@
 #include <random>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 std::string expected(std::int64_t time) {

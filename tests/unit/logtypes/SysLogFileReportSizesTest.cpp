@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm;
+
 namespace {
 
 /// Reports over files of many sizes in blocks of many sizes.

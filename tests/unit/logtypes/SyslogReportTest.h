@@ -10,6 +10,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm;
+
 inline constexpr const char* farPast = "0000000000000000";
 inline constexpr const char* farFuture = "9999999999999999";
 

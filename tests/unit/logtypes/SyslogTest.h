@@ -19,6 +19,8 @@
 #include <string>
 #include <thread>
 
+using namespace zrm;
+
 /// A syslog file whose monitor could not open it and has ended, so that a test has the object to
 /// itself and waits for no poll. The time is 5 October 2006, 12:00:00 UTC.
 class SyslogTest : public testing::Test {

@@ -9,6 +9,8 @@
 
 #include <fcntl.h>
 
+using namespace zrm;
+
 // Reports on user logs: the file read backwards, block by block.
 
 namespace {

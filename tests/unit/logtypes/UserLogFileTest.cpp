@@ -13,6 +13,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 // User logs: learning the format, lines to rows, the monitor.
 
 namespace {

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <cctype>
 
+using namespace zrm;
+
 // The time stamp of a user log's entry, made of the texts of its fields. The clock stands at 5
 // October 2006, 12:34:56.
 

@@ -25,6 +25,8 @@
 #include <thread>
 #include <vector>
 
+using namespace zrm;
+
 /// Names the protected members of user logs, for pointers to them.
 class UserLogMembers : public UserLogFile {
 public:

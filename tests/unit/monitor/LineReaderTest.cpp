@@ -15,6 +15,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 constexpr std::size_t blockSize = 256 * 1024;

@@ -12,6 +12,8 @@
 #include <sstream>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

@@ -10,6 +10,8 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <cstring>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

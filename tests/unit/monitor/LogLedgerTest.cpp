@@ -10,6 +10,8 @@
 #include <memory>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

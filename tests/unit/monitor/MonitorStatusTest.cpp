@@ -5,6 +5,8 @@
 #include <string>
 #include <utility>
 
+using namespace zrm;
+
 namespace {
 
 TEST(MonitorStatus, EveryValueHasItsText) {

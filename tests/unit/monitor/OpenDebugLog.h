@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <string>
 
+using namespace zrm;
+
 /// The debug log of all logs while the object lives: this file, opened for appending and
 /// line-buffered.
 class OpenDebugLog {

@@ -12,6 +12,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+using namespace zrm;
+
 namespace {
 
 class ReadGuardTest : public testing::Test {

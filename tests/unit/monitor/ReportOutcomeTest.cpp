@@ -5,6 +5,8 @@
 #include <string>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 TEST(ReportOutcome, IsCompleteUntilSomethingIsNoted) {

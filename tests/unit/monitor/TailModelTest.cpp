@@ -7,6 +7,8 @@
 #include <numeric>
 #include <random>
 
+using namespace zrm;
+
 namespace {
 
 /// What following a file comes to, said plainly.

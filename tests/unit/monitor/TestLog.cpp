@@ -7,6 +7,8 @@
 #include <cstring>
 #include <thread>
 
+using namespace zrm;
+
 namespace {
 
 char systemName[65] = "web1:ZRM";

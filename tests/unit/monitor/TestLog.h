@@ -17,6 +17,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm;
+
 /// A kind of log of the tests: a line that begins with "bad" is rejected, any other becomes the
 /// description of its row. Its thread polls every millisecond. The operations that the kinds of
 /// logs use are public, so that a test may also go through them on its own thread.

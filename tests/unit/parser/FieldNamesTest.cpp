@@ -7,6 +7,8 @@
 
 #include <vector>
 
+using namespace zrm;
+
 // The list of field names, and the table of keywords that it is matched against.
 
 namespace {

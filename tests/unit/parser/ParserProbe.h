@@ -7,6 +7,8 @@
 #include <cstring>
 #include <string>
 
+using namespace zrm;
+
 /// The field names of user logs.
 inline constexpr _KeywordFields testKeywords[] = {
     {"year", 2},   {"month", 2},  {"day", 2},  {"hour", 2},  {"minute", 2},      {"second", 2},

@@ -8,6 +8,8 @@
 
 #include <cerrno>
 
+using namespace zrm;
+
 // Print directives: how each is learned, and the message of each warning and refusal.
 
 namespace {

@@ -10,6 +10,8 @@
 #include <limits>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 /// A value of one data type, as the receiving variable holds it.

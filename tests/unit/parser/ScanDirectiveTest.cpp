@@ -8,6 +8,8 @@
 
 #include <cerrno>
 
+using namespace zrm;
+
 // Scan directives: how each is learned, and the message of each that cannot be.
 
 namespace {

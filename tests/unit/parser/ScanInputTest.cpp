@@ -8,6 +8,8 @@
 
 #include <cerrno>
 
+using namespace zrm;
+
 // Lines scanned with a learned format and printed into the buffers of the fields.
 
 namespace {

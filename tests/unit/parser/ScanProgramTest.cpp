@@ -11,6 +11,8 @@
 #include <limits>
 #include <string>
 
+using namespace zrm;
+
 namespace {
 
 /// A receiving variable that shows what was written behind a value.

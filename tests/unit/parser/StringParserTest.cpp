@@ -12,6 +12,8 @@
 
 #include <pthread.h>
 
+using namespace zrm;
+
 // A format as a whole: its beginning, the chain, the dump, the chain's end.
 
 namespace {

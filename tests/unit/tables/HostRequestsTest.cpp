@@ -22,6 +22,9 @@
 #include <memory>
 #include <thread>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -16,6 +16,9 @@
 #include <memory>
 #include <thread>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -13,6 +13,9 @@
 #include <cstring>
 #include <tuple>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -18,6 +18,9 @@
 #include <memory>
 #include <numeric>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

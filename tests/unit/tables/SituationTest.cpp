@@ -22,14 +22,17 @@
 #include <random>
 #include <thread>
 
+using namespace zrm;
+using namespace zrm::host;
+
 // Timestamp::countEvents finds every chain intact unless a test says otherwise.
 namespace {
 std::atomic<bool> chainIsCorrupted{false};
 }
-extern "C" long __real__ZN9Timestamp11countEventsEl(Timestamp* head, long period);
-extern "C" long __wrap__ZN9Timestamp11countEventsEl(Timestamp* head, long period);
-extern "C" long __wrap__ZN9Timestamp11countEventsEl(Timestamp* head, long period) {
-    return chainIsCorrupted ? -1 : __real__ZN9Timestamp11countEventsEl(head, period);
+extern "C" long __real__ZN3zrm9Timestamp11countEventsEl(Timestamp* head, long period);
+extern "C" long __wrap__ZN3zrm9Timestamp11countEventsEl(Timestamp* head, long period);
+extern "C" long __wrap__ZN3zrm9Timestamp11countEventsEl(Timestamp* head, long period) {
+    return chainIsCorrupted ? -1 : __real__ZN3zrm9Timestamp11countEventsEl(head, period);
 }
 
 namespace {

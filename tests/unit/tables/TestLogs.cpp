@@ -5,6 +5,8 @@
 
 #include <cstring>
 
+using namespace zrm;
+
 namespace {
 
 TestLogs* theLogs = nullptr;
@@ -25,10 +27,10 @@ std::unique_ptr<char[]> copyOf(const std::string& text) {
 
 // The process-wide values and the log manager, in place of the agent's.
 
-decltype(pTheLogManager) pTheLogManager{nullptr};
-char* gSystemName = nullptr;
-char* gHostName = nullptr;
-std::int32_t gMaxRows = 1000;
+decltype(pTheLogManager) zrm::pTheLogManager{nullptr};
+char* zrm::gSystemName = nullptr;
+char* zrm::gHostName = nullptr;
+std::int32_t zrm::gMaxRows = 1000;
 
 LogManager::LogManager() = default;
 LogManager::~LogManager() = default;

@@ -10,6 +10,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm;
+
 /// A monitored log without a thread, whose every property and report entry a test states.
 class TestLog : public LogFile {
 public:

@@ -8,6 +8,9 @@
 #include <cstring>
 #include <map>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 TRC1_Anchor anchor{"TestRequest.cpp"};

@@ -10,6 +10,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 // A double of the framework's request class. It honours the contract, lets a test state each
 // condition byte by byte and each status, and records what the agent asks of it. It takes the
 // place of the host's requests at link time.

@@ -11,6 +11,8 @@
 #include <random>
 #include <vector>
 
+using namespace zrm;
+
 namespace {
 
 using testing::ElementsAre;

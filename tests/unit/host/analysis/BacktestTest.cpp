@@ -16,6 +16,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

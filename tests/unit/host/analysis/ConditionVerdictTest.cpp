@@ -11,6 +11,9 @@
 #include <string>
 #include <variant>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 Condition parsed(const std::string& text) {

@@ -20,6 +20,9 @@
 
 #include <sys/stat.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

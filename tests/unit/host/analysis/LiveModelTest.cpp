@@ -29,6 +29,9 @@
 #include <variant>
 #include <vector>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using Random = std::mt19937;

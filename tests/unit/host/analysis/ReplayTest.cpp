@@ -11,6 +11,9 @@
 #include <string>
 #include <vector>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

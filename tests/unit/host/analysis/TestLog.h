@@ -14,6 +14,8 @@
 #include <utility>
 #include <vector>
 
+using namespace zrm;
+
 /// The 16-character time stamp so many seconds behind an arbitrary moment of the past.
 inline std::string stampAt(int seconds) {
     const std::time_t time = 1'700'000'000 + seconds;

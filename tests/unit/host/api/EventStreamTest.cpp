@@ -15,6 +15,8 @@
 #include <string>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -9,6 +9,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -6,6 +6,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 /// Field and detail of the refusal; "accepted" without one.

@@ -4,6 +4,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string refused(const std::string& body, const char* table = "RMMONLOG") {

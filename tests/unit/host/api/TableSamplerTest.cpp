@@ -9,6 +9,9 @@
 
 #include <string>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 class TableSamplerTest : public testing::Test {

@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 /// A history of a test: what was added, oldest first. It notes the last query.
 class TestHistory : public HistoryReader {
 public:

@@ -6,6 +6,8 @@
 #include <chrono>
 #include <set>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

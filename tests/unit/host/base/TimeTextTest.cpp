@@ -6,6 +6,8 @@
 #include <ctime>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string stampOf(const std::string& text) {

@@ -6,6 +6,8 @@
 #include <map>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 using Query = std::multimap<std::string, std::string>;

@@ -4,6 +4,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string encoded(unsigned point) {

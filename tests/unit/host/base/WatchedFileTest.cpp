@@ -6,6 +6,8 @@
 
 #include <filesystem>
 
+using namespace zrm::host;
+
 namespace {
 
 class WatchedFileTest : public testing::Test {

@@ -8,6 +8,8 @@
 #include <cstdlib>
 #include <functional>
 
+using namespace zrm::host;
+
 namespace {
 
 class AgentAccessTest : public testing::Test {

@@ -14,6 +14,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 namespace {
 
 void expectError(const std::function<void()>& action, CliStatus status, const std::string& text) {

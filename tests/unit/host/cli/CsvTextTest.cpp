@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 TEST(CsvTextTest, FieldsStandBetweenCommas) {
     EXPECT_EQ(CsvText::record({"a", "", "c d"}), "a,,c d\r\n");
     EXPECT_EQ(CsvText::record({}), "\r\n");

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 using namespace DisplayText;
 
 TEST(DisplayTextTest, PlainTextStaysAsItIs) {

@@ -19,6 +19,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 using testing::ElementsAre;
 
 namespace {

@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 using Json = JsonText::Json;
 
 TEST(JsonTextTest, MembersKeepTheirOrder) {

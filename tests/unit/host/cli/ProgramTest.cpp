@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::EndsWith;

@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 using testing::ElementsAre;
 
 namespace {

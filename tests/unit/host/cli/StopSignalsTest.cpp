@@ -8,6 +8,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 using namespace std::chrono_literals;
 
 TEST(StopSignalsTest, AWaitEndsAfterItsTimeWithoutASignal) {

@@ -10,6 +10,8 @@
 #include <memory>
 #include <string>
 
+using namespace zrm::host;
+
 /// An agent that answers as a test says: the agent's own server with other routes, which are added
 /// before `begin`.
 class TestAgent {

@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 TEST(TimeDisplayTest, UtcTimesAreShownLocally) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     EXPECT_EQ(TimeDisplay::local("2026-11-20T07:03:09.412Z"), "2026-11-20 08:03:09");

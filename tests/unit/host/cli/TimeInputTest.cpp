@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 namespace {
 
 constexpr std::time_t now = 1795158189; // 2026-11-20T07:03:09Z

@@ -12,6 +12,8 @@
 #include <sys/resource.h>
 #include <sys/select.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -11,6 +11,8 @@
 
 #include <netinet/in.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -12,6 +12,9 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 /// A request that only describes its table.

@@ -5,6 +5,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

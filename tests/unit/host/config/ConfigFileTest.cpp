@@ -11,6 +11,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -10,6 +10,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 class ConfigSecretsTest : public testing::Test {

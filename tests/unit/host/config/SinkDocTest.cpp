@@ -8,6 +8,8 @@
 #include <string>
 #include <string_view>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string code(std::string_view text) {

@@ -7,6 +7,8 @@
 #include <set>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(SinkTypes, TheKeyTypeNamesEveryType) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(Thresholds, AFrequencyIsAConditionWithItsOperator) {

@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::Contains;

@@ -9,6 +9,8 @@
 
 #include <utime.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::EndsWith;

@@ -16,6 +16,9 @@
 #include <map>
 #include <random>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

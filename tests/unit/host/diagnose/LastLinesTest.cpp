@@ -8,6 +8,9 @@
 #include <cerrno>
 #include <optional>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

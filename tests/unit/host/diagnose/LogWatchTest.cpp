@@ -12,6 +12,9 @@
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -10,6 +10,9 @@
 
 #include <sys/stat.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 class MonitoredLogFileTest : public testing::Test {

@@ -9,6 +9,9 @@
 #include <fstream>
 #include <thread>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 TRC1_Anchor anchor{"TraceCaptureTest.cpp"};

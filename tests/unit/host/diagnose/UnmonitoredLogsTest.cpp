@@ -6,6 +6,8 @@
 
 #include <gmock/gmock.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -6,6 +6,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(EventJson, WritesAnEventAsOneObject) {

@@ -12,6 +12,8 @@
 #include <thread>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

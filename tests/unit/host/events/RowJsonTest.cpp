@@ -12,6 +12,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string jsonText(std::string_view text) {

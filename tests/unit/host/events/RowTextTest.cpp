@@ -5,6 +5,8 @@
 #include <clocale>
 #include <cstring>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string textOf(std::string_view content, ColumnType type = COLUMN_CHARACTER) {

@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 /// The layout of the test table's rows.
 inline RowLayout testLayout() {
     TestManager manager;

@@ -7,6 +7,8 @@
 
 #include <cstring>
 
+using namespace zrm::host;
+
 // What happens for every row and line must not allocate.
 
 namespace {

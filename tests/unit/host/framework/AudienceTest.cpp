@@ -14,6 +14,8 @@
 #include <memory>
 #include <random>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -5,6 +5,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 namespace {
 
 std::uint32_t numberOf(std::string_view codeSet) {

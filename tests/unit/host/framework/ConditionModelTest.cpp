@@ -10,6 +10,8 @@
 #include <random>
 #include <regex>
 
+using namespace zrm::host;
+
 // Random conditions on random rows, held against the plainest reading of what they mean.
 
 namespace {

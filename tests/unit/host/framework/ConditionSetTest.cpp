@@ -9,6 +9,8 @@
 #include <clocale>
 #include <memory>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -7,6 +7,8 @@
 #include <string>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 constexpr std::uint32_t utf8 = 1208;

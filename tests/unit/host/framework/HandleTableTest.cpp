@@ -13,6 +13,8 @@
 #include <thread>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 /// The table only hands the address back, so any address serves.

@@ -12,6 +12,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 class LocalHost : public testing::Test {

@@ -9,6 +9,8 @@
 #include <thread>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(Locks, LetOneThreadInAtATime) {

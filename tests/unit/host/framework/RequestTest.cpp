@@ -13,6 +13,8 @@
 #include <atomic>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

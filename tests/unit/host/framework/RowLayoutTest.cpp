@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 namespace {
 
 class RowLayoutTest : public testing::Test {

@@ -15,6 +15,8 @@
 #include <string_view>
 #include <vector>
 
+using namespace zrm::host;
+
 /// A small table for the tests of the framework: two character columns that name a log, one of
 /// UTF-8, and a number.
 struct TestRow {

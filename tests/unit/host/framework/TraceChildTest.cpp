@@ -22,6 +22,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 TRC1_Anchor anchor{"TraceChildTest.cpp"};

@@ -13,6 +13,8 @@
 #include <time.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string text(const TraceClock::Time& time) {

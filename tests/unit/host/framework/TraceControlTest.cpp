@@ -11,6 +11,8 @@
 
 #include <malloc.h>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(TraceControl, ChangesTheGenerationWithTheLevels) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+using namespace zrm::host;
+
 namespace {
 
 /// The level of one unit under a text that must be right.

@@ -15,6 +15,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 namespace fs = std::filesystem;

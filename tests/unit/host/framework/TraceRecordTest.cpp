@@ -4,6 +4,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 /// What a record shows of a text.

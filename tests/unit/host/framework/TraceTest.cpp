@@ -23,6 +23,9 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

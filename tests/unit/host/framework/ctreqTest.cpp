@@ -10,6 +10,8 @@
 #include <cerrno>
 #include <memory>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -13,6 +13,8 @@
 #include <memory>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -9,6 +9,8 @@
 #include <random>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string documentOf(const std::string& description) {

@@ -18,6 +18,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 constexpr const char* cure = "; make it a directory that the agent may write, or set "

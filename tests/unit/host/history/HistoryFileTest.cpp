@@ -14,6 +14,8 @@
 
 #include <sqlite3.h>
 
+using namespace zrm::host;
+
 namespace {
 
 constexpr std::int64_t day = 24 * 60 * 60'000;

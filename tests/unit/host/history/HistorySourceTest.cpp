@@ -20,6 +20,8 @@
 
 #include <sqlite3.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -24,6 +24,8 @@
 
 #include <sqlite3.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

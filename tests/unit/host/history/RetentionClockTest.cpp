@@ -4,6 +4,8 @@
 
 #include <chrono>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

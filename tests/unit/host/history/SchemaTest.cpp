@@ -10,6 +10,8 @@
 
 #include <sqlite3.h>
 
+using namespace zrm::host;
+
 namespace {
 
 /// A file as the first version of the schema left it, with one event.

@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 /// The moment at which test events are raised: 2026-11-20, UTC.
 inline constexpr std::int64_t testTime = 1'795'158'189'412;
 

@@ -6,6 +6,8 @@
 #include <future>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -14,6 +14,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 const std::string secret = "0123456789abcdef0123456789abcdef";

@@ -5,6 +5,8 @@
 #include <chrono>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

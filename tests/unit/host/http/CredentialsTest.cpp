@@ -12,6 +12,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 const std::string first(32, 'a');

@@ -8,6 +8,8 @@
 
 #include <sys/resource.h>
 
+using namespace zrm::host;
+
 namespace {
 
 /// Sets the process's soft limit of descriptors while it lives.

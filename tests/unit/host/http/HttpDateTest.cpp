@@ -4,6 +4,8 @@
 
 #include <ctime>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(HttpDateTest, WritesTimesAsHeadersHaveThem) {

@@ -10,6 +10,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

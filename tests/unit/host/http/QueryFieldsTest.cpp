@@ -8,6 +8,8 @@
 #include <functional>
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -4,6 +4,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 const std::string secret(64, 'a');

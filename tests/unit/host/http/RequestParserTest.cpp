@@ -4,6 +4,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 const std::string post = "POST /a HTTP/1.1\r\nHost: h\r\n";

@@ -5,6 +5,8 @@
 #include <array>
 #include <chrono>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -8,6 +8,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 /// Asks a resource without a server between.
 class TestRouter {
 public:

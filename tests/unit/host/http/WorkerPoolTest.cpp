@@ -8,6 +8,8 @@
 #include <set>
 #include <thread>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(WorkerPool, DoesItsWorkInOrderOnAsManyThreadsAsWanted) {

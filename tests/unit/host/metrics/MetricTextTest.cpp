@@ -5,6 +5,8 @@
 #include <array>
 #include <cstdint>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(MetricText, WritesFamilies) {

@@ -8,6 +8,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 namespace {
 
 using Json = nlohmann::json;

@@ -13,6 +13,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

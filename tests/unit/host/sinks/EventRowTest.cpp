@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 EventRow rowOf(std::string_view json) {

@@ -16,6 +16,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

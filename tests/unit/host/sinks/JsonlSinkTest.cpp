@@ -23,6 +23,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string content(const std::string& path) {

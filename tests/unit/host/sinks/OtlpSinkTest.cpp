@@ -9,6 +9,8 @@
 
 #include <nlohmann/json.hpp>
 
+using namespace zrm::host;
+
 namespace {
 
 using Json = nlohmann::json;

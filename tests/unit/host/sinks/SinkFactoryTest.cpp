@@ -7,6 +7,8 @@
 
 #include <string>
 
+using namespace zrm::host;
+
 namespace {
 
 TEST(SinkFactory, MakesEveryTypeUnderItsName) {

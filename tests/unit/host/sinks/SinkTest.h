@@ -13,6 +13,8 @@
 #include <variant>
 #include <vector>
 
+using namespace zrm::host;
+
 /// The sink that this text, behind [[sink]], configures.
 inline SinkConfig sinkConfig(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse("[[sink]]\n" + text, "zrm.toml");

@@ -9,6 +9,8 @@
 
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 std::string messageOf(const EntryEvents::Entry& entry, std::string_view facility = "daemon") {

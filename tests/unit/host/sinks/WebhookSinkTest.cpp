@@ -14,6 +14,8 @@
 
 #include <sys/stat.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using Reply = ScriptedServer::Reply;

@@ -22,6 +22,9 @@
 #include <utility>
 #include <vector>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using testing::ElementsAre;

@@ -15,6 +15,9 @@
 #include <optional>
 #include <thread>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -18,6 +18,9 @@
 #include <thread>
 #include <vector>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+using namespace zrm::host;
+
 namespace {
 
 CommandLine read(const std::vector<const char*>& arguments) {

@@ -20,6 +20,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;

@@ -22,6 +22,9 @@
 
 #include <unistd.h>
 
+using namespace zrm;
+using namespace zrm::host;
+
 namespace {
 
 using namespace std::chrono_literals;
