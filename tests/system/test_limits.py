@@ -51,22 +51,52 @@ def test_a_start_without_a_thread_ends_with_one_sentence(agents, few_threads, hi
     assert ends.index(None) >= 3, ends
 
 
-def test_many_logs_leave_descriptors_for_everything_else(agent):
-    logs = [agent.log(f"{number}.log") for number in range(300)]
+@pytest.mark.skipif(os.geteuid() != 0, reason="a user without other processes takes root")
+def test_a_user_without_processes_left_is_told_so(agents):
+    """The limit itself, in the place of a library that stands for it."""
+    user = str(400_000 + os.getpid() % 100_000)  # with no other process, or the limit counts it
+    ends = {}
+    for processes in (1, 2, 3, 4, 5, 12):
+        agent = agents()
+        agent.situation(log=agent.log())
+        agent.listen = "127.0.0.1:0"
+        as_user = ("setpriv", f"--reuid={user}", f"--regid={user}", "--clear-groups",
+                   "--inh-caps=-all,+dac_override", "--ambient-caps=+dac_override",
+                   "prlimit", f"--nproc={processes}:{processes}")  # fmt: skip
+        agent.start(trace="error", wait=False, wrapper=as_user)
+        if processes == 12:
+            agent.wait_trace("zrmagent: HTTP at")
+            ends[processes] = agent.stop()
+            continue
+        ends[processes] = agent.wait_end()
+        said = agent.stderr.text()
+        assert "manager thread" in said or "no thread can be started" in said or (
+            "zrmagent: cannot start a thread (Resource" in said
+        ), said
+    assert ends == {1: 255, 2: 255, 3: 255, 4: 255, 5: 255, 12: 0}
+
+
+@pytest.mark.parametrize("logs, descriptors, kept", [(300, 256, 64), (2000, 1024, 256)])
+def test_many_logs_leave_descriptors_for_everything_else(agent, logs, descriptors, kept):
+    paths = [agent.directory / f"{number}.log" for number in range(logs)]
+    for path in paths:
+        path.touch()
+    agent.configure(*map(str, paths))
     agent.situation(log=None)
     agent.sink = agent.directory / "events.jsonl"
     agent.listen = "127.0.0.1:0"
-    agent.start(trace="error", wait=False, wrapper=("prlimit", "--nofile=256:256"))
+    limit = ("prlimit", f"--nofile={descriptors}:{descriptors}")
+    agent.start(trace="error", wait=False, wrapper=limit)
     said = agent.wait_trace("logs could not be opened")[0]
-    assert "of 256 descriptors 64 are kept" in said
+    assert f"of {descriptors} descriptors {kept} are kept" in said
     api = Api(agent)
     states = [row["MONSTATUS"] for row in api.logs().values()]
-    assert len(states) == 300
+    assert len(states) == logs
     failed = sum(state != "Running" for state in states)
     assert said.startswith(f"zrmagent: {failed} logs could not be opened"), (failed, said)
-    assert 300 - 192 <= failed < 300 - 100
-    for log in logs:
-        log.append(syslog_line("line"))
-    events = agent.wait_events(300 - failed)
-    assert len(events) == 300 - failed
+    assert logs - (descriptors - kept) <= failed < logs - (descriptors - kept) + 92
+    for path in paths:
+        path.write_text(syslog_line("line"), encoding="utf-8")
+    events = agent.wait_events(logs - failed)
+    assert len(events) == logs - failed
     assert agent.stop() == 0
