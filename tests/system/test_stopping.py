@@ -59,6 +59,11 @@ def status_of_text(api, path):
         connection.close()
 
 
+def cpu_seconds(agent):
+    fields = Path(f"/proc/{agent.process.pid}/stat").read_text().rpartition(")")[2].split()
+    return sum(map(int, fields[11:13])) / os.sysconf("SC_CLK_TCK")
+
+
 def queue_is_full(api):
     _, _, status = api.request("GET", "/api/v1/status")
     return status["queue"]["size"] >= status["queue"]["capacity"]
@@ -264,6 +269,36 @@ def test_a_disk_that_takes_nothing_keeps_neither_signals_nor_requests_waiting(
         assert "7952 lines that waited in the logs were not looked at" in text
 
 
+@pytest.mark.parametrize("history", (True, False))
+def test_a_sink_on_a_frozen_disk_keeps_neither_signals_nor_requests_waiting(agent, disk, history):
+    flag = agent.directory / "flag"
+    agent.environment = {
+        "LD_PRELOAD": str(disk / "frozen_disk.so"),
+        "FROZEN_DISK": str(flag),
+        "FROZEN_FILES": ".jsonl",
+        "ASAN_OPTIONS": "verify_asan_link_order=0",
+    }
+    agent.history = {"enabled": history}
+    agent.sink = agent.directory / "events.jsonl"
+    agent.listen = "127.0.0.1:0"
+    log, other = agent.log(), agent.log("other.log")
+    agent.situation()
+    agent.start()
+    api = Api(agent)
+    flag.touch()
+    flood(log)
+    if history:
+        wait_until(lambda: api.request("GET", "/api/v1/status")[2]["history"]["events"] == FLOOD, "the events")
+    else:
+        wait_until(lambda: queue_stands_still(api), "a full queue")
+    agent.configure(str(other))
+    agent.refresh()
+    agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+    answers(api)
+    stop(agent)
+    assert agent.sink.read_bytes() == b""
+
+
 # ------------------------------------------------------------------ files that are none
 
 
@@ -278,16 +313,26 @@ def test_a_log_that_became_a_pipe_holds_up_neither_reports_nor_its_restart(servi
     assert stop(agent) == 0
 
 
-def test_a_report_over_a_huge_hole_ends_with_its_client(serving, agent):
-    log, api = serving("Jan  1 00:00:00 web1 old: line\n")
-    os.truncate(log.path, 1 << 40)
+def test_a_report_over_a_huge_hole_ends_with_its_client(agent):
+    log = agent.log()
+    os.truncate(log.path, 1 << 40)  # before the monitor, which begins at the end
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
     body = json.dumps({"log": str(log), "from": "2026-01-01T00:00:00", "to": "2099-01-01T00:00:00"})
     connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=60)
     headers = {"Authorization": f"Bearer {api.token}", "Content-Type": "application/json"}
     connection.request("POST", "/api/v1/reports", body, headers)
-    time.sleep(1)
+    wait_until(lambda: cpu_seconds(agent) > 0.3, "the reading of the hole")
     answers(api)
     connection.close()
+
+    def is_quiet():
+        before = cpu_seconds(agent)
+        time.sleep(1)
+        return cpu_seconds(agent) - before < 0.3
+
+    wait_until(is_quiet, "an end of the reading that nobody waits for", 15)
     assert stop(agent) == 0
 
 
