@@ -1,5 +1,6 @@
 """Every view used as a person would, on the real agent."""
 
+import json
 import re
 import time
 
@@ -316,6 +317,21 @@ def test_a_report_is_run_sorted_and_saved(page, agent):
     value.send_keys("not there")
     page.click("Run the report")
     page.wait_text("No entries")
+
+
+def test_what_is_saved_neither_steers_nor_computes(page, agent):
+    auth, _ = logs_agent(agent)
+    text = "=cmd()\u202e\u009b31m\x7f"
+    auth.append(syslog_line(text, "sshd[1]"))
+    page.on(agent, "reports")
+    page.condition("cmd")
+    page.run_report(auth, "1 entry")
+    saved = page.saved("CSV")
+    assert ",'=cmd()\\u202e\\u009b31m\\u007f" in saved
+    assert not set(saved) & set("\u202e\u009b\x7f")
+    saved = page.saved("JSON")
+    assert not set(saved) & set("\u202e\u009b\x7f")
+    assert json.loads(saved)[0]["ENTRYDESC"] == text
 
 
 # ---------------------------------------------------------------------- try a format

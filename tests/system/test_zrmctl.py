@@ -230,6 +230,26 @@ def test_outputs_are_as_kept(watched):
     assert {path.stem for path in GOLDEN.glob("*.txt")} == set(COMMANDS)
 
 
+def test_a_report_as_csv_neither_steers_nor_computes(agent):
+    log = agent.log(content=b"")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    texts = ["=1+1", "+1", "-1", "@sum", "1=1", "a\u202eb\u009bc\x1b[31m\x7f"]
+    log.append("".join(syslog_line(text) for text in texts))
+    api = Api(agent)
+    access = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", str(api.token_file)]
+    report = ["report", str(log), "--format", "csv", "--columns", "ENTRYDESC,ENTRYTIME", *access]
+    code, output, _ = run(report)
+    head, *lines = output.splitlines()
+    assert (code, head) == (0, "ENTRYDESC,ENTRYTIME")
+    times = [line.rpartition(",")[2] for line in lines]
+    assert all(re.fullmatch(r"20\d\d-\d\d-\d\d \d\d:\d\d:\d\d", each) for each in times), times
+    descriptions = [line.rpartition(",")[0] for line in reversed(lines)]
+    assert descriptions == [
+        "'=1+1", "'+1", "'-1", "'@sum", "1=1", "a\\u202eb\\u009bc\\x1b[31m\\x7f",
+    ]  # fmt: skip
+
+
 def test_nothing_is_wider_than_the_terminal(watched):
     agent, log, text, _ = watched
     for command in ("status", "logs", "events", "report LOG", "situations"):

@@ -2,7 +2,7 @@
 
 import { get, post } from "../api.js";
 import { Conditions } from "../conditions.js";
-import { button, empty, failure, field, fill, h, loading, select } from "../dom.js";
+import { button, empty, failure, field, fill, h, loading, select, visible } from "../dom.js";
 import { offsetOf, plural, reachText, stamp } from "../format.js";
 
 const HOUR = 3600 * 1000;
@@ -149,7 +149,7 @@ class ReportPage {
         !truncated && !complete && h("p", { className: "why warn" }, reachText(this.answer)),
         h("div", { className: "push" }, h("label", { className: "check" }, all, "All columns"),
           button("CSV", () => this.#download("csv", "text/csv", this.#csv()), { "aria-label": "Download as CSV" }),
-          button("JSON", () => this.#download("json", "application/json", `${JSON.stringify(this.answer.rows, null, 2)}\n`), { "aria-label": "Download as JSON" }))),
+          button("JSON", () => this.#download("json", "application/json", `${visible(JSON.stringify(this.answer.rows, null, 2))}\n`), { "aria-label": "Download as JSON" }))),
       this.holder);
     this.#drawTable(false);
   }
@@ -180,11 +180,11 @@ class ReportPage {
     return up ? order : -order;
   }
 
-  // A spreadsheet must not take a log's text for a formula.
+  // What a log holds must neither steer a terminal nor be a formula to a spreadsheet.
   #csv() {
     const cell = (value) => {
-      const text = String(value);
-      const safe = typeof value === "string" && /^[=+\-@\t\r]/.test(text) ? `'${text}` : text;
+      const text = visible(String(value));
+      const safe = typeof value === "string" && /^[=+\-@\t]/.test(text) ? `'${text}` : text;
       return /[",\r\n]/.test(safe) ? `"${safe.replaceAll('"', '""')}"` : safe;
     };
     const names = Object.keys(this.answer.rows[0]);
