@@ -58,6 +58,19 @@ def test_the_trace_is_changed_while_the_agent_runs(agent, serving):
     assert get(api, "/api/v1/status")["trace"] == "error,LogFile=all", "a refusal changes nothing"
 
 
+def test_the_trace_shows_the_beginning_of_long_levels(agent, serving):
+    _, api = serving()
+    levels = "error," + ",".join(f"Unit{number}=all" for number in range(300))
+    assert api.request("PUT", "/api/v1/trace", {"levels": levels})[2] == {"levels": levels}
+    agent.wait_trace(f'Trace levels are now "{levels[:200]}" and more.')
+    assert levels[:201] not in agent.stderr.text()
+    for length in (200, 201):
+        levels = "error,".ljust(length - 4, "u") + "=all"
+        assert api.request("PUT", "/api/v1/trace", {"levels": levels})[0] == 200
+        more = " and more" if length > 200 else ""
+        agent.wait_trace(f'Trace levels are now "{levels[:200]}"{more}.')
+
+
 def test_columns_are_those_of_conditions(serving):
     _, api = serving()
     answer = get(api, "/api/v1/columns")
