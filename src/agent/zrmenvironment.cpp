@@ -1,5 +1,5 @@
-// The environment of the process as start-up finds it: what the agent takes from it, and the limits
-// of the system for the trace.
+// The process's environment at start-up: the settings that the agent takes from it, and the system
+// limits that it traces.
 
 #include "agent/zrmmain.h"
 #include "base/ErrorText.h"
@@ -23,8 +23,8 @@ constexpr long displayedPosixVersion = 199506;
 constexpr long displayedPathMax = 1024;
 constexpr const char* constantDisplayed = ">> constant displayed <<";
 
-/// One line of the system's limits: a constant or the value of a selector. Formats of constants
-/// take an int, the others a long and a text.
+/// One system limit: a constant or the value of a selector. Formats of constants take an int, the
+/// others a long and a text.
 struct Limit {
     const char* format;
     enum Source { CONSTANT, SYSCONF } source;
@@ -54,7 +54,7 @@ constexpr Limit systemLimits[] = {
     {"\nCLK_TCK\t\t\t= %ld\tNo. of clock ticks per second. %s", Limit::SYSCONF, _SC_CLK_TCK},
 };
 
-/// One line of the limits of the current directory's file system.
+/// One limit of the current directory's file system.
 struct PathLimit {
     const char* format;
     int name;
@@ -70,14 +70,14 @@ constexpr PathLimit pathLimits[] = {
     {"\nCHOWN_RESTRICTED\t= %ld\tRestricted use of chown. %s", _PC_CHOWN_RESTRICTED},
 };
 
-/// Takes the report row limit from the environment; false when the default is to be used.
+/// Reads the report row limit from the environment. Returns false if the default applies.
 bool takeMaxRows(const TraceScope& trace) {
     constexpr const char* variable = "ZRM_MAX_ROWS";
     const char* const text = std::getenv(variable);
     if (text == nullptr || *text == '\0') {
         return false;
     }
-    // As atoi reads it, with a defined result for numbers out of range.
+    // Like atoi, but with a defined result for numbers out of range.
     gMaxRows = static_cast<std::int32_t>(std::strtol(text, nullptr, 10));
     if (gMaxRows <= 0) {
         trace.error()("Error converting %s value of %s to integer; using default value.", variable,
@@ -126,7 +126,7 @@ const char* setLocale() {
     return categories != nullptr ? categories : "unknown";
 }
 
-/// Traces one limit; `call` and `noValue` name the system call and a value that it does not have.
+/// Traces one limit. `call` names the system call; `noValue` describes a value it does not have.
 long printLimit(const TraceScope& trace, const char* format, long value, int error, int name,
                 const char* call, const char* noValue) {
     const char* suffix = "";

@@ -28,7 +28,7 @@ constexpr const char* component = "zrmagent";
 constexpr const char* nodeType = "ZRM";
 constexpr const char* product = "RM";
 
-/// The agent's own affinity, then the features of the framework that it supports.
+/// The agent's own affinity, followed by the features of the framework that it supports.
 constexpr const char* affinities[] = {
     "ZRM.logs",
     "framework.version-2",
@@ -58,7 +58,7 @@ int zrmMain(int argc, char** argv) {
     SYS1_Main(&argc, argv, component);
     TraceScope trace(anchor);
     checkEnvironment();
-    // Every thread inherits the mask; the manager thread alone takes signals, by waiting for them.
+    // Every thread inherits the mask. Only the manager thread takes signals, by waiting for them.
     blockAllSignals();
     if (std::atexit(shutDown) != 0) {
         const ErrorText error(errno);
@@ -90,7 +90,7 @@ void getSystemName() {
     DetermineLocalHost(gSystemName, systemNameSize);
     gHostName = new (std::nothrow) char[maxHostName + 1]();
     if (gHostName == nullptr) {
-        endWithoutMemory(trace, maxHostName); // without the terminator's byte
+        endWithoutMemory(trace, maxHostName); // not counting the terminator
     }
     utsname names;
     if (::uname(&names) < 0) {

@@ -15,11 +15,11 @@ TRC1_Anchor anchor{"BrevanTime.cpp"};
 
 constexpr std::size_t stampLength = 16;
 
-/// The stamp of the second that the thread asked for last. It holds while the trace levels stay as
-/// they are, and not at all where the flow of operations is traced: each call is an operation then.
+/// The stamp of the second that the thread last asked for. Valid until a trace level changes. Never
+/// valid while the flow class is traced, because then each call must be traced.
 struct CurrentStamp {
     std::time_t second = std::numeric_limits<std::time_t>::min();
-    unsigned generation = 0; ///< of the trace levels; 0: the stamp does not hold
+    unsigned generation = 0; ///< of the trace levels; 0: the stamp is not valid
     char text[stampLength] = {};
 };
 
@@ -32,7 +32,7 @@ void BrevanTime::generateTimestamp(long time, char* out) {
     const std::time_t seconds = time;
     std::tm parts{};
     localtime_r(&seconds, &parts);
-    // Room for any int in each place: years beyond 2899 need a fourth digit and are cut below.
+    // Room for any int in each field. Years after 2899 need a fourth digit and are cut below.
     char text[96];
     std::snprintf(text, sizeof text, "%03d%02d%02d%02d%02d%02d000", parts.tm_year, parts.tm_mon + 1,
                   parts.tm_mday, parts.tm_hour, parts.tm_min, parts.tm_sec);

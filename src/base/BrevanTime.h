@@ -3,14 +3,14 @@
 
 namespace zrm {
 
-/// The 16-character time stamp CYYMMDDhhmmss000, in local time, of which the first three characters
-/// are the years since 1900.
+/// The 16-character time stamp CYYMMDDhhmmss000 in local time. The first three characters are the
+/// years since 1900.
 class BrevanTime {
 public:
-    /// Writes the 16 characters for `time` (seconds since the epoch), without a terminator. Any
-    /// thread.
+    /// Writes the 16 characters for `time` (seconds since the epoch) without a terminator. Safe on
+    /// any thread.
     static void generateTimestamp(long time, char* out);
-    /// The same for the current time; asks the system for the time zone once per second and thread.
+    /// Does the same for the current time. Looks up the time zone once per second and thread.
     static void generateCurrentTimestamp(char* out);
 };
 

@@ -6,7 +6,7 @@
 
 namespace zrm {
 
-/// The numbers from 0 to 99 as two digits each, which spares the per-line path its divisions.
+/// The numbers 0 to 99 as two digits each. Saves the per-line path its divisions.
 namespace DigitPairs {
 
 inline constexpr auto texts = [] {

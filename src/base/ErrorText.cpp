@@ -6,7 +6,7 @@ namespace zrm {
 
 namespace {
 
-// strerror_r comes in two forms; overloads take whichever the system has.
+// strerror_r has two variants. Overloads accept either one.
 [[maybe_unused]] const char* chosenText(int status, const char* buffer) {
     return status == 0 ? buffer : nullptr;
 }

@@ -3,13 +3,13 @@
 
 namespace zrm {
 
-/// The number and text of a system error, for the "errno = %d; %s" and "Return code = %d; %s" of
-/// messages. Unlike strerror it shares no buffer between threads. The text is "Unknown error"
-/// where the system has none.
+/// The number and text of a system error, for messages with "errno = %d; %s" or "Return code = %d;
+/// %s". Unlike strerror, it shares no buffer between threads. The text is "Unknown error" if the
+/// system has none.
 class ErrorText {
 public:
-    /// `number` is errno or the return code of a thread call; pass errno at once, before another
-    /// call can change it.
+    /// `number` is errno or the return code of a pthread call. Pass errno immediately, before
+    /// another call can change it.
     explicit ErrorText(int number) noexcept;
 
     int number() const noexcept { return m_number; }

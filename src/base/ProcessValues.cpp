@@ -1,4 +1,4 @@
-// The process-wide values stand apart from start-up, so that a program can use parts of the agent
+// The process-wide values are separate from start-up, so that a program can use parts of the agent
 // without the framework's main loop.
 
 #include "base/ProcessValues.h"

@@ -5,12 +5,12 @@
 
 namespace zrm {
 
-// Process-wide values. They are written on the initial thread before any other thread exists and
-// are read-only afterwards.
+// Process-wide values. The initial thread writes them before any other thread exists; they are
+// read-only from then on.
 
 extern char* gSystemName;     ///< managed-system name, 65 bytes with its terminator
 extern char* gHostName;       ///< node name, 257 bytes with its terminator; "-1" when unknown
-extern std::int32_t gMaxRows; ///< most rows that one Log Entries report returns
+extern std::int32_t gMaxRows; ///< maximum number of rows in one Log Entries report
 
 } // namespace zrm
 

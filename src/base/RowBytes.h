@@ -5,9 +5,9 @@
 
 namespace zrm {
 
-/// Blanking and copying of a row's bytes for the per-line path. Out of line on purpose: where a
-/// compiler knows a length or its bound, it may put a string instruction in place of memset or
-/// memcpy, and that takes several times as long.
+/// Blanks and copies a row's bytes on the per-line path. Deliberately out of line: a compiler that
+/// knows the length or its bound may replace memset or memcpy with a string instruction, which is
+/// several times slower.
 namespace RowBytes {
 
 void blank(char* bytes, std::size_t length) noexcept;

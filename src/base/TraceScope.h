@@ -8,18 +8,18 @@
 
 namespace zrm {
 
-/// Traces one operation: construction reads the source file's trace level and writes the entry
-/// event, destruction writes the exit event on every return path. Lives on the stack of one
-/// thread. An operation on the per-line path pays a few instructions for it: that takes a
-/// destructor that is always inlined, since a call from where exceptions unwind would keep the
-/// members in memory.
+/// Traces one operation. The constructor reads the source file's trace level and writes the
+/// entry event; the destructor writes the exit event on every return path. Lives on the stack
+/// of one thread. It costs an operation on the per-line path only a few instructions. For that
+/// the destructor must always be inlined: a call during unwinding would keep the members in
+/// memory.
 ///
 ///     TraceScope trace(anchor);
 ///     trace.error()("Error opening file %s", name);   // written when the error class is on
 ///     return trace.result(count);                      // the exit event carries the count
 class TraceScope {
 public:
-    /// A record about to be written, or nothing when its class is off.
+    /// A trace record to write, or nothing if its class is off.
     class Record {
     public:
         Record(const TRC1_Anchor* anchor, int line) noexcept : m_anchor(anchor), m_line(line) {}
@@ -46,17 +46,17 @@ public:
     TraceScope(const TraceScope&) = delete;
     TraceScope& operator=(const TraceScope&) = delete;
 
-    /// True when the class is on; for dumps, and to keep argument work off the per-row path.
+    /// True if the class is on. For dumps, and to skip the work of building arguments.
     bool isOn(TRC1_Class traceClass) const noexcept { return (m_level & traceClass) != 0; }
 
     Record error(int line = __builtin_LINE()) const noexcept { return record(TRC1_ERROR, line); }
     Record detail(int line = __builtin_LINE()) const noexcept { return record(TRC1_DETAIL, line); }
     Record fine(int line = __builtin_LINE()) const noexcept { return record(TRC1_FINE, line); }
-    /// A record that is written whatever the level.
+    /// A record that is written whatever the trace level.
     Record always(int line = __builtin_LINE()) const noexcept { return {&m_anchor, line}; }
 
-    /// Remembers the operation's result for the exit event, of a pointer the address, and passes
-    /// it through.
+    /// Stores the operation's result for the exit event (the address if it is a pointer) and
+    /// returns it unchanged.
     template <typename Result> Result result(Result value) noexcept {
         m_hasResult = true;
         if constexpr (std::is_pointer_v<Result>) {
@@ -69,7 +69,7 @@ public:
 
 private:
     static unsigned level(TRC1_Anchor& anchor) noexcept {
-        // Acquire pairs with the release in TRC1_Sync: a matching generation has its level.
+        // The acquire pairs with the release in TRC1_Sync: a matching generation implies its level.
         if (anchor.generation.load(std::memory_order_acquire) !=
             TRC1_Generation.load(std::memory_order_relaxed)) [[unlikely]] {
             return TRC1_Sync(anchor);

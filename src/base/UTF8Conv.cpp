@@ -11,7 +11,7 @@ namespace {
 
 TRC1_Anchor anchor{"UTF8Conv.cpp"};
 
-/// The locale as first looked up; a race on the first call only repeats the look-up.
+/// Caches the locale after the first look-up. A race on the first call only repeats the look-up.
 struct LocaleCache {
     std::atomic<LOC2_Locale*> locale{nullptr};
     std::atomic<bool> isKnown{false};
@@ -26,11 +26,11 @@ struct LocaleCache {
     }
 };
 
-// Each direction looks the locale up for itself.
+// Each direction looks up the locale separately.
 LocaleCache toUTF8Locale;
 LocaleCache fromUTF8Locale;
 
-/// The locale's code page; 0, with a record whatever the trace level, when there is none.
+/// The locale's code page, or 0 if there is none, which is traced whatever the trace level.
 inline std::uint32_t localCodePage(const TraceScope& trace, LocaleCache& cache,
                                    const char* noCodePage) {
     LOC2_Locale* const locale = cache.get();

@@ -6,16 +6,16 @@
 
 namespace zrm {
 
-/// Conversion between the process's local code page and UTF-8. Both operations return the number
-/// of bytes written, 0 when nothing was converted (no locale, no code page); then `out` is left as
-/// it was. Any thread.
+/// Converts between the process's local code page and UTF-8. Both functions return the number of
+/// bytes written, or 0 if nothing was converted (no locale or no code page), in which case `out` is
+/// unchanged. Any thread.
 class UTF8Conv {
 public:
-    /// Local code page to UTF-8; a text of n bytes needs at most 3 * n + 1. `flags`: 0 terminates
-    /// the output, LOC2_NO_TERMINATOR does not.
+    /// Converts from the local code page to UTF-8. n bytes of text need at most 3 * n + 1 bytes.
+    /// With `flags` 0 the output is terminated, with LOC2_NO_TERMINATOR it is not.
     static std::int32_t Convert_toUTF8(char* out, std::size_t outSize, const char* in,
                                        std::size_t inLength, int flags);
-    /// UTF-8 to the local code page; the output is terminated.
+    /// Converts from UTF-8 to the local code page. The output is terminated.
     static std::int32_t Convert_fromUTF8(char* out, std::size_t outSize, const char* in,
                                          std::size_t inLength);
 };

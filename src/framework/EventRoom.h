@@ -5,16 +5,16 @@
 #include <cstdint>
 #include <functional>
 
-/// Whether the framework has room for what situations accept. Rows are offered only while it has:
-/// dispatching never waits, so that a log's thread waits for room with no lock held, and only for
-/// as long as its log is monitored. One for the process; any thread.
+/// Reports whether the framework has room for the rows that situations accept. Rows are offered
+/// only while it has. Dispatching never blocks: a log's thread waits for room without holding a
+/// lock, and only while its log is monitored. One per process; any thread.
 namespace EventRoom {
 
 enum class State : std::uint8_t {
     HELD,   ///< the situations are still being opened
     FREE,   ///< rows may be offered
-    FULL,   ///< what was accepted before has still to be taken
-    CLOSED, ///< the process is ending: no row is taken any more
+    FULL,   ///< rows accepted earlier have not been taken yet
+    CLOSED, ///< the process is ending; no more rows are taken
 };
 
 extern std::atomic<State> state;
@@ -27,11 +27,11 @@ inline bool mayOffer() noexcept {
     return now() == State::FREE;
 }
 
-/// Waits while there is no room yet and the row is still `isWanted`, which is asked now and then,
-/// and returns the state. The wait can be seen in the numbers of the queue.
+/// Waits until there is room or `isWanted`, polled from time to time, returns false. Returns the
+/// state. The queue's metrics include the wait.
 State wait(const std::function<bool()>& isWanted);
 
-/// Entries of a log were not offered because the process is ending: read and passed over.
+/// Counts entries that were read but not offered because the process is ending.
 void notePassedOver(std::uint64_t entries) noexcept;
 
 } // namespace EventRoom

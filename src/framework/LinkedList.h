@@ -5,18 +5,18 @@
 #include <cstdint>
 #include <vector>
 
-/// A list of elements that it does not own. Not locked: its user guards it.
+/// A list of elements that it does not own. Not locked: the user guards it.
 class LinkedList {
 public:
     /// Adds an element at the end.
     void Add(void* element);
-    /// Removes the first occurrence of the element; nothing happens when there is none.
+    /// Removes the first occurrence of the element. Does nothing if there is none.
     void Remove(void* element);
-    /// Removes all elements and keeps their room.
+    /// Removes all elements but keeps the allocated memory.
     void Clear() noexcept;
-    /// The last element; null when there is none.
+    /// The last element, or null if the list is empty.
     void* Last() const noexcept;
-    /// Another number after every change of the list; never 0.
+    /// Changes with every change of the list; never 0.
     std::uint64_t generation() const noexcept { return m_generation; }
 
 private:
@@ -25,12 +25,12 @@ private:
     std::uint64_t m_generation = 1;
 };
 
-/// Walks a list from its first element. The list must not change while an iterator walks it.
+/// Walks a list from its first element. The list must not change during the walk.
 class LinkedListIter {
 public:
     explicit LinkedListIter(LinkedList& list);
     virtual ~LinkedListIter();
-    /// Returns the next element, null at the end.
+    /// Returns the next element, or null at the end.
     void* Next();
 
 private:

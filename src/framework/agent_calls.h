@@ -1,38 +1,38 @@
 #ifndef ZRM_FRAMEWORK_AGENT_CALLS_H
 #define ZRM_FRAMEWORK_AGENT_CALLS_H
 
-/// Initialises the framework's base services for this process. Called before anything else; may
-/// end the process (help, version, unusable command line).
+/// Initialises the framework's base services for this process. Must be the first call. May end the
+/// process (help, version, invalid command line).
 void SYS1_Main(int* argc, char** argv, const char* component);
 
-/// Remembers the loader that agfmain calls once it accepts table registrations.
+/// Stores the loader. agfmain calls it once it accepts table registrations.
 void AGF_RegisterAgentLoader(int (*loader)());
 
-/// Runs the framework's main loop and returns the process's status when the agent is to end.
+/// Runs the framework's main loop. Returns the exit status when the agent has to end.
 int agfmain(int argc, char** argv);
 
-/// Sets the node type of the managed system.
+/// Sets the managed system's node type.
 void AGF_SetNodeType(const char* nodeType);
 
-/// Writes the managed-system name, at most `size` bytes with its terminator.
+/// Writes the managed-system name, at most `size` bytes including its terminator.
 void DetermineLocalHost(char* name, int size);
 
 /// Adds one affinity of the agent.
 void AGF_SetAffinity(const char* affinity);
 
-/// Sets the agent's version from the version record of `product`; `version` (of `size` bytes)
-/// receives its text, terminated.
+/// Sets the agent's version from the version record of `product`. `version` (`size` bytes) receives
+/// the version text, terminated.
 void AGF_SetVersionUsingProduct(const char* product, char* version, int size);
 
-/// Tells the framework that the agent has begun to end, before it waits for the framework's server.
-/// Returns at once. Any thread.
+/// Notifies the framework that the agent has begun to end, before the agent waits for the
+/// framework's server. Returns immediately. Any thread.
 void AGF_Stopping();
 
-/// Tells the framework that the agent is ending: its threads are stopped, its queues delivered.
+/// Notifies the framework that the agent ends: its threads are stopped and its queues delivered.
 void AGF_Shutdown(int reason);
 
-/// Asks the framework's server to stop, which makes agfmain return; `status` receives 0 or the
-/// server's reason for refusing. Returns at once. Any thread.
+/// Asks the framework's server to stop, which makes agfmain return. `status` receives 0 or the
+/// server's reason for refusing. Returns immediately. Any thread.
 void RPC1_Shutdown(unsigned* status);
 
 #endif

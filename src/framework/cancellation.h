@@ -1,9 +1,9 @@
 #ifndef ZRM_FRAMEWORK_CANCELLATION_H
 #define ZRM_FRAMEWORK_CANCELLATION_H
 
-/// True when the request on which the calling thread works is to end early: who asked has left, its
-/// time is over, or the process ends. False on a thread that works on no request. Cheap enough for
-/// every block that is read.
+/// True if the request that the calling thread works on should end early: the client has
+/// disconnected, the request timed out, or the process is ending. False on a thread without a
+/// request. Cheap enough to call for every block read.
 bool CTX1_IsCancelled() noexcept;
 
 #endif

@@ -17,54 +17,54 @@ enum SampleType : unsigned {
     SAMPLE_SITUATION = 4, ///< rows pushed by events
 };
 
-/// One open request on a table: a situation or a report. Tables derive from it; the framework
-/// creates one through TableManager::CreateCtreq, and destroys it. The agent's threads use it only
+/// One open request on a table: a situation or a report. Tables derive from it. The framework
+/// creates one through TableManager::CreateCtreq and destroys it. The agent's threads use it only
 /// under the table manager's lock and pinned by UseHandle.
 class ctreq {
 public:
-    /// All three are the framework's and outlive the object.
+    /// The framework owns all three; they outlive the object.
     ctreq(RequestDetail* detail, ContextInfo* context, TableManager* manager);
     ctreq(const ctreq&) = delete;
     ctreq& operator=(const ctreq&) = delete;
 
-    // The virtual operations stand in slot order.
+    // The virtual functions are in slot order.
 
     /// Dumps the object to the trace.
     virtual void PrintSelf();
     /// Produces the rows of one sample.
     virtual void TakeSample() = 0;
-    /// Number of columns of the table.
+    /// The number of columns of the table.
     virtual int NumColumns();
-    /// Describes column `index`; returns 0 or a status.
+    /// Describes column `index`. Returns 0 or a status.
     virtual unsigned GetColumnInfo(ColumnInfo* info, int index);
     virtual unsigned ExecuteCommand(char* command, int length, char* result);
     virtual ~ctreq();
-    /// Copies one row into the data array; a non-zero status stops further inserts of the pass.
+    /// Copies one row into the data array. A non-zero status ends the current pass.
     virtual unsigned InsertRow(char* row);
-    /// Non-zero when the row meets the request's conditions.
+    /// Non-zero if the row meets the request's conditions.
     virtual unsigned CheckForException(char* row);
-    /// Non-zero when the named column of the row compares true against the value.
+    /// Non-zero if comparing the row's named column with the value yields true.
     virtual unsigned ColumnIsException(char* row, char* column, _IntfOper op, char* value);
     virtual void CommandCompleted(CtreqAutomationCapsule* capsule);
 
-    /// Delivers the next condition: 0 and its address, or non-zero at the end.
+    /// Returns 0 and the address of the next condition, or non-zero at the end.
     unsigned GetFilterInfo(SEL1_FILTERINFO** filter);
-    /// Starts the walk over the conditions afresh.
+    /// Restarts the iteration over the conditions.
     void ResetFilterIndex();
-    /// Compares a character column of `width` bytes with a terminated text, neither's padding
-    /// counting.
+    /// Compares a character column of `width` bytes with a terminated text. Ignores the padding of
+    /// both.
     int IsException(_IntfOper op, const char* column, const char* value, int width);
-    /// Compares an integer column with a number of 8 bytes in host order, perhaps unaligned.
+    /// Compares an integer column with an 8-byte number in host order, which may be unaligned.
     int IsException(_IntfOper op, int column, const char* value);
     /// Dumps the conditions to the trace.
     void DumpThresholds();
-    /// Sends the rows collected so far (`count` of them).
+    /// Sends the `count` rows collected so far.
     unsigned Dispatch();
     /// Ends the situation.
     unsigned Stop();
-    /// Marks the request as stopped; reasons: 1 corrupted time-stamp chain, 2 invalid sample type.
+    /// Marks the request as stopped. Reasons: 1 corrupted time-stamp chain, 2 invalid sample type.
     unsigned Stopped(unsigned reason);
-    /// Pins the request of this handle until RSC1_Drop; null when there is none. Any thread.
+    /// Pins the request with this handle until RSC1_Drop. Null if there is none. Any thread.
     static ctreq* UseHandle(unsigned handle);
 
     const char* name() const noexcept { return m_name; }
@@ -74,15 +74,15 @@ public:
     unsigned interval() const noexcept { return m_interval; }
     TableManager* manager() const noexcept { return m_manager; }
 
-    /// What the framework keeps with a request: the framework's own matter.
+    /// What the framework stores with a request; private to the framework.
     class Framework;
     Framework& framework() noexcept { return *m_framework; }
 
-    /// The data array: rows collected for the next dispatch, `rowSize` bytes each, back to back.
+    /// The data array: the rows collected for the next dispatch, `rowSize` bytes each, contiguous.
     char* rows() const noexcept { return m_rows.get(); }
-    unsigned count = 0;     ///< rows held
-    unsigned allocated = 0; ///< rows for which room exists
-    unsigned allocSize = 0; ///< rows of room added each time it runs out; set by the table
+    unsigned count = 0;     ///< rows in the array
+    unsigned allocated = 0; ///< rows the array has room for
+    unsigned allocSize = 0; ///< rows to grow by when the array is full; set by the table
     unsigned rowSize = 0;   ///< bytes; set by the table
 
 private:

@@ -3,7 +3,7 @@
 
 #include <cstdint>
 
-/// Comparison operators of filter conditions. Codes outside this list are the framework's own and
+/// Comparison operators of filter conditions. Codes outside this list belong to the framework and
 /// are passed through.
 enum _IntfOper : std::int16_t {
     INTF_EQUAL = 1,
@@ -17,8 +17,8 @@ enum _IntfOper : std::int16_t {
 /// Data type of an integer filter value.
 inline constexpr std::int16_t SEL1_INTEGER = 496;
 
-/// One condition of a request's filter, as the framework publishes it. Owned by the request and
-/// valid as long as it lives.
+/// One condition of a request's filter as published by the framework. Owned by the request and
+/// valid as long as the request lives.
 struct SEL1_FILTERINFO {
     const char* columnName; ///< upper-case text, terminated
     _IntfOper compareOperator;

@@ -8,10 +8,10 @@ struct SYS1_Lock {
     pthread_mutex_t mutex = PTHREAD_MUTEX_INITIALIZER;
 };
 
-/// Takes the lock; waits while another thread holds it.
+/// Takes the lock. Waits while another thread holds it.
 void SYS1_GetLock(SYS1_Lock* lock);
 
-/// Releases a lock that the calling thread holds.
+/// Releases a lock held by the calling thread.
 void SYS1_ReleaseLock(SYS1_Lock* lock);
 
 #endif

@@ -20,7 +20,7 @@ TRC1_Anchor anchor{"LogManager.cpp"};
 
 constexpr const char* defaultSyslogConfFile = "/etc/syslog.conf";
 
-/// The value of an environment variable, null when it is unset or empty.
+/// The value of an environment variable, or null if it is unset or empty.
 const char* environment(const char* name) {
     const char* const value = std::getenv(name);
     return value != nullptr && *value != '\0' ? value : nullptr;
@@ -207,7 +207,7 @@ void LogManager::shutdown() {
     TraceScope trace(anchor);
     trace.detail()("Shutdown commencing.");
     stopManagerThread();
-    // Only now does nobody read the paths any more.
+    // From here on nothing reads the paths.
     ConfigFile.reset();
     SyslogConfFile.reset();
     DebugLog.reset();
@@ -246,9 +246,9 @@ void LogManager::closeDebugLog() {
 
 void LogManager::printSelf() const {
     TraceScope trace(anchor);
-    // Both times show the syslog configuration's.
+    // Both times show that of the syslog configuration.
     const std::time_t changed = SyslogConfFileLastChanged;
-    char lastChanged[26] = ""; // stays empty for a year that has no text
+    char lastChanged[26] = ""; // stays empty for a year that cannot be printed
     ctime_r(&changed, lastChanged);
     const pthread_t thread = ManagerThread;
     trace.always()(

@@ -18,13 +18,13 @@ namespace zrm {
 class LogFile;
 
 /// The single owner of everything that is monitored. Its manager thread reads the configuration,
-/// builds and deletes the monitoring objects and takes the process's signals (SIGHUP, SIGINT,
-/// SIGTERM, SIGQUIT and SIGCHLD, which the creator has blocked before any thread exists); requests
-/// of the tables bracket their use of the chain of logs with beginRequest and endRequest. Lives
-/// from start-up until the exit routine destroys it.
+/// creates and deletes the monitoring objects and handles the process's signals (SIGHUP, SIGINT,
+/// SIGTERM, SIGQUIT and SIGCHLD, which the creator must block before any thread exists). Requests
+/// on the tables use the chain of logs only between beginRequest and endRequest. Lives from
+/// start-up until the exit routine destroys it.
 class LogManager {
 public:
-    /// Reads the environment and starts the manager thread. Ends the process when that fails.
+    /// Reads the environment and starts the manager thread. Ends the process if that fails.
     LogManager();
     LogManager(const LogManager&) = delete;
     LogManager& operator=(const LogManager&) = delete;
@@ -33,28 +33,28 @@ public:
 
     // For requests, on any thread.
 
-    /// Holds the chain of logs still until endRequest: a refresh waits.
+    /// Keeps the chain of logs unchanged until endRequest; a refresh waits.
     void beginRequest();
-    /// Ends a request; a refresh that waits for the last one goes on.
+    /// Ends a request. A refresh that waits for the last request then continues.
     void endRequest();
-    /// True while a refresh waits for requests to end: a long one may end early. Any thread.
+    /// True while a refresh waits for requests; a long one can then end early. Any thread.
     bool isRefreshWaiting() const noexcept { return RefreshWaiting.load(); }
-    /// Records that the framework has begun to serve requests; a stop waits for that.
+    /// Records that the framework has begun to serve requests. A stop waits for that.
     void setServerUp();
-    /// Walks the chain between beginRequest and endRequest: null gives the first log; `index` is
-    /// the number of logs already given. Null at the end.
+    /// Walks the chain between beginRequest and endRequest. Null returns the first log. `index` is
+    /// the number of logs already returned. Returns null at the end.
     LogFile* getNextLogObject(LogFile* current, unsigned index);
-    /// The monitored log of this local name, or null. Between beginRequest and endRequest.
+    /// The monitored log with this local name, or null. Use between beginRequest and endRequest.
     LogFile* findLogObject(const char* localName);
-    /// True when a refresh now would take the log configuration for unchanged. Any thread.
+    /// True if a refresh now would consider the log configuration unchanged. Any thread.
     bool isConfigTakenOver(std::time_t lastModified) const noexcept {
         return lastModified == ConfigFileLastChanged.load();
     }
     std::uint32_t numLogs() const noexcept { return NumLogs.load(); }
-    /// The open debug log, or null. Any thread; it stays open as long as any log exists.
+    /// The open debug log, or null. It stays open as long as any log exists. Any thread.
     std::FILE* debugLogStream() const noexcept { return DebugLogP.load(); }
 
-    /// Writes one record of all fields, whatever the level. Any thread.
+    /// Writes one record with all fields, whatever the trace level. Any thread.
     void printSelf() const;
 
 private:
@@ -66,15 +66,15 @@ private:
 
     void startManagerThread();
     void stopManagerThread();
-    /// Waits for the next signal that matters: true for a refresh, false to stop.
+    /// Waits for the next relevant signal. True: refresh; false: stop.
     bool waitForSignal();
     void terminateFramework();
     void waitForServer();
-    /// Waits on a condition with the manager locked (`limit` null: for ever); only here and in
-    /// sleep and sigwait can the manager thread be cancelled.
+    /// Waits on a condition with the manager locked (`limit` null: forever). The manager thread can
+    /// only be cancelled here and in sleep and sigwait.
     int waitFor(pthread_cond_t& condition, const timespec* limit);
 
-    /// Re-reads the configuration; returns the number of logs, 0 when there is nothing to do.
+    /// Re-reads the configuration. Returns the number of logs, or 0 if there is nothing to do.
     std::uint32_t refresh();
     void waitForRequests();
     std::uint32_t getValidLogs();
@@ -84,16 +84,16 @@ private:
     void buildLogObjects(unsigned validCount);
     void buildLogObject(const ValidLog& log);
     void retireMarkedLogs();
-    /// Ends the monitoring of what was taken off the chain. Without the lock: a thread takes up to
-    /// a second to end, and requests need the lock meanwhile.
+    /// Ends the monitoring of the logs taken off the chain. Runs without the lock, because a thread
+    /// needs up to a second to end and requests need the lock in the meantime.
     void deleteRetiredLogs();
-    /// Deletes the chain from its tail to `log`, which is its member number `depth`; the manager
-    /// gives the head and 1.
+    /// Deletes the chain from its tail up to `log`, its member number `depth`. The manager passes
+    /// the head and 1.
     void deleteNextLog(LogFile* log, unsigned depth);
     void deleteLogObject(LogFile* log);
-    /// Takes the log off the chain, which does not wait.
+    /// Takes the log off the chain. Does not wait.
     void retireLogObject(LogFile* log);
-    /// Waits like sleep, but for a signal that ends the agent, which it takes.
+    /// Waits like sleep, but ends early on a signal that ends the agent, and consumes it.
     void sleepUnlessStopped(unsigned seconds);
 
     void lockManager();
@@ -102,7 +102,7 @@ private:
     void openDebugLog();
     void closeDebugLog();
 
-    // What printSelf reads while other threads write is atomic.
+    // Atomic where printSelf reads while other threads write.
     std::atomic<bool> AgentServerUp{false};
     std::unique_ptr<char[]> ConfigFile;
     std::unique_ptr<char[]> DebugLog;
@@ -118,15 +118,15 @@ private:
     std::atomic<std::uint32_t> NumLogs{0};
     std::atomic<std::int32_t> UseCount{0};
     std::atomic<bool> RefreshWaiting{false};
-    LogFile* RetiredLogs = nullptr; ///< owns a chain of logs to delete; the manager thread's
+    LogFile* RetiredLogs = nullptr; ///< owns a chain of logs to delete; manager thread only
     Pulse ManagerPulse{"the log manager"};
-    /// Owns the circular chain of valid logs, which exists from the reading of the configuration
-    /// to the building of the objects.
+    /// Owns the circular chain of valid logs, which exists from reading the configuration until the
+    /// monitoring objects are built.
     std::atomic<ValidLog*> FirstValidLog{nullptr};
 };
 
-/// The one log manager; null until start-up created it. Atomic, since its own threads already run
-/// when start-up stores it. Never cleared.
+/// The one log manager; null until start-up has created it. Atomic because its own threads already
+/// run when start-up stores it. Never cleared.
 extern std::atomic<LogManager*> pTheLogManager;
 
 /// The manager thread's start routine; its argument is the LogManager.

@@ -1,5 +1,5 @@
-// The configuration of LogManager: the chain of valid logs is read from the log configuration or,
-// where that has none, from the syslog configuration.
+// The configuration part of LogManager: reads the chain of valid logs from the log configuration
+// or, if that has none, from the syslog configuration.
 
 #include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
@@ -45,7 +45,7 @@ std::uint32_t LogManager::getValidLogs() {
     return trace.result(count);
 }
 
-/// The valid logs of the syslog configuration; 0 when there are none or it has not changed.
+/// The valid logs of the syslog configuration; 0 if there are none or the file has not changed.
 std::uint32_t LogManager::getDefaultLogs() {
     TraceScope trace(anchor);
     const std::time_t changed = LogManagerUtil::fileLastModified(SyslogConfFile.get());
@@ -83,7 +83,7 @@ std::uint32_t LogManager::createValidLogList(WhenceConfig whence, const char* pa
         if (FirstValidLog == nullptr) {
             FirstValidLog = log.get();
         }
-        // The chain keeps the object until discardValidLogs.
+        // The chain owns the object until discardValidLogs.
         static_cast<void>(log.release());
     }
     return trace.result(count);

@@ -1,4 +1,4 @@
-// The refresh of LogManager: monitoring objects are built and deleted to fit the configuration.
+// The refresh part of LogManager: makes the monitoring objects match the configuration.
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
@@ -15,9 +15,9 @@ namespace {
 
 TRC1_Anchor anchor{"LogManagerRefresh.cpp"};
 
-constexpr unsigned noWorkSeconds = 60; ///< how long an agent without logs stays before it ends
+constexpr unsigned noWorkSeconds = 60; ///< how long an agent without logs runs before it ends
 
-/// True when the object goes on as the monitor of this line, under a new debug mode perhaps.
+/// True if the object can continue as the monitor of this line, possibly in a new debug mode.
 bool canMonitor(const LogFile& object, const ValidLog& log) {
     return object.type() == log.type() && std::strcmp(object.procedure(), log.procedure()) == 0;
 }
@@ -94,7 +94,7 @@ void LogManager::buildLogObjects(unsigned validCount) {
     discardValidLogs();
 }
 
-/// Lets the log's present object go on, or creates a new one.
+/// Keeps the log's existing object or creates a new one.
 void LogManager::buildLogObject(const ValidLog& log) {
     TraceScope trace(anchor);
     LogFile* const present = findLogObject(log.fileNameLocal());
@@ -126,7 +126,7 @@ void LogManager::retireMarkedLogs() {
     for (std::uint32_t left = NumLogs; left > 0; --left) {
         LogFile* const next = object->next();
         if (object->isMarked()) {
-            // All are asked before the first is waited for: together they take as long as one.
+            // Ask all of them before waiting for the first: together they take as long as one.
             object->askToStop();
             retireLogObject(object);
             object->addToChain(RetiredLogs);
@@ -163,7 +163,7 @@ void LogManager::discardValidLogs() {
 
 void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
     TraceScope trace(anchor);
-    // Down to the tail, counting, before anything is deleted.
+    // First find and count down to the tail, then delete.
     const unsigned firstDepth = depth;
     for (; depth <= NumLogs && log->next() != FirstLogObject; ++depth) {
         log = log->next();
@@ -175,7 +175,7 @@ void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
         std::exit(-1);
     }
     if (depth == NumLogs) {
-        // All are asked before the first is waited for: together they take as long as one.
+        // Ask all of them before waiting for the first: together they take as long as one.
         for (LogFile* member = log;; member = static_cast<LogFile*>(member->prev())) {
             member->askToStop();
             if (member == FirstLogObject) {
@@ -215,7 +215,7 @@ void LogManager::retireLogObject(LogFile* log) {
     }
     trace.detail()("Deleting log object for file %s.", log->fileNameLocal());
     log->removeFromChain();
-    log->addToChain(nullptr); // its destructor finds nobody to unlink it from
+    log->addToChain(nullptr); // its destructor then has nothing to unlink it from
     --NumLogs;
 }
 

@@ -1,4 +1,4 @@
-// The manager thread of LogManager: its start and stop, its loop, signals and waits.
+// The manager thread of LogManager: start and stop, main loop, signals and waits.
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
@@ -21,7 +21,7 @@ TRC1_Anchor anchor{"LogManagerThread.cpp"};
 
 constexpr int serverUpSeconds = 10; ///< how long a stop waits for the framework's server
 
-/// Ends the process when a step of the manager's start failed.
+/// Ends the process if a step of starting the manager failed.
 void require(const TraceScope& trace, int code, const char* failure, int line = __builtin_LINE()) {
     if (code != 0) {
         const ErrorText error(code);
@@ -33,7 +33,7 @@ void require(const TraceScope& trace, int code, const char* failure, int line = 
     }
 }
 
-/// Traces a step of the manager's stop, which goes on in any case.
+/// Traces a step of stopping the manager, which continues in any case.
 void report(const TraceScope& trace, int code, const char* failure, const char* success,
             int line = __builtin_LINE()) {
     if (code != 0) {
@@ -113,7 +113,7 @@ void* managerThread(void* argument) {
     TraceScope trace(anchor);
     ManagerCancellation::forbid();
     auto* const manager = static_cast<LogManager*>(argument);
-    // The creator stores the same value, perhaps later than this thread needs it.
+    // The creator stores the same value, but possibly later than this thread needs it.
     manager->ManagerThread = pthread_self();
     trace.detail()("Log manager thread successfully started.");
     while (manager->refresh() != 0 && manager->waitForSignal()) {

@@ -5,9 +5,9 @@
 
 namespace zrm {
 
-/// Lets the manager thread be cancelled while it lives: around the calls in which the thread waits.
-/// Everywhere else cancellation is forbidden, since files, locks and half-built chains would be
-/// left behind, and since a cancellation cannot unwind through the noexcept calls of the trace.
+/// Allows cancellation of the manager thread while the object lives, around calls in which the
+/// thread waits. Cancellation is disabled everywhere else: it would leak files, locks and
+/// half-built chains, and it cannot unwind through the noexcept calls of the trace.
 class ManagerCancellation {
 public:
     ManagerCancellation() { set(PTHREAD_CANCEL_ENABLE); }
@@ -15,7 +15,7 @@ public:
     ManagerCancellation(const ManagerCancellation&) = delete;
     ManagerCancellation& operator=(const ManagerCancellation&) = delete;
 
-    /// Forbids cancellation of the calling thread until an object lives; at the thread's start.
+    /// Disables cancellation of the calling thread. Called at the thread's start.
     static void forbid() { set(PTHREAD_CANCEL_DISABLE); }
 
 private:

@@ -1,4 +1,4 @@
-// The one log manager stands apart from its class, so that a test can put its own in its place.
+// The log manager instance is separate from its class, so that a test can define its own.
 
 #include "logmgr/LogManager.h"
 

@@ -14,7 +14,7 @@ namespace {
 
 TRC1_Anchor anchor{"LogBase.cpp"};
 
-/// An array of zeroed characters; ends the process when memory runs out.
+/// A zeroed character array. Ends the process if memory runs out.
 std::unique_ptr<char[]> newText(const TraceScope& trace, std::size_t size) {
     std::unique_ptr<char[]> text(new (std::nothrow) char[size]());
     if (!text) {
@@ -54,7 +54,7 @@ LogBase::LogBase(const LogBase& other) {
 
 void LogBase::setLogFileName(const char* name, int isUTF8) {
     TraceScope trace(anchor);
-    // The work buffers start zeroed: a conversion that is not possible leaves them alone.
+    // The work buffers start zeroed. A conversion that is not possible leaves them unchanged.
     if (isUTF8 != 1) {
         LogFileNameLocal = newLogFileName(LogPathNameLengthLocal, name);
         const std::size_t length = std::strlen(LogFileNameLocal.get());

@@ -7,38 +7,38 @@
 
 namespace zrm {
 
-/// Returns a heap copy of `name` and sets `pathLength` to the length of its directory part with
-/// the last '/', 0 (and an error in the trace) when it has none. Ends the process when memory runs
-/// out.
+/// Returns a heap copy of `name` and sets `pathLength` to the length of its directory part
+/// including the last '/'. If there is none, `pathLength` is 0 and the trace shows an error. Ends
+/// the process if memory runs out.
 std::unique_ptr<char[]> newLogFileName(std::size_t& pathLength, const char* name);
 
-/// What a line of the configuration and a monitored log share: the log's name in the local code
-/// page (to open it) and in UTF-8 (to report it), its type, debug mode and procedure, and the links
-/// of a circular chain that its owner heads. Not locked; the log manager's lock guards the chain.
+/// The common part of a configuration line and a monitored log: the name in the local code page (to
+/// open) and in UTF-8 (to report), type, debug mode, procedure, and the links of a circular chain
+/// whose head the owner holds. Not locked; the log manager's lock guards the chain.
 class LogBase {
 public:
     LogBase() = default;
-    /// Copies names, type, debug mode and procedure; the copy is on no chain.
+    /// Copies names, type, debug mode and procedure. The copy is not on a chain.
     LogBase(const LogBase& other);
     LogBase& operator=(const LogBase&) = delete;
     virtual ~LogBase() = default;
 
-    /// Sets both names from one: UTF-8 when `isUTF8` is 1, else in the local code page.
+    /// Sets both names from one, which is UTF-8 if `isUTF8` is 1, else in the local code page.
     void setLogFileName(const char* name, int isUTF8);
-    /// False when a conversion has cut the name or put other characters into it, so that the one
-    /// name no longer stands for the file of the other: `isUTF8` says which one was given. A name
-    /// that has no other form at all, as without a code page, is not such a case.
+    /// False if a conversion cut the name or replaced characters, so that one name no longer
+    /// denotes the same file as the other. `isUTF8` says which name was given. A name that could
+    /// not be converted at all (no code page) still counts as kept.
     bool isNameKept(int isUTF8) const;
-    /// Stores a copy of the procedure; null stays null.
+    /// Stores a copy of the procedure. Null remains null.
     void setLogProcedure(const char* procedure);
-    /// Links this object in at the tail of the chain that `head` heads; null: a chain of one.
+    /// Adds this object at the tail of the chain headed by `head`. Null: a chain of one.
     void addToChain(LogBase* head);
-    /// Unlinks this object; its own links stay. Not for a chain of one.
+    /// Unlinks this object but leaves its own links unchanged. Not for a chain of one.
     void removeFromChain();
-    /// Writes one trace record of all fields, whatever the level.
+    /// Writes one trace record with all fields, whatever the trace level.
     void printSelf() const;
 
-    // A missing name or procedure reads as the empty text.
+    // A missing name or procedure is returned as an empty text.
     const char* fileNameLocal() const noexcept { return text(LogFileNameLocal); }
     const char* fileNameUTF8() const noexcept { return text(LogFileNameUTF8); }
     const char* procedure() const noexcept { return text(LogProcedure); }
@@ -54,7 +54,7 @@ protected:
         return field ? field.get() : "";
     }
 
-    std::atomic<char> LogDebugMode{'N'}; ///< a refresh changes it while the log's thread reads it
+    std::atomic<char> LogDebugMode{'N'}; ///< a refresh may change it while the thread reads it
     char LogType = 'S';
     std::unique_ptr<char[]> LogFileNameUTF8;
     std::unique_ptr<char[]> LogFileNameLocal;

@@ -19,8 +19,8 @@ namespace {
 
 TRC1_Anchor anchor{"LogManagerUtil.cpp"};
 
-/// The one configuration file being read. Trivially destructible: the process may end while the
-/// manager thread reads.
+/// The configuration file being read. Trivially destructible, because the process may end while the
+/// manager thread is reading.
 struct Reader {
     std::FILE* stream;
     char* line;
@@ -59,10 +59,10 @@ void Reader::close() {
 
 std::FILE* LogManagerUtil::openStream(const char* path, const char* mode) {
     const bool appending = mode[0] == 'a';
-    // What the agent writes holds log lines, and goes where the configuration says: others get no
-    // permission, and a link put in the file's place leads nowhere.
+    // Files that the agent writes contain log lines, and the configuration chooses their location.
+    // So others get no permissions, and a symbolic link in place of the file is not followed.
     const int flags = appending ? O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW : O_RDONLY;
-    // Neither the opening nor a write waits for whoever is at the other end of a pipe.
+    // Neither the open nor a write may block on the other end of a pipe.
     const int fd = ::open(path, flags | O_NONBLOCK | O_CLOEXEC, 0640);
     if (fd == -1) {
         return nullptr;
@@ -137,8 +137,8 @@ char* LogManagerUtil::getNextRec(const char* path) {
 }
 
 char* LogManagerUtil::xtoa(char* out, const void* /*data*/, std::size_t /*length*/) {
-    // Every digit would go to the first character, where the terminator replaces it. The bytes are
-    // not even looked at: they are those of locks that other threads are using.
+    // Every digit would be written to the first character, which the terminator then overwrites.
+    // The bytes are not even read: they belong to locks that other threads are using.
     *out = '\0';
     return out;
 }

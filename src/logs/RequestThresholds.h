@@ -5,10 +5,10 @@
 
 namespace zrm {
 
-/// A report's time window and a situation's event-rate thresholds. Handed by address to the log
-/// types' report operations.
+/// A report's time window and a situation's event-rate thresholds. The log types' report functions
+/// take its address.
 struct _RequestThresholds {
-    char startTime[17];           ///< 16-character time stamp, terminated; empty when not given
+    char startTime[17];           ///< 16-character time stamp, terminated; empty if not given
     char endTime[17];             ///< the same
     std::int64_t freqThreshold;   ///< N: at least N entries in the period; -N: at most N; 0: none
     std::int64_t periodThreshold; ///< seconds; 0: none

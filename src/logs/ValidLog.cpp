@@ -21,7 +21,7 @@ TRC1_Anchor anchor{"ValidLog.cpp"};
 
 constexpr std::string_view logTypes = "SEAU";
 constexpr std::string_view typesWithProcedure = "EU";
-constexpr std::string_view nameToken = "${@}"; ///< stands for the log's name in a procedure
+constexpr std::string_view nameToken = "${@}"; ///< replaced with the log's name in a procedure
 
 /// The fields of a configuration line, numbered from 1.
 enum Field : int {
@@ -57,7 +57,7 @@ public:
         return token;
     }
 
-    /// Gives the last token the rest of the line, behind a blank.
+    /// Appends a blank and the rest of the line to the last token.
     void takeRest() {
         if (*m_rest != '\0') {
             *m_end = ' ';
@@ -67,7 +67,7 @@ public:
 
 private:
     static constexpr const char* separators = "\t ";
-    char* m_rest;          ///< what is not split yet
+    char* m_rest;          ///< the part not split yet
     char* m_end = nullptr; ///< the last token's terminator
 };
 
@@ -121,11 +121,11 @@ void ValidLog::extractTokens(char* line) {
             takeField(trace, field, token + 1);
         }
     }
-    // A log of type 'U' or 'E' without a procedure is valid here; what to make of it is the
-    // business of its monitor.
+    // A log of type 'U' or 'E' without a procedure is valid here. Its monitor decides what to do
+    // about it.
 }
 
-/// True when the token begins with ';' where it must and only there.
+/// True if the token begins with ';' exactly where it must.
 bool ValidLog::hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const {
     const bool isSeparated = *token == ';';
     if (field == FIELD_FILE_NAME) {
@@ -135,7 +135,7 @@ bool ValidLog::hasSeparatorAsNeeded(const TraceScope& trace, int field, const ch
         return !isSeparated;
     }
     if (!isSeparated) {
-        // The length of the log's path stands where one would look for the log's name.
+        // The message shows the length of the log's path in place of its name.
         char pathLength[24];
         std::snprintf(pathLength, sizeof pathLength, "%zu", LogPathNameLengthUTF8);
         trace.error()("Field separator missing after field %d for log %s. Skipping rest of line.",
@@ -178,7 +178,7 @@ void ValidLog::takeFileName(const TraceScope& trace, const char* token) {
     }
 }
 
-/// A name that its conversion has changed would be the name of another file.
+/// A name altered by its conversion would denote a different file.
 bool ValidLog::isNameUsable(const TraceScope& trace, int isUTF8) const {
     const bool isUsable = isNameKept(isUTF8);
     if (!isUsable) {
@@ -203,7 +203,7 @@ void ValidLog::takeType(const TraceScope& trace, const char* token) {
     }
 }
 
-/// True on the one system that has an error log, and where the system cannot be told.
+/// True on the one system that has an error log, and if the system cannot be determined.
 bool ValidLog::isErrorLogSystem(const TraceScope& trace) const {
     utsname names;
     if (::uname(&names) < 0) {
@@ -236,7 +236,7 @@ void ValidLog::extractFileName(char* line) {
                        "followed by an absolute file name.");
         return;
     }
-    // Actions such as remote hosts and lists of users are no logs.
+    // Actions such as remote hosts and user lists are not logs.
     if (*action != '/' || LogManagerUtil::fileLastModified(action) == 0) {
         return;
     }

@@ -7,29 +7,29 @@ namespace zrm {
 
 class TraceScope;
 
-/// Where a line comes from.
+/// The source of a configuration line.
 enum WhenceConfig : char {
-    CONFIG_USER = 'U',    ///< a line of the log configuration file
-    CONFIG_DEFAULT = 'D', ///< a line of the syslog configuration file
+    CONFIG_USER = 'U',    ///< log configuration file
+    CONFIG_DEFAULT = 'D', ///< syslog configuration file
 };
 
-/// One accepted line of the log configuration, or, while isValid() is false, a refused one. Lives
-/// on the log manager's chain of valid logs until the monitoring objects are built. Manager thread
-/// only.
+/// One accepted line of the log configuration, or a rejected one if isValid() is false. Stays on
+/// the log manager's chain of valid logs until the monitoring objects have been built. Manager
+/// thread only.
 class ValidLog : public LogBase {
 public:
-    /// Parses `line` (and modifies it), checks it against the chain that starts at `head` (null for
-    /// an empty one) and, when it is valid, joins that chain.
+    /// Parses `line` (which it modifies) and checks it against the chain that starts at `head`
+    /// (null: empty). A valid line joins that chain.
     ValidLog(WhenceConfig whence, char* line, ValidLog* head);
     ValidLog(const ValidLog&) = delete;
-    /// Leaves the chain when valid.
+    /// Leaves the chain if valid.
     ~ValidLog() override;
 
     bool isValid() const noexcept { return Valid; }
-    /// Replaces each "${@}" by the local file name and stores the result. Ends the process when
+    /// Replaces each "${@}" with the local file name and stores the result. Ends the process if
     /// memory runs out.
     void setLogProcedure(const char* procedure);
-    /// Writes the records of LogBase and of this class, whatever the level.
+    /// Writes the records of LogBase and of this class, whatever the trace level.
     void printSelf() const;
 
     ValidLog* next() const noexcept { return static_cast<ValidLog*>(Next); }
@@ -40,11 +40,11 @@ private:
     void extractTokens(char* line);
     /// Parses a line of the syslog configuration file: selector, action.
     void extractFileName(char* line);
-    /// Refuses this line when its log is already on the chain.
+    /// Rejects this line if its log is already on the chain.
     void checkForDups(const ValidLog* head);
 
     bool hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const;
-    // The fields of a configuration line; a refused line loses Valid.
+    // The fields of a configuration line. A rejected line clears Valid.
     void takeFileName(const TraceScope& trace, const char* token);
     bool isNameUsable(const TraceScope& trace, int isUTF8) const;
     void takeField(const TraceScope& trace, int field, const char* token);

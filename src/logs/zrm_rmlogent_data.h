@@ -6,8 +6,8 @@
 
 namespace zrm {
 
-/// One Log Entries row. Character columns are blank-padded and not terminated; the framework reads
-/// the columns by offset and width, so the layout is fixed.
+/// One Log Entries row. Character columns are blank-padded and not terminated. The framework reads
+/// columns by offset and width, so the layout is fixed.
 struct zrm_rmlogent_data_t {
     char originnode[64];
     char logpath[256];
@@ -37,7 +37,7 @@ static_assert(offsetof(zrm_rmlogent_data_t, timestamp) == 824);
 static_assert(offsetof(zrm_rmlogent_data_t, ulogpath) == 848);
 static_assert(offsetof(zrm_rmlogent_data_t, uentrydesc) == 2096);
 
-/// The framework has no room now: nothing was offered. To the logs alone.
+/// The framework has no room, so nothing was offered. Returned to the logs only.
 inline constexpr unsigned tableNoRoom = 0x21060008;
 
 } // namespace zrm

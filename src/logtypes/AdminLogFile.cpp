@@ -20,17 +20,17 @@ TRC1_Anchor anchor{"AdminLogFile.cpp"};
 
 constexpr std::size_t recordLength = AdminLogFile::recordLength;
 
-/// How long records are counted that the end of the process leaves in the log.
+/// How long to count the records that the end of the process leaves unread.
 constexpr std::chrono::milliseconds countingTime{500};
 
-/// Reads whole records, many with one call. The outcome is that of reading them one by one: a
-/// record whose end is missing when its turn comes has what there is by then, and those bytes are
+/// Reads whole records, many per call. The result is the same as reading them one at a
+/// time: if a record is incomplete when its turn comes, its available bytes are
 /// consumed.
 class RecordReader {
 public:
     explicit RecordReader(int fd) : m_fd(fd) {}
 
-    /// The next record, valid until the next call; null at the end.
+    /// The next record, valid until the next call, or null at the end.
     char* next() {
         if (m_end - m_begin < recordLength) {
             refill();
@@ -43,12 +43,12 @@ public:
         return record;
     }
 
-    /// After the end: 0, the bytes of an incomplete record, or -1 for a read error.
+    /// After the end: 0, the size of an incomplete record in bytes, or -1 for a read error.
     ssize_t outcome() const { return m_failed ? -1 : static_cast<ssize_t>(m_end - m_begin); }
 
 private:
     void refill() {
-        // Fewer bytes than a record are left, so the source never overlaps its new place.
+        // Fewer bytes than one record are left, so source and destination never overlap.
         for (std::size_t i = 0; i < m_end - m_begin; ++i) {
             m_buffer[i] = m_buffer[m_begin + i];
         }
@@ -166,7 +166,7 @@ long AdminLogFile::readLog() {
     return trace.result(-1L);
 }
 
-/// False when the log or the process is to end before the record's row could be offered.
+/// False if the log has to end or the process is ending before the row could be offered.
 bool AdminLogFile::deliverRecord(char* record) {
     count(NumEvents);
     zrm_rmlogent_data_t* const row = ownRow();

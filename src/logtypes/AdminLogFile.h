@@ -9,12 +9,12 @@
 
 namespace zrm {
 
-/// A login accounting log: a file of 40-byte binary records, each of which becomes one row. Life
-/// and threads are those of every LogFile: the log's own thread follows the file's end, a report
-/// reads the file backwards on its request's thread.
+/// A login accounting log: a file of 40-byte binary records, one row each. Lifetime and threads are
+/// those of every LogFile: the log's own thread follows the end of the file, and a report reads the
+/// file backwards on its request's thread.
 class AdminLogFile : public LogFile {
 public:
-    /// One record of the file. Texts are padded with NULs and not terminated when full; numbers are
+    /// One record of the file. Texts are padded with NULs and not terminated if full. Numbers are
     /// in the byte order of the host that wrote them.
     struct utmp {
         char ut_user[8];
@@ -32,22 +32,22 @@ public:
     ~AdminLogFile() override;
 
     void endReportRequest(void** reportState) override;
-    /// The next older record within the window. Null at the first record that is older than the
-    /// window, and at the file's start, which is traced as an incomplete record.
+    /// Returns the next older record within the window. Null at the first record older than the
+    /// window and at the start of the file, which is traced as an incomplete record.
     void* getNextLogEntry(void* row, void* reportState, void* thresholds) override;
     /// The report's state is a _LogBufferInfo.
     void* startReportRequest(void* thresholds) override;
-    /// Fills the row from the 40 bytes at `record`, of any alignment; always 0.
+    /// Fills the row from the 40 bytes at `record`, which may be unaligned. Always returns 0.
     long formatEntryAsRow(char* record, void* row, void* context) override;
     void processLogData() override;
-    /// Consumes the records between LogEOF and the file's end. -1 on a read error and when the file
-    /// ends within a record, whose bytes are lost.
+    /// Reads the records between LogEOF and the end of the file. Returns -1 on a read error or if
+    /// the file ends within a record; the bytes of that record are lost.
     long readLog() override;
 
-    /// Copies the text of a record type, at most `room` bytes, without a terminator.
+    /// Copies the text for a record type, at most `room` bytes, without a terminator.
     static void fillEntryType(char* dest, unsigned long room, int type);
-    /// Writes the description of a record, at most `room` bytes, without a terminator; in UTF-8
-    /// when `toUTF8` is not 0, else in the local code page.
+    /// Writes the description of a record, at most `room` bytes, without a terminator. UTF-8 if
+    /// `toUTF8` is not 0, else the local code page.
     static void formatEntryDesc(char* dest, unsigned long room, const utmp* record, int toUTF8);
 
 private:
@@ -57,7 +57,7 @@ private:
     bool allocateReportBuffers(_LogBufferInfo** reportState);
     static void deallocateReportBuffers(_LogBufferInfo** reportState);
 
-    QuarterHour m_quarterHour; ///< the thread's
+    QuarterHour m_quarterHour; ///< used by the log's thread only
 };
 
 static_assert(sizeof(AdminLogFile::utmp) == AdminLogFile::recordLength);

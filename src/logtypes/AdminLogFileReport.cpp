@@ -17,7 +17,7 @@ namespace {
 TRC1_Anchor anchor{"AdminLogFileReport.cpp"};
 
 constexpr auto length = static_cast<std::int64_t>(AdminLogFile::recordLength);
-constexpr int statedStateLength = 32; // of a report's state, in the message of its failure
+constexpr int statedStateLength = 32; // size of a report's state in the message about its failure
 
 /// Compares 16-character time stamps.
 int compareTimes(const char* left, const char* right) {
@@ -35,7 +35,7 @@ void* AdminLogFile::startReportRequest(void* /*thresholds*/) {
     }
     info->bufferCount = 0;
     if (info->bytesLeft % length != 0) {
-        // Read from its end, such a file gives no record as it was written.
+        // Such a file, read from its end, does not return any record as it was written.
         ReportOutcome::note(ReportEnd::brokenRecord);
     }
     trace.detail()("Read buffer of size %ld allocated for file %s.",
@@ -60,11 +60,11 @@ bool AdminLogFile::allocateReportBuffers(_LogBufferInfo** reportState) {
     }
     *reportState = info;
     info->fd = -1;
-    // Another report may just be raising the size: this block holds a record whatever it saw.
+    // Another report may be increasing the size right now. This block always fits a record.
     info->blockSize = std::max(OptimumBlockSize.load(), length);
     info->pBuffer = new (std::nothrow) char[static_cast<std::size_t>(info->blockSize)];
     if (info->pBuffer == nullptr) {
-        // Names one byte more than was asked for: what the text logs allocate.
+        // States one byte more than requested, which is what the text logs allocate.
         trace.error()("Memory allocation of %d bytes failed.",
                       static_cast<int>(info->blockSize + 1));
         return trace.result(false);

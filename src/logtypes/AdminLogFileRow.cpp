@@ -18,8 +18,8 @@ namespace {
 
 TRC1_Anchor anchor{"AdminLogFileRow.cpp"};
 
-// Indexed by record type. The words are this table's own: 3 and 4 do not follow the system's names
-// of these record types.
+// Indexed by record type. The texts are specific to this table: 3 and 4 differ from the system's
+// names for these record types.
 constexpr std::string_view entryTypes[] = {
     "Unused space", "Run level",     "System boot time", "User logon time", "User idle time",
     "init process", "getty waiting", "User process",     "Zombie process",  "Accounting",
@@ -31,9 +31,9 @@ template <std::size_t size> std::string_view fieldText(const char (&field)[size]
     return {field, strnlen(field, size)};
 }
 
-/// Builds a description without the cost of a format string. The buffer holds the longest one: two
-/// short names, three numbers of up to six characters, and the words between them. What is appended
-/// has a length that the compiler knows, so that it is copied in place.
+/// Builds a description without the cost of a format string. The buffer fits the longest one: two
+/// short names, three numbers of up to six characters, and the words between them. The compiler
+/// knows the length of each appended text and copies it inline.
 class Description {
 public:
     explicit Description(const AdminLogFile::utmp& record) {
@@ -59,7 +59,7 @@ public:
     }
 
 private:
-    /// Copies all of the field; its first `length` characters count.
+    /// Copies the whole field but counts only its first `length` characters.
     template <std::size_t size> void append(const char (&field)[size], std::size_t length) {
         std::memcpy(m_text + m_length, field, size);
         m_length += length;

@@ -13,13 +13,13 @@ namespace zrm {
 
 namespace {
 
-/// How long a child may take that has been asked to end.
+/// How long to wait for a child that was asked to end.
 constexpr std::chrono::seconds patience{2};
 constexpr int lookInterval = 10; // milliseconds
 
 constexpr int standardOutput = 1;
-constexpr int firstOther = 3;    // behind the standard descriptors
-constexpr int otherLimit = 4096; // more than an agent of a thousand logs has open
+constexpr int firstOther = 3;    // first after the standard descriptors
+constexpr int otherLimit = 4096; // more than an agent with a thousand logs has open
 
 } // namespace
 
@@ -27,7 +27,7 @@ int ChildProcess::openPipe(int fds[2]) {
     if (pipe(fds) != 0) {
         return -1;
     }
-    // Fails on no descriptor that is open.
+    // Cannot fail on an open descriptor.
     fcntl(fds[0], F_SETFD, FD_CLOEXEC);
     fcntl(fds[1], F_SETFD, FD_CLOEXEC);
     return 0;
@@ -42,7 +42,7 @@ pid_t ChildProcess::waitFor(pid_t pid, int* status) {
             return ended;
         }
         if (ended == 0 && Clock::now() >= limit) {
-            kill(-pid, SIGKILL); // of a group that it leads
+            kill(-pid, SIGKILL); // its process group, if it leads one
             kill(pid, SIGKILL);
         }
         if (ended == 0) {
@@ -59,10 +59,10 @@ void ChildProcess::redirectOutput(const int fds[2]) {
         dup2(fds[1], standardOutput);
         close(fds[1]);
     }
-    // The agent's descriptors close on exec, but for the moment between their making and the call
-    // that says so, in which another thread may have forked. A command that kept the write end of
-    // another one's pipe would keep its reader waiting. They stay open until the exec, since the
-    // trace needs its own when that fails.
+    // The agent's descriptors close on exec, except between their creation and the call that sets
+    // the flag, when another thread may have forked. A command that inherited the write end of
+    // another command's pipe would block that pipe's reader. The descriptors stay open until the
+    // exec, because the trace needs its own if exec fails.
     for (int fd = firstOther; fd < otherLimit; ++fd) {
         fcntl(fd, F_SETFD, FD_CLOEXEC);
     }

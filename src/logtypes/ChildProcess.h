@@ -7,32 +7,32 @@
 
 namespace zrm {
 
-/// The system's side of running a command whose standard output the agent reads through a pipe.
+/// The system calls for running a command whose standard output the agent reads through a pipe.
 ///
-/// The agent has many threads and blocks every signal in all of them; a child inherits one thread,
-/// the blocked signals, and locks that nobody will release. So whatever a child needs is prepared
-/// before the fork, and between fork and exec a child makes no call that takes a lock or memory.
+/// The agent has many threads, and all of them block every signal. A child inherits one thread, the
+/// blocked signals, and locks that nobody will release. So the parent prepares everything before
+/// the fork, and between fork and exec the child makes no call that locks or allocates.
 namespace ChildProcess {
 
-/// Makes a pipe whose ends close on exec. As pipe(): 0, or -1 and errno. Any thread.
+/// Creates a pipe whose ends close on exec. Like pipe(), returns 0, or -1 and errno. Any thread.
 int openPipe(int fds[2]);
 
-/// Waits for the end of a child that has been asked to end, or whose output nobody reads any more.
-/// One that has not ended after two seconds is killed. As waitpid(). Any thread.
+/// Waits for a child that was asked to end or whose output is no longer read. Kills the child if it
+/// has not ended after two seconds. Returns what waitpid() returns. Any thread.
 pid_t waitFor(pid_t pid, int* status);
 
-/// In the child: makes the pipe's write end its standard output and closes both ends. The command
-/// will find nothing else of the agent's open than standard input and error.
+/// In the child: makes the pipe's write end the standard output and closes both ends. The command
+/// inherits no other descriptor of the agent except standard input and standard error.
 void redirectOutput(const int fds[2]);
 
-/// In the child: undoes what the agent's threads do with signals, so that the command can be ended
-/// by signal 15 and by a pipe that nobody reads.
+/// In the child: restores the signal handling that the agent's threads changed, so that signal 15
+/// or a pipe that nobody reads can end the command.
 void restoreSignals();
 
 } // namespace ChildProcess
 
-/// The texts of the errors with which exec fails, made before the fork: a text may come from the
-/// locale's message catalogue, which is out of a child's reach.
+/// The texts of the errors with which exec can fail, created before the fork. A text may come from
+/// the locale's message catalogue, which a child cannot access safely.
 class ExecErrorTexts {
 public:
     ExecErrorTexts() noexcept;

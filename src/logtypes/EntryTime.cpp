@@ -13,7 +13,7 @@ namespace {
 
 constexpr long yearsOfCentury = 100;
 
-/// The local time of the second that the thread asked for last.
+/// The local time of the second that the thread last asked for.
 struct LocalTime {
     std::time_t second = std::numeric_limits<std::time_t>::min();
     std::tm parts{};
@@ -21,7 +21,7 @@ struct LocalTime {
 
 constinit thread_local LocalTime localTime;
 
-/// The current local time; null, with errno, when it cannot be told.
+/// The current local time. Null, with errno set, if it is unavailable.
 const std::tm* currentTime() {
     const std::time_t now = std::time(nullptr);
     if (now == static_cast<std::time_t>(-1)) {

@@ -3,10 +3,10 @@
 
 namespace zrm {
 
-/// The parts of a user log entry's time, as far as they are known.
+/// The known parts of a user log entry's time.
 struct EntryTime {
     static constexpr long unknown = -1;
-    static constexpr int textLength = 15; ///< characters that write() must give
+    static constexpr int textLength = 15; ///< characters that write() must produce
 
     long century = unknown; ///< 1 for the years 2000 to 2069, 0 for 1970 to 1999
     long year = unknown;    ///< two digits
@@ -20,14 +20,14 @@ struct EntryTime {
         return year != unknown && month != unknown && day != unknown && hour != unknown &&
                minute != unknown;
     }
-    /// Takes what is unknown from the current local time. False, with errno, when that cannot be
-    /// told. Asks the system for the time zone once per second and thread.
+    /// Fills unknown parts from the current local time. Returns false and sets errno if the time is
+    /// unavailable. Looks up the time zone once per second and thread.
     bool completeFromClock() noexcept;
-    /// Writes the first 15 characters of the time stamp and returns their number; another number
-    /// when the parts do not give 15, and then nothing is written.
+    /// Writes the first 15 characters of the time stamp and returns 15. If the parts do not format
+    /// to 15 characters, returns that other length and writes nothing.
     int write(char* out) const noexcept;
 
-    /// The current local date: century, year, month and day; the rest unknown. False as above.
+    /// The current local date: century, year, month and day, the rest unknown. False as above.
     static bool today(EntryTime& date) noexcept;
 };
 

@@ -3,9 +3,9 @@
 
 namespace zrm {
 
-/// The texts of one entry's time fields, terminated; an empty one was not in the entry.
+/// The texts of one entry's time fields, terminated. A field missing from the entry is empty.
 struct _EntryTimeBuffers {
-    static constexpr int room = 7; ///< characters of each
+    static constexpr int room = 7; ///< characters per field
 
     char year[room + 1];
     char month[room + 1];

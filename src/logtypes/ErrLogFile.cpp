@@ -15,11 +15,11 @@ namespace {
 
 TRC1_Anchor anchor{"ErrLogFile.cpp"};
 
-/// Waits up to one second until the descriptor can be read. As select(): above 0 when it can, 0
-/// when not, -1 and errno.
+/// Waits up to one second for data on the descriptor. Like select(), returns a positive number if
+/// there is data, 0 if not, or -1 and errno.
 int waitForData(int fd) {
     if (fd >= FD_SETSIZE) {
-        // Outside the descriptor sets of select().
+        // Not limited to the descriptor sets of select().
         pollfd entry{fd, POLLIN, 0};
         return poll(&entry, 1, 1000);
     }
@@ -85,8 +85,8 @@ void ErrLogFile::waitForEventLoop() {
                           "errno = %d; %s",
                           procedure(), m_readFd, error.number(), error.text());
             setMonitorStatus(MONITOR_ERR_WAIT_EVENT);
-            // This path releases the lock, and traces that, although it does not hold it: it is
-            // taken here first, without a message, since releasing a free mutex is undefined.
+            // This path releases the lock, and traces that, although it does not hold it. Unlocking
+            // a free mutex is undefined, so the lock is taken here first, without a message.
             pthread_mutex_lock(&LogLock);
             unlockLog();
             return;
@@ -118,8 +118,8 @@ long ErrLogFile::readLog() {
     return trace.result(0L);
 }
 
-// Reads as fgets does, up to 255 characters, but keeps a line whose end has not come yet: the
-// stream does not block, and fgets says nothing of what it has read when it fails.
+// Reads up to 255 characters as fgets does, but keeps an incomplete line. The stream does not
+// block, and fgets does not report what it read before it failed.
 bool ErrLogFile::readLine() {
     int character = 0;
     while (m_lineLength < sizeof m_line - 1 && character != '\n') {

@@ -18,62 +18,62 @@ struct _RequestThresholds;
 struct zrm_rmlogent_data_t;
 
 /// The state of one report on an error log: the child that runs the report command, and the pipe
-/// through which its output comes.
+/// that carries its output.
 struct ErrlogBufferInfo {
     std::uint8_t headerSkipped; ///< 1 once the column header was read and dropped
-    char line[256];             ///< the line last read, terminated
-    char* command;           ///< the command as run, for messages; owned, null when memory ran out
-    std::FILE* fp;           ///< the pipe's read end; null until the child runs
-    std::int32_t pid;        ///< 0 until the fork
-    std::int32_t pipeFds[2]; ///< read end, write end
+    char line[256];             ///< the last line read, terminated
+    char* command;              ///< the command as run, for messages; owned, null if memory ran out
+    std::FILE* fp;              ///< the pipe's read end; null until the child runs
+    std::int32_t pid;           ///< 0 until the fork
+    std::int32_t pipeFds[2];    ///< read end, write end
 };
 static_assert(sizeof(ErrlogBufferInfo) == 296);
 
 /// The system's error log, read through a command. While the log is monitored, one child runs the
-/// configured command and every line that it writes becomes a row. The child leads a process group
-/// of its own, which ends with the monitor. Every report runs a child of its own on the request's
+/// configured command, and every line of its output becomes a row. The child leads its own
+/// process group, which ends with the monitor. Each report runs its own child on the request's
 /// thread.
 class ErrLogFile : public LogFile {
 public:
     ErrLogFile(const ValidLog& log, LogFile* chainHead);
     ~ErrLogFile() override;
 
-    /// Ends the report: closes the pipe, so that a command which still writes ends by itself, and
-    /// waits for the child.
+    /// Ends the report: closes the pipe, so that a command that is still writing ends by itself,
+    /// and waits for the child.
     void endReportRequest(void** reportState) override;
-    /// The next line of the command. The window was given to the command and is not looked at here.
-    /// A line that is not an entry ends the report.
+    /// Returns the command's next line. The window was passed to the command and is not
+    /// checked again. A line that is not an entry ends the report.
     void* getNextLogEntry(void* row, void* reportState, void* thresholds) override;
     /// The report's state is an ErrlogBufferInfo.
     void* startReportRequest(void* thresholds) override;
-    /// Fills the row from a terminated line; non-zero when it is not an entry.
+    /// Fills the row from a terminated line. Returns non-zero if the line is not an entry.
     long formatEntryAsRow(char* entry, void* row, void* context) override;
-    /// Runs the command once: until its output ends, an error occurs or the monitor is stopped.
-    /// Then the child gets signal 15 and is waited for, for as long as it takes to end.
+    /// Runs the command once, until its output ends, an error occurs or the monitor is stopped.
+    /// Then sends the child signal 15 and waits for it to end, however long that takes.
     void processLogData() override;
-    /// Consumes the lines that the pipe holds: 0, or -1 at the output's end and on a read error.
-    /// Returns early when the monitor is stopped, since a command may never stop writing.
+    /// Reads the lines available in the pipe. Returns 0, or -1 at the end of the output or on a
+    /// read error. Returns early if the monitor is stopped: a command may write forever.
     long readLog() override;
 
     /// Traces how a child ended; `command` may be null. Any thread.
     void printChildStatus(pid_t pid, int status, const char* command) const;
     /// Converts a 16-character time stamp to the 10 characters MMDDhhmmYY and a terminator.
     static void timestamp2ErrlogTime(char* dest, const char* timestamp);
-    /// Writes the 16-character time stamp of a line; returns the position of the fields behind the
-    /// time, or null when the line is not an entry. A year below 70 is in the 21st century.
+    /// Writes the 16-character time stamp of a line. Returns the position of the fields after the
+    /// time, or null if the line is not an entry. Years below 70 are in the 21st century.
     static const char* formatEntryTime(char* dest, const char* line);
-    /// Copies the field at `position` and returns the position of the next. The character that
-    /// follows the first `maximum` ones is dropped; those behind it are copied on, over what
-    /// follows in the row, but never at or past `end`.
+    /// Copies the field at `position` and returns the position of the next field. The character
+    /// after the first `maximum` characters is dropped. Any further characters are copied too, over
+    /// whatever follows in the row, but never at or past `end`.
     static const char* extractNextField(char* dest, const char* position, unsigned long maximum,
                                         const char* end);
-    /// Writes identifier and description, at most `size` bytes, without a terminator; `rest` loses
-    /// its last character, which is the newline of a whole line.
+    /// Writes the identifier and description, at most `size` bytes, without a terminator. The last
+    /// character of `rest` is dropped: it is the newline of a complete line.
     static void formatDescription(char* dest, const char* line, const char* rest,
                                   unsigned long size, int toUtf8);
 
 private:
-    /// The local time as the command's placeholder takes it, found before the fork.
+    /// The local time in the format of the command's placeholder, computed before the fork.
     struct StartDate {
         char text[11];
         bool failed;
@@ -101,9 +101,9 @@ private:
     void waitForReportChild(const ErrlogBufferInfo* info) const;
 
     int m_readFd = -1;
-    std::atomic<pid_t> m_childPid{0}; ///< also read by reports, which tell their child from it
+    std::atomic<pid_t> m_childPid{0}; ///< also read by reports, to tell their own child from it
     std::FILE* m_readStream = nullptr;
-    char m_line[256]; ///< the line last read, or the part of the next one that has come so far
+    char m_line[256]; ///< the last line read, or the part of the next line received so far
     std::size_t m_lineLength = 0;
 };
 

@@ -61,14 +61,14 @@ void ErrLogFile::createChild(const int fds[2]) {
         setMonitorStatus(MONITOR_ERR_CREATE_CHILD);
         return;
     }
-    // The child does the same: whoever comes first, the group exists before it is needed.
+    // The child does the same. Whichever runs first, the group exists before it is needed.
     setpgid(pid, pid);
     trace.detail()("Child process created for file %s. pid = %d.", fileNameLocal(),
                    static_cast<int>(pid));
     convertReadFD();
 }
 
-// The trace level was read before the fork: learning it anew could wait for a lock.
+// The trace level was read before the fork: reading it now could wait for a lock.
 void ErrLogFile::runCommand(const TraceScope& trace, const int fds[2], const StartDate& date,
                             const ExecErrorTexts& errorTexts) {
     setpgid(0, 0);
@@ -83,7 +83,7 @@ void ErrLogFile::runCommand(const TraceScope& trace, const int fds[2], const Sta
     trace.error()("Error executing command %s for file %s. errno = %d; %s.  Use the error number "
                   "and message to investigate the failure.  Agent is terminating.",
                   procedure(), fileNameLocal(), error, errorTexts.text(error));
-    // Without the exit routine, which would destroy a log manager that is the parent's.
+    // Skips the exit routine, which would destroy the parent's log manager.
     _exit(execFailed);
 }
 
@@ -97,7 +97,7 @@ ErrLogFile::StartDate ErrLogFile::startDate() {
         local = {};
         local.tm_mon = -1;
     }
-    // At least two digits each; %.2d is what %0.2d means.
+    // At least two digits each; %.2d is equivalent to %0.2d.
     char text[64];
     std::snprintf(text, sizeof text, "%.2d%.2d%.2d%.2d%.2d", local.tm_mon + 1, local.tm_mday,
                   local.tm_hour, local.tm_min, local.tm_year % 100);
@@ -105,7 +105,7 @@ ErrLogFile::StartDate ErrLogFile::startDate() {
     return date;
 }
 
-// Edits the child's copy of the command: the parent's keeps its placeholder for the next start.
+// Edits the child's copy of the command. The parent's keeps its placeholder for the next start.
 void ErrLogFile::substituteStartDate(const TraceScope& trace, const StartDate& date) {
     char* const found = LogProcedure ? std::strstr(LogProcedure.get(), placeholder) : nullptr;
     if (found == nullptr) {
@@ -159,7 +159,7 @@ void ErrLogFile::killChild() {
                       error.text());
         return;
     }
-    // What the shell has started. Before the wait: afterwards the group's number is free.
+    // Also ends what the shell started. After the wait, the group's number could be reused.
     kill(-pid, SIGTERM);
     int status = 0;
     const pid_t ended = ChildProcess::waitFor(pid, &status);

@@ -16,13 +16,13 @@ namespace {
 
 TRC1_Anchor anchor{"ErrLogFileLine.cpp"};
 
-// A line: identifier (10, of which 8 count), blank, time as mmddhhmmyy, blank, fields.
+// A line: identifier (10 characters, 8 significant), blank, time as mmddhhmmyy, blank, fields.
 constexpr std::size_t identifierLength = 8;
 constexpr std::size_t timeStart = 11;
 constexpr std::size_t yearStart = 19;
 constexpr std::size_t timeEnd = 21;
 
-// The characters that isspace knows in the POSIX locale, without a look at the process's locale.
+// White space as isspace defines it in the POSIX locale, without checking the process's locale.
 bool isWhiteSpace(char character) {
     return character == ' ' || (character >= '\t' && character <= '\r');
 }

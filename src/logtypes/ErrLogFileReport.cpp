@@ -22,7 +22,7 @@ namespace {
 
 TRC1_Anchor anchor{"ErrLogFileReport.cpp"};
 
-constexpr int lookInterval = 200; ///< milliseconds between looks whether the report is wanted
+constexpr int lookInterval = 200; ///< milliseconds between checks that the report is still wanted
 constexpr std::size_t commandLength = 34;
 constexpr std::size_t argumentLength = 13; // option, ten digits, terminator
 constexpr int execFailed = 255;            // the low byte of exit(-1)
@@ -115,7 +115,7 @@ void ErrLogFile::timestamp2ErrlogTime(char* dest, const char* timestamp) {
     dest[10] = '\0';
 }
 
-// The trace level was read before the fork: learning it anew could wait for a lock.
+// The trace level was read before the fork: reading it now could wait for a lock.
 void ErrLogFile::runReportCommand(const TraceScope& trace, const ErrlogBufferInfo* info,
                                   char** argv, const ExecErrorTexts& errorTexts) const {
     trace.detail()("Child process for report on file %s about to exec \"%s %s %s\"; redirecting fd "
@@ -131,7 +131,7 @@ void ErrLogFile::runReportCommand(const TraceScope& trace, const ErrlogBufferInf
                   "terminating.",
                   argv[0], orEmpty(argv[1]), orEmpty(argv[2]), fileNameLocal(), error,
                   errorTexts.text(error));
-    // Without the exit routine, which would destroy a log manager that is the parent's.
+    // Skips the exit routine, which would destroy the parent's log manager.
     _exit(execFailed);
 }
 
@@ -157,7 +157,7 @@ void* ErrLogFile::getNextLogEntry(void* row, void* reportState, void* /*threshol
 
 bool ErrLogFile::readReportLine(ErrlogBufferInfo* info) const {
     TraceScope trace(anchor);
-    // As fgets does, but the command may be silent for longer than the report is wanted.
+    // Like fgets, but the command may be silent for longer than the report is wanted.
     std::size_t length = 0;
     int character = 0;
     while (length < sizeof info->line - 1 && character != '\n') {
@@ -181,8 +181,8 @@ bool ErrLogFile::readReportLine(ErrlogBufferInfo* info) const {
     }
     if (std::ferror(info->fp) != 0) {
         ReportOutcome::note(ReportEnd::readError);
-        // The message has a place for the command, which is not given: name, number and text each
-        // stand one place further ahead, and the last place stays empty.
+        // The message has a placeholder for the command, which is not passed. So name, number and
+        // text each move one place to the left, and the last one stays empty.
         trace.error()("Error while reading file %s for report on file %d. errno = %s; %s",
                       fileNameLocal(), error.number(), error.text(), "");
     }
@@ -195,7 +195,7 @@ void ErrLogFile::endReportRequest(void** reportState) {
     if (info == nullptr) {
         return;
     }
-    // First of all, so that a command which still writes meets a broken pipe and ends.
+    // Do this first, so that a command that is still writing gets a broken pipe and ends.
     if (info->fp != nullptr) {
         closePipe(&info->fp);
     } else if (info->pipeFds[0] >= 0) {

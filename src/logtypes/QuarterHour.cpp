@@ -40,8 +40,8 @@ void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
     std::memset(out + hourLength + 4, '0', 3);
 }
 
-// A zone may change its offset within a quarter of an hour, and has had offsets that cut an hour
-// into one: then both ends do not stand in the same hour, or not 899 seconds apart.
+// A zone may change its offset within a quarter of an hour, and some offsets have split a quarter
+// across two hours. Then its ends are in different hours, or not 899 seconds apart.
 void QuarterHour::enter(std::int64_t time) {
     m_isRegular = false;
     if (time < -farAway || time > farAway) {

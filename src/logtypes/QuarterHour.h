@@ -5,21 +5,21 @@
 
 namespace zrm {
 
-/// Makes time stamps of times that lie close together: asks the system for the local time once per
-/// quarter of an hour, within which only minute and second change. One thread.
+/// Generates time stamps for times that are close together. Asks the system for the local time once
+/// per quarter of an hour, within which only the minute and second change. One thread.
 class QuarterHour {
 public:
-    /// As BrevanTime::generateTimestamp.
+    /// Same as BrevanTime::generateTimestamp.
     void generateTimestamp(std::int64_t time, char* out);
 
 private:
     void enter(std::int64_t time);
 
     std::int64_t m_start = 0; ///< a multiple of 900
-    std::int64_t m_end = 0;   ///< 900 later; the start when none was entered
-    bool m_isRegular = false; ///< the local time runs through it without a leap
+    std::int64_t m_end = 0;   ///< 900 later; equal to the start if no quarter was entered
+    bool m_isRegular = false; ///< the local time does not jump within it
     char m_hour[9];           ///< CYYMMDDhh
-    int m_secondOfHour = 0;   ///< at its start
+    int m_secondOfHour = 0;   ///< at the start
 };
 
 } // namespace zrm

@@ -51,16 +51,16 @@ constexpr std::size_t timeLength = 15; // Mmm dd hh:mm:ss
 constexpr std::size_t yearLength = 3;
 constexpr std::size_t stampLength = 16;
 
-/// Host and source of a line whose description begins within so many characters do not run past
+/// If a line's description begins within this many characters, its host and source do not overrun
 /// ENTRYDESC into the common columns.
 constexpr std::ptrdiff_t longestHeader =
     offsetof(zrm_rmlogent_data_t, freqthresh) - offsetof(zrm_rmlogent_data_t, entrysrc);
 
-/// With so few, neither of them runs out of its own column.
+/// Within this many, neither overruns its own column.
 constexpr std::ptrdiff_t shortHeader = timeLength + std::min(sizeof(zrm_rmlogent_data_t::entrysys),
                                                              sizeof(zrm_rmlogent_data_t::entrysrc));
 
-/// The month's number, 1 to 12; 0 when the text begins with none. `likely` is looked at first.
+/// The month's number, 1 to 12, or 0 if the text does not begin with a month. Tries `likely` first.
 unsigned monthNumber(const char* text, unsigned likely) {
     const std::uint32_t letters = threeLetters(text);
     if (likely - 1 < months.size() && months[likely - 1] == letters) {
@@ -78,8 +78,8 @@ unsigned twoDigits(const char* text) {
     return static_cast<unsigned>((text[0] - '0') * 10 + (text[1] - '0'));
 }
 
-/// Dates an entry of a report by the newer entry read before it, and becomes that entry's stamp:
-/// a later month and day means that a new year was crossed going backwards.
+/// Sets the year of a report entry from the newer entry read before it, then stores its stamp in
+/// `newer`. A later month and day means that reading backwards crossed a new year.
 void followYear(char* stamp, char* newer) {
     constexpr std::size_t monthAndDay = 4;
     if (std::memcmp(stamp + yearLength, newer + yearLength, monthAndDay) <= 0) {
@@ -94,8 +94,8 @@ void followYear(char* stamp, char* newer) {
     std::memcpy(newer, stamp, stampLength);
 }
 
-/// The characters that end a field, by their codes: the line's end, white space of the line's
-/// layout, whatever the locale, and others.
+/// The characters that end a field, indexed by code: the end of the line, white space whatever the
+/// locale, and others.
 using FieldEnds = std::array<bool, 256>;
 
 constexpr FieldEnds endsAt(std::string_view others) {
@@ -113,8 +113,8 @@ constexpr FieldEnds endsAt(std::string_view others) {
 constexpr FieldEnds systemEnds = endsAt("");
 constexpr FieldEnds sourceEnds = endsAt(":");
 
-/// Copies a field's characters and returns where the field ends. Once `max` were copied one is
-/// skipped, and then copying goes on, up to `limit`.
+/// Copies a field's characters and returns the end of the field. After `max` characters, skips one
+/// and continues to copy up to `limit`.
 char* copyField(char* out, char* text, unsigned int max, const char* limit, const FieldEnds& ends) {
     const auto isEnd = [&ends](char character) {
         return ends[static_cast<unsigned char>(character)];
@@ -171,7 +171,7 @@ void SysLogFile::processLogData() {
 long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     TraceScope trace(anchor);
     auto& entry = *static_cast<zrm_rmlogent_data_t*>(row);
-    char* const columns = static_cast<char*>(row); // host and source may run over their columns
+    char* const columns = static_cast<char*>(row); // host and source may overrun their columns
     const char* const limit = columns + sizeof entry;
     prepareRow(&entry);
     char* text = formatEntryTime(entry.entrytime, line, reportState);
@@ -182,8 +182,8 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
                          sizeof entry.entrysys, limit);
     text = extractSource(columns + offsetof(zrm_rmlogent_data_t, entrysrc), text,
                          sizeof entry.entrysrc, limit);
-    // What was written last, the source, is read last: reading it back at once makes a processor
-    // wait.
+    // Read the source, which was written last, only at the end: reading it back immediately stalls
+    // the processor.
     const std::size_t rest = std::strlen(text);
     const std::size_t length = std::min(rest > 0 ? rest - 1 : 0, sizeof entry.entrydesc);
     RowBytes::copy(entry.entrydesc, text, length);
@@ -202,8 +202,8 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
 char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     TraceScope trace(anchor);
     char now[stampLength];
-    BrevanTime::generateCurrentTimestamp(now); // its year counts while monitoring
-    // A time that the line's end cuts short is none, the newline not its last digit.
+    BrevanTime::generateCurrentTimestamp(now); // monitoring uses its year
+    // A time cut off by the end of the line is not a time. The newline is not its last digit.
     const bool isWhole =
         std::memchr(line, '\0', timeLength) == nullptr && line[timeLength - 1] != '\n';
     const unsigned month = isWhole ? monthNumber(line, twoDigits(now + yearLength)) : 0;

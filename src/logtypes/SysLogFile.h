@@ -7,8 +7,8 @@ namespace zrm {
 
 struct SyslogBufferInfo;
 
-/// A file written by the system logger: lines of month, day, time, host, source and message, in
-/// that order and without a year. The monitor starts with the object. Threads as in LogFile.
+/// A file written by the system logger: lines with month, day, time, host, source and message, in
+/// this order and without a year. Monitoring starts on construction. Threads as in LogFile.
 class SysLogFile : public LogFile {
 public:
     SysLogFile(const ValidLog& log, LogFile* chainHead);
@@ -18,25 +18,25 @@ public:
     /// Closes the report's descriptor and frees its state (a SyslogBufferInfo).
     void endReportRequest(void** reportState) override;
     void* getNextLogEntry(void* row, void* reportState, void* thresholds) override;
-    /// Returns a SyslogBufferInfo; null when the log is empty or cannot be read.
+    /// Returns a SyslogBufferInfo, or null if the log is empty or cannot be read.
     void* startReportRequest(void* request) override;
-    /// Always 0: a line that begins with no month gives a row with blank entry columns.
+    /// Always returns 0. A line that does not begin with a month leaves the entry columns blank.
     long formatEntryAsRow(char* line, void* row, void* reportState) override;
     void processLogData() override;
 
 protected:
-    /// Prepares a log that is not monitored: no thread is started. For lines that are only tried.
+    /// Creates a log that is not monitored and starts no thread. Used to try out lines.
     struct Unmonitored {};
     SysLogFile(const ValidLog& log, Unmonitored);
 
-    /// Writes the 16 characters of ENTRYTIME, in the current year or, for a report, in the year
-    /// that reading backwards has reached. Returns where the host field begins; the line's end,
-    /// with `out` left as it was, when the line begins with no month or is too short for a time.
+    /// Writes the 16 characters of ENTRYTIME, with the current year or, in a report, the year
+    /// reached by reading backwards. Returns the start of the host field. A line without a month or
+    /// too short for a time leaves `out` unchanged, and the end of the line is returned.
     char* formatEntryTime(char* out, char* line, void* reportState);
-    /// Copies the host field and returns where the source field begins. A field that is longer
-    /// than `max` loses one character and runs on, up to `limit`.
+    /// Copies the host field and returns the start of the source field. A field longer than `max`
+    /// loses one character and continues up to `limit`.
     char* extractSystem(char* out, char* text, unsigned int max, const char* limit);
-    /// The same for the source field; a repeat notice has none and is all description.
+    /// Does the same for the source field. A repeat notice has none and is all description.
     char* extractSource(char* out, char* text, unsigned int max, const char* limit);
     /// Frees the report's state and clears the caller's pointer.
     void deallocateReportBuffers(SyslogBufferInfo** reportState);

@@ -21,7 +21,7 @@ namespace {
 TRC1_Anchor anchor{"SysLogFileReport.cpp"};
 
 constexpr std::size_t stampLength = 16;
-constexpr std::int64_t longestLine = 999; ///< bytes; of a longer line only so many are given
+constexpr std::int64_t longestLine = 999; ///< bytes; a longer line is cut to this
 
 bool hasNewline(const char* eightBytes) {
     constexpr std::uint64_t ones = 0x0101010101010101;
@@ -31,7 +31,7 @@ bool hasNewline(const char* eightBytes) {
     return ((word - ones) & ~word & ones << 7U) != 0;
 }
 
-/// The last newline at or behind `from` and before `to`; -1 when there is none.
+/// The last newline in the range from `from` up to, but not including, `to`; -1 if there is none.
 std::int64_t lastNewline(const char* text, std::int64_t from, std::int64_t to) {
     while (to - from >= 8 && !hasNewline(text + to - 8)) {
         to -= 8;
@@ -84,7 +84,7 @@ void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds
     auto& state = *static_cast<SyslogBufferInfo*>(reportState);
     const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
     while (char* const line = previousLine(state)) {
-        // The time alone tells whether a row is wanted. It does not change by being made again.
+        // The time alone decides whether a row is wanted. Formatting it again does not change it.
         char time[stampLength];
         std::memset(time, ' ', stampLength);
         formatEntryTime(time, line, reportState);
@@ -94,21 +94,21 @@ void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds
         const bool isOlder = std::memcmp(time, window.startTime, stampLength) < 0;
         if (isOlder || formatEntryAsRow(line, row, reportState) != 0) {
             ReportOutcome::note(time[0] == ' ' ? ReportEnd::noTime : ReportEnd::complete);
-            break; // what stands before an older entry is older still
+            break; // entries before an older entry are older still
         }
         return trace.result(row);
     }
     return trace.result<void*>(nullptr);
 }
 
-/// The newest line that was not given yet, terminated; null at the report's end.
+/// The newest line not yet returned, terminated, or null at the end of the report.
 char* SysLogFile::previousLine(SyslogBufferInfo& state) {
     TraceScope trace(anchor);
     for (;;) {
         if (state.bufferCount == 0 && !refill(state)) {
             return trace.result<char*>(nullptr);
         }
-        // The line begins behind the newline before its own, which is the last byte.
+        // The line begins after the previous line's newline. Its own newline is the last byte.
         const std::int64_t end = state.bufferCount;
         state.pBuffer[end] = '\0';
         const std::int64_t newline =
@@ -123,7 +123,7 @@ char* SysLogFile::previousLine(SyslogBufferInfo& state) {
                 return trace.result<char*>(nullptr);
             }
         } else if (end >= state.blockSize) {
-            --state.bufferCount; // pushing back a whole block would read it again for ever
+            --state.bufferCount; // pushing back a whole block would read it again forever
         }
         if (!refill(state)) {
             return trace.result<char*>(nullptr);
@@ -131,17 +131,17 @@ char* SysLogFile::previousLine(SyslogBufferInfo& state) {
     }
 }
 
-/// Drops the end of a line that is too long, so that its first bytes alone remain as a line; false
-/// when that ends the report.
+/// Drops the end of a line that is too long, so that only its first bytes remain as a line. Returns
+/// false if that ends the report.
 ///
-/// The rule is to drop one byte, to read a block that ends there, and to search again: the report
-/// ends where nothing precedes such a block while the line is still too long. What this comes to
-/// is found without reading a block per byte.
+/// By definition, this drops one byte, reads a block that ends there, and searches again. The
+/// report ends if nothing precedes such a block while the line is still too long. This code
+/// computes the same result without reading a block per byte.
 bool SysLogFile::cutLongLine(SyslogBufferInfo& state) {
     TraceScope trace(anchor);
     const std::int64_t blockStart = state.bytesLeft;
     const std::int64_t lineEnd = blockStart + state.bufferCount;
-    // The newline before the line, or the last place where it may still be.
+    // The newline before the line, or the last position where it may still be.
     const std::int64_t newline =
         blockStart + lastNewline(state.pBuffer, 0, state.bufferCount - longestLine - 1);
     const std::int64_t lastTooLongEnd = newline + longestLine + 2;
@@ -153,8 +153,8 @@ bool SysLogFile::cutLongLine(SyslogBufferInfo& state) {
     return trace.result(true);
 }
 
-/// Reads the block before the present one; false when there is none, which ends the report for
-/// good.
+/// Reads the block before the current one. Returns false if there is none, which ends the report
+/// permanently.
 bool SysLogFile::refill(SyslogBufferInfo& state) {
     if (fillReportBuffer(&state) > 0) {
         return true;

@@ -9,8 +9,8 @@ namespace zrm {
 
 /// The state of one report on a syslog file.
 struct SyslogBufferInfo : _LogBufferInfo {
-    /// ENTRYTIME of the entry formatted last, at first the time of the report's start: it tells
-    /// the year of the entries before it.
+    /// ENTRYTIME of the last formatted entry, initially the time at which the report started.
+    /// Determines the year of the entries before it.
     char timestamp[16];
     std::unique_ptr<char[]> block; ///< owns what pBuffer points to
 };

@@ -20,7 +20,7 @@ namespace {
 
 TRC1_Anchor anchor{"UserLogFile.cpp"};
 
-/// The fields of a user log. Their order is that of the format buffers in formatEntryAsRow.
+/// The fields of a user log, in the order of the format buffers in formatEntryAsRow.
 constexpr _KeywordFields validFields[] = {
     {"year", 2},   {"month", 2},  {"day", 2},  {"hour", 2},  {"minute", 2},      {"second", 2},
     {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2}, {"description", 2}, {nullptr, 0},

@@ -15,9 +15,9 @@ struct EntryTime;
 struct UserlogBufferInfo;
 struct _EntryTimeBuffers;
 
-/// A text log whose lines are laid out as its configuration's format specifier says. The monitoring
-/// thread learns the format, once; the monitor starts with the object. Threads as in LogFile:
-/// reports format lines while the monitor does, so a lock guards what a line changes.
+/// A text log whose configured format specifier defines the line layout. The monitoring thread
+/// learns the format once. Monitoring starts on construction. Threads as in LogFile. Reports format
+/// lines while the monitor does, so a lock guards what a line changes.
 class UserLogFile : public LogFile {
 public:
     UserLogFile(const ValidLog& log, LogFile* chainHead);
@@ -26,34 +26,34 @@ public:
 
     /// Closes the report's descriptor and frees its state (a UserlogBufferInfo).
     void endReportRequest(void** bufferInfo) override;
-    /// Null at the first entry older than the window, at the log's beginning, at a line of more
-    /// than 2047 characters, and behind more than 10 bad lines in a row.
+    /// Returns null at the first entry older than the window, at the start of the log, at a line
+    /// longer than 2047 characters, and after more than 10 bad lines in a row.
     void* getNextLogEntry(void* row, void* bufferInfo, void* thresholds) override;
-    /// Returns a UserlogBufferInfo; null when the format is not known (yet) or the log is empty or
+    /// Returns a UserlogBufferInfo, or null if the format is not known (yet) or the log is empty or
     /// cannot be read.
     void* startReportRequest(void* request) override;
-    /// 0, or -1 for a line that does not fit the format or whose time cannot be told.
+    /// Returns 0, or -1 for a line that does not match the format or has no valid time.
     long formatEntryAsRow(char* line, void* row, void* reportContext) override;
     void processLogData() override;
 
     void printSelf() const;
 
-    /// The names that a format may give its fields.
+    /// The field names that a format may use.
     static const _KeywordFields* fields() noexcept;
 
 protected:
-    /// Prepares a log that is not monitored: no thread is started. For lines that are only tried.
+    /// Creates a log that is not monitored and starts no thread. Used to try out lines.
     struct Unmonitored {};
     UserLogFile(const ValidLog& log, Unmonitored);
 
-    /// Writes the 16 characters of ENTRYTIME; what the texts do not tell is taken from the report's
-    /// date (the year alone) or the clock. 0 or -1. The caller holds the lock of the chain.
+    /// Writes the 16 characters of ENTRYTIME. Parts missing from the texts come from the report's
+    /// date (the year only) or the clock. Returns 0 or -1. The caller holds the lock of the chain.
     long formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, void* reportContext);
     /// Frees the report's state and clears the caller's pointer.
     void deallocateReportBuffers(UserlogBufferInfo** bufferInfo);
 
-    std::unique_ptr<StringParser> SPAnchor; ///< the learned format; null until it is learned
-    bool NumericMonth = true;               ///< months were numbers, not names, the last time
+    std::unique_ptr<StringParser> SPAnchor; ///< the learned format; null until then
+    bool NumericMonth = true;               ///< the last month was a number, not a name
 
 private:
     void readYear(const char* text, EntryTime& time) const;

@@ -19,7 +19,7 @@ namespace {
 
 TRC1_Anchor anchor{"UserLogFileReport.cpp"};
 
-constexpr std::int64_t longestLine = 2047; ///< the pieces in which monitoring reads lines
+constexpr std::int64_t longestLine = 2047; ///< monitoring reads lines in pieces of this size
 constexpr int mostErrors = 10;             ///< bad lines in a row
 
 } // namespace
@@ -71,8 +71,8 @@ bool UserLogFile::allocateReportBuffers(UserlogBufferInfo** bufferInfo) {
     return trace.result(true);
 }
 
-/// Dates the newest entries of a log without years by today. False, with a message, when the
-/// clock cannot be read.
+/// Sets today as the date for the newest entries of a log without years. Returns false, with a
+/// message, if the clock cannot be read.
 bool UserLogFile::setDateContext(UserlogBufferInfo& info) const {
     TraceScope trace(anchor);
     EntryTime date;
@@ -122,15 +122,15 @@ void* UserLogFile::getNextLogEntry(void* row, void* bufferInfo, void* thresholds
     return trace.result(static_cast<void*>(nullptr));
 }
 
-/// Takes the last line of the unprocessed part off it and terminates it; null when there is none,
-/// or none that a report takes.
+/// Removes the last line from the unprocessed part and terminates it. Returns null if there is none
+/// or the report cannot take it.
 char* UserLogFile::previousLine(UserlogBufferInfo& info) {
     TraceScope trace(anchor);
     if (info.bufferCount < 1 && !refill(info)) {
         return trace.result(static_cast<char*>(nullptr));
     }
-    // The newline that ends the line itself does not begin it, so the search starts in front of
-    // the last character.
+    // The search starts before the last character, because the line's own newline does not begin
+    // it.
     std::int64_t position = info.bufferCount - 2;
     for (;;) {
         const std::int64_t tooFar = std::max<std::int64_t>(info.bufferCount - longestLine - 2, -1);
@@ -146,7 +146,7 @@ char* UserLogFile::previousLine(UserlogBufferInfo& info) {
             break;
         }
         if (length >= info.blockSize) {
-            // Pushed back, it would fill the block again.
+            // If pushed back, it would fill the block again.
             return trace.result(endAtLongLine(info, info.blockSize));
         }
         if (!refill(info)) {
@@ -160,7 +160,7 @@ char* UserLogFile::previousLine(UserlogBufferInfo& info) {
     return trace.result(line);
 }
 
-/// Ends the report for good at a line that it does not take; null.
+/// Ends the report permanently at a line that it cannot take. Returns null.
 char* UserLogFile::endAtLongLine(UserlogBufferInfo& info, std::int64_t limit) const {
     TraceScope trace(anchor);
     trace.error()("Line in file %s exceeds %d characters. Remaining contents ignored.",
@@ -170,8 +170,8 @@ char* UserLogFile::endAtLongLine(UserlogBufferInfo& info, std::int64_t limit) co
     return nullptr;
 }
 
-/// Reads the block in front of the present one, which it ends with the unprocessed part. False when
-/// there is none, which ends the report for good.
+/// Reads the block before the current one and appends the unprocessed part to it. Returns false if
+/// there is none, which ends the report permanently.
 bool UserLogFile::refill(UserlogBufferInfo& info) {
     TraceScope trace(anchor);
     if (fillReportBuffer(&info) > 0) {

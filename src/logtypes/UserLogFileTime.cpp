@@ -21,7 +21,7 @@ constexpr const char* monthNames[] = {
     "JAN", "FEB", "MAR", "APR", "MAY", "JUN", "JUL", "AUG", "SEP", "OCT", "NOV", "DEC",
 };
 constexpr long monthsOfYear = 12;
-/// February always has its 29 days: the year may not be known.
+/// February always has 29 days, because the year may be unknown.
 constexpr long daysOfMonth[] = {31, 29, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
 constexpr long mostDays = 31;
 
@@ -33,7 +33,7 @@ bool isDigit(char character) {
     return character >= '0' && character <= '9';
 }
 
-/// A text read as strtol reads it with base 10.
+/// A text parsed as strtol does with base 10.
 struct Number {
     explicit Number(const char* text) : end(text) {
         const char* next = text;
@@ -56,11 +56,11 @@ struct Number {
     }
 
     long value = 0;
-    const char* end; ///< behind the number; the text's beginning when there is none
-    bool isWhole;    ///< the number fills the text
+    const char* end; ///< one past the number, or the start of the text if there is none
+    bool isWhole;    ///< the number is the whole text
 };
 
-/// The month that the text begins with; 0: none.
+/// The month name that the text begins with; 0: none.
 long monthByName(const char* text) {
     for (std::size_t index = 0; index < std::size(monthNames); ++index) {
         if (std::strncmp(text, monthNames[index], 3) == 0) {
@@ -70,8 +70,8 @@ long monthByName(const char* text) {
     return 0;
 }
 
-/// Dates an entry of a report without a year by the entry read before it, which is newer: a later
-/// day of the year means that a new year was crossed going backwards.
+/// Sets the year of a report entry without one from the newer entry read before it. A later day of
+/// the year means that reading backwards crossed a new year.
 void takeYearFromReport(EntryTime& time, UserlogBufferInfo& context) {
     const bool isDateKnown = time.month != EntryTime::unknown && time.day != EntryTime::unknown;
     if (isDateKnown) {
@@ -136,7 +136,7 @@ void UserLogFile::readYear(const char* text, EntryTime& time) const {
     time.century = time.year < 70 ? 1 : 0;
 }
 
-/// Reads the kind of month that worked last, number or name, and then the other one.
+/// Tries the kind of month that worked last, number or name, then the other one.
 void UserLogFile::readMonth(const char* text, EntryTime& time) {
     if (*text == '\0') {
         return;
@@ -160,7 +160,7 @@ void UserLogFile::readMonth(const char* text, EntryTime& time) {
     }
 }
 
-/// False when the text begins with no number and so may be a name.
+/// False if the text does not begin with a number and so may be a name.
 bool UserLogFile::readMonthNumber(const char* text, EntryTime& time) const {
     const Number number(text);
     if (number.isWhole && number.value >= 1 && number.value <= monthsOfYear) {
@@ -189,7 +189,7 @@ void UserLogFile::readDay(const char* text, EntryTime& time) const {
     time.day = number.value;
 }
 
-/// A number of up to 24, or one of 1 to 12 with an "a" or "p" behind it, which makes 12pm hour 24.
+/// A number up to 24, or 1 to 12 followed by "a" or "p". With "p", 12 becomes hour 24.
 void UserLogFile::readHour(const char* text, EntryTime& time) const {
     if (*text == '\0') {
         return;
@@ -226,7 +226,7 @@ void UserLogFile::readMinute(const char* text, EntryTime& time) const {
     time.minute = number.value;
 }
 
-/// A bad second becomes 0: unlike the other parts it is never taken from the clock.
+/// An invalid second becomes 0. Unlike the other parts, it never comes from the clock.
 void UserLogFile::readSecond(const char* text, EntryTime& time) const {
     if (*text == '\0') {
         return;

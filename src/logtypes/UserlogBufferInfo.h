@@ -7,8 +7,8 @@
 
 namespace zrm {
 
-/// The state of one report on a user log: besides the reading state a date, at first today's, then
-/// that of the entry read last. It dates the entries of a log without years.
+/// The state of one report on a user log. Besides the reading state it holds a date, initially
+/// today, then that of the last entry read. It supplies the year for entries without one.
 struct UserlogBufferInfo : _LogBufferInfo {
     long century; ///< 1 for the years 2000 to 2069, 0 for 1970 to 1999
     long year;    ///< two digits

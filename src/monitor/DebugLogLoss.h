@@ -5,7 +5,7 @@
 
 namespace zrm {
 
-/// Records that the debug log did not take whole, since the start. Any thread.
+/// Counts records that were not written completely to the debug log since the start. Any thread.
 namespace DebugLogLoss {
 
 std::uint64_t records() noexcept;

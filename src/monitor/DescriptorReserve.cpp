@@ -15,7 +15,7 @@ constexpr rlim_t partReserved = 4;
 
 std::atomic<std::uint64_t> failed{0};
 
-/// 0 where there is no limit.
+/// 0 if there is no limit.
 rlim_t limitOfDescriptors() {
     rlimit limit{};
     const bool isLimited = getrlimit(RLIMIT_NOFILE, &limit) == 0 && limit.rlim_cur != RLIM_INFINITY;
@@ -29,7 +29,7 @@ std::uint64_t DescriptorReserve::size() {
 }
 
 bool DescriptorReserve::has(int descriptor) {
-    // A new descriptor is always the lowest that is free: one of the last says that few are left.
+    // A new descriptor is always the lowest free one. A high number means that few are left.
     const rlim_t limit = limitOfDescriptors();
     return limit != 0 && static_cast<rlim_t>(descriptor) >= limit - size();
 }

@@ -5,22 +5,22 @@
 
 namespace zrm {
 
-/// The part of the process's descriptors that logs leave to everything else: however many logs
-/// there are, the framework can be reached, and what it stores and delivers finds descriptors. Any
+/// The descriptors that logs leave for everything else. No matter how many logs there are, the
+/// framework stays reachable and can open the descriptors it needs to store and deliver events. Any
 /// thread.
 namespace DescriptorReserve {
 
-/// How many descriptors logs leave: the last 256 below the process's limit, or a quarter of them
-/// where that is less.
+/// The number of descriptors in the reserve: the last 256 below the process's limit, or a quarter
+/// of the limit if that is less.
 std::uint64_t size();
 
-/// Whether the descriptor, just opened for a log, is one of those.
+/// True if the descriptor, just opened for a log, belongs to the reserve.
 bool has(int descriptor);
 
-/// Notes that a log could not be opened, with errno: counted where it is for want of a descriptor.
+/// Records with its errno that a log could not be opened. Counts it if descriptors ran out.
 void noteFailure(int number) noexcept;
 
-/// How often a log could not be opened for want of a descriptor since the start.
+/// The number of failed opens of a log since the start because descriptors ran out.
 std::uint64_t failures() noexcept;
 
 } // namespace DescriptorReserve

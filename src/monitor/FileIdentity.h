@@ -5,7 +5,7 @@
 
 namespace zrm {
 
-/// Which file it is, whatever its name at present.
+/// Identifies a file independently of its current name.
 struct FileIdentity {
     dev_t device;
     ino_t inode;

@@ -54,8 +54,8 @@ char* LineReader::next() noexcept {
     }
 }
 
-/// Reads more behind the unfinished line, which moves to the block's start; false when there is
-/// no more or the read failed.
+/// Moves the unfinished line to the start of the block and reads more after it. Returns false if
+/// there is no more or the read failed.
 bool LineReader::fill() noexcept {
     if (m_isAtEnd || m_error != 0) {
         return false;

@@ -6,25 +6,25 @@
 
 namespace zrm {
 
-/// Reads the lines behind a descriptor in the pieces that fgets with a buffer of 2048 bytes gives:
-/// at most 2047 characters each, the newline kept, a last line without one as it stands. Reads
-/// large blocks and terminates each piece in place, so that a line costs neither a copy nor a lock.
-/// The block is allocated by the first read, since most logs of a machine never grow. One thread;
-/// the descriptor is the caller's and stands behind the last byte given once `next` returned null.
+/// Reads lines from a descriptor in the pieces that fgets with a 2048-byte buffer would return: at
+/// most 2047 characters each, newline included, a last line without a newline unchanged. Reads
+/// large blocks and terminates each piece in place, so a line needs neither a copy nor a lock. The
+/// first read allocates the block, because most logs never grow. One thread. The caller owns the
+/// descriptor, which is positioned after the last byte returned once `next` returned null.
 class LineReader {
 public:
     LineReader() = default;
     LineReader(const LineReader&) = delete;
     LineReader& operator=(const LineReader&) = delete;
 
-    /// Reads from the descriptor's position on; forgets what was read before.
+    /// Reads from the descriptor's current position. Discards what was read before.
     void start(int fd) noexcept;
-    /// The next piece, terminated and changeable until the next call; null at the end of input or
-    /// when reading failed.
+    /// Returns the next piece, terminated and writable until the next call. Null at the end of
+    /// input or on a read error.
     char* next() noexcept;
-    /// errno of the read that failed; 0 when the end of input was reached.
+    /// errno of the failed read, or 0 if the end of input was reached.
     int error() const noexcept { return m_error; }
-    /// Gives the block's memory back.
+    /// Frees the block.
     void release() noexcept;
 
 private:
@@ -32,9 +32,9 @@ private:
     char* take(std::size_t length) noexcept;
 
     std::unique_ptr<char[]> m_block;
-    char* m_begin = nullptr; ///< first byte that was not given yet
-    char* m_end = nullptr;   ///< behind the last byte read; the block has room for one more
-    char m_behind = '\0';    ///< the byte at m_begin, where the last piece's terminator stands
+    char* m_begin = nullptr; ///< first byte not returned yet
+    char* m_end = nullptr;   ///< one past the last byte read; the block has room for one more
+    char m_behind = '\0';    ///< the byte at m_begin, overwritten by the last piece's terminator
     bool m_isTerminated = false;
     bool m_isAtEnd = false;
     int m_fd = -1;

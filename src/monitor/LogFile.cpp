@@ -144,7 +144,7 @@ void LogFile::stopThread() {
         MonitorStatus = MONITOR_STOPPED;
     }
     unlockLog();
-    // A thread that could not be started again after its predecessor was joined is not there.
+    // There is no thread to join if it could not be restarted after its predecessor was joined.
     if (status != MONITOR_NOT_STARTED && m_hasThread) {
         pthread_join(LogThread, nullptr);
         m_hasThread = false;
@@ -217,7 +217,7 @@ void LogFile::fillCommonColumns(zrm_rmlogent_data_t* row) const {
     const std::string_view path = name.substr(0, pathLength);
     const std::string_view file = name.substr(pathLength);
     fillColumn(row->originnode, gSystemName != nullptr ? gSystemName : "");
-    // The columns of the local code page take the UTF-8 form too.
+    // The columns for the local code page take the UTF-8 form too.
     fillColumn(row->ulogpath, path);
     fillColumn(row->logpath, path);
     fillColumn(row->logname, file);
@@ -225,7 +225,7 @@ void LogFile::fillCommonColumns(zrm_rmlogent_data_t* row) const {
     fillChangingColumns(row);
 }
 
-/// The common columns that are not the same in every row of a log, or that the table writes.
+/// The common columns that vary between a log's rows or that the table writes.
 void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) const {
     row->freqthresh = 0;
     row->periodthrs = 0;
@@ -237,7 +237,7 @@ void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) const {
 void LogFile::prepareRow(zrm_rmlogent_data_t* row) {
     TraceScope trace(anchor);
     char* const columns = reinterpret_cast<char*>(row);
-    // With the flow of operations traced, each row has its columns filled by fillCommonColumns.
+    // While the flow class is traced, fillCommonColumns must run for each row.
     if (row == &m_row && m_isRowPrepared && !trace.isOn(TRC1_FLOW)) {
         constexpr std::size_t entry = offsetof(zrm_rmlogent_data_t, entrytime);
         constexpr std::size_t description = offsetof(zrm_rmlogent_data_t, entrydesc);
@@ -262,7 +262,7 @@ void LogFile::noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t lengt
                                std::int32_t lengthInUTF8) noexcept {
     if (row == &m_row) {
         m_descriptionLength = std::min(length, sizeof row->entrydesc);
-        // A negative length is none that can be relied upon.
+        // A negative length becomes huge, so the whole column counts.
         m_descriptionLengthInUTF8 =
             std::min(static_cast<std::size_t>(lengthInUTF8), sizeof row->uentrydesc);
     }
@@ -272,7 +272,7 @@ void LogFile::repairRow(zrm_rmlogent_data_t* row) {
     TraceScope trace(anchor);
     fillCommonColumns(row);
     if (row == &m_row) {
-        m_isRowPrepared = false; // the field's rest stands where the next row has to be blank
+        m_isRowPrepared = false; // the overrun left text where the next row must be blank
     }
 }
 

@@ -23,54 +23,54 @@ namespace zrm {
 
 class ValidLog;
 
-/// One monitored log with one thread of its own, which tails it and turns new entries into Log
-/// Entries rows; reports read it backwards on the threads of their requests. The log manager's
-/// thread constructs, reconfigures and destroys it. The log types derive from it: their
-/// constructors end with startThread, their destructors begin with stopThread.
+/// A monitored log with its own thread, which follows the file and turns new entries into Log
+/// Entries rows. Reports read the log backwards on the threads of their requests. The log manager's
+/// thread constructs, reconfigures and destroys it. Log types derive from this class; their
+/// constructors must end with startThread and their destructors begin with stopThread.
 class LogFile : public LogBase {
 public:
-    /// Takes fresh rows of a log, `count` of them, back to back, on the log's thread. It may write
-    /// the columns of the thresholds. Returns TABLE_NO_ROOM when nothing was offered, since the
-    /// framework has no room; other statuses do not concern the log.
+    /// Receives `count` new rows of a log, contiguous, on the log's thread. It may write the
+    /// threshold columns. Returns tableNoRoom if nothing was offered because the framework has no
+    /// room. The log ignores all other statuses.
     using RowReceiver = unsigned (*)(zrm_rmlogent_data_t* rows, int count);
-    /// Names the receiver of the rows of all logs; with null they go nowhere. Called while no log
-    /// has a thread.
+    /// Sets the receiver of the rows of all logs; null discards them. Call it while no log has a
+    /// thread.
     static void setRowReceiver(RowReceiver receiver) noexcept { m_rowReceiver = receiver; }
-    /// Names the open debug log of all logs, or null. The stream stays open as long as a log that
-    /// may write to it.
+    /// Sets the open debug log of all logs, or null. The stream must stay open as long as any log
+    /// that may write to it exists.
     static void setDebugLog(std::FILE* stream) noexcept;
 
-    /// Copies the configuration line and joins the chain of logs behind `chainHead` (null: none).
+    /// Copies the configuration line and joins the chain of logs after `chainHead` (null: none).
     LogFile(const ValidLog& log, LogFile* chainHead);
     LogFile(const LogFile&) = delete;
-    /// Takes over the debug mode of a changed line and restarts a monitor that is not running.
+    /// Applies the debug mode of a changed line and restarts a monitor that is not running.
     LogFile& operator=(const ValidLog& log);
 
-    // The virtual operations stand in slot order.
+    // The virtual functions are in slot order.
 
     ~LogFile() override;
     /// Ends a report, frees its state and clears the caller's pointer.
     virtual void endReportRequest(void** reportState) = 0;
     /// Fills `row` (zrm_rmlogent_data_t*) with the next older entry within the thresholds
-    /// (_RequestThresholds*) and returns it; null at the report's end.
+    /// (_RequestThresholds*) and returns it, or null at the end of the report.
     virtual void* getNextLogEntry(void* row, void* reportState, void* thresholds) = 0;
-    /// Opens the log for a report over the thresholds (_RequestThresholds*) and returns the
-    /// report's state; null when the report cannot start.
+    /// Opens the log for a report with the thresholds (_RequestThresholds*) and returns the
+    /// report's state, or null if the report cannot start.
     virtual void* startReportRequest(void* thresholds) = 0;
-    /// Fills one row from one entry, a terminated line or one record; `context` is the report's
-    /// state, null while monitoring. 0 when the row is built, non-zero when the entry is rejected.
-    /// Every byte of the row is written: it may still hold the entry before.
+    /// Fills one row from one entry, which is a terminated line or a record. `context` is the
+    /// report's state, or null while monitoring. Returns 0 if the row is built, non-zero if the
+    /// entry is rejected. Writes every byte of the row, which may still hold the previous entry.
     virtual long formatEntryAsRow(char* entry, void* row, void* context) = 0;
-    /// The body of the monitoring thread: open, seek to the end, wait loop, close.
+    /// The body of the monitoring thread: open, seek to the end, loop, close.
     virtual void processLogData() = 0;
-    /// Consumes everything between LogEOF and the end of the file; 0, or -1 on a read error.
+    /// Reads everything between LogEOF and the end of the file. Returns 0, or -1 on a read error.
     virtual long readLog();
 
     void startThread();
-    /// Lets a running monitor end by itself, so that stopThread waits less: each thread looks at
-    /// its status once a second, and many are to end at once.
+    /// Asks a running monitor to end, so that stopThread waits less: each thread checks its status
+    /// once a second, and many may have to end at once.
     void askToStop() noexcept;
-    /// Ends the monitoring thread and joins it; at once when no thread was ever started.
+    /// Ends the monitoring thread and joins it. Returns immediately if no thread was started.
     void stopThread();
     void setMonitorStatus(_MonitorStatus status);
     /// Copies the status text, at most `bufferLength` bytes, without a terminator. Any thread.
@@ -84,7 +84,7 @@ public:
     std::time_t monitorStartStopTime() const noexcept { return MonitorStartStopTime.load(); }
     const LogLedger& ledger() const noexcept { return m_ledger; }
 
-    // The log manager's mark of logs that a new configuration no longer names.
+    // The log manager marks logs that a new configuration no longer contains.
     bool isMarked() const noexcept { return RefreshMode; }
     void setMarked(bool marked) noexcept { RefreshMode = marked; }
 
@@ -96,35 +96,35 @@ protected:
     void openLogAndSeek();
     void noteOpenFile();
     void closeLog();
-    /// Remembers the bytes in front of LogEOF; the log's thread.
+    /// Remembers the bytes before LogEOF. Log's thread only.
     void guardEnd() noexcept;
     void waitForEventLoop(timeval interval);
-    /// Offers a row to the situations, once the framework has room. False when the log is to end or
-    /// the process is ending before it has: then nothing was offered, and the entry counts as
-    /// passed over.
+    /// Waits for room and offers a row to the situations. Returns false if the log has to end or
+    /// the process is ending before there is room. Then nothing was offered, and the entry counts
+    /// as skipped.
     bool offer(zrm_rmlogent_data_t* row);
-    /// Further entries were passed over since the process is ending; counts them if it is.
+    /// Counts further entries as skipped if the process is ending.
     static void notePassedOver(std::uint64_t entries) noexcept;
-    /// True when the log is to end and has had a second for what stood in it: a log may grow faster
-    /// than it is read. For every loop over entries.
+    /// True if the log has to end and had a second to read what was left. A log may grow faster
+    /// than it is read. Check it in every loop over entries.
     bool isReadingOver() noexcept;
-    /// Counts one more; the log's thread alone.
+    /// Increments a counter. Log's thread only.
     static void count(std::atomic<std::int64_t>& counter) noexcept;
-    /// Fills the columns that all kinds of logs share, in a row that is blank there.
+    /// Fills the columns common to all kinds of logs, in a row whose common columns are blank.
     void fillCommonColumns(zrm_rmlogent_data_t* row) const;
     /// The row in which the log's thread offers its entries.
     zrm_rmlogent_data_t* ownRow() noexcept { return &m_row; }
-    /// Makes `row` blank but for the common columns. The log's own row has kept its common columns
-    /// from the line before and costs less.
+    /// Blanks `row` except for the common columns. This is cheaper for the log's own row, which
+    /// keeps its common columns from the previous line.
     void prepareRow(zrm_rmlogent_data_t* row);
-    /// Says that a built row has so many characters in ENTRYDESC and UENTRYDESC and no text that
-    /// ran out of its column, so that the row of the next entry is blanked no further. Without this
-    /// it is blanked to the ends of the columns.
+    /// Records the lengths of ENTRYDESC and UENTRYDESC in a built row in which no text overran its
+    /// column. Only that many characters are then blanked for the next entry. Without this call,
+    /// the columns are blanked to their ends.
     void noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t length,
                           std::int32_t lengthInUTF8) noexcept;
-    /// Puts the common columns into a prepared row again, over a field that has run into them.
+    /// Restores the common columns of a prepared row that a field has overrun.
     void repairRow(zrm_rmlogent_data_t* row);
-    /// Makes a prepared row all blank: its entry is rejected.
+    /// Blanks all of a prepared row because its entry was rejected.
     void dropRow(zrm_rmlogent_data_t* row);
 
     // The debug log, shared by all logs.
@@ -140,7 +140,7 @@ protected:
     void closeLogForReport(int fd);
 
     bool RefreshMode = false;
-    // The thread owns the open file and the counters; a dump may read them on another thread.
+    // The thread owns the open file and the counters. A dump may read them on another thread.
     std::atomic<std::FILE*> LogFileP{nullptr};
     std::atomic<_MonitorStatus> MonitorStatus{MONITOR_NOT_STARTED};
     std::atomic<std::int64_t> LogEOF{-1};
@@ -155,7 +155,7 @@ protected:
     static pthread_mutex_t m_debugFileLock;
     Pulse m_pulse{fileNameUTF8(), &NumEvents};
     static std::atomic<std::FILE*> m_debugLog;
-    LogLedger m_ledger; ///< lives as long as the object: through every refresh that keeps it
+    LogLedger m_ledger; ///< lives as long as the object, across every refresh that keeps it
 
 private:
     friend void* logThread(void* logFile);
@@ -176,15 +176,15 @@ private:
 
     static inline RowReceiver m_rowReceiver = nullptr;
 
-    bool m_hasThread = false; ///< LogThread is to be joined; only those who start and stop use it
-    // The thread's.
-    std::chrono::steady_clock::time_point m_end{}; ///< of reading a log that is to end
+    bool m_hasThread = false; ///< LogThread must be joined; used only when starting and stopping
+    // Used by the log's thread only.
+    std::chrono::steady_clock::time_point m_end{}; ///< when a log that has to end stops reading
     LineReader m_lineReader;
     ReadGuard m_guard;
     zrm_rmlogent_data_t m_row{};
-    bool m_isRowPrepared = false;        ///< m_row's common columns stand
+    bool m_isRowPrepared = false;        ///< the common columns of m_row are filled
     std::size_t m_descriptionLength = 0; ///< characters of m_row's ENTRYDESC that may not be blank
-    std::size_t m_descriptionLengthInUTF8 = 0; ///< and of its UENTRYDESC
+    std::size_t m_descriptionLengthInUTF8 = 0; ///< the same for its UENTRYDESC
 };
 
 /// The monitoring thread's start routine; its argument is the LogFile.

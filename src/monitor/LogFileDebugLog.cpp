@@ -20,16 +20,16 @@ TRC1_Anchor anchor{"LogFileDebugLog.cpp"};
 std::int64_t numRecords = 0; // guarded by m_debugFileLock
 
 std::atomic<std::uint64_t> incompleteRecords{0};
-bool isIncomplete = false; // the latest record was; guarded by m_debugFileLock
+bool isIncomplete = false; // of the last record; guarded by m_debugFileLock
 
-/// What became of one piece of a record.
+/// The result of writing one piece of a record.
 enum class Piece {
     NOT_WRITTEN,
-    CUT, ///< some of it was written, or the newline behind it was not
+    CUT, ///< only a part was written, or the newline was not
     WRITTEN,
 };
 
-/// Writes one piece of a record and a newline behind it.
+/// Writes one piece of a record and a newline.
 Piece writePiece(std::FILE* stream, const void* data, unsigned long length) {
     const std::size_t written = std::fwrite(data, 1, length, stream);
     if (written == 0) {
@@ -76,7 +76,7 @@ void LogFile::unlockDebugFile() {
     trace.detail()("Debug file mutex unlocked.");
 }
 
-/// The open debug log when this log's entries are to be copied to it, else null.
+/// The open debug log if this log's entries must be copied to it, else null.
 std::FILE* LogFile::debugLogStream() const {
     if (debugMode() != 'Y') {
         return nullptr;
@@ -93,7 +93,7 @@ void LogFile::writeToDebugLog(const void* data1, unsigned long length1, const vo
     }
 }
 
-/// Traces that the log has an entry of which the debug log takes nothing: the usual case.
+/// Traces an entry that is not copied to the debug log, which is the usual case.
 void LogFile::traceEntry() const {
     TraceScope trace(anchor);
     if (trace.isOn(TRC1_DETAIL)) {
@@ -110,7 +110,7 @@ void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long le
     lockDebugFile(fileNameLocal());
     const auto lost = [&] {
         causeOfLoss = causeOfLoss == 0 ? errno : causeOfLoss;
-        std::clearerr(stream); // so that the next record shows for itself how it fares
+        std::clearerr(stream); // so that the next record reports its own outcome
     };
     if (std::fprintf(stream, "%s%ld%s", "\t\t>>>>>>>>> RECORD ", static_cast<long>(++numRecords),
                      " <<<<<<<<<\n") < 0) {
@@ -129,7 +129,7 @@ void LogFile::writeRecord(std::FILE* stream, const void* data1, unsigned long le
     };
     write(data1, length1);
     write(data2, length2);
-    if (causeOfLoss == 0 && std::fflush(stream) != 0) { // what has no newline at its end
+    if (causeOfLoss == 0 && std::fflush(stream) != 0) { // for text that does not end with a newline
         lost();
     }
     const bool wasIncomplete = std::exchange(isIncomplete, causeOfLoss != 0);

@@ -14,8 +14,8 @@
 
 namespace zrm {
 
-// Reading a log backwards for a report, block by block, on the thread of the report's request and
-// through a descriptor of the report's own.
+// Reads a log backwards for a report, block by block, on the thread of the report's request and
+// through the report's own descriptor.
 
 namespace {
 
@@ -68,8 +68,8 @@ long LogFile::openLogForReport(_LogBufferInfo* info) {
     return trace.result<long>(info->fd);
 }
 
-/// Makes the unconsumed bytes at the block's start unread again, so that the next block ends with
-/// them.
+/// Makes the unconsumed bytes at the start of the block unread again, so that the next block ends
+/// with them.
 void LogFile::pushBack(_LogBufferInfo* info) {
     TraceScope trace(anchor);
     if (lseek(info->fd, static_cast<off_t>(info->bufferCount), SEEK_CUR) < 1) {

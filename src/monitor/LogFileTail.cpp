@@ -15,25 +15,25 @@
 
 namespace zrm {
 
-// Following a log's growth, on the log's own thread.
+// Follows a log's growth on the log's own thread.
 
 namespace {
 
 TRC1_Anchor anchor{"LogFileTail.cpp"};
 
-/// How long lines are counted that the end of the process leaves in a log.
+/// How long to count the lines that the end of the process leaves unread.
 constexpr std::chrono::milliseconds countingTime{500};
 
 } // namespace
 
-/// Counts without a locked instruction: only the log's thread writes the counter.
+/// Counts without an atomic read-modify-write: only the log's thread writes the counter.
 void LogFile::count(std::atomic<std::int64_t>& counter) noexcept {
     counter.store(counter.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
 }
 
 void LogFile::openLogAndSeek() {
     TraceScope trace(anchor);
-    // Nothing waits here: a pipe in the log's place has no end to seek.
+    // Must not block: a pipe in place of the log has no end to seek to.
     int fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     if (fd >= 0 && DescriptorReserve::has(fd)) {
         close(fd);
@@ -70,7 +70,7 @@ void LogFile::guardEnd() noexcept {
     m_guard.take(LogFD, LogEOF);
 }
 
-/// Notes in the ledger which file LogFD is.
+/// Records in the ledger which file LogFD is.
 void LogFile::noteOpenFile() {
     struct stat status;
     if (fstat(LogFD, &status) == 0) {
@@ -90,7 +90,7 @@ void LogFile::closeLog() {
 
 void LogFile::waitForEventLoop(timeval interval) {
     TraceScope trace(anchor);
-    // A wait on no descriptors leaves the empty sets empty.
+    // With no descriptors to wait for, the empty sets stay empty.
     fd_set readable;
     fd_set writable;
     fd_set exceptional;
@@ -114,13 +114,13 @@ void LogFile::waitForEventLoop(timeval interval) {
     }
 }
 
-/// One look at the file's size; false when the monitor has failed and its status says why.
+/// Checks the file's size once. Returns false if the monitor has failed; its status says why.
 bool LogFile::checkForChange() {
     TraceScope trace(anchor);
     const std::int64_t newEOF = lseek(LogFD, 0, SEEK_END);
     if (newEOF > LogEOF) {
         if (!m_guard.holds(LogFD)) {
-            // What is read stays what it is; the ledger alone knows.
+            // This does not affect what is read. Only the ledger records it.
             noteTruncated(LogEOF, LogLedger::Truncation::regrown);
         }
         return trace.result(readGrowth());
@@ -142,7 +142,7 @@ bool LogFile::checkForChange() {
     return trace.result(true);
 }
 
-/// The file holds other bytes than those that were read; it is followed from `newEnd` on.
+/// The file no longer holds the bytes that were read. It is followed from `newEnd` on.
 void LogFile::noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind) {
     TraceScope trace(anchor);
     m_ledger.noteTruncated(kind, newEnd, m_guard.unreadInCopy(LogFD, fileNameLocal()));
@@ -166,7 +166,7 @@ bool LogFile::readGrowth() {
         setMonitorStatus(MONITOR_ERR_READ);
         return trace.result(false);
     }
-    // Where reading stopped: what was appended meanwhile counts only if it was read.
+    // The position where reading stopped. Text appended meanwhile counts only if it was read.
     const std::int64_t consumed = lseek(LogFD, 0, SEEK_CUR);
     if (consumed < 0) {
         const ErrorText error(errno);
@@ -216,7 +216,7 @@ void LogFile::notePassedOver(std::uint64_t entries) noexcept {
     }
 }
 
-/// Counts the lines behind one that nobody takes any more since the process is ending.
+/// Counts the remaining lines, which are not offered because the process is ending.
 void LogFile::passOverRest() {
     std::uint64_t entries = 0;
     const auto limit = std::chrono::steady_clock::now() + countingTime;

@@ -25,14 +25,14 @@ std::timespec now() noexcept {
     return time;
 }
 
-/// Adds without a locked instruction: one thread alone writes the counter.
+/// Adds without an atomic read-modify-write: only one thread writes the counter.
 void add(std::atomic<std::int64_t>& counter, std::int64_t count) noexcept {
     counter.store(counter.load(std::memory_order_relaxed) + count, std::memory_order_relaxed);
 }
 
 } // namespace
 
-/// The place of the next entry, that of the oldest one once KEPT are there; null without memory.
+/// The slot for the next entry, replacing the oldest once there are mostKept; null without memory.
 template <typename Entry> Entry* LogLedger::Latest<Entry>::next() noexcept {
     if (!entries) {
         entries.reset(new (std::nothrow) Entry[mostKept]);

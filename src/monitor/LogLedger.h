@@ -13,33 +13,33 @@
 
 namespace zrm {
 
-/// What one log's monitor has read and what it has passed over, since the log is monitored; beside
-/// the numbers of lines and of format errors, which the log itself counts. The log's thread writes,
-/// any thread reads. Reading costs the log's thread nothing: it takes the lock only for a line that
-/// does not fit and for a truncation, and memory for these is allocated by the first of them.
-/// Without memory they are counted, but not kept.
+/// Records what a log's monitor has read and skipped since monitoring began. The log itself
+/// counts lines and format errors. The log's thread writes, any thread reads. Ordinary
+/// lines need no lock: only a line that does not match and a truncation take it, and the
+/// first of these allocates the memory to keep them. Without memory they are counted but
+/// not kept.
 class LogLedger {
 public:
-    /// A line that did not fit, without its line end.
+    /// A line that did not match, without its line end.
     struct RejectedLine {
         std::timespec time; ///< when it was read
         std::size_t length;
         char text[2048];
     };
     enum class Truncation {
-        seen,    ///< the file was shorter than before
-        regrown, ///< it was not, but no longer held the bytes read last
+        seen,    ///< the file became shorter
+        regrown, ///< the file did not, but no longer held the bytes last read
     };
-    /// What a truncation keeps from the monitor: the bytes in front of the place from which the
-    /// file is followed now, and those that were appended before it and never read.
+    /// What a truncation hides from the monitor: the bytes before the position from which the file
+    /// is now followed, and the bytes appended before the truncation and never read.
     struct SkippedRange {
         std::timespec time; ///< when the truncation was noticed
         std::int64_t from;
-        std::int64_t to;     ///< behind the last byte
-        std::int64_t unread; ///< bytes of the old contents; -1: not known
+        std::int64_t to;     ///< one past the last byte
+        std::int64_t unread; ///< bytes of the old contents; -1: unknown
         Truncation kind;
     };
-    static constexpr std::size_t mostKept = 16; ///< lines and ranges that are kept, the latest
+    static constexpr std::size_t mostKept = 16; ///< number of lines and ranges kept (the latest)
 
     LogLedger() = default;
     LogLedger(const LogLedger&) = delete;
@@ -47,22 +47,22 @@ public:
 
     // On the log's thread.
 
-    /// The log's file was opened, or, with none, closed.
+    /// The log's file was opened (or closed, if there is none).
     void noteFile(const std::optional<FileIdentity>& file) noexcept;
     void addBytes(std::int64_t count) noexcept;
-    /// Entries have just been read.
+    /// Entries were just read.
     void noteEntries() noexcept;
-    /// A line did not fit.
+    /// A line did not match the format.
     void noteRejected(const char* line) noexcept;
-    /// A row has this first character in its ENTRYTIME.
+    /// `first` is the first character of a row's ENTRYTIME.
     void noteTime(char first) noexcept {
         if (first == ' ') {
             m_withoutTime.store(m_withoutTime.load(std::memory_order_relaxed) + 1,
                                 std::memory_order_relaxed);
         }
     }
-    /// The log was truncated; reading goes on at `from`, and `unread` bytes of the old contents are
-    /// lost (-1: not known).
+    /// The log was truncated. Reading continues at `from`, and `unread` bytes of the old contents
+    /// are lost (-1: unknown).
     void noteTruncated(Truncation kind, std::int64_t from, std::int64_t unread) noexcept;
 
     // On the thread that starts the monitor.
@@ -71,29 +71,29 @@ public:
 
     // On any thread.
 
-    /// The file that the monitor has open; none while it has none.
+    /// The file that the monitor has open, if any.
     std::optional<FileIdentity> file() const noexcept;
     std::int64_t bytesRead() const noexcept { return m_bytes.load(std::memory_order_relaxed); }
     std::int64_t truncations() const noexcept {
         return m_truncations.load(std::memory_order_relaxed);
     }
-    /// Rows without a time.
+    /// The number of rows without a time.
     std::int64_t withoutTime() const noexcept {
         return m_withoutTime.load(std::memory_order_relaxed);
     }
     std::int64_t skippedBytes() const noexcept { return m_skipped.load(std::memory_order_relaxed); }
-    /// How often the monitor was started again.
+    /// How often the monitor was restarted.
     std::int64_t restarts() const noexcept;
-    /// When entries were read last, in nanoseconds since the epoch; 0: never.
+    /// When entries were last read, in nanoseconds since the epoch; 0: never.
     std::int64_t lastEntry() const noexcept { return m_lastEntry.load(std::memory_order_relaxed); }
-    /// Copies the lines kept, the oldest first, to an array of KEPT. Returns their number.
+    /// Copies the kept lines, oldest first, to an array of mostKept. Returns their number.
     std::size_t copyRejected(RejectedLine* lines) const noexcept;
-    /// The same for the ranges.
+    /// Does the same for the ranges.
     std::size_t copySkipped(SkippedRange* ranges) const noexcept;
 
 private:
     template <typename Entry> struct Latest {
-        std::unique_ptr<Entry[]> entries; ///< KEPT of them, or null
+        std::unique_ptr<Entry[]> entries; ///< mostKept of them, or null
         std::size_t count = 0;            ///< written so far
 
         Entry* next() noexcept;
@@ -106,7 +106,7 @@ private:
     std::atomic<std::int64_t> m_withoutTime{0};
     std::atomic<std::int64_t> m_starts{0};
     std::atomic<std::int64_t> m_lastEntry{0};
-    mutable SYS1_Lock m_lock; ///< guards what follows
+    mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<FileIdentity> m_file;
     Latest<RejectedLine> m_rejectedLines;
     Latest<SkippedRange> m_skippedRanges;

@@ -6,7 +6,7 @@ namespace zrm {
 
 namespace {
 
-// From the lowest value to the highest, without a gap.
+// From the lowest to the highest value, without gaps.
 constexpr const char* statusTexts[] = {
     "Error: insufficient memory",
     "Error: format command",

@@ -5,8 +5,8 @@
 
 namespace zrm {
 
-/// State of a log's monitor. Only MONITOR_RUNNING keeps its wait loop going; negative values are
-/// error states.
+/// The state of a log's monitor. The monitoring loop continues only in MONITOR_RUNNING. Negative
+/// values are errors.
 enum _MonitorStatus : std::int32_t {
     MONITOR_RUNNING = 2,
     MONITOR_STOPPED = 1,
@@ -27,7 +27,7 @@ enum _MonitorStatus : std::int32_t {
     MONITOR_ERR_NO_MEMORY = -14,
 };
 
-/// The status's display text; "Error: unknown" for a value that is none of the above.
+/// The display text of the status; "Error: unknown" for any other value.
 const char* monitorStatusText(_MonitorStatus status) noexcept;
 
 } // namespace zrm

@@ -14,7 +14,7 @@ namespace zrm {
 
 namespace {
 
-constexpr int mostCopies = 100; ///< files looked into; a directory may hold any number
+constexpr int mostCopies = 100; ///< files to check; a directory may hold any number
 
 class Descriptor {
 public:
@@ -75,7 +75,7 @@ std::int64_t ReadGuard::unreadInCopy(int fd, const char* path) const noexcept {
     std::int64_t unread = -1;
     timespec newest{};
     int looked = 0;
-    // The stream belongs to this call alone. NOLINTNEXTLINE(concurrency-mt-unsafe)
+    // Only this call uses the stream. NOLINTNEXTLINE(concurrency-mt-unsafe)
     while (const dirent* const entry = looked < mostCopies ? readdir(entries.get()) : nullptr) {
         const std::string_view other = entry->d_name;
         if (other.size() <= name.size() || !other.starts_with(name)) {

@@ -7,20 +7,20 @@
 
 namespace zrm {
 
-/// The last bytes in front of the place to which a log has been read. They tell whether the file
-/// still holds what was read, even when it was truncated and has grown past that place again
-/// between two looks. Costs one read per look at a log that has grown, nothing per line. One
+/// The last bytes before the position up to which a log was read. They show whether the file
+/// still contains what was read, even if it was truncated and grew past that position again
+/// between two checks. Costs one read per check of a log that has grown, nothing per line. One
 /// thread.
 class ReadGuard {
 public:
-    /// Remembers the bytes of the file in front of `end`; nothing where they cannot be read.
+    /// Remembers the bytes of the file before `end`, or nothing if they cannot be read.
     void take(int fd, std::int64_t end) noexcept;
-    /// False when the file no longer holds these bytes; true also when nothing is remembered.
+    /// False if the file no longer contains these bytes. True if nothing is remembered.
     bool holds(int fd) const noexcept;
 
-    /// The number of bytes behind the guard in a copy of the file as it was: what was appended
-    /// after the last read and before the truncation. The copy is a file beside `path` whose name
-    /// begins with that of the log, as log rotation makes one. -1 when there is none.
+    /// The number of bytes after the guard in a copy of the old file, that is, bytes appended after
+    /// the last read and before the truncation. The copy is a file in the directory of `path` whose
+    /// name begins with the log's name, as log rotation creates it. -1 if there is none.
     std::int64_t unreadInCopy(int fd, const char* path) const noexcept;
 
 private:

@@ -26,7 +26,7 @@ void ReportOutcome::note(ReportEnd end) noexcept {
 
 void ReportOutcome::noteReached(const char* entryTime) noexcept {
     if (current != nullptr) {
-        current->m_reached.assign(entryTime, stampLength); // its room was reserved
+        current->m_reached.assign(entryTime, stampLength); // capacity is reserved
     }
 }
 

@@ -8,8 +8,8 @@ namespace zrm {
 
 /// Why a report ended.
 enum class ReportEnd {
-    complete, ///< at the beginning of the window or of the log
-    notRead,  ///< the log could not be opened, or its format is not known
+    complete, ///< at the start of the window or of the log
+    notRead,  ///< the log could not be opened, or its format is unknown
     formatErrors,
     longLine,
     noTime,
@@ -20,9 +20,9 @@ enum class ReportEnd {
     rowLimit,
 };
 
-/// How far a report reached and why it ended. The operations of reports have no room for it, so
-/// whoever wants to know keeps an outcome while the report runs on the same thread; without one
-/// nothing is noted. Outcomes may be nested: the innermost is the thread's. Notes cost nothing per
+/// How far a report reached and why it ended. The report functions cannot return this, so a
+/// caller who needs it keeps an outcome on the same thread while the report runs; without one,
+/// nothing is recorded. Outcomes may be nested; the innermost one records. Costs nothing per
 /// entry.
 class ReportOutcome {
 public:
@@ -31,17 +31,17 @@ public:
     ReportOutcome(const ReportOutcome&) = delete;
     ReportOutcome& operator=(const ReportOutcome&) = delete;
 
-    /// Notes on the thread's outcome why the report ends. The first note counts: later ones follow
-    /// from it.
+    /// Records on the thread's outcome why the report ends. Only the first call counts; later
+    /// reasons follow from it.
     static void note(ReportEnd end) noexcept;
-    /// Notes the ENTRYTIME (16 characters) of the oldest entry given so far.
+    /// Records the ENTRYTIME (16 characters) of the oldest entry returned so far.
     static void noteReached(const char* entryTime) noexcept;
 
     ReportEnd end() const noexcept { return m_end; }
     bool isComplete() const noexcept { return m_end == ReportEnd::complete; }
-    /// A clause without a capital and a full stop; empty for a complete report.
+    /// A clause without a capital letter and a full stop. Empty for a complete report.
     const char* reason() const noexcept;
-    /// ENTRYTIME of the oldest entry given; empty when there was none.
+    /// ENTRYTIME of the oldest entry returned, or empty if there was none.
     const std::string& reached() const noexcept { return m_reached; }
 
 private:

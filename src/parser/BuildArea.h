@@ -6,20 +6,20 @@
 
 namespace zrm {
 
-/// Where one directive is put together while it is learned: the place in the format text and the
+/// Where a directive is assembled while it is learned: the position in the format text and the
 /// directive built so far. One thread, one directive.
 struct _BuildArea {
-    static constexpr std::size_t limit = 255; ///< characters of a directive; one more terminates it
+    static constexpr std::size_t limit = 255; ///< characters of a directive, without the terminator
 
     explicit _BuildArea(const char* start) noexcept : position(start) {}
 
-    /// Appends one character; false when the area is full.
+    /// Appends one character. Returns false if the area is full.
     bool append(char character) noexcept { return append(&character, 1); }
     /// Appends all of the characters, or none and returns false.
     bool append(const char* text, std::size_t length) noexcept {
         return insert(count, text, length);
     }
-    /// Inserts all of the characters in front of the one at `index`, or none and returns false.
+    /// Inserts all characters before the one at `index`, or none and returns false.
     bool insert(std::size_t index, const char* text, std::size_t length) noexcept {
         if (count + length > limit) {
             return false;
@@ -30,9 +30,9 @@ struct _BuildArea {
         buffer[count] = '\0';
         return true;
     }
-    /// Takes the last character out.
+    /// Removes the last character.
     void removeLast() noexcept { buffer[--count] = '\0'; }
-    /// The number of characters, for the "%.*s" of messages.
+    /// The number of characters, for "%.*s" in messages.
     int length() const noexcept { return static_cast<int>(count); }
 
     const char* position; ///< in the format text

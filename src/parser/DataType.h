@@ -5,10 +5,10 @@
 
 namespace zrm {
 
-/// Type of a scanned field: the base of the size modifier plus the number of the conversion code.
+/// Type of a scanned field: base of its size modifier plus number of its conversion code.
 enum _DataType : int {
     DATATYPE_BAD = -1, ///< the size modifier could not be read
-    // The bases, which are also what extractVariableSize gives.
+    // The bases, which extractVariableSize also returns.
     DATATYPE_BASE_NONE = 0,
     DATATYPE_BASE_SHORT = 20,    ///< h
     DATATYPE_BASE_LONG = 30,     ///< l
@@ -48,7 +48,7 @@ enum _DataType : int {
     DATATYPE_LONGLONGx = 54,
 };
 
-// The default print directives, which also name the types in messages.
+// The default print directives. Messages also use them as names of the types.
 inline constexpr char defaultInt[] = "%d";
 inline constexpr char DEFAULT_UINTo[] = "%o";
 inline constexpr char DEFAULT_UINTu[] = "%u";
@@ -84,20 +84,20 @@ inline constexpr char DEFAULT_LONGLONGx[] = "%llx";
 /// The variable that receives a scanned field.
 enum class Receiver { INTEGER2, INTEGER4, INTEGER8, FLOAT, DOUBLE, LONG_DOUBLE, TEXT, CHARACTER };
 
-/// What the format language says of one data type.
+/// The properties of one data type in the format language.
 struct DataTypeInfo {
     _DataType type;
     const char* defaultDirective;
     Receiver receiver;
-    _DataType group;     ///< first type of the types that may be printed for one another
+    _DataType group;     ///< first of the types that can be printed for one another
     bool signOptions;    ///< a print directive may ask for '+' or a blank before the number
     bool groupingOption; ///< a print directive may ask for thousands grouping
 };
 
-/// The type's row in the table; null for a number that is no data type.
+/// The type's row in the table, or null if the number is not a data type.
 const DataTypeInfo* findDataType(_DataType type) noexcept;
 
-/// Bytes of the receiving variable; 1 for a text, of which the width says how many it has.
+/// The size of the receiving variable in bytes; 1 for a text, whose width determines its size.
 std::size_t receiverSize(Receiver receiver) noexcept;
 
 } // namespace zrm

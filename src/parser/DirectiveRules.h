@@ -7,21 +7,21 @@
 
 namespace zrm {
 
-// The rules that scan directives and print directives share.
+// The common rules of scan directives and print directives.
 
-/// A size modifier and the base of the data types that it gives.
+/// A size modifier and the base of its data types.
 struct SizeModifier {
     std::string_view text;
     _DataType base;
 };
 
-/// Longest first, so that the first match is the right one; the last one always matches.
+/// Longest first, so that the first match is the right one. The last one always matches.
 inline constexpr SizeModifier sizeModifiers[] = {
     {"ll", DATATYPE_BASE_LONGLONG}, {"l", DATATYPE_BASE_LONG}, {"h", DATATYPE_BASE_SHORT},
     {"L", DATATYPE_BASE_BIGLONG},   {"", DATATYPE_BASE_NONE},
 };
 
-/// Which size modifiers a conversion code goes with.
+/// The size modifiers that a conversion code accepts.
 enum class ModifierRule { ANY, FLOATING, NONE };
 
 constexpr bool isAllowed(ModifierRule rule, _DataType base) {
@@ -37,7 +37,7 @@ constexpr bool isAllowed(ModifierRule rule, _DataType base) {
     return false;
 }
 
-/// A conversion code, its number within the data types, and where it may stand.
+/// A conversion code, its number within the data types, and where it is allowed.
 struct ConversionCode {
     char code;
     int number;
@@ -56,8 +56,8 @@ inline constexpr ConversionCode conversionCodes[] = {
     {'[', 8, ModifierRule::NONE, true, false},     {'c', 9, ModifierRule::NONE, true, true},
 };
 
-/// An escape of scan formats and print directives: the character behind the backslash and what
-/// both stand for. The list is the whole set: neither form feeds nor numbers.
+/// An escape in scan formats and print directives: the character after the backslash and what both
+/// stand for. The list is complete: there are no form feeds and no numeric escapes.
 struct Escape {
     char written;
     char meant;
@@ -68,23 +68,23 @@ inline constexpr Escape escapes[] = {
     {'b', '\b'}, {'n', '\n'},  {'r', '\r'}, {'t', '\t'},  {'v', '\v'},
 };
 
-inline constexpr int maxColumn = 1023;        ///< last column that a field may start at
-inline constexpr int maxColumnCharacters = 4; ///< digits and ')': columns end at 999 in fact
-inline constexpr int maxScanWidth = 1023;     ///< most characters that a field may take
+inline constexpr int maxColumn = 1023;        ///< last column at which a field may start
+inline constexpr int maxColumnCharacters = 4; ///< digits and ')', so columns actually end at 999
+inline constexpr int maxScanWidth = 1023;     ///< maximum characters in a field
 inline constexpr int maxScanWidthDigits = 4;
 inline constexpr int maxPrintWidth = 256; ///< largest minimum width of a printed field
 inline constexpr int maxPrintWidthDigits = 3;
 inline constexpr int maxPrecision = 256;
-inline constexpr int maxPrecisionCharacters = 3; ///< the point included: two digits in fact
-inline constexpr unsigned defaultTextSize = 31;  ///< most characters of a text without a width
+inline constexpr int maxPrecisionCharacters = 3; ///< includes the point, so at most two digits
+inline constexpr unsigned defaultTextSize = 31;  ///< maximum characters in a text without a width
 inline constexpr std::string_view defaultTextWidth = "31";
 inline constexpr std::string_view consumedCount = "%n"; ///< ends each scan directive
 
-/// White space as the C library's scanner knows it in the "C" locale.
+/// White space as defined by the C library's scanner in the "C" locale.
 constexpr bool isWhiteSpace(char character) noexcept {
     return character == ' ' || (character >= '\t' && character <= '\r');
 }
-/// The first character of the text that is no white space.
+/// The first character of the text that is not white space.
 constexpr const char* skipWhiteSpace(const char* text) noexcept {
     while (isWhiteSpace(*text)) {
         ++text;

@@ -20,21 +20,21 @@ constexpr bool isHexDigit(char character) {
     return isDigit(character) || (lowerCase(character) >= 'a' && lowerCase(character) <= 'f');
 }
 
-/// A walk over the characters that the field may take.
+/// Walks over the characters that the field may take.
 class Cursor {
 public:
     Cursor(const char* text, unsigned width) : m_text(text), m_left(width) {}
 
-    /// The current character; a zero byte at the end of the text and of the width alike.
+    /// The current character, or a zero byte at the end of the text or width.
     char peek() const { return m_left > 0 ? *m_text : '\0'; }
     const char* position() const { return m_text; }
     void advance(unsigned count = 1) {
         m_text += count;
         m_left -= count;
     }
-    /// True when a hexadecimal prefix stands here and the width has room behind it.
+    /// True if a hexadecimal prefix is here and the width has room after it.
     bool atHexPrefix() const { return peek() == '0' && m_left > 2 && lowerCase(m_text[1]) == 'x'; }
-    /// Takes the word, in either case; false when it is not there whole.
+    /// Takes the word in either case. Returns false if it is not there in full.
     bool take(std::string_view word) {
         for (const char expected : word) {
             if (lowerCase(peek()) != expected) {
@@ -44,7 +44,7 @@ public:
         }
         return true;
     }
-    /// Takes the decimal point, which some locales write with several bytes.
+    /// Takes the decimal point, which has several bytes in some locales.
     bool takePoint(const char* point) {
         const std::size_t length = std::strlen(point);
         if (length == 0 || length > m_left || std::strncmp(m_text, point, length) != 0) {
@@ -59,8 +59,8 @@ private:
     unsigned m_left;
 };
 
-/// Takes digits with point and exponent. A lone sign of an exponent, or an exponent without
-/// digits, belongs to the field, though not to the value.
+/// Takes digits with a point and an exponent. The lone sign of an exponent, or an exponent without
+/// digits, belongs to the field but not to the value.
 void takeNumber(Cursor& cursor, bool isHex, const char* decimalPoint) {
     const char exponentMark = isHex ? 'p' : 'e';
     bool hasDigit = false;
@@ -98,7 +98,7 @@ const char* FloatField::findEnd(const char* text, unsigned width,
     case 'n':
         return cursor.take("nan") ? cursor.position() : nullptr;
     case 'i':
-        // Begun, the long form must be there whole: "infin" is no infinity.
+        // Once begun, the long form must be complete: "infin" is not infinity.
         return cursor.take("inf") && (lowerCase(cursor.peek()) != 'i' || cursor.take("inity"))
                    ? cursor.position()
                    : nullptr;
@@ -116,7 +116,7 @@ const char* FloatField::findEnd(const char* text, unsigned width,
 
 bool FloatField::convert(const char* begin, const char* end, Receiver receiver,
                          void* value) noexcept {
-    // The C library converts terminated text. Only a number longer than any sensible one costs an
+    // The C library converts terminated text. Only a number longer than any sensible one needs an
     // allocation.
     char usual[128];
     std::unique_ptr<char[]> large;

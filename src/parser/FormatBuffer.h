@@ -6,13 +6,13 @@
 
 namespace zrm {
 
-/// Where the texts of one keyword's fields are written, one behind the other, without terminators.
-/// The caller sets it up before each line.
+/// The buffer for the texts of one keyword's fields, written one after the other without
+/// terminators. The caller sets it up before each line.
 struct _FormatBuffer {
     char* position; ///< where the next text goes
-    long room;      ///< characters still free there
+    long room;      ///< characters still free
 
-    /// Writes as much of the text as there is room for.
+    /// Writes as much of the text as fits.
     void append(const char* text, std::size_t length) noexcept {
         if (room > 0 && length > 0) {
             const std::size_t written =
@@ -21,7 +21,7 @@ struct _FormatBuffer {
             advance(written);
         }
     }
-    /// Takes over so many characters that were written at the position, within its room.
+    /// Skips `length` characters already written at the position. They must fit in the room.
     void advance(std::size_t length) noexcept {
         position += length;
         room -= static_cast<long>(length);

@@ -3,13 +3,13 @@
 
 namespace zrm {
 
-/// One name that a format may give its fields. A table of them ends with an entry whose minimum
-/// is 0 and holds at most maxKeywords others; an entry's place in it is the field's print index.
+/// A name that a format may give its fields. A table of names holds at most maxKeywords entries and
+/// ends with an entry whose minimum is 0. The index of an entry is the field's print index.
 struct _KeywordFields {
     static constexpr int maxKeywords = 100;
 
     const char* keyword;
-    int minimum; ///< leading characters of the keyword that must be given
+    int minimum; ///< minimum number of leading characters to specify
 };
 
 } // namespace zrm

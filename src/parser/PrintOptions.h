@@ -5,7 +5,7 @@
 
 namespace zrm {
 
-/// The options of print directives, as the set in which they are remembered.
+/// The options of print directives, as bits of a set.
 enum PrintOptionFlag : unsigned {
     OPTION_GROUPING = 1,
     OPTION_LEFT = 2,
@@ -15,7 +15,7 @@ enum PrintOptionFlag : unsigned {
     OPTION_ZERO = 32,
 };
 
-/// Which scan data types an option goes with.
+/// The scan data types that an option applies to.
 enum class OptionTypes { ALL, SIGNED, GROUPED, NUMBERS };
 
 constexpr bool isAllowed(OptionTypes types, const DataTypeInfo& scanned) {
@@ -32,17 +32,17 @@ constexpr bool isAllowed(OptionTypes types, const DataTypeInfo& scanned) {
     return false;
 }
 
-/// The texts with which a refused option is reported. They differ, in blanks too.
+/// The message texts for rejected options. They differ, even in their blanks.
 enum class OptionRefusal { OPTION, THOUSANDS, ZERO };
 
-/// One option: what it goes with, and the option that it meets badly when that came first.
+/// One option: the types it applies to, and the earlier option it conflicts with.
 struct PrintOption {
     char character;
     unsigned flag;
     OptionTypes types;
     OptionRefusal refusal;
-    unsigned rival;  ///< flag of the option that was given before; 0: none
-    bool isYielding; ///< the rival wins: this option is dropped
+    unsigned rival;  ///< flag of the conflicting earlier option; 0: none
+    bool isYielding; ///< the rival wins and this option is dropped
 };
 
 inline constexpr PrintOption printOptions[] = {

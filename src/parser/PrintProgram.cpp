@@ -12,8 +12,8 @@ namespace zrm {
 
 namespace {
 
-/// Holds the longest text that a directive can give: a long double has up to 4933 digits, which
-/// thousands grouping stretches by a third, and the directive's own text adds 255.
+/// Fits the longest text that a directive can produce: a long double has up to 4933 digits,
+/// thousands grouping adds a third, and the directive's own text adds 255.
 constexpr std::size_t workSize = 8192;
 
 template <typename Type> Type valueAt(const void* value) {
@@ -22,7 +22,7 @@ template <typename Type> Type valueAt(const void* value) {
     return result;
 }
 
-/// The integer in its full width: the sign extended for signed conversions, not for others.
+/// The integer extended to full width, with its sign only for signed conversions.
 std::int64_t integerAt(const void* value, Receiver receiver, bool isSigned) {
     if (receiver == Receiver::INTEGER2) {
         return isSigned ? valueAt<std::int16_t>(value) : valueAt<std::uint16_t>(value);
@@ -41,8 +41,8 @@ bool isInteger(Receiver receiver) {
 
 constexpr std::size_t smallLength = 4;
 
-/// Prints a number that is small and needs no padding, as the parts of a time do; false, with
-/// nothing printed, for others. There is room for smallLength characters.
+/// Prints a small number that needs no padding, such as a part of a time. Returns false and prints
+/// nothing for others. The buffer must have room for smallLength characters.
 inline bool printSmall(std::uint32_t number, std::size_t width, _FormatBuffer& buffer) {
     if (number < 10 && width <= 1) {
         *buffer.position = static_cast<char>('0' + number);
@@ -81,8 +81,8 @@ bool PrintProgram::compile(const char* directive, _DataType type) noexcept {
     return true;
 }
 
-/// Looks for a directive that needs no help of the C library: at most zero padding and a minimum
-/// width, and no second '%'.
+/// Detects a directive that does not need the C library: at most zero padding and a minimum width,
+/// and no second '%'.
 PrintProgram::Kind PrintProgram::classify(const char* conversion) noexcept {
     m_fill = *conversion == '0' ? '0' : ' ';
     conversion += *conversion == '0' ? 1 : 0;
@@ -116,7 +116,7 @@ PrintProgram::Kind PrintProgram::classify(const char* conversion) noexcept {
 }
 
 bool PrintProgram::run(const void* value, _FormatBuffer& buffer) const noexcept {
-    // A negative number is a large one here.
+    // Cast to unsigned, a negative number is large.
     if (m_isBareInteger && buffer.room >= static_cast<long>(smallLength) &&
         printSmall(valueAt<std::uint32_t>(value), m_width, buffer)) {
         return true;
@@ -161,7 +161,7 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
         ++length;
     }
     length = std::max(length, m_width);
-    // Written from its right end, at its place when it fits there; else cut afterwards.
+    // Written from its right end: in place if it fits there, else cut afterwards.
     char cut[maxPrintWidth + 1];
     const bool fits = buffer.room >= static_cast<long>(length);
     char* const begin = fits ? buffer.position : cut;
@@ -177,7 +177,7 @@ void PrintProgram::printInteger(const void* value, _FormatBuffer& buffer) const 
         *--next = m_fill;
     }
     if (isNegative && m_fill == '0') {
-        *begin = '-'; // zeros go behind the sign
+        *begin = '-'; // zeros go after the sign
     }
     if (fits) {
         buffer.advance(length);

@@ -8,22 +8,22 @@
 
 namespace zrm {
 
-/// One print directive made ready for printing values of one data type. It writes what snprintf
-/// would write; the usual directives (constant text, plain texts and characters, decimal integers
-/// with or without a minimum width) do not go through it. Compiled once, then read-only.
+/// A print directive compiled for values of one data type. It writes what snprintf would write but
+/// does not use it for common directives: constant text, plain texts and characters, and decimal
+/// integers with or without a minimum width. Compiled once, then read-only.
 class PrintProgram {
 public:
     PrintProgram() = default;
     PrintProgram(const PrintProgram&) = delete;
     PrintProgram& operator=(const PrintProgram&) = delete;
 
-    /// Compiles the directive, whose text must live as long as the program, for values of `type`.
-    /// False when that is no data type.
+    /// Compiles the directive for values of `type`. Its text must live as long as the program.
+    /// Returns false if `type` is not a data type.
     bool compile(const char* directive, _DataType type) noexcept;
     bool isCompiled() const noexcept { return m_directive != nullptr; }
 
-    /// Appends the printed value (a receiving variable of the type) to the buffer, cut to its room.
-    /// False when the C library fails to print it.
+    /// Appends the printed value (a receiving variable of the type) to the buffer, cut to the
+    /// available room. Returns false if the C library fails to print it.
     bool run(const void* value, _FormatBuffer& buffer) const noexcept;
 
 private:
@@ -43,7 +43,7 @@ private:
     bool m_isSigned = false;
     char m_fill = ' ';
     std::size_t m_width = 0;      ///< minimum width of an integer
-    bool m_isBareInteger = false; ///< of 32 bits, without text around it
+    bool m_isBareInteger = false; ///< 32 bits, without surrounding text
 };
 
 } // namespace zrm

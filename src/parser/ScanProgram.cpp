@@ -20,7 +20,7 @@ constexpr unsigned char byteOf(char character) {
 
 constexpr unsigned char noDigit = 255;
 
-/// The value of each digit, noDigit for characters that are none.
+/// The value of each digit, or noDigit for other characters.
 constexpr auto digitValues = [] {
     std::array<unsigned char, 256> values{};
     values.fill(noDigit);
@@ -34,7 +34,7 @@ constexpr auto digitValues = [] {
     return values;
 }();
 
-/// The characters of a "%s".
+/// The characters that "%s" accepts.
 constexpr auto wordCharacters = [] {
     std::array<bool, 256> accepted{};
     for (int character = 1; character < 256; ++character) {
@@ -43,7 +43,7 @@ constexpr auto wordCharacters = [] {
     return accepted;
 }();
 
-/// What an integer conversion reads.
+/// How an integer conversion reads its number.
 struct IntegerCode {
     char code;
     unsigned base;
@@ -53,12 +53,12 @@ constexpr IntegerCode integerCodes[] = {
     {'d', 10, true}, {'i', 0, true}, {'o', 8, false}, {'u', 10, false}, {'x', 16, false},
 };
 
-/// Reads digits of a base, at most `width` of them. Returns the position behind them.
+/// Reads at most `width` digits of a base. Returns the position after them.
 template <unsigned Base>
 const char* readDigits(const char* position, unsigned width, std::uint64_t& magnitude,
                        bool& overflowed) {
     constexpr std::uint64_t most = std::numeric_limits<std::uint64_t>::max();
-    constexpr unsigned safeDigits = 16; // so few digits never overflow
+    constexpr unsigned safeDigits = 16; // this many digits never overflow
     unsigned safe = width < safeDigits ? width : safeDigits;
     unsigned left = width - safe;
     unsigned digit = 0;
@@ -119,12 +119,12 @@ void ScanProgram::compile(const char* directive, unsigned textWidth) noexcept {
                   : m_kind == Kind::TEXT && textWidth > 0 ? textWidth
                                                           : UINT_MAX;
     }
-    constexpr unsigned mostDigits = 9; // these fit into 32 bits of either sign
+    constexpr unsigned mostDigits = 9; // this many fit into 32 bits, signed or not
     m_fewDigits = std::min(m_width, mostDigits);
     m_isCounted = consumedCount == position;
 }
 
-/// Returns the position behind the conversion.
+/// Returns the position after the conversion.
 const char* ScanProgram::compileConversion(const char* conversion, unsigned base) noexcept {
     for (const ConversionCode& candidate : conversionCodes) {
         if (!candidate.scans || candidate.code != *conversion) {
@@ -165,8 +165,8 @@ const char* ScanProgram::compileConversion(const char* conversion, unsigned base
     return conversion;
 }
 
-/// Reads a scan set, from behind its '[', as the C library does: "a-f" is a range when its ends are
-/// in order, and a '-' or ']' that comes first is itself. Returns the position behind the ']'.
+/// Reads a scan set that starts after its '[', as the C library does: "a-f" is a range if its ends
+/// are in order, and a '-' or ']' that comes first is literal. Returns the position after the ']'.
 const char* ScanProgram::compileSet(const char* set) noexcept {
     m_skipsWhiteSpace = false;
     m_accepted = m_set.data();
@@ -197,8 +197,8 @@ const char* ScanProgram::compileSet(const char* set) noexcept {
     return *set == ']' ? set + 1 : set;
 }
 
-/// A few digits and nothing before them, which is what the numbers of most logs are; false, with
-/// nothing read, for everything else.
+/// Reads a few digits with nothing before them, as in most logs. Returns false and reads nothing
+/// for anything else.
 inline bool ScanProgram::scanShortNumber(const char*& position, void* value) const noexcept {
     const char* next = position;
     const char* const limit = position + m_fewDigits;
@@ -211,7 +211,7 @@ inline bool ScanProgram::scanShortNumber(const char*& position, void* value) con
     }
     position = next;
     if (value != nullptr) {
-        // Too small to meet the end of any range but that of the shortest, which cuts it.
+        // Too small to exceed any type's range except the shortest, for which it is cut.
         if (m_receiver == Receiver::INTEGER4) {
             store<std::int32_t>(number, value);
         } else if (m_receiver == Receiver::INTEGER2) {
@@ -234,7 +234,7 @@ int ScanProgram::run(const char* text, void* value) const noexcept {
     return scan(text, value);
 }
 
-/// Skips leading text that is none, or one character that is there.
+/// Skips leading text that is empty or one character.
 inline bool ScanProgram::skipShortLiteral(const char*& position) const noexcept {
     if (m_isOneCharacter) {
         return *position++ == *m_literal;
@@ -324,7 +324,7 @@ ScanProgram::Outcome ScanProgram::scanInteger(const char*& position, void* value
     unsigned base = m_base;
     bool hasDigits = false;
     if (base != 10 && left > 0 && *next == '0') {
-        hasDigits = true; // A prefix without digits behind it is the number 0.
+        hasDigits = true; // A prefix without digits after it is the number 0.
         ++next;
         --left;
         if (left > 0 && (*next == 'x' || *next == 'X')) {
@@ -361,8 +361,8 @@ ScanProgram::Outcome ScanProgram::scanInteger(const char*& position, void* value
     return Outcome::MATCHED;
 }
 
-/// The C library reads every integer as a long, stops at the ends of its range, and cuts the result
-/// to the receiving variable.
+/// Like the C library, reads every integer as a long, stops at the ends of its range, and cuts the
+/// result to the receiving variable.
 void ScanProgram::storeInteger(std::uint64_t magnitude, bool isNegative, bool overflowed,
                                void* value) const noexcept {
     std::uint64_t bits = isNegative ? 0 - magnitude : magnitude;
@@ -397,7 +397,7 @@ ScanProgram::Outcome ScanProgram::scanFloating(const char*& position, void* valu
     return Outcome::MATCHED;
 }
 
-/// The end of a text that reaches up to one character, which is searched for many bytes at once.
+/// The end of a text that extends to one stop character. The search covers many bytes at once.
 const char* ScanProgram::findStop(const char* begin) const noexcept {
     const std::size_t limit = strnlen(begin, m_width);
     const void* const stop = std::memchr(begin, m_stop, limit);

@@ -17,7 +17,7 @@ TRC1_Anchor anchor{"StringParser.cpp"};
 
 constexpr char startPattern[] = " %*1[Aa] , \"%n";
 
-/// Where a specifier without the right beginning goes wrong.
+/// The offset at which a specifier without a valid beginning fails.
 std::size_t findBadStart(const char* text) {
     constexpr const char* expected[] = {"Aa", ",", "\""};
     const char* position = text;
@@ -39,7 +39,7 @@ StringParser::StringParser(const char* formatSpecifier, const _KeywordFields* va
     std::snprintf(FieldName, sizeof FieldName, "ANCHOR");
     const char* const text = formatSpecifier != nullptr ? formatSpecifier : "";
     int length = 0;
-    // Only the count tells: the pattern stores nothing.
+    // Only the count matters: the pattern stores nothing.
     static_cast<void>(std::sscanf(text, startPattern, &length));
     if (length == 0) {
         trace.error()(
@@ -72,8 +72,8 @@ StringParser::StringParser(const char** formatPosition, OneDirective) {
     m_distanceToEnd = static_cast<std::size_t>(*formatPosition - begin);
 }
 
-/// Learns the directives behind this one, node by node: a node that learned the next one would
-/// take as much stack as a format has directives. False when one of them fails.
+/// Learns the directives after this one in a loop. Recursion would use stack space in proportion to
+/// the number of directives. Returns false if one of them fails.
 bool StringParser::learnRest(const char** formatPosition) {
     TraceScope trace(anchor);
     for (StringParser* last = this;; last = last->ScanOrder.get()) {
@@ -91,7 +91,7 @@ bool StringParser::learnRest(const char** formatPosition) {
     }
 }
 
-/// Destroys the nodes behind this one, the last one first and none from within another.
+/// Destroys the nodes after this one, the last one first and without recursion.
 void StringParser::destroyRest() noexcept {
     std::unique_ptr<StringParser> reversed;
     while (ScanOrder) {
@@ -155,7 +155,7 @@ const char* StringParser::convertType2Char(_DataType type) noexcept {
     return info != nullptr ? info->defaultDirective : "";
 }
 
-/// Characters of the scan directive without its "%n", for messages.
+/// The length of the scan directive without its "%n", for messages.
 int StringParser::scanDirectiveLength() const noexcept {
     const std::string_view directive = scanDirective();
     const bool isCounted = directive.ends_with(consumedCount);

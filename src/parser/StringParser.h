@@ -18,67 +18,67 @@ struct PrintOption;
 /// How far a node of a format's chain, or the whole format, was learned.
 enum _ObjectStatus : int {
     OBJECT_FAILED = -1,
-    OBJECT_NO_DIRECTIVE = 0,   ///< the scan format holds no further directive
-    OBJECT_LEARNED = 1,        ///< the node's directive
-    OBJECT_FORMAT_LEARNED = 2, ///< the anchor: the whole format
+    OBJECT_NO_DIRECTIVE = 0,   ///< the scan format has no further directive
+    OBJECT_LEARNED = 1,        ///< the node's directive was learned
+    OBJECT_FORMAT_LEARNED = 2, ///< on the anchor: the whole format was learned
 };
 
-/// A line layout of a text log, learned from a format specifier: a chain with one node for each
-/// scan directive, headed by an anchor. The anchor scans lines and prints their fields into
-/// buffers. Learning fills the chain once; scanning changes only the receiving variables, so one
-/// chain serves one caller at a time. The anchor owns the chain.
+/// A line layout of a text log, learned from a format specifier. It is a chain with one node per
+/// scan directive, headed by an anchor, which owns the chain. The anchor scans lines and prints
+/// their fields into buffers. The chain is learned once. Scanning changes only the receiving
+/// variables, so one chain serves one caller at a time.
 class StringParser {
 public:
-    /// Learns a whole format; usable when status() is then OBJECT_FORMAT_LEARNED. The keywords
-    /// must live as long as the object is constructed.
+    /// Learns a whole format. The object is usable if status() is then OBJECT_FORMAT_LEARNED. The
+    /// keywords are needed only during construction.
     StringParser(const char* formatSpecifier, const _KeywordFields* validFields);
-    /// Learns the directive that follows the character at `*formatPosition`, and the rest of the
-    /// chain behind it; `*formatPosition` is then the last character that was read.
+    /// Learns the directive after the character at `*formatPosition` and the rest of the chain.
+    /// Sets `*formatPosition` to the last character read.
     explicit StringParser(const char** formatPosition);
     StringParser(const StringParser&) = delete;
     StringParser& operator=(const StringParser&) = delete;
     virtual ~StringParser();
 
-    /// On the anchor: scans a line and prints its fields into the buffers, which the fields' print
-    /// indexes index. Returns the number of fields printed; -1 when the line does not fit.
+    /// On the anchor: scans a line and prints its fields into the buffers, indexed by the fields'
+    /// print indexes. Returns the number of fields printed, or -1 if the line does not match.
     int formatLine(const char* line, _FormatBuffer* buffers);
-    /// On the anchor: scans a line into the receiving variables. Returns the number of directives;
-    /// -1 when the line does not fit.
+    /// On the anchor: scans a line into the receiving variables. Returns the number of directives,
+    /// or -1 if the line does not match.
     int scanInput(const char* line);
-    /// On the anchor: prints the values of the line scanned last. Returns the number of fields; -1
-    /// when one cannot be printed.
+    /// On the anchor: prints the values of the last scanned line. Returns the number of fields, or
+    /// -1 if one cannot be printed.
     int formatFields(_FormatBuffer* buffers);
 
     // For explaining a format and its lines.
 
-    /// Where one directive looks in a line; offsets in the line.
+    /// Where one directive looks in a line, as offsets in the line.
     struct Place {
         bool isInside;         ///< false: the line ends before the directive's column
-        bool isLiteralMatched; ///< the literal text in front of the directive is there
+        bool isLiteralMatched; ///< the literal text before the directive is there
         bool isMatched;
-        std::size_t value; ///< where the value begins, or where the line stops fitting
-        std::size_t end;   ///< behind the value, when matched
+        std::size_t value; ///< where the value begins, or where the line stops matching
+        std::size_t end;   ///< one past the value, if matched
     };
-    /// Scans this node's directive alone, from `position` in the line, which the directive's column
-    /// overrules: a step of scanInput, without its messages.
+    /// Scans this node's directive only, starting at `position` in the line unless the directive
+    /// has a column. This is one step of scanInput, without its messages.
     Place locate(const char* line, std::size_t position) const;
-    /// Prints the value scanned last as formatFields does; false when it cannot be printed.
+    /// Prints the last scanned value as formatFields does. Returns false if it cannot be printed.
     bool printValue(_FormatBuffer& buffer) const;
-    /// On the anchor: the offset in the specifier at which learning began to go wrong. On an anchor
-    /// that was learned: of the scan format's opening quote.
+    /// On the anchor: the offset in the specifier at which learning failed, or, if it succeeded,
+    /// the offset of the scan format's opening quote.
     std::size_t learnedTo() const noexcept { return m_learnedTo; }
-    /// Characters of the specifier from the last one of the directive before (from the opening
-    /// quote, for the first) to this directive's '%', and to its last one.
+    /// Characters of the specifier from the last one of the previous directive (for the first, from
+    /// the opening quote) to this directive's '%', and to its last character.
     std::size_t distanceToBegin() const noexcept { return m_distanceToBegin; }
     std::size_t distanceToEnd() const noexcept { return m_distanceToEnd; }
 
-    /// Dumps this node and all behind it to the trace.
+    /// Dumps this node and all nodes after it to the trace.
     void printChain() const;
     void printSelf() const;
-    /// The default print directive of a type, which names it in messages; "" for no type.
+    /// The default print directive of a type, its name in messages. Empty if it is not a type.
     static const char* convertType2Char(_DataType type) noexcept;
 
-    // What was learned.
+    // The learned properties.
     _ObjectStatus status() const noexcept { return ObjectStatus; }
     const StringParser* next() const noexcept { return ScanOrder.get(); }
     const char* fieldName() const noexcept { return FieldName; }
@@ -135,12 +135,12 @@ protected:
     unsigned MaxFieldSize = 0;
     unsigned MinFieldSize = 0;
     unsigned Offset = 0;    ///< column - 1
-    bool HasColumn = false; ///< tells column 1 from none
+    bool HasColumn = false; ///< distinguishes column 1 from no column
     unsigned Precision = 0;
     std::unique_ptr<unsigned char[]> Value; ///< the receiving variable
 
 private:
-    struct OneDirective {}; ///< chooses the constructor that learns no chain
+    struct OneDirective {}; ///< selects the constructor that learns only one node
 
     StringParser(const char** formatPosition, OneDirective);
     bool learnRest(const char** formatPosition);

@@ -14,8 +14,8 @@ TRC1_Anchor anchor{"StringParserFields.cpp"};
 
 constexpr char startPattern[] = "\" , %n";
 
-/// Length of the field name that the text begins with when it names `keyword` by at least its
-/// minimum; 0 when it does not.
+/// The length of the field name at the start of the text, if it matches at least the minimum of
+/// `keyword`; otherwise 0.
 std::size_t matchKeyword(const char* text, const _KeywordFields& keyword) {
     const std::size_t nameLength = std::strcspn(text, "= \t\n\v\f\r");
     const bool isNamed = nameLength >= static_cast<std::size_t>(keyword.minimum) &&

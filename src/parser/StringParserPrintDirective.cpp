@@ -16,7 +16,7 @@ namespace {
 TRC1_Anchor anchor{"StringParserPrintDirective.cpp"};
 
 constexpr char openingPattern[] = "= \"%n";
-constexpr int openingLength = 3; ///< characters of the pattern that the text must hold
+constexpr int openingLength = 3; ///< minimum number of characters for the pattern to match
 
 } // namespace
 
@@ -92,8 +92,8 @@ int StringParser::validatePrintOptions(_BuildArea* area) {
     return trace.result(-1);
 }
 
-/// Decides on one option, of which `given` holds those kept before it; warns where it is dropped
-/// for another reason than having been given twice. `text` is the print text from the option on.
+/// Decides whether to keep an option. `given` holds the options already kept. Warns if it is
+/// dropped, unless it is a repetition. `text` is the print text starting at the option.
 bool StringParser::isPrintOptionKept(const PrintOption& option, unsigned given,
                                      const char* text) const {
     TraceScope trace(anchor);
@@ -112,7 +112,7 @@ bool StringParser::isPrintOptionKept(const PrintOption& option, unsigned given,
     }
     if (option.flag == OPTION_GROUPING && trace.isOn(TRC1_FINE)) {
         const char separator = *nl_langinfo(THOUSEP);
-        // A locale without grouping has none; a blank keeps the record whole.
+        // A locale without grouping has no separator. A blank keeps the record complete.
         trace.fine()("Integer \"thousands_sep\" is '%c'.", separator != '\0' ? separator : ' ');
     }
     return trace.result(true);
@@ -186,7 +186,7 @@ int StringParser::extractPrecision(_BuildArea* area) {
     if (length == 0) {
         length = 1;
     }
-    // The reading also takes a sign or white space before the digits, which no directive may hold.
+    // sscanf also accepts a sign or white space before the digits, which no directive may contain.
     const bool isWritten = length == 1 || isDigit(text[1]);
     if (!isWritten || precision < 0 || precision > maxPrecision ||
         length > maxPrecisionCharacters) {

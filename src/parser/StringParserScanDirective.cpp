@@ -31,7 +31,7 @@ const char* StringParser::formatNextDirective(const char* position) {
     return area.position;
 }
 
-/// Reads the directive behind its '%' and stores it. 0 or -1.
+/// Reads the directive after its '%' and stores it. Returns 0 or -1.
 int StringParser::buildScanDirective(_BuildArea* area) {
     TraceScope trace(anchor);
     if (*area->position == '(' && extractOffset(area) != 0) {
@@ -52,7 +52,7 @@ int StringParser::buildScanDirective(_BuildArea* area) {
     if (validateScanConvcode(area) != 0) {
         return trace.result(-1);
     }
-    // A directive that leaves no room for the count is learned all the same and matches no line.
+    // A directive that has no room left for the count is still learned, but matches no line.
     area->append(consumedCount.data(), consumedCount.size());
     if (allocateVariableStorage(area, widthPosition) != 0 ||
         !storeDirective(*area, ScanDirective)) {
@@ -87,8 +87,8 @@ int StringParser::findDirective(_BuildArea* area) {
     }
 }
 
-/// Replaces the backslash just appended, at the position, by the character that it and the next
-/// one mean, and moves on to that one.
+/// Replaces the backslash that was just appended with the character that the escape stands for, and
+/// moves the position to the escape's second character.
 bool StringParser::takeEscape(_BuildArea* area) {
     if (area->position[1] == '\0') {
         return false;
@@ -191,7 +191,7 @@ int StringParser::validateScanConvcode(_BuildArea* area) {
     bool isEscapeBad = false;
     if (conversion == nullptr || (code == '[' && !copyScanSet(area, isEscapeBad))) {
         if (!isEscapeBad) {
-            // At the end of the text there is no code; a blank keeps the record whole.
+            // At the end of the text there is no code. A blank keeps the record complete.
             trace.error()("Invalid convcode or receiving variable size specified for code %c.  "
                           "Directive is %.*s",
                           code != '\0' ? code : ' ', area->length(), area->buffer);
@@ -210,8 +210,8 @@ int StringParser::validateScanConvcode(_BuildArea* area) {
     return trace.result(0);
 }
 
-/// Copies a scan set from behind its '[', which is in the buffer, up to its ']'. False when it has
-/// no end, or an escape that is none, which is then already traced.
+/// Copies a scan set, whose '[' is already in the buffer, up to its ']'. Returns false if the set
+/// has no end or an invalid escape, which is then already traced.
 bool StringParser::copyScanSet(_BuildArea* area, bool& isEscapeBad) {
     bool isFirst = true;
     for (;;) {
@@ -220,7 +220,7 @@ bool StringParser::copyScanSet(_BuildArea* area, bool& isEscapeBad) {
             return false;
         }
         if (character == '\\' && !takeEscape(area)) {
-            isEscapeBad = *area->position != '\\'; // else the text ends behind the backslash
+            isEscapeBad = *area->position != '\\'; // else the text ends after the backslash
             return false;
         }
         if (character == ']' && !isFirst) {
@@ -240,7 +240,7 @@ int StringParser::allocateVariableStorage(_BuildArea* area, long widthPosition) 
     if (info->receiver == Receiver::TEXT) {
         if (MaxFieldSize == 0) {
             MaxFieldSize = defaultTextSize;
-            // Without room for it the directive's text lacks the width; scanning keeps to it.
+            // If it does not fit, the text lacks the width, but scanning still applies it.
             area->insert(static_cast<std::size_t>(widthPosition), defaultTextWidth.data(),
                          defaultTextWidth.size());
         }
@@ -258,7 +258,7 @@ int StringParser::allocateVariableStorage(_BuildArea* area, long widthPosition) 
     return trace.result(0);
 }
 
-/// Keeps a copy of a finished directive; false, with a message, when memory runs out.
+/// Stores a copy of a finished directive. Returns false, with a message, if memory runs out.
 bool StringParser::storeDirective(const _BuildArea& area,
                                   std::unique_ptr<char[]>& directive) const {
     TraceScope trace(anchor);

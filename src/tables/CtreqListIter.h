@@ -5,7 +5,7 @@
 
 namespace zrm {
 
-/// Walks a table manager's open requests, while its lock is held.
+/// Walks a table manager's open requests. Use it only while holding the manager's lock.
 class CtreqListIter : public LinkedListIter {
 public:
     using LinkedListIter::LinkedListIter;

@@ -12,7 +12,7 @@ const TableColumn* TableDescription::find(std::string_view name) const noexcept 
 }
 
 unsigned TableDescription::describe(ColumnInfo* info, int index) const noexcept {
-    // The framework's probe for the end of the columns, one behind the last, is no error.
+    // The framework probes one past the last column to find the end. That is not an error.
     if (index < 0 || index > numColumns()) {
         return tableNoSuchColumn;
     }

@@ -10,36 +10,36 @@
 
 namespace zrm {
 
-// Statuses that the tables give to the framework.
+// Statuses that the tables return to the framework.
 inline constexpr unsigned tableNoManager = 0x21060002;
 inline constexpr unsigned tableNoSuchColumn = 0x21060007;
 /// One column of a table's row record.
 struct TableColumn {
-    std::string_view name;    ///< upper-case name, by which conditions refer to the column
-    const char* internalName; ///< the name that the framework learns
+    std::string_view name;    ///< upper-case name, used by conditions
+    const char* internalName; ///< the name reported to the framework
     ColumnType type;
     std::size_t offset; ///< bytes from the row's start
     std::size_t width;  ///< bytes
 };
 
-/// One table as its request objects describe it to the framework. Constant data of static
+/// A table as its request objects describe it to the framework. Constant data with static storage
 /// duration.
 struct TableDescription {
-    const char* className; ///< the row holder class, which heads a state dump
+    const char* className; ///< the row holder class, printed at the top of a state dump
     std::span<const TableColumn> columns;
     unsigned rowSize;   ///< bytes
-    unsigned allocSize; ///< rows of room added each time the data array is full
+    unsigned allocSize; ///< rows to grow by when the data array is full
 
     int numColumns() const noexcept { return static_cast<int>(columns.size()); }
 
-    /// The column of this upper-case name, letter by letter; null when there is none.
+    /// The column with exactly this upper-case name, or null if there is none.
     const TableColumn* find(std::string_view name) const noexcept;
 
-    /// Describes column `index` and returns 0. An index out of range gives tableNoSuchColumn;
-    /// the one right behind the last column gives 0. Both leave `info` as it was.
+    /// Describes column `index` and returns 0. Returns tableNoSuchColumn if the index is out of
+    /// range, but 0 for the one just past the last column. Both leave `info` unchanged.
     unsigned describe(ColumnInfo* info, int index) const noexcept;
 
-    /// True when the columns, in order, cover the whole record: each begins where the one before
+    /// True if the columns, in order, cover the whole record: each begins where the previous one
     /// ends, integers at the next multiple of four.
     constexpr bool coversRow() const noexcept {
         constexpr std::size_t integerSize = sizeof(std::int32_t);

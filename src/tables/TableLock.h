@@ -5,7 +5,7 @@
 
 namespace zrm {
 
-/// Holds a table manager's lock; lives on the stack of one thread.
+/// Holds a table manager's lock. Lives on the stack of one thread.
 class TableLock {
 public:
     explicit TableLock(TableManager& manager) : m_lock(manager.lock()) { SYS1_GetLock(m_lock); }

@@ -13,10 +13,10 @@
 
 namespace zrm {
 
-// What the managers of both tables do alike.
+// The common operations of both tables' managers.
 
-/// Creates the table's manager, keeps it in `singleton` for the rest of the process and registers
-/// it. Returns tableNoManager when memory runs out, else the framework's status.
+/// Creates the table's manager, stores it in `singleton` for the rest of the process and registers
+/// it. Returns tableNoManager if memory runs out, else the framework's status.
 template <typename Manager>
 unsigned registerTable(std::atomic<Manager*>& singleton, const char* table) {
     auto* const manager = new (std::nothrow) Manager("ZRM", table);
@@ -27,7 +27,7 @@ unsigned registerTable(std::atomic<Manager*>& singleton, const char* table) {
     return TableManager::RegisterWithManager(manager);
 }
 
-/// Creates a request object that is ready for the framework, which owns it; null when memory runs
+/// Creates a request object ready for the framework, which owns it. Returns null if memory runs
 /// out.
 template <typename Agent>
 ctreq* createRequest(RequestDetail* detail, ContextInfo* context, TableManager* manager) {
@@ -38,8 +38,8 @@ ctreq* createRequest(RequestDetail* detail, ContextInfo* context, TableManager* 
     return agent;
 }
 
-/// Offers `count` rows, back to back, to these requests of a table and dispatches what each one
-/// accepts. Returns the last non-zero status of a dispatch, else 0. The caller holds the lock.
+/// Offers `count` contiguous rows to these requests of a table and dispatches what each one
+/// accepts. Returns the last non-zero dispatch status, else 0. The caller holds the lock.
 template <typename RowHolder, typename Row>
 unsigned offerRowsTo(LinkedList& requests, Row* rows, int count) {
     unsigned status = 0;
@@ -53,14 +53,14 @@ unsigned offerRowsTo(LinkedList& requests, Row* rows, int count) {
         if (dispatched != 0) {
             status = dispatched;
         }
-        request->count = 0; // the same rows are never dispatched twice
+        request->count = 0; // never dispatch the same rows twice
         RSC1_Drop(handle);
     }
     return status;
 }
 
-/// Offers the rows to every open request of the table, as above. Any thread; one array of rows at
-/// a time.
+/// Offers the rows to every open request of the table, as above. Any thread; one array of rows at a
+/// time.
 template <typename RowHolder, typename Row>
 unsigned offerRows(TableManager& manager, Row* rows, int count) {
     const TableLock lock(manager);

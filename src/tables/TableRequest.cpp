@@ -52,7 +52,7 @@ void TableRequest::PrintSelf() {
     for (unsigned i = 0; i < count; ++i) {
         trace.detail()("\t\t{\n");
         for (const TableColumn& column : m_table.columns) {
-            // A dispatch on a log's thread may empty the array while it is being dumped.
+            // A dispatch on a log's thread may empty the array during the dump.
             if (i < count) {
                 printColumn(trace, column, rows() + std::size_t{i} * rowSize);
             }

@@ -7,31 +7,31 @@
 
 namespace zrm {
 
-/// What the row holders of both tables share: everything that follows from the description of the
-/// table's columns. Adds no virtual operation, so that a row holder's AddData takes the slot right
-/// behind those of ctreq. Owned by the framework; used by one thread at a time, under the table
-/// manager's lock where rows arrive as events.
+/// The common part of both tables' row holders: everything that follows from the table's columns.
+/// Adds no virtual function, so a row holder's AddData takes the slot directly after those of
+/// ctreq. Owned by the framework. Used by one thread at a time, under the table manager's lock if
+/// rows arrive as events.
 class TableRequest : public ctreq {
 public:
-    /// Dumps the request and the rows that it holds, when the detail class is on.
+    /// Dumps the request and its rows if the detail class is on.
     void PrintSelf() override;
     int NumColumns() override;
     /// See TableDescription::describe.
     unsigned GetColumnInfo(ColumnInfo* info, int index) override;
-    /// 0 also for a column that the table does not have.
+    /// Also returns 0 for a column that the table does not have.
     unsigned ColumnIsException(char* row, char* column, _IntfOper op, char* value) override;
 
 protected:
-    /// `table` outlives the object.
+    /// `table` must outlive the object.
     TableRequest(RequestDetail* detail, ContextInfo* context, TableManager* manager,
                  const TableDescription& table);
 
-    /// Passes each of `count` rows, back to back, that meets the request's conditions to
-    /// InsertRow, up to the first non-zero status, which it returns; otherwise 0.
+    /// Passes each of `count` contiguous rows that meets the request's conditions to InsertRow.
+    /// Stops at the first non-zero status and returns it; otherwise returns 0.
     unsigned addRows(char* rows, int count);
 
-    /// True when it shows in this file's trace, or in that of a derived class with `anchor`, that
-    /// rows are offered.
+    /// True if this file's trace, or the trace of a derived class with `anchor`, shows that rows
+    /// are offered.
     static bool isTraced();
     static bool tracesRows(TRC1_Anchor& anchor);
 

@@ -16,7 +16,7 @@ TRC1_Anchor anchor{"Timestamp.cpp"};
 
 constexpr std::size_t stampLength = 16;
 
-/// A number in the stamp and the place of the broken-down time where it belongs.
+/// A number in the stamp and the tm member that it belongs to.
 struct StampPart {
     std::size_t begin;
     std::size_t end;
@@ -24,14 +24,14 @@ struct StampPart {
     int offset; ///< added to the number
 };
 
-// From the back, because each number is ended by cutting the text behind it. The years since 1900
-// are the century digit and the year together.
+// From last to first, because each number is terminated by cutting off the text after it. The
+// century digit and the year together are the years since 1900.
 constexpr StampPart stampParts[] = {
     {11, 13, &std::tm::tm_sec, 0}, {9, 11, &std::tm::tm_min, 0}, {7, 9, &std::tm::tm_hour, 0},
     {5, 7, &std::tm::tm_mday, 0},  {3, 5, &std::tm::tm_mon, -1}, {0, 3, &std::tm::tm_year, 0},
 };
 
-/// Reads the numbers of a stamp up to the first that sets errno.
+/// Reads the numbers of a stamp up to the first one that sets errno.
 std::tm partsOf(const char* stamp) {
     char text[stampLength + 1];
     std::memcpy(text, stamp, sizeof text);
@@ -85,8 +85,8 @@ Timestamp::Timestamp(Timestamp** pHeadOfChain, const char* pNewTime) {
 
 Timestamp::~Timestamp() {
     TraceScope trace(anchor);
-    // A loop and not a recursion: a busy situation's chain may hold more events than the stack has
-    // room for calls.
+    // A loop, not a recursion: a busy situation's chain may hold more events than there is stack
+    // space for.
     Timestamp* older = m_next;
     while (older != nullptr && !older->m_isHeadOfChain) {
         Timestamp* const next = older->m_next;
@@ -148,7 +148,7 @@ long Timestamp::countEvents(long period, std::int64_t now) {
     return trace.result(count);
 }
 
-/// On the head: the newest element that is not later than the cut-off; null when all are.
+/// On the head: the newest element not later than the cut-off, or null if all are later.
 Timestamp* Timestamp::newestOut(long cutOff) const {
     Timestamp* out = nullptr;
     for (Timestamp* low = m_oldestLow; low != nullptr && low->m_eventTime <= cutOff;

@@ -17,7 +17,7 @@ TRC1_Anchor anchor{"zrm_rmlogent_agent.cpp"};
 constexpr unsigned stoppedCorruptedChain = 1;
 constexpr unsigned stoppedInvalidSampleType = 2;
 
-/// Traces what becomes of a situation, with the time as ctime prints it, newline included.
+/// Traces an event of a situation, with the time as ctime prints it, including the newline.
 void traceSituation(const TraceScope& trace, const char* event, const char* name) {
     if (!trace.isOn(TRC1_DETAIL)) {
         return;
@@ -136,7 +136,7 @@ long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) {
     return newest.countEvents(period);
 }
 
-/// Adds the entry's time to the chain; false when the time does not convert or memory runs out.
+/// Adds the entry's time to the chain. False if the time does not convert or memory runs out.
 bool zrm_rmlogent_agent::addEventTime(const char* entrytime) {
     TraceScope trace(anchor);
     auto* const timestamp = new (std::nothrow) Timestamp(&timestampChain, entrytime);
@@ -146,7 +146,7 @@ bool zrm_rmlogent_agent::addEventTime(const char* entrytime) {
         return trace.result(false);
     }
     if (timestamp->eventTime() < 0) {
-        delete timestamp; // it stands alone, outside the chain
+        delete timestamp; // it is not on the chain
         return trace.result(false);
     }
     return trace.result(true);

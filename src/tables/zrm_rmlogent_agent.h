@@ -11,39 +11,39 @@ namespace zrm {
 
 class LogFile;
 
-/// One request on the Log Entries table. A situation receives every log's new rows and passes on
-/// those that meet its conditions, if it has frequency and period thresholds only while the
-/// entries come often or seldom enough. A report reads one log's entries between two times, and
-/// holds the log manager's chain of logs still from its construction to its destruction.
+/// One request on the Log Entries table. A situation receives the new rows of every log and passes
+/// on those that meet its conditions; with frequency and period thresholds, only while entries are
+/// frequent or rare enough. A report reads one log's entries between two times. It keeps the log
+/// manager's chain of logs unchanged from its construction to its destruction.
 ///
-/// The framework owns the object. A situation is used on the logs' threads, one at a time under
-/// the table manager's lock; a report on the framework's thread that takes its sample.
+/// The framework owns the object. A situation is used on the logs' threads, one at a time under the
+/// table manager's lock; a report is used on the framework's thread that takes its sample.
 class zrm_rmlogent_agent : public zrm_rmlogent_base {
 public:
     using zrm_rmlogent_base::zrm_rmlogent_base;
     ~zrm_rmlogent_agent() override;
 
-    /// Begins the request; called once, by the manager, right after construction.
+    /// Begins the request. The manager calls it once, right after construction.
     void TakeSampleConstructor();
 
-    /// Reads the report's log and inserts the rows that meet its conditions, newest entries first
-    /// and at most gMaxRows read. Failures are only traced and leave fewer rows or none.
+    /// Reads the report's log and inserts the rows that meet its conditions, newest entries first.
+    /// Reads at most gMaxRows rows. Failures are only traced and result in fewer rows or none.
     void TakeSample() override;
-    /// Inserts one row that met the conditions, subject to the thresholds. A row that they refuse,
-    /// or whose time cannot be read, is dropped and gives 0.
+    /// Inserts one row that met the conditions, subject to the thresholds. Drops the row and
+    /// returns 0 if they reject it or its time cannot be read.
     unsigned InsertRow(char* row) override;
-    /// Writes the thresholds' columns of the rows in place and offers the rows.
+    /// Writes the threshold columns of the rows in place and offers the rows.
     unsigned AddData(zrm_rmlogent_data_t* rows, int count) override;
-    /// Writes the thresholds' columns alone: 0 unless both thresholds are in force.
+    /// Writes only the threshold columns. They are 0 unless both thresholds are in force.
     void writeThresholds(zrm_rmlogent_data_t* rows, int count) const;
-    /// True when it shows in the trace to which requests a row is offered.
+    /// True if the trace shows to which requests a row is offered.
     static bool isTraced();
 
 protected:
     const _RequestThresholds& thresholdsInForce() const noexcept { return thresholds; }
 
-    /// Counts the chain's entries within the period, which ends now while logs are monitored. For
-    /// entries that are replayed it ends with the newest of them.
+    /// Counts the chain's entries within the period. For monitored logs the period ends now; for
+    /// replayed entries it ends with the newest of them.
     virtual long countEvents(Timestamp& newest, long period);
 
 private:
@@ -68,7 +68,7 @@ private:
     LogFile* logFile = nullptr;                        ///< the log that a report reads
     _RequestThresholds thresholds{};
     Timestamp* timestampChain = nullptr; ///< owned; head of the chain of recent entry times
-    void* reportHandle = nullptr;        ///< the log's state of a report
+    void* reportHandle = nullptr;        ///< the log's state for a report
 };
 
 } // namespace zrm

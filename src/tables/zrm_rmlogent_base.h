@@ -6,15 +6,15 @@
 
 namespace zrm {
 
-/// Row holder of the Log Entries table: describes the table and filters the rows that are offered
-/// to a request. Owned by the framework; its rows arrive on the logs' threads, one at a time under
-/// the table manager's lock.
+/// Row holder of the Log Entries table: describes the table and filters the rows offered to a
+/// request. Owned by the framework. Its rows arrive on the logs' threads, one at a time under the
+/// table manager's lock.
 class zrm_rmlogent_base : public TableRequest {
 public:
     zrm_rmlogent_base(RequestDetail* detail, ContextInfo* context, TableManager* manager);
 
-    /// Offers `count` rows, back to back: those that meet the request's conditions are inserted.
-    /// Returns the last status of an insertion, 0 when there was none.
+    /// Offers `count` contiguous rows and inserts those that meet the request's conditions. Returns
+    /// the last insertion status, or 0 if nothing was inserted.
     virtual unsigned AddData(zrm_rmlogent_data_t* rows, int count);
 
 protected:

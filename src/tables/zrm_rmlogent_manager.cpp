@@ -13,7 +13,7 @@ namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_manager.cpp"};
 
-/// The table's one manager. The logs' threads read it from before the table is registered.
+/// The table's one manager. The logs' threads may read it before the table is registered.
 std::atomic<zrm_rmlogent_manager*> theManager{nullptr};
 
 } // namespace
@@ -40,7 +40,7 @@ unsigned zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t* rows, int count
 unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
     const TableLock lock(*this);
-    // Asked under the lock, so that what one row raises is all that comes behind the last room.
+    // Checked under the lock, so that at most one row's events exceed the room.
     if (!EventRoom::mayOffer()) {
         return trace.result(tableNoRoom);
     }
@@ -53,7 +53,7 @@ unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int cou
     if (lastConcerned != nullptr) {
         status = offerRowsTo<zrm_rmlogent_base>(concerned, rows, count);
     }
-    // The row keeps the thresholds of the last request, whether that was passed over or not.
+    // The row keeps the thresholds of the last request, even if that request was skipped.
     void* const last = requests().Last();
     if (last != lastConcerned) {
         static_cast<zrm_rmlogent_agent*>(static_cast<ctreq*>(last))->writeThresholds(rows, count);
@@ -61,9 +61,9 @@ unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int cou
     return trace.result(status);
 }
 
-/// Whether the trace tells to which requests a row is offered. That is asked of several source
-/// files, so the answer is kept until a level changes, unless levels differ between threads: then
-/// no source file has learned one.
+/// True if the trace shows to which requests a row is offered. That involves several source files,
+/// so the answer is cached until a level changes. It is not cached while levels differ between
+/// threads, because then no anchor stores one.
 bool zrm_rmlogent_manager::areOffersTraced() {
     const unsigned generation = anchor.generation.load(std::memory_order_acquire);
     if (generation != TRC1_Generation.load(std::memory_order_relaxed)) {

@@ -6,17 +6,17 @@
 
 namespace zrm {
 
-/// Manager of the Log Entries table: creates its request objects and hands fresh rows to every
-/// open situation. One per process, never destroyed.
+/// Manager of the Log Entries table: creates its request objects and passes new rows to every open
+/// situation. One per process, never destroyed.
 class zrm_rmlogent_manager : public TableManager {
 public:
     zrm_rmlogent_manager(const char* application, const char* table);
     ctreq* CreateCtreq(RequestDetail* detail, ContextInfo* context) override;
 
-    /// Hands `count` fresh rows, back to back, to every open situation; called by the threads of
-    /// all logs. The thresholds' columns of the rows are written in place. Returns 0, or the last
-    /// non-zero status of a dispatch; 0 and nothing else before the table was registered.
-    /// TABLE_NO_ROOM when nothing was offered, since the framework has no room (EventRoom).
+    /// Passes `count` contiguous new rows to every open situation. Called by the threads of all
+    /// logs. Writes the threshold columns of the rows in place. Returns 0 or the last non-zero
+    /// dispatch status. Before the table is registered, does nothing and returns 0. Returns
+    /// tableNoRoom if nothing was offered because the framework has no room (EventRoom).
     static unsigned EventArrived(zrm_rmlogent_data_t* rows, int count);
 
     unsigned AddDataToEvent(zrm_rmlogent_data_t* rows, int count);
@@ -25,7 +25,7 @@ private:
     bool areOffersTraced();
 
     // Under the lock.
-    unsigned m_traceGeneration = 0; ///< of the trace levels that m_areOffersTraced follows
+    unsigned m_traceGeneration = 0; ///< of the trace levels reflected in m_areOffersTraced
     bool m_areOffersTraced = false;
 };
 

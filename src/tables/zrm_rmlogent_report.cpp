@@ -1,4 +1,4 @@
-// The report side of a Log Entries request: which log, which time window, and the rows.
+// The report part of a Log Entries request: which log, which time window, and the rows.
 
 #include "base/ProcessValues.h"
 #include "base/TraceScope.h"
@@ -20,16 +20,16 @@ namespace {
 
 TRC1_Anchor anchor{"zrm_rmlogent_report.cpp"};
 
-/// Room for a UTF-8 column converted to the local code page, with its terminator.
+/// Room for a UTF-8 column converted to the local code page, including its terminator.
 constexpr std::size_t pathRoom = 1153;
 constexpr std::size_t nameRoom = 385;
 
-/// How one column names a part of the report's log.
+/// A column that names a part of the report's log.
 struct NamePart {
     const char* column;
     bool isPath; ///< else the name
     bool isUTF8;
-    int width; ///< most bytes taken of a column in the local code page
+    int width; ///< maximum bytes taken from a column in the local code page
 };
 
 constexpr NamePart nameParts[] = {
@@ -99,7 +99,7 @@ void zrm_rmlogent_agent::insertReportRows(int batch) {
     while (const int read = getLogEntries(batch)) {
         zrm_rmlogent_base::AddData(reportRows.get(), read);
         if (read < batch) {
-            return; // the log has no more
+            return; // the log has no more entries
         }
         total += read;
         if (total >= gMaxRows) {

@@ -38,7 +38,7 @@ template <typename Integer> std::int64_t readInteger(const char* value) {
     return integer;
 }
 
-/// True when the filter states the threshold in an acceptable way; its value is then read. Lengths
+/// True if the filter states the threshold in an acceptable way; then reads its value. Lengths
 /// other than 2 and 4 are read as 8 bytes.
 bool readThreshold(const ThresholdRule& rule, const SEL1_FILTERINFO& filter, std::int64_t& value) {
     TraceScope trace(anchor);
@@ -83,7 +83,7 @@ std::int64_t inclusiveBound(_IntfOper op, std::int64_t value) {
     return static_cast<std::int64_t>(bits);
 }
 
-/// The frequency threshold that the filter states, upper bounds negated; 0: none.
+/// The frequency threshold in the filter, negated for upper bounds; 0: none.
 std::int64_t frequencyOf(const SEL1_FILTERINFO& filter) {
     TraceScope trace(anchor);
     std::int64_t value = 0;
@@ -101,7 +101,7 @@ std::int64_t frequencyOf(const SEL1_FILTERINFO& filter) {
     return trace.result(isUpperBound ? -bound : bound);
 }
 
-/// The period threshold that the filter states, seconds; 0: none.
+/// The period threshold in the filter, in seconds; 0: none.
 std::int64_t periodOf(const SEL1_FILTERINFO& filter) {
     TraceScope trace(anchor);
     std::int64_t value = 0;

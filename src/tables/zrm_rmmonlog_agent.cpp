@@ -55,7 +55,7 @@ void zrm_rmmonlog_agent::TakeSample() {
     }
 }
 
-/// Builds one row per monitored log and returns their number.
+/// Builds one row per monitored log and returns the number of rows.
 unsigned zrm_rmmonlog_agent::getMonitoredLogs(std::unique_ptr<zrm_rmmonlog_data_t[]>& rows) {
     TraceScope trace(anchor);
     LogManager* const logManager = pTheLogManager;
@@ -77,7 +77,7 @@ unsigned zrm_rmmonlog_agent::getMonitoredLogs(std::unique_ptr<zrm_rmmonlog_data_
     return trace.result(built);
 }
 
-/// Fills at most `room` rows, one per log of the chain, and returns their number.
+/// Fills at most `room` rows, one per log of the chain, and returns the number of rows.
 unsigned zrm_rmmonlog_agent::buildTableRows(zrm_rmmonlog_data_t* rows, unsigned room) {
     TraceScope trace(anchor);
     LogManager* const logManager = pTheLogManager;

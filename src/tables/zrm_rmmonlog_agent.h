@@ -9,19 +9,19 @@ namespace zrm {
 
 class LogFile;
 
-/// One request on the Monitored Logs table: each sample builds one row per monitored log afresh.
-/// Owned by the framework; used by the thread that takes the sample. The log manager exists before
-/// the first request and is told by it that requests are being served.
+/// One request on the Monitored Logs table. Each sample builds one new row per monitored log. Owned
+/// by the framework; used by the thread that takes the sample. The log manager exists before the
+/// first request, which notifies it that requests are being served.
 class zrm_rmmonlog_agent : public zrm_rmmonlog_base {
 public:
     using zrm_rmmonlog_base::zrm_rmmonlog_base;
     ~zrm_rmmonlog_agent() override;
 
-    /// Begins the request; called once, by the manager, right after construction.
+    /// Begins the request. The manager calls it once, right after construction.
     void TakeSampleConstructor();
 
-    /// Inserts the rows of the monitored logs that meet the request's conditions. Failures are
-    /// only traced and leave no rows.
+    /// Inserts the rows of the monitored logs that meet the request's conditions. Failures are only
+    /// traced and result in no rows.
     void TakeSample() override;
 
 private:

@@ -12,8 +12,8 @@ class zrm_rmmonlog_base : public TableRequest {
 public:
     zrm_rmmonlog_base(RequestDetail* detail, ContextInfo* context, TableManager* manager);
 
-    /// Offers `count` rows, back to back: those that meet the request's conditions are inserted.
-    /// Returns the last status of an insertion, 0 when there was none.
+    /// Offers `count` contiguous rows and inserts those that meet the request's conditions. Returns
+    /// the last insertion status, or 0 if nothing was inserted.
     virtual unsigned AddData(zrm_rmmonlog_data_t* rows, int count);
 };
 

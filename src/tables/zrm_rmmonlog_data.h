@@ -6,8 +6,8 @@
 
 namespace zrm {
 
-/// One Monitored Logs row. Character columns are blank-padded and not terminated; the framework
-/// reads the columns by offset and width, so the layout is fixed.
+/// One Monitored Logs row. Character columns are blank-padded and not terminated. The framework
+/// reads columns by offset and width, so the layout is fixed.
 struct zrm_rmmonlog_data_t {
     char originnode[64];
     char logpath[256];

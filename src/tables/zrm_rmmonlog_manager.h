@@ -13,7 +13,7 @@ public:
     zrm_rmmonlog_manager(const char* application, const char* table);
     ctreq* CreateCtreq(RequestDetail* detail, ContextInfo* context) override;
 
-    /// Hands `count` rows to every open request, as zrm_rmlogent_manager::EventArrived does. The
+    /// Passes `count` rows to every open request, like zrm_rmlogent_manager::EventArrived. The
     /// table's rows come from samples; nothing in the agent raises events on it.
     static unsigned EventArrived(zrm_rmmonlog_data_t* rows, int count);
 
