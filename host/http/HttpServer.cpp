@@ -349,7 +349,7 @@ void HttpServer::Network::abandon(Clock::time_point limit) {
 
 HttpServer::HttpServer(const Router& router) : HttpServer(router, Size{}) {}
 
-HttpServer::HttpServer(const Router& router, Size size)
+HttpServer::HttpServer(const Router& router, const Size& size)
     : m_network(std::make_unique<Network>(router, size)) {}
 
 HttpServer::~HttpServer() = default;

@@ -32,7 +32,7 @@ public:
 
     /// `router` outlives the object.
     explicit HttpServer(const Router& router);
-    HttpServer(const Router& router, Size size);
+    HttpServer(const Router& router, const Size& size);
     HttpServer(const HttpServer&) = delete;
     HttpServer& operator=(const HttpServer&) = delete;
     /// Stops the server and waits for its threads.

@@ -5,7 +5,7 @@ import time
 
 import pytest
 from api import Api, stamp
-from conftest import syslog_line, wait_until
+from conftest import syslog_line
 from test_zrmctl import ZRMCTL
 
 FORMAT = ' ;N ;U ;A , "%d-%d-%dT%d:%d:%d %[^\\n]" , year month day hour minute second description'
