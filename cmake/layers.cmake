@@ -14,6 +14,9 @@ function(zrm_layer name)
   file(CREATE_LINK ${CMAKE_CURRENT_SOURCE_DIR} ${headers}/${include} SYMBOLIC)
   if(layer_SOURCES)
     add_library(${name} STATIC ${layer_SOURCES})
+    # The contract's implementation closes a circle of libraries, which a linker that reads them in
+    # order has to go around a few times.
+    set_target_properties(${name} PROPERTIES LINK_INTERFACE_MULTIPLICITY 4)
     set(scope PUBLIC)
   else()
     add_library(${name} INTERFACE)
