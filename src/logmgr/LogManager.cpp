@@ -30,16 +30,6 @@ const char* textOf(const std::unique_ptr<char[]>& text) {
     return text ? text.get() : "";
 }
 
-/// The hexadecimal dump of an object's bytes.
-template <std::size_t size> class Dump {
-public:
-    explicit Dump(const void* data) { LogManagerUtil::xtoa(m_text, data, size); }
-    const char* text() const { return m_text; }
-
-private:
-    char m_text[2 * size + 1];
-};
-
 } // namespace
 
 LogManager::LogManager() {
@@ -250,7 +240,6 @@ void LogManager::printSelf() const {
     const std::time_t changed = SyslogConfFileLastChanged;
     char lastChanged[26] = ""; // stays empty for a year that cannot be printed
     ctime_r(&changed, lastChanged);
-    const pthread_t thread = ManagerThread;
     trace.always()(
         "\n\tthis\t\t\t\t= %p\n\tConfigFile\t\t\t= \"%s\"\n"
         "\tConfigFileLastChanged\t\t= %s\tSyslogConfFile\t\t\t= \"%s\"\n"
@@ -262,11 +251,9 @@ void LogManager::printSelf() const {
         "\tDebugLogP\t\t\t= %p\n",
         static_cast<const void*>(this), textOf(ConfigFile), lastChanged, textOf(SyslogConfFile),
         lastChanged, static_cast<int>(NumLogs.load()), static_cast<void*>(FirstLogObject.load()),
-        static_cast<void*>(FirstValidLog.load()), UseCount.load(),
-        Dump<sizeof thread>(&thread).text(), Dump<sizeof ManagerLock>(&ManagerLock).text(),
-        Dump<sizeof ManagerNotInUse>(&ManagerNotInUse).text(),
-        static_cast<int>(AgentServerUp.load()),
-        Dump<sizeof AgentServerNotUp>(&AgentServerNotUp).text(), textOf(DebugLog),
+        static_cast<void*>(FirstValidLog.load()), UseCount.load(), LogManagerUtil::handleDump,
+        LogManagerUtil::handleDump, LogManagerUtil::handleDump,
+        static_cast<int>(AgentServerUp.load()), LogManagerUtil::handleDump, textOf(DebugLog),
         static_cast<void*>(DebugLogP.load()));
 }
 

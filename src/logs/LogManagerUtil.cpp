@@ -138,7 +138,7 @@ char* LogManagerUtil::getNextRec(const char* path) {
 
 char* LogManagerUtil::xtoa(char* out, const void* /*data*/, std::size_t /*length*/) {
     // Every digit would be written to the first character, which the terminator then overwrites.
-    // The bytes are not even read: they belong to locks that other threads are using.
+    // So the bytes are not read at all.
     *out = '\0';
     return out;
 }

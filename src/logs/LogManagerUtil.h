@@ -35,6 +35,9 @@ char* getNextRec(const char* path);
 /// the output position never advances. Returns `out`.
 char* xtoa(char* out, const void* data, std::size_t length);
 
+/// What xtoa returns for any data. State dumps show it for handles and locks.
+inline constexpr const char* handleDump = "";
+
 } // namespace LogManagerUtil
 
 } // namespace zrm

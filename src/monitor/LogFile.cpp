@@ -287,9 +287,6 @@ void LogFile::dropRow(zrm_rmlogent_data_t* row) {
 void LogFile::printSelf() const {
     TraceScope trace(anchor);
     LogBase::printSelf();
-    char thread[2 * sizeof LogThread + 1];
-    char lock[2 * sizeof LogLock + 1];
-    char debugFileLock[2 * sizeof m_debugFileLock + 1];
     const std::time_t changed = MonitorStartStopTime;
     char changedText[64] = "";
     ctime_r(&changed, changedText);
@@ -298,12 +295,11 @@ void LogFile::printSelf() const {
         "\n\tLogFD\t\t\t= %d\n\tLogEOF\t\t\t= %ld\n\tMonitorStatus\t\t= %d"
         "\n\tMonitorStartStopTime\t= %.*s\n\tNumEvents\t\t= %d\n\tNumFormatErrors\t\t= %d"
         "\n\tOptimumBlockSize\t= %ld\n\tDebugFileLock\t\t= %s\n",
-        static_cast<int>(RefreshMode), LogManagerUtil::xtoa(thread, &LogThread, sizeof LogThread),
-        LogManagerUtil::xtoa(lock, &LogLock, sizeof LogLock), static_cast<void*>(LogFileP.load()),
-        LogFD.load(), static_cast<long>(LogEOF.load()), static_cast<int>(monitorStatus()), 24,
-        changedText, static_cast<int>(numEvents()), static_cast<int>(numFormatErrors()),
-        static_cast<long>(OptimumBlockSize.load()),
-        LogManagerUtil::xtoa(debugFileLock, &m_debugFileLock, sizeof m_debugFileLock));
+        static_cast<int>(RefreshMode), LogManagerUtil::handleDump, LogManagerUtil::handleDump,
+        static_cast<void*>(LogFileP.load()), LogFD.load(), static_cast<long>(LogEOF.load()),
+        static_cast<int>(monitorStatus()), 24, changedText, static_cast<int>(numEvents()),
+        static_cast<int>(numFormatErrors()), static_cast<long>(OptimumBlockSize.load()),
+        LogManagerUtil::handleDump);
 }
 
 } // namespace zrm

@@ -194,6 +194,7 @@ TEST_F(LogManagerUtilTest, TheHexadecimalDumpIsAlwaysEmpty) {
     std::memset(out, 'x', sizeof out);
     const unsigned word = 0xDEADBEEF;
     EXPECT_EQ(LogManagerUtil::xtoa(out, &word, sizeof word), out);
+    EXPECT_STREQ(out, LogManagerUtil::handleDump);
     EXPECT_STREQ(out, "");
     out[0] = 'x';
     EXPECT_STREQ(LogManagerUtil::xtoa(out, &word, 0), "");
