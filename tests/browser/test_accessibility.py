@@ -105,7 +105,7 @@ def troubled(console):
     console.type("Name", "bad")
     console.choose("Log", console.api.request("GET", "/api/v1/logs")[2]["logs"][0]["log"])
     console.condition("port [", operator="matches")
-    console.wait_text("Mend what is marked")
+    console.wait_text("Correct what is marked")
     yield "a condition that is wrong"
     ready(console, "events")
     console.find("//*[@role='option']").click()
@@ -117,7 +117,7 @@ def troubled(console):
     console.wait_text("Stops at column 1")
     yield "a line that does not fit"
     console.run("sessionStorage.clear(); location.hash = '#/reports'")
-    console.heading("Who may look")
+    console.heading("Sign in")
     yield "no token"
 
 

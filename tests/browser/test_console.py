@@ -113,7 +113,7 @@ def test_logs_tell_trouble_first_and_why(page, agent, fast_polls):
     app.append("2026-11-20 07:03:09 ERROR fine\nthis does not fit\n")
     page.on(agent)
     page.wait_text("1 in trouble")
-    page.wait_text("The format of this log cannot be learned")
+    page.wait_text("The format of this log cannot be used")
     page.wait_text("1 line does not fit the format")
     first = page.find("//table//tbody/tr[1]").text
     assert "broken.log" in first and "Error" in first
@@ -222,7 +222,7 @@ def test_events_are_filtered(page, agent):
     until(lambda: len(page.all("[role=option]")) == 1, "one event")
     page.type("Text", " ")
     page.choose("Severity", "info")
-    page.wait_text("No event of the history fits the filter.")
+    page.wait_text("No event in the history matches the filter.")
     page.click("Show all events")
     page.wait_text("203.0.113.2")
     assert "severity" not in page.driver.current_url
@@ -293,7 +293,7 @@ def test_a_condition_is_judged_while_it_is_typed(page, agent):
     page.type("Name", "bad")
     page.choose("Log", str(auth))
     value = page.condition("port [", operator="matches")
-    page.wait_text("Mend what is marked")
+    page.wait_text("Correct what is marked")
     assert value.get_attribute("aria-invalid") == "true"
     page.pictures("situation-problem")
 
@@ -340,10 +340,10 @@ def test_what_is_saved_neither_steers_nor_computes(page, agent):
 def test_a_format_is_tried_while_it_is_typed(page, agent):
     logs_agent(agent)
     page.on(agent, "try")
-    page.wait_text("100 % of the lines fit")
+    page.wait_text("100% of the lines fit")
     assert [mark.text for mark in page.all(".lines mark.f2")] == ["payment", "web"]
     page.type("Lines", "2026-11-20 07:03:09 ERROR payment: Card declined\nno entry at all")
-    page.wait_text("50 % of the lines fit")
+    page.wait_text("50% of the lines fit")
     page.wait_text("Stops at column 1")
     page.wait_text("Card declined")
     page.pictures("try")

@@ -86,7 +86,7 @@ def test_the_preview_says_what_happens(page, agent):
     page.type("Name", "same")
     page.choose("Log", str(auth))
     page.condition("Failed password")
-    page.find("//label[contains(., 'Raise only')]/input").click()
+    page.find("//label[contains(., 'Raise depending')]/input").click()
     control = page.find("//input[@aria-label='Period']")
     control.clear()
     control.send_keys("1")
@@ -137,7 +137,7 @@ def test_a_report_from_another_time_zone(page, agent, far_away):
     log = agent.log("auth.log", content=lines.encode())
     agent.start()
     page.on(agent, "reports")
-    page.wait_text("the times of entries are those of the agent's machine")
+    page.wait_text("entries show the local time of the agent's machine")
     page.pictures("report-zone")
     # Two to four hours ago, on this browser's clock.
     there = datetime.fromtimestamp(now, ZoneInfo(ZONE))

@@ -21,11 +21,11 @@ def test_without_a_history_the_views_say_so_and_what_to_do(page, agent):
     agent.history = {"enabled": False}
     auth, _ = logs_agent(agent)
     page.on(agent)
-    page.wait_text("The history is off, so events are not kept. [history] in the configuration switches it on.")
+    page.wait_text("The history is off, so events are not kept. Set enabled = true under [history].")
     assert "auth.log" in page.text()
     page.pictures("logs-history-off")
     page.open_log(auth)
-    page.wait_text("The history is off, so rates are not kept. [history] in the configuration switches it on.")
+    page.wait_text("The history is off, so rates are not kept. Set enabled = true under [history].")
     page.wait_text("Monitored since")
     page.open("events")
     page.wait_text("Set enabled = true under [history]")
@@ -49,7 +49,7 @@ def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent, fas
             others.callback(answer.close)
             assert answer.status == 200
         page.go("Events")
-        page.wait_text("New events do not come by themselves: too many clients follow the events: at most 32.")
+        page.wait_text("New events do not appear by themselves: too many clients follow the events: at most 32.")
         page.wait_text("Not live; next try in")
         page.pictures("events-full")
     page.wait_live(30)
@@ -100,7 +100,7 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     agent.refresh()
     agent.wait_open(empty)
     page.on(agent, "try")
-    page.wait_text("100 % of the lines fit")
+    page.wait_text("100% of the lines fit")
     page.type("Format", FIELDS.removeprefix(";N ;U ;"))
     page.pick("How many lines", "10")
     page.pick("Log", str(app))
@@ -116,7 +116,7 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     page.wait_text("10 of 10 lines")
     page.pick("Log", str(empty))
     page.click("Take them")
-    page.wait_text("This log holds no lines yet.")
+    page.wait_text("This log has no lines yet.")
     until(lambda: str(empty) in page.find("//*[@aria-label='Configuration line']").text, "the configuration line")
     assert "of the lines fit" not in page.text()
     app.path.unlink()
@@ -172,7 +172,7 @@ def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
     page.heading("Edit by-hand")
     text = page.find("(//input[@aria-label='Condition'])[2]")
     text.send_keys(" or")
-    page.wait_text("Mend what is marked")
+    page.wait_text("Correct what is marked")
     assert text.get_attribute("aria-invalid") == "true"
     page.pictures("situation-text")
     text.clear()
@@ -220,6 +220,9 @@ def test_a_log_shows_rejected_lines_and_skipped_ranges(page, agent):
     begin(agent, app)
     page.on(agent)
     app.append(app_entry("fits") + "this does not fit\n" + "2026-11-20 07:03:09\n")
+    counts = "//tbody/tr[contains(., 'app.log')]/td[@data-label='{}']"
+    until(lambda: page.find(counts.format("Rejected")).text == "2", "the count of rejected lines")
+    assert page.find(counts.format("Entries")).text == "1"  # a rejected line is not an entry
 
     def ledger():
         return page.api.request("GET", f"/api/v1/logs?log={quote(str(app))}")[2]["logs"][0]["ledger"]
@@ -240,7 +243,7 @@ def test_a_log_shows_rejected_lines_and_skipped_ranges(page, agent):
     page.driver.refresh()
     page.wait_text("Skipped by truncations")
     assert len(page.rows("Skipped ranges")) == 1
-    assert f" {size} unknown when it was shorter" in page.rows("Skipped ranges")[0]
+    assert f" {size} unknown found while it was shorter" in page.rows("Skipped ranges")[0]
     page.pictures("log-ledger")
 
 
@@ -248,7 +251,7 @@ def test_a_log_that_cannot_be_shown_says_why(page, agent):
     logs_agent(agent)
     page.on(agent)
     page.open_log(agent.directory / "broken.log")
-    page.wait_text("The format of this log cannot be learned")
+    page.wait_text("The format of this log cannot be used")
     assert page.find("//*[@class='state bad']").text == "Error"
     page.pictures("log-error")
     page.open_log(agent.directory / "other.log")
@@ -340,19 +343,19 @@ def test_a_log_that_is_not_monitored_says_why_until_it_is(page, agent, fast_poll
     page.on(agent)
     page.wait_text("3 in trouble")
     row = page.find(f"//tbody/tr[contains(., '{missing}')]").text
-    assert "Not read" in row and "No such file or directory. Make the file, or mend the path." in row
-    assert "Mend line 5 of the log configuration." in page.find("//tbody/tr[contains(., 'relative.log')]").text
+    assert "Not read" in row and "No such file or directory. Create the file, or correct the path." in row
+    assert "Correct line 5 of the log configuration." in page.find("//tbody/tr[contains(., 'relative.log')]").text
     assert str(agent.logs_conf) in page.text()
     page.pictures("logs-not-monitored")
     page.open_log(missing)
-    page.wait_text("It stands in line 4 of the log configuration.")
+    page.wait_text("It is on line 4 of the log configuration.")
     assert "last 24 hours" not in page.text()
     page.pictures("log-not-read")
     page.go("Logs")
     missing.write_text("")
     page.wait_text("The agent has not read this line yet.")
     page.click("Re-read configuration")
-    page.wait_text("Where that file has not changed, nothing changes.")
+    page.wait_text("An unchanged file changes nothing.")
     agent.configure(append=True)  # touched
     page.click("Re-read configuration")
     page.wait_text("2 in trouble")

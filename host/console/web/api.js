@@ -26,11 +26,15 @@ tabs.addEventListener("message", ({ data }) => {
 export function takeTokenFromTabs() {
   return new Promise((resolve) => {
     setTimeout(resolve, PATIENCE_WITH_TABS);
-    tabs.addEventListener("message", ({ data }) => {
-      if (!data.token) return;
-      token.set(data.token);
-      resolve();
-    }, { once: true });
+    tabs.addEventListener(
+      "message",
+      ({ data }) => {
+        if (!data.token) return;
+        token.set(data.token);
+        resolve();
+      },
+      { once: true },
+    );
     tabs.postMessage("ask");
   });
 }
@@ -43,17 +47,17 @@ export class ApiError extends Error {
     this.field = problem.field || "";
     if (status === 0) {
       this.title = "The agent does not answer";
-      this.cure = "The console goes on by itself as soon as it does.";
+      this.cure = "The console reconnects by itself.";
     } else if (status === 404 && !problem.detail) {
-      this.title = "Not there";
+      this.title = "Not found";
     } else if (status >= 500) {
       this.title = "The agent could not do that";
-      this.cure = "Its trace says more.";
+      this.cure = "Its trace says why.";
     }
   }
 }
 
-/** Tells the page: `lost` and `found` for the connection, `refused` for the token. */
+/** Events for the page: `lost` and `found` for the connection, `refused` for the token. */
 export const signals = new EventTarget();
 const signal = (name) => signals.dispatchEvent(new Event(name));
 
@@ -63,7 +67,10 @@ function lost() {
 }
 
 /** A view's module. It comes from the agent, as answers do, and fails as they do. */
-export const viewModule = (name) => import(`./views/${name}.js`).catch(() => { throw lost(); });
+export const viewModule = (name) =>
+  import(`./views/${name}.js`).catch(() => {
+    throw lost();
+  });
 
 export async function open(path, options = {}) {
   const headers = { Authorization: `Bearer ${token.get()}`, ...options.headers };
@@ -74,7 +81,13 @@ export async function open(path, options = {}) {
   }
   let response;
   try {
-    response = await fetch(path, { method: options.method || "GET", headers, body, signal: options.signal, cache: "no-store" });
+    response = await fetch(path, {
+      method: options.method || "GET",
+      headers,
+      body,
+      signal: options.signal,
+      cache: "no-store",
+    });
   } catch (error) {
     if (error.name === "AbortError") throw error;
     throw lost();
@@ -104,10 +117,12 @@ export const post = (path, body = {}, abort) => request("POST", path, body, abor
 export function withQuery(path, values) {
   const query = new URLSearchParams();
   for (const [key, value] of Object.entries(values)) {
-    for (const one of [value].flat()) if (one !== "" && one !== null && one !== undefined) query.append(key, one);
+    for (const one of [value].flat())
+      if (one !== "" && one !== null && one !== undefined) query.append(key, one);
   }
   const text = query.toString();
   return text ? `${path}?${text}` : path;
 }
 
-export const situationPath = (name, action = "") => `/api/v1/situations/${encodeURIComponent(name)}${action && `/${action}`}`;
+export const situationPath = (name, action = "") =>
+  `/api/v1/situations/${encodeURIComponent(name)}${action && `/${action}`}`;

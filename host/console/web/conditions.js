@@ -4,11 +4,24 @@ import { button, fill, h, select } from "./dom.js";
 
 const FORM = /^\s*([A-Z]+)\s*(!=|>=|<=|=|<|>|contains\b|starts\b|matches\b|in\b)\s*([^]*)$/;
 const NAMES = {
-  ENTRYSRC: "Source", ENTRYDESC: "Description", ENTRYTYPE: "Type", ENTRYCLASS: "Class", ENTRYSYS: "System", ENTRYTIME: "Time",
+  ENTRYSRC: "Source",
+  ENTRYDESC: "Description",
+  ENTRYTYPE: "Type",
+  ENTRYCLASS: "Class",
+  ENTRYSYS: "System",
+  ENTRYTIME: "Time",
 };
 const WORDS = {
-  "=": "is", "!=": "is not", contains: "contains", starts: "starts with", matches: "matches", in: "is one of",
-  ">=": "at least", "<=": "at most", "<": "less than", ">": "more than",
+  "=": "is",
+  "!=": "is not",
+  contains: "contains",
+  starts: "starts with",
+  matches: "matches",
+  in: "is one of",
+  ">=": "at least",
+  "<=": "at most",
+  "<": "less than",
+  ">": "more than",
 };
 const FIRST = ["ENTRYSRC", "ENTRYDESC", "ENTRYTYPE", "ENTRYCLASS", "ENTRYSYS", "ENTRYTIME"];
 
@@ -28,11 +41,14 @@ function parse(text) {
     const list = /^\[([^]*)\]\s*$/.exec(value);
     const items = list && list[1].match(/'(?:[^']|'')*'|-?\d+/g);
     const values = items && items.map((item) => unquote(item) ?? item);
-    // One input cannot tell a comma in an item from one between two, nor keep blanks around an item.
-    return values?.every((item) => item && item === item.trim() && !item.includes(",")) ? { column, operator, value: values.join(", ") } : null;
+    // In one input a comma in an item looks like one between items, and outer blanks are lost.
+    return values?.every((item) => item && item === item.trim() && !item.includes(","))
+      ? { column, operator, value: values.join(", ") }
+      : null;
   }
   const plain = unquote(value) ?? (/^-?\d+\s*$/.test(value) ? value.trim() : null);
-  return plain ? { column, operator, value: plain } : null; // an input left empty has no condition yet
+  // An input that is left empty is not a condition yet.
+  return plain ? { column, operator, value: plain } : null;
 }
 
 /** A list of conditions that a person edits. */
@@ -46,11 +62,16 @@ export class Conditions {
     this.#columns = columns;
     this.#change = change;
     this.list = h("div", { className: "stack-small" });
-    this.element = h("fieldset", {}, h("legend", {}, "Conditions (all must hold)"), this.list,
+    this.element = h(
+      "fieldset",
+      {},
+      h("legend", {}, "Conditions (all must hold)"),
+      this.list,
       button("Add a condition", () => {
         this.#add(this.#chosen({ column: "ENTRYDESC", operator: "contains", value: "" })).focus();
         this.#change();
-      }));
+      }),
+    );
     for (const text of texts) {
       const parts = parse(text);
       this.#add(parts ? this.#chosen(parts) : this.#raw(text));
@@ -69,14 +90,18 @@ export class Conditions {
     const shown = this.#rows.filter((row) => !row.isBlank());
     return problems.filter((problem) => {
       const match = /^(?:definition\.)?(?:when|where)(?:\[(\d+)\])?/.exec(problem.field);
-      const row = match && (shown[Number(match[1] ?? 0)]);
+      const row = match && shown[Number(match[1] ?? 0)];
       row?.setProblem(problem.detail);
       return !row;
     });
   }
 
   #drawEmpty() {
-    if (this.#rows.length === 0) fill(this.list, h("p", { className: "hint" }, "None: every entry of the log is meant."));
+    if (this.#rows.length === 0)
+      fill(
+        this.list,
+        h("p", { className: "hint" }, "No conditions: every entry of the log matches."),
+      );
   }
 
   #add(row) {
@@ -89,54 +114,112 @@ export class Conditions {
       row.input.toggleAttribute("aria-invalid", false);
       if (detail) row.input.setAttribute("aria-invalid", "true");
     };
-    row.element.append(button("Remove", () => {
-      this.#rows.splice(this.#rows.indexOf(row), 1);
-      row.element.remove();
-      this.#drawEmpty();
-      this.#change();
-      this.element.querySelector(":scope > button").focus();
-    }, { "aria-label": `Remove condition ${number}` }), problem);
+    row.element.append(
+      button(
+        "Remove",
+        () => {
+          this.#rows.splice(this.#rows.indexOf(row), 1);
+          row.element.remove();
+          this.#drawEmpty();
+          this.#change();
+          this.element.querySelector(":scope > button").focus();
+        },
+        { "aria-label": `Remove condition ${number}` },
+      ),
+      problem,
+    );
     this.#rows.push(row);
     this.list.append(row.element);
     return row.input;
   }
 
   #chosen({ column, operator, value }) {
-    const known = [...this.#columns].sort((a, b) => (FIRST.indexOf(a.name) + 1 || 99) - (FIRST.indexOf(b.name) + 1 || 99));
+    const known = [...this.#columns].sort(
+      (a, b) => (FIRST.indexOf(a.name) + 1 || 99) - (FIRST.indexOf(b.name) + 1 || 99),
+    );
     const changed = () => this.#change();
-    const columnBox = select(known.map(({ name }) => [name, NAMES[name] ?? name]), column,
-      { "aria-label": "Column", onchange: () => { offer(); changed(); } });
-    const operatorBox = h("select", { "aria-label": "Operator", onchange: () => { hint(); changed(); } });
-    const input = h("input", { className: "value", value, "aria-label": "Value", spellcheck: false, autocomplete: "off", oninput: changed });
+    const columnBox = select(
+      known.map(({ name }) => [name, NAMES[name] ?? name]),
+      column,
+      {
+        "aria-label": "Column",
+        onchange: () => {
+          offer();
+          changed();
+        },
+      },
+    );
+    const operatorBox = h("select", {
+      "aria-label": "Operator",
+      onchange: () => {
+        hint();
+        changed();
+      },
+    });
+    const input = h("input", {
+      className: "value",
+      value,
+      "aria-label": "Value",
+      spellcheck: false,
+      autocomplete: "off",
+      oninput: changed,
+    });
     const isNumber = () => known.find(({ name }) => name === columnBox.value)?.type === "number";
     const offer = () => {
       const before = operatorBox.value || operator;
-      const usable = Object.keys(WORDS).filter((key) => !isNumber() || !["contains", "starts", "matches"].includes(key));
-      fill(operatorBox, usable.map((key) => h("option", { value: key }, WORDS[key])));
+      const usable = Object.keys(WORDS).filter(
+        (key) => !isNumber() || !["contains", "starts", "matches"].includes(key),
+      );
+      fill(
+        operatorBox,
+        usable.map((key) => h("option", { value: key }, WORDS[key])),
+      );
       operatorBox.value = usable.includes(before) ? before : "=";
       hint();
     };
     const hint = () => {
-      input.placeholder = operatorBox.value === "in" ? "one, two, three" : operatorBox.value === "matches" ? "a regular expression" : isNumber() ? "a number" : "text";
+      input.placeholder =
+        operatorBox.value === "in"
+          ? "one, two, three"
+          : operatorBox.value === "matches"
+            ? "a regular expression"
+            : isNumber()
+              ? "a number"
+              : "text";
     };
     offer();
     const write = (text) => (isNumber() ? text.trim() : quote(text));
     return {
-      element: h("div", { className: "condition", role: "group", "aria-label": "Condition" }, columnBox, operatorBox, input),
+      element: h(
+        "div",
+        { className: "condition", role: "group", "aria-label": "Condition" },
+        columnBox,
+        operatorBox,
+        input,
+      ),
       input,
       isBlank: () => input.value === "",
       text: () => {
         const list = input.value.split(",").map((item) => write(item.trim()));
-        return `${columnBox.value} ${operatorBox.value} ${operatorBox.value === "in" ? `[${list.join(", ")}]` : write(input.value)}`;
+        const wanted = operatorBox.value === "in" ? `[${list.join(", ")}]` : write(input.value);
+        return `${columnBox.value} ${operatorBox.value} ${wanted}`;
       },
     };
   }
 
   #raw(text) {
-    const input = h("input", { className: "mono", value: text, "aria-label": "Condition", spellcheck: false, oninput: () => this.#change() });
+    const input = h("input", {
+      className: "mono",
+      value: text,
+      "aria-label": "Condition",
+      spellcheck: false,
+      oninput: () => this.#change(),
+    });
     return {
-      element: h("div", { className: "condition raw" }, input), input,
-      isBlank: () => input.value.trim() === "", text: () => input.value.trim(),
+      element: h("div", { className: "condition raw" }, input),
+      input,
+      isBlank: () => input.value.trim() === "",
+      text: () => input.value.trim(),
     };
   }
 }

@@ -1,6 +1,6 @@
 // Elements from code. Text from outside only ever becomes a text node, so markup in it stays text.
 
-/** Makes an element: properties, then children (nodes, texts, lists; null and false are left out). */
+/** Makes an element: properties, then children (nodes, texts, lists; null and false skipped). */
 export function h(tag, properties = {}, ...children) {
   const element = document.createElement(tag);
   for (const [name, value] of Object.entries(properties)) {
@@ -17,13 +17,18 @@ export function h(tag, properties = {}, ...children) {
 const fixed = new Set(["list", "form", "role"]);
 
 // Controls, and what changes the direction of text: they would not show, but change what does.
-const STEERING = /[\u0000-\u0008\u000b-\u001f\u007f-\u009f\u061c\u200e\u200f\u2028-\u202e\u2066-\u2069]/g;
+const STEERING =
+  // eslint-disable-next-line no-control-regex -- these are what it looks for
+  /[\u0000-\u0008\u000b-\u001f\u007f-\u009f\u061c\u200e\u200f\u2028-\u202e\u2066-\u2069]/g;
 
 /** A text with such characters written by number. */
-export const visible = (text) => text.replace(STEERING, (one) => `\\u${one.charCodeAt(0).toString(16).padStart(4, "0")}`);
+export const visible = (text) =>
+  text.replace(STEERING, (one) => `\\u${one.charCodeAt(0).toString(16).padStart(4, "0")}`);
 
 function nodes(children) {
-  return children.flat(Infinity).filter((child) => child !== null && child !== undefined && child !== false)
+  return children
+    .flat(Infinity)
+    .filter((child) => child !== null && child !== undefined && child !== false)
     .map((child) => (typeof child === "string" ? visible(child) : child));
 }
 
@@ -61,7 +66,14 @@ export function field(label, control, hint = "") {
     described.push(note.id);
   }
   control.setAttribute("aria-describedby", described.join(" "));
-  const element = h("div", { className: "field" }, h("label", { htmlFor: control.id }, label), control, note, problem);
+  const element = h(
+    "div",
+    { className: "field" },
+    h("label", { htmlFor: control.id }, label),
+    control,
+    note,
+    problem,
+  );
   element.control = control;
   element.setProblem = (text) => {
     problem.textContent = text || "";
@@ -73,10 +85,14 @@ export function field(label, control, hint = "") {
 }
 
 export function select(options, value, properties = {}) {
-  const control = h("select", properties, options.map((option) => {
-    const [key, text] = Array.isArray(option) ? option : [option, option];
-    return h("option", { value: key }, text);
-  }));
+  const control = h(
+    "select",
+    properties,
+    options.map((option) => {
+      const [key, text] = Array.isArray(option) ? option : [option, option];
+      return h("option", { value: key }, text);
+    }),
+  );
   if (value !== undefined && value !== null) control.value = value;
   return control;
 }
@@ -87,18 +103,58 @@ export function button(text, action, properties = {}) {
 
 /** A table whose roles survive its being laid out as cards on a narrow screen. */
 export function table(caption, columns, rows, properties = {}) {
-  return h("table", { role: "table", ...properties },
+  return h(
+    "table",
+    { role: "table", ...properties },
     h("caption", { className: "unseen" }, caption),
-    h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, columns.map((column) =>
-      h("th", { role: "columnheader", scope: "col", className: column.className || "" }, column.head ?? column.label)))),
-    h("tbody", { role: "rowgroup" }, rows.map((cells) => h("tr", { role: "row" }, cells.map((cell, index) =>
-      h("td", { role: "cell", className: `${columns[index].className || ""}${cell === null ? " absent" : ""}`, "data-label": columns[index].label }, cell))))));
+    h(
+      "thead",
+      { role: "rowgroup" },
+      h(
+        "tr",
+        { role: "row" },
+        columns.map((column) =>
+          h(
+            "th",
+            { role: "columnheader", scope: "col", className: column.className || "" },
+            column.head ?? column.label,
+          ),
+        ),
+      ),
+    ),
+    h(
+      "tbody",
+      { role: "rowgroup" },
+      rows.map((cells) =>
+        h(
+          "tr",
+          { role: "row" },
+          cells.map((cell, index) =>
+            h(
+              "td",
+              {
+                role: "cell",
+                className: `${columns[index].className || ""}${cell === null ? " absent" : ""}`,
+                "data-label": columns[index].label,
+              },
+              cell,
+            ),
+          ),
+        ),
+      ),
+    ),
+  );
 }
 
-/** What stands where there is nothing, not yet anything, or an error with what to do about it. */
+/** Shown where there is nothing, nothing yet, or an error with what to do about it. */
 export function empty(title, text, ...actions) {
-  return h("div", { className: "empty" }, h("h2", {}, title), h("p", {}, text),
-    actions.length > 0 && h("p", { className: "actions" }, actions));
+  return h(
+    "div",
+    { className: "empty" },
+    h("h2", {}, title),
+    h("p", {}, text),
+    actions.length > 0 && h("p", { className: "actions" }, actions),
+  );
 }
 
 export function loading(text = "Loading") {
@@ -106,14 +162,26 @@ export function loading(text = "Loading") {
 }
 
 /** The agent's problems as a sentence. */
-const sentence = (text) => `${text.charAt(0).toUpperCase()}${text.slice(1)}${/[.!?]$/.test(text) ? "" : "."}`;
+const sentence = (text) =>
+  `${text.charAt(0).toUpperCase()}${text.slice(1)}${/[.!?]$/.test(text) ? "" : "."}`;
 
-/** Why something failed; what failed for want of a connection is done again once there is one. */
+/** Why something failed; what a lost connection stopped is tried again once it is back. */
 export function failure(error, retry) {
-  const element = h("div", { className: "empty failure", role: "alert" }, h("h2", {}, error.title || "That did not work"),
-    h("p", {}, sentence(error.message)), error.cure && h("p", {}, error.cure),
-    retry && h("p", { className: "actions" }, button("Try again", () => retry())));
-  if (retry && error.status === 0) addEventListener("zrm-regained", () => element.isConnected && retry(), { once: true });
+  const element = h(
+    "div",
+    { className: "empty failure", role: "alert" },
+    h("h2", {}, error.title || "That did not work"),
+    h("p", {}, sentence(error.message)),
+    error.cure && h("p", {}, error.cure),
+    retry &&
+      h(
+        "p",
+        { className: "actions" },
+        button("Try again", () => retry()),
+      ),
+  );
+  if (retry && error.status === 0)
+    addEventListener("zrm-regained", () => element.isConnected && retry(), { once: true });
   return element;
 }
 
@@ -129,11 +197,18 @@ export function debounce(action, milliseconds) {
 /** Asks before something that cannot be undone; true when it is meant. */
 export function confirm(title, text, verb) {
   return new Promise((resolve) => {
-    const dialog = h("dialog", { "aria-labelledby": "dialog-title" },
-      h("h2", { id: "dialog-title" }, title), h("p", {}, text),
-      h("p", { className: "actions" },
+    const dialog = h(
+      "dialog",
+      { "aria-labelledby": "dialog-title" },
+      h("h2", { id: "dialog-title" }, title),
+      h("p", {}, text),
+      h(
+        "p",
+        { className: "actions" },
         button("Cancel", () => dialog.close("")),
-        button(verb, () => dialog.close("yes"), { className: "danger" })));
+        button(verb, () => dialog.close("yes"), { className: "danger" }),
+      ),
+    );
     dialog.addEventListener("close", () => {
       dialog.remove();
       resolve(dialog.returnValue === "yes");

@@ -3,8 +3,10 @@
 const whole = new Intl.NumberFormat("en", { maximumFractionDigits: 0 });
 const short = new Intl.NumberFormat("en", { notation: "compact", maximumFractionDigits: 1 });
 
-export const number = (value) => (value === null || value === undefined ? "–" : whole.format(value));
-export const compact = (value) => (value === null || value === undefined ? "–" : short.format(value));
+export const number = (value) =>
+  value === null || value === undefined ? "–" : whole.format(value);
+export const compact = (value) =>
+  value === null || value === undefined ? "–" : short.format(value);
 
 export function bytes(value) {
   if (value === null || value === undefined || value < 0) return "–";
@@ -24,11 +26,13 @@ export function time(value, withMilliseconds = false) {
   if (!value) return "–";
   const date = value instanceof Date ? value : new Date(value);
   if (Number.isNaN(date.getTime())) return String(value);
-  const text = `${date.getFullYear()}-${two(date.getMonth() + 1)}-${two(date.getDate())} ${clock(date)}`;
+  const day = [date.getFullYear(), two(date.getMonth() + 1), two(date.getDate())].join("-");
+  const text = `${day} ${clock(date)}`;
   return withMilliseconds ? `${text}.${String(date.getMilliseconds()).padStart(3, "0")}` : text;
 }
 
-export const clock = (date) => `${two(date.getHours())}:${two(date.getMinutes())}:${two(date.getSeconds())}`;
+export const clock = (date) =>
+  `${two(date.getHours())}:${two(date.getMinutes())}:${two(date.getSeconds())}`;
 
 /** The time alone when it is of today. */
 export function briefTime(value) {
@@ -52,7 +56,7 @@ export function reachText({ complete, reached, reason }) {
   return `Not everything was read: ${reason}.${missing}`;
 }
 
-/** By how many minutes the agent's clock on the wall is before UTC, of one moment as 16-digit stamp and in UTC. */
+/** Minutes by which the agent's local time is ahead of UTC, from one moment in both forms. */
 export function offsetOf(value, utc) {
   const shown = Date.parse(`${stamp(value).replace(" ", "T")}Z`);
   return Math.round((shown - Date.parse(utc)) / 900000) * 15; // zones lie quarters of an hour apart
@@ -68,7 +72,8 @@ export function ago(value) {
   return `${Math.round(seconds / 86400)} days ago`;
 }
 
-export const plural = (count, one, many = `${one}s`) => `${number(count)} ${count === 1 ? one : many}`;
+export const plural = (count, one, many = `${one}s`) =>
+  `${number(count)} ${count === 1 ? one : many}`;
 
 /** Entries per minute over the last minutes that are known. */
 export function rate(values, minutes = 5) {
@@ -85,10 +90,18 @@ export function rateText(value) {
 export const SEVERITIES = ["critical", "major", "minor", "warning", "info"];
 
 /** How a frequency compares, in words. */
-export const COMPARISONS = [[">=", "at least"], ["<=", "at most"], ["=", "exactly"], [">", "more than"], ["<", "fewer than"]];
+export const COMPARISONS = [
+  [">=", "at least"],
+  ["<=", "at most"],
+  ["=", "exactly"],
+  [">", "more than"],
+  ["<", "fewer than"],
+];
 
 export function frequencyText(frequency, period) {
   const [, operator, count] = /^\s*(\S+)\s+(\d+)/.exec(frequency) || [];
   const words = new Map(COMPARISONS).get(operator);
-  return words ? `${words} ${plural(Number(count), "match", "matches")} within ${period}` : `${frequency} within ${period}`;
+  return words
+    ? `${words} ${plural(Number(count), "match", "matches")} within ${period}`
+    : `${frequency} within ${period}`;
 }

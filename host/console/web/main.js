@@ -3,14 +3,20 @@
 import { get, signals, takeTokenFromTabs, token, viewModule } from "./api.js";
 import { button, failure, field, fill, h, loading } from "./dom.js";
 
-const VIEWS = [["logs", "Logs"], ["events", "Events"], ["situations", "Situations"], ["reports", "Reports"], ["try", "Try a format"]];
+const VIEWS = [
+  ["logs", "Logs"],
+  ["events", "Events"],
+  ["situations", "Situations"],
+  ["reports", "Reports"],
+  ["try", "Try a format"],
+];
 const CHECK_EVERY = 5000;
 const LONGEST_PAUSE = 20000;
 
 const main = document.getElementById("view");
 const link = document.getElementById("link");
 const banner = document.getElementById("banner");
-let leave = null; // ends the present view
+let leave = null; // ends the current view
 let visit = 0; // a view that comes late finds another number
 
 function address() {
@@ -19,8 +25,12 @@ function address() {
 }
 
 function drawNavigation(current) {
-  fill(document.getElementById("nav"), VIEWS.map(([name, label]) =>
-    h("a", { href: `#/${name}`, "aria-current": name === current ? "page" : null }, label)));
+  fill(
+    document.getElementById("nav"),
+    VIEWS.map(([name, label]) =>
+      h("a", { href: `#/${name}`, "aria-current": name === current ? "page" : null }, label),
+    ),
+  );
 }
 
 async function show(isFirst = false) {
@@ -47,7 +57,11 @@ async function show(isFirst = false) {
     if (number !== visit) end?.();
     else leave = end || null;
   } catch (error) {
-    if (number === visit && error.status !== 401) fill(main, failure(error, () => show()));
+    if (number === visit && error.status !== 401)
+      fill(
+        main,
+        failure(error, () => show()),
+      );
   }
 }
 
@@ -59,17 +73,33 @@ function askForToken(problem) {
   leave = null;
   document.title = "Token · zrmagent";
   fill(document.getElementById("nav"));
-  const input = h("input", { type: "password", autocomplete: "off", required: true, spellcheck: false });
-  const row = field("API token", input, "It stands in the agent's token file, of which the agent tells the place when it starts.");
+  const input = h("input", {
+    type: "password",
+    autocomplete: "off",
+    required: true,
+    spellcheck: false,
+  });
+  const row = field(
+    "API token",
+    input,
+    "The contents of the agent's token file. The agent prints the file's path when it starts.",
+  );
   row.setProblem(problem);
-  const form = h("form", {
-    className: "panel token", onsubmit: (event) => {
-      event.preventDefault();
-      token.set(input.value.trim());
-      show();
-      check();
+  const form = h(
+    "form",
+    {
+      className: "panel token",
+      onsubmit: (event) => {
+        event.preventDefault();
+        token.set(input.value.trim());
+        show();
+        check();
+      },
     },
-  }, h("h1", {}, "Who may look"), row, h("p", { className: "actions" }, h("button", { className: "primary" }, "Open the console")));
+    h("h1", {}, "Sign in"),
+    row,
+    h("p", { className: "actions" }, h("button", { className: "primary" }, "Open the console")),
+  );
   fill(main, form);
   input.focus();
 }
@@ -78,7 +108,7 @@ signals.addEventListener("refused", () => {
   if (!token.get()) return;
   token.clear();
   setLink("", "");
-  askForToken("The agent refused this token. Take the present one from its token file.");
+  askForToken("The agent refused this token. Its token file has the current one.");
 });
 
 // ------------------------------------------------------------------ connection
@@ -97,9 +127,15 @@ signals.addEventListener("lost", () => {
   isLost = true;
   pause = 1000;
   setLink("lost", "Connection lost");
-  fill(banner, h("p", { className: "banner lost" },
-    "The connection to the agent is lost. What you see is as it was. The console keeps trying. ",
-    button("Try now", () => check())));
+  fill(
+    banner,
+    h(
+      "p",
+      { className: "banner lost" },
+      "The connection to the agent is lost. The page shows the last known state and keeps trying. ",
+      button("Try now", () => check()),
+    ),
+  );
   schedule();
 });
 
@@ -126,7 +162,10 @@ async function check() {
       const status = await get("/api/v1/status");
       document.getElementById("node").textContent = status.node || "";
       const troubles = problems(status);
-      setLink(troubles.length > 0 ? "trouble" : "up", troubles.length > 0 ? troubles[0] : "Connected");
+      setLink(
+        troubles.length > 0 ? "trouble" : "up",
+        troubles.length > 0 ? troubles[0] : "Connected",
+      );
       link.title = troubles.join("\n");
     } catch (error) {
       if (error.status && error.status !== 401) setLink("trouble", error.message);
@@ -139,7 +178,8 @@ function problems(status) {
   const found = [];
   if (status.history?.problem) found.push(`History: ${status.history.problem}`);
   for (const sink of status.sinks || []) {
-    if (sink.state === "failing") found.push(`Sink ${sink.name || sink.type}: ${sink.error || "failing"}`);
+    if (sink.state === "failing")
+      found.push(`Sink ${sink.name || sink.type}: ${sink.error || "failing"}`);
   }
   return found;
 }

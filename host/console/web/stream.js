@@ -25,8 +25,9 @@ export class EventStream {
   #query;
   #handlers;
 
-  /** handlers: event(event), state("connecting" | "live" | "waiting" | "refused", detail): waiting says
-   *  for how many seconds and, if the agent refused, why; refused the error; again() when a lost stream
+  /** handlers: event(event),
+   *  state("connecting" | "live" | "waiting" | "refused", detail): detail has
+   *  the seconds of waiting and why, or the error of refused; again() when a lost stream
    *  is back */
   constructor(query, after, handlers) {
     this.#query = query;
@@ -47,8 +48,12 @@ export class EventStream {
       try {
         this.#handlers.state("connecting");
         const headers = { Accept: "text/event-stream" };
-        if (this.#last !== null && this.#last !== undefined) headers["Last-Event-ID"] = String(this.#last);
-        const response = await open(withQuery("/api/v1/events/stream", this.#query), { headers, signal: this.#abort.signal });
+        if (this.#last !== null && this.#last !== undefined)
+          headers["Last-Event-ID"] = String(this.#last);
+        const response = await open(withQuery("/api/v1/events/stream", this.#query), {
+          headers,
+          signal: this.#abort.signal,
+        });
         this.#handlers.state("live");
         if (wasLive) this.#handlers.again();
         wasLive = true;

@@ -11,13 +11,21 @@ export class WindowedList {
   #inner = h("div", { className: "windowed-inner", role: "presentation" });
   #scheduled = false;
 
-  /** options: label, row(item) -> children, choose(item), end() when the last rows come into sight */
+  /** options: label, row(item) -> children, choose(item), end() once the last rows are in sight */
   constructor(options) {
     this.options = options;
-    this.element = h("div", {
-      className: "windowed", tabIndex: 0, role: "listbox", "aria-label": options.label,
-      onscroll: () => this.draw(), onkeydown: (event) => this.#key(event),
-    }, this.#inner);
+    this.element = h(
+      "div",
+      {
+        className: "windowed",
+        tabIndex: 0,
+        role: "listbox",
+        "aria-label": options.label,
+        onscroll: () => this.draw(),
+        onkeydown: (event) => this.#key(event),
+      },
+      this.#inner,
+    );
     this.resize = new ResizeObserver(() => this.draw());
     this.resize.observe(this.element);
   }
@@ -71,22 +79,35 @@ export class WindowedList {
     this.#size();
     const height = this.rowHeight;
     const first = Math.max(0, Math.floor(this.element.scrollTop / height) - MARGIN);
-    const last = Math.min(this.items.length, first + Math.ceil(this.element.clientHeight / height) + 2 * MARGIN);
+    const last = Math.min(
+      this.items.length,
+      first + Math.ceil(this.element.clientHeight / height) + 2 * MARGIN,
+    );
     const rows = [];
-    for (let index = first; index < last; index += 1) rows.push(this.#row(this.items[index], index, height));
+    for (let index = first; index < last; index += 1)
+      rows.push(this.#row(this.items[index], index, height));
     this.#inner.replaceChildren(...rows);
     const isChosenInSight = rows.some((row) => row.id === `event-${this.#chosen?.id}`);
-    if (isChosenInSight) this.element.setAttribute("aria-activedescendant", `event-${this.#chosen.id}`);
+    if (isChosenInSight)
+      this.element.setAttribute("aria-activedescendant", `event-${this.#chosen.id}`);
     else this.element.removeAttribute("aria-activedescendant");
     if (last === this.items.length && this.items.length > 0) this.options.end?.();
   }
 
   #row(item, index, height) {
-    const row = h("div", {
-      id: `event-${item.id}`, className: "windowed-row", role: "option",
-      "aria-selected": String(item === this.#chosen), "aria-posinset": index + 1, "aria-setsize": this.items.length,
-      onclick: () => this.choose(item),
-    }, this.options.row(item));
+    const row = h(
+      "div",
+      {
+        id: `event-${item.id}`,
+        className: "windowed-row",
+        role: "option",
+        "aria-selected": String(item === this.#chosen),
+        "aria-posinset": index + 1,
+        "aria-setsize": this.items.length,
+        onclick: () => this.choose(item),
+      },
+      this.options.row(item),
+    );
     row.style.top = `${index * height}px`;
     return row;
   }
@@ -99,7 +120,14 @@ export class WindowedList {
 
   #key(event) {
     const page = Math.max(1, Math.floor(this.element.clientHeight / this.rowHeight) - 1);
-    const steps = { ArrowDown: 1, ArrowUp: -1, PageDown: page, PageUp: -page, Home: -Infinity, End: Infinity };
+    const steps = {
+      ArrowDown: 1,
+      ArrowUp: -1,
+      PageDown: page,
+      PageUp: -page,
+      Home: -Infinity,
+      End: Infinity,
+    };
     if (event.key === "Enter" && this.#chosen) this.options.choose(this.#chosen, true);
     else if (event.key in steps && this.items.length > 0) this.#move(steps[event.key]);
     else return;

@@ -11,7 +11,9 @@ const PAGE = 200;
 const MOST = 20000; // kept in the page; older ones are in the history
 
 const describe = (event) => event.row?.UENTRYDESC || event.row?.ENTRYDESC || "";
-const logOf = (event) => (event.row?.ULOGPATH || event.row?.LOGPATH || "") + (event.row?.ULOGNAME || event.row?.LOGNAME || "");
+const logOf = (event) =>
+  (event.row?.ULOGPATH || event.row?.LOGPATH || "") +
+  (event.row?.ULOGNAME || event.row?.LOGNAME || "");
 
 export async function show(element, query) {
   const page = new EventsPage(element, query);
@@ -26,7 +28,9 @@ class EventsPage {
     this.arrived = [];
     this.isPaused = false;
     this.next = null; // older events are before this one
-    this.wanted = Object.fromEntries(["situation", "log", "severity", "text"].map((key) => [key, query.get(key) || ""]));
+    this.wanted = Object.fromEntries(
+      ["situation", "log", "severity", "text"].map((key) => [key, query.get(key) || ""]),
+    );
     this.#build(element);
   }
 
@@ -36,26 +40,62 @@ class EventsPage {
     this.log = select([["", "All logs"]], "", { onchange: again });
     this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
     this.text = h("input", {
-      type: "search", placeholder: "anywhere in the event", maxLength: 80, value: this.wanted.text, oninput: debounce(again, 300),
+      type: "search",
+      placeholder: "anywhere in the event",
+      maxLength: 80,
+      value: this.wanted.text,
+      oninput: debounce(again, 300),
     });
     this.state = h("p", { className: "state", role: "status" }, "Connecting");
     this.pause = button("Pause", () => this.#togglePause(), { "aria-pressed": "false" });
-    this.newer = button("", () => { this.list.element.scrollTop = 0; this.list.element.focus(); }, { hidden: true });
+    this.newer = button(
+      "",
+      () => {
+        this.list.element.scrollTop = 0;
+        this.list.element.focus();
+      },
+      { hidden: true },
+    );
     this.count = h("p", { className: "quiet" });
     this.trouble = h("p", { className: "why bad trouble", role: "status" });
     this.list = new WindowedList({
-      label: "Events, newest first", row: (event) => this.#row(event), end: () => this.#older(),
+      label: "Events, newest first",
+      row: (event) => this.#row(event),
+      end: () => this.#older(),
       choose: (event, isEntered) => this.#open(event, isEntered),
     });
-    this.list.element.addEventListener("scroll", () => { if (this.list.isAtTop) this.newer.hidden = true; });
-    this.detail = h("aside", { className: "panel detail", "aria-label": "Event", hidden: true, tabIndex: -1 });
+    this.list.element.addEventListener("scroll", () => {
+      if (this.list.isAtTop) this.newer.hidden = true;
+    });
+    this.detail = h("aside", {
+      className: "panel detail",
+      "aria-label": "Event",
+      hidden: true,
+      tabIndex: -1,
+    });
     this.body = h("div", { className: "stack" }, this.list.element);
     this.split = h("div", { className: "events" }, this.body, this.detail);
-    fill(element,
-      h("div", { className: "head" }, h("h1", {}, "Events"), this.state, this.count, h("div", { className: "push" }, this.newer, this.pause), this.trouble),
-      h("div", { className: "toolbar", role: "group", "aria-label": "Filter" }, field("Situation", this.situation), field("Log", this.log),
-        field("Severity", this.severity), field("Text", this.text)),
-      this.split);
+    fill(
+      element,
+      h(
+        "div",
+        { className: "head" },
+        h("h1", {}, "Events"),
+        this.state,
+        this.count,
+        h("div", { className: "push" }, this.newer, this.pause),
+        this.trouble,
+      ),
+      h(
+        "div",
+        { className: "toolbar", role: "group", "aria-label": "Filter" },
+        field("Situation", this.situation),
+        field("Log", this.log),
+        field("Severity", this.severity),
+        field("Text", this.text),
+      ),
+      this.split,
+    );
   }
 
   async start() {
@@ -64,14 +104,18 @@ class EventsPage {
   }
 
   async #offer() {
-    const offer = (select, value) => {
-      if ([...select.options].every((one) => one.value !== value)) select.append(h("option", { value }, value));
+    const offer = (list, value) => {
+      if ([...list.options].every((one) => one.value !== value))
+        list.append(h("option", { value }, value));
     };
     for (const key of ["situation", "log", "severity"]) {
       offer(this[key], this.wanted[key]);
       this[key].value = this.wanted[key];
     }
-    const [situations, logs] = await Promise.allSettled([get("/api/v1/situations"), get("/api/v1/logs")]);
+    const [situations, logs] = await Promise.allSettled([
+      get("/api/v1/situations"),
+      get("/api/v1/logs"),
+    ]);
     for (const { name } of situations.value?.situations || []) offer(this.situation, name);
     for (const { log } of logs.value?.logs || []) offer(this.log, log);
   }
@@ -84,12 +128,18 @@ class EventsPage {
   }
 
   get filter() {
-    return { situation: this.situation.value, log: this.log.value, severity: this.severity.value, text: this.text.value };
+    return {
+      situation: this.situation.value,
+      log: this.log.value,
+      severity: this.severity.value,
+      text: this.text.value,
+    };
   }
 
   /** Takes the filter as it is now. */
   choose() {
-    history.replaceState(null, "", withQuery("#/events", this.filter)); // for a reload, and the way back
+    // For a reload, and the way back.
+    history.replaceState(null, "", withQuery("#/events", this.filter));
     this.restart();
   }
 
@@ -114,7 +164,9 @@ class EventsPage {
     this.#draw();
     const after = Math.max(answer.newest || 0, answer.events[0]?.id || 0);
     this.stream = new EventStream(this.filter, after, {
-      event: (event) => this.#arrive(event), state: (...state) => this.#setState(...state), again: () => this.#verify(abort.signal),
+      event: (event) => this.#arrive(event),
+      state: (...state) => this.#setState(...state),
+      again: () => this.#verify(abort.signal),
     });
   }
 
@@ -124,16 +176,20 @@ class EventsPage {
     let next = before;
     let newest;
     do {
-      const answer = await get(withQuery("/api/v1/events", { ...this.filter, before: next, limit: PAGE - events.length }), signal);
+      const answer = await get(
+        withQuery("/api/v1/events", { ...this.filter, before: next, limit: PAGE - events.length }),
+        signal,
+      );
       newest ??= answer.newest;
       events.push(...answer.events);
       next = answer.next;
-      if (next !== null && events.length < PAGE) this.count.textContent = `Searching before event ${number(next)} …`;
+      if (next !== null && events.length < PAGE)
+        this.count.textContent = `Searching before event ${number(next)} …`;
     } while (next !== null && events.length < PAGE);
     return { events, next, newest };
   }
 
-  /** An agent that comes back with another history counts its events anew: then the list begins anew. */
+  /** An agent that returns with another history numbers its events anew; so the list is cleared. */
   async #verify(signal) {
     const [latest] = this.all;
     if (!latest) return;
@@ -147,14 +203,23 @@ class EventsPage {
 
   #fail(error) {
     this.#setState("refused", error);
-    fill(this.body, error.status === 409
-      ? empty("The history is off", "Without it the agent keeps no events, and there are none to show. Set enabled = true under [history] in its configuration and start it again.")
-      : failure(error, () => this.restart()));
+    fill(
+      this.body,
+      error.status === 409
+        ? empty(
+            "The history is off",
+            "Without it the agent keeps no events, and there are none to show. " +
+              "Set enabled = true under [history] in its configuration and restart it.",
+          )
+        : failure(error, () => this.restart()),
+    );
   }
 
   #setState(state, detail) {
     const texts = {
-      connecting: ["", "Connecting"], live: ["good", "Live"], waiting: ["bad", `Not live; next try in ${detail?.seconds} s`],
+      connecting: ["", "Connecting"],
+      live: ["good", "Live"],
+      waiting: ["bad", `Not live; next try in ${detail?.seconds} s`],
       refused: ["bad", detail?.status === 409 ? "History off" : "Not live"],
     };
     const [level, text] = this.isPaused && state === "live" ? ["warn", "Paused"] : texts[state];
@@ -162,13 +227,18 @@ class EventsPage {
     this.state.className = `state ${level}`;
     this.state.textContent = text;
     // While it is tried again, the reason stays.
-    if (state !== "connecting") this.trouble.textContent = state === "waiting" && detail.error?.status > 0 ? `New events do not come by themselves: ${detail.error.message.replace(/\.$/, "")}.` : "";
+    if (state !== "connecting")
+      this.trouble.textContent =
+        state === "waiting" && detail.error?.status > 0
+          ? `New events do not appear by themselves: ${detail.error.message.replace(/\.$/, "")}.`
+          : "";
   }
 
   // Events that come close together are drawn together, once per frame.
   #arrive(event) {
     this.arrived.push(event);
-    if (this.arrived.length > 2 * MOST) this.arrived.splice(0, MOST); // a page out of sight draws no frame
+    // A page out of sight draws no frame.
+    if (this.arrived.length > 2 * MOST) this.arrived.splice(0, MOST);
     this.frame ??= requestAnimationFrame(() => {
       this.frame = null;
       this.#take(this.arrived.splice(0).reverse());
@@ -207,16 +277,33 @@ class EventsPage {
     this.list.reset(this.all);
     if (this.all.length > 0) fill(this.body, this.list.element);
     else if (Object.values(this.filter).some(Boolean)) {
-      fill(this.body, empty("None of these", "No event of the history fits the filter. One that comes shows at once.", button("Show all events", () => {
-        for (const control of [this.situation, this.log, this.severity, this.text]) control.value = "";
-        this.choose();
-      })));
-    } else fill(this.body, empty("No events yet", "An event comes when an entry meets a situation. This page shows it at once.", h("a", { className: "button", href: "#/situations" }, "Situations")));
+      fill(
+        this.body,
+        empty(
+          "No matches",
+          "No event in the history matches the filter. New ones appear here at once.",
+          button("Show all events", () => {
+            for (const control of [this.situation, this.log, this.severity, this.text])
+              control.value = "";
+            this.choose();
+          }),
+        ),
+      );
+    } else
+      fill(
+        this.body,
+        empty(
+          "No events yet",
+          "An entry that meets a situation raises an event, which appears here at once.",
+          h("a", { className: "button", href: "#/situations" }, "Situations"),
+        ),
+      );
     this.#drawCount();
   }
 
   #drawCount() {
-    this.count.textContent = `${number(this.list.items.length)}${this.next !== null ? "+" : ""} shown`;
+    const more = this.next !== null ? "+" : "";
+    this.count.textContent = `${number(this.list.items.length)}${more} shown`;
   }
 
   async #older() {
@@ -240,7 +327,8 @@ class EventsPage {
     return [
       h("span", { title: time(event.raised, true) }, briefTime(event.raised)),
       h("span", { className: `severity ${event.severity}` }, event.severity),
-      h("span", { title: event.situation }, event.situation), h("span", {}, describe(event)),
+      h("span", { title: event.situation }, event.situation),
+      h("span", {}, describe(event)),
     ];
   }
 
@@ -249,20 +337,46 @@ class EventsPage {
     const explain = button("Why was it raised?", async () => {
       fill(why, h("p", { className: "loading" }, "Asking …"));
       try {
-        const answer = await post("/api/v1/explain", { situation: event.situation, event: event.id });
+        const answer = await post("/api/v1/explain", {
+          situation: event.situation,
+          event: event.id,
+        });
         fill(why, explained(answer, { withColumns: false }));
       } catch (error) {
         fill(why, failure(error));
       }
     });
-    fill(this.detail,
-      h("div", { className: "head" }, h("h2", {}, `Event ${event.id}`), h("div", { className: "push" }, button("Close", () => this.#close()))),
+    fill(
+      this.detail,
+      h(
+        "div",
+        { className: "head" },
+        h("h2", {}, `Event ${event.id}`),
+        h(
+          "div",
+          { className: "push" },
+          button("Close", () => this.#close()),
+        ),
+      ),
       h("pre", {}, describe(event)),
-      h("dl", { className: "pairs" }, [
-        ["Situation", h("a", { href: withQuery("#/situations", { name: event.situation }) }, event.situation)],
-        ["Severity", h("span", { className: `severity ${event.severity}` }, event.severity)], ["Raised", time(event.raised, true)], ["Log", logOf(event)],
-      ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)])),
-      h("p", { className: "actions" }, explain), why, h("h3", {}, "Columns"), rowList(event.row));
+      h(
+        "dl",
+        { className: "pairs" },
+        [
+          [
+            "Situation",
+            h("a", { href: withQuery("#/situations", { name: event.situation }) }, event.situation),
+          ],
+          ["Severity", h("span", { className: `severity ${event.severity}` }, event.severity)],
+          ["Raised", time(event.raised, true)],
+          ["Log", logOf(event)],
+        ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)]),
+      ),
+      h("p", { className: "actions" }, explain),
+      why,
+      h("h3", {}, "Columns"),
+      rowList(event.row),
+    );
     this.detail.hidden = false;
     this.split.classList.add("open");
     if (isEntered || matchMedia("(max-width: 960px)").matches) this.detail.focus();

@@ -9,27 +9,60 @@ import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 const EVERY = 10000;
 const CHART_EVERY = 60000;
 const SKIPPED = [
-  { label: "Time", className: "fit" }, { label: "From byte", className: "num" },
-  { label: "To byte", className: "num" }, { label: "Unread before", className: "num" },
+  { label: "Time", className: "fit" },
+  { label: "From byte", className: "num" },
+  { label: "To byte", className: "num" },
+  { label: "Unread before", className: "num" },
   { label: "Noticed", className: "wide" },
 ];
 
 export async function show(element, path) {
-  const report = h("a", { className: "button", href: withQuery("#/reports", { log: path }), hidden: true }, "Report on this log");
-  const trial = h("a", { className: "button", href: withQuery("#/try", { log: path }), hidden: true }, "Try a format on it");
+  const report = h(
+    "a",
+    { className: "button", href: withQuery("#/reports", { log: path }), hidden: true },
+    "Report on this log",
+  );
+  const trial = h(
+    "a",
+    { className: "button", href: withQuery("#/try", { log: path }), hidden: true },
+    "Try a format on it",
+  );
   const state = h("div", { className: "panel" }, loading());
   const chart = h("div", {}, loading("Loading the last 24 hours"));
-  const rates = h("section", { className: "panel" }, h("h2", {}, "Entries and events per minute, last 24 hours"), chart);
+  const rates = h(
+    "section",
+    { className: "panel" },
+    h("h2", {}, "Entries and events per minute, last 24 hours"),
+    chart,
+  );
   const ledger = h("div", { className: "stack" });
-  fill(element,
-    h("div", { className: "head" }, h("h1", { className: "path" }, path), h("div", { className: "push" }, report, trial,
-      h("a", { className: "button", href: "#/logs" }, "All logs"))),
-    state, rates, ledger);
+  fill(
+    element,
+    h(
+      "div",
+      { className: "head" },
+      h("h1", { className: "path" }, path),
+      h(
+        "div",
+        { className: "push" },
+        report,
+        trial,
+        h("a", { className: "button", href: "#/logs" }, "All logs"),
+      ),
+    ),
+    state,
+    rates,
+    ledger,
+  );
   let endChart = () => {};
   let isDrawn = false;
   const load = async () => {
     try {
-      const { logs: [log], unmonitored: [other], configuration } = await get(withQuery("/api/v1/logs", { log: path }));
+      const {
+        logs: [log],
+        unmonitored: [other],
+        configuration,
+      } = await get(withQuery("/api/v1/logs", { log: path }));
       rates.hidden = report.hidden = !log;
       trial.hidden = !"US".includes(log?.row.LOGTYPE ?? " ");
       if (log) {
@@ -42,7 +75,14 @@ export async function show(element, path) {
       isDrawn = true;
     } catch (error) {
       if (error.status === 404) {
-        fill(state, empty("This log is not monitored", "It is not, or no longer, in the agent's configuration. Add it there, then re-read the configuration.", h("a", { className: "button", href: "#/logs" }, "All logs")));
+        fill(
+          state,
+          empty(
+            "This log is not monitored",
+            "It is not in the log configuration. Add it there, then re-read the configuration.",
+            h("a", { className: "button", href: "#/logs" }, "All logs"),
+          ),
+        );
         fill(ledger);
         rates.hidden = report.hidden = trial.hidden = true;
         isDrawn = false;
@@ -56,11 +96,29 @@ export async function show(element, path) {
       const [series] = answer.logs;
       endChart();
       endChart = () => {};
-      if (!series) fill(chart, h("p", { className: "hint" }, "No entry of this log in the last 24 hours. Entries are counted at the end of each minute."));
+      if (!series)
+        fill(
+          chart,
+          h(
+            "p",
+            { className: "hint" },
+            "No entries in the last 24 hours. Entries are counted at the end of each minute.",
+          ),
+        );
       else endChart = await drawRates(chart, answer, series);
       isCharted = Boolean(series);
     } catch (error) {
-      if (!isCharted) fill(chart, h("p", { className: "hint" }, error.status === 409 ? "The history is off, so rates are not kept. [history] in the configuration switches it on." : error.message));
+      if (!isCharted)
+        fill(
+          chart,
+          h(
+            "p",
+            { className: "hint" },
+            error.status === 409
+              ? "The history is off, so rates are not kept. Set enabled = true under [history]."
+              : error.message,
+          ),
+        );
     }
   };
   const scheme = matchMedia("(prefers-color-scheme: dark)");
@@ -81,34 +139,96 @@ function drawState(element, log, configuration) {
   const { row } = log;
   const ledger = log.ledger || {};
   const pairs = [
-    ["Kind", kindOf(row)], ["Status", row.MONSTATUS], ["Monitored since", stamp(row.MONTIME)], ["File changed", stamp(row.LOGMODDATE)], ["Size", bytes(row.LOGSIZE)],
-    ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`], ["Entries", number(ledger.rows ?? row.NUMEVENTS)], ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
-    ["Without a time", number(ledger.without_time)], ["Truncations", number(ledger.truncations)], ["Skipped", bytes(ledger.skipped_bytes)], ["Restarts of the monitor", number(ledger.restarts)],
-    ["Last entry", time(ledger.last_entry)], ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
+    ["Kind", kindOf(row)],
+    ["Status", row.MONSTATUS],
+    ["Monitored since", stamp(row.MONTIME)],
+    ["File changed", stamp(row.LOGMODDATE)],
+    ["Size", bytes(row.LOGSIZE)],
+    ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`],
+    ["Entries", number(ledger.rows ?? row.NUMEVENTS)],
+    ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
+    ["Without a time", number(ledger.without_time)],
+    ["Truncations", number(ledger.truncations)],
+    ["Skipped", bytes(ledger.skipped_bytes)],
+    ["Restarts of the monitor", number(ledger.restarts)],
+    ["Last entry", time(ledger.last_entry)],
+    ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
   ];
-  if (row.FORMATTER) pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
-  fill(element, h("p", {}, h("span", { className: `state ${level}` }, state)), why && h("p", { className: `why ${level}` }, why),
+  if (row.FORMATTER)
+    pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
+  fill(
+    element,
+    h("p", {}, h("span", { className: `state ${level}` }, state)),
+    why && h("p", { className: `why ${level}` }, why),
     level === "bad" && h("p", { className: "hint" }, again(configuration)),
-    h("dl", { className: "facts" }, pairs.map(([name, value]) => h("div", {}, h("dt", {}, name), h("dd", {}, value)))));
+    h(
+      "dl",
+      { className: "facts" },
+      pairs.map(([name, value]) => h("div", {}, h("dt", {}, name), h("dd", {}, value))),
+    ),
+  );
 }
 
 function drawUnmonitored(element, log, configuration) {
   const { level, state, why } = judgeUnmonitored(log);
-  fill(element, h("p", {}, h("span", { className: `state ${level}` }, state)), h("p", { className: `why ${level}` }, why),
-    h("p", { className: "hint" }, `It stands in line ${log.line} of the log configuration. ${again(configuration)}`));
+  fill(
+    element,
+    h("p", {}, h("span", { className: `state ${level}` }, state)),
+    h("p", { className: `why ${level}` }, why),
+    h(
+      "p",
+      { className: "hint" },
+      `It is on line ${log.line} of the log configuration. ${again(configuration)}`,
+    ),
+  );
 }
 
 function drawLedger(element, log) {
   const { rejected = [], skipped = [] } = log.ledger || {};
-  fill(element,
-    h("section", { className: "panel flush" }, h("h2", {}, "Rejected lines, the latest"), rejected.length === 0
-      ? h("p", { className: "loading" }, "Every line fitted.")
-      : table("Rejected lines", [{ label: "Time", className: "fit" }, { label: "Line", className: "wide" }, { label: "Reason", className: "wide" }],
-        [...rejected].reverse().map((one) => [time(one.time), h("pre", {}, one.line), h("span", { className: "why bad" }, one.reason)]), { className: "cards" })),
-    skipped.length > 0 && h("section", { className: "panel flush" }, h("h2", {}, "Skipped by truncations"),
-      table("Skipped ranges", SKIPPED, [...skipped].reverse().map((one) => [
-        time(one.time), number(one.from), number(one.to),
-        one.unread === null ? "unknown" : number(one.unread),
-        one.regrown ? "after it had grown again" : "when it was shorter",
-      ]), { className: "cards" })));
+  fill(
+    element,
+    h(
+      "section",
+      { className: "panel flush" },
+      h("h2", {}, "Latest rejected lines"),
+      rejected.length === 0
+        ? h("p", { className: "loading" }, "Every line fits the format.")
+        : table(
+            "Rejected lines",
+            [
+              { label: "Time", className: "fit" },
+              { label: "Line", className: "wide" },
+              { label: "Reason", className: "wide" },
+            ],
+            [...rejected]
+              .reverse()
+              .map((one) => [
+                time(one.time),
+                h("pre", {}, one.line),
+                h("span", { className: "why bad" }, one.reason),
+              ]),
+            { className: "cards" },
+          ),
+    ),
+    skipped.length > 0 &&
+      h(
+        "section",
+        { className: "panel flush" },
+        h("h2", {}, "Skipped by truncations"),
+        table(
+          "Skipped ranges",
+          SKIPPED,
+          [...skipped]
+            .reverse()
+            .map((one) => [
+              time(one.time),
+              number(one.from),
+              number(one.to),
+              one.unread === null ? "unknown" : number(one.unread),
+              one.regrown ? "found after it had grown again" : "found while it was shorter",
+            ]),
+          { className: "cards" },
+        ),
+      ),
+  );
 }

@@ -14,9 +14,15 @@ const TAKES_A_WHILE = 1500; // until a refresh shows
 const ORDER = { bad: 0, warn: 1, idle: 2, good: 3 };
 
 const COLUMNS = [
-  { label: "State", className: "fit lead" }, { label: "Log", className: "wide" }, { label: "Kind", className: "fit tail" },
-  { label: "Entries/min", className: "num" }, { label: "Last 24 h", className: "fit" }, { label: "Entries", className: "num" },
-  { label: "Rejected", className: "num" }, { label: "Size", className: "num" }, { label: "Last entry", className: "fit" },
+  { label: "State", className: "fit lead" },
+  { label: "Log", className: "wide" },
+  { label: "Kind", className: "fit tail" },
+  { label: "Entries/min", className: "num" },
+  { label: "Last 24 h", className: "fit" },
+  { label: "Entries", className: "num" },
+  { label: "Rejected", className: "num" },
+  { label: "Size", className: "num" },
+  { label: "Last entry", className: "fit" },
 ];
 
 export async function show(element, query) {
@@ -39,25 +45,61 @@ class LogsPage {
 
   constructor(element) {
     this.counts = h("p", { className: "counts", role: "status" });
-    this.text = h("input", { type: "search", placeholder: "Find a log", "aria-label": "Find a log", oninput: debounce(() => this.draw(), 100) });
-    this.which = select([["", "All states"], ["bad", "In trouble"], ["warn", "To look at"], ["good", "Running"]], "", { "aria-label": "State", onchange: () => this.draw() });
+    this.text = h("input", {
+      type: "search",
+      placeholder: "Find a log",
+      "aria-label": "Find a log",
+      oninput: debounce(() => this.draw(), 100),
+    });
+    this.which = select(
+      [
+        ["", "All states"],
+        ["bad", "In trouble"],
+        ["warn", "With warnings"],
+        ["good", "Running"],
+      ],
+      "",
+      { "aria-label": "State", onchange: () => this.draw() },
+    );
     this.note = h("div", { role: "status" });
     this.cure = h("p", { className: "hint" });
     this.trouble = h("div", { role: "alert" });
     this.list = h("section", { className: "panel flush", "aria-label": "Logs" }, loading());
     this.lately = h("section", { className: "panel flush", "aria-label": "Raised lately" });
-    fill(element,
-      h("div", { className: "head" }, h("h1", {}, "Logs"), this.counts,
-        h("div", { className: "push" }, this.text, this.which,
-          button("Re-read configuration", () => this.#reread(), { title: "As SIGHUP does: new logs are taken up, removed ones are left" }))),
-      this.note, this.trouble, this.cure, this.list, this.lately);
+    fill(
+      element,
+      h(
+        "div",
+        { className: "head" },
+        h("h1", {}, "Logs"),
+        this.counts,
+        h(
+          "div",
+          { className: "push" },
+          this.text,
+          this.which,
+          button("Re-read configuration", () => this.#reread(), {
+            title: "Same as SIGHUP: starts monitoring added logs and stops monitoring removed ones",
+          }),
+        ),
+      ),
+      this.note,
+      this.trouble,
+      this.cure,
+      this.list,
+      this.lately,
+    );
   }
 
   async load() {
     try {
       this.#take(await get("/api/v1/logs"));
     } catch (error) {
-      if (!this.logs) fill(this.list, failure(error, () => this.load()));
+      if (!this.logs)
+        fill(
+          this.list,
+          failure(error, () => this.load()),
+        );
       return;
     }
     this.draw();
@@ -83,14 +125,29 @@ class LogsPage {
     }
     this.configuration = configuration;
     this.isIdle = logs.length === 0;
-    say(this.trouble, configuration?.problem && h("p", { className: "panel problem" },
-      `The log configuration ${configuration.file} cannot be read: ${configuration.problem}. The agent goes on with the logs that it has; those of the system's syslog configuration, if it had none.`));
+    say(
+      this.trouble,
+      configuration?.problem &&
+        h(
+          "p",
+          { className: "panel problem" },
+          `The log configuration ${configuration.file} cannot be read: ${configuration.problem}. ` +
+            "The agent keeps the logs it has, or uses the system's syslog configuration.",
+        ),
+    );
   }
 
   async #reread() {
     try {
       await post("/api/v1/refresh");
-      fill(this.note, h("p", { className: "hint" }, "The agent was asked to read its log configuration. Where that file has not changed, nothing changes."));
+      fill(
+        this.note,
+        h(
+          "p",
+          { className: "hint" },
+          "The agent is re-reading its log configuration. An unchanged file changes nothing.",
+        ),
+      );
       setTimeout(() => this.list.isConnected && this.load(), TAKES_A_WHILE);
     } catch (error) {
       fill(this.note, h("p", { className: "problem" }, error.message));
@@ -104,7 +161,10 @@ class LogsPage {
     const byLog = ({ logs }) => new Map(logs.map((one) => [one.log, one.entries]));
     try {
       const from = new Date(this.at - 6 * MINUTE).toISOString();
-      const [day, latest] = await Promise.all([get("/api/v1/rates?step=900"), get(withQuery("/api/v1/rates", { from }))]);
+      const [day, latest] = await Promise.all([
+        get("/api/v1/rates?step=900"),
+        get(withQuery("/api/v1/rates", { from })),
+      ]);
       this.#days = byLog(day);
       this.#rates = byLog(latest);
       this.draw();
@@ -130,9 +190,17 @@ class LogsPage {
       this.#newest = newest;
       this.#drawEvents(events);
     } catch (error) {
-      fill(this.lately, h("h2", {}, "Raised lately"), h("p", { className: "loading" }, error.status === 409
-        ? "The history is off, so events are not kept. [history] in the configuration switches it on."
-        : error.message));
+      fill(
+        this.lately,
+        h("h2", {}, "Raised lately"),
+        h(
+          "p",
+          { className: "loading" },
+          error.status === 409
+            ? "The history is off, so events are not kept. Set enabled = true under [history]."
+            : error.message,
+        ),
+      );
       this.#newest = null;
     }
   }
@@ -146,54 +214,133 @@ class LogsPage {
       else bySituation.set(event.situation, { ...event, count: 1 });
     }
     const shown = [...bySituation.values()].slice(0, MOST_RAISED);
-    fill(this.lately, h("h2", {}, "Raised lately"), shown.length === 0
-      ? h("p", { className: "loading" }, "No situation has been raised yet. ", h("a", { href: "#/situations" }, "Look at the situations"), " to see what would be.")
-      : h("ul", { className: "list" }, shown.map((event) => h("li", {},
-        h("span", { title: event.raised }, briefTime(event.raised)),
-        h("span", { className: `severity ${event.severity}` }, event.severity),
-        h("span", {}, h("a", { href: withQuery("#/events", { situation: event.situation }) }, event.situation),
-          event.count > 1 && h("span", { className: "quiet", title: `Among the latest ${events.length} events` }, ` × ${event.count}`)),
-        h("span", { className: "what" }, event.row?.UENTRYDESC || event.row?.ENTRYDESC || "")))));
+    fill(
+      this.lately,
+      h("h2", {}, "Raised lately"),
+      shown.length === 0
+        ? h(
+            "p",
+            { className: "loading" },
+            "No events yet. ",
+            h("a", { href: "#/situations" }, "See the situations"),
+            " for what would raise one.",
+          )
+        : h(
+            "ul",
+            { className: "list" },
+            shown.map((event) =>
+              h(
+                "li",
+                {},
+                h("span", { title: event.raised }, briefTime(event.raised)),
+                h("span", { className: `severity ${event.severity}` }, event.severity),
+                h(
+                  "span",
+                  {},
+                  h(
+                    "a",
+                    { href: withQuery("#/events", { situation: event.situation }) },
+                    event.situation,
+                  ),
+                  event.count > 1 &&
+                    h(
+                      "span",
+                      { className: "quiet", title: `Among the latest ${events.length} events` },
+                      ` × ${event.count}`,
+                    ),
+                ),
+                h(
+                  "span",
+                  { className: "what" },
+                  event.row?.UENTRYDESC || event.row?.ENTRYDESC || "",
+                ),
+              ),
+            ),
+          ),
+    );
   }
 
   draw() {
     const judged = this.logs;
-    this.cure.textContent = judged.some(({ level }) => level === "bad") ? `${again(this.configuration)}${this.isIdle ? " The agent monitors nothing: without a log it ends after a minute." : ""}` : "";
+    this.cure.textContent = judged.some(({ level }) => level === "bad")
+      ? again(this.configuration) +
+        (this.isIdle ? " Without a log to monitor, the agent ends after a minute." : "")
+      : "";
     const counted = (level) => judged.filter((log) => log.level === level).length;
-    say(this.counts, h("span", {}, h("b", {}, number(judged.length)), ` ${judged.length === 1 ? "log" : "logs"}`),
+    say(
+      this.counts,
+      h("span", {}, h("b", {}, number(judged.length)), ` ${judged.length === 1 ? "log" : "logs"}`),
       counted("bad") > 0 && h("span", { className: "state bad" }, `${counted("bad")} in trouble`),
-      counted("warn") > 0 && h("span", { className: "state warn" }, `${counted("warn")} to look at`),
-      h("span", { className: "state good" }, `${counted("good")} running`));
+      counted("warn") > 0 &&
+        h("span", { className: "state warn" }, `${counted("warn")} with warnings`),
+      h("span", { className: "state good" }, `${counted("good")} running`),
+    );
     if (judged.length === 0) {
-      fill(this.list, empty("No log is monitored", "The agent reads its logs from the file of log_config in its configuration, one path per line. Write one, then re-read the configuration. Without a log the agent ends after a minute, and is to be started again.", h("a", { className: "button", href: "#/try" }, "Make a line for a log")));
+      fill(
+        this.list,
+        empty(
+          "No log is monitored",
+          "The file that log_config names lists the logs, one path per line. Add one, then " +
+            "re-read the configuration. Without a log the agent ends after a minute.",
+          h("a", { className: "button", href: "#/try" }, "Create a line for a log"),
+        ),
+      );
       return;
     }
     const word = this.text.value.toLowerCase();
     const shown = judged
-      .filter((log) => log.log.toLowerCase().includes(word) && (!this.which.value || log.level === this.which.value))
+      .filter(
+        (log) =>
+          log.log.toLowerCase().includes(word) &&
+          (!this.which.value || log.level === this.which.value),
+      )
       .sort((a, b) => ORDER[a.level] - ORDER[b.level] || a.log.localeCompare(b.log));
     if (shown.length === 0) {
-      fill(this.list, empty("None of these", "No log fits what is looked for."));
+      fill(this.list, empty("No matches", "No log matches the search."));
       return;
     }
     const focused = document.activeElement?.closest?.("td a")?.getAttribute("href");
-    fill(this.list, table("Logs, those in trouble first", COLUMNS, shown.map((log) => this.#cells(log)), { className: "cards" }));
+    fill(
+      this.list,
+      table(
+        "Logs, those in trouble first",
+        COLUMNS,
+        shown.map((log) => this.#cells(log)),
+        { className: "cards" },
+      ),
+    );
     if (focused) this.list.querySelector(`a[href="${CSS.escape(focused)}"]`)?.focus();
   }
 
   #cells(log) {
-    const why = log.why && h("p", { className: `why ${log.level}` }, [log.why, log.more].filter(Boolean).join(" "));
+    const why =
+      log.why &&
+      h("p", { className: `why ${log.level}` }, [log.why, log.more].filter(Boolean).join(" "));
     const state = h("span", { className: `state ${log.level}` }, log.state);
-    if (!log.row) return [state, h("div", {}, h("span", { className: "break" }, log.log), why), ...Array(COLUMNS.length - 2).fill(null)];
+    if (!log.row)
+      return [
+        state,
+        h("div", {}, h("span", { className: "break" }, log.log), why),
+        ...Array(COLUMNS.length - 2).fill(null),
+      ];
     const perMinute = this.#rateOf(log.log);
     const day = this.#days.get(log.log);
     const last = log.ledger?.last_entry;
     return [
-      state, h("div", {}, h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log), why),
-      kindOf(log.row), h("span", { title: "Mean of the last five minutes" }, rateText(perMinute)),
+      state,
+      h(
+        "div",
+        {},
+        h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log),
+        why,
+      ),
+      kindOf(log.row),
+      h("span", { title: "Mean of the last five minutes" }, rateText(perMinute)),
       day ? sparkline(day, `Entries over 24 hours, now ${rateText(perMinute)} per minute`) : "–",
-      number(log.ledger?.lines ?? log.row.NUMEVENTS), number(log.ledger?.format_errors ?? log.row.NUMERRORS),
-      bytes(log.row.LOGSIZE), h("span", { title: last || "" }, last ? ago(last) : "–"),
+      number(log.ledger?.rows ?? log.row.NUMEVENTS),
+      number(log.ledger?.format_errors ?? log.row.NUMERRORS),
+      bytes(log.row.LOGSIZE),
+      h("span", { title: last || "" }, last ? ago(last) : "–"),
     ];
   }
 }

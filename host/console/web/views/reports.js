@@ -2,15 +2,26 @@
 
 import { get, post } from "../api.js";
 import { Conditions } from "../conditions.js";
-import { button, empty, failure, field, fill, h, loading, select, visible } from "../dom.js";
+import { button, empty, failure, field, fill, h, select, visible } from "../dom.js";
 import { offsetOf, plural, reachText, stamp } from "../format.js";
 
 const HOUR = 3600 * 1000;
 const PRESETS = [
-  ["hour", "Last hour"], ["day", "Last 24 hours"], ["today", "Today"], ["yesterday", "Yesterday"], ["night", "Last night, 22 to 6"], ["week", "Last 7 days"], ["own", "Other times"],
+  ["hour", "Last hour"],
+  ["day", "Last 24 hours"],
+  ["today", "Today"],
+  ["yesterday", "Yesterday"],
+  ["night", "Last night, 22 to 6"],
+  ["week", "Last 7 days"],
+  ["own", "Other times"],
 ];
 const MAIN = [
-  ["ENTRYTIME", "Time"], ["ENTRYSYS", "System"], ["ENTRYSRC", "Source"], ["ENTRYTYPE", "Type"], ["ENTRYCLASS", "Class"], ["ENTRYDESC", "Description"],
+  ["ENTRYTIME", "Time"],
+  ["ENTRYSYS", "System"],
+  ["ENTRYSRC", "Source"],
+  ["ENTRYTYPE", "Type"],
+  ["ENTRYCLASS", "Class"],
+  ["ENTRYDESC", "Description"],
 ];
 
 function window(preset, now = new Date()) {
@@ -23,12 +34,18 @@ function window(preset, now = new Date()) {
     return date;
   };
   switch (preset) {
-    case "hour": return [new Date(now - HOUR), now];
-    case "today": return [midnight, now];
-    case "yesterday": return [at(-1), new Date(midnight - 1000)];
-    case "night": return [at(-1, 22), at(0, 6)];
-    case "week": return [new Date(now - 7 * 24 * HOUR), now];
-    default: return [new Date(now - 24 * HOUR), now];
+    case "hour":
+      return [new Date(now - HOUR), now];
+    case "today":
+      return [midnight, now];
+    case "yesterday":
+      return [at(-1), new Date(midnight - 1000)];
+    case "night":
+      return [at(-1, 22), at(0, 6)];
+    case "week":
+      return [new Date(now - 7 * 24 * HOUR), now];
+    default:
+      return [new Date(now - 24 * HOUR), now];
   }
 }
 
@@ -39,12 +56,28 @@ function local(date) {
 }
 
 export async function show(element, query) {
-  const [{ logs, time }, { columns }] = await Promise.all([get("/api/v1/logs"), get("/api/v1/columns")]);
+  const [{ logs, time }, { columns }] = await Promise.all([
+    get("/api/v1/logs"),
+    get("/api/v1/columns"),
+  ]);
   if (logs.length === 0) {
-    fill(element, h("h1", {}, "Reports"), empty("No log is monitored", "A report reads a log that the agent monitors.", h("a", { className: "button", href: "#/logs" }, "Logs")));
+    fill(
+      element,
+      h("h1", {}, "Reports"),
+      empty(
+        "No log is monitored",
+        "A report reads a log that the agent monitors.",
+        h("a", { className: "button", href: "#/logs" }, "Logs"),
+      ),
+    );
     return () => {};
   }
-  const page = new ReportPage(element, logs.map(({ log }) => log).sort(), columns, query.get("log"));
+  const page = new ReportPage(
+    element,
+    logs.map(({ log }) => log).sort(),
+    columns,
+    query.get("log"),
+  );
   const offset = offsetOf(logs[0].row.TIMESTAMP, time);
   if (offset !== -new Date().getTimezoneOffset()) page.setZone(offset);
   return () => page.end();
@@ -53,28 +86,59 @@ export async function show(element, query) {
 class ReportPage {
   constructor(element, logs, columns, log) {
     this.columns = columns;
-    this.result = h("section", { className: "stack", "aria-label": "Result" },
-      h("div", { className: "panel" }, empty("Nothing asked yet", "Choose a log and a time, then run the report. Its newest entries come first.")));
+    this.result = h(
+      "section",
+      { className: "stack", "aria-label": "Result" },
+      h(
+        "div",
+        { className: "panel" },
+        empty(
+          "No report yet",
+          "Choose a log and a time, then run the report. Its newest entries come first.",
+        ),
+      ),
+    );
     this.log = field("Log", select(logs, log && logs.includes(log) ? log : logs[0]));
     this.preset = field("Time", select(PRESETS, "day", { onchange: () => this.#setWindow() }));
-    const own = () => { this.preset.control.value = "own"; };
+    const own = () => {
+      this.preset.control.value = "own";
+    };
     this.from = field("From", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.to = field("To", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.conditions = new Conditions(columns, [], () => this.conditions.setProblems([]));
     this.zone = h("p", { className: "hint" });
     this.run = h("button", { className: "primary" }, "Run the report");
     this.#setWindow();
-    fill(element, h("div", { className: "head" }, h("h1", {}, "Reports")),
-      h("form", { className: "panel", noValidate: true, onsubmit: (event) => { event.preventDefault(); this.#run(); } },
-        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to), this.zone, this.conditions.element, h("p", { className: "actions" }, this.run)),
-      this.result);
+    fill(
+      element,
+      h("div", { className: "head" }, h("h1", {}, "Reports")),
+      h(
+        "form",
+        {
+          className: "panel",
+          noValidate: true,
+          onsubmit: (event) => {
+            event.preventDefault();
+            this.#run();
+          },
+        },
+        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to),
+        this.zone,
+        this.conditions.element,
+        h("p", { className: "actions" }, this.run),
+      ),
+      this.result,
+    );
   }
 
   /** Says whose times are meant, where the agent's machine has others than this browser. */
   setZone(offset) {
     const two = (value) => String(Math.floor(value)).padStart(2, "0");
-    const zone = `UTC${offset < 0 ? "−" : "+"}${two(Math.abs(offset) / 60)}:${two(Math.abs(offset) % 60)}`;
-    this.zone.textContent = `From and To are your time; the times of entries are those of the agent's machine (${zone}).`;
+    const away = Math.abs(offset);
+    const zone = `UTC${offset < 0 ? "−" : "+"}${two(away / 60)}:${two(away % 60)}`;
+    this.zone.textContent =
+      "From and To are in your time zone; " +
+      `entries show the local time of the agent's machine (${zone}).`;
   }
 
   end() {
@@ -97,14 +161,25 @@ class ReportPage {
     this.#setWindow();
     const from = new Date(this.from.control.value);
     const to = new Date(this.to.control.value);
-    this.from.setProblem(Number.isNaN(from.getTime()) ? "Say from when." : "");
-    this.to.setProblem(Number.isNaN(to.getTime()) ? "Say until when." : to < from ? "This is before the begin." : "");
+    this.from.setProblem(Number.isNaN(from.getTime()) ? "Enter a start time." : "");
+    this.to.setProblem(
+      Number.isNaN(to.getTime())
+        ? "Enter an end time."
+        : to < from
+          ? "This is before the start."
+          : "",
+    );
     if (Number.isNaN(from.getTime()) || Number.isNaN(to.getTime()) || to < from) return;
     this.abort = new AbortController();
     const abort = this.abort; // of this run; another may begin before its answer
     this.#showProgress();
     try {
-      const body = { log: this.log.control.value, from: from.toISOString(), to: to.toISOString(), where: this.conditions.texts };
+      const body = {
+        log: this.log.control.value,
+        from: from.toISOString(),
+        to: to.toISOString(),
+        where: this.conditions.texts,
+      };
       this.answer = await post("/api/v1/reports", body, abort.signal);
       this.sort = null;
       this.#draw();
@@ -118,65 +193,192 @@ class ReportPage {
   #showProgress() {
     const begin = performance.now();
     const elapsed = h("span", {}, "Reading the log, 0 s");
-    fill(this.result, h("div", { className: "panel" }, h("p", { role: "status", className: "actions" }, elapsed, button("Cancel", () => this.abort.abort()))));
-    this.timer = setInterval(() => { elapsed.textContent = `Reading the log, ${Math.round((performance.now() - begin) / 1000)} s`; }, 500);
+    fill(
+      this.result,
+      h(
+        "div",
+        { className: "panel" },
+        h(
+          "p",
+          { role: "status", className: "actions" },
+          elapsed,
+          button("Cancel", () => this.abort.abort()),
+        ),
+      ),
+    );
+    this.timer = setInterval(() => {
+      elapsed.textContent = `Reading the log, ${Math.round((performance.now() - begin) / 1000)} s`;
+    }, 500);
   }
 
   #fail(error) {
     if (error.name === "AbortError") {
-      fill(this.result, h("div", { className: "panel" }, empty("Cancelled", "Choose a later begin or a shorter time, or run it again.")));
+      fill(
+        this.result,
+        h(
+          "div",
+          { className: "panel" },
+          empty("Cancelled", "Choose a later start or a shorter period, or run it again."),
+        ),
+      );
       return;
     }
-    const rest = error.field ? this.conditions.setProblems([{ field: error.field, detail: error.message }]) : [error];
-    for (const key of ["from", "to", "log"]) if (error.field === key) this[key].setProblem(error.message);
-    fill(this.result, h("div", { className: "panel" }, rest.length > 0 ? failure(error, () => this.#run()) : failure(new Error("A condition cannot be used; it is marked above."))));
+    const rest = error.field
+      ? this.conditions.setProblems([{ field: error.field, detail: error.message }])
+      : [error];
+    for (const key of ["from", "to", "log"])
+      if (error.field === key) this[key].setProblem(error.message);
+    fill(
+      this.result,
+      h(
+        "div",
+        { className: "panel" },
+        rest.length > 0
+          ? failure(error, () => this.#run())
+          : failure(new Error("A condition is invalid; it is marked above.")),
+      ),
+    );
   }
 
   #draw() {
     const { rows, truncated, max_rows: most, complete } = this.answer;
     if (rows.length === 0) {
-      fill(this.result, h("div", { className: "panel" }, empty("No entries", truncated
-        ? `None of the newest ${most} entries of this time meets the conditions; a report reads no more than that. Choose a shorter time.`
-        : complete ? "The log has no entry of this time that meets the conditions."
-          : `No entry that was read meets the conditions. ${reachText(this.answer)}`)));
+      fill(
+        this.result,
+        h(
+          "div",
+          { className: "panel" },
+          empty(
+            "No entries",
+            truncated
+              ? `None of the newest ${most} entries of this period meets the conditions; ` +
+                  "a report reads no more than that. Choose a shorter period."
+              : complete
+                ? "The log has no entries in this period that meet the conditions."
+                : `None of the entries read meets the conditions. ${reachText(this.answer)}`,
+          ),
+        ),
+      );
       return;
     }
     const all = h("input", { type: "checkbox", onchange: () => this.#drawTable(all.checked) });
-    this.holder = h("div", { className: "panel flush", tabIndex: 0, role: "region", "aria-label": "Entries" });
-    fill(this.result,
-      h("div", { className: "head" }, h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
-        truncated && h("p", { className: "why warn" }, `Only the newest ${most} entries of the time were read. Choose a shorter time for the rest.`),
+    this.holder = h("div", {
+      className: "panel flush",
+      tabIndex: 0,
+      role: "region",
+      "aria-label": "Entries",
+    });
+    fill(
+      this.result,
+      h(
+        "div",
+        { className: "head" },
+        h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
+        truncated &&
+          h(
+            "p",
+            { className: "why warn" },
+            `Only the newest ${most} entries of the period were read. ` +
+              "Choose a shorter period for the rest.",
+          ),
         !truncated && !complete && h("p", { className: "why warn" }, reachText(this.answer)),
-        h("div", { className: "push" }, h("label", { className: "check" }, all, "All columns"),
-          button("CSV", () => this.#download("csv", "text/csv", this.#csv()), { "aria-label": "Download as CSV" }),
-          button("JSON", () => this.#download("json", "application/json", `${visible(JSON.stringify(this.answer.rows, null, 2))}\n`), { "aria-label": "Download as JSON" }))),
-      this.holder);
+        h(
+          "div",
+          { className: "push" },
+          h("label", { className: "check" }, all, "All columns"),
+          button("CSV", () => this.#download("csv", "text/csv", this.#csv()), {
+            "aria-label": "Download as CSV",
+          }),
+          button(
+            "JSON",
+            () =>
+              this.#download(
+                "json",
+                "application/json",
+                `${visible(JSON.stringify(this.answer.rows, null, 2))}\n`,
+              ),
+            { "aria-label": "Download as JSON" },
+          ),
+        ),
+      ),
+      this.holder,
+    );
     this.#drawTable(false);
   }
 
   #drawTable(isWhole) {
     const { rows } = this.answer;
-    const shown = isWhole ? Object.keys(rows[0]).map((name) => [name, name])
+    const shown = isWhole
+      ? Object.keys(rows[0]).map((name) => [name, name])
       : MAIN.filter(([name]) => rows.some((row) => row[name] !== ""));
     const sorted = this.sort ? [...rows].sort((a, b) => this.#compare(a, b)) : rows;
     const head = shown.map(([name, label]) => {
       const isSorted = this.sort?.name === name;
-      return h("th", { scope: "col", className: name.endsWith("DESC") ? "" : "fit", role: "columnheader", "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none" },
-        button(`${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`, () => {
-          this.sort = { name, up: isSorted ? !this.sort.up : true };
-          this.#drawTable(isWhole);
-          this.holder.querySelector(`[data-name="${name}"]`).focus();
-        }, { "data-name": name }));
+      return h(
+        "th",
+        {
+          scope: "col",
+          className: name.endsWith("DESC") ? "" : "fit",
+          role: "columnheader",
+          "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none",
+        },
+        button(
+          `${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`,
+          () => {
+            this.sort = { name, up: isSorted ? !this.sort.up : true };
+            this.#drawTable(isWhole);
+            this.holder.querySelector(`[data-name="${name}"]`).focus();
+          },
+          { "data-name": name },
+        ),
+      );
     });
-    fill(this.holder, h("table", { role: "table", className: isWhole ? "" : "cards sortable" }, h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
-      h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
-      h("tbody", { role: "rowgroup" }, sorted.map((row) => h("tr", { role: "row" }, shown.map(([name, label]) =>
-        h("td", { role: "cell", "data-label": label, className: name.endsWith("DESC") ? "wide break" : name === "ENTRYTIME" ? "fit whole" : "fit" }, name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]))))))));
+    fill(
+      this.holder,
+      h(
+        "table",
+        { role: "table", className: isWhole ? "" : "cards sortable" },
+        h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
+        h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
+        h(
+          "tbody",
+          { role: "rowgroup" },
+          sorted.map((row) =>
+            h(
+              "tr",
+              { role: "row" },
+              shown.map(([name, label]) =>
+                h(
+                  "td",
+                  {
+                    role: "cell",
+                    "data-label": label,
+                    className: name.endsWith("DESC")
+                      ? "wide break"
+                      : name === "ENTRYTIME"
+                        ? "fit whole"
+                        : "fit",
+                  },
+                  name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]),
+                ),
+              ),
+            ),
+          ),
+        ),
+      ),
+    );
   }
 
   #compare(a, b) {
     const { name, up } = this.sort;
-    const order = typeof a[name] === "number" ? a[name] - b[name] : a[name] < b[name] ? -1 : a[name] > b[name] ? 1 : 0;
+    const order =
+      typeof a[name] === "number"
+        ? a[name] - b[name]
+        : a[name] < b[name]
+          ? -1
+          : a[name] > b[name]
+            ? 1
+            : 0;
     return up ? order : -order;
   }
 
@@ -188,7 +390,9 @@ class ReportPage {
       return /[",\r\n]/.test(safe) ? `"${safe.replaceAll('"', '""')}"` : safe;
     };
     const names = Object.keys(this.answer.rows[0]);
-    return [names, ...this.answer.rows.map((row) => names.map((name) => row[name]))].map((row) => `${row.map(cell).join(",")}\r\n`).join("");
+    return [names, ...this.answer.rows.map((row) => names.map((name) => row[name]))]
+      .map((row) => `${row.map(cell).join(",")}\r\n`)
+      .join("");
   }
 
   #download(ending, type, text) {

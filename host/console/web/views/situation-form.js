@@ -7,9 +7,22 @@ import { COMPARISONS, SEVERITIES } from "../format.js";
 import { explainPanel, previewPanel } from "../situation-tools.js";
 import { notThere } from "./situations.js";
 
-const BLANK = { name: "", text: "", severity: "warning", log: null, when: [], frequency: null, period: null };
+const BLANK = {
+  name: "",
+  text: "",
+  severity: "warning",
+  log: null,
+  when: [],
+  frequency: null,
+  period: null,
+};
 const ANY = "*"; // no log has this path
-const UNITS = [["s", "seconds"], ["m", "minutes"], ["h", "hours"], ["d", "days"]];
+const UNITS = [
+  ["s", "seconds"],
+  ["m", "minutes"],
+  ["h", "hours"],
+  ["d", "days"],
+];
 
 export async function show(element, name, query) {
   const given = async () => {
@@ -20,7 +33,11 @@ export async function show(element, name, query) {
       throw error;
     }
   };
-  const [situation, { logs }, { columns }] = await Promise.all([given(), get("/api/v1/logs"), get("/api/v1/columns")]);
+  const [situation, { logs }, { columns }] = await Promise.all([
+    given(),
+    get("/api/v1/logs"),
+    get("/api/v1/columns"),
+  ]);
   if (!situation) {
     fill(element, notThere(name));
     return;
@@ -34,44 +51,129 @@ class Form {
     const changed = () => this.changed();
     if (situation.log && !logs.includes(situation.log)) logs.unshift(situation.log);
     this.fields = {
-      name: field("Name", h("input", { value: situation.name, required: true, disabled: Boolean(name), autocomplete: "off", oninput: changed }), name ? "" : "Short, and not used yet, for example ssh-bruteforce"),
-      text: field("Text", h("input", { value: situation.text, autocomplete: "off", oninput: changed }), "What people read when it is raised"),
+      name: field(
+        "Name",
+        h("input", {
+          value: situation.name,
+          required: true,
+          disabled: Boolean(name),
+          autocomplete: "off",
+          oninput: changed,
+        }),
+        name ? "" : "Short, and not used yet, for example ssh-bruteforce",
+      ),
+      text: field(
+        "Text",
+        h("input", { value: situation.text, autocomplete: "off", oninput: changed }),
+        "Shown to people when it is raised",
+      ),
       severity: field("Severity", select(SEVERITIES, situation.severity, { onchange: changed })),
-      log: field("Log", select([["", "Choose a log"], ...logs, [ANY, "Any log"]], situation.log || (name ? ANY : ""), { onchange: changed })),
+      log: field(
+        "Log",
+        select(
+          [["", "Choose a log"], ...logs, [ANY, "Any log"]],
+          situation.log || (name ? ANY : ""),
+          { onchange: changed },
+        ),
+      ),
     };
     this.conditions = new Conditions(columns, situation.when, changed);
     this.repeats = this.#repeats(situation, changed);
     this.preview = previewPanel(() => ({ definition: this.definition }));
-    this.explain = explainPanel(() => ({ definition: this.definition }), () => (this.fields.log.control.value ? this.definition.log : undefined));
+    this.explain = explainPanel(
+      () => ({ definition: this.definition }),
+      () => (this.fields.log.control.value ? this.definition.log : undefined),
+    );
     this.problem = h("p", { className: "problem", role: "alert" });
     this.save = h("button", { className: "primary" }, name ? "Save changes" : "Create situation");
-    fill(element, h("div", { className: "head" }, h("h1", {}, name ? `Edit ${name}` : "New situation")),
-      h("div", { className: "split" },
-        h("form", { className: "panel", noValidate: true, onsubmit: (event) => { event.preventDefault(); this.#save(); } },
-          h("div", { className: "fields" }, this.fields.name, this.fields.text), h("div", { className: "fields" }, this.fields.log, this.fields.severity),
-          this.conditions.element, this.repeats.element, this.problem,
-          h("p", { className: "actions" }, this.save, h("a", { className: "button", href: "#/situations" }, "Cancel"))),
-        h("div", { className: "stack" }, this.preview.element, this.explain.element)));
+    fill(
+      element,
+      h("div", { className: "head" }, h("h1", {}, name ? `Edit ${name}` : "New situation")),
+      h(
+        "div",
+        { className: "split" },
+        h(
+          "form",
+          {
+            className: "panel",
+            noValidate: true,
+            onsubmit: (event) => {
+              event.preventDefault();
+              this.#save();
+            },
+          },
+          h("div", { className: "fields" }, this.fields.name, this.fields.text),
+          h("div", { className: "fields" }, this.fields.log, this.fields.severity),
+          this.conditions.element,
+          this.repeats.element,
+          this.problem,
+          h(
+            "p",
+            { className: "actions" },
+            this.save,
+            h("a", { className: "button", href: "#/situations" }, "Cancel"),
+          ),
+        ),
+        h("div", { className: "stack" }, this.preview.element, this.explain.element),
+      ),
+    );
     this.check = debounce(() => this.#validate(), 350);
     this.#validate();
   }
 
   #repeats(situation, changed) {
-    const [, operator, count] = /^\s*(\S+)\s+(\d+)/.exec(situation.frequency || "") || [null, ">=", "5"];
+    const [, operator, count] = /^\s*(\S+)\s+(\d+)/.exec(situation.frequency || "") || [
+      null,
+      ">=",
+      "5",
+    ];
     const [, length, unit] = /^(\d+)\s*([smhd])/.exec(situation.period || "") || [null, "60", "s"];
-    const isOn = h("input", { type: "checkbox", checked: Boolean(situation.frequency), onchange: () => { draw(); changed(); } });
+    const isOn = h("input", {
+      type: "checkbox",
+      checked: Boolean(situation.frequency),
+      onchange: () => {
+        draw();
+        changed();
+      },
+    });
     const compare = select(COMPARISONS, operator, { "aria-label": "How often", onchange: changed });
-    const times = h("input", { type: "number", min: 0, value: count, "aria-label": "Times", oninput: changed });
-    const period = h("input", { type: "number", min: 1, value: length, "aria-label": "Period", oninput: changed });
+    const times = h("input", {
+      type: "number",
+      min: 0,
+      value: count,
+      "aria-label": "Times",
+      oninput: changed,
+    });
+    const period = h("input", {
+      type: "number",
+      min: 1,
+      value: length,
+      "aria-label": "Period",
+      oninput: changed,
+    });
     const units = select(UNITS, unit, { "aria-label": "Unit of the period", onchange: changed });
     const more = h("div", { className: "inline" }, compare, times, "times within", period, units);
     const problem = h("p", { className: "problem", hidden: true });
-    const draw = () => { more.hidden = !isOn.checked; };
+    const draw = () => {
+      more.hidden = !isOn.checked;
+    };
     draw();
     return {
-      element: h("fieldset", {}, h("legend", {}, "Frequency"), h("label", { className: "check" }, isOn, "Raise only by how often such entries come"), more, problem),
+      element: h(
+        "fieldset",
+        {},
+        h("legend", {}, "Frequency"),
+        h("label", { className: "check" }, isOn, "Raise depending on how often such entries come"),
+        more,
+        problem,
+      ),
       get value() {
-        return isOn.checked ? { frequency: `${compare.value} ${times.value}`, period: `${period.value}${units.value}` } : { frequency: null, period: null };
+        return isOn.checked
+          ? {
+              frequency: `${compare.value} ${times.value}`,
+              period: `${period.value}${units.value}`,
+            }
+          : { frequency: null, period: null };
       },
       setProblem(text) {
         problem.textContent = text;
@@ -82,7 +184,14 @@ class Form {
 
   get definition() {
     const { name, text, severity, log } = this.fields;
-    return { name: name.control.value.trim(), text: text.control.value, severity: severity.control.value, log: [ANY, ""].includes(log.control.value) ? null : log.control.value, when: this.conditions.texts, ...this.repeats.value };
+    return {
+      name: name.control.value.trim(),
+      text: text.control.value,
+      severity: severity.control.value,
+      log: [ANY, ""].includes(log.control.value) ? null : log.control.value,
+      when: this.conditions.texts,
+      ...this.repeats.value,
+    };
   }
 
   changed() {
@@ -108,7 +217,8 @@ class Form {
       const { problems } = await post("/api/v1/situations/validate", body);
       const ours = problems.filter((problem) => !(this.name && problem.field === "name"));
       this.#show(ours);
-      if (ours.length > 0) this.preview.clear("Mend what is marked to see what it would have done.");
+      if (ours.length > 0)
+        this.preview.clear("Correct what is marked to see what it would have done.");
       else this.preview.update();
       return ours.length === 0;
     } catch (error) {

@@ -1,4 +1,4 @@
-// One situation: what it says, its counts, what it would have done, and why it takes an entry or not.
+// One situation: its definition, its counts, a backtest, and why it matches an entry or not.
 
 import { get, situationPath, withQuery } from "../api.js";
 import { failure, fill, h, loading } from "../dom.js";
@@ -30,14 +30,33 @@ class SituationPage {
     try {
       this.situation = await get(situationPath(this.name));
     } catch (error) {
-      fill(this.element, error.status === 404 ? notThere(this.name) : failure(error, () => this.load()));
+      fill(
+        this.element,
+        error.status === 404 ? notThere(this.name) : failure(error, () => this.load()),
+      );
       return;
     }
     const preview = previewPanel(() => ({ situation: this.name }));
     this.#draw();
-    fill(this.element, h("div", { className: "head" }, h("h1", {}, this.name), this.state, this.actions), this.note,
-      h("div", { className: "split" }, this.definition,
-        h("div", { className: "stack" }, preview.element, explainPanel(() => ({ situation: this.name }), () => this.situation.log).element)));
+    fill(
+      this.element,
+      h("div", { className: "head" }, h("h1", {}, this.name), this.state, this.actions),
+      this.note,
+      h(
+        "div",
+        { className: "split" },
+        this.definition,
+        h(
+          "div",
+          { className: "stack" },
+          preview.element,
+          explainPanel(
+            () => ({ situation: this.name }),
+            () => this.situation.log,
+          ).element,
+        ),
+      ),
+    );
     preview.update();
   }
 
@@ -47,7 +66,8 @@ class SituationPage {
     try {
       this.situation = await get(situationPath(this.name));
     } catch (error) {
-      if (error.status === 404) fill(this.note, h("p", { className: "problem" }, "This situation is no longer there."));
+      if (error.status === 404)
+        fill(this.note, h("p", { className: "problem" }, "This situation no longer exists."));
       return;
     }
     this.#draw();
@@ -58,10 +78,22 @@ class SituationPage {
     this.state.className = `state ${level}`;
     this.state.textContent = state;
     fill(this.definition, definition(this.situation));
-    if (this.drawnFor === state) return; // whoever stands on a button stays there
-    const focused = this.actions.contains(document.activeElement) ? document.activeElement.dataset.key : null;
+    if (this.drawnFor === state) return; // a button that has the focus keeps it
+    const focused = this.actions.contains(document.activeElement)
+      ? document.activeElement.dataset.key
+      : null;
     this.drawnFor = state;
-    fill(this.actions, actions(this.situation, (action) => this.#act(action), () => { location.hash = "#/situations"; }), h("a", { className: "button", href: "#/situations" }, "All situations"));
+    fill(
+      this.actions,
+      actions(
+        this.situation,
+        (action) => this.#act(action),
+        () => {
+          location.hash = "#/situations";
+        },
+      ),
+      h("a", { className: "button", href: "#/situations" }, "All situations"),
+    );
     if (focused) this.actions.querySelector(`[data-key="${CSS.escape(focused)}"]`)?.focus();
   }
 
@@ -80,14 +112,49 @@ class SituationPage {
 function definition(situation) {
   const { counts } = situation;
   const pairs = [
-    ["Text", situation.text || "–"], ["Severity", h("span", { className: `severity ${situation.severity}` }, situation.severity)], ["Log", situation.log || "any log"],
-    ["Conditions", situation.when.length > 0 ? situation.when.map((text) => h("div", {}, h("code", {}, text))) : "none: every entry"],
-    ["Frequency", situation.frequency ? `raised by ${frequencyText(situation.frequency, situation.period)}` : "every match is raised"],
-    ["Comes from", situation.source === "file" ? "the configuration file; it is changed there" : "this console or the API"],
-    ["Entries judged", number(counts.offered)], ["Matched", number(counts.matched)], ["Held back", `${number(counts.discarded)} by the frequency`], ["Raised", `${number(counts.raised)} since the agent's start`],
-    ["Last raised", situation.last_raised ? `${time(situation.last_raised)} (${ago(situation.last_raised)})` : "never"],
+    ["Text", situation.text || "–"],
+    ["Severity", h("span", { className: `severity ${situation.severity}` }, situation.severity)],
+    ["Log", situation.log || "any log"],
+    [
+      "Conditions",
+      situation.when.length > 0
+        ? situation.when.map((text) => h("div", {}, h("code", {}, text)))
+        : "none: every entry",
+    ],
+    [
+      "Frequency",
+      situation.frequency
+        ? `raised by ${frequencyText(situation.frequency, situation.period)}`
+        : "every match is raised",
+    ],
+    [
+      "Comes from",
+      situation.source === "file"
+        ? "the configuration file; change it there"
+        : "this console or the API",
+    ],
+    ["Entries judged", number(counts.offered)],
+    ["Matched", number(counts.matched)],
+    ["Held back", `${number(counts.discarded)} by the frequency`],
+    ["Raised", `${number(counts.raised)} since the agent's start`],
+    [
+      "Last raised",
+      situation.last_raised
+        ? `${time(situation.last_raised)} (${ago(situation.last_raised)})`
+        : "never",
+    ],
   ];
-  return [situation.problem && h("p", { className: "problem" }, situation.problem),
-    h("dl", { className: "pairs" }, pairs.map(([key, value]) => [h("dt", {}, key), h("dd", {}, value)])),
-    h("p", {}, h("a", { href: withQuery("#/events", { situation: situation.name }) }, "Its events"))];
+  return [
+    situation.problem && h("p", { className: "problem" }, situation.problem),
+    h(
+      "dl",
+      { className: "pairs" },
+      pairs.map(([key, value]) => [h("dt", {}, key), h("dd", {}, value)]),
+    ),
+    h(
+      "p",
+      {},
+      h("a", { href: withQuery("#/events", { situation: situation.name }) }, "Its events"),
+    ),
+  ];
 }

@@ -4,9 +4,20 @@ import { get, post } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, select, table } from "../dom.js";
 import { plural, stamp } from "../format.js";
 
-const START = 'A , "%d-%d-%d %d:%d:%d %s %64[^:]: %256[^\\n]" , year month day hour minute second type source description';
-const SAMPLE = "2026-11-20 07:03:09 ERROR payment: Card declined for order 4711\n2026-11-20 07:03:10 INFO web: Request served";
-const COLUMNS = [["ENTRYTIME", "Time"], ["ENTRYSYS", "System"], ["ENTRYSRC", "Source"], ["ENTRYTYPE", "Type"], ["ENTRYCLASS", "Class"], ["ENTRYDESC", "Description"]];
+const START =
+  'A , "%d-%d-%d %d:%d:%d %s %64[^:]: %256[^\\n]" , ' +
+  "year month day hour minute second type source description";
+const SAMPLE =
+  "2026-11-20 07:03:09 ERROR payment: Card declined for order 4711\n" +
+  "2026-11-20 07:03:10 INFO web: Request served";
+const COLUMNS = [
+  ["ENTRYTIME", "Time"],
+  ["ENTRYSYS", "System"],
+  ["ENTRYSRC", "Source"],
+  ["ENTRYTYPE", "Type"],
+  ["ENTRYCLASS", "Class"],
+  ["ENTRYDESC", "Description"],
+];
 // The parts of the time share a colour; the other fields have one each.
 const COLOURS = { system: "f1", source: "f2", type: "f3", class: "f4", description: "f5" };
 const MOST_LINES = 200;
@@ -20,35 +31,74 @@ class TryPage {
   constructor(element, logs, log) {
     const known = logs.find((one) => one.log === log);
     const again = debounce(() => this.#try(), 250);
-    this.format = field("Format", h("textarea", { rows: 3, spellcheck: false, value: known?.row.LOGTYPE === "U" ? known.row.FORMATTER : START, oninput: again }),
-      'A , "the layout of a line with a directive for each part" , a name for each directive. %d is a number, %s a word, %[^:] a text up to a colon, %[^\\n] the rest; %*s is read and forgotten.');
-    this.lines = field("Lines", h("textarea", { rows: 6, spellcheck: false, wrap: "off", value: log ? "" : SAMPLE, oninput: again }), "One entry per line, as in the log.");
+    this.format = field(
+      "Format",
+      h("textarea", {
+        rows: 3,
+        spellcheck: false,
+        value: known?.row.LOGTYPE === "U" ? known.row.FORMATTER : START,
+        oninput: again,
+      }),
+      'A , "the layout of a line with a directive for each part" , a name for each directive. ' +
+        "%d is a number, %s a word, %[^:] text up to a colon, %[^\\n] the rest; %*s is skipped.",
+    );
+    this.lines = field(
+      "Lines",
+      h("textarea", {
+        rows: 6,
+        spellcheck: false,
+        wrap: "off",
+        value: log ? "" : SAMPLE,
+        oninput: again,
+      }),
+      "One entry per line, as in the log.",
+    );
     this.log = select(logs.map((one) => one.log).sort(), log || undefined, { "aria-label": "Log" });
     this.count = select(["10", "50", "200"], "50", { "aria-label": "How many lines" });
     this.result = h("div", { className: "stack", role: "region", "aria-label": "Result" });
-    fill(element, h("div", { className: "head" }, h("h1", {}, "Try a format")),
-      h("div", { className: "panel" }, this.format, this.lines,
-        logs.length > 0 && h("div", { className: "inline" }, h("span", { className: "quiet" }, "or take the last"), this.count, h("span", { className: "quiet" }, "lines of"), this.log,
-          button("Take them", () => this.#take()))),
-      this.result);
+    fill(
+      element,
+      h("div", { className: "head" }, h("h1", {}, "Try a format")),
+      h(
+        "div",
+        { className: "panel" },
+        this.format,
+        this.lines,
+        logs.length > 0 &&
+          h(
+            "div",
+            { className: "inline" },
+            h("span", { className: "quiet" }, "or take the last"),
+            this.count,
+            h("span", { className: "quiet" }, "lines of"),
+            this.log,
+            button("Take them", () => this.#take()),
+          ),
+      ),
+      this.result,
+    );
     if (log) this.#take();
     else this.#try();
   }
 
-  /** A try with the lines from before would come late, and wrong; one asked for meanwhile follows. */
+  /** A try with the previous lines would be wrong by now; one asked for meanwhile follows. */
   async #take() {
     this.isTaking = true;
     this.abort?.abort();
     this.lines.setProblem("");
     try {
-      const answer = await post("/api/v1/try", { format: this.format.control.value, log: this.log.value, last: Number(this.count.value) });
+      const answer = await post("/api/v1/try", {
+        format: this.format.control.value,
+        log: this.log.value,
+        last: Number(this.count.value),
+      });
       if (answer.lines.length === 0 && !answer.accepted) {
         this.#draw(answer);
         return;
       }
       this.lines.control.value = answer.lines.map((one) => one.line).join("\n");
       this.takenFrom = this.log.value;
-      this.lines.setProblem(answer.lines.length === 0 ? "This log holds no lines yet." : "");
+      this.lines.setProblem(answer.lines.length === 0 ? "This log has no lines yet." : "");
       this.#draw(answer);
     } catch (error) {
       this.lines.setProblem(error.message);
@@ -62,30 +112,63 @@ class TryPage {
   async #try() {
     this.isAsked = this.isTaking;
     if (this.isTaking) return;
-    const lines = this.lines.control.value.split("\n").filter((line) => line !== "").slice(0, MOST_LINES);
+    const lines = this.lines.control.value
+      .split("\n")
+      .filter((line) => line !== "")
+      .slice(0, MOST_LINES);
     const format = this.format.control.value.trim();
     this.abort?.abort();
     this.abort = new AbortController();
     if (!format || lines.length === 0) {
-      fill(this.result, h("div", { className: "panel" }, empty("Nothing to try", "Type a format, and paste lines or take them from a log.")));
+      fill(
+        this.result,
+        h(
+          "div",
+          { className: "panel" },
+          empty("Nothing to try", "Type a format, and paste lines or take them from a log."),
+        ),
+      );
       return;
     }
     try {
       this.#draw(await post("/api/v1/try", { format, lines }, this.abort.signal));
     } catch (error) {
-      if (error.name !== "AbortError") fill(this.result, h("div", { className: "panel" }, failure(error, () => this.#try())));
+      if (error.name !== "AbortError")
+        fill(
+          this.result,
+          h(
+            "div",
+            { className: "panel" },
+            failure(error, () => this.#try()),
+          ),
+        );
     }
   }
 
   #draw(answer) {
     this.format.setProblem(answer.accepted ? "" : `The format cannot be used: ${answer.reason}`);
     if (!answer.accepted) {
-      fill(this.result, h("section", { className: "panel" }, h("h2", {}, "Where the format stops"), markedAt(this.format.control.value, answer.position)));
+      fill(
+        this.result,
+        h(
+          "section",
+          { className: "panel" },
+          h("h2", {}, "Where the format stops"),
+          markedAt(this.format.control.value, answer.position),
+        ),
+      );
       return;
     }
     const names = fieldNames(answer.directives);
     if (answer.lines.length === 0) fill(this.result, this.#configuration(answer));
-    else fill(this.result, coverage(answer.coverage, names), linesPanel(answer, names), columnsPanel(answer), this.#configuration(answer));
+    else
+      fill(
+        this.result,
+        coverage(answer.coverage, names),
+        linesPanel(answer, names),
+        columnsPanel(answer),
+        this.#configuration(answer),
+      );
   }
 
   #configuration(answer) {
@@ -93,18 +176,40 @@ class TryPage {
     const path = this.takenFrom || "/path/to/the.log";
     const text = answer.configuration_line.replace(/^\S+/, path);
     const said = h("span", { role: "status", className: "hint" });
-    const code = h("pre", { className: "copyable", tabIndex: 0, "aria-label": "Configuration line" }, text);
-    return h("section", { className: "panel" }, h("h2", {}, "Line for the agent's configuration"), code,
-      h("p", { className: "actions" }, button("Copy", async () => {
-        try {
-          await navigator.clipboard.writeText(text);
-          said.textContent = "Copied.";
-        } catch {
-          getSelection().selectAllChildren(code);
-          said.textContent = "Selected; copy it with the keyboard.";
-        }
-      }), said, h("span", { className: "hint" }, this.takenFrom ? "Put it into the file of log_config in place of the log's present line, then re-read the configuration under Logs."
-        : "Put the log's own path in front, and the line into the file of log_config; then re-read the configuration under Logs.")));
+    const code = h(
+      "pre",
+      { className: "copyable", tabIndex: 0, "aria-label": "Configuration line" },
+      text,
+    );
+    return h(
+      "section",
+      { className: "panel" },
+      h("h2", {}, "Line for the agent's configuration"),
+      code,
+      h(
+        "p",
+        { className: "actions" },
+        button("Copy", async () => {
+          try {
+            await navigator.clipboard.writeText(text);
+            said.textContent = "Copied.";
+          } catch {
+            getSelection().selectAllChildren(code);
+            said.textContent = "Selected; copy it with the keyboard.";
+          }
+        }),
+        said,
+        h(
+          "span",
+          { className: "hint" },
+          this.takenFrom
+            ? "Put it in the log configuration in place of the log's current line, then press " +
+                "“Re-read configuration” under Logs."
+            : "Put the log's own path in front, add the line to the log configuration, then " +
+                "press “Re-read configuration” under Logs.",
+        ),
+      ),
+    );
   }
 }
 
@@ -112,7 +217,12 @@ class TryPage {
 function markedAt(text, position) {
   const at = new Offsets(text);
   if (position === null || position === undefined) return h("pre", {}, text);
-  return h("pre", {}, at.slice(0, position), h("mark", { className: "stop" }, at.slice(position) || " "));
+  return h(
+    "pre",
+    {},
+    at.slice(0, position),
+    h("mark", { className: "stop" }, at.slice(position) || " "),
+  );
 }
 
 /** Byte offsets of a text in UTF-8, which is what the agent counts. */
@@ -135,15 +245,44 @@ function colourOf(names, name) {
 function coverage({ lines, matched, percent }, names) {
   const bar = h("span", {});
   bar.style.width = `${percent}%`;
-  return h("section", { className: "panel" },
-    h("p", { className: "verdict", role: "status" }, `${percent} % of the lines fit`), h("div", { className: `meter ${matched < lines ? "low" : ""}`, "aria-hidden": "true" }, bar),
+  return h(
+    "section",
+    { className: "panel" },
+    h("p", { className: "verdict", role: "status" }, `${percent}% of the lines fit`),
+    h("div", { className: `meter ${matched < lines ? "low" : ""}`, "aria-hidden": "true" }, bar),
     h("p", { className: "quiet" }, `${matched} of ${plural(lines, "line")}`),
-    h("div", { className: "legend", "aria-label": "Fields", role: "group" }, names.map((name) => h("span", { className: `swatch ${colourOf(names, name)}` }, name))));
+    h(
+      "div",
+      { className: "legend", "aria-label": "Fields", role: "group" },
+      names.map((name) => h("span", { className: `swatch ${colourOf(names, name)}` }, name)),
+    ),
+  );
 }
 
 function linesPanel(answer, names) {
-  return h("section", { className: "panel flush" }, h("h2", {}, "Lines"), h("ul", { className: "lines" }, answer.lines.map((one) => h("li", {}, coloured(one, names),
-    !one.matched && h("p", { className: "why bad" }, one.failed_at === null ? "" : `Stops at column ${one.failed_at + 1}: `, one.reason)))));
+  return h(
+    "section",
+    { className: "panel flush" },
+    h("h2", {}, "Lines"),
+    h(
+      "ul",
+      { className: "lines" },
+      answer.lines.map((one) =>
+        h(
+          "li",
+          {},
+          coloured(one, names),
+          !one.matched &&
+            h(
+              "p",
+              { className: "why bad" },
+              one.failed_at === null ? "" : `Stops at column ${one.failed_at + 1}: `,
+              one.reason,
+            ),
+        ),
+      ),
+    ),
+  );
 }
 
 /** A line with its fields marked in place, and the place where it stops fitting. */
@@ -153,21 +292,54 @@ function coloured(one, names) {
   let done = 0;
   for (const { from, to, name } of [...one.fields].sort((a, b) => a.from - b.from)) {
     if (from < done) continue;
-    parts.push(at.slice(done, from), h("mark", { className: colourOf(names, name), title: name || "read and forgotten" }, at.slice(from, to)));
+    parts.push(
+      at.slice(done, from),
+      h("mark", { className: colourOf(names, name), title: name || "skipped" }, at.slice(from, to)),
+    );
     done = to;
   }
   if (one.matched || one.failed_at === null) parts.push(at.slice(done));
   else {
     const stop = Math.max(done, one.failed_at);
-    parts.push(at.slice(done, stop), h("mark", { className: "stop", title: "Here it stops fitting" }, at.slice(stop) || " (line ends)"));
+    parts.push(
+      at.slice(done, stop),
+      h(
+        "mark",
+        { className: "stop", title: "The line stops fitting here" },
+        at.slice(stop) || " (line ends)",
+      ),
+    );
   }
   return h("pre", {}, parts);
 }
 
 function columnsPanel(answer) {
-  const rows = answer.lines.filter((one) => one.row).slice(0, 20).map((one) => one.row);
+  const rows = answer.lines
+    .filter((one) => one.row)
+    .slice(0, 20)
+    .map((one) => one.row);
   if (rows.length === 0) return null;
-  const columns = COLUMNS.map(([, label]) => ({ label, className: label === "Description" ? "wide break" : label === "Time" ? "fit whole" : "fit" }));
-  return h("section", { className: "panel flush" }, h("h2", {}, rows.length < answer.coverage.matched ? `Columns that result, the first ${rows.length}` : "Columns that result"),
-    table("Columns that result", columns, rows.map((row) => COLUMNS.map(([name]) => (name === "ENTRYTIME" ? stamp(row[name]) : row[name] || "–"))), { className: "cards" }));
+  const columns = COLUMNS.map(([, label]) => ({
+    label,
+    className: label === "Description" ? "wide break" : label === "Time" ? "fit whole" : "fit",
+  }));
+  return h(
+    "section",
+    { className: "panel flush" },
+    h(
+      "h2",
+      {},
+      rows.length < answer.coverage.matched
+        ? `Resulting columns of the first ${rows.length} lines`
+        : "Resulting columns",
+    ),
+    table(
+      "Resulting columns",
+      columns,
+      rows.map((row) =>
+        COLUMNS.map(([name]) => (name === "ENTRYTIME" ? stamp(row[name]) : row[name] || "–")),
+      ),
+      { className: "cards" },
+    ),
+  );
 }
