@@ -59,6 +59,10 @@ bool JsonlSink::open() {
         m_error = m_path + " is a symbolic link, which is not followed; name the file itself";
         return trace.result(false);
     }
+    if (m_fd == -1 && errno == ENXIO) {
+        m_error = "no process reads " + m_path + "; start its reader";
+        return trace.result(false);
+    }
     if (m_fd == -1) {
         fail("open", errno);
         return trace.result(false);
