@@ -72,7 +72,7 @@ def test_a_loud_situation_does_not_hide_the_others(page, agent):
     until(lambda: len(agent.events()) == 31, "the events")
     page.on(agent)
     page.wait_text("× 30")
-    lately = page.find("//section[@aria-label='Raised lately']")
+    lately = page.find("//section[@aria-label='Recent events']")
     rows = [row.text for row in lately.find_elements("css selector", "li")]
     assert len(rows) == 2 and "number 29" in rows[0] and "ssh-failed" in rows[1]
 

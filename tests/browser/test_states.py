@@ -299,7 +299,7 @@ def test_long_paths_wrap_on_a_narrow_screen(page, agent):
     log.append(app_entry("declined"))
     until(agent.events, "the event")
     page.on(agent)
-    views = {"logs": "Raised lately", "situations": "declined", "situations?name=declined": "Its events", "reports": "Run the report", "try": "of the lines fit"}
+    views = {"logs": "Recent events", "situations": "declined", "situations?name=declined": "Events of this situation", "reports": "Run the report", "try": "of the lines fit"}
     views[f"logs?log={quote(str(log))}"] = "Monitored since"
     for view, text in views.items():
         page.open(view)
@@ -389,7 +389,7 @@ def test_events_begin_anew_with_a_new_history(page, agent, fast_polls):
 def test_a_new_token_is_asked_for_and_the_view_goes_on(page, agent, fast_polls):
     logs = logs_agent(agent)
     page.on(agent, "situations?name=ssh-failed")
-    page.wait_text("Its events")
+    page.wait_text("Events of this situation")
     page.lose(agent)
     token = agent.directory / "state/api-token"
     token.unlink()
@@ -399,5 +399,5 @@ def test_a_new_token_is_asked_for_and_the_view_goes_on(page, agent, fast_polls):
     page.type("API token", token.read_text().strip())
     page.click("Open the console")
     page.heading("ssh-failed")
-    page.wait_text("Its events")
+    page.wait_text("Events of this situation")
     page.expect_complaints()

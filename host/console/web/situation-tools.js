@@ -121,7 +121,7 @@ export function explainPanel(subject, log) {
   const element = h(
     "section",
     { className: "panel", "aria-label": "Explain" },
-    h("h2", {}, "What would it make of a line?"),
+    h("h2", {}, "Try a line"),
     which,
     row,
     h(

@@ -65,7 +65,7 @@ class LogsPage {
     this.cure = h("p", { className: "hint" });
     this.trouble = h("div", { role: "alert" });
     this.list = h("section", { className: "panel flush", "aria-label": "Logs" }, loading());
-    this.lately = h("section", { className: "panel flush", "aria-label": "Raised lately" });
+    this.lately = h("section", { className: "panel flush", "aria-label": "Recent events" });
     fill(
       element,
       h(
@@ -192,7 +192,7 @@ class LogsPage {
     } catch (error) {
       fill(
         this.lately,
-        h("h2", {}, "Raised lately"),
+        h("h2", {}, "Recent events"),
         h(
           "p",
           { className: "loading" },
@@ -216,7 +216,7 @@ class LogsPage {
     const shown = [...bySituation.values()].slice(0, MOST_RAISED);
     fill(
       this.lately,
-      h("h2", {}, "Raised lately"),
+      h("h2", {}, "Recent events"),
       shown.length === 0
         ? h(
             "p",

@@ -154,7 +154,7 @@ function definition(situation) {
     h(
       "p",
       {},
-      h("a", { href: withQuery("#/events", { situation: situation.name }) }, "Its events"),
+      h("a", { href: withQuery("#/events", { situation: situation.name }) }, "Events of this situation"),
     ),
   ];
 }
