@@ -154,7 +154,11 @@ function definition(situation) {
     h(
       "p",
       {},
-      h("a", { href: withQuery("#/events", { situation: situation.name }) }, "Events of this situation"),
+      h(
+        "a",
+        { href: withQuery("#/events", { situation: situation.name }) },
+        "Events of this situation",
+      ),
     ),
   ];
 }
