@@ -41,7 +41,7 @@ class EventsPage {
     this.severity = select([["", "All severities"], ...SEVERITIES], "", { onchange: again });
     this.text = h("input", {
       type: "search",
-      placeholder: "anywhere in the event",
+      placeholder: "any text",
       maxLength: 80,
       value: this.wanted.text,
       oninput: debounce(again, 300),
