@@ -39,14 +39,17 @@ void BrevanTime::generateTimestamp(long time, char* out) {
     std::memcpy(out, text, stampLength);
 }
 
+bool BrevanTime::isFlowTraced() noexcept {
+    return (TRC1_Sync(anchor) & TRC1_FLOW) != 0;
+}
+
 void BrevanTime::generateCurrentTimestamp(char* out) {
     const std::time_t now = std::time(nullptr);
     const unsigned generation = TRC1_Generation.load(std::memory_order_relaxed);
     if (now != currentStamp.second || generation != currentStamp.generation) {
         generateTimestamp(now, currentStamp.text);
-        const bool isFlowTraced = (TRC1_Sync(anchor) & TRC1_FLOW) != 0;
         currentStamp.second = now;
-        currentStamp.generation = isFlowTraced ? 0 : generation;
+        currentStamp.generation = isFlowTraced() ? 0 : generation;
     }
     std::memcpy(out, currentStamp.text, stampLength);
 }

@@ -12,6 +12,9 @@ public:
     static void generateTimestamp(long time, char* out);
     /// Does the same for the current time. Looks up the time zone once per second and thread.
     static void generateCurrentTimestamp(char* out);
+    /// Whether every time stamp is to be made by generateTimestamp, since the flow of operations is
+    /// traced; otherwise callers may keep the parts that repeat. Any thread.
+    static bool isFlowTraced() noexcept;
 };
 
 } // namespace zrm

@@ -137,10 +137,11 @@ char* LogManagerUtil::getNextRec(const char* path) {
 }
 
 char* LogManagerUtil::xtoa(char* out, const void* /*data*/, std::size_t /*length*/) {
+    TraceScope trace(anchor);
     // Every digit would be written to the first character, which the terminator then overwrites.
     // So the bytes are not read at all.
     *out = '\0';
-    return out;
+    return trace.result(out);
 }
 
 } // namespace zrm

@@ -2,6 +2,7 @@
 
 #include "base/BrevanTime.h"
 #include "base/DigitPairs.h"
+#include "framework/trace.h"
 
 #include <cstring>
 
@@ -26,8 +27,10 @@ int secondOfHour(const char* stamp) {
 } // namespace
 
 void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
-    if (time < m_start || time >= m_end) {
+    const unsigned generation = TRC1_Generation.load(std::memory_order_relaxed);
+    if (time < m_start || time >= m_end || generation != m_generation) {
         enter(time);
+        m_generation = generation;
     }
     if (!m_isRegular) {
         BrevanTime::generateTimestamp(time, out);
@@ -44,7 +47,7 @@ void QuarterHour::generateTimestamp(std::int64_t time, char* out) {
 // across two hours. Then its ends are in different hours, or not 899 seconds apart.
 void QuarterHour::enter(std::int64_t time) {
     m_isRegular = false;
-    if (time < -farAway || time > farAway) {
+    if (time < -farAway || time > farAway || BrevanTime::isFlowTraced()) {
         m_end = m_start;
         return;
     }

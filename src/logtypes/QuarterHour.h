@@ -6,7 +6,8 @@
 namespace zrm {
 
 /// Generates time stamps for times that are close together. Asks the system for the local time once
-/// per quarter of an hour, within which only the minute and second change. One thread.
+/// per quarter of an hour, within which only the minute and second change. While the flow of
+/// operations is traced, every stamp is an operation of BrevanTime. One thread.
 class QuarterHour {
 public:
     /// Same as BrevanTime::generateTimestamp.
@@ -15,11 +16,12 @@ public:
 private:
     void enter(std::int64_t time);
 
-    std::int64_t m_start = 0; ///< a multiple of 900
-    std::int64_t m_end = 0;   ///< 900 later; equal to the start if no quarter was entered
-    bool m_isRegular = false; ///< the local time does not jump within it
-    char m_hour[9];           ///< CYYMMDDhh
-    int m_secondOfHour = 0;   ///< at the start
+    std::int64_t m_start = 0;  ///< a multiple of 900
+    std::int64_t m_end = 0;    ///< 900 later; equal to the start if no quarter was entered
+    bool m_isRegular = false;  ///< the local time does not jump within it
+    unsigned m_generation = 0; ///< of the trace levels when it was entered
+    char m_hour[9];            ///< CYYMMDDhh
+    int m_secondOfHour = 0;    ///< at the start
 };
 
 } // namespace zrm

@@ -151,8 +151,9 @@ _ObjectStatus StringParser::learnLogFormat(const char* format, const _KeywordFie
 }
 
 const char* StringParser::convertType2Char(_DataType type) noexcept {
+    TraceScope trace(anchor);
     const DataTypeInfo* info = findDataType(type);
-    return info != nullptr ? info->defaultDirective : "";
+    return trace.result(info != nullptr ? info->defaultDirective : "");
 }
 
 /// The length of the scan directive without its "%n", for messages.

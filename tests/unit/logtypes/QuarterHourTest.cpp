@@ -2,10 +2,12 @@
 
 #include "base/BrevanTime.h"
 #include "support/Faults.h"
+#include "support/RecordingTrace.h"
 #include "support/TimeZone.h"
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <limits>
 #include <random>
@@ -92,6 +94,28 @@ TEST(QuarterHour, AsksForTheLocalTimeOnceForNearTimes) {
         given(quarterHour, time);
     }
     EXPECT_EQ(asked.calls(), 2);
+}
+
+TEST(QuarterHour, EachStampIsAnOperationWhereTheFlowIsTraced) {
+    const TimeZone zone("UTC0");
+    QuarterHour quarterHour;
+    EXPECT_EQ(given(quarterHour, 1000000000), expected(1000000000));
+    const auto stamps = [&quarterHour](RecordingTrace& trace) {
+        trace.clear();
+        EXPECT_EQ(given(quarterHour, 1000000001), "1010909014641000");
+        const auto events = trace.events();
+        return std::count(events.begin(), events.end(), "BrevanTime.cpp entry");
+    };
+    RecordingTrace trace(TRC1_FLOW);
+    EXPECT_EQ(stamps(trace), 1);
+    EXPECT_EQ(stamps(trace), 1);
+    trace.setLevel(TRC1_ERROR);
+    const Fault counter("localtime_r", 0, {.times = 0});
+    given(quarterHour, 1000000000);
+    const int calls = counter.calls();
+    EXPECT_GT(calls, 0);
+    given(quarterHour, 1000000001);
+    EXPECT_EQ(counter.calls(), calls) << "without the flow a quarter of an hour is entered once";
 }
 
 } // namespace
