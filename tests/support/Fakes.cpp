@@ -147,6 +147,10 @@ extern "C" int __wrap_select(int count, fd_set* readable, fd_set* writable, fd_s
         return -1;
     }
     if (g_shortSelect) {
+        if (limit->tv_usec < 0 || limit->tv_usec >= 1'000'000) {
+            errno = EINVAL; // as systems may
+            return -1;
+        }
         g_selected = limit->tv_sec * 1'000'000 + limit->tv_usec;
         *limit = {0, 2000};
     }
