@@ -91,7 +91,7 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     // error log's command is told the time instead.
     const std::string_view end = log.type() == errorLog ? std::string_view(to) : never;
     end.copy(window.endTime, sizeof window.endTime - 1);
-    const ReportOutcome outcome;
+    const ReportOutcome outcome(ReportedFile::monitored);
     Reach reach;
     void* report = MonitoredLogs::isReadable(log) ? log.startReportRequest(&window) : nullptr;
     if (report == nullptr) {

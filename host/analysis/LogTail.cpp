@@ -153,7 +153,7 @@ void LogTail::entries(const Entry& entry) {
     _RequestThresholds always{};
     std::strcpy(always.startTime, "0000000000000000");
     std::strcpy(always.endTime, "1991231235959000");
-    const ReportOutcome outcome;
+    const ReportOutcome outcome(ReportedFile::monitored);
     void* report = m_log.startReportRequest(&always);
     if (report == nullptr) {
         ReportOutcome::note(ReportEnd::notRead);

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <optional>
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -25,6 +26,13 @@ constexpr std::int64_t defaultBlockSize = 8192;
 constexpr char syslogFile = 'S';
 constexpr char userLog = 'U';
 
+/// Whether the opened file is not the one that the log's monitor has open.
+bool isAnother(int fd, const std::optional<FileIdentity>& monitored) {
+    struct stat status;
+    return monitored &&
+           (fstat(fd, &status) != 0 || *monitored != FileIdentity{status.st_dev, status.st_ino});
+}
+
 } // namespace
 
 unsigned char LogFile::determineOptimumBlockSize() {
@@ -42,7 +50,16 @@ unsigned char LogFile::determineOptimumBlockSize() {
 
 long LogFile::openLogForReport(_LogBufferInfo* info) {
     TraceScope trace(anchor);
-    info->fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    const bool isBound = ReportOutcome::file() == ReportedFile::monitored;
+    const std::optional<FileIdentity> monitored = isBound ? m_ledger.file() : std::nullopt;
+    const int links = isBound && !monitored ? O_NOFOLLOW : 0;
+    info->fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC | links);
+    if (info->fd >= 0 && isAnother(info->fd, monitored)) {
+        ReportOutcome::note(ReportEnd::otherFile);
+        closeLogForReport(info->fd);
+        info->fd = -1;
+        return trace.result<long>(info->fd);
+    }
     if (info->fd < 0) {
         const ErrorText error(errno);
         trace.error()("Error opening file %s for report.  errno = %d; %s", fileNameLocal(),

@@ -8,13 +8,17 @@ thread_local ReportOutcome* current = nullptr;
 
 } // namespace
 
-ReportOutcome::ReportOutcome() noexcept : m_outer(current) {
+ReportOutcome::ReportOutcome(ReportedFile file) noexcept : m_outer(current), m_file(file) {
     current = this;
     m_reached.reserve(stampLength);
 }
 
 ReportOutcome::~ReportOutcome() {
     current = m_outer;
+}
+
+ReportedFile ReportOutcome::file() noexcept {
+    return current != nullptr ? current->m_file : ReportedFile::named;
 }
 
 void ReportOutcome::note(ReportEnd end) noexcept {
@@ -36,6 +40,9 @@ const char* ReportOutcome::reason() const noexcept {
         break;
     case ReportEnd::notRead:
         return "the log cannot be read";
+    case ReportEnd::otherFile:
+        return "its name is another file's by now, and its monitor reads the one that had the "
+               "name before";
     case ReportEnd::formatErrors:
         return "eleven lines in a row do not fit the log's format, and a report ends there";
     case ReportEnd::longLine:

@@ -8,8 +8,9 @@ namespace zrm {
 
 /// Why a report ended.
 enum class ReportEnd {
-    complete, ///< at the start of the window or of the log
-    notRead,  ///< the log could not be opened, or its format is unknown
+    complete,  ///< at the start of the window or of the log
+    notRead,   ///< the log could not be opened, or its format is unknown
+    otherFile, ///< its name belongs to another file, and only the monitored one may be read
     formatErrors,
     longLine,
     noTime,
@@ -20,17 +21,25 @@ enum class ReportEnd {
     rowLimit,
 };
 
+/// Which file a report on a log reads.
+enum class ReportedFile {
+    named,     ///< whichever file has the log's name now
+    monitored, ///< only the file that the monitor has open; if it has none, not a symbolic link
+};
+
 /// How far a report reached and why it ended. The report functions cannot return this, so a
 /// caller who needs it keeps an outcome on the same thread while the report runs; without one,
 /// nothing is recorded. Outcomes may be nested; the innermost one records. Costs nothing per
 /// entry.
 class ReportOutcome {
 public:
-    ReportOutcome() noexcept;
+    explicit ReportOutcome(ReportedFile file = ReportedFile::named) noexcept;
     ~ReportOutcome();
     ReportOutcome(const ReportOutcome&) = delete;
     ReportOutcome& operator=(const ReportOutcome&) = delete;
 
+    /// Which file a report on this thread may read.
+    static ReportedFile file() noexcept;
     /// Records on the thread's outcome why the report ends. Only the first call counts; later
     /// reasons follow from it.
     static void note(ReportEnd end) noexcept;
@@ -48,6 +57,7 @@ private:
     static constexpr std::size_t stampLength = 16;
 
     ReportOutcome* const m_outer;
+    const ReportedFile m_file;
     bool m_isNoted = false;
     ReportEnd m_end = ReportEnd::complete;
     std::string m_reached;

@@ -80,6 +80,11 @@ def test_only_the_file_that_is_monitored_is_read(serving):
     assert "another file" in answer["detail"]
     status, _, answer = serving.api.request("POST", "/api/v1/explain", {"situation": "any", "log": str(log), "last": 3})
     assert status == 409 and "another file" in answer["detail"]
+    window = {"from": "2000-01-01", "to": "2099-01-01"}
+    request = {"definition": {"log": str(log)}, **window}
+    status, _, answer = serving.api.request("POST", "/api/v1/backtest", request)
+    assert (status, answer["entries"], answer["complete"]) == (200, 0, False)
+    assert "another file" in answer["reason"]
     log.unlink()
     log.symlink_to(log.with_suffix(".1"))
     answer = attempt(serving, format='A , "%d %*s %d" , day class', log=str(log), last=1)

@@ -1,8 +1,10 @@
 #include "TestLog.h"
+#include "monitor/ReportOutcome.h"
 
 #include <gmock/gmock.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <vector>
 
 #include <fcntl.h>
@@ -272,6 +274,48 @@ TEST_F(ReportFailure, OfClosing) {
     EXPECT_THAT(trace.messages(),
                 ElementsAre("Error closing fd " + std::to_string(fd) + " for report on file " +
                             m_path + ".  errno = 9; Bad file descriptor"));
+}
+
+TEST_F(Report, MayBeBoundToTheFileThatIsMonitored) {
+    m_directory.write("messages", "monitored");
+    m_log.openLogAndSeek();
+    std::filesystem::rename(m_path, m_path + ".1");
+    m_directory.write("other", "another file");
+    std::filesystem::create_symlink(m_directory.file("other"), m_path);
+    RecordingTrace trace(TRC1_ERROR);
+    {
+        const ReportOutcome outcome(ReportedFile::monitored);
+        EXPECT_LT(m_log.openLogForReport(&m_info), 0);
+        EXPECT_EQ(outcome.end(), ReportEnd::otherFile);
+        EXPECT_EQ(m_info.fd, -1);
+    }
+    {
+        const ReportOutcome outcome; // goes by the name
+        EXPECT_GE(m_log.openLogForReport(&m_info), 0);
+        EXPECT_EQ(m_info.bytesLeft, 12);
+        m_log.closeLogForReport(m_info.fd);
+    }
+    std::filesystem::remove(m_path);
+    std::filesystem::create_symlink(m_path + ".1", m_path);
+    {
+        const ReportOutcome outcome(ReportedFile::monitored);
+        EXPECT_GE(m_log.openLogForReport(&m_info), 0) << "the same file by a link";
+        EXPECT_EQ(m_info.bytesLeft, 9);
+        m_log.closeLogForReport(m_info.fd);
+    }
+    m_log.closeLog();
+    m_info.fd = -1;
+    EXPECT_THAT(trace.messages(), IsEmpty());
+}
+
+TEST_F(Report, FollowsNoLinkWhileNoMonitorHasAFileOpen) {
+    m_directory.write("other", "another file");
+    std::filesystem::remove(m_path);
+    std::filesystem::create_symlink(m_directory.file("other"), m_path);
+    RecordingTrace trace(TRC1_ERROR);
+    const ReportOutcome outcome(ReportedFile::monitored);
+    EXPECT_LT(m_log.openLogForReport(&m_info), 0);
+    EXPECT_THAT(trace.messages(), testing::SizeIs(1));
 }
 
 } // namespace
