@@ -2,6 +2,9 @@
 
 #include "host/base/Utf8.h"
 
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
 #include <string_view>
 #include <utility>
 
@@ -42,6 +45,37 @@ std::string SteeringText::escapedInJson(std::string document) {
         at += sequence.length - 1;
     }
     return from == 0 ? std::move(document) : result.append(document, from);
+}
+
+std::size_t SteeringText::copyVisible(std::string_view text, char* out, std::size_t room) noexcept {
+    constexpr std::size_t longestEscape = 6;
+    std::size_t size = 0;
+    while (!text.empty()) {
+        const Utf8::Sequence sequence = Utf8::firstSequence(text);
+        const std::string_view bytes = text.substr(0, sequence.length);
+        text.remove_prefix(sequence.length);
+        // A byte that belongs to no character may be a control in the terminal's own code page.
+        const char32_t character =
+            sequence.valid ? Utf8::character(bytes) : static_cast<unsigned char>(bytes.front());
+        if (character == '\n' || character == '\t' || !Utf8::isSteering(character)) {
+            if (size + bytes.size() > room) {
+                break;
+            }
+            std::memcpy(out + size, bytes.data(), bytes.size());
+            size += bytes.size();
+            continue;
+        }
+        char escape[longestEscape + 1];
+        const auto length = static_cast<std::size_t>(std::snprintf(
+            escape, sizeof escape, character < 0x80 || !sequence.valid ? "\\x%02x" : "\\u%04x",
+            static_cast<unsigned>(character)));
+        if (size + length > room) {
+            break;
+        }
+        std::memcpy(out + size, escape, length);
+        size += length;
+    }
+    return size;
 }
 
 } // namespace zrm::host

@@ -1,6 +1,6 @@
 #include "host/framework/TraceRecord.h"
 
-#include "host/base/Utf8.h"
+#include "host/base/SteeringText.h"
 #include "host/framework/TraceClock.h"
 
 #include <algorithm>
@@ -10,8 +10,6 @@
 namespace zrm::host {
 
 namespace {
-
-constexpr std::size_t longestEscape = 6;
 
 /// Whether a byte is shown by every terminal as it is, or is a line end or tab.
 bool isPlain(char c) {
@@ -51,29 +49,8 @@ std::string_view TraceRecord::finish() noexcept {
 
 /// The record with escapes in the place of what steers a terminal, cut where it becomes too long.
 std::string_view TraceRecord::escaped() noexcept {
-    std::size_t size = 0;
-    for (std::string_view rest(m_text, m_size - 1); !rest.empty();) {
-        const Utf8::Sequence sequence = Utf8::firstSequence(rest);
-        const std::string_view bytes = rest.substr(0, sequence.length);
-        rest.remove_prefix(sequence.length);
-        // A byte that belongs to no character may be a control in the terminal's own code page.
-        const char32_t character =
-            sequence.valid ? Utf8::character(bytes) : static_cast<unsigned char>(bytes.front());
-        const bool isShown =
-            (bytes.size() == 1 && isPlain(bytes.front())) || !Utf8::isSteering(character);
-        if (size + std::max<std::size_t>(bytes.size(), longestEscape) >= maxSize) {
-            break;
-        }
-        if (isShown) {
-            std::memcpy(m_escaped + size, bytes.data(), bytes.size());
-            size += bytes.size();
-        } else {
-            size += static_cast<std::size_t>(
-                std::snprintf(m_escaped + size, longestEscape + 1,
-                              character < 0x80 || !sequence.valid ? "\\x%02x" : "\\u%04x",
-                              static_cast<unsigned>(character)));
-        }
-    }
+    std::size_t size =
+        SteeringText::copyVisible({m_text, m_size - 1}, m_escaped, sizeof m_escaped - 1);
     m_escaped[size++] = '\n';
     return {m_escaped, size};
 }

@@ -1,5 +1,7 @@
 #include "host/http/Problem.h"
 
+#include "host/base/SteeringText.h"
+
 #include <algorithm>
 #include <array>
 #include <utility>
@@ -43,8 +45,10 @@ std::string Problem::json() const {
     if (!field.empty()) {
         document["field"] = field;
     }
-    // A detail may quote what the client sent: bytes that are no UTF-8 are replaced.
-    return document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+    // A detail may quote what the client sent: bytes that are not UTF-8 are replaced, and what
+    // steers a terminal is escaped.
+    return SteeringText::escapedInJson(
+        document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 
 } // namespace zrm::host

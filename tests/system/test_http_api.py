@@ -56,6 +56,14 @@ def test_the_trace_is_changed_while_the_agent_runs(agent, serving):
     for odd in ("error+", "a\n1 forged=fine", "x" * 4096 + "=fine"):
         assert problem(api, "PUT", "/api/v1/trace", {"levels": odd})[:2] == (400, "levels"), odd
     assert get(api, "/api/v1/status")["trace"] == "error,LogFile=all", "a refusal changes nothing"
+    steering = "\u009b31m\u202e\x7f"
+    sent = http.client.HTTPConnection("127.0.0.1", api.port, timeout=30)
+    sent.request("PUT", "/api/v1/trace", json.dumps({"levels": steering}),
+                 {"Authorization": f"Bearer {api.token}", "Content-Type": "application/json"})  # fmt: skip
+    text = sent.getresponse().read().decode()
+    assert not set(text) & set(steering[0] + steering[-2:])
+    assert steering in json.loads(text)["detail"]
+    sent.close()
 
 
 def test_the_trace_shows_the_beginning_of_long_levels(agent, serving):
