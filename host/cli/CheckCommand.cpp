@@ -48,6 +48,17 @@ std::string textOf(const ConfigCheck::Line& line, const Terminal& terminal) {
     return text;
 }
 
+/// Says why an agent that runs would not load this content: it takes it for one that is still
+/// being written. A start loads it.
+void noteUnfinished(const std::string& content, const std::string& path) {
+    if (content.find_first_not_of(" \t\r\n") == std::string::npos) {
+        Context::note(path + " is empty: a running agent does not load it");
+    } else if (content.back() != '\n') {
+        Context::note(path + " has no newline after its last line: a running agent does not load "
+                             "it; add the newline");
+    }
+}
+
 } // namespace
 
 CheckCommand::CheckCommand(CLI::App& program)
@@ -92,7 +103,8 @@ int CheckCommand::checkLogs(Context& context) const {
 }
 
 int CheckCommand::checkHost(Context& context) const {
-    const ConfigFile::Result result = ConfigFile::parse(InputFile(m_host).text(), m_host);
+    const std::string content = InputFile(m_host).text();
+    const ConfigFile::Result result = ConfigFile::parse(content, m_host);
     const auto* const found = std::get_if<std::vector<std::string>>(&result);
     const std::vector<std::string> problems =
         found == nullptr ? std::vector<std::string>() : *found;
@@ -100,6 +112,7 @@ int CheckCommand::checkHost(Context& context) const {
         context.printJson({{"accepted", problems.empty()}, {"problems", problems}});
     } else if (problems.empty()) {
         context.print(DisplayText::visible(m_host) + " can be used\n");
+        noteUnfinished(content, m_host);
         if (const std::string warning = warningOfSecrets(std::get<HostConfig>(result), m_host);
             !warning.empty()) {
             Context::note(warning);

@@ -117,6 +117,13 @@ def test_the_host_configuration(tmp_path):
     path = tmp_path / "zrm.toml"
     path.write_text("[history]\nkeep_days = 3\n")
     assert run("check", "--host", path) == (f"{path} can be used\n", "")
+    for content, note in (
+        ("\n", " is empty: a running agent does not load it\n"),
+        ("[agent]", " has no newline after its last line: a running agent does not load it; add the newline\n"),
+    ):
+        (tmp_path / "unfinished.toml").write_text(content)
+        unfinished = str(tmp_path / "unfinished.toml")
+        assert run("check", "--host", unfinished) == (f"{unfinished} can be used\n", f"zrmctl: {unfinished}{note}")
     assert json.loads(run("check", "--host", path, "--json")[0]) == {
         "accepted": True,
         "problems": [],
