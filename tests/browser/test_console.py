@@ -211,6 +211,15 @@ def test_markup_in_a_log_line_stays_text(page, agent):
     assert page.all("main img, main script, main b") == []
 
 
+def test_what_steers_text_is_shown_and_not_obeyed(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent, "events")
+    page.wait_live()
+    auth.append(syslog_line("Failed password for \u202etoor\u2066 \u009b31m\x1b[0m\x7f", "sshd[1]"))
+    page.wait_text("Failed password for \\u202etoor\\u2066 \\u009b31m\\u001b[0m\\u007f")
+    assert not set(page.run("return document.body.textContent")) & set("\u202e\u2066\u009b\x1b\x7f")
+
+
 def test_events_are_filtered(page, agent):
     auth, _ = logs_agent(agent)
     for number in (1, 2):
