@@ -254,8 +254,10 @@ def test_a_history_that_is_removed_is_made_anew_and_ids_go_on(agent):
     assert agent.stop() == 0
     history_file(agent).unlink()  # and while no agent runs
     agent.start()
+    status = Api(agent).request("GET", "/api/v1/status")[2]
+    assert status["history"]["problem"] is None, "a history, which alone knows the ids"
     log.append(lines(range(15, 16)))
-    assert agent.wait_events(1)[0]["id"] == 16
+    assert agent.wait_events(1)[0]["id"] == 16, agent.stderr.text()
     assert agent.stop() == 0
 
 
