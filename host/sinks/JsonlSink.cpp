@@ -69,10 +69,11 @@ bool JsonlSink::open() {
     }
     struct stat status {};
     m_isRegular = fstat(m_fd, &status) == 0 && S_ISREG(status.st_mode);
+    const bool isAppended = (fcntl(m_fd, F_GETFL) & O_APPEND) != 0; // standard output may not be
     const long pipeBuffer = fpathconf(m_fd, _PC_PIPE_BUF);
     m_unblockedWrite = pipeBuffer > 0 ? static_cast<std::size_t>(pipeBuffer) : _POSIX_PIPE_BUF;
     m_lookAgain = Clock::now() + lookInterval;
-    if (m_isRegular && status.st_size > 0 && !endLastLine()) {
+    if (m_isRegular && isAppended && status.st_size > 0 && !endLastLine()) {
         close();
         return trace.result(false);
     }
@@ -83,10 +84,10 @@ bool JsonlSink::open() {
 /// An agent that was killed while it wrote has left a line torn: it is ended, so that the next one
 /// stands alone. False when that failed.
 bool JsonlSink::endLastLine() {
+    constexpr int flags = O_RDONLY | O_CLOEXEC | O_NONBLOCK;
     char last = '\n';
-    const int fd = m_isStandardOutput
-                       ? -1
-                       : ::open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
+    const int fd = m_isStandardOutput ? ::open("/proc/self/fd/1", flags)
+                                      : ::open(m_path.c_str(), flags | O_NOFOLLOW);
     if (fd != -1) { // what this user may write but not read is taken as it is
         if (lseek(fd, -1, SEEK_END) == -1 || ::read(fd, &last, 1) != 1) {
             last = '\n';

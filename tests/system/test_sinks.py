@@ -237,6 +237,24 @@ def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, aut
         assert agent.stop() == 0
 
 
+# ------------------------------------------------------------------------------------ files
+
+
+def test_a_line_torn_at_the_end_of_standard_output_is_ended(agent, log):
+    """What an agent that was killed has left in a file that the next one appends to."""
+    path = agent.directory / "out.jsonl"
+    path.write_bytes(b'{"id": 1, "tor')
+    agent.sink = "-"
+    with open(path, "ab") as output:
+        agent.start(stdout=output)
+    append(log, 1, 1)
+    wait_until(lambda: path.read_bytes().endswith(b"}\n"), "the event")
+    assert agent.stop() == 0
+    torn, line, rest = path.read_bytes().split(b"\n")
+    assert (torn, rest) == (b'{"id": 1, "tor', b"")
+    assert descriptions([json.loads(line)]) == entries(1, 1)
+
+
 # ------------------------------------------------------------------------------------ pipes
 
 
