@@ -175,7 +175,7 @@ std::string Backtest::decisionOf(const Result& result) const {
     }
     return text + (result.reach.isComplete()
                        ? "."
-                       : "; older entries were not looked at: " + result.reach.reason + '.');
+                       : "; older entries were not examined: " + result.reach.reason + '.');
 }
 
 } // namespace zrm::host

@@ -182,7 +182,8 @@ Explanation Explainer::describe(Seen& seen) {
             seen.verdict.frequency};
     }
     if (!seen.isRow) {
-        explanation.reason = "the line does not fit the log's format, or its time cannot be told";
+        explanation.reason =
+            "the line does not match the log's format, or its time cannot be determined";
     } else {
         char* const row = reinterpret_cast<char*>(&seen.row);
         RowJson::append(explanation.row, layout(), row);
@@ -199,7 +200,7 @@ void Explainer::decide(Explanation& explanation, const Seen& seen) const {
     const std::string would = explanation.isRaised ? "Would be raised" : "Would not be raised";
     std::string because;
     if (!seen.isRow) {
-        because = "the line gives no entry";
+        because = "the line yields no entry";
     } else if (!explanation.matches) {
         because = "a condition does not hold";
         for (const ConditionVerdict& verdict : explanation.conditions) {
@@ -216,8 +217,8 @@ void Explainer::decide(Explanation& explanation, const Seen& seen) const {
                   std::to_string(m_replay.periodSeconds()) + " s, the threshold is " +
                   boundOf(m_replay);
     } else if (seen.event) {
-        explanation.decision = "Cannot be told: every condition holds, but the log holds the entry "
-                               "no more, so that those before it cannot be counted.";
+        explanation.decision = "Cannot be determined: every condition holds, but the log no longer "
+                               "contains the entry, so the ones before it cannot be counted.";
         return;
     } else {
         because = "the time of the entry cannot be counted";

@@ -143,7 +143,7 @@ HttpAnswer refresh(const HttpRequest& request) {
     TraceScope trace(anchor);
     JsonFields(request.body).refuseUnknown();
     if (kill(getpid(), SIGHUP) != 0) {
-        throw RequestRefused(500, "the agent cannot be asked", "");
+        throw RequestRefused(500, "the agent cannot be notified", "");
     }
     HttpAnswer answer = answerWith({{"status", "asked"}});
     answer.status = 202;

@@ -35,7 +35,7 @@ using Json = nlohmann::ordered_json;
 LogFile& logOf(const MonitoredLogs& logs, JsonFields& fields, const SituationConfig& situation) {
     const std::optional<std::string> path = fields.optionalText("log");
     if (!path && !situation.log) {
-        fields.refuse("log", "is missing; the situation is not on one log alone");
+        fields.refuse("log", "is missing; the situation is not limited to one log");
     }
     LogFile* const log = logs.find(path ? *path : *situation.log);
     if (log == nullptr) {
@@ -46,16 +46,15 @@ LogFile& logOf(const MonitoredLogs& logs, JsonFields& fields, const SituationCon
 
 void requireOpen(bool isOpen) {
     if (!isOpen) {
-        throw RequestRefused(503, "there are as many requests as there can be: try again", "");
+        throw RequestRefused(503, "there are too many requests: try again", "");
     }
 }
 
 std::string timeOf(JsonFields& fields, const char* key) {
     const std::optional<std::string> stamp = TimeText::toStamp(fields.text(key));
     if (!stamp) {
-        fields.refuse(key,
-                      "write a time like 2026-11-20T07:03:09, with Z or +01:00 behind it where "
-                      "it is not local, or a 16-digit time stamp");
+        fields.refuse(key, "write a time like 2026-11-20T07:03:09, followed by Z or +01:00 unless "
+                           "it is local, or a 16-digit time stamp");
     }
     return *stamp;
 }
@@ -165,7 +164,7 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     const std::optional<StoredEvent> event =
         EventQuery::reading([&] { return m_history->event(id); });
     if (!event) {
-        throw RequestRefused(404, "the history holds no such event", "event");
+        throw RequestRefused(404, "the history does not contain this event", "event");
     }
     const bool isNamed = !fields.has("definition");
     Subject wanted = subject(fields, event->situation);
@@ -190,10 +189,10 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     const std::string to = timeOf(fields, "to");
     fields.refuseUnknown();
     if (from > to) {
-        fields.refuse("to", "lies before from");
+        fields.refuse("to", "is before from");
     }
     if (!m_room.try_acquire()) {
-        throw RequestRefused(503, "two backtests are under way already: try again", "");
+        throw RequestRefused(503, "two backtests are already running: try again", "");
     }
     struct Release {
         std::counting_semaphore<2>& room;
@@ -216,7 +215,7 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
         return m_isCancelled.load(std::memory_order_relaxed) || logs.areWanted();
     });
     if (result.isTruncated && logs.areWanted()) {
-        throw RequestRefused(503, "the agent reads its configuration of logs again: try again", "");
+        throw RequestRefused(503, "the agent is re-reading its log configuration: try again", "");
     }
     Json answer{{"entries", result.entries},    {"matched", result.matched},
                 {"raised", result.raised},      {"truncated", result.isTruncated},

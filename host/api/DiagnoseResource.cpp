@@ -33,7 +33,7 @@ std::vector<std::string> givenLines(JsonFields& fields) {
                                  fields.place("lines", i));
         }
         if (lines[i].find('\n') != std::string::npos) {
-            throw RequestRefused(400, "write each line by itself, without its line end",
+            throw RequestRefused(400, "write each line by itself, without its newline",
                                  fields.place("lines", i));
         }
     }
@@ -48,7 +48,7 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
         fields.refuse("log", "this log is not monitored");
     }
     if (monitored[0].type != 'U' && monitored[0].type != 'S') {
-        fields.refuse("log", "this log is no text file");
+        fields.refuse("log", "this log is not a text file");
     }
     const MonitoredLogFile file(monitored[0].file, monitored[0].openFile);
     if (!file.problem().empty()) {

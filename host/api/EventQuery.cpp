@@ -14,7 +14,7 @@ constexpr std::size_t longestText = 256; ///< bytes
 
 void limitNames(const std::vector<std::string>& names, const char* field) {
     if (names.size() > mostNames) {
-        throw RequestRefused(400, "the parameter comes more than 100 times", field);
+        throw RequestRefused(400, "the parameter appears more than 100 times", field);
     }
 }
 
@@ -40,11 +40,12 @@ void EventQuery::readKinds(QueryFields& query, EventFilter& filter) {
     limitNames(filter.severities, "severity");
     for (const std::string& severity : filter.severities) {
         if (std::find(severities.begin(), severities.end(), severity) == severities.end()) {
-            throw RequestRefused(400,
-                                 "'" + severity +
-                                     "' is no severity; the severities are info, minor, warning, "
-                                     "major, critical",
-                                 "severity");
+            throw RequestRefused(
+                400,
+                "'" + severity +
+                    "' is not a severity; the severities are info, minor, warning, "
+                    "major, critical",
+                "severity");
         }
     }
 }

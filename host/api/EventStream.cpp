@@ -263,8 +263,10 @@ HttpAnswer EventStream::open(const HttpRequest& request) {
     filter.newestFirst = false;
     std::shared_ptr<void> place = m_followers->takePlace();
     if (place == nullptr) {
-        throw RequestRefused(
-            503, "too many clients follow the events: at most " + std::to_string(mostClients), "");
+        throw RequestRefused(503,
+                             "too many clients are following the events: at most " +
+                                 std::to_string(mostClients),
+                             "");
     }
     HttpAnswer answer;
     answer.contentType = "text/event-stream";

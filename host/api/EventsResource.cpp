@@ -86,7 +86,7 @@ Window windowOf(const HttpRequest& request) {
         throw RequestRefused(400, "write a multiple of 60 seconds", "step");
     }
     if (window.from > window.to) {
-        throw RequestRefused(400, "lies before from", "to");
+        throw RequestRefused(400, "is before from", "to");
     }
     if ((window.to - window.from) / window.step > mostSteps) {
         throw RequestRefused(400, "the window has more than 2880 steps", "step");
@@ -142,7 +142,7 @@ HttpAnswer EventsResource::event(const HttpRequest& request) {
     }
     const std::optional<StoredEvent> event = EventQuery::reading([&] { return history.event(id); });
     if (!event) {
-        throw RequestRefused(404, "the history does not hold this event", "id");
+        throw RequestRefused(404, "the history does not contain this event", "id");
     }
     return HttpAnswer::json(event->json);
 }

@@ -25,8 +25,8 @@ std::string readTime(JsonFields& fields, const char* key, std::optional<std::str
     std::optional<std::string> stamp = TimeText::toStamp(*text);
     if (!stamp) {
         fields.refuse(key, "'" + *text +
-                               "' is no time; write it like 2026-11-20T07:03:09, with Z or +01:00 "
-                               "behind it where it is not local, or as a 16-digit time stamp");
+                               "' is not a time; write it like 2026-11-20T07:03:09, followed by Z "
+                               "or +01:00 unless it is local, or as a 16-digit time stamp");
     }
     return std::move(*stamp);
 }
@@ -59,7 +59,7 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     const std::vector<std::string> where = fields.texts("where", mostConditions);
     fields.refuseUnknown();
     if (report.from > report.to) {
-        fields.refuse("to", "lies before from");
+        fields.refuse("to", "is before from");
     }
     report.conditions.push_back(bound(INTF_GREATER_OR_EQUAL, report.from));
     report.conditions.push_back(bound(INTF_LESS_OR_EQUAL, report.to));

@@ -130,7 +130,7 @@ HttpAnswer SituationsResource::replace(const HttpRequest& request) {
     const SituationConfig situation = SituationBody::situation(fields, name);
     if (situation.name != name) {
         throw RequestRefused(400,
-                             "a situation keeps its name: leave it out, or make a new situation "
+                             "a situation keeps its name: leave it out, or create a new situation "
                              "and remove this one",
                              "name");
     }

@@ -25,7 +25,7 @@ class Room {
 public:
     explicit Room(bool isReport) : m_isReport(isReport) {
         if (isReport && !reportRoom.try_acquire()) {
-            throw RequestRefused(503, "four reports are under way already: try again", "");
+            throw RequestRefused(503, "four reports are already running: try again", "");
         }
     }
     ~Room() {
@@ -61,7 +61,7 @@ SampleSource::Rows TableSampler::take(std::string_view table,
     rows.truncated =
         sample && table == "RMLOGENT" && sample->offered() >= static_cast<std::uint64_t>(gMaxRows);
     if (!sample) {
-        rows.reason = "the agent has as many requests as it can have";
+        rows.reason = "the agent cannot take any more requests";
     } else if (!outcome.isComplete()) {
         rows.reason = outcome.reason();
     }

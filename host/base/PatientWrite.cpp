@@ -107,7 +107,7 @@ void writeRecord(int fd, Kind kind, std::string_view record) noexcept {
         if (isStuck.exchange(false, std::memory_order_relaxed)) {
             char line[96];
             const int length = std::snprintf(
-                line, sizeof line, "zrmagent: %llu lines were lost here, since nobody read them\n",
+                line, sizeof line, "zrmagent: %llu lines were lost here because nobody read them\n",
                 static_cast<unsigned long long>(lost.exchange(0, std::memory_order_relaxed)));
             writeAll(fd, kind, {line, static_cast<std::size_t>(length)});
         }

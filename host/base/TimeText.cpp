@@ -184,7 +184,7 @@ bool isStamp(std::string_view text) {
     return text.size() == 16 && text.find_first_not_of("0123456789") == std::string_view::npos;
 }
 
-/// The moment of a time stamp; none when it is no time.
+/// The moment of a time stamp; none when it is not a time.
 std::optional<Moment> momentOf(std::string_view text) {
     Moment at;
     int century = 0;

@@ -76,12 +76,16 @@ private:
 std::string urlOf(AgentConfig& config) {
     const std::optional<ListenAddress>& listen = config.get().http.listen;
     if (!listen) {
-        throw CliError(CLI_USAGE, config.path() + " switches HTTP off: give [http] a listen "
-                                                  "address, or name the address with --url");
+        throw CliError(
+            CLI_USAGE,
+            config.path() +
+                " turns HTTP off: give [http] a listen address, or give the address with --url");
     }
     if (listen->port == 0) {
-        throw CliError(CLI_USAGE, config.path() + " leaves the port open: name the address that "
-                                                  "the agent told with --url");
+        throw CliError(
+            CLI_USAGE,
+            config.path() +
+                " leaves the port open: give the address that the agent reported with --url");
     }
     ListenAddress reached = *listen;
     if (reached.host == "0.0.0.0") { // every address, this machine's own among them
@@ -109,7 +113,7 @@ std::string checkedUrl(const std::string& written, const std::string& source) {
         ListenAddress::parse(hasPort ? address : address + ":80");
     if (!host) {
         throw CliError(CLI_USAGE, source + ": '" + written +
-                                      "' is no address; write it as "
+                                      "' is not an address; write it as "
                                       "http://127.0.0.1:7186");
     }
     if (!host->isLoopback()) {
@@ -130,12 +134,13 @@ std::string readToken(const std::string& path) {
                                               ": use sudo, or give the token in ZRM_TOKEN");
         }
         throw CliError(CLI_FORBIDDEN, "cannot read the token " + path + ": " + error.text() +
-                                          "; the agent makes it when it starts with HTTP");
+                                          "; the agent creates it when it starts with HTTP");
     }
     char text[4096];
     std::string token = trimmed({text, std::fread(text, 1, sizeof text, stream.get())});
     if (token.empty() || token.find_first_of("\r\n") != std::string::npos) {
-        throw CliError(CLI_FORBIDDEN, path + " holds no token: one line of visible characters");
+        throw CliError(CLI_FORBIDDEN,
+                       path + " does not contain a token: one line of visible characters");
     }
     return token;
 }

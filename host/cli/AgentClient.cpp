@@ -59,7 +59,7 @@ std::string authoritiesOf(const AgentAccess& access) {
     for (const std::string& file : access.authorities) {
         const std::string text = InputFile(file).text();
         if (text.find("CERTIFICATE-----") == std::string::npos) {
-            throw CliError(CLI_USAGE, file + " holds no certificate in PEM");
+            throw CliError(CLI_USAGE, file + " does not contain a certificate in PEM format");
         }
         all += text + '\n';
     }
@@ -128,7 +128,7 @@ Json AgentClient::Implementation::ask(HttpClientRequest request) {
     }
     Json document = JsonText::parse(body);
     if (!document.is_object()) {
-        throw foreign("its answer is no JSON object");
+        throw foreign("its answer is not a JSON object");
     }
     return document;
 }
@@ -162,23 +162,25 @@ CliError AgentClient::Implementation::unreachable(const HttpClientAnswer& answer
     case Outcome::untrusted:
     case Outcome::noTls:
     case Outcome::noAuthorities:
-        return {CLI_UNREACHABLE, agent + " shows no certificate that this machine trusts for "
-                                         "this address: name the file of its authority, or of "
-                                         "the certificate itself, with --ca-file"};
+        return {
+            CLI_UNREACHABLE,
+            agent +
+                " has no certificate that this machine trusts for this address: name the file with "
+                "its authority's certificate, or with the certificate itself, with --ca-file"};
     case Outcome::notHttp:
         return foreign("its answer is not HTTP");
     case Outcome::failed:
         return {CLI_UNREACHABLE, "the connection to " + agent + " failed: " + answer.detail};
     default:
-        return {CLI_UNREACHABLE, agent + " did not answer: it ended, or it is too busy"};
+        return {CLI_UNREACHABLE, agent + " did not answer: it has stopped, or it is too busy"};
     }
 }
 
 CliError AgentClient::Implementation::refused(int status, const std::string& body) const {
     if (status == 401) {
-        return {CLI_FORBIDDEN, "the agent at " + m_access.url + " does not accept the token of " +
+        return {CLI_FORBIDDEN, "the agent at " + m_access.url + " does not accept the token from " +
                                    m_access.tokenSource +
-                                   ": name the agent's own with --token-file or --config"};
+                                   ": give the right one with --token-file or --config"};
     }
     const Json problem = JsonText::parse(body);
     std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
@@ -192,7 +194,7 @@ CliError AgentClient::Implementation::refused(int status, const std::string& bod
 }
 
 CliError AgentClient::Implementation::foreign(const std::string& why) const {
-    return {CLI_UNREACHABLE, "what answers at " + m_access.url + " is no zrmagent: " + why};
+    return {CLI_UNREACHABLE, "what answers at " + m_access.url + " is not a zrmagent: " + why};
 }
 
 AgentClient::AgentClient(AgentAccess access)
@@ -211,7 +213,7 @@ Json AgentClient::send(const std::string& method, const std::string& path, const
             text = body.dump();
         } catch (const Json::type_error&) {
             throw CliError(CLI_USAGE, "the command line, or the file that it names, is not valid "
-                                      "UTF-8, as the agent's API wants it");
+                                      "UTF-8, which the agent's API requires");
         }
     }
     const bool hasBody = method != "DELETE" || !text.empty();

@@ -13,8 +13,8 @@
 namespace zrm::host {
 
 BacktestCommand::BacktestCommand(CLI::App& program)
-    : m_command(
-          program.add_subcommand("backtest", "Run a situation over what its log holds already")) {
+    : m_command(program.add_subcommand("backtest",
+                                       "Run a situation over what its log already contains")) {
     m_command->add_option("SITUATION", m_situation, "The situation's name");
     m_command->add_option("--file", m_file, "A definition as JSON instead of a situation")
         ->type_name("FILE");
@@ -42,7 +42,7 @@ int BacktestCommand::run(Context& context) {
     context.print(text);
     Context::noteReach(answer);
     if (JsonText::text(answer, "truncated") == "true") {
-        Context::note("begin later or end earlier to read less");
+        Context::note("start later or end earlier to read less");
     }
     return CLI_DONE;
 }

@@ -64,8 +64,9 @@ void noteUnfinished(const std::string& content, const std::string& path) {
 CheckCommand::CheckCommand(CLI::App& program)
     : m_command(program.add_subcommand("check", "Check a configuration; needs no agent")) {
     m_command->add_option("CONFIG", m_config,
-                          "A configuration of logs, judged line by line; - is standard input");
-    m_command->add_option("--host", m_host, "Instead the agent's own configuration, a zrm.toml")
+                          "A log configuration, checked line by line; - is standard input");
+    m_command
+        ->add_option("--host", m_host, "Check the agent's own configuration instead, a zrm.toml")
         ->type_name("FILE");
 }
 
@@ -75,7 +76,7 @@ bool CheckCommand::isChosen() const {
 
 int CheckCommand::run(Context& context) {
     if (m_config.empty() == m_host.empty()) {
-        throw CliError(CLI_USAGE, "check: name either a configuration of logs or --host FILE");
+        throw CliError(CLI_USAGE, "check: name either a log configuration or --host FILE");
     }
     return m_config.empty() ? checkHost(context) : checkLogs(context);
 }

@@ -71,7 +71,7 @@ std::string Context::time(const std::string& option, const std::string& text) {
     const std::optional<std::string> time = TimeInput::toIso(text, std::time(nullptr));
     if (!time) {
         throw CliError(CLI_USAGE,
-                       option + ": '" + text + "' is no time; write " + TimeInput::forms);
+                       option + ": '" + text + "' is not a time; write " + TimeInput::forms);
     }
     return *time;
 }

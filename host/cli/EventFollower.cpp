@@ -62,7 +62,7 @@ bool EventFollower::connect(const Receiver& receiver) {
         query.emplace("after", std::to_string(m_last));
         m_client.stream("/api/v1/events/stream", query, [&](std::string_view piece) {
             if (std::exchange(m_isLost, false)) {
-                m_note("connected again");
+                m_note("reconnected");
             }
             hasReceived = true;
             parser.take(piece);
@@ -73,7 +73,7 @@ bool EventFollower::connect(const Receiver& receiver) {
         }
     }
     if (!m_signals.isStopped() && !std::exchange(m_isLost, true)) {
-        m_note("the connection to the agent is lost; trying to connect again");
+        m_note("the connection to the agent was lost; reconnecting");
     }
     return hasReceived;
 }
@@ -82,7 +82,7 @@ void EventFollower::adoptNewHistory() {
     const Json answer = m_client.get("/api/v1/events", {{"limit", "1"}});
     if (JsonText::member(answer, "newest").is_number() &&
         JsonText::number(answer, "newest") < m_last) {
-        m_note("the agent has begun a new history; its events follow from the first");
+        m_note("the agent has started a new history; its events follow from the first");
         m_last = 0;
     }
 }

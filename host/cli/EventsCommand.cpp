@@ -65,7 +65,7 @@ std::optional<std::int64_t> numberOf(const std::string& text) {
 }
 
 std::string problemOfNumber(const std::string& text) {
-    return numberOf(text) ? "" : '\'' + text + "' is no number of an event";
+    return numberOf(text) ? "" : '\'' + text + "' is not the id of an event";
 }
 
 /// One event while following: what comes next is not known, so columns have a width of their own.
@@ -139,13 +139,14 @@ Found find(Context& context, std::multimap<std::string, std::string> query, std:
 } // namespace
 
 EventsCommand::EventsCommand(CLI::App& program)
-    : m_command(program.add_subcommand("events", "What situations have raised; -f follows")) {
+    : m_command(program.add_subcommand("events",
+                                       "The events that situations have raised; -f follows them")) {
     const auto anyOf = [&](const char* name, std::vector<std::string>& values, const char* type,
                            const char* help) {
         m_command->add_option(name, values, help)->type_name(type)->allow_extra_args(false);
     };
-    m_command->add_flag("-f,--follow", m_follow, "Go on with new events until Ctrl-C");
-    m_command->add_option("--after", m_after, "Events behind this one")
+    m_command->add_flag("-f,--follow", m_follow, "Continue with new events until Ctrl-C");
+    m_command->add_option("--after", m_after, "Events after this one")
         ->type_name("ID")
         ->check(problemOfNumber);
     m_command->add_option("--before", m_before, "Events before this one")
@@ -156,8 +157,10 @@ EventsCommand::EventsCommand(CLI::App& program)
     anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
     anyOf("--log", m_logs, "LOG", "Of this log; may be repeated");
     anyOf("--severity", m_severities, "SEVERITY", "Of this severity; may be repeated");
-    m_command->add_option("--text", m_text, "With this text, in whatever case")->type_name("TEXT");
-    m_command->add_option("--limit", m_limit, "The latest so many (default 100; with -f 10)")
+    m_command->add_option("--text", m_text, "Containing this text, in upper or lower case")
+        ->type_name("TEXT");
+    m_command
+        ->add_option("--limit", m_limit, "The number of latest events (default 100; with -f 10)")
         ->type_name("COUNT")
         ->check(CLI::Range(1, 1000));
 }
@@ -210,7 +213,7 @@ int EventsCommand::list(Context& context) {
 
 int EventsCommand::follow(Context& context) {
     if (!m_before.empty() || !m_to.empty()) {
-        throw CliError(CLI_USAGE, "--before and --to end a list; -f has no end");
+        throw CliError(CLI_USAGE, "--before and --to cannot be combined with -f, which has no end");
     }
     StopSignals signals;
     AgentClient& client = context.client();

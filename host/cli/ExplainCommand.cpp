@@ -55,12 +55,13 @@ std::string textOf(const Json& explanation, const Terminal& terminal) {
 } // namespace
 
 ExplainCommand::ExplainCommand(CLI::App& program)
-    : m_command(program.add_subcommand("explain", "Why entries raise a situation, or do not")) {
+    : m_command(
+          program.add_subcommand("explain", "Why entries raise a situation, or why they do not")) {
     m_command->add_option("SITUATION", m_situation, "The situation's name");
     m_command->add_option("--file", m_file, "A definition as JSON instead of a situation")
         ->type_name("FILE");
-    m_command->add_option("--line", m_line, "A line as it stands in the log")->type_name("TEXT");
-    m_command->add_option("--log", m_log, "The whole path of a log (default the situation's)")
+    m_command->add_option("--line", m_line, "A line as written in the log")->type_name("TEXT");
+    m_command->add_option("--log", m_log, "The full path of a log (default: the situation's)")
         ->type_name("LOG");
     m_command->add_option("--event", m_event, "An event of the history")->type_name("ID");
     m_command->add_option("--last", m_last, "The last entries of the log (default 5)")

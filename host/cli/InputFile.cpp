@@ -55,8 +55,7 @@ std::string InputFile::text() {
     int character = EOF;
     while ((character = std::getc(m_stream.get())) != EOF) {
         if (text.size() == mostText) {
-            throw CliError(CLI_USAGE,
-                           m_path + " has more than 16 MiB, which is the most that is read");
+            throw CliError(CLI_USAGE, m_path + " is larger than 16 MiB, the most that is read");
         }
         text += static_cast<char>(character);
     }

@@ -15,7 +15,7 @@ public:
     /// Throws CliError when the file cannot be opened.
     explicit InputFile(const std::string& path);
 
-    /// The next line without its line end, or none behind the last one. Of a line of more than
+    /// The next line without its newline, or none behind the last one. Of a line of more than
     /// mostLine bytes each such part is a line. Throws CliError when the file cannot be read.
     std::optional<std::string> line();
 

@@ -169,8 +169,8 @@ std::string unmonitoredText(const Json& answer, const Terminal& terminal) {
 
 LogsCommand::LogsCommand(CLI::App& program)
     : m_command(program.add_subcommand("logs", "The monitored logs, or everything about one")) {
-    m_command->add_option("LOG", m_log, "The whole path of a log");
-    m_command->add_flag("--check", m_check, "End with status 1 when a log is not monitored");
+    m_command->add_option("LOG", m_log, "The full path of a log");
+    m_command->add_flag("--check", m_check, "Exit with status 1 when a log is not monitored");
 }
 
 bool LogsCommand::isChosen() const {
@@ -210,7 +210,7 @@ int LogsCommand::list(Context& context) {
     noteWarnings(answer);
     const std::string unmonitored = unmonitoredText(answer, context.terminal());
     if (table.empty()) {
-        Context::note("the agent monitors no log");
+        Context::note("the agent does not monitor any log");
         context.print(unmonitored);
         return CLI_REFUSED;
     }

@@ -30,7 +30,7 @@ std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
         return error.what();
     }
     const std::vector<std::string> rest = app.remaining();
-    return rest.empty() ? "name a command" : '\'' + rest.front() + "' is no command";
+    return rest.empty() ? "name a command" : '\'' + rest.front() + "' is not a command";
 }
 
 /// Where the operator finds what the command takes.
@@ -41,32 +41,34 @@ std::string hintOf(const CLI::App& app) {
         command += ' ' + at->get_name();
     }
     return "; " + command + " --help lists " +
-           (app.get_subcommands().empty() ? "commands and options" : "what it takes");
+           (app.get_subcommands().empty() ? "commands and options" : "its options");
 }
 
 } // namespace
 
 Program::Program()
     : m_app(std::make_unique<CLI::App>("Works with the log-monitoring agent zrmagent.", "zrmctl")) {
-    m_app->set_version_flag("--version", "zrmctl " ZRM_VERSION, "Print the version and end");
-    m_app->set_help_flag("-h,--help", "Print this help and end; also behind a command");
+    m_app->set_version_flag("--version", "zrmctl " ZRM_VERSION, "Print the version and exit");
+    m_app->set_help_flag("-h,--help", "Print this help and exit; also after a command");
     m_app
         ->add_option("--config", m_options.config,
                      "The agent's configuration (default /etc/zrm/zrm.toml), for address and token")
         ->type_name("FILE");
-    m_app->add_option("--url", m_options.url, "The agent's address (else ZRM_URL)")
+    m_app->add_option("--url", m_options.url, "The agent's address (default: ZRM_URL)")
         ->type_name("URL");
-    m_app->add_option("--token-file", m_options.tokenFile, "The token's file (else ZRM_TOKEN)")
+    m_app
+        ->add_option("--token-file", m_options.tokenFile,
+                     "The file with the token (default: ZRM_TOKEN)")
         ->type_name("FILE");
     m_app
         ->add_option("--ca-file", m_options.caFile,
-                     "Certificates to trust beside the system's (else ZRM_CA_FILE)")
+                     "Certificates to trust besides the system's (default: ZRM_CA_FILE)")
         ->type_name("FILE");
     m_app->add_flag("--json", m_options.json, "Print JSON");
     m_app->fallthrough(); // these options may also stand behind the command
     m_app->require_subcommand(1);
     m_app->footer("Exit status: 0 done, 1 refused or nothing found, 2 unusable command line or\n"
-                  "configuration, 3 no agent answers, 4 no permission.");
+                  "configuration, 3 no agent answered, 4 no permission.");
     m_commands.push_back(std::make_unique<StatusCommand>(*m_app));
     m_commands.push_back(std::make_unique<LogsCommand>(*m_app));
     m_commands.push_back(std::make_unique<EventsCommand>(*m_app));
@@ -97,10 +99,11 @@ int Program::run(int argc, const char* const* argv) {
         Context::note(error.what());
         return error.status();
     } catch (const nlohmann::json::exception&) {
-        Context::note("what answers is no zrmagent of this version: its answer has another form");
+        Context::note(
+            "what answers is not a zrmagent of this version: its answer has a different form");
         return CLI_UNREACHABLE;
     } catch (const std::bad_alloc&) {
-        Context::note("there is not enough memory for the answer");
+        Context::note("not enough memory for the answer");
         return CLI_REFUSED;
     }
 }

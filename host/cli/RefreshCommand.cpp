@@ -9,8 +9,8 @@
 namespace zrm::host {
 
 RefreshCommand::RefreshCommand(CLI::App& program)
-    : m_command(program.add_subcommand("refresh",
-                                       "Let the agent re-read the configuration of the logs")) {}
+    : m_command(program.add_subcommand("refresh", "Make the agent re-read its log configuration")) {
+}
 
 bool RefreshCommand::isChosen() const {
     return m_command->parsed();

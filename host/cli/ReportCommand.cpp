@@ -41,7 +41,7 @@ std::vector<std::string> chosen(std::vector<std::string> asked, const Json& know
                 names += (names.empty() ? "" : ", ") + JsonText::text(name);
             }
             throw CliError(CLI_USAGE,
-                           "--columns: '" + column + "' is no column; the columns are " + names);
+                           "--columns: '" + column + "' is not a column; the columns are " + names);
         }
     }
     return asked;
@@ -117,7 +117,7 @@ std::string csvText(const Json& rows, const std::vector<std::string>& columns) {
 
 ReportCommand::ReportCommand(CLI::App& program)
     : m_command(program.add_subcommand("report", "What a log held between two times")) {
-    m_command->add_option("LOG", m_log, "The whole path of a log")->required();
+    m_command->add_option("LOG", m_log, "The full path of a log")->required();
     m_command->add_option("--from", m_from, "First time (default -24h)")->type_name("TIME");
     m_command->add_option("--to", m_to, "Last time (default now)")->type_name("TIME");
     m_command
@@ -163,7 +163,7 @@ int ReportCommand::run(Context& context) {
     }
     if (JsonText::text(answer, "truncated") == "true") {
         Context::note("the report has read " + JsonText::text(answer, "max_rows") +
-                      " entries, the most that it may: older ones are missing; begin later or end "
+                      " entries, the most that it may: older ones are missing; start later or end "
                       "earlier");
     } else {
         Context::noteReach(answer);

@@ -20,9 +20,10 @@ using Json = SituationOptions::Json;
 Json fileContent(const std::string& path) {
     Json value = JsonText::parse(InputFile(path).text());
     if (!value.is_object()) {
-        throw CliError(CLI_USAGE, "--file: " + path +
-                                      " holds no JSON object; 'zrmctl situations show NAME "
-                                      "--json' prints one");
+        throw CliError(CLI_USAGE,
+                       "--file: " + path +
+                           " does not contain a JSON object; 'zrmctl situations show NAME "
+                           "--json' prints one");
     }
     return value;
 }
@@ -64,14 +65,15 @@ void SituationOptions::addTo(CLI::App& command) {
     add("--file", m_file, "FILE", "The definition as JSON; - is standard input");
     addMember("text", m_text, "TEXT", "A description for people");
     addMember("severity", m_severity, "SEVERITY", "info, minor, warning, major or critical");
-    addMember("log", m_log, "LOG", "The whole path of a log; without it every log");
+    addMember("log", m_log, "LOG", "The full path of a log; without it, every log");
     command
         .add_option("--when", m_when,
                     "A condition, for example \"ENTRYSRC starts 'sshd'\"; all must hold")
         ->type_name("CONDITION")
         ->allow_extra_args(false);
-    addMember("frequency", m_frequency, "COUNT", "At least or most so many, for example \">= 5\"");
-    addMember("period", m_period, "TIME", "within this time, for example 60s, 5m, 1h");
+    addMember("frequency", m_frequency, "COUNT",
+              "At least or at most this many entries, for example \">= 5\"");
+    addMember("period", m_period, "TIME", "Within this time, for example 60s, 5m, 1h");
 }
 
 bool SituationOptions::areGiven() const {

@@ -59,18 +59,19 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
 } // namespace
 
 SituationsCommand::SituationsCommand(CLI::App& program)
-    : m_command(program.add_subcommand("situations", "List, make, change and stop situations")) {
+    : m_command(program.add_subcommand("situations", "List, create, change and stop situations")) {
     using This = SituationsCommand;
     m_command->require_subcommand(0, 1);
-    declare("list", "All situations (also without a command)", &This::list);
+    declare("list", "All situations (the default)", &This::list);
     declareNamed("show", "One situation", &This::show);
-    m_options.addTo(*declareNamed("add", "Make a situation", &This::add));
-    m_options.addTo(*declareNamed("set", "Change a situation: what options name", &This::set));
+    m_options.addTo(*declareNamed("add", "Create a situation", &This::add));
+    m_options.addTo(
+        *declareNamed("set", "Change what the options name in a situation", &This::set));
     declareNamed("remove", "Remove a situation", &This::remove);
-    declareNamed("start", "Start a situation that is stopped", &This::start);
+    declareNamed("start", "Start a stopped situation", &This::start);
     declareNamed("stop", "Stop a situation", &This::stop);
     m_options.addTo(
-        *declareNamed("validate", "Check a definition without making it", &This::validate));
+        *declareNamed("validate", "Check a definition without creating it", &This::validate));
 }
 
 CLI::App* SituationsCommand::declare(const char* name, const char* help, Action action) {
@@ -131,7 +132,7 @@ int SituationsCommand::list(Context& context) {
                    TimeDisplay::local(JsonText::text(situation, "last_raised"))});
     }
     if (table.empty()) {
-        Context::note("there is no situation");
+        Context::note("there are no situations");
         return CLI_REFUSED;
     }
     context.print(table.text(context.terminal()));
@@ -156,7 +157,8 @@ int SituationsCommand::add(Context& context) {
 
 int SituationsCommand::set(Context& context) {
     if (!m_options.areGiven()) {
-        throw CliError(CLI_USAGE, "nothing to change: give --file or the options of what changes");
+        throw CliError(CLI_USAGE,
+                       "nothing to change: give --file, or options for what is to change");
     }
     Json body = m_options.definition(context.client().get(path()));
     body["name"] = m_name;

@@ -16,7 +16,7 @@ SseParser::SseParser(Receiver receiver) : m_receiver(std::move(receiver)) {}
 
 void SseParser::take(std::string_view piece) {
     if (m_line.size() + m_data.size() + piece.size() > longestEvent) {
-        throw CliError(CLI_UNREACHABLE, "what answers is no zrmagent: an event of its stream is "
+        throw CliError(CLI_UNREACHABLE, "what answers is not a zrmagent: an event of its stream is "
                                         "longer than 1 MB");
     }
     for (std::size_t end = piece.find('\n'); end != std::string_view::npos;

@@ -70,9 +70,9 @@ Colour colourOf(const std::string& state) {
 } // namespace
 
 StatusCommand::StatusCommand(CLI::App& program)
-    : m_command(program.add_subcommand("status", "How the agent itself fares")) {
+    : m_command(program.add_subcommand("status", "The state of the agent itself")) {
     m_command->add_flag("--check", m_check,
-                        "End with status 1 when the history or a sink does not work");
+                        "Exit with status 1 when the history or a sink does not work");
 }
 
 bool StatusCommand::isChosen() const {

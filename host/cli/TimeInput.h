@@ -19,7 +19,7 @@ public:
 
     /// What may be written, for messages and help.
     static constexpr const char* forms = "-2h (s, m, h, d, w), now, today, yesterday, 07:30, "
-                                         "2026-11-20, 2026-11-20T07:30:00 or with a zone";
+                                         "2026-11-20, 2026-11-20T07:30:00, optionally with a zone";
 };
 
 } // namespace zrm::host

@@ -112,11 +112,11 @@ TryCommand::TryCommand(CLI::App& program)
     : m_command(program.add_subcommand("try", "Try a format on a file; needs no agent")) {
     m_command
         ->add_option("FORMAT", m_format,
-                     "The format as a log's configuration has it behind the third ';'")
+                     "The format as in the log configuration, after the third ';'")
         ->required();
     m_command->add_option("FILE", m_file, "The file with the lines; - is standard input")
         ->required();
-    m_command->add_option("--lines", m_lines, "The first so many lines (default 100)")
+    m_command->add_option("--lines", m_lines, "The number of lines, from the first (default 100)")
         ->type_name("COUNT")
         ->check(CLI::Range(std::size_t{1}, mostLines));
 }
@@ -149,7 +149,7 @@ int TryCommand::run(Context& context) {
     context.print((result.lines.empty() ? "" : "\n") + coverageOf(result, context.terminal()) +
                   DisplayText::visible(result.configurationLine) + '\n');
     if (lines.empty()) {
-        Context::note(m_file + " has no line to try the format on");
+        Context::note(m_file + " has no lines to try the format on");
     }
     return status;
 }

@@ -40,9 +40,9 @@ std::optional<ConditionProblem> checkWhole(const Column& column, std::string& va
     if (column.isTime && !value.empty()) {
         std::optional<std::string> stamp = TimeText::toStamp(value);
         if (!stamp) {
-            return badValue(quoted(value) + " is no time",
-                            "write it like '2026-11-20T07:03:09', with Z or +01:00 behind it where "
-                            "it is not local, or as a 16-digit time stamp");
+            return badValue(quoted(value) + " is not a time",
+                            "write it like '2026-11-20T07:03:09', followed by Z or +01:00 unless "
+                            "it is local, or as a 16-digit time stamp");
         }
         value = std::move(*stamp);
     }
@@ -71,9 +71,9 @@ std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudg
     constexpr const char* cure =
         "repeat less, and write [A-Za-z] or \\w instead of a class of Unicode such as \\pL";
     if (budget.isSpent()) {
-        return badValue("the regular expressions before this one are as large as all of them may "
-                        "be together",
-                        cure);
+        return badValue(
+            "the regular expressions before this one already reach the limit for all of them",
+            cure);
     }
     RE2::Options options(RE2::Quiet);
     options.set_max_mem(memory);
@@ -85,12 +85,12 @@ std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudg
         return badValue(quoted(value) + " is too large a regular expression", cure);
     }
     if (!pattern.ok()) {
-        return badValue(quoted(value) + " is no regular expression: " + pattern.error(),
+        return badValue(quoted(value) + " is not a regular expression: " + pattern.error(),
                         "correct it (RE2 syntax)");
     }
     budget.spend(size);
     if (budget.isExceeded()) {
-        return badValue("with this one the regular expressions are too large together", cure);
+        return badValue("together with this one the regular expressions are too large", cure);
     }
     return std::nullopt;
 }
@@ -165,7 +165,7 @@ ConditionBuilder::column(std::string_view name) const {
     if (const Column* const column = findColumn(m_columns, name)) {
         return column;
     }
-    ConditionProblem problem{ConditionProblem::COLUMN, quoted(name) + " is no column", ""};
+    ConditionProblem problem{ConditionProblem::COLUMN, quoted(name) + " is not a column", ""};
     if (findColumn(m_columns, upperCase(name)) != nullptr) {
         problem.cure = "write it in upper case: " + upperCase(name);
         return problem;
@@ -188,7 +188,7 @@ ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, st
     const Operator* const known = findOperator(op);
     if (known == nullptr) {
         return ConditionProblem{
-            ConditionProblem::OPERATOR, quoted(op) + " is no operator",
+            ConditionProblem::OPERATOR, quoted(op) + " is not an operator",
             "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in"};
     }
     if (column.isNumber && !known->forNumbers) {
@@ -256,7 +256,8 @@ ConditionBuilder::Result ConditionBuilder::several(const Column& column,
                                                    : std::move(checked.text));
         bytes += condition.values.back().size() + 1;
         if (condition.values.back().find('\n') != std::string::npos) {
-            return badValue("a value of the list has a line end", "no column holds one: remove it");
+            return badValue("a value of the list has a line end",
+                            "no column can contain one: remove it");
         }
     }
     if (bytes > longestList) {
@@ -270,8 +271,8 @@ std::variant<std::vector<Condition>, ConditionProblem>
 ConditionBuilder::ofLog(std::string_view path) {
     const std::size_t slash = path.rfind('/');
     if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
-        return badValue(quoted(path) + " is no absolute path of a file",
-                        "write the log's path as its configuration has it, beginning with '/'");
+        return badValue(quoted(path) + " is not the absolute path of a file",
+                        "write the log's path as in the log configuration, beginning with '/'");
     }
     const std::string_view directory = path.substr(0, slash + 1);
     const std::string_view name = path.substr(slash + 1);

@@ -81,7 +81,7 @@ std::variant<ConditionValue::Item, ConditionProblem> item(Scanner& scanner) {
         return badValue("the value is missing", form);
     }
     if (error != std::errc() || end != word.data() + word.size()) {
-        return badValue("'" + std::string(word) + "' is no value",
+        return badValue("'" + std::string(word) + "' is not a value",
                         "write text in single quotes and numbers without");
     }
     return ConditionValue::Item(number);

@@ -29,7 +29,7 @@ constexpr std::size_t largestFile = 4 * 1024 * 1024; ///< bytes
 
 void requireAbsolute(ConfigSection& section, std::string_view key, const std::string& path) {
     if (path.empty() || path.front() != '/') {
-        section.problem(key, "'" + path + "' is no absolute path", "begin it with '/'");
+        section.problem(key, "'" + path + "' is not an absolute path", "begin it with '/'");
     }
 }
 
@@ -51,7 +51,7 @@ void readAgent(const toml::table& table, ConfigProblems& problems, HostConfig& c
     }
     if (const std::optional<std::int64_t> rows = section.number("max_rows")) {
         if (*rows < 1 || *rows > std::numeric_limits<std::int32_t>::max()) {
-            section.problem("max_rows", "is no usable number of rows",
+            section.problem("max_rows", "is not a usable number of rows",
                             "write a number from 1 to 2147483647");
         }
         config.environment.push_back({"ZRM_MAX_ROWS", std::to_string(*rows)});
@@ -81,7 +81,7 @@ void readHttpAccess(ConfigSection& section, HttpConfig& http) {
     if (!listen.empty()) {
         http.listen = ListenAddress::parse(listen);
         if (!http.listen) {
-            section.problem("listen", "'" + listen + "' is no address to listen at",
+            section.problem("listen", "'" + listen + "' is not an address to listen on",
                             "write ADDRESS:PORT, for example \"127.0.0.1:7186\", or \"\" for none");
         }
     }
@@ -98,11 +98,11 @@ void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& co
                         "'" + section.text("listen").value_or("") +
                             "' can be reached from other machines",
                         "write a loopback address (127.0.0.1, [::1] or localhost), or add "
-                        "certificate and key, so that TLS is spoken");
+                        "certificate and key, to use TLS");
     }
     readPath(section, "key", config.http.key);
     if (section.has("certificate") != section.has("key")) {
-        section.problem(section.has("key") ? "key" : "certificate", "stands alone",
+        section.problem(section.has("key") ? "key" : "certificate", "is given alone",
                         "give both certificate and key, or neither");
     }
     section.refuseUnknownKeys();

@@ -26,8 +26,8 @@ std::string warningOfSecrets(const HostConfig& config, const std::string& path) 
         return "";
     }
     return path +
-           " holds secrets and every user can read it: move them into files of their own "
-           "(secret_file, headers_file), or take the others' permissions away (chmod o= " +
+           " contains secrets and every user can read it: move them into separate files "
+           "(secret_file, headers_file), or remove the permissions of other users (chmod o= " +
            path + ')';
 }
 

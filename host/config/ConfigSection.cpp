@@ -24,7 +24,7 @@ const char* typeName(const toml::node& node) {
     case toml::node_type::floating_point:
         return "a number with a fraction";
     case toml::node_type::boolean:
-        return "a truth value";
+        return "a boolean";
     default:
         return "a date or time";
     }
@@ -72,7 +72,7 @@ std::optional<std::string> ConfigSection::text(std::string_view key) {
     }
     const std::string& text = node->as_string()->get();
     if (text.find('\0') != std::string::npos) {
-        problem(key, "holds a zero byte", "leave it out");
+        problem(key, "contains a NUL character", "leave it out");
         return std::nullopt;
     }
     return text;
@@ -83,7 +83,7 @@ void ConfigSection::addText(std::vector<Text>& texts, std::string_view key,
                             const toml::value<std::string>& text) {
     const unsigned line = lineOf(text.source());
     if (text->find('\0') != std::string::npos) {
-        problem(line, key, "holds a zero byte", "leave it out");
+        problem(line, key, "contains a NUL character", "leave it out");
         return;
     }
     texts.emplace_back(*text, line);

@@ -61,14 +61,14 @@ struct TextKind {
 };
 
 constexpr std::array textKinds = {
-    TextKind{SinkOption::TEXT, isText, "is no usable text", ""},
+    TextKind{SinkOption::TEXT, isText, "is not usable text", ""},
     TextKind{SinkOption::CHOICE, isChoice, "is none of the choices", ""},
-    TextKind{SinkOption::URL, isUrl, "is no URL to send events to",
+    TextKind{SinkOption::URL, isUrl, "is not a URL that events can be sent to",
              "write http:// or https://, a host, and a port and a path where they are needed"},
-    TextKind{SinkOption::ADDRESS, isAddress, "is no address to send events to",
+    TextKind{SinkOption::ADDRESS, isAddress, "is not an address that events can be sent to",
              "write HOST:PORT, an IPv6 address in brackets"},
-    TextKind{SinkOption::PATH, isPath, "is no absolute path", "begin it with '/'"},
-    TextKind{SinkOption::OUTPUT, isOutput, "is no absolute path",
+    TextKind{SinkOption::PATH, isPath, "is not an absolute path", "begin it with '/'"},
+    TextKind{SinkOption::OUTPUT, isOutput, "is not an absolute path",
              "begin it with '/', or write \"-\" for standard output"},
 };
 
@@ -108,12 +108,12 @@ struct TableKind {
 };
 
 constexpr std::array tableKinds = {
-    TableKind{SinkOption::HEADERS, isAddableHeader, "is no name of a header that can be added",
+    TableKind{SinkOption::HEADERS, isAddableHeader, "is not the name of a header that can be added",
               "use letters, digits and dashes; what describes the request is set already"},
-    TableKind{SinkOption::LABELS, isLabelName, "is no name of a label that can be added",
+    TableKind{SinkOption::LABELS, isLabelName, "is not the name of a label that can be added",
               "use letters, digits and underscores, a letter first; alertname, severity, log and "
               "node are set already"},
-    TableKind{SinkOption::ATTRIBUTES, isAttributeName, "is no name of an attribute",
+    TableKind{SinkOption::ATTRIBUTES, isAttributeName, "is not the name of an attribute",
               "write at least one character and no control characters"},
 };
 
@@ -176,7 +176,7 @@ SinkOptionReader::Value SinkOptionReader::readDuration(const SinkOption& option)
     const std::string text = m_section.text(option.name).value_or(std::string(option.value));
     const std::optional<std::chrono::seconds> length = DurationText::parse(text);
     if (!length || length->count() < option.least || length->count() > option.most) {
-        m_section.problem(option.name, "'" + text + "' is no usable length of time",
+        m_section.problem(option.name, "'" + text + "' is not a usable duration",
                           "write a number and s, m, h or d, from " + std::to_string(option.least) +
                               "s to " + std::to_string(option.most) + "s");
         return std::nullopt;
@@ -198,7 +198,7 @@ SinkOptionReader::Value SinkOptionReader::readTexts(const SinkOption& option) {
         if (!kind.accepts(name)) {
             section.problem(name, kind.what, kind.cure);
         } else if (text && std::any_of(text->begin(), text->end(), isControl)) {
-            section.problem(name, "holds control characters", "leave them out");
+            section.problem(name, "contains control characters", "leave them out");
         }
         texts.emplace(name, text.value_or(""));
     }

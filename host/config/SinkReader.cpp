@@ -59,7 +59,7 @@ void SinkReader::readOption(ConfigSection& section, const SinkOption& option, Si
                         "write " + name + " = \"" + std::string(option.value) + '"');
     }
     if (!option.instead.empty() && section.has(name) && section.has(option.instead)) {
-        section.problem(name, "stands beside " + std::string(option.instead),
+        section.problem(name, "cannot be combined with " + std::string(option.instead),
                         "leave one of them out");
     }
 }

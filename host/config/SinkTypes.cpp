@@ -25,8 +25,8 @@ constexpr std::array commonOptions = {
            .kind = Option::TEXT,
            .need = Option::OPTIONAL,
            .value = "",
-           .meaning = "what the sink is called in messages and metrics, and what its place in the "
-                      "history is kept under; unique",
+           .meaning = "the sink's name in messages and metrics, under which its position in the "
+                      "history is kept; unique",
            .most = 128},
 };
 
@@ -39,24 +39,24 @@ constexpr Option timeoutOption{
     .meaning = "how long one request may take, from connecting to the end of the answer",
     .least = 1,
     .most = 300};
-constexpr Option headersOption{
-    .name = "headers",
-    .kind = Option::HEADERS,
-    .need = Option::OPTIONAL,
-    .value = "",
-    .meaning = "headers that are sent with each request, such as `Authorization`"};
+constexpr Option headersOption{.name = "headers",
+                               .kind = Option::HEADERS,
+                               .need = Option::OPTIONAL,
+                               .value = "",
+                               .meaning =
+                                   "headers to send with each request, such as `Authorization`"};
 constexpr Option headersFileOption{
     .name = "headers_file",
     .kind = Option::PATH,
     .need = Option::OPTIONAL,
     .value = "",
-    .meaning = "the file with more headers, `Name: value` a line, which is read for each request"};
+    .meaning = "a file with more headers, one `Name: value` per line; it is read for each request"};
 constexpr Option caFileOption{
     .name = "ca_file",
     .kind = Option::PATH,
     .need = Option::OPTIONAL,
     .value = "",
-    .meaning = "certificates (PEM) of the authorities that are trusted, instead of the system's"};
+    .meaning = "certificates (PEM) of the authorities to trust instead of the system's"};
 
 constexpr std::array webhookOptions = {
     Option{.name = "url",
@@ -68,7 +68,7 @@ constexpr std::array webhookOptions = {
            .kind = Option::NUMBER,
            .need = Option::OPTIONAL,
            .value = "100",
-           .meaning = "how many events one request has at most",
+           .meaning = "the largest number of events in one request",
            .least = 1,
            .most = 256},
     Option{.name = "secret",
@@ -82,7 +82,7 @@ constexpr std::array webhookOptions = {
            .kind = Option::PATH,
            .need = Option::OPTIONAL,
            .value = "",
-           .meaning = "the file with the secret, which is read for each request"},
+           .meaning = "the file with the secret; it is read for each request"},
     timeoutOption,
     headersOption,
     headersFileOption,
@@ -106,12 +106,12 @@ constexpr std::array alertmanagerOptions = {
            .kind = Option::LABELS,
            .need = Option::OPTIONAL,
            .value = "",
-           .meaning = "labels that are added to each alert"},
+           .meaning = "labels to add to each alert"},
     Option{.name = "generator_url",
            .kind = Option::URL,
            .need = Option::OPTIONAL,
            .value = "",
-           .meaning = "the link from an alert to where it comes from"},
+           .meaning = "the link from an alert to its origin"},
     timeoutOption,
     headersOption,
     headersFileOption,
@@ -130,7 +130,7 @@ constexpr std::array syslogOptions = {
            .kind = Option::CHOICE,
            .need = Option::OPTIONAL,
            .value = "tcp",
-           .meaning = "frames that tell their length over TCP, or datagrams over UDP",
+           .meaning = "TCP with octet-counted frames, or UDP datagrams",
            .choices = transports},
     Option{.name = "facility",
            .kind = Option::CHOICE,
@@ -163,7 +163,7 @@ constexpr std::array otlpOptions = {
            .kind = Option::ATTRIBUTES,
            .need = Option::OPTIONAL,
            .value = "",
-           .meaning = "resource attributes that are added"},
+           .meaning = "resource attributes to add"},
     timeoutOption,
     headersOption,
     headersFileOption,
@@ -181,9 +181,9 @@ constexpr std::array jsonlOptions = {
 constexpr std::array<SinkType, typeNames.size()> types = {{
     {"jsonl", "one JSON object per event, one event per line", "path", jsonlOptions},
     {"webhook", "JSON in batches to a URL, by HTTP POST", "url", webhookOptions},
-    {"alertmanager", "an alert for each event, to an Alertmanager", "url", alertmanagerOptions},
+    {"alertmanager", "an alert in an Alertmanager for each event", "url", alertmanagerOptions},
     {"syslog", "syslog messages (RFC 5424) over TCP or UDP", "address", syslogOptions},
-    {"otlp", "log records of OpenTelemetry over HTTP, in JSON", "url", otlpOptions},
+    {"otlp", "OpenTelemetry log records over HTTP, in JSON", "url", otlpOptions},
 }};
 
 } // namespace

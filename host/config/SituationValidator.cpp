@@ -36,7 +36,7 @@ void checkName(const std::optional<std::string>& name, Problems& problems) {
         *name == ".." || std::any_of(name->begin(), name->end(), isControl)) {
         problems.push_back({"name",
                             {},
-                            "is no usable name",
+                            "is not a usable name",
                             "write 1 to " + inBytes(SituationValidator::longestName) +
                                 " without control characters, and not . or .."});
     }
@@ -55,7 +55,7 @@ void checkSeverity(const std::string& severity, Problems& problems) {
     if (std::find(severities.begin(), severities.end(), severity) == severities.end()) {
         problems.push_back({"severity",
                             {},
-                            "'" + severity + "' is no severity",
+                            "'" + severity + "' is not a severity",
                             "write info, minor, warning, major or critical"});
     }
 }
@@ -116,12 +116,13 @@ private:
     }
 
     Problems& m_problems;
-    Threshold m_frequency{"FREQTHRESH", &Thresholds::isFrequency,
-                          "the condition on FREQTHRESH states no frequency that can be reached",
-                          "write >=, >, <= or < and a number of entries, for example "
-                          "FREQTHRESH >= 5"};
+    Threshold m_frequency{
+        "FREQTHRESH", &Thresholds::isFrequency,
+        "the condition on FREQTHRESH does not state a frequency that can be reached",
+        "write >=, >, <= or < and a number of entries, for example "
+        "FREQTHRESH >= 5"};
     Threshold m_period{"PERIODTHRS", &Thresholds::isPeriod,
-                       "the condition on PERIODTHRS states no period",
+                       "the condition on PERIODTHRS does not state a period",
                        "write = and a number of seconds from 1, for example PERIODTHRS = 60"};
 };
 
@@ -174,11 +175,10 @@ void addConditions(const SituationText& text, SituationConfig& situation, Patter
 
 void addThresholds(const SituationText& text, SituationConfig& situation, Problems& problems) {
     if (text.frequency && !text.period) {
-        problems.push_back({"frequency", {}, "has no period beside it", "add period = \"60s\""});
+        problems.push_back({"frequency", {}, "has no period", "add period = \"60s\""});
     }
     if (text.period && !text.frequency) {
-        problems.push_back(
-            {"period", {}, "has no frequency beside it", "add frequency = \">= 5\""});
+        problems.push_back({"period", {}, "has no frequency", "add frequency = \">= 5\""});
     }
     const auto add = [&](std::string_view field, const std::optional<std::string>& value,
                          const std::optional<Condition>& condition, const char* what,
@@ -191,10 +191,10 @@ void addThresholds(const SituationText& text, SituationConfig& situation, Proble
     };
     add("frequency", text.frequency,
         text.frequency ? Thresholds::frequency(*text.frequency) : std::nullopt,
-        "no frequency that can be reached",
+        "not a frequency that can be reached",
         "write >=, >, <= or < and a number of entries, for example \">= 5\"");
     add("period", text.period, text.period ? Thresholds::period(*text.period) : std::nullopt,
-        "no period", "write a number and s, m, h or d, for example \"60s\"");
+        "not a period", "write a number and s, m, h or d, for example \"60s\"");
 }
 
 } // namespace

@@ -30,8 +30,8 @@ std::unique_ptr<History> openHistory(const HostConfig& config, std::string& prob
         return std::move(*history);
     }
     problem = std::get<std::string>(opened);
-    say("the history is off: %s. Until the next start sinks get events without it, and one that "
-        "stays down stops the monitoring",
+    say("the history is off: %s. Until the next start sinks receive events without it, and one "
+        "that stays down stops the monitoring",
         problem.c_str());
     return nullptr;
 }
@@ -89,7 +89,8 @@ void Delivery::finish(EventQueue::Clock::time_point limit) {
 }
 
 void Delivery::finishSinks(EventQueue::Clock::time_point limit) {
-    const char* const rest = m_history == nullptr ? "" : "; it gets them when the agent runs again";
+    const char* const rest =
+        m_history == nullptr ? "" : "; it will get them when the agent runs again";
     // All of them first: one that hangs until the limit leaves the others their time.
     for (const auto& sink : m_sinks) {
         sink->beginFinish();

@@ -87,9 +87,8 @@ public:
         line.cause = Cause::NONE;
         if (m_directories != nullptr && log[0] == '/' && !isWithin(log, *m_directories)) {
             line.verdict = Verdict::OUTSIDE;
-            line.reason =
-                "The file is outside the directories of the configured logs; zrmctl check "
-                "judges it on the agent's machine.";
+            line.reason = "The file is outside the directories of the configured logs; zrmctl "
+                          "check checks it on the agent's machine.";
             return;
         }
         TraceCapture errors;

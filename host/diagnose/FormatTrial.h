@@ -38,7 +38,7 @@ public:
         std::size_t directive; ///< index of its directive
     };
     struct Line {
-        std::string line; ///< without its line end
+        std::string line; ///< without its newline
         bool matched = false;
         std::vector<Field> fields; ///< those in front of the failure, too
         std::vector<std::pair<std::string, std::string>> row; ///< column and text, when matched
@@ -68,7 +68,7 @@ public:
     /// What there is to say of the format, without lines.
     const Result& result() const noexcept { return m_result; }
 
-    /// Tries one line, given without its line end; of more than 2046 bytes the beginning. The
+    /// Tries one line, given without its newline; of more than 2046 bytes the beginning. The
     /// format must have been accepted.
     Line scan(std::string_view line);
 

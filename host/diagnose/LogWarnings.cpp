@@ -35,9 +35,8 @@ constexpr std::size_t recordsTried = 50;
 constexpr const char* syslogCure =
     "Describe the file as a text log with a format, or let the system logger write traditional "
     "times (RSYSLOG_TraditionalFileFormat).";
-constexpr const char* accountingCure =
-    "Linux's wtmp has other records and cannot be read as type A: take its line out of the log "
-    "configuration.";
+constexpr const char* accountingCure = "Linux's wtmp has other records and cannot be read as type "
+                                       "A: remove its line from the log configuration.";
 
 /// A syslog file that nobody monitors.
 class TrialSyslog : public SysLogFile {
@@ -48,8 +47,8 @@ public:
 /// What the name of an open file has become; none while it still names it.
 std::optional<LogWarning> ofName(const LogLedgerView& log) {
     constexpr const char* cure =
-        " Rotate with copytruncate. To have the new file read, restart the agent, or take the "
-        "log's line out of the log configuration, refresh, put it back, and refresh again.";
+        " Rotate with copytruncate. To have the new file read, restart the agent, or remove the "
+        "log's line from the log configuration, refresh, add it again, and refresh once more.";
     struct stat status;
     if (!log.openFile) {
         return std::nullopt;
@@ -59,7 +58,7 @@ std::optional<LogWarning> ofName(const LogLedgerView& log) {
             return std::nullopt;
         }
         return LogWarning{"missing", 0,
-                          "No file has this log's name any more. The agent goes on reading the "
+                          "No file has this log's name any more. The agent continues to read the "
                           "file that it has opened, and will not read a new one of this name." +
                               std::string(cure)};
     }
@@ -67,8 +66,8 @@ std::optional<LogWarning> ofName(const LogLedgerView& log) {
         return std::nullopt;
     }
     return LogWarning{"replaced", 0,
-                      "Another file has this log's name by now, and is not read: the agent goes on "
-                      "reading the file that it has opened." +
+                      "Another file now has this log's name and is not read: the agent continues "
+                      "to read the file that it has opened." +
                           std::string(cure)};
 }
 

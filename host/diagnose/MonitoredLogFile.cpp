@@ -26,8 +26,8 @@ std::string problemOf(int descriptor, const std::optional<FileIdentity>& monitor
         return "the log cannot be read: it is not a regular file";
     }
     if (monitored && *monitored != FileIdentity{status.st_dev, status.st_ino}) {
-        return "the log cannot be read: its name is another file's by now, and its monitor reads "
-               "the one that had the name before";
+        return "the log cannot be read: another file now has its name, and its monitor reads the "
+               "one that had the name before";
     }
     return "";
 }

@@ -102,7 +102,7 @@ std::string TraceLevels::parseWord(std::string_view word) {
         }
         if (!std::all_of(unit->begin(), unit->end(),
                          [](char c) { return c > ' ' && c < '\x7f'; })) {
-            return "\"" + std::string(*unit) + "\" is no name of a source file";
+            return "\"" + std::string(*unit) + "\" is not the name of a source file";
         }
     }
     unsigned level = 0;
@@ -113,7 +113,8 @@ std::string TraceLevels::parseWord(std::string_view word) {
         const std::optional<unsigned> known = classOf(name);
         if (!known) {
             return "\"" + std::string(name) + "\" in \"" + std::string(word) +
-                   "\" is no trace class; the classes are error, flow, detail, fine, all, none, or "
+                   "\" is not a trace class; the classes are error, flow, detail, fine, all, none, "
+                   "or "
                    "a number from 0 to 255";
         }
         level |= *known;

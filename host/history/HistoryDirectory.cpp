@@ -108,7 +108,7 @@ std::string HistoryDirectory::restore() {
     constexpr const char* cure = "; make it a directory that the agent may write, or set "
                                  "history.directory to one";
     if (mkdir(m_directory.c_str(), directoryMode) == -1 && errno != EEXIST) {
-        return because("cannot make the directory " + m_directory, errno) + cure;
+        return because("cannot create the directory " + m_directory, errno) + cure;
     }
     if (!hasLock()) {
         std::string problem;

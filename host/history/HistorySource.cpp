@@ -65,8 +65,7 @@ void HistorySource::use(std::shared_ptr<const EventBatch> batch) {
 
 /// Goes on at the event `next`: those before it are gone.
 void HistorySource::passOver(std::uint64_t next) {
-    say("%s did not get the events %" PRIu64 " to %" PRIu64
-        ": the history does not hold them any longer",
+    say("%s did not get the events %" PRIu64 " to %" PRIu64 ": the history no longer contains them",
         m_sink.c_str(), m_cursor.load() + 1, next - 1);
     m_cursor.store(next - 1);
 }

@@ -70,7 +70,7 @@ bool writeAll(int fd, std::string_view text) {
 std::string make(const std::string& path) {
     const std::string directory = path.substr(0, path.rfind('/'));
     if (!directory.empty() && mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
-        return because("cannot make the directory " + directory, errno);
+        return because("cannot create the directory " + directory, errno);
     }
     const std::optional<std::string> token = newToken();
     if (!token) {
@@ -79,13 +79,13 @@ std::string make(const std::string& path) {
     std::string temporary = path + ".XXXXXX";
     const int fd = mkstemp(temporary.data()); // readable for the owner alone
     if (fd == -1) {
-        return because("cannot make a file in " + directory, errno);
+        return because("cannot create a file in " + directory, errno);
     }
     std::string problem;
     if (!writeAll(fd, *token + '\n')) {
         problem = because("cannot write " + temporary, errno);
     } else if (link(temporary.c_str(), path.c_str()) == -1 && errno != EEXIST) {
-        problem = because("cannot make " + path, errno);
+        problem = because("cannot create " + path, errno);
     }
     close(fd);
     unlink(temporary.c_str());
@@ -100,7 +100,7 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     TraceScope trace(anchor);
     struct stat status {};
     if (stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode)) {
-        return path + " is no file that can hold a token"; // opening a pipe would wait
+        return path + " is not a file that can contain a token"; // opening a pipe would wait
     }
     Stream stream(std::fopen(path.c_str(), "re"));
     if (stream == nullptr && errno == ENOENT) {
@@ -115,8 +115,8 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     }
     if ((status.st_mode & S_IRWXO) != 0) {
         return path +
-               " is open to every user: take the others' permissions away (chmod o= " + path +
-               ") or remove it, and a new one is made";
+               " is accessible to every user: remove the permissions of other users (chmod o= " +
+               path + ") or remove it to have a new one created";
     }
     char text[longestToken + 2];
     std::string token(text, std::fread(text, 1, sizeof text, stream.get()));
@@ -124,8 +124,8 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     const bool isPrintable =
         std::all_of(token.begin(), token.end(), [](char c) { return c > 0x20 && c < 0x7f; });
     if (token.size() < shortestToken || token.size() > longestToken || !isPrintable) {
-        return path + " holds no token of 32 to 1024 visible characters: remove it, and a new one "
-                      "is made";
+        return path + " does not contain a token of 32 to 1024 visible characters: remove it to "
+                      "have a new one created";
     }
     return ApiToken(std::move(token));
 }

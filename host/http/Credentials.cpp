@@ -40,7 +40,7 @@ Credentials::Change Credentials::refresh() {
     if (m_tokenFile.hasChanged()) {
         const std::string problem = loadToken();
         change.isNew = problem.empty();
-        change.problem = problem.empty() ? "" : "the token before goes on: " + problem;
+        change.problem = problem.empty() ? "" : "the previous token stays in use: " + problem;
     }
     refreshTls(change);
     return change;
@@ -61,7 +61,7 @@ void Credentials::refreshTls(Change& change) {
     } else if (isCertificateNew || isKeyNew) {
         m_isTriedAgain = true;
     } else {
-        change.problem = "the certificate before goes on: " + problem;
+        change.problem = "the previous certificate stays in use: " + problem;
     }
 }
 

@@ -31,7 +31,7 @@ constexpr std::size_t mostBehindHead = 8 * 1024 * 1024;
 constexpr std::size_t mostUnparsed = 16 * 1024; ///< no part of a body is longer, besides its data
 constexpr std::size_t mostAhead = 16 * 1024;    ///< of requests behind the one under way
 
-const Problem bodyIncomplete{400, "the body did not come whole", "body"};
+const Problem bodyIncomplete{400, "the body is incomplete", "body"};
 
 } // namespace
 
@@ -94,12 +94,12 @@ void HttpConnection::onTime() {
     switch (m_phase) {
     case READING_HEAD:
         m_isLast = true;
-        write(m_context.dispatcher.refuse({408, "the request did not come within 10 s", ""}));
+        write(m_context.dispatcher.refuse({408, "the request did not arrive within 10 s", ""}));
         break;
     case READING_BODY:
         m_isLast = true;
         write(m_context.dispatcher.refuse(*m_admission,
-                                          {408, "the request did not come within 10 s", "body"}));
+                                          {408, "the request did not arrive within 10 s", "body"}));
         break;
     case WAITING_FOR_WORKER:
         onWaitTimeOver();
@@ -364,7 +364,7 @@ void HttpConnection::onWaitTimeOver() {
     }
     TraceScope trace(anchor);
     trace.detail()("Every worker is busy: %s was refused.", m_job->admission.request.path.c_str());
-    refuseJob({503, "the agent is busy with other requests: try again in some seconds", ""});
+    refuseJob({503, "the agent is busy with other requests: try again in a few seconds", ""});
 }
 
 void HttpConnection::refuseJob(const Problem& problem) {

@@ -136,7 +136,7 @@ std::string HttpServer::Network::start(const ListenAddress& address, ApiToken to
                                        std::shared_ptr<const TlsContext> tls) {
     TraceScope trace(anchor);
     if (!listen(address)) {
-        return "cannot listen at " + address.text() +
+        return "cannot listen on " + address.text() +
                (address.port == 0 ? "" : ": is another agent running?");
     }
     const DescriptorRoom room = DescriptorRoom::make(m_size.connections);

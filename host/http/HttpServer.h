@@ -53,7 +53,7 @@ public:
     /// What was answered so far, and how many connections are open. Any thread.
     const RequestStatistics& statistics() const noexcept;
     std::size_t connections() const;
-    /// Connections that found no place.
+    /// Connections that were refused because the limit was reached.
     std::uint64_t refusedConnections() const;
 
     /// Ends the serving: requests under way are cancelled and answered first, streams end. At the

@@ -36,7 +36,7 @@ public:
         } else if (event == json::parse_event_t::object_end) {
             m_keys.pop_back();
         } else if (event == json::parse_event_t::key && !m_keys.back().insert(parsed).second) {
-            throw RequestRefused(400, "the member comes twice", shown(parsed.get<std::string>()));
+            throw RequestRefused(400, "the member appears twice", shown(parsed.get<std::string>()));
         }
         return true;
     }
@@ -53,7 +53,7 @@ std::shared_ptr<const json> parse(std::string_view body) {
         document = json::parse(body, std::ref(rules), throwsErrors);
     }
     if (document.is_discarded()) {
-        throw RequestRefused(400, "the body is no JSON", "body");
+        throw RequestRefused(400, "the body is not JSON", "body");
     }
     if (!document.is_object()) {
         throw RequestRefused(400, "write an object", "body");

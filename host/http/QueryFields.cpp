@@ -21,7 +21,7 @@ std::vector<std::string> QueryFields::texts(const std::string& name) {
 std::optional<std::string> QueryFields::text(const std::string& name) {
     const std::vector<std::string> values = texts(name);
     if (values.size() > 1) {
-        throw RequestRefused(400, "the parameter comes more than once", name);
+        throw RequestRefused(400, "the parameter appears more than once", name);
     }
     return values.empty() ? std::nullopt : std::optional(values.front());
 }
@@ -53,8 +53,8 @@ std::optional<std::int64_t> QueryFields::time(const std::string& name) {
     if (!time) {
         throw RequestRefused(400,
                              "'" + *value +
-                                 "' is no time; write it like 2026-11-20T07:03:09, with Z or "
-                                 "+01:00 behind it where it is not local",
+                                 "' is not a time; write it like 2026-11-20T07:03:09, followed by "
+                                 "Z or +01:00 unless it is local",
                              name);
     }
     return time;

@@ -86,7 +86,7 @@ HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& reque
         // On this thread: a handler that ends the process must not wait for itself.
         const ActiveRequests::Guard guard(active);
         if (!guard) {
-            throw RequestRefused(503, "the agent is ending", "");
+            throw RequestRefused(503, "the agent is stopping", "");
         }
         RequestLimit reading(RequestLimit::Clock::now() + limit,
                              [&] { return request.cancelled.stop_requested(); });

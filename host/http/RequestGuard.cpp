@@ -64,7 +64,7 @@ std::optional<Problem> RequestGuard::refuse(const Headers& headers, bool isPubli
     const std::string_view scheme = m_tls == nullptr ? "http://" : "https://";
     if (headers.origin && (!headers.origin->starts_with(scheme) ||
                            !isOurs(std::string_view(*headers.origin).substr(scheme.size())))) {
-        return Problem{403, "requests of other origins are refused", "Origin"};
+        return Problem{403, "requests from other origins are refused", "Origin"};
     }
     if (isPublic) {
         return std::nullopt;

@@ -139,7 +139,7 @@ template <class Name> std::optional<std::string> find(const Message& message, Na
 /// The parser takes the first of several headers, and more forms of a length than one.
 void checkSingle(const Message& message) {
     const auto refuseTwice = [](const std::string& name) {
-        refuse(400, "the header comes more than once", name);
+        refuse(400, "the header appears more than once", name);
     };
     for (const http::field name : singleHeaders) {
         if (message.count(name) > 1) {
@@ -243,7 +243,7 @@ std::size_t RequestParser::Engine::put(std::string_view bytes) {
     if (error == http::error::body_limit) {
         m_bodyProblem = RequestDispatcher::tooLong().problem();
     } else if (error && error != http::error::need_more) {
-        m_bodyProblem = {400, "the body did not come whole", "body"};
+        m_bodyProblem = {400, "the body is incomplete", "body"};
     }
     return taken;
 }

@@ -20,7 +20,7 @@ std::atomic<int> leftBehind{0};
 
 HttpAnswer TimedWork::answer(std::function<HttpAnswer()> work, std::chrono::milliseconds limit) {
     if (leftBehind.load() >= mostLeftBehind) {
-        throw RequestRefused(503, "the agent is busy: requests wait for a file system", "");
+        throw RequestRefused(503, "the agent is busy: requests are waiting for a file system", "");
     }
     auto promise = std::make_shared<std::promise<HttpAnswer>>();
     auto isLate = std::make_shared<std::atomic<bool>>(false);

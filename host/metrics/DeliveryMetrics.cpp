@@ -12,11 +12,11 @@ namespace zrm::host {
 namespace {
 
 void collectQueue(MetricText& text, const QueueState& queue) {
-    text.gauge("zrm_queue_events", "Events that wait in the queue behind the logs.");
+    text.gauge("zrm_queue_events", "Events that are waiting in the queue.");
     text.add(static_cast<double>(queue.size));
-    text.gauge("zrm_queue_capacity_events", "Events that find room in the queue.");
+    text.gauge("zrm_queue_capacity_events", "Number of events for which the queue has room.");
     text.add(static_cast<double>(queue.capacity));
-    text.counter("zrm_queue_waits_total", "Times that a log had to wait for room in the queue.");
+    text.counter("zrm_queue_waits_total", "How often a log had to wait for room in the queue.");
     text.add(queue.waits);
     text.counter("zrm_queue_wait_seconds_total",
                  "Time that logs have waited for room in the queue, in seconds.");
@@ -28,15 +28,15 @@ MetricText::Labels labelsOf(const SinkState& sink) {
 }
 
 void collectSinks(MetricText& text, const std::vector<SinkState>& sinks) {
-    text.gauge("zrm_sink_up", "0 while deliveries to the sink fail, else 1.");
+    text.gauge("zrm_sink_up", "0 while deliveries to the sink fail, otherwise 1.");
     for (const SinkState& sink : sinks) {
         text.add(sink.condition == SinkState::Condition::FAILING ? 0.0 : 1.0, labelsOf(sink));
     }
-    text.gauge("zrm_sink_lag_events", "Events that the sink has still to get.");
+    text.gauge("zrm_sink_lag_events", "Events that have not been delivered to the sink yet.");
     for (const SinkState& sink : sinks) {
         text.add(sink.lag, labelsOf(sink));
     }
-    text.counter("zrm_sink_delivered_events_total", "Events that the sink got.");
+    text.counter("zrm_sink_delivered_events_total", "Events that were delivered to the sink.");
     for (const SinkState& sink : sinks) {
         text.add(sink.delivered, labelsOf(sink));
     }
@@ -47,15 +47,15 @@ void collectSinks(MetricText& text, const std::vector<SinkState>& sinks) {
 }
 
 void collectHistory(MetricText& text, const HistoryState& history) {
-    text.gauge("zrm_history_up", "0 while the history takes no events, else 1.");
+    text.gauge("zrm_history_up", "0 while the history cannot store events, otherwise 1.");
     text.add(history.problem.empty() ? 1.0 : 0.0);
-    text.gauge("zrm_history_events", "Events that the history holds.");
+    text.gauge("zrm_history_events", "Events in the history.");
     text.add(history.events);
     text.gauge("zrm_history_size_bytes", "Size of the history on disk.");
     text.add(history.bytes);
     text.gauge("zrm_history_damaged_events", "Events that readers found damaged since the start.");
     text.add(history.damaged);
-    text.gauge("zrm_history_oldest_event_id", "Id of the oldest event that the history holds.");
+    text.gauge("zrm_history_oldest_event_id", "Id of the oldest event in the history.");
     text.add(history.oldest);
     text.gauge("zrm_history_newest_event_id", "Id of the newest event of the history.");
     text.add(history.newest);

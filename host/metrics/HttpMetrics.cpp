@@ -25,9 +25,10 @@ void HttpMetrics::collect(MetricText& text) {
     }
     text.gauge("zrm_http_connections", "Connections of clients that are open.");
     text.add(static_cast<double>(m_server.connections()));
-    text.counter("zrm_http_refused_connections_total", "Connections that found no place.");
+    text.counter("zrm_http_refused_connections_total",
+                 "Connections that were refused because the limit was reached.");
     text.add(m_server.refusedConnections());
-    text.gauge("zrm_http_stream_clients", "Clients that follow the events.");
+    text.gauge("zrm_http_stream_clients", "Clients that follow the stream of events.");
     text.add(static_cast<double>(m_stream.clients()));
 }
 

@@ -38,15 +38,15 @@ struct Count {
 constexpr Count counts[] = {
     {"zrm_log_read_bytes_total", "Bytes that were read from the log.", &LogLedgerView::bytesRead},
     {"zrm_log_lines_total", "Lines that were read from the log.", &LogLedgerView::lines},
-    {"zrm_log_entries_total", "Entries that the lines of the log gave.", &LogLedgerView::rows},
-    {"zrm_log_format_errors_total", "Lines of the log that did not fit its format.",
+    {"zrm_log_entries_total", "Entries among the lines of the log.", &LogLedgerView::rows},
+    {"zrm_log_format_errors_total", "Lines of the log that did not match its format.",
      &LogLedgerView::formatErrors},
     {"zrm_log_entries_without_time_total", "Entries whose time could not be read.",
      &LogLedgerView::withoutTime},
-    {"zrm_log_truncations_total", "Times that the log was truncated.", &LogLedgerView::truncations},
+    {"zrm_log_truncations_total", "How often the log was truncated.", &LogLedgerView::truncations},
     {"zrm_log_skipped_bytes_total", "Bytes that were not read because the log was truncated.",
      &LogLedgerView::skippedBytes},
-    {"zrm_log_restarts_total", "Times that the log's monitor was begun again.",
+    {"zrm_log_restarts_total", "How often the log's monitor was restarted.",
      &LogLedgerView::restarts},
 };
 
@@ -125,7 +125,7 @@ void collectWarnings(MetricText& text, const LogWatch& watch) {
 }
 
 void collectSizes(MetricText& text, const Logs& logs) {
-    text.gauge("zrm_log_size_bytes", "Size of the log, where the system tells it.");
+    text.gauge("zrm_log_size_bytes", "Size of the log, if it is known.");
     for (const auto& [path, log] : logs) {
         struct stat status {};
         if (log.ledger && stat(log.ledger->file.c_str(), &status) == 0) {
@@ -143,10 +143,10 @@ void LogMetrics::collect(MetricText& text) {
     collectTimes(text, logs);
     collectSizes(text, logs);
     text.counter("zrm_debug_log_incomplete_records_total",
-                 "Records that the debug log did not take whole.");
+                 "Records that were not completely written to the debug log.");
     text.add(DebugLogLoss::records());
     text.counter("zrm_logs_without_descriptor_total",
-                 "Times that a log could not be opened for want of a descriptor.");
+                 "How often a log could not be opened because no descriptor was free.");
     text.add(DescriptorReserve::failures());
     collectWarnings(text, m_watch);
 }

@@ -18,11 +18,11 @@ struct Count {
 };
 
 constexpr Count counts[] = {
-    {"zrm_situation_offered_total", "Entries that were handed to the situation.",
+    {"zrm_situation_offered_total", "Entries that were offered to the situation.",
      &SituationStatus::offered},
     {"zrm_situation_matched_total", "Entries that met every condition of the situation.",
      &SituationStatus::matched},
-    {"zrm_situation_discarded_total", "Matching entries that the situation's thresholds refused.",
+    {"zrm_situation_discarded_total", "Matching entries that the situation's thresholds rejected.",
      &SituationStatus::discarded},
     {"zrm_situation_raised_total", "Events that the situation raised.", &SituationStatus::raised},
 };
@@ -37,7 +37,7 @@ MetricText::Labels labelsOf(const SituationStatus& situation) {
 
 void SituationMetrics::collect(MetricText& text) {
     const std::vector<SituationStatus> situations = m_situations.list();
-    text.gauge("zrm_situation_running", "1 while the situation judges entries, else 0.");
+    text.gauge("zrm_situation_running", "1 while the situation is running, otherwise 0.");
     for (const SituationStatus& situation : situations) {
         text.add(situation.state == SituationStatus::RUNNING ? 1.0 : 0.0, labelsOf(situation));
     }

@@ -71,7 +71,7 @@ bool Connection::wait(short events, const std::stop_token& giveUp) {
             return false;
         }
     }
-    m_error = "the agent is ending (" + m_receiver.text() + ')';
+    m_error = "the agent is stopping (" + m_receiver.text() + ')';
     return false;
 }
 
@@ -104,7 +104,7 @@ bool Connection::open(const std::stop_token& giveUp) {
     const std::vector<SocketAddress> addresses = m_lookup.find(Clock::now() + m_timeout, giveUp);
     if (addresses.empty()) {
         m_error = giveUp.stop_requested()
-                      ? "the agent is ending (" + m_receiver.text() + ')'
+                      ? "the agent is stopping (" + m_receiver.text() + ')'
                       : m_receiver.text() + " is not known: " + m_lookup.error();
     }
     for (const SocketAddress& address : addresses) {

@@ -34,14 +34,14 @@ struct OutcomeName {
 };
 
 constexpr std::array outcomeNames = {
-    OutcomeName{Outcome::stopped, "the agent is ending"},
+    OutcomeName{Outcome::stopped, "the agent is stopping"},
     OutcomeName{Outcome::late, "no answer in time"},
     OutcomeName{Outcome::unreachable, "no connection"},
     OutcomeName{Outcome::untrusted, "the server's certificate is not trusted for this host"},
     OutcomeName{Outcome::noTls, "no TLS connection"},
     OutcomeName{Outcome::noAuthorities, "ca_file cannot be read"},
     OutcomeName{Outcome::sendFailed, "the connection ended while the events were sent"},
-    OutcomeName{Outcome::brokenOff, "the connection ended without a whole answer"},
+    OutcomeName{Outcome::brokenOff, "the connection ended before the answer was complete"},
     OutcomeName{Outcome::notHttp, "the answer is not HTTP, or its head is longer than 64 kB"},
 };
 

@@ -141,7 +141,7 @@ bool JsonlSink::waitWritable(const std::stop_token& giveUp) {
     }
     m_waitsSince = 0;
     if (!isReady) {
-        m_error = "the reader takes no data";
+        m_error = "the reader does not read";
     }
     return isReady;
 }

@@ -41,8 +41,8 @@ std::optional<std::string> SecretFile::read(const std::string& path, std::string
     ::close(fd);
     if (problem.empty() && text && (status.st_mode & S_IRWXO) != 0) {
         problem = path +
-                  " is open to every user: take the others' permissions away (chmod o= " + path +
-                  ')';
+                  " is accessible to every user: remove the permissions of other users (chmod o= " +
+                  path + ')';
         return std::nullopt;
     }
     if (text && text->ends_with('\n')) {

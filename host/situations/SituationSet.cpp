@@ -166,7 +166,7 @@ SituationSet::Changed SituationSet::orTooLarge(const Records& records, const Key
         return key;
     }
     return SituationRefusal{SituationRefusal::TOO_MANY,
-                            "the regular expressions of the situations made through the API are "
+                            "the regular expressions of the situations created through the API are "
                             "too large together: remove a situation, or write smaller ones"};
 }
 
@@ -183,7 +183,7 @@ SituationSet::Change SituationSet::add(const SituationConfig& config) {
         if (static_cast<std::size_t>(made) >= mostMade) {
             return SituationRefusal{SituationRefusal::TOO_MANY,
                                     "there are " + std::to_string(mostMade) +
-                                        " situations made through the API: remove one first"};
+                                        " situations created through the API: remove one first"};
         }
         const Key key{apiSource, config.name};
         draft.records.emplace(key, Record{config});
@@ -260,7 +260,7 @@ SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Dra
     const Turn turn(*this);
     if (!turn.hasCome()) {
         return SituationRefusal{SituationRefusal::BUSY,
-                                "other changes of the situations are under way: try again"};
+                                "other changes of the situations are in progress: try again"};
     }
     Draft draft;
     {
@@ -407,9 +407,10 @@ SituationStatus SituationSet::statusOf(const Key& key, const Record& record) con
                  "again");
             break;
         case SituationRunner::State::OPENING:
-            status.problem = "is still to be opened: a log waits for room in the queue of events";
+            status.problem =
+                "has not been opened yet: a log is waiting for room in the event queue";
             break;
-        case SituationRunner::State::ABSENT: // the agent is ending
+        case SituationRunner::State::ABSENT: // the agent is stopping
         case SituationRunner::State::OPEN:
             break;
         }

@@ -129,14 +129,14 @@ std::optional<Content> contentOf(const std::string& text, std::string& reason) {
         for (const json& object : document.at("situations")) {
             content.made.push_back(madeFrom(object, patterns));
             if (!names.insert(content.made.back().config.name).second) {
-                reason = "a name comes twice";
+                reason = "a name appears twice";
                 return std::nullopt;
             }
         }
         content.stoppedFiles = document.at("stopped").get<std::vector<std::string>>();
         return content;
     } catch (const TooDeep&) {
-        reason = "it is nested too deep";
+        reason = "it is nested too deeply";
     } catch (const json::exception&) {
         reason = "it is damaged";
     }
@@ -167,7 +167,7 @@ Content SituationStore::load(std::string& message) {
         return {};
     } else if (number != 0) {
         m_blocked = because("cannot read " + m_path, number);
-        message = m_blocked + "; no situation is changed through the API until the next start";
+        message = m_blocked + "; situations cannot be changed through the API until the next start";
         return {};
     }
     std::string reason;
@@ -189,10 +189,10 @@ std::string SituationStore::moveAside(const std::string& reason) {
     if (std::rename(m_path.c_str(), aside.c_str()) != 0) {
         m_blocked = because("cannot move " + m_path + " aside", errno);
         return m_path + " cannot be used (" + reason + "); " + m_blocked +
-               "; no situation is changed through the API until the next start";
+               "; situations cannot be changed through the API until the next start";
     }
     return m_path + " cannot be used (" + reason + ") and was moved to " + aside +
-           "; the agent goes on without the situations that were made through the API";
+           "; the agent continues without the situations that were created through the API";
 }
 
 std::string SituationStore::save(const Content& content) {
@@ -218,13 +218,13 @@ std::string SituationStore::save(const Content& content) {
 std::string SituationStore::replace(std::string_view text) const {
     const std::string directory = m_path.substr(0, m_path.rfind('/'));
     if (mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
-        return because("cannot make the directory " + directory, errno);
+        return because("cannot create the directory " + directory, errno);
     }
     const std::string temporary = m_path + ".new";
     unlink(temporary.c_str()); // of an agent that was killed, or whatever stands there
     const int fd = open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, fileMode);
     if (fd == -1) {
-        return because("cannot make " + temporary, errno);
+        return because("cannot create " + temporary, errno);
     }
     std::string problem;
     if (!writeAll(fd, text)) {

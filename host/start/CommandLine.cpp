@@ -24,7 +24,7 @@ struct Values {
 void addOptions(CLI::App& app, Values& values) {
     app.set_help_flag(); // so that what is wrong beside --help is reported
     app.add_option("--config", values.config,
-                   "host configuration (default /etc/zrm/zrm.toml when it exists)")
+                   "host configuration (default /etc/zrm/zrm.toml if it exists)")
         ->type_name("FILE")
         ->expected(0, 1) // what is missing is reported below
         ->take_last();
@@ -33,10 +33,10 @@ void addOptions(CLI::App& app, Values& values) {
         ->type_name("FILE")
         ->expected(0, 1) // what is missing is reported below
         ->take_last();
-    app.add_flag("--version", values.version, "print the version and end")
+    app.add_flag("--version", values.version, "print the version and exit")
         ->disable_flag_override()
         ->take_last();
-    app.add_flag("--help", values.help, "print this help and end")
+    app.add_flag("--help", values.help, "print this help and exit")
         ->disable_flag_override()
         ->take_last();
 }
@@ -105,8 +105,8 @@ std::string CommandLine::help() {
         left.resize(std::max(left.size() + 2, column), ' ');
         text += left + option->get_description() + '\n';
     }
-    return text + "\nSignals: HUP re-reads the configuration of the logs, INT and TERM end the "
-                  "agent.\nExit status: 0 after an orderly end, 2 for an unusable command line or "
+    return text + "\nSignals: HUP re-reads the log configuration, INT and TERM stop the "
+                  "agent.\nExit status: 0 after an orderly stop, 2 for an unusable command line or "
                   "configuration,\n255 after a failure.\n";
 }
 

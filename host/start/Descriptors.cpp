@@ -33,7 +33,7 @@ void Descriptors::tick() {
         getrlimit(RLIMIT_NOFILE, &limit);
         say("%" PRIu64 " logs could not be opened: of %ju descriptors %" PRIu64
             " are kept for HTTP, the history and the sinks, and no other is free; raise the limit "
-            "(LimitNOFILE= of the service, ulimit -n) and start the agent again",
+            "(LimitNOFILE= of the service, ulimit -n) and restart the agent",
             failures - m_told, static_cast<std::uintmax_t>(limit.rlim_cur),
             DescriptorReserve::size());
         m_told = failures;

@@ -67,7 +67,7 @@ int Host::run() {
         m_state = STARTING;
     }
     if (!m_watchdog.start([this] { requestStop(); })) {
-        say("no thread can be started: raise the limit of processes, or of memory");
+        say("no thread can be started: raise the limit on processes or on memory");
         return trace.result(failureStatus);
     }
     // Runs before the agent's own exit routine, which waits for threads that may wait for the host.
@@ -130,12 +130,11 @@ void Host::tick(int number) {
         const char* const file = std::getenv("ZRM_CONFIG_FILE");
         if (file == nullptr || *file == '\0') {
             say("no log to monitor: set log_config in %s, or ZRM_CONFIG_FILE in the environment, "
-                "to a file that names one log per line; ending in a minute",
+                "to a file that names one log per line; exiting in a minute",
                 m_file.path().empty() ? "/etc/zrm/zrm.toml" : m_file.path().c_str());
         } else {
             say("no log to monitor: %s names none that can be monitored, and 'zrmctl check %s' "
-                "says "
-                "why; ending in a minute",
+                "says why; exiting in a minute",
                 file, file);
         }
     }
@@ -152,7 +151,7 @@ void Host::reload() {
         for (const std::string& problem : *problems) {
             say("%s", problem.c_str());
         }
-        say("%s was not taken over; the situations go on as they were", m_file.path().c_str());
+        say("%s was not loaded; the situations stay as they were", m_file.path().c_str());
         m_serving->noteUnusableConfig();
         return;
     }
@@ -161,7 +160,7 @@ void Host::reload() {
     const std::size_t removed = removedSituations(m_config, config);
     const bool removesMost = removed > m_config.situations.size() / 2;
     if (removesMost) {
-        say("%s: %zu of %zu situations are gone and raise nothing any more; if the file was cut "
+        say("%s: %zu of %zu situations are gone and no longer raise events; if the file was cut "
             "off, write it again",
             m_file.path().c_str(), removed, m_config.situations.size());
     }
@@ -169,7 +168,7 @@ void Host::reload() {
     if (config.environment != m_config.environment || config.http != m_config.http ||
         config.sinks != m_config.sinks || config.history != m_config.history ||
         config.stateDirectory != m_config.stateDirectory) {
-        say("%s: the situations are taken over, every other change at the next start",
+        say("%s: the situations are reloaded; every other change takes effect at the next start",
             m_file.path().c_str());
     }
     m_config = std::move(config);

@@ -83,7 +83,8 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
     }
     serving->m_situations.apply(config.situations);
     if (!serving->m_situations.waitUntilOpen(openingLimit)) {
-        say("some situations are still being opened: entries until then raise nothing for them");
+        say("some situations are still being opened: entries that arrive before then do not raise "
+            "them");
     }
     EventRoomControl::open();
     countLogs(); // the first sample tells the log manager that requests are served
@@ -212,7 +213,7 @@ void Serving::stop(Clock::time_point limit) {
     m_watchdog.noteStage("delivering events");
     m_delivery.finish(limit);
     if (const std::uint64_t entries = EventRoomControl::passedOver(); entries > 0) {
-        say("%" PRIu64 " lines that waited in the logs were not looked at; reports find them",
+        say("%" PRIu64 " lines that were waiting in the logs were not read; reports will find them",
             entries);
     }
 }

@@ -86,8 +86,7 @@ void Watchdog::lookAtEnd() const {
     for (const PulseRegistry::Working& working : PulseRegistry::look()) {
         who += "; " + working.subject + " " + working.doing;
     }
-    say("ending by force after %d seconds: the main thread was %s%s. What was not delivered by "
-        "now is not",
+    say("forced to stop after %d seconds: the main thread was %s%s. Nothing more is delivered",
         static_cast<int>(std::chrono::duration_cast<std::chrono::seconds>(endLimit).count()),
         m_stage.load(), who.c_str());
     _exit(forcedStatus);
@@ -99,7 +98,7 @@ void Watchdog::lookAtPulses() {
     for (const PulseRegistry::Working& working : PulseRegistry::look()) {
         if (working.standing >= stillLimit) {
             const bool isLog = working.subject.starts_with('/');
-            const std::string still = std::string(" has not moved for ") +
+            const std::string still = std::string(" has made no progress for ") +
                                       std::to_string(working.standing.count()) + " seconds: it " +
                                       working.doing;
             if (problem.empty()) {
@@ -113,8 +112,9 @@ void Watchdog::lookAtPulses() {
     m_problem = problem;
     lock.unlock();
     if (hadProblem != !problem.empty()) {
-        say("%s", problem.empty() ? "the log manager and the threads of all logs move again"
-                                  : named.c_str());
+        say("%s", problem.empty()
+                      ? "the log manager and the threads of all logs are making progress again"
+                      : named.c_str());
     }
 }
 

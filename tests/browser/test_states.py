@@ -49,7 +49,7 @@ def test_a_full_stream_says_so_and_goes_live_when_there_is_room(page, agent, fas
             others.callback(answer.close)
             assert answer.status == 200
         page.go("Events")
-        page.wait_text("New events do not appear by themselves: too many clients follow the events: at most 32.")
+        page.wait_text("New events do not appear by themselves: too many clients are following the events: at most 32.")
         page.wait_text("Not live; next try in")
         page.pictures("events-full")
     page.wait_live(30)

@@ -83,7 +83,7 @@ def test_what_ends_a_report_is_said(serving, obstacle, reason):
     assert reach(report) == (False, reached, reason)
     assert (backtest["entries"], backtest["raised"], backtest["truncated"]) == (1, 1, False)
     assert reach(backtest) == (False, reached, f"{serving.text}: {reason}")
-    assert backtest["decision"].endswith(f"; older entries were not looked at: {serving.text}: {reason}.")
+    assert backtest["decision"].endswith(f"; older entries were not examined: {serving.text}: {reason}.")
     told = zrmctl(serving, "report", str(serving.text))
     assert told.returncode == 0
     shown = time.strftime("%Y-%m-%d %H:%M:%S", time.localtime(serving.now + 3))

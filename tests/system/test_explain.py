@@ -241,8 +241,8 @@ def test_a_user_logs_own_format_and_an_undisturbed_monitor(agent):
     bad = api.explain_line("nonsense too", log, when=["ENTRYTYPE = 'ERROR'"])
     assert bad["row"] is None and not bad["matches"] and not bad["raised"]
     assert bad["conditions"] == []
-    assert "does not fit the log's format" in bad["reason"]
-    assert bad["decision"] == "Would not be raised: the line gives no entry."
+    assert "does not match the log's format" in bad["reason"]
+    assert bad["decision"] == "Would not be raised: the line yields no entry."
     explained = api.explain(situation="all", last=2)
     assert [e["line"] for e in explained] == [good, "nonsense"]
     # None of this was monitored.
@@ -447,7 +447,7 @@ def test_the_entry_of_an_event(agent):
     assert gone["decision"] == "Would be raised: 3 entries in 3600 s, the threshold is >= 2."
     other = api.explain(event=events[1]["id"], definition={"frequency": ">= 2", "period": "1h"})[0]
     assert other["window"]["count"] is None and not other["raised"]
-    assert other["decision"].startswith("Cannot be told: ")
+    assert other["decision"].startswith("Cannot be determined: ")
     assert api.post("explain", {"event": 99}, 404)["field"] == "event"
     assert agent.stop() == 0
 
@@ -489,7 +489,7 @@ def test_a_refresh_waits_for_no_backtest(agent):
         def both_run():
             status, _, answer = run_short(agent, begin, log)
             refused.append(answer)
-            return status == 503 and "two backtests are under way" in answer["detail"]
+            return status == 503 and "two backtests are already running" in answer["detail"]
 
         wait_until(both_run, lambda: f"two backtests: {refused[-1]}")
         begun = time.monotonic()
@@ -506,7 +506,7 @@ def test_a_refresh_waits_for_no_backtest(agent):
             status, _, problem = answer.result(PATIENCE)
             assert status == 503, (status, problem, taken)
             assert problem["detail"] == (
-                "the agent reads its configuration of logs again: try again"
+                "the agent is re-reading its log configuration: try again"
             )
     # The same, left alone.
     status, _, answer = run_short(agent, begin, log)

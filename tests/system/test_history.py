@@ -53,7 +53,7 @@ def test_what_a_sink_missed_it_gets_after_a_restart(agent):
     wait_until(lambda: len(stored(agent)) == 100, "the history")
     assert agent.stop() == 0
     assert agent.trace(
-        f"100 events were not delivered to {agent.sink}; it gets them when the agent runs again"
+        f"100 events were not delivered to {agent.sink}; it will get them when the agent runs again"
     )
     agent.sink.parent.mkdir()
     agent.start()

@@ -179,7 +179,7 @@ def test_a_changed_token_and_certificate_are_taken_over(agent, serving):
     certificate, key = agent.directory / "agent.pem", agent.directory / "agent.key"
     whole = certificate.read_text()
     certificate.write_text("nonsense")
-    agent.wait_trace("HTTP: the certificate before goes on: cannot use the certificate")
+    agent.wait_trace("HTTP: the previous certificate stays in use: cannot use the certificate")
     assert ask(port, renewed, context)[0] == 200
     certificate.write_text(whole)
     make_certificate(agent.directory)

@@ -152,7 +152,7 @@ def test_what_was_saved_and_cannot_run_says_why(agent):
     api = Situations(agent)
     old = api.get("old")
     assert old["state"] == "failed"
-    assert "when[0]" in old["problem"] and "'GONE' is no column" in old["problem"]
+    assert "when[0]" in old["problem"] and "'GONE' is not a column" in old["problem"]
     status, answer = api.send("PUT", path("old"), {"when": ["ENTRYSRC = 'x'"]})
     assert (status, answer["state"], answer["problem"]) == (200, "running", None)
     assert agent.stop() == 0

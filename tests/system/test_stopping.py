@@ -141,7 +141,7 @@ def test_a_full_queue_keeps_neither_signals_nor_requests_waiting(agent, sink, re
     assert stop(agent, number) == 0
     text = agent.stderr.text()
     assert " events were not delivered to " in text
-    assert " lines that waited in the logs were not looked at" in text
+    assert " lines that were waiting in the logs were not read" in text
     assert kept is not None
 
 
@@ -199,9 +199,9 @@ def test_a_log_that_waits_for_room_turns_health_red_and_green_again(agent):
         "a red health",
         20,
     )
-    assert "the thread of a log has not moved for" in answer["detail"]
+    assert "the thread of a log has made no progress for" in answer["detail"]
     assert str(logs[0]) not in answer["detail"], "names are not for everybody"
-    agent.wait_trace(f"zrmagent: the thread of {logs[0]} has not moved for ")
+    agent.wait_trace(f"zrmagent: the thread of {logs[0]} has made no progress for ")
     ended = threading.Event()
 
     def read():
@@ -266,7 +266,7 @@ def test_a_disk_that_takes_nothing_keeps_neither_signals_nor_requests_waiting(
     text = agent.stderr.text()
     assert "2048 events were not stored in the history" in text
     if not refresh:
-        assert "7952 lines that waited in the logs were not looked at" in text
+        assert "7952 lines that were waiting in the logs were not read" in text
 
 
 @pytest.mark.parametrize("history", (True, False))

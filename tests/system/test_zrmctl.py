@@ -325,8 +325,8 @@ def test_following_goes_on_over_restarts_of_the_agent(followed):
     assert follower.ids() == list(range(1, 8))
     assert follower.end(SIGINT) == 0
     assert follower.ids() == list(range(1, 8))
-    lost = "zrmctl: the connection to the agent is lost; trying to connect again"
-    assert follower.errors.text().splitlines() == [lost, "zrmctl: connected again"] * 2
+    lost = "zrmctl: the connection to the agent was lost; reconnecting"
+    assert follower.errors.text().splitlines() == [lost, "zrmctl: reconnected"] * 2
 
 
 def test_ctrl_c_ends_following_with_status_0(followed):
@@ -353,7 +353,7 @@ def test_exit_statuses_tell_what_failed(followed, tmp_path):
     code, output, errors = run(["logs", *config], ZRM_TOKEN="wrong")
     assert (code, output) == (4, "")
     assert errors.endswith(
-        "does not accept the token of ZRM_TOKEN: name the agent's own with --token-file or --config\n"
+        "does not accept the token from ZRM_TOKEN: give the right one with --token-file or --config\n"
     )
     assert run(["logs", *config, "--token-file", str(tmp_path / "none")])[0] == 4
     assert agent.stop() == 0
@@ -412,7 +412,7 @@ def test_the_certificate_of_the_configuration_is_trusted(agent):
     token = agent.directory / "state" / "api-token"
     url = "https://" + agent.listen.replace("0.0.0.0", "127.0.0.1")
     code, _, errors = run(["logs", "--url", url, "--token-file", str(token)])
-    assert code == 3 and "shows no certificate that this machine trusts" in errors
+    assert code == 3 and "has no certificate that this machine trusts" in errors
     assert errors.endswith(", with --ca-file\n")
     by_hand = ["logs", "--url", url, "--token-file", str(token)]
     code, output, errors = run([*by_hand, "--ca-file", str(certificate)])

@@ -140,7 +140,7 @@ def test_the_host_configuration(tmp_path):
 
 
 def test_what_cannot_be_checked(tmp_path):
-    either = "zrmctl: check: name either a configuration of logs or --host FILE\n"
+    either = "zrmctl: check: name either a log configuration or --host FILE\n"
     assert run("check", status=2) == ("", either)
     assert run("check", "a", "--host", "b", status=2) == ("", either)
     missing = tmp_path / "missing"
@@ -153,7 +153,7 @@ def test_what_cannot_be_checked(tmp_path):
     )
     assert run("check", "-", given=b"#" * (16 * 1024 * 1024 + 1), status=2) == (
         "",
-        "zrmctl: - has more than 16 MiB, which is the most that is read\n",
+        "zrmctl: - is larger than 16 MiB, the most that is read\n",
     )
 
 
@@ -203,7 +203,7 @@ def test_no_line_fits_and_no_line_is_there(log):
     path = log()
     assert run("try", FORMAT, path, status=1) == (
         f"0 of 0 lines fit (0.0 %)\n{path} ;N ;U ;{FORMAT}\n",
-        f"zrmctl: {path} has no line to try the format on\n",
+        f"zrmctl: {path} has no lines to try the format on\n",
     )
 
 

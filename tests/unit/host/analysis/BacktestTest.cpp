@@ -109,7 +109,7 @@ TEST_F(BacktestTest, EndsEarlyWhenItIsCancelledAndSaysSo) {
     EXPECT_EQ(first.ends, first.reports) << "the report is closed";
     EXPECT_EQ(second.reports, 0);
     EXPECT_THAT(run({}).decision,
-                testing::EndsWith("; older entries were not looked at: " +
+                testing::EndsWith("; older entries were not examined: " +
                                   directory.file("first.log") + ": the backtest was cancelled."));
 }
 
@@ -124,7 +124,7 @@ TEST_F(BacktestTest, SaysHowFarItReached) {
     EXPECT_FALSE(result.isTruncated);
     EXPECT_EQ(result.reach.reason, directory.file("second.log") + ": the log cannot be read");
     EXPECT_EQ(result.reach.reached, "") << "of that log nothing was read";
-    EXPECT_THAT(result.decision, testing::EndsWith("; older entries were not looked at: " +
+    EXPECT_THAT(result.decision, testing::EndsWith("; older entries were not examined: " +
                                                    result.reach.reason + "."));
 }
 

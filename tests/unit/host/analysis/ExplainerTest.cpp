@@ -164,7 +164,7 @@ TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
     EXPECT_EQ(all[0].decision, "Would be raised: 2 entries in 60 s, the threshold is >= 2.");
     EXPECT_EQ(all[1].line, "nonsense");
     EXPECT_EQ(all[1].row, "");
-    EXPECT_EQ(all[1].decision, "Would not be raised: the line gives no entry.");
+    EXPECT_EQ(all[1].decision, "Would not be raised: the line yields no entry.");
     EXPECT_EQ(all[2].window->count, 3);
     EXPECT_EQ(asked.problem(), "");
     const std::vector<Explanation> two = explainer(">= 2").last(log, 5);
@@ -218,8 +218,8 @@ TEST_F(ExplainerTest, ExplainsAnEventWhoseLogHoldsItNoMore) {
     EXPECT_TRUE(other.matches);
     EXPECT_FALSE(other.isRaised);
     EXPECT_FALSE(other.window->count);
-    EXPECT_EQ(other.decision, "Cannot be told: every condition holds, but the log holds the entry "
-                              "no more, so that those before it cannot be counted.");
+    EXPECT_EQ(other.decision, "Cannot be determined: every condition holds, but the log no longer "
+                              "contains the entry, so the ones before it cannot be counted.");
     EXPECT_EQ(explainer().event(nullptr, event).decision,
               "Would be raised: every condition holds.");
     event.row = rowAt(10, "miss");

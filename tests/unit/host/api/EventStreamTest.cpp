@@ -229,7 +229,7 @@ TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {
         }
         const HttpAnswer refused = open();
         EXPECT_EQ(refused.status, 503);
-        EXPECT_EQ(refused.body, ": too many clients follow the events: at most 32");
+        EXPECT_EQ(refused.body, ": too many clients are following the events: at most 32");
         EXPECT_EQ(stream.clients(), EventStream::mostClients);
     }
     EXPECT_EQ(stream.clients(), 0u);

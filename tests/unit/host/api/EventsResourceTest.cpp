@@ -80,21 +80,22 @@ TEST_F(EventsResourceTest, RefusesParametersThatMakeNoSense) {
     EXPECT_EQ(get("/api/v1/events?after=-1"),
               "400 after: write a whole number from 0 to 9223372036854775807");
     EXPECT_EQ(get("/api/v1/events?order=up"), "400 order: write asc or desc");
-    EXPECT_EQ(get("/api/v1/events?severity=red"),
-              "400 severity: 'red' is no severity; the severities are info, minor, warning, major, "
-              "critical");
+    EXPECT_EQ(
+        get("/api/v1/events?severity=red"),
+        "400 severity: 'red' is not a severity; the severities are info, minor, warning, major, "
+        "critical");
     EXPECT_EQ(get("/api/v1/events?colour=red").substr(0, 30), "400 colour: unknown parameter;");
     std::string many = "/api/v1/events?log=1";
     for (int count = 0; count < 100; ++count) {
         many += "&log=1";
     }
-    EXPECT_EQ(get(many), "400 log: the parameter comes more than 100 times");
+    EXPECT_EQ(get(many), "400 log: the parameter appears more than 100 times");
 }
 
 TEST_F(EventsResourceTest, GivesOneEvent) {
     history.add(7);
     EXPECT_EQ(get("/api/v1/events/7"), R"(200 {"id":7})");
-    EXPECT_EQ(get("/api/v1/events/8"), "404 id: the history does not hold this event");
+    EXPECT_EQ(get("/api/v1/events/8"), "404 id: the history does not contain this event");
     for (const char* const id : {"x", "-1", "7x", "9223372036854775808", "1%20OR%201=1"}) {
         EXPECT_EQ(get("/api/v1/events/" + std::string(id)),
                   "404 id: an event's id is a whole number");
@@ -114,7 +115,7 @@ TEST_F(EventsResourceTest, GivesRates) {
     EXPECT_EQ(history.ratesTo - history.ratesFrom, 24 * 3600 * 1000);
     EXPECT_EQ(get("/api/v1/rates?step=90"), "400 step: write a multiple of 60 seconds");
     EXPECT_EQ(get("/api/v1/rates?step=59"), "400 step: write a whole number from 60 to 86400");
-    EXPECT_EQ(get("/api/v1/rates?from=2026-01-02&to=2026-01-01"), "400 to: lies before from");
+    EXPECT_EQ(get("/api/v1/rates?from=2026-01-02&to=2026-01-01"), "400 to: is before from");
     EXPECT_EQ(get("/api/v1/rates?from=2026-01-01&to=2026-01-04"),
               "400 step: the window has more than 2880 steps");
 }

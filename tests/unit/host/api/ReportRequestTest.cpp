@@ -50,14 +50,14 @@ TEST(ReportRequest, GoesUpToTheNewestEntryWithoutAnEnd) {
 TEST(ReportRequest, NamesWhatIsWrong) {
     EXPECT_EQ(refused(""), "log: is missing");
     EXPECT_EQ(refused(R"({"log":"auth.log","from":"2026-11-20"})"),
-              "log: 'auth.log' is no absolute path of a file; write the log's path as its "
-              "configuration has it, beginning with '/'");
+              "log: 'auth.log' is not the absolute path of a file; write the log's path as in the "
+              "log configuration, beginning with '/'");
     EXPECT_EQ(refused(R"({"log":"/a"})"), "from: is missing");
     EXPECT_EQ(refused(R"({"log":"/a","from":"soon"})"),
-              "from: 'soon' is no time; write it like 2026-11-20T07:03:09, with Z or +01:00 behind "
-              "it where it is not local, or as a 16-digit time stamp");
+              "from: 'soon' is not a time; write it like 2026-11-20T07:03:09, followed by Z or "
+              "+01:00 unless it is local, or as a 16-digit time stamp");
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","to":"2026-11-19"})"),
-              "to: lies before from");
+              "to: is before from");
     EXPECT_EQ(
         refused(R"({"log":"/a","from":"2026-11-20","where":["ENTRYSRC = 'a'","x"]})").substr(0, 10),
         "where[1]: ");

@@ -46,14 +46,14 @@ TEST(SampleRequest, NeedsNoFiltersForTheMonitoredLogs) {
 }
 
 TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
-    EXPECT_EQ(refused("{"), "body: the body is no JSON");
-    EXPECT_EQ(refused("{\"filters\":\"\xff\"}"), "body: the body is no JSON");
+    EXPECT_EQ(refused("{"), "body: the body is not JSON");
+    EXPECT_EQ(refused("{\"filters\":\"\xff\"}"), "body: the body is not JSON");
     EXPECT_EQ(refused("[]"), "body: write an object");
     EXPECT_EQ(refused("5"), "body: write an object");
     EXPECT_EQ(refused(R"({"filter":[]})"), "filter: unknown member; the members are filters");
     EXPECT_EQ(refused(R"({"filters":{}})"), "filters: write a list of at most 100 filters");
     EXPECT_EQ(refused(R"({"filters":"x"})"), "filters: write a list of at most 100 filters");
-    EXPECT_EQ(refused(R"({"filters":[],"filters":[]})"), "filters: the member comes twice");
+    EXPECT_EQ(refused(R"({"filters":[],"filters":[]})"), "filters: the member appears twice");
     EXPECT_EQ(refused(std::string(100'000, '[')), "body: the body is nested deeper than 32");
     std::string many = R"({"filters":[0)";
     for (int count = 0; count < 100; ++count) {
@@ -74,7 +74,7 @@ TEST(SampleRequest, NamesTheFilterThatIsWrong) {
               "filters[0].not: unknown member; a filter has column, op and value");
     EXPECT_EQ(refused(R"({"filters":[{"column":"LOGNAME","op":"=","value":"a"},
                                      {"column":"LOGNAME","op":"is","value":"a"}]})"),
-              "filters[1].op: 'is' is no operator; the operators are =, !=, >=, <=, <, >, "
+              "filters[1].op: 'is' is not an operator; the operators are =, !=, >=, <=, <, >, "
               "contains, starts, matches, in");
 }
 
@@ -95,10 +95,10 @@ TEST(SampleRequest, RefusesUnusableValues) {
               "filters[0].value: the number does not fit the column; write a number from "
               "-2147483648 to 2147483647");
     EXPECT_EQ(value("MONTIME", ">=", "\"soon\""),
-              "filters[0].value: 'soon' is no time; write it like '2026-11-20T07:03:09', with Z "
-              "or +01:00 behind it where it is not local, or as a 16-digit time stamp");
-    EXPECT_EQ(value("COLOUR", "=", "\"red\"").substr(0, 44),
-              "filters[0].column: 'COLOUR' is no column; th");
+              "filters[0].value: 'soon' is not a time; write it like '2026-11-20T07:03:09', "
+              "followed by Z or +01:00 unless it is local, or as a 16-digit time stamp");
+    EXPECT_EQ(value("COLOUR", "=", "\"red\"").substr(0, 47),
+              "filters[0].column: 'COLOUR' is not a column; th");
 }
 
 TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
@@ -108,8 +108,8 @@ TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
         filters += R"({"column":"LOGNAME","op":"matches","value":"\\pL{8}"})";
     }
     const std::string problem = refused(R"({"filters":[)" + filters + "]}");
-    EXPECT_TRUE(problem.starts_with("filters[2].value: with this one the regular expressions are "
-                                    "too large together; "))
+    EXPECT_TRUE(problem.starts_with(
+        "filters[2].value: together with this one the regular expressions are too large; "))
         << problem;
 }
 

@@ -123,7 +123,7 @@ TEST_F(AgentAccessTest, WhatIsNoAddressIsRefused) {
           "https://a/path", "https://user@a", "http://localhost/path", "http://[::1"}) {
         options.url = url;
         expectError(CLI_USAGE, "--url: '" + std::string(url) +
-                                   "' is no address; write it as http://127.0.0.1:7186");
+                                   "' is not an address; write it as http://127.0.0.1:7186");
     }
 }
 
@@ -157,28 +157,31 @@ TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsTold) {
 
 TEST_F(AgentAccessTest, AConfigurationWithoutHttpHasNoAddress) {
     write("zrm.toml", "");
-    expectError(CLI_USAGE, options.config + " switches HTTP off: give [http] a listen address, or "
-                                            "name the address with --url");
+    expectError(
+        CLI_USAGE,
+        options.config +
+            " turns HTTP off: give [http] a listen address, or give the address with --url");
 }
 
 TEST_F(AgentAccessTest, AnOpenPortIsNoAddress) {
     write("zrm.toml", "[http]\nlisten = \"127.0.0.1:0\"\n");
-    expectError(CLI_USAGE, options.config + " leaves the port open: name the address that the "
-                                            "agent told with --url");
+    expectError(CLI_USAGE,
+                options.config +
+                    " leaves the port open: give the address that the agent reported with --url");
 }
 
 TEST_F(AgentAccessTest, AMissingTokenIsTold) {
     options.tokenFile = directory.file("absent");
-    expectError(CLI_FORBIDDEN, "cannot read the token " + options.tokenFile +
-                                   ": No such file or directory; the agent makes it when it starts "
-                                   "with HTTP");
+    expectError(CLI_FORBIDDEN,
+                "cannot read the token " + options.tokenFile +
+                    ": No such file or directory; the agent creates it when it starts with HTTP");
 }
 
 TEST_F(AgentAccessTest, AFileThatHoldsNoTokenIsTold) {
     options.tokenFile = write("two-lines", "one\ntwo\n");
     expectError(CLI_FORBIDDEN,
-                options.tokenFile + " holds no token: one line of visible characters");
+                options.tokenFile + " does not contain a token: one line of visible characters");
     options.tokenFile = write("blank", "\n");
     expectError(CLI_FORBIDDEN,
-                options.tokenFile + " holds no token: one line of visible characters");
+                options.tokenFile + " does not contain a token: one line of visible characters");
 }

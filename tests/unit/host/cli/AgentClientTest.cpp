@@ -80,8 +80,8 @@ TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
 }
 
 TEST_F(AgentClientTest, AProblemIsToldWithItsField) {
-    answer(400, R"({"status":400,"detail":"'is' is no operator","field":"where[0]"})");
-    expectAnswer(CLI_REFUSED, "where[0]: 'is' is no operator");
+    answer(400, R"({"status":400,"detail":"'is' is not an operator","field":"where[0]"})");
+    expectAnswer(CLI_REFUSED, "where[0]: 'is' is not an operator");
 }
 
 TEST_F(AgentClientTest, AProblemWithoutAField) {
@@ -97,14 +97,14 @@ TEST_F(AgentClientTest, AnErrorThatIsNoProblemIsTold) {
 TEST_F(AgentClientTest, ATokenThatIsNotAcceptedIsTold) {
     answer(401, "{}");
     expectAnswer(CLI_FORBIDDEN, "the agent at " + url +
-                                    " does not accept the token of its file: name the agent's own "
+                                    " does not accept the token from its file: give the right one "
                                     "with --token-file or --config");
 }
 
 TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsTold) {
     answer(200, "<html>");
     expectAnswer(CLI_UNREACHABLE,
-                 "what answers at " + url + " is no zrmagent: its answer is no JSON object");
+                 "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
 TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
@@ -123,13 +123,13 @@ TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
     });
     AgentClient client({server.url(), "the-token", "its file"});
     expectError([&] { client.get("/x"); }, CLI_UNREACHABLE,
-                "what answers at " + server.url() + " is no zrmagent: its answer does not end");
+                "what answers at " + server.url() + " is not a zrmagent: its answer does not end");
 }
 
 TEST_F(AgentClientTest, AnAnswerThatIsNestedWithoutReasonIsTold) {
     answer(200, R"({"a":)" + std::string(1'000'000, '[') + std::string(1'000'000, ']') + '}');
     expectAnswer(CLI_UNREACHABLE,
-                 "what answers at " + url + " is no zrmagent: its answer is no JSON object");
+                 "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
 TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
@@ -141,7 +141,8 @@ TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
     SseParser parser([](const std::string&) {});
     expectError(
         [&] { client.stream("/x", {}, [&](std::string_view piece) { parser.take(piece); }); },
-        CLI_UNREACHABLE, "what answers is no zrmagent: an event of its stream is longer than 1 MB");
+        CLI_UNREACHABLE,
+        "what answers is not a zrmagent: an event of its stream is longer than 1 MB");
 }
 
 TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {

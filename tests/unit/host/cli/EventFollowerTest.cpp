@@ -112,7 +112,7 @@ protected:
     std::atomic<int> received{0}; ///< events
 };
 
-const std::string lost = "the connection to the agent is lost; trying to connect again";
+const std::string lost = "the connection to the agent was lost; reconnecting";
 
 } // namespace
 
@@ -133,7 +133,7 @@ TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
     agent.begin();
     EXPECT_THAT(follow(7, 11), ElementsAre(8, 9, 10, 11));
     EXPECT_THAT(asked, ElementsAre("7", "9", "10"));
-    EXPECT_THAT(notes, ElementsAre(lost, "connected again", lost, "connected again"));
+    EXPECT_THAT(notes, ElementsAre(lost, "reconnected", lost, "reconnected"));
 }
 
 TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
@@ -143,10 +143,10 @@ TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
     agent.begin();
     EXPECT_THAT(follow(499, 2), ElementsAre(500, 1, 2));
     EXPECT_THAT(asked, ElementsAre("499", "0"));
-    EXPECT_THAT(notes, ElementsAre(lost,
-                                   "the agent has begun a new history; its events follow from the "
-                                   "first",
-                                   "connected again"));
+    EXPECT_THAT(notes,
+                ElementsAre(lost,
+                            "the agent has started a new history; its events follow from the first",
+                            "reconnected"));
 }
 
 TEST_F(EventFollowerTest, ARefusalEndsIt) {
@@ -176,5 +176,5 @@ TEST_F(EventFollowerTest, AnAgentThatIsStartedAgainIsFollowedFurther) {
     });
     EXPECT_THAT(follow(7, 9), ElementsAre(8, 9));
     restart.join();
-    EXPECT_THAT(notes, ElementsAre(lost, "connected again"));
+    EXPECT_THAT(notes, ElementsAre(lost, "reconnected"));
 }

@@ -98,15 +98,15 @@ TEST_F(ProgramTest, AnAnswerOfAnotherFormEndsNoCommandAbruptly) {
     }
     answerWith(R"({"columns":1,"rows":[{}]})");
     EXPECT_EQ(run({"report", "/x", "--format", "csv"}), CLI_UNREACHABLE);
-    EXPECT_EQ(errors, "zrmctl: what answers is no zrmagent of this version: its answer has another "
-                      "form\n");
+    EXPECT_EQ(errors, "zrmctl: what answers is not a zrmagent of this version: its answer has a "
+                      "different form\n");
 }
 
 TEST_F(ProgramTest, AColumnThatAReportHasNotIsRefused) {
     answerWith(R"({"columns":["ENTRYTIME","ENTRYDESC"],"rows":[{"ENTRYDESC":"a, b"}]})");
     EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CLI_USAGE);
     EXPECT_EQ(output, "");
-    EXPECT_EQ(errors, "zrmctl: --columns: 'BOGUS' is no column; the columns are ENTRYTIME, "
+    EXPECT_EQ(errors, "zrmctl: --columns: 'BOGUS' is not a column; the columns are ENTRYTIME, "
                       "ENTRYDESC\n");
     EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CLI_DONE);
     EXPECT_EQ(output, "ENTRYDESC\r\n\"a, b\"\r\n");
@@ -118,9 +118,9 @@ TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
     for (const char* const number :
          {"99999999999999999999999", "9223372036854775808", "1.5", "-1", "x", "", " 1", "1x"}) {
         EXPECT_EQ(run({"events", "-f", "--after", number}), CLI_USAGE) << number;
-        EXPECT_EQ(errors, "zrmctl: --after: '" + std::string(number) +
-                              "' is no number of an event; zrmctl events --help lists what it "
-                              "takes\n");
+        EXPECT_EQ(errors,
+                  "zrmctl: --after: '" + std::string(number) +
+                      "' is not the id of an event; zrmctl events --help lists its options\n");
         EXPECT_EQ(run({"events", "--before", number}), CLI_USAGE) << number;
     }
     answerWith(R"({"events":[{"id":8}]})");
@@ -140,9 +140,8 @@ TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
           {"explain", "x", "--line", "caf\xe9"},
           {"report", "/x", "--where", "ENTRYDESC = '\xff'"}}) {
         EXPECT_EQ(run(command), CLI_USAGE);
-        EXPECT_EQ(errors,
-                  "zrmctl: the command line, or the file that it names, is not valid UTF-8, "
-                  "as the agent's API wants it\n");
+        EXPECT_EQ(errors, "zrmctl: the command line, or the file that it names, is not valid "
+                          "UTF-8, which the agent's API requires\n");
     }
     EXPECT_FALSE(isAsked);
 }
@@ -189,11 +188,12 @@ TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
 
 TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
     EXPECT_EQ(run({"situations", "bogus"}), CLI_USAGE);
-    EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists what it takes\n"));
+    EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists its options\n"));
     EXPECT_EQ(run({"situations", "show"}), CLI_USAGE);
-    EXPECT_THAT(errors, EndsWith("; zrmctl situations show --help lists what it takes\n"));
+    EXPECT_THAT(errors, EndsWith("; zrmctl situations show --help lists its options\n"));
     EXPECT_EQ(run({"bogus"}), CLI_USAGE);
-    EXPECT_EQ(errors, "zrmctl: 'bogus' is no command; zrmctl --help lists commands and options\n");
+    EXPECT_EQ(errors,
+              "zrmctl: 'bogus' is not a command; zrmctl --help lists commands and options\n");
     for (const char* const help : {"-h", "--help"}) {
         EXPECT_EQ(run({"report", help}), CLI_DONE);
         EXPECT_THAT(output, HasSubstr("--columns"));
@@ -202,7 +202,7 @@ TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
 
 TEST_F(ProgramTest, ADefinitionWithoutEndIsNotReadForEver) {
     EXPECT_EQ(run({"backtest", "--file", "/dev/zero"}), CLI_USAGE);
-    EXPECT_EQ(errors, "zrmctl: /dev/zero has more than 16 MiB, which is the most that is read\n");
+    EXPECT_EQ(errors, "zrmctl: /dev/zero is larger than 16 MiB, the most that is read\n");
     EXPECT_EQ(run({"situations", "add", "x", "--file", directory.path().string()}), CLI_USAGE);
     EXPECT_EQ(errors, "zrmctl: cannot read " + directory.path().string() + ": Is a directory\n");
 }
@@ -211,7 +211,7 @@ TEST_F(ProgramTest, AFileOfCertificatesThatHoldsNoneIsRefused) {
     const std::string empty = directory.write("empty.pem", "nothing\n");
     const std::string url = "https://127.0.0.1:1";
     EXPECT_EQ(run({"--url", url, "--ca-file", empty, "logs"}), CLI_USAGE);
-    EXPECT_EQ(errors, "zrmctl: " + empty + " holds no certificate in PEM\n");
+    EXPECT_EQ(errors, "zrmctl: " + empty + " does not contain a certificate in PEM format\n");
     const std::string absent = directory.file("absent.pem");
     EXPECT_EQ(run({"--url", url, "--ca-file", absent, "logs"}), CLI_USAGE);
     EXPECT_EQ(errors, "zrmctl: cannot read " + absent + ": No such file or directory\n");

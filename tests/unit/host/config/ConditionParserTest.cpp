@@ -76,27 +76,27 @@ TEST(ConditionParser, TimesBecomeTimeStamps) {
                 ElementsAre("1261120000000000", ""));
     EXPECT_EQ(parsed("ENTRYTIME starts '12611'").text, "12611");
     EXPECT_EQ(refused("ENTRYTIME >= 'yesterday'"),
-              "'yesterday' is no time; write it like '2026-11-20T07:03:09', with Z or +01:00 "
-              "behind it where it is not local, or as a 16-digit time stamp");
+              "'yesterday' is not a time; write it like '2026-11-20T07:03:09', followed by Z or "
+              "+01:00 unless it is local, or as a 16-digit time stamp");
 }
 
 TEST(ConditionParser, RefusesUnknownColumns) {
     EXPECT_EQ(refused("ENTRYSOURCE = 'a'"),
-              "'ENTRYSOURCE' is no column; the columns are ORIGINNODE, LOGPATH, LOGNAME, "
+              "'ENTRYSOURCE' is not a column; the columns are ORIGINNODE, LOGPATH, LOGNAME, "
               "ENTRYTIME, ENTRYSYS, ENTRYSRC, ENTRYTYPE, ENTRYCLASS, ENTRYDESC, FREQTHRESH, "
               "PERIODTHRS, TIMESTAMP, SAMPLENO, ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, UENTRYDESC");
     EXPECT_EQ(refused("entrysrc = 'a'"),
-              "'entrysrc' is no column; write it in upper case: ENTRYSRC");
+              "'entrysrc' is not a column; write it in upper case: ENTRYSRC");
     // The columns of one table are not those of the other.
-    EXPECT_THAT(refused("MONSTATUS = 'a'"), testing::StartsWith("'MONSTATUS' is no column; "));
+    EXPECT_THAT(refused("MONSTATUS = 'a'"), testing::StartsWith("'MONSTATUS' is not a column; "));
     EXPECT_EQ(parsed("MONSTATUS = 'Running'", "RMMONLOG").text, "Running");
 }
 
 TEST(ConditionParser, RefusesUnknownOperators) {
     const std::string cure = "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in";
-    EXPECT_EQ(refused("ENTRYSRC == 'a'"), "'==' is no operator; " + cure);
-    EXPECT_EQ(refused("ENTRYSRC like 'a'"), "'like' is no operator; " + cure);
-    EXPECT_EQ(refused("ENTRYSRC is sshd"), "'is' is no operator; " + cure);
+    EXPECT_EQ(refused("ENTRYSRC == 'a'"), "'==' is not an operator; " + cure);
+    EXPECT_EQ(refused("ENTRYSRC like 'a'"), "'like' is not an operator; " + cure);
+    EXPECT_EQ(refused("ENTRYSRC is sshd"), "'is' is not an operator; " + cure);
     EXPECT_EQ(refused("LOGSIZE contains 5", "RMMONLOG"),
               "LOGSIZE holds numbers and 'contains' compares text; use =, !=, >=, <=, <, > or in");
 }
@@ -114,11 +114,11 @@ TEST(ConditionParser, RefusesMalformedValues) {
     EXPECT_EQ(refused("ENTRYSRC = 'a"), "the text has no closing quote; end it with '");
     EXPECT_EQ(refused("ENTRYSRC = 'a''"), "the text has no closing quote; end it with '");
     EXPECT_EQ(refused("ENTRYSRC = sshd"),
-              "'sshd' is no value; write text in single quotes and numbers without");
+              "'sshd' is not a value; write text in single quotes and numbers without");
     EXPECT_EQ(refused("LOGSIZE = 5k", "RMMONLOG"),
-              "'5k' is no value; write text in single quotes and numbers without");
+              "'5k' is not a value; write text in single quotes and numbers without");
     EXPECT_EQ(refused("LOGSIZE = 99999999999999999999", "RMMONLOG"),
-              "'99999999999999999999' is no value; write text in single quotes and numbers "
+              "'99999999999999999999' is not a value; write text in single quotes and numbers "
               "without");
     EXPECT_EQ(refused("ENTRYSRC in ['a' 'b']"), "the list has no end; end it with ]");
     EXPECT_EQ(refused("ENTRYSRC in ['a'"), "the list has no end; end it with ]");
@@ -146,7 +146,7 @@ TEST(ConditionParser, RefusesValuesThatTheColumnCannotHold) {
 
 TEST(ConditionParser, RefusesListsThatCannotBePassedOn) {
     EXPECT_EQ(refused("ENTRYSRC in ['a\nb']"),
-              "a value of the list has a line end; no column holds one: remove it");
+              "a value of the list has a line end; no column can contain one: remove it");
     std::string list = "UENTRYDESC in [";
     for (int count = 0; count < 22; ++count) {
         list += (count == 0 ? "'" : ", '") + std::string(768, 'a') + "'";
@@ -156,7 +156,7 @@ TEST(ConditionParser, RefusesListsThatCannotBePassedOn) {
 
 TEST(ConditionParser, RefusesPatternsThatCannotBeUsed) {
     EXPECT_EQ(refused("ENTRYDESC matches '(a'"),
-              "'(a' is no regular expression: missing ): (a; correct it (RE2 syntax)");
+              "'(a' is not a regular expression: missing ): (a; correct it (RE2 syntax)");
     EXPECT_EQ(refused("ENTRYDESC contains ''"), "the value has 0 bytes; write 1 to 4096 bytes");
     EXPECT_EQ(refused("ENTRYDESC starts '" + std::string(4097, 'a') + "'"),
               "the value has 4097 bytes; write 1 to 4096 bytes");
@@ -180,10 +180,10 @@ TEST(ConditionParser, ALogBecomesItsDirectoryAndItsName) {
     EXPECT_EQ(of("/var/l\xc3\xb6g/auth.log"), "ULOGPATH=/var/l\xc3\xb6g/ ULOGNAME=auth.log ");
     const std::string longName(129, 'n');
     EXPECT_EQ(of("/var/" + longName), "LOGPATH=/var/ ULOGNAME=" + longName + " ");
-    const std::string cure = "write the log's path as its configuration has it, beginning with '/'";
-    EXPECT_EQ(of("auth.log"), "'auth.log' is no absolute path of a file; " + cure);
-    EXPECT_EQ(of(""), "'' is no absolute path of a file; " + cure);
-    EXPECT_EQ(of("/var/log/"), "'/var/log/' is no absolute path of a file; " + cure);
+    const std::string cure = "write the log's path as in the log configuration, beginning with '/'";
+    EXPECT_EQ(of("auth.log"), "'auth.log' is not the absolute path of a file; " + cure);
+    EXPECT_EQ(of(""), "'' is not the absolute path of a file; " + cure);
+    EXPECT_EQ(of("/var/log/"), "'/var/log/' is not the absolute path of a file; " + cure);
     EXPECT_EQ(of("/" + std::string(385, 'n')), "the path is too long for a log's path; shorten it");
 }
 

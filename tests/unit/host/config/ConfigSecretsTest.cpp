@@ -33,8 +33,8 @@ TEST_F(ConfigSecretsTest, WarnsOfSecretsThatEveryUserCanRead) {
     const std::string path = directory.file("zrm.toml");
     const std::string expected =
         path +
-        " holds secrets and every user can read it: move them into files of their own "
-        "(secret_file, headers_file), or take the others' permissions away (chmod o= " +
+        " contains secrets and every user can read it: move them into separate files (secret_file, "
+        "headers_file), or remove the permissions of other users (chmod o= " +
         path + ')';
     for (const char* const secret :
          {"secret = 'key'", "headers = { authorization = 'Bearer a' }",

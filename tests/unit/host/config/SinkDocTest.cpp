@@ -67,7 +67,7 @@ std::string tableOf(std::span<const SinkOption> options) {
         table += "| " + code(option.name) + " | " + valueOf(option) + " | " + defaultOf(option) +
                  " | " + std::string(option.meaning);
         if (!option.instead.empty()) {
-            table += "; not beside " + code(option.instead);
+            table += "; cannot be combined with " + code(option.instead);
         }
         table += " |\n";
     }

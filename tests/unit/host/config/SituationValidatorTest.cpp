@@ -101,7 +101,7 @@ TEST(SituationValidator, NamesEveryProblemWithItsPlace) {
                                             "frequency", "frequency"));
     SituationConfig situation;
     const auto problems = SituationValidator::check(text, situation);
-    EXPECT_THAT(problems[3].what, HasSubstr("in \"NOTHING = 'x'\": 'NOTHING' is no column"));
+    EXPECT_THAT(problems[3].what, HasSubstr("in \"NOTHING = 'x'\": 'NOTHING' is not a column"));
     EXPECT_THAT(problems[3].cure, HasSubstr("the columns are ORIGINNODE, "));
 }
 
@@ -137,14 +137,14 @@ TEST(SituationValidator, RegularExpressionsHaveALimitAloneAndTogether) {
     const std::vector<std::string> many = problemsOf("\\pL{400}", 100);
     ASSERT_EQ(many.size(), 100u);
     EXPECT_THAT(many[1], HasSubstr("is too large a regular expression"));
-    const std::string spent = "the regular expressions before this one are as large as all of "
-                              "them may be together";
+    const std::string spent =
+        "the regular expressions before this one already reach the limit for all of them";
     EXPECT_THAT(many[2], HasSubstr(spent)) << "not even compiled";
     const std::vector<std::string> together = problemsOf("\\pL{8}", 4);
     ASSERT_EQ(together.size(), 2u);
     EXPECT_THAT(together[0], HasSubstr("when[2]: "));
     EXPECT_THAT(together[0],
-                HasSubstr("with this one the regular expressions are too large together"));
+                HasSubstr("together with this one the regular expressions are too large"));
     EXPECT_THAT(together[1], HasSubstr(spent));
 }
 
@@ -161,7 +161,8 @@ TEST(SituationValidator, RefusesThresholdsThatHaveNoEffect) {
     };
     const std::string period = "PERIODTHRS = 60";
     const std::string noFrequency =
-        "when[0]: the condition on FREQTHRESH states no frequency that can be reached; write >=, "
+        "when[0]: the condition on FREQTHRESH does not state a frequency that can be reached; "
+        "write >=, "
         ">, <= or < and a number of entries, for example FREQTHRESH >= 5";
     for (const char* const condition :
          {"FREQTHRESH = 3", "FREQTHRESH != 3", "FREQTHRESH in [3]", "FREQTHRESH < 1",
@@ -170,9 +171,10 @@ TEST(SituationValidator, RefusesThresholdsThatHaveNoEffect) {
     }
     for (const char* const condition :
          {"PERIODTHRS = 0", "PERIODTHRS = -1", "PERIODTHRS >= 60", "PERIODTHRS in [60]"}) {
-        EXPECT_THAT(refused({"FREQTHRESH >= 5", condition}),
-                    ElementsAre("when[1]: the condition on PERIODTHRS states no period; write = "
-                                "and a number of seconds from 1, for example PERIODTHRS = 60"))
+        EXPECT_THAT(
+            refused({"FREQTHRESH >= 5", condition}),
+            ElementsAre("when[1]: the condition on PERIODTHRS does not state a period; write = "
+                        "and a number of seconds from 1, for example PERIODTHRS = 60"))
             << condition;
     }
     EXPECT_THAT(refused({"ENTRYSRC = 'x'", period}),

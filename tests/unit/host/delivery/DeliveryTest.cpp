@@ -106,7 +106,7 @@ TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
     delivery.finish(Clock::now() + 50ms);
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
               "zrmagent: " + std::to_string(more) +
-                  " events were not delivered to /dev/full; it gets them when the agent runs "
+                  " events were not delivered to /dev/full; it will get them when the agent runs "
                   "again\n");
 }
 
@@ -124,7 +124,7 @@ TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
     testing::internal::CaptureStderr();
     delivery.finish(Clock::now() + 1s);
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "zrmagent: 1 events were not delivered to /dev/full; it gets them when the agent "
+              "zrmagent: 1 events were not delivered to /dev/full; it will get them when the agent "
               "runs again\n");
     EXPECT_EQ(lines(later), 1);
 }
@@ -135,12 +135,12 @@ TEST_F(DeliveryTest, WithoutADirectoryForTheHistoryItGoesOnWithoutOne) {
     config.history.directory = directory.file("no/such");
     testing::internal::CaptureStderr();
     Delivery delivery(config, testLayout(), sizeof(TestRow));
-    const std::string problem = "cannot make the directory " + config.history.directory +
+    const std::string problem = "cannot create the directory " + config.history.directory +
                                 ": No such file or directory; make it a directory that the agent "
                                 "may write, or set history.directory to one";
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
               "zrmagent: the history is off: " + problem +
-                  ". Until the next start sinks get events without it, and one that stays down "
+                  ". Until the next start sinks receive events without it, and one that stays down "
                   "stops the monitoring\n");
     EXPECT_EQ(delivery.historyProblem(), problem);
     EXPECT_EQ(delivery.history(), nullptr);

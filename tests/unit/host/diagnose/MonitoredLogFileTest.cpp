@@ -42,8 +42,8 @@ TEST_F(MonitoredLogFileTest, OpensTheFileThatTheMonitorHas) {
 
 TEST_F(MonitoredLogFileTest, OpensNoOtherFileOfTheName) {
     const FileIdentity monitored = identityOf(m_log);
-    const std::string another = "the log cannot be read: its name is another file's by now, and "
-                                "its monitor reads the one that had the name before";
+    const std::string another = "the log cannot be read: another file now has its name, and its "
+                                "monitor reads the one that had the name before";
     std::filesystem::rename(m_log, m_directory.file("app.log.1"));
     EXPECT_EQ(problem(monitored), "the log cannot be read: No such file or directory");
     m_directory.write("app.log", "successor\n");

@@ -26,9 +26,10 @@ TEST(TraceControl, ChangesTheGenerationWithTheLevels) {
 TEST(TraceControl, ABadTextChangesNothing) {
     ASSERT_EQ(TraceControl::configure("fine"), "");
     const unsigned before = TRC1_Generation;
-    EXPECT_EQ(TraceControl::configure("fine,loud"),
-              "\"loud\" in \"loud\" is no trace class; the classes are error, flow, detail, fine, "
-              "all, none, or a number from 0 to 255");
+    EXPECT_EQ(
+        TraceControl::configure("fine,loud"),
+        "\"loud\" in \"loud\" is not a trace class; the classes are error, flow, detail, fine, "
+        "all, none, or a number from 0 to 255");
     EXPECT_EQ(TRC1_Generation, before);
     EXPECT_EQ(TraceControl::levelOf("Any.cpp"), 0x01u);
     TraceControl::configure("");

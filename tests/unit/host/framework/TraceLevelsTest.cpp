@@ -81,7 +81,7 @@ TEST(TraceLevels, AClassHasAllItsSourceFiles) {
 }
 
 TEST(TraceLevels, NamesTheWordThatIsWrong) {
-    const std::string classes = " is no trace class; the classes are error, flow, detail, fine, "
+    const std::string classes = " is not a trace class; the classes are error, flow, detail, fine, "
                                 "all, none, or a number from 0 to 255";
     EXPECT_EQ(wrong("detial"), "\"detial\" in \"detial\"" + classes);
     EXPECT_EQ(wrong("fine,ValidLog=error+Fine"), "\"Fine\" in \"ValidLog=error+Fine\"" + classes);
@@ -94,8 +94,8 @@ TEST(TraceLevels, NamesTheWordThatIsWrong) {
     EXPECT_EQ(wrong("0x"), "\"0x\" in \"0x\"" + classes);
     EXPECT_EQ(wrong("0x1g"), "\"0x1g\" in \"0x1g\"" + classes);
     EXPECT_EQ(wrong("a=b=fine"), "\"b=fine\" in \"a=b=fine\"" + classes);
-    EXPECT_EQ(wrong("a b=fine"), "\"a b\" is no name of a source file");
-    EXPECT_EQ(wrong("a\n1 forged=fine"), "\"a\n1 forged\" is no name of a source file");
+    EXPECT_EQ(wrong("a b=fine"), "\"a b\" is not the name of a source file");
+    EXPECT_EQ(wrong("a\n1 forged=fine"), "\"a\n1 forged\" is not the name of a source file");
     EXPECT_EQ(wrong("fine, =fine"), "no unit is named before '=' in \"=fine\"");
 }
 

@@ -54,7 +54,7 @@ TEST_F(HistoryDirectoryTest, MakesWhatIsMissingForItsOwnerAndGroupAlone) {
 
 TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
     EXPECT_EQ(problemOf(path + "/below"),
-              "cannot make the directory " + path + "/below: No such file or directory" + cure);
+              "cannot create the directory " + path + "/below: No such file or directory" + cure);
     std::ofstream(directory.file("plain")) << "no directory";
     EXPECT_EQ(problemOf(directory.file("plain")),
               "cannot open " + directory.file("plain") + "/history.lock: Not a directory" + cure);

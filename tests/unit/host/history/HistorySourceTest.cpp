@@ -142,9 +142,9 @@ TEST_F(HistorySourceTest, PassesOverWhatTheHistoryNoLongerHoldsAndSaysSo) {
     HistorySource late("late", later, readers, cursor);
     testing::internal::CaptureStderr();
     EXPECT_EQ(late.read(1).front().id, 901u);
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "zrmagent: late did not get the events 251 to 900: the history does not hold them "
-              "any longer\n");
+    EXPECT_EQ(
+        testing::internal::GetCapturedStderr(),
+        "zrmagent: late did not get the events 251 to 900: the history no longer contains them\n");
     EXPECT_EQ(cursor, 900u);
     EXPECT_EQ(late.backlog(), 100u);
 }
@@ -190,11 +190,10 @@ TEST_F(HistorySourceTest, ReachesBackInMemoryWhereTheFileIsNew) {
     nothing.end();
     EXPECT_TRUE(late.read(1).empty());
     EXPECT_EQ(cursor, 40u);
-    EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "zrmagent: sink x did not get the events 1 to 20: the history does not hold them any "
-              "longer\n"
-              "zrmagent: late did not get the events 31 to 40: the history does not hold them any "
-              "longer\n");
+    EXPECT_EQ(
+        testing::internal::GetCapturedStderr(),
+        "zrmagent: sink x did not get the events 1 to 20: the history no longer contains them\n"
+        "zrmagent: late did not get the events 31 to 40: the history no longer contains them\n");
 }
 
 TEST_F(HistorySourceTest, TriesAgainWhenTheFileCannotBeRead) {

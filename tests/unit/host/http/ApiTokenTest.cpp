@@ -81,13 +81,14 @@ TEST_F(ApiTokenTest, TakesAnOperatorsOwnToken) {
 
 TEST_F(ApiTokenTest, RefusesAFileThatEveryoneReads) {
     EXPECT_EQ(problem(withContent(secret, 0644)),
-              path + " is open to every user: take the others' permissions away (chmod o= " + path +
-                  ") or remove it, and a new one is made");
+              path +
+                  " is accessible to every user: remove the permissions of other users (chmod o= " +
+                  path + ") or remove it to have a new one created");
 }
 
 TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
-    const std::string expected = path + " holds no token of 32 to 1024 visible characters: remove "
-                                        "it, and a new one is made";
+    const std::string expected = path + " does not contain a token of 32 to 1024 visible "
+                                        "characters: remove it to have a new one created";
     for (const std::string& text :
          {std::string(), std::string("\n"), secret.substr(1), secret + " " + secret,
           std::string(1025, 'x'), std::string(5000, 'x'), secret + "\x01"}) {
@@ -98,9 +99,10 @@ TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
 
 TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
     const std::string itself = directory.path();
-    EXPECT_EQ(problem(itself), itself + " is no file that can hold a token");
+    EXPECT_EQ(problem(itself), itself + " is not a file that can contain a token");
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
-    EXPECT_EQ(problem(path), path + " is no file that can hold a token") << "nobody waits for it";
+    EXPECT_EQ(problem(path), path + " is not a file that can contain a token")
+        << "nobody waits for it";
 }
 
 TEST_F(ApiTokenTest, NothingIsMadeWhereALinkLeads) {
@@ -112,12 +114,13 @@ TEST_F(ApiTokenTest, NothingIsMadeWhereALinkLeads) {
 
 TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
     const std::string deep = directory.file("no/such/api-token");
-    EXPECT_EQ(problem(deep), "cannot make the directory " + directory.file("no/such") +
+    EXPECT_EQ(problem(deep), "cannot create the directory " + directory.file("no/such") +
                                  ": No such file or directory");
     directory.write("file", "");
     EXPECT_EQ(problem(directory.file("file/api-token")),
               "cannot read " + directory.file("file/api-token") + ": Not a directory");
-    EXPECT_EQ(problem("/proc/api-token"), "cannot make a file in /proc: No such file or directory");
+    EXPECT_EQ(problem("/proc/api-token"),
+              "cannot create a file in /proc: No such file or directory");
     {
         Fault fault("fopen", EACCES);
         EXPECT_EQ(problem(path), "cannot read " + path + ": Permission denied");

@@ -76,7 +76,7 @@ TEST_F(CredentialsTest, ATokenThatCannotBeUsedIsReportedOnce) {
     EXPECT_EQ(credentials.load(), "");
     writeToken("short");
     EXPECT_THAT(look(credentials).problem,
-                testing::StartsWith("the token before goes on: " + token));
+                testing::StartsWith("the previous token stays in use: " + token));
     EXPECT_TRUE(credentials.token().matches(first));
     expectNothingNew(credentials);
     std::filesystem::remove(token);
@@ -108,9 +108,10 @@ TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
     Credentials credentials(token, certificate, key);
     EXPECT_EQ(credentials.load(), "");
     directory.write("agent.pem", "nonsense");
-    EXPECT_THAT(look(credentials).problem,
-                testing::StartsWith("the certificate before goes on: cannot use the certificate " +
-                                    certificate));
+    EXPECT_THAT(
+        look(credentials).problem,
+        testing::StartsWith("the previous certificate stays in use: cannot use the certificate " +
+                            certificate));
     EXPECT_TRUE(credentials.tls()->isFor("one.example"));
     expectNothingNew(credentials);
     makePair("two.example");
@@ -124,7 +125,7 @@ TEST_F(CredentialsTest, WithoutAUsableFileThereIsAProblemAtOnce) {
     EXPECT_THAT(Credentials(token, certificate, key).load(),
                 testing::StartsWith("cannot use the certificate"));
     writeToken("short");
-    EXPECT_THAT(Credentials(token, "", "").load(), testing::StartsWith(token + " holds no token"));
+    EXPECT_THAT(Credentials(token, "", "").load(), testing::StartsWith(token + " does not contain a token"));
 }
 
 } // namespace

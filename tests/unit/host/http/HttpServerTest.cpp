@@ -171,7 +171,7 @@ TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
     EXPECT_THAT(client().raw("GET /healthz HTTP/1.1\r\nConnection: close\r\n\r\n"),
                 testing::StartsWith("HTTP/1.1 421 Misdirected Request\r\n"));
     expectProblem(client().get("/healthz", {{"Origin", "http://evil.example"}}), 403,
-                  "requests of other origins are refused", "Origin");
+                  "requests from other origins are refused", "Origin");
 }
 
 TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
@@ -188,7 +188,7 @@ TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
 }
 
 TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
-    expectProblem(sample("RMMONLOG", "{"), 400, "the body is no JSON", "body");
+    expectProblem(sample("RMMONLOG", "{"), 400, "the body is not JSON", "body");
     expectProblem(sample("RMMONLOG", R"({"filters":[{}]})"), 400, "write a text",
                   "filters[0].column");
     expectProblem(
@@ -199,7 +199,7 @@ TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
 TEST_F(HttpServerTest, RefusesLongBodies) {
     const std::string tooLong = "the body has more than 1048576 bytes";
     expectProblem(sample("RMMONLOG", std::string(1048577, ' ')), 413, tooLong, "body");
-    expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is no JSON",
+    expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is not JSON",
                   "body");
     // A body that does not tell its length is cut off too.
     std::string chunks;
@@ -261,11 +261,11 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
 TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
     HttpServer second(router);
     EXPECT_EQ(second.start({"127.0.0.1", server.port()}, ApiToken(secret)),
-              "cannot listen at 127.0.0.1:" + std::to_string(server.port()) +
+              "cannot listen on 127.0.0.1:" + std::to_string(server.port()) +
                   ": is another agent running?");
     HttpServer elsewhere(router);
     EXPECT_EQ(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret)),
-              "cannot listen at 203.0.113.1:0");
+              "cannot listen on 203.0.113.1:0");
 }
 
 TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
@@ -334,7 +334,7 @@ TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
     const auto begin = Clock::now();
     server.abandon(begin + 30ms);
     EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is under way";
-    expectProblem(sample("RMMONLOG", "{}"), 503, "the agent is ending", "");
+    expectProblem(sample("RMMONLOG", "{}"), 503, "the agent is stopping", "");
     go.set_value();
     EXPECT_EQ(answer.get(), 200);
     server.abandon(Clock::now() + 10s); // nothing is under way: returns at once

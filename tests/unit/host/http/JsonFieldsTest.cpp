@@ -64,14 +64,14 @@ TEST(JsonFields, MissingAndNullAreTheSame) {
 
 TEST(JsonFields, RefusesBodiesThatAreNoObject) {
     for (const char* const body : {"{", "{}x", "\"\xff\"", "{\"a\":1,}", "{\"a\":NaN}", "'"}) {
-        EXPECT_EQ(refused(body, nothing), "body: the body is no JSON") << body;
+        EXPECT_EQ(refused(body, nothing), "body: the body is not JSON") << body;
     }
     for (const char* const body : {"[]", "5", "null", "\"x\""}) {
         EXPECT_EQ(refused(body, nothing), "body: write an object") << body;
     }
     EXPECT_EQ(refused(std::string(900'000, '['), nothing),
               "body: the body is nested deeper than 32");
-    EXPECT_EQ(refused(R"({"a":1,"b":{"a":2},"a":3})", nothing), "a: the member comes twice");
+    EXPECT_EQ(refused(R"({"a":1,"b":{"a":2},"a":3})", nothing), "a: the member appears twice");
 }
 
 TEST(JsonFields, RefusesOtherTypes) {
@@ -100,7 +100,7 @@ TEST(JsonFields, RefusesMembersThatNobodyAskedFor) {
     EXPECT_EQ(refused(R"({"log":"x","where":[]})", read),
               "where: unknown member; the members are log, logs");
     EXPECT_EQ(refused(R"({"":1})", read), "\"\": unknown member; the members are log, logs");
-    EXPECT_EQ(refused(R"({"":1,"":2})", read), "\"\": the member comes twice");
+    EXPECT_EQ(refused(R"({"":1,"":2})", read), "\"\": the member appears twice");
     EXPECT_EQ(refused(R"({"definition":{"nam":1}})",
                       [](JsonFields& f) {
                           JsonFields definition = f.object("definition");

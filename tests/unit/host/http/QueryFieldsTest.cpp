@@ -59,10 +59,10 @@ TEST(QueryFields, RefusesWhatIsWrong) {
          {"", "0", "10", "-1", "+5", " 5", "5 ", "5.0", "0x5", "five", "99999999999999999999999"}) {
         EXPECT_EQ(refused({{"n", value}}, number), "n: write a whole number from 1 to 9") << value;
     }
-    EXPECT_EQ(refused({{"n", "1"}, {"n", "2"}}, number), "n: the parameter comes more than once");
+    EXPECT_EQ(refused({{"n", "1"}, {"n", "2"}}, number), "n: the parameter appears more than once");
     EXPECT_EQ(refused({{"t", "soon"}}, [](QueryFields& fields) { fields.time("t"); }),
-              "t: 'soon' is no time; write it like 2026-11-20T07:03:09, with Z or +01:00 behind it "
-              "where it is not local");
+              "t: 'soon' is not a time; write it like 2026-11-20T07:03:09, followed by Z or +01:00 "
+              "unless it is local");
     EXPECT_EQ(refused({{"n", "1"}, {"m", "2"}}, number),
               "m: unknown parameter; the parameters are n");
     EXPECT_EQ(refused({{"x", ""}}, [](QueryFields&) {}), "x: this path takes no parameters");

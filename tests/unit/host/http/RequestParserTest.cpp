@@ -115,7 +115,7 @@ TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
         const IncomingRequest twice =
             read(std::string("GET / HTTP/1.1\r\n") + name + ": 1\r\n" + name + ": 1");
         ASSERT_TRUE(twice.problem) << name;
-        EXPECT_EQ(twice.problem->detail, "the header comes more than once");
+        EXPECT_EQ(twice.problem->detail, "the header appears more than once");
     }
 }
 

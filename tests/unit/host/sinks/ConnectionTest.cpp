@@ -56,7 +56,7 @@ TEST_F(ConnectionTest, ANameThatIsLookedUpForLongHoldsNobodyUp) {
     Connection other(ListenAddress{"slow.example", port}, Connection::TCP, 60s);
     giveUp.request_stop();
     EXPECT_FALSE(other.open(giveUp.get_token()));
-    EXPECT_EQ(other.error(), "the agent is ending (" + place + ")");
+    EXPECT_EQ(other.error(), "the agent is stopping (" + place + ")");
 }
 
 } // namespace

@@ -125,7 +125,7 @@ TEST_F(HttpPostTest, AnAnswerThatBreaksOffOrIsNoneIsAFailure) {
     };
     for (const char* const bytes :
          {"", "HTTP/1.1 20", "HTTP/1.1 200 OK\r\nContent-Le", "\0\1\2\3garbage\r\n\r\n"}) {
-        expectError(bytes, "the connection ended without a whole answer");
+        expectError(bytes, "the connection ended before the answer was complete");
     }
     for (const char* const bytes :
          {"220 mail.example.com ESMTP\r\n", "\r\n\r\n", "HTTP/1.1 999999999999 X\r\n\r\n"}) {
@@ -199,7 +199,7 @@ TEST_F(HttpPostTest, EndsAtOnceWhenItIsToldToGiveUp) {
     EXPECT_FALSE(send(http));
     EXPECT_LT(Clock::now() - begin, 10s);
     EXPECT_EQ(http.error(),
-              "the agent is ending (127.0.0.1:" + std::to_string(receiver.port()) + ")");
+              "the agent is stopping (127.0.0.1:" + std::to_string(receiver.port()) + ")");
 }
 
 /// A port at which connections are neither taken nor refused: its queue of them is full.
@@ -259,7 +259,7 @@ TEST_F(HttpPostTest, LookingANameUpEndsInTimeAndWhenToldToGiveUp) {
     const Clock::time_point begin = Clock::now();
     EXPECT_FALSE(send(patient));
     EXPECT_LT(Clock::now() - begin, 30s);
-    EXPECT_EQ(patient.error(), "the agent is ending (" + place + ")");
+    EXPECT_EQ(patient.error(), "the agent is stopping (" + place + ")");
     stopper.join();
     giveUp = {};
     resolver.answer();

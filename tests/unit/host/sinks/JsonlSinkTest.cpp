@@ -316,7 +316,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
         delivered = sink.deliver(from(0), giveUp.get_token());
         expected += lines;
     }
-    EXPECT_EQ(sink.error(), "the reader takes no data");
+    EXPECT_EQ(sink.error(), "the reader does not read");
     written = readAll();
     EXPECT_TRUE(expected.starts_with(written));
     // Offered again, the rest follows where the stream broke off.

@@ -271,7 +271,7 @@ TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
     EXPECT_EQ(deliver(sink, 0, events.records().size()), 0u);
     EXPECT_LT(Clock::now() - begin, 10s);
     EXPECT_EQ(sink.error(),
-              "the agent is ending (127.0.0.1:" + std::to_string(listener.port) + ")");
+              "the agent is stopping (127.0.0.1:" + std::to_string(listener.port) + ")");
 }
 
 TEST_F(SyslogSinkTest, OverUdpEachMessageIsADatagram) {

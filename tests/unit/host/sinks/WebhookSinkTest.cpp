@@ -142,10 +142,10 @@ TEST_F(WebhookSinkTest, ASecretThatIsOpenToEveryUserIsNotUsed) {
     chmod(path.c_str(), 0644);
     WebhookSink sink(config("secret_file = '" + path + "'"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
-    EXPECT_EQ(sink.error(), path +
-                                " is open to every user: take the others' permissions away "
-                                "(chmod o= " +
-                                path + ")");
+    EXPECT_EQ(sink.error(),
+              path +
+                  " is accessible to every user: remove the permissions of other users (chmod o= " +
+                  path + ")");
     chmod(path.c_str(), 0640);
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
 }

@@ -281,7 +281,7 @@ TEST_F(SituationChanges, ThereIsAMostNumber) {
     const SituationSet::Change change = set->add(situation("a"));
     EXPECT_EQ(refused(change), SituationRefusal::TOO_MANY);
     EXPECT_EQ(std::get<SituationRefusal>(change).detail,
-              "there are 1000 situations made through the API: remove one first");
+              "there are 1000 situations created through the API: remove one first");
     EXPECT_FALSE(set->remove("s0"));
     EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
 }

@@ -90,7 +90,7 @@ TEST_F(SituationStoreTest, AFileOfAnyDepthIsMovedAside) {
         std::ofstream(file) << content;
         message.clear();
         EXPECT_THAT(SituationStore(file).load(message).made, IsEmpty());
-        EXPECT_THAT(message, HasSubstr(file + " cannot be used (it is nested too deep)"));
+        EXPECT_THAT(message, HasSubstr(file + " cannot be used (it is nested too deeply)"));
     }
 }
 
@@ -132,7 +132,7 @@ TEST_F(SituationStoreTest, MakesItsDirectory) {
     EXPECT_EQ(deeper.load(message).made.size(), 2u);
     SituationStore tooDeep(directory.file("no") + "/such/situations.json");
     EXPECT_THAT(tooDeep.save(content()),
-                HasSubstr("cannot make the directory " + directory.file("no") + "/such: "));
+                HasSubstr("cannot create the directory " + directory.file("no") + "/such: "));
 }
 
 TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
@@ -189,7 +189,7 @@ TEST_F(SituationStoreTest, MovesAsideWhatItCannotUse) {
         {R"({"version":7,"situations":[],"stopped":[]})", "its version is 7, this agent's is 1"},
         {R"({"version":1,"situations":[{"name":"a","when":[],"stopped":false},)"
          R"({"name":"a","when":[],"stopped":false}],"stopped":[]})",
-         "a name comes twice"},
+         "a name appears twice"},
     };
     for (const auto& [written, reason] : bad) {
         for (const std::string& name : names()) {
@@ -216,8 +216,8 @@ TEST_F(SituationStoreTest, SavesNothingOverWhatItCouldNotRead) {
         fresh.load(message);
     }
     EXPECT_EQ(message, "cannot read " + file +
-                           ": Permission denied; no situation is changed through the API until the "
-                           "next start");
+                           ": Permission denied; situations cannot be changed through the API "
+                           "until the next start");
     EXPECT_EQ(fresh.save({}), "cannot read " + file + ": Permission denied");
     EXPECT_EQ(text(), before);
     SituationStore torn(file);
@@ -240,7 +240,7 @@ TEST_F(SituationStoreTest, SaysWhatIsWrongWithASituationThatCannotRun) {
     EXPECT_EQ(loaded.made[0].config.name, "a");
     EXPECT_THAT(loaded.made[0].config.when, ElementsAre("GONE = 'x'"));
     EXPECT_THAT(loaded.made[0].problem, HasSubstr("when[0]: in \"GONE = 'x'\": 'GONE' is no"));
-    EXPECT_THAT(loaded.made[0].problem, HasSubstr("; frequency: has no period beside it"));
+    EXPECT_THAT(loaded.made[0].problem, HasSubstr("; frequency: has no period"));
 }
 
 } // namespace

@@ -51,20 +51,19 @@ TEST(CommandLine, RefusesEverythingElse) {
 }
 
 TEST(CommandLine, TheHelpNamesEveryOption) {
-    EXPECT_EQ(
-        CommandLine::help(),
-        "Usage: zrmagent [OPTION]...\n"
-        "Watches log files and reports their new entries as events.\n"
-        "\n"
-        "  --config FILE       host configuration (default /etc/zrm/zrm.toml when it exists)\n"
-        "  --trace-file FILE   append the trace to FILE instead of standard error\n"
-        "  --version           print the version and end\n"
-        "  --help              print this help and end\n"
-        "\n"
-        "Signals: HUP re-reads the configuration of the logs, INT and TERM end the agent.\n"
-        "Exit status: 0 after an orderly end, 2 for an unusable command line or "
-        "configuration,\n"
-        "255 after a failure.\n");
+    EXPECT_EQ(CommandLine::help(),
+              "Usage: zrmagent [OPTION]...\n"
+              "Watches log files and reports their new entries as events.\n"
+              "\n"
+              "  --config FILE       host configuration (default /etc/zrm/zrm.toml if it exists)\n"
+              "  --trace-file FILE   append the trace to FILE instead of standard error\n"
+              "  --version           print the version and exit\n"
+              "  --help              print this help and exit\n"
+              "\n"
+              "Signals: HUP re-reads the log configuration, INT and TERM stop the agent.\n"
+              "Exit status: 0 after an orderly stop, 2 for an unusable command line or "
+              "configuration,\n"
+              "255 after a failure.\n");
 }
 
 } // namespace

@@ -252,7 +252,7 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
                       "[[situation]]\nname = 'every'\n[[situation]]\nname = 'b'\n[http]\n");
                 arrive(2);
                 write("broken");
-                waitForError("not taken over");
+                waitForError("was not loaded");
                 arrive(2);
                 stop();
             }).detach();
@@ -261,12 +261,12 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
         testing::ExitedWithCode(0), "");
     EXPECT_EQ(lines(), 5);
     const std::string file = directory + "/zrm.toml";
-    EXPECT_THAT(errors(), testing::MatchesRegex(
-                              "zrmagent: " + file +
-                              ": the situations are taken over, every other change at the next "
-                              "start\nzrmagent: " +
-                              file + ":1: .*; correct the TOML here\nzrmagent: " + file +
-                              " was not taken over; the situations go on as they were\n"));
+    EXPECT_THAT(errors(),
+                testing::MatchesRegex("zrmagent: " + file +
+                                      ": the situations are reloaded; every other change takes "
+                                      "effect at the next start\nzrmagent: " +
+                                      file + ":1: .*; correct the TOML here\nzrmagent: " + file +
+                                      " was not loaded; the situations stay as they were\n"));
 }
 
 TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
@@ -303,12 +303,12 @@ TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
         },
         testing::ExitedWithCode(0), "");
     const std::string file = "zrmagent: " + directory + "/zrm.toml";
-    const std::string kept = file + " was not taken over; the situations go on as they were\n";
+    const std::string kept = file + " was not loaded; the situations stay as they were\n";
     EXPECT_EQ(errors(),
               file + ": is empty; write the configuration into it again\n" + kept + file +
                   ":7: the file ends within this line; write the rest of it, or end the line\n" +
                   kept + file +
-                  ": 3 of 4 situations are gone and raise nothing any more; if the file was cut "
+                  ": 3 of 4 situations are gone and no longer raise events; if the file was cut "
                   "off, write it again\n");
 }
 
@@ -327,7 +327,7 @@ TEST_F(HostTest, SaysOnceThatThereIsNoLogToMonitor) {
         testing::ExitedWithCode(0), "");
     EXPECT_EQ(errors(), "zrmagent: no log to monitor: set log_config in " + directory +
                             "/zrm.toml, or ZRM_CONFIG_FILE in the environment, to a file that "
-                            "names one log per line; ending in a minute\n");
+                            "names one log per line; exiting in a minute\n");
 }
 
 TEST_F(HostTest, SaysWhichFileNamesNoLog) {
@@ -342,9 +342,9 @@ TEST_F(HostTest, SaysWhichFileNamesNoLog) {
             std::exit(run("[agent]\nlog_config = '/etc/zrm/logs.conf'\n"));
         },
         testing::ExitedWithCode(0), "");
-    EXPECT_EQ(errors(), "zrmagent: no log to monitor: /etc/zrm/logs.conf names none that can be "
-                        "monitored, and 'zrmctl check /etc/zrm/logs.conf' says why; ending in a "
-                        "minute\n");
+    EXPECT_EQ(errors(),
+              "zrmagent: no log to monitor: /etc/zrm/logs.conf names none that can be "
+              "monitored, and 'zrmctl check /etc/zrm/logs.conf' says why; exiting in a minute\n");
 }
 
 TEST_F(HostTest, GoesOnWithoutItsExitRoutine) {

@@ -128,11 +128,11 @@ TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
     serving->stop(begin + 200ms);
     EXPECT_LT(Clock::now() - begin, 5s);
     log.join();
-    EXPECT_EQ(
-        testing::internal::GetCapturedStderr(),
-        "zrmagent: " + std::to_string(taken) +
-            " events were not delivered to /dev/full\n"
-            "zrmagent: 7 lines that waited in the logs were not looked at; reports find them\n");
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "zrmagent: " + std::to_string(taken) +
+                  " events were not delivered to /dev/full\n"
+                  "zrmagent: 7 lines that were waiting in the logs were not read; reports will "
+                  "find them\n");
 }
 
 TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
@@ -165,7 +165,7 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
-              "zrmagent: HTTP is off: cannot make the directory " + directory.file("no/such") +
+              "zrmagent: HTTP is off: cannot create the directory " + directory.file("no/such") +
                   ": No such file or directory\n");
     EXPECT_EQ(arrive(), 0u);
     serving->stop(Clock::now() + 10s);
@@ -182,7 +182,7 @@ TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
               "zrmagent: 1 events were not delivered to " +
                   directory.file("no/such/directory/events.jsonl") +
-                  "; it gets them when the agent runs again\n");
+                  "; it will get them when the agent runs again\n");
     serving.reset();
     std::filesystem::create_directories(directory.file("no/such/directory"));
     serving = Serving::begin(config, entries, watchdog);
