@@ -125,7 +125,8 @@ TEST_F(CredentialsTest, WithoutAUsableFileThereIsAProblemAtOnce) {
     EXPECT_THAT(Credentials(token, certificate, key).load(),
                 testing::StartsWith("cannot use the certificate"));
     writeToken("short");
-    EXPECT_THAT(Credentials(token, "", "").load(), testing::StartsWith(token + " does not contain a token"));
+    EXPECT_THAT(Credentials(token, "", "").load(),
+                testing::StartsWith(token + " does not contain a token"));
 }
 
 } // namespace
