@@ -200,14 +200,14 @@ def test_situations_change_while_entries_arrive(running):
 
     def write():
         while not over.is_set():
-            running.watched.append(syslog_line("busy") * 200)
+            running.watched.append(syslog_line("busy") * 50)
             time.sleep(0.01)
 
     writer = threading.Thread(target=write)
     writer.start()
     try:
         changes = 0
-        while not running.events() or changes < 30:
+        while changes < 30 or not running.events():
             changes += 1
             api.add("changing", when=["ENTRYDESC = 'never'"])
             api.post("changing", "stop")
