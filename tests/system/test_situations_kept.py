@@ -222,7 +222,7 @@ def test_situations_change_while_entries_arrive(running):
 
 
 def test_a_full_queue_holds_no_change_up_for_long(agent):
-    """A sink that takes nothing: the log thread waits with the table's lock."""
+    """A sink that takes nothing: the log thread waits, and holds no lock meanwhile."""
     agent.history = {"enabled": False}  # the sink stands between the queue and the log
     agent.listen = "127.0.0.1:0"
     agent.sink = str(agent.directory / "pipe")
@@ -246,13 +246,7 @@ def test_a_full_queue_holds_no_change_up_for_long(agent):
     begin = time.monotonic()
     late = api.add("late")
     assert time.monotonic() - begin < 10
-    assert late["state"] == "running" and "still to be opened" in late["problem"]
-    assert time.monotonic() - begin < 10
-    while api.get("late")["problem"] is not None:
-        try:
-            os.read(reader, 1 << 20)
-        except BlockingIOError:
-            time.sleep(0.01)
+    assert late["state"] == "running" and late["problem"] is None
     drain = threading.Event()
 
     def read_on():
