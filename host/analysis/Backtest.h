@@ -20,35 +20,35 @@ class LogFile;
 
 namespace zrm::host {
 
-/// Runs a situation over what logs hold between two times, by the logs' reports, without their
-/// limit of rows. Holds the times of the entries that meet the conditions, and no rows. One
-/// thread; it holds the logs still meanwhile (MonitoredLogs).
+/// Runs a situation over the contents of logs between two times, using the logs' reports without
+/// their row limit. Keeps the times of matching entries but no rows. Used by one thread, which
+/// keeps the logs from changing meanwhile (MonitoredLogs).
 class Backtest {
 public:
     static constexpr std::uint64_t mostEntries = 5'000'000; ///< read
     static constexpr std::size_t mostMatched = 1'000'000;
-    static constexpr std::size_t mostTimes = 1000; ///< that the result names
+    static constexpr std::size_t mostTimes = 1000; ///< listed in the result
     static constexpr std::chrono::seconds patience{30};
 
     struct Result {
         std::uint64_t entries = 0; ///< between the two times
-        std::uint64_t matched = 0; ///< of these, met every condition
+        std::uint64_t matched = 0; ///< of these, those that met every condition
         std::uint64_t raised = 0;
-        bool isTruncated = false;          ///< there are older entries that were not looked at
-        Reach reach;                       ///< over all logs: back to `reached` every one was read
+        bool isTruncated = false;          ///< there are older entries that were not read
+        Reach reach;                       ///< over all logs: each was read back to `reached`
         std::vector<std::string> raisedAt; ///< the first times, 16 characters each
         std::string decision;              ///< one sentence
     };
 
-    /// The table's manager outlives the object.
+    /// The table's manager must outlive the object.
     Backtest(const SituationConfig& situation, TableManager& entries)
         : m_replay(situation, entries) {}
 
-    /// Whether the table has given a request; nothing else may be called without.
+    /// Whether the table opened a request; if not, nothing else may be called.
     bool isOpen() const noexcept { return m_replay.isOpen(); }
 
-    /// Reads the logs from one 16-character time to the other, ends included. Ends early, with a
-    /// truncated result, when `isCancelled`.
+    /// Reads the logs between two 16-character times, both included. Ends early with a truncated
+    /// result once `isCancelled` returns true.
     Result run(const std::vector<LogFile*>& logs, const std::string& from, const std::string& to,
                const std::function<bool()>& isCancelled);
 
@@ -63,7 +63,7 @@ private:
     std::string decisionOf(const Result& result) const;
 
     Replay m_replay;
-    std::vector<Stamp> m_matched; ///< newest first within a log, logs one behind the other
+    std::vector<Stamp> m_matched; ///< newest first within a log, one log after another
 };
 
 } // namespace zrm::host

@@ -30,7 +30,7 @@ std::string valueOf(const Condition& condition) {
     return '[' + list + ']';
 }
 
-/// What stands between a column's value and that of a condition which does not hold.
+/// The words between a column's value and that of a condition which does not hold.
 const char* denial(_IntfOper op) {
     struct Denial {
         _IntfOper op;

@@ -14,7 +14,7 @@
 
 namespace zrm::host {
 
-/// What became of one condition on one entry.
+/// The result of checking one condition against one entry.
 struct ConditionVerdict {
     std::string condition;                         ///< as operators write it
     std::variant<std::string, std::int64_t> value; ///< of the column
@@ -25,10 +25,10 @@ struct ConditionVerdict {
     static std::string textOf(const Condition& condition);
 };
 
-/// Judges rows by conditions, one by one, as a situation's requests do. One thread.
+/// Checks rows against conditions one by one, as a situation's requests do. Used by one thread.
 class ConditionJudge {
 public:
-    /// The rows are those of a table of this layout, which outlives the object.
+    /// The rows have this layout, which must outlive the object.
     ConditionJudge(std::vector<Condition> conditions, const RowLayout& layout);
     ConditionJudge(const ConditionJudge&) = delete;
     ConditionJudge& operator=(const ConditionJudge&) = delete;

@@ -58,7 +58,7 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
     seen.line = line;
     if (row != nullptr) {
         seen.isRow = true;
-        seen.row = *row; // judging writes into the row
+        seen.row = *row; // judging modifies the row
         seen.verdict = replay.judge(*row);
     }
     return seen;
@@ -94,7 +94,7 @@ std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
     TraceScope trace(anchor);
     std::optional<Seen> found;
     Stamps matched;
-    // A log that cannot be read has nothing before the line.
+    // If the log cannot be read, no entries precede the line.
     read(log, [&](auto text, zrm_rmlogent_data_t* row) {
         Seen seen = judge(m_replay, text, row);
         if (seen.verdict.matches && m_replay.hasThresholds()) {
@@ -110,7 +110,7 @@ std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
     return nextLine(log, line, matched);
 }
 
-/// The line as if it came behind those of its time and before.
+/// The line as if it came after all entries up to its time.
 std::vector<Explanation> Explainer::nextLine(LogFile& log, std::string_view line,
                                              const Stamps& before) {
     TraceScope trace(anchor);
@@ -144,7 +144,7 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
             const bool isEntry =
                 row != nullptr && StoredRow::isSameEntry(layout(), *row, entry.row);
             Seen seen = judge(m_replay, line, row);
-            // Of several that are the same, the one that was counted like the event.
+            // Among identical entries, take the one with the same count as the event.
             if (isEntry && !isExact) {
                 isExact = entry.isOwn && seen.verdict.frequency == entry.row.freqthresh;
                 found = std::move(seen);
@@ -187,7 +187,7 @@ Explanation Explainer::describe(Seen& seen) {
     } else {
         char* const row = reinterpret_cast<char*>(&seen.row);
         RowJson::append(explanation.row, layout(), row);
-        m_replay.matches(seen.row); // gives the row the situation's thresholds
+        m_replay.matches(seen.row); // writes the situation's thresholds into the row
         explanation.conditions = m_judge->judge(row);
     }
     explanation.matches = seen.verdict.matches;

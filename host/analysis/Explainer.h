@@ -24,8 +24,8 @@ class LogFile;
 
 namespace zrm::host {
 
-/// Explains what a situation makes of entries. The entries that a log holds before them are
-/// counted for the thresholds, as far back as LogTail reads. One thread; it holds the logs still
+/// Explains how a situation evaluates entries. Earlier entries of the log count towards the
+/// thresholds, as far back as LogTail reads. Used by one thread, which keeps the logs from changing
 /// meanwhile (MonitoredLogs).
 class Explainer {
 public:
@@ -34,19 +34,19 @@ public:
     /// The entry of an event.
     struct EventEntry {
         std::uint64_t id;
-        bool isOwn; ///< of this very situation: its row tells how many entries were counted
+        bool isOwn; ///< of this same situation: its row has the number of entries counted
         zrm_rmlogent_data_t row;
     };
 
-    /// The table's manager outlives the object. `isStopped`: the situation does not run.
+    /// The table's manager must outlive the object. `isStopped`: the situation is not running.
     Explainer(SituationConfig situation, bool isStopped, TableManager& entries);
 
-    /// Whether the table has given a request; nothing else may be called without.
+    /// Whether the table opened a request; if not, nothing else may be called.
     bool isOpen() const noexcept { return m_replay.isOpen(); }
     const RowLayout& layout() const { return m_replay.layout(); }
 
-    /// A line of a log that has lines: where the log holds it last, or as if it came next. A line
-    /// that is longer than a monitor reads in one piece has several.
+    /// Explains a line of a line-based log: its last occurrence in the log, or else as if it came
+    /// next. A line longer than a monitor reads in one piece yields several explanations.
     std::vector<Explanation> line(LogFile& log, std::string_view line);
 
     /// The log's last entries, at most `mostEntries`, oldest first.
@@ -55,13 +55,13 @@ public:
     /// The entry of an event; the log is null when it is no longer monitored.
     Explanation event(LogFile* log, const EventEntry& entry);
 
-    /// What was wrong with reading the log; empty when nothing was.
+    /// Why the log could not be read; empty when it could.
     const std::string& problem() const noexcept { return m_problem; }
-    /// How far back the log was read for what was explained last.
+    /// How far back the log was read for the latest explanation.
     const Reach& reach() const noexcept { return m_reach; }
 
 private:
-    /// An entry and what was found when it was judged.
+    /// An entry and the verdict on it.
     struct Seen;
     using Stamps = std::vector<std::string>;
 
@@ -76,7 +76,7 @@ private:
     const bool m_isStopped;
     TableManager& m_entries;
     Replay m_replay;
-    std::optional<ConditionJudge> m_judge; ///< of every condition but the thresholds
+    std::optional<ConditionJudge> m_judge; ///< for every condition except the thresholds
     std::string m_problem;
     Reach m_reach;
 };

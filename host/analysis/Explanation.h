@@ -10,7 +10,7 @@
 
 namespace zrm::host {
 
-/// Why a situation is raised by an entry, or why not.
+/// Why an entry does or does not raise a situation.
 struct Explanation {
     struct Window {
         std::string frequency;     ///< ">= 5"
@@ -19,8 +19,8 @@ struct Explanation {
     };
 
     std::optional<std::string> line;    ///< none: the entry did not come from a line
-    std::optional<std::uint64_t> event; ///< none: the entry is not one of an event
-    std::string row;                    ///< JSON object; empty: the line gives no row
+    std::optional<std::uint64_t> event; ///< none: the entry does not belong to an event
+    std::string row;                    ///< JSON object; empty: the line yields no row
     std::string reason;                 ///< why there is no row; empty: there is one
     std::vector<ConditionVerdict> conditions;
     bool matches = false; ///< every condition holds

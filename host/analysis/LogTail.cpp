@@ -22,9 +22,9 @@ namespace {
 
 TRC1_Anchor anchor{"LogTail.cpp"};
 
-constexpr char errorLog = 'E'; ///< read through a command
+constexpr char errorLog = 'E'; ///< this log is read through a command
 
-/// A descriptor that is closed at the end of its scope.
+/// A descriptor closed at the end of its scope.
 class Descriptor {
 public:
     explicit Descriptor(int fd) : m_fd(fd) {}
@@ -48,7 +48,7 @@ std::string because(const std::string& what, int number) {
     return what + ": " + error.text();
 }
 
-/// Goes to the first whole line among the file's last bytes; false leaves errno.
+/// Seeks to the first complete line among the file's last bytes; false with errno set.
 bool seekTail(int fd) {
     const off_t end = lseek(fd, 0, SEEK_END);
     if (end == -1) {
@@ -58,7 +58,7 @@ bool seekTail(int fd) {
     if (end <= room) {
         return lseek(fd, 0, SEEK_SET) != -1;
     }
-    // A line may begin right there, which the newline before it tells.
+    // A line may begin exactly there: check for a newline before it.
     off_t at = lseek(fd, end - room - 1, SEEK_SET);
     char block[4096];
     ssize_t count = 0;
@@ -99,7 +99,7 @@ std::string LogTail::read(const Entry& entry) {
     return problem;
 }
 
-/// Reads the lines at the end of a file; what is wrong, empty when nothing is.
+/// Reads the lines at the end of a file. Returns an error message, empty on success.
 std::string LogTail::readLines(int fd, const Entry& entry) {
     if (!seekTail(fd)) {
         return because("the log cannot be read", errno);
@@ -118,7 +118,7 @@ std::string LogTail::readLine(std::string_view line, const Entry& entry) {
     const Descriptor readEnd(ends[0]);
     Descriptor writeEnd(ends[1]);
     const std::string text = std::string(line) + '\n';
-    // A pipe that is empty takes as much at once.
+    // An empty pipe takes this much at once.
     if (write(writeEnd.get(), text.data(), text.size()) != static_cast<ssize_t>(text.size())) {
         return because("the line cannot be read", errno);
     }
@@ -132,10 +132,10 @@ void LogTail::pieces(int fd, const Entry& entry) {
     reader.start(fd);
     zrm_rmlogent_data_t row;
     std::string line;
-    // What a busy log is given meanwhile must not keep the reading from its end.
+    // A busy log that grows meanwhile must not keep this loop from ending.
     std::size_t read = 0;
     for (char* piece; read < 2 * longest && (piece = reader.next()) != nullptr;) {
-        line = piece; // making the row may change it
+        line = piece; // building the row may change it
         read += line.size() + 1;
         const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
         if (isRow && m_reach.reached.empty()) {
@@ -148,7 +148,7 @@ void LogTail::pieces(int fd, const Entry& entry) {
     }
 }
 
-/// The entries of a report over all times, which comes newest first.
+/// The entries of a report over all times, newest first.
 void LogTail::entries(const Entry& entry) {
     _RequestThresholds always{};
     std::strcpy(always.startTime, "0000000000000000");

@@ -11,9 +11,9 @@ class LogManager;
 
 namespace zrm::host {
 
-/// The monitored logs, held as they are while the object lives: a refresh waits for its end. To be
-/// constructed may itself wait for a refresh. Any thread, which holds no lock that a log's thread
-/// wants.
+/// The monitored logs, kept unchanged while the object exists: a refresh waits for its destruction.
+/// The constructor may wait for a refresh. Any thread that holds no lock which a log's thread
+/// needs.
 class MonitoredLogs {
 public:
     MonitoredLogs();
@@ -21,18 +21,18 @@ public:
     MonitoredLogs(const MonitoredLogs&) = delete;
     MonitoredLogs& operator=(const MonitoredLogs&) = delete;
 
-    /// True once a refresh waits for the object's end, and with it every log that has changed.
+    /// True once a refresh, and with it every changed log, waits for the destruction of the object.
     bool areWanted() const noexcept;
     std::vector<LogFile*> all() const;
-    /// The log of this whole path, in UTF-8; null when it is not monitored.
+    /// The log with this full path, in UTF-8; null when it is not monitored.
     LogFile* find(std::string_view path) const;
 
-    /// Whether a report on the log begins at once: one on a pipe in the place of its file would
-    /// wait for a writer.
+    /// Whether a report on the log starts without blocking: opening a pipe that has taken the place
+    /// of the file would wait for a writer.
     static bool isReadable(const LogFile& log) noexcept;
 
 private:
-    LogManager* const m_manager; ///< null while the process ends
+    LogManager* const m_manager; ///< null while the process exits
 };
 
 } // namespace zrm::host

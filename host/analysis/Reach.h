@@ -7,10 +7,10 @@
 
 namespace zrm::host {
 
-/// How far logs were read and why the reading ended.
+/// How far back logs were read and why reading stopped.
 struct Reach {
-    std::string reached; ///< ENTRYTIME of the oldest entry read; empty: there was none
-    std::string reason;  ///< why the reading ended early, a clause; empty: everything was read
+    std::string reached; ///< ENTRYTIME of the oldest entry read; empty: none was read
+    std::string reason;  ///< why reading stopped early, as a clause; empty: everything was read
 
     bool isComplete() const noexcept { return reason.empty(); }
     /// Adds `complete`, `reached` and `reason` to a JSON object.

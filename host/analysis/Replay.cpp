@@ -14,7 +14,7 @@ namespace {
 
 TRC1_Anchor anchor{"Replay.cpp"};
 
-/// Nothing is dispatched.
+/// Never called: nothing is dispatched.
 class NoReceiver : public RowReceiver {
 public:
     unsigned receive(const ctreq&, const char*, unsigned) override { return 0; }
@@ -62,7 +62,7 @@ Replay::Replay(const SituationConfig& situation, TableManager& entries)
     m_request.reset(new (std::nothrow)
                         Request(&m_surroundings->detail, &m_surroundings->context, &entries));
     if (m_request != nullptr && m_request->handle() == 0) {
-        m_request.reset(); // there are as many requests as there can be
+        m_request.reset(); // the limit of requests is reached
     }
     if (m_request != nullptr) {
         m_request->TakeSampleConstructor();

@@ -46,9 +46,9 @@ bool StoredRow::isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& 
     return std::all_of(layout.columns().begin(), layout.columns().end(),
                        [&](const RowColumn& column) {
                            if (column.isInteger() || column.name == "TIMESTAMP") {
-                               return true; // not of the entry
+                               return true; // not part of the entry
                            }
-                           // As the event's JSON has it.
+                           // As in the event's JSON.
                            std::string leftRoom;
                            std::string rightRoom;
                            return RowText::of(column, leftBytes, leftRoom) ==

@@ -8,14 +8,14 @@
 
 namespace zrm::host {
 
-/// Log Entries rows from the JSON of events. Stateless.
+/// Rebuilds Log Entries rows from the JSON of events. Stateless.
 class StoredRow {
 public:
-    /// Fills a row with the columns of an event's object; false when the text holds none. Columns
-    /// that are missing are blank or 0.
+    /// Fills a row with the columns of an event's JSON object; false when the text is not such an
+    /// object. Missing columns become blank or 0.
     static bool fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::string_view event);
 
-    /// Whether two rows are of the same entry, as far as the entry's own columns tell.
+    /// Whether two rows belong to the same entry, judging by the entry's own columns.
     static bool isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
                             const zrm_rmlogent_data_t& right);
 };

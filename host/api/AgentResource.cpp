@@ -31,7 +31,7 @@ using nlohmann::ordered_json;
 TRC1_Anchor anchor{"AgentResource.cpp"};
 
 constexpr std::size_t longestLevels = 4096; ///< bytes
-constexpr int tracedLevels = 200;           ///< bytes of them that the trace shows
+constexpr int tracedLevels = 200;           ///< bytes of the levels shown in the trace
 
 std::int64_t now() {
     return std::chrono::duration_cast<std::chrono::milliseconds>(
@@ -49,7 +49,7 @@ ordered_json textOrNull(const std::string& text) {
     return text.empty() ? ordered_json() : ordered_json(text);
 }
 
-/// Texts may quote what the system or a log said: bytes that are no UTF-8 are replaced.
+/// Texts may quote the system or a log: bytes that are not UTF-8 are replaced.
 HttpAnswer answerWith(const ordered_json& document) {
     return HttpAnswer::json(document.dump(-1, ' ', false, ordered_json::error_handler_t::replace));
 }
@@ -97,7 +97,7 @@ ordered_json sinksOf(const Delivery& delivery) {
     return sinks;
 }
 
-/// What is wrong with logs that are monitored without an error.
+/// Warnings about logs that are monitored without an error.
 ordered_json warningsOf(const LogWatch& watch) {
     ordered_json list = ordered_json::array();
     for (const auto& [log, warnings] : watch.all()) {

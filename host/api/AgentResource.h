@@ -16,7 +16,7 @@ class LogWatch;
 /// `POST /api/v1/refresh`.
 class AgentResource : public Resource {
 public:
-    /// Both outlive the object.
+    /// Both must outlive the object.
     AgentResource(Delivery& delivery, const LogWatch& watch);
 
     void addRoutes(Router& router) override;

@@ -31,7 +31,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// The log that a body names, or else the situation's.
+/// The log named in a body, or else the situation's.
 LogFile& logOf(const MonitoredLogs& logs, JsonFields& fields, const SituationConfig& situation) {
     const std::optional<std::string> path = fields.optionalText("log");
     if (!path && !situation.log) {
@@ -68,7 +68,7 @@ void AnalysisResource::addRoutes(Router& router) {
                [this](const HttpRequest& request) { return backtest(request); });
 }
 
-/// The situation that a body names or defines; `otherwise` is the name where it does neither.
+/// The situation that a body names or defines; `otherwise` is the name if it does neither.
 AnalysisResource::Subject AnalysisResource::subject(JsonFields& fields,
                                                     const std::string& otherwise) {
     std::optional<std::string> name = fields.optionalText("situation");

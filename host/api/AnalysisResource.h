@@ -25,14 +25,14 @@ class LogWatch;
 /// `POST /api/v1/explain` and `POST /api/v1/backtest`.
 class AnalysisResource : public Resource {
 public:
-    /// All outlive the object; the history is null when it is off.
+    /// All must outlive the object. The history is null when it is off.
     AnalysisResource(SituationSet& situations, TableManager& entries, const LogWatch& watch,
                      HistoryReader* history)
         : m_situations(situations), m_entries(entries), m_watch(watch), m_history(history) {}
 
     void addRoutes(Router& router) override;
 
-    /// Ends what is under way soon. Any thread.
+    /// Makes running requests end soon. Any thread.
     void cancel() noexcept { m_isCancelled = true; }
 
 private:
@@ -43,7 +43,7 @@ private:
 
     struct Explained {
         std::vector<Explanation> explanations;
-        Reach reach;     ///< of the log that they are about
+        Reach reach;     ///< of the log they are about
         std::string log; ///< its path
     };
 
@@ -58,7 +58,7 @@ private:
     TableManager& m_entries;
     const LogWatch& m_watch;
     HistoryReader* const m_history;
-    std::counting_semaphore<2> m_room{2}; ///< of backtests at a time
+    std::counting_semaphore<2> m_room{2}; ///< for concurrent backtests
     std::atomic<bool> m_isCancelled{false};
 };
 

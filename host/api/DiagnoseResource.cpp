@@ -40,7 +40,7 @@ std::vector<std::string> givenLines(JsonFields& fields) {
     return lines;
 }
 
-/// The last lines of a monitored log: the API shows no other file.
+/// The last lines of a monitored log; the API shows no other files.
 std::vector<std::string> loggedLines(const JsonFields& fields, const std::string& log,
                                      std::size_t count) {
     const std::vector<LogLedgerView> monitored = LogLedgers::read(log);
@@ -63,7 +63,7 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
     return std::move(*lines);
 }
 
-/// An answer holds what every directive reads in every line: how much that is, is bounded here.
+/// An answer contains what every directive reads from every line; this limits the total.
 void refuseTooMuch(const JsonFields& fields, const std::string& format, std::string_view log,
                    const std::vector<std::string>& lines) {
     std::size_t pieces = 0;
@@ -80,8 +80,8 @@ void refuseTooMuch(const JsonFields& fields, const std::string& format, std::str
     }
 }
 
-/// Where the configured logs are, monitored or not: elsewhere the API says of no file that it is
-/// there.
+/// The directories of the configured logs, monitored or not. The API reveals no file outside of
+/// them.
 ConfigCheck::Directories logDirectories() {
     ConfigCheck::Directories directories;
     const auto add = [&directories](const std::string& path) {

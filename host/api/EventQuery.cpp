@@ -9,7 +9,7 @@ namespace zrm::host {
 namespace {
 
 constexpr std::array severities = {"info", "minor", "warning", "major", "critical"};
-constexpr std::size_t mostNames = 100;   ///< of one kind
+constexpr std::size_t mostNames = 100;   ///< names of one kind
 constexpr std::size_t longestText = 256; ///< bytes
 
 void limitNames(const std::vector<std::string>& names, const char* field) {

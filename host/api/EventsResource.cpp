@@ -24,7 +24,7 @@ namespace {
 
 TRC1_Anchor anchor{"EventsResource.cpp"};
 
-/// The largest id that the history can hold.
+/// The largest id that the history can store.
 constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max();
 constexpr std::uint64_t defaultEvents = 100;
 constexpr std::uint64_t mostEvents = 1000;
@@ -109,7 +109,7 @@ HttpAnswer EventsResource::events(const HttpRequest& request) {
     TraceScope trace(anchor);
     HistoryReader& history = EventQuery::history(m_history);
     EventFilter filter = filterOf(request);
-    const std::size_t limit = filter.limit++; // one more tells whether there are more
+    const std::size_t limit = filter.limit++; // one extra, to see whether there are more
     const EventPage page = EventQuery::reading([&] { return history.query(filter); });
     const HistoryState state = EventQuery::reading([&] { return history.state(); });
     const std::size_t count = std::min(limit, page.events.size());

@@ -9,11 +9,11 @@ namespace zrm::host {
 
 class HistoryReader;
 
-/// What the history holds: `GET /api/v1/events`, `GET /api/v1/events/{id}` and
-/// `GET /api/v1/rates`.
+/// The contents of the history: `GET /api/v1/events`, `GET /api/v1/events/{id}` and `GET
+/// /api/v1/rates`.
 class EventsResource : public Resource {
 public:
-    /// `history` outlives the object; null when the history is off.
+    /// `history` must outlive the object; null when the history is off.
     explicit EventsResource(HistoryReader* history) : m_history(history) {}
 
     void addRoutes(Router& router) override;

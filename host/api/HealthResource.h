@@ -9,10 +9,10 @@
 
 namespace zrm::host {
 
-/// `GET /healthz`: the process serves HTTP and monitors logs. Needs no token.
+/// `GET /healthz`: says whether the process serves HTTP and monitors logs. Needs no token.
 class HealthResource : public Resource {
 public:
-    /// `problem` gives what keeps the agent from monitoring; empty: nothing. Any thread.
+    /// `problem` returns what keeps the agent from monitoring, or an empty text. Any thread.
     explicit HealthResource(std::function<std::string()> problem = [] { return std::string(); })
         : m_problem(std::move(problem)) {}
 

@@ -43,7 +43,7 @@ std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
     return std::get<std::vector<Condition>>(std::move(conditions));
 }
 
-/// The log's ledger; null when a refresh has just ended its monitoring.
+/// The log's ledger; null when a refresh has just stopped its monitoring.
 std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::string& log,
                      bool withSamples) {
     for (const LogLedgerView& ledger : ledgers) {
@@ -54,7 +54,7 @@ std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::strin
     return "null";
 }
 
-/// Of the logs that are configured and not monitored, all or the one with this path.
+/// The configured but unmonitored logs: all, or the one with this path.
 std::vector<UnmonitoredLogs::Log> chosen(std::vector<UnmonitoredLogs::Log> logs,
                                          const std::optional<std::string>& log) {
     std::erase_if(logs, [&](const UnmonitoredLogs::Log& one) { return log && one.log != *log; });

@@ -9,10 +9,10 @@ namespace zrm::host {
 
 class LogWatch;
 
-/// `GET /api/v1/logs`: the monitored logs as they are now.
+/// `GET /api/v1/logs`: the current state of the monitored logs.
 class LogsResource : public Resource {
 public:
-    /// `watch` outlives the object.
+    /// `watch` must outlive the object.
     explicit LogsResource(const LogWatch& watch) : m_watch(watch) {}
 
     void addRoutes(Router& router) override;

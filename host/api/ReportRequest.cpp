@@ -15,7 +15,7 @@ namespace {
 
 constexpr std::size_t mostConditions = 100;
 
-/// Where a report ends that names no end: with the last time that a stamp can hold.
+/// The default end of a report: the last time that a stamp can express.
 constexpr const char* endOfTime = "1991231235959999";
 
 std::string readTime(JsonFields& fields, const char* key, std::optional<std::string> text) {

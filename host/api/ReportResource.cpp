@@ -36,7 +36,7 @@ void ReportResource::addRoutes(Router& router) {
 HttpAnswer ReportResource::report(const HttpRequest& request) {
     TraceScope trace(anchor);
     const ReportRequest wanted = ReportRequest::parse(request.body);
-    // Asked first: the agent takes a report on a log that it does not know for an error of its own.
+    // Checked first: the agent treats a report on an unknown log as an internal error.
     if (!m_source.isMonitored(wanted.conditions)) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }

@@ -8,10 +8,10 @@
 
 namespace zrm::host {
 
-/// `POST /api/v1/reports`: what a log holds between two times, where conditions hold.
+/// `POST /api/v1/reports`: the entries of a log between two times that meet conditions.
 class ReportResource : public Resource {
 public:
-    /// `source` outlives the object.
+    /// `source` must outlive the object.
     explicit ReportResource(SampleSource& source) : m_source(source) {}
 
     void addRoutes(Router& router) override;

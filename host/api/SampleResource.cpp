@@ -25,7 +25,7 @@ HttpAnswer SampleResource::sample(const HttpRequest& request) {
         throw RequestRefused(*problem);
     }
     const auto& wanted = std::get<std::vector<Condition>>(conditions);
-    // Asked first: the agent takes a report on a log that it does not know for an error of its own.
+    // Checked first: the agent treats a report on an unknown log as an internal error.
     if (table == "RMLOGENT" && !m_source.isMonitored(wanted)) {
         throw RequestRefused(404, "the agent does not monitor this log", "filters");
     }

@@ -13,7 +13,7 @@ namespace zrm::host {
 /// `POST /api/v1/tables/{table}/sample`: the rows of one sample of a table.
 class SampleResource : public Resource {
 public:
-    /// `source` outlives the object.
+    /// `source` must outlive the object.
     explicit SampleResource(SampleSource& source) : m_source(source) {}
 
     void addRoutes(Router& router) override;

@@ -51,7 +51,7 @@ HttpAnswer answerOf(const SituationSet::Change& change) {
     return HttpAnswer::json(SituationJson::text(status));
 }
 
-/// A name as one part of a path.
+/// A name as one path segment.
 std::string encoded(const std::string& name) {
     constexpr const char* digits = "0123456789ABCDEF";
     constexpr std::string_view unreserved =
@@ -156,7 +156,7 @@ HttpAnswer SituationsResource::validate(const HttpRequest& request) {
                 {{"field", problem.fieldText()}, {"detail", problem.what + "; " + problem.cure}});
         }
     } catch (const RequestRefused& refused) {
-        // A member of the wrong type keeps the others from being read.
+        // A member of the wrong type prevents the others from being read.
         problems.push_back(
             {{"field", refused.problem().field}, {"detail", refused.problem().detail}});
     }

@@ -8,10 +8,10 @@
 
 namespace zrm::host {
 
-/// `/api/v1/situations` and what lies under it: shows the situations and changes them.
+/// `/api/v1/situations` and the routes below it: shows and changes the situations.
 class SituationsResource : public Resource {
 public:
-    /// `situations` outlives the object.
+    /// `situations` must outlive the object.
     explicit SituationsResource(SituationSet& situations) : m_situations(situations) {}
 
     void addRoutes(Router& router) override;

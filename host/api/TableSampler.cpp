@@ -17,10 +17,10 @@ namespace {
 
 TRC1_Anchor anchor{"TableSampler.cpp"};
 
-constexpr int mostReports = 4; ///< at once: each may keep a disk and a processor busy
+constexpr int mostReports = 4; ///< concurrent reports: each may keep a disk and a processor busy
 std::counting_semaphore<mostReports> reportRoom{mostReports};
 
-/// One of the reports under way, while it lives.
+/// One running report while it exists.
 class Room {
 public:
     explicit Room(bool isReport) : m_isReport(isReport) {

@@ -5,7 +5,7 @@
 
 namespace zrm::host {
 
-/// Takes samples of the tables that the agent has registered.
+/// Takes samples of the agent's registered tables.
 class TableSampler : public SampleSource {
 public:
     Rows take(std::string_view table, const std::vector<Condition>& conditions) override;

@@ -7,11 +7,11 @@
 
 namespace zrm::host {
 
-/// Lengths of time as operators write them. Stateless.
+/// Durations as written by operators. Stateless.
 class DurationText {
 public:
-    /// The length of "60s", "5m", "1h" or "1d"; none for any other text, for none at all ("0s"),
-    /// and for one of more than 2147483647 seconds.
+    /// The duration of "60s", "5m", "1h" or "1d"; none for any other text, for zero ("0s"), and for
+    /// more than 2147483647 seconds.
     static std::optional<std::chrono::seconds> parse(std::string_view text);
 };
 

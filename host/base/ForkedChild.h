@@ -3,11 +3,11 @@
 
 namespace zrm::host {
 
-/// Tells a forked child, which must stay with async-signal-safe calls until its exec, from the
-/// process that the host was started as.
+/// Distinguishes a forked child, which may use only async-signal-safe calls until its exec, from
+/// the host's original process.
 namespace ForkedChild {
 
-/// True in a process forked from the one that asked first. Neither locks nor allocates.
+/// True in a process forked from the one that made the first call. Neither locks nor allocates.
 bool isCaller() noexcept;
 
 } // namespace ForkedChild

@@ -11,9 +11,9 @@ namespace zrm::host {
 /// Where the HTTP server listens.
 struct ListenAddress {
     std::string host;       ///< name or number, without brackets
-    std::uint16_t port = 0; ///< 0: a free one
+    std::uint16_t port = 0; ///< 0: any free port
 
-    /// Reads "HOST:PORT" or "[IPV6]:PORT"; none for any other text.
+    /// Parses "HOST:PORT" or "[IPV6]:PORT"; none for any other text.
     static std::optional<ListenAddress> parse(std::string_view text);
 
     /// True when only this machine can reach the address.

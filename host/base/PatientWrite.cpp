@@ -22,16 +22,16 @@ constexpr int patience = 1000; // milliseconds
 constexpr std::size_t pipeRoom = 4096;
 constexpr std::size_t terminalRoom = 256;
 
-/// Whether a reader has been found not to read, and what it has lost since. One for both outputs,
-/// of which a process has one at a time.
+/// Whether the reader has been found not to read, and how much it has lost since. Shared by both
+/// outputs, since a process uses only one at a time.
 std::atomic<bool> isStuck{false};
 std::atomic<std::uint64_t> lost{0};
-std::atomic_flag isWriting; ///< held for the moment of a look and a write
+std::atomic_flag isWriting; ///< held briefly for a check and a write
 
 enum class Kind { WAITING, PIPE, TERMINAL, SOCKET };
 
-/// How standard error can be written without waiting. It may be exchanged while the process runs,
-/// so it is looked at anew each time, which costs little beside the write.
+/// How standard error can be written without blocking. It may be replaced while the process runs,
+/// so it is checked each time, which costs little compared to the write.
 Kind kindOf(int fd) noexcept {
     struct stat status {};
     if (fstat(fd, &status) != 0) {
@@ -48,10 +48,10 @@ bool isWritable(int fd, int limit) noexcept {
     return poll(&entry, 1, limit) > 0;
 }
 
-/// What a pipe or a terminal that is writable takes without waiting, as long as nobody else writes
-/// between the look and the write: of the threads of this process, none does.
+/// Writes what a writable pipe or terminal takes without blocking, as long as nobody else writes
+/// between the check and the write; other threads of this process do not.
 ssize_t writeAtOnce(int fd, std::string_view part) noexcept {
-    const bool isAlone = ForkedChild::isCaller(); // the parent's other threads are not here
+    const bool isAlone = ForkedChild::isCaller(); // the parent's other threads do not exist here
     while (!isAlone && isWriting.test_and_set(std::memory_order_acquire)) {
         sched_yield();
     }
@@ -67,7 +67,7 @@ ssize_t writeAtOnce(int fd, std::string_view part) noexcept {
     return written;
 }
 
-/// One attempt; -1 with EAGAIN when the other end takes nothing now.
+/// One attempt; -1 with EAGAIN when the reader takes nothing now.
 ssize_t attempt(int fd, Kind kind, std::string_view part) noexcept {
     if (kind == Kind::SOCKET) {
         return send(fd, part.data(), part.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
@@ -92,7 +92,7 @@ bool writeAll(int fd, Kind kind, std::string_view record) noexcept {
                 return false;
             }
         } else if (errno != EINTR) {
-            return true; // nobody is left to say it to
+            return true; // there is nobody left to report it to
         }
     }
     return true;

@@ -5,17 +5,17 @@
 
 namespace zrm::host {
 
-/// Writes of records to a descriptor at whose other end somebody may not read. Any thread; neither
-/// locks nor allocates.
+/// Writes records to a descriptor whose reader may not be reading. Any thread; neither locks nor
+/// allocates.
 namespace PatientWrite {
 
-/// Writes a record, in one write when the system takes it whole. A reader that is slow is waited
-/// for, for a second at most; from then on what it does not take at once is lost, until it reads
-/// again and gets a line that says how much. The descriptor's own mode is not changed, which
-/// other processes may share.
+/// Writes a record, in a single write when the system takes all of it. Waits for a slow reader for
+/// at most one second; after that, what the reader does not take at once is lost until it reads
+/// again and gets a line saying how much was lost. Leaves the descriptor's mode unchanged, since
+/// other processes may share it.
 void toStandardError(std::string_view record) noexcept;
 
-/// The same for a file that this process has opened without waiting (O_NONBLOCK).
+/// The same for a file that this process has opened with O_NONBLOCK.
 void toFile(int fd, std::string_view record) noexcept;
 
 } // namespace PatientWrite

@@ -6,9 +6,9 @@
 
 namespace zrm::host {
 
-/// The pauses between tries at something that fails: each twice as long as the one before, up to a
-/// longest, and each cut by a random part, at most a quarter. Many agents whose receiver was down
-/// for all of them would otherwise come back to it at the same moments. One thread's.
+/// Pauses between retries: each twice as long as the one before, up to a maximum, and shortened by
+/// a random part of at most a quarter. Otherwise many agents whose receiver was down would all
+/// return to it at the same moments. Used by one thread.
 class RetryPause {
 public:
     using Duration = std::chrono::milliseconds;
@@ -18,13 +18,13 @@ public:
     /// The length of the next pause.
     Duration next();
 
-    /// The next pause is the first again.
+    /// Starts over with the first pause.
     void reset() noexcept { m_whole = m_first; }
 
 private:
     const Duration m_first;
     const Duration m_longest;
-    Duration m_whole; ///< of the next pause, uncut
+    Duration m_whole; ///< of the next pause, not shortened
     std::minstd_rand m_random;
 };
 

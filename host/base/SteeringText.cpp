@@ -12,7 +12,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Whether a character that steers may begin with the byte; C0 controls are escaped in every JSON.
+/// Whether a steering character may begin with the byte; C0 controls are always escaped in JSON.
 bool mayBegin(char c) {
     return c == 0x7f || c == '\xc2' || c == '\xd8' || c == '\xe2';
 }
@@ -54,7 +54,7 @@ std::size_t SteeringText::copyVisible(std::string_view text, char* out, std::siz
         const Utf8::Sequence sequence = Utf8::firstSequence(text);
         const std::string_view bytes = text.substr(0, sequence.length);
         text.remove_prefix(sequence.length);
-        // A byte that belongs to no character may be a control in the terminal's own code page.
+        // A byte outside any character may be a control in the terminal's code page.
         const char32_t character =
             sequence.valid ? Utf8::character(bytes) : static_cast<unsigned char>(bytes.front());
         if (character == '\n' || character == '\t' || !Utf8::isSteering(character)) {

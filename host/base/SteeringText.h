@@ -7,14 +7,14 @@
 
 namespace zrm::host {
 
-/// Characters that steer how text is shown (Utf8::isSteering), made visible. Any thread.
+/// Makes characters that control how text is shown (Utf8::isSteering) visible. Any thread.
 namespace SteeringText {
 
-/// Appends a character by its number: \u202e.
+/// Appends a character as an escape: \u202e.
 void appendEscape(std::string& text, char32_t character);
 
-/// A JSON document, in valid UTF-8, with all such characters of its strings escaped; line ends
-/// between its values stay.
+/// A JSON document in valid UTF-8 with all such characters in its strings escaped; line ends
+/// between values stay.
 std::string escapedInJson(std::string document);
 
 /// Copies a text with escapes in the place of what steers a terminal, line ends and tabs excepted,

@@ -16,7 +16,7 @@ bool isDigit(char c) {
     return c >= '0' && c <= '9';
 }
 
-/// Takes exactly `digits` digits from the text's front.
+/// Removes exactly `digits` digits from the beginning of the text.
 bool takeNumber(std::string_view& text, std::size_t digits, int& number) {
     if (text.size() < digits) {
         return false;
@@ -142,7 +142,7 @@ std::time_t localSecondsOf(const Moment& at) {
     return std::mktime(&local);
 }
 
-/// The milliseconds that a fraction of the second stands for; 0 without one.
+/// The fraction of the second in milliseconds; 0 without one.
 int fractionOf(std::string_view text) {
     const std::size_t point = text.find('.');
     int milliseconds = 0;
@@ -153,7 +153,7 @@ int fractionOf(std::string_view text) {
     return milliseconds;
 }
 
-/// A time in ISO 8601 with the seconds of its zone east of UTC, where it has one.
+/// An ISO 8601 time with its zone, if any, in seconds east of UTC.
 struct Iso {
     Moment at;
     std::optional<long> east = std::nullopt;

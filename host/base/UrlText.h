@@ -8,15 +8,15 @@
 
 namespace zrm::host {
 
-/// Reads the texts of a URL strictly. Stateless.
+/// Decodes parts of a URL strictly. Stateless.
 class UrlText {
 public:
-    /// The text behind percent-encoding; none when an encoding is broken, or when what comes out
-    /// is no UTF-8 or has a NUL character.
+    /// Decodes percent-encoding; none when an encoding is invalid, or when the result is not UTF-8
+    /// or contains a NUL character.
     static std::optional<std::string> decode(std::string_view encoded);
 
-    /// Names and values of a query, in which '+' stands for a blank; none when one of them cannot
-    /// be decoded.
+    /// Names and values of a query, where '+' means a blank; none when one of them cannot be
+    /// decoded.
     static std::optional<std::multimap<std::string, std::string>> query(std::string_view encoded);
 };
 

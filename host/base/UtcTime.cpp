@@ -27,7 +27,7 @@ void UtcTime::append(std::string& text, std::int64_t milliseconds) {
         appendUnusual(text, utc, millisecond);
         return;
     }
-    char stamp[] = "0000-00-00T00:00:00.000Z"; // one for each event: without a format string
+    char stamp[] = "0000-00-00T00:00:00.000Z"; // called for every event, so without a format string
     const auto put = [&stamp](std::size_t end, int number) {
         for (; number > 0; number /= 10) {
             stamp[--end] = static_cast<char>('0' + number % 10);

@@ -6,14 +6,14 @@
 
 namespace zrm::host {
 
-/// Times of the host as other systems read them. Stateless.
+/// The host's times in the form that other systems read. Stateless.
 class UtcTime {
 public:
-    /// Appends a time that is given in milliseconds since 1970-01-01 UTC, as in
+    /// Appends a time in milliseconds since 1970-01-01 UTC, formatted as
     /// "2026-11-20T07:03:09.412Z".
     static void append(std::string& text, std::int64_t milliseconds);
 
-    /// The same as a text of its own.
+    /// The same as a new text.
     static std::string text(std::int64_t milliseconds);
 };
 

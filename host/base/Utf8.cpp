@@ -9,8 +9,8 @@ namespace {
 
 constexpr std::uint64_t highBits = 0x8080808080808080;
 
-/// The form of the characters that begin with one of these bytes: the range of the second byte
-/// keeps out over-long forms, surrogates and what lies beyond the last character.
+/// The form of characters that begin with one of these bytes: the range of the second byte excludes
+/// overlong forms, surrogates and values beyond the last character.
 struct Form {
     unsigned char first;
     unsigned char last;
@@ -51,7 +51,7 @@ bool Utf8::isAscii(std::string_view text) noexcept {
         seen |= wordAt(position);
     }
     if (text.size() >= sizeof seen) {
-        seen |= wordAt(end - sizeof seen); // what is left, and some bytes again
+        seen |= wordAt(end - sizeof seen); // the rest, including some bytes again
     } else {
         for (; position != end; ++position) {
             seen |= static_cast<unsigned char>(*position);
@@ -143,7 +143,7 @@ std::string_view Utf8::prefix(std::string_view text, std::size_t size) noexcept 
     if (size >= text.size()) {
         return text;
     }
-    // A character has at most three bytes behind its first; more of them are no character's.
+    // A character has at most three bytes after its first; more do not belong to any character.
     for (std::size_t back = 0; back < 4 && back < size + 1; ++back) {
         if (!isContinuation(static_cast<unsigned char>(text[size - back]))) {
             return text.substr(0, size - back);

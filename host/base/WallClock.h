@@ -6,7 +6,7 @@
 
 namespace zrm::host {
 
-/// The time of day in the form in which the host stores it.
+/// The wall-clock time in the form in which the host stores it.
 namespace WallClock {
 
 /// Milliseconds since 1970-01-01, UTC.

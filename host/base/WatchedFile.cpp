@@ -22,7 +22,7 @@ bool WatchedFile::hasChanged() {
     const std::optional<Version> now = look();
     const bool isStill = now == m_seen;
     m_seen = now;
-    // A file that is missing for a moment is about to be replaced.
+    // A briefly missing file is about to be replaced.
     if (!now || !isStill || now == m_known) {
         return false;
     }

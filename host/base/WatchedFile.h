@@ -9,16 +9,16 @@
 
 namespace zrm::host {
 
-/// Notices that a file was written or replaced. Used by one thread.
+/// Detects that a file was written or replaced. Used by one thread.
 class WatchedFile {
 public:
-    /// Remembers the file as it is now. An empty path: no file, which never changes.
+    /// Remembers the file's current state. An empty path means no file, which never changes.
     explicit WatchedFile(std::string path);
 
     const std::string& path() const noexcept { return m_path; }
 
-    /// True once after a change, when the file has stayed as it is since the last call: a file that
-    /// is being written is left alone until the writer is done.
+    /// True once after a change, when the file has not changed since the previous call: a file that
+    /// is still being written is left alone until the writer has finished.
     bool hasChanged();
 
 private:
@@ -34,7 +34,7 @@ private:
 
     std::string m_path;
     std::optional<Version> m_known; ///< none: the file was not there
-    std::optional<Version> m_seen;  ///< at the last look
+    std::optional<Version> m_seen;  ///< at the last check
 };
 
 } // namespace zrm::host

@@ -31,7 +31,7 @@ std::string trimmed(std::string text) {
     return text;
 }
 
-/// The agent's configuration, read when it is needed first.
+/// The agent's configuration, read on first use.
 class AgentConfig {
 public:
     explicit AgentConfig(const std::string& path) : m_path(path.empty() ? defaultConfig : path) {}
@@ -72,7 +72,7 @@ private:
     std::optional<HostConfig> m_config;
 };
 
-/// The address to which a client of this machine connects.
+/// The address that a client on this machine connects to.
 std::string urlOf(AgentConfig& config) {
     const std::optional<ListenAddress>& listen = config.get().http.listen;
     if (!listen) {
@@ -88,14 +88,14 @@ std::string urlOf(AgentConfig& config) {
                 " leaves the port open: give the address that the agent reported with --url");
     }
     ListenAddress reached = *listen;
-    if (reached.host == "0.0.0.0") { // every address, this machine's own among them
+    if (reached.host == "0.0.0.0") { // all addresses, including the loopback address
         reached.host = "127.0.0.1";
     }
     const bool isSecret = !config.get().http.certificate.empty();
     return (isSecret ? "https://" : "http://") + reached.text();
 }
 
-/// A URL that was written by hand, checked: the token goes in the clear to this machine alone.
+/// Checks a URL given by the operator: the token is sent unencrypted only to this machine.
 std::string checkedUrl(const std::string& written, const std::string& source) {
     std::string url = written;
     while (url.ends_with('/')) {

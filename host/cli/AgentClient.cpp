@@ -22,9 +22,9 @@ using namespace std::chrono_literals;
 using Json = AgentClient::Json;
 using Outcome = HttpClientAnswer::Outcome;
 
-/// A report waits for a refresh, and reads a log that may be large.
+/// A report may wait for a refresh and read a large log.
 constexpr HttpLimits answerLimits{.connect = 5s, .head = 120s, .whole = 900s, .silence = 120s};
-/// Three keep-alive comments are missing.
+/// The silence limit equals three missing keep-alive comments.
 constexpr HttpLimits streamLimits{.connect = 5s, .head = 45s, .whole = 0s, .silence = 45s};
 
 constexpr std::size_t longestAnswer = 256 * 1024 * 1024; ///< bytes
@@ -53,7 +53,7 @@ HttpUrl serverOf(const AgentAccess& access) {
     return *url;
 }
 
-/// The agent's own certificate may be signed by itself, or by an authority of its owner's.
+/// The agent's certificate may be self-signed, or signed by a private authority.
 std::string authoritiesOf(const AgentAccess& access) {
     std::string all;
     for (const std::string& file : access.authorities) {

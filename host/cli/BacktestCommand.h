@@ -7,7 +7,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl backtest SITUATION`: how often a situation would have been raised, and when.
+/// `zrmctl backtest SITUATION`: how often and when a situation would have been raised.
 class BacktestCommand : public Command {
 public:
     explicit BacktestCommand(CLI::App& program);

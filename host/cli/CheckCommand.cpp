@@ -25,7 +25,7 @@ constexpr std::size_t numberColumns = 5;
 constexpr std::size_t verdictColumns = 8;
 constexpr std::size_t indent = numberColumns + 2 + verdictColumns + 2;
 
-/// A line that counts, with its number, verdict and reason.
+/// A relevant line with its number, verdict and reason.
 std::string textOf(const ConfigCheck::Line& line, const Terminal& terminal) {
     const bool isRefused = line.verdict == ConfigCheck::Verdict::REFUSED;
     const std::string number = std::to_string(line.number);

@@ -7,8 +7,8 @@
 
 namespace zrm::host {
 
-/// `zrmctl check CONFIG`, `zrmctl check --host FILE`: judges a configuration of logs, or the
-/// agent's own configuration, as the agent would. Needs no agent.
+/// `zrmctl check CONFIG`, `zrmctl check --host FILE`: checks a log configuration, or the agent's
+/// own configuration, as the agent would. Needs no agent.
 class CheckCommand : public Command {
 public:
     explicit CheckCommand(CLI::App& program);

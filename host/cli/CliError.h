@@ -9,13 +9,13 @@ namespace zrm::host {
 /// The exit statuses of zrmctl.
 enum CliStatus {
     CLI_DONE = 0,
-    CLI_REFUSED = 1,     ///< refused by the agent or by a check, nothing found, or something wrong
-    CLI_USAGE = 2,       ///< the command line or the configuration cannot be used
-    CLI_UNREACHABLE = 3, ///< no agent answers
+    CLI_REFUSED = 1, ///< refused by the agent or by a check, nothing found, or a problem reported
+    CLI_USAGE = 2,   ///< the command line or the configuration is invalid
+    CLI_UNREACHABLE = 3, ///< the agent does not answer
     CLI_FORBIDDEN = 4,   ///< the token cannot be read, or the agent does not accept it
 };
 
-/// Why a command ends, in words for the operator, and the status with which it does.
+/// Why a command failed, as a message for the operator, and its exit status.
 class CliError : public std::runtime_error {
 public:
     CliError(CliStatus status, const std::string& text)

@@ -14,10 +14,10 @@ class Command {
 public:
     virtual ~Command() = default;
 
-    /// True when the command line, once it is read, names this command.
+    /// Whether the parsed command line names this command.
     virtual bool isChosen() const = 0;
 
-    /// Does it. Returns a CliStatus, or throws CliError.
+    /// Runs the command. Returns a CliStatus, or throws CliError.
     virtual int run(Context& context) = 0;
 };
 

@@ -18,7 +18,7 @@ struct Range {
     char32_t last;
 };
 
-/// Characters without a width, behind which other text could hide.
+/// Zero-width characters, which could hide other text.
 constexpr std::array<Range, 4> invisible = {
     {{0x200b, 0x200f}, {0x2060, 0x2065}, {0x206a, 0x206f}, {0xfeff, 0xfeff}}};
 
@@ -45,8 +45,8 @@ std::string escaped(char32_t character) {
     }
 }
 
-/// The widths of characters are those of the C library's UTF-8 locale, whatever the operator's
-/// locale is, on this thread as long as the object lives.
+/// While it exists, this thread uses the C library's UTF-8 locale for character widths, whatever
+/// the operator's locale is.
 class Utf8Locale {
 public:
     Utf8Locale() : m_before(uselocale(utf8())) {}
@@ -68,7 +68,7 @@ std::size_t columnsOf(std::string_view sequence) {
         return 1;
     }
     const int columns = wcwidth(static_cast<wchar_t>(character));
-    return columns < 0 ? 1 : static_cast<std::size_t>(columns); // not assigned: a box, in truth
+    return columns < 0 ? 1 : static_cast<std::size_t>(columns); // unassigned: shown as a box
 }
 
 } // namespace

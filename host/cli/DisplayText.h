@@ -7,23 +7,23 @@
 
 namespace zrm::host {
 
-/// Texts of logs made fit for a terminal. Any thread.
+/// Makes texts from logs safe to show on a terminal. Any thread.
 namespace DisplayText {
 
-/// The text with everything that could steer a terminal or hide other text written as an escape
-/// (\n, \t, \x1b, \u202e), and with the replacement character for what is no UTF-8.
+/// The text with everything that could control a terminal or hide other text escaped (\n, \t, \x1b,
+/// \u202e) and invalid UTF-8 replaced by the replacement character.
 std::string visible(std::string_view text);
 
-/// The columns that a visible text takes on a terminal.
+/// The number of terminal columns that a visible text takes.
 std::size_t width(std::string_view visible);
 
-/// The beginning of a visible text that takes at most so many columns; no character is cut.
+/// The longest prefix of a visible text that fits `columns`; characters are not split.
 std::string_view beginning(std::string_view visible, std::size_t columns);
 
-/// A visible text in at most so many columns; one that is longer ends with the ellipsis.
+/// A visible text shortened to at most `columns`; a longer one ends with the ellipsis.
 std::string shortened(std::string_view visible, std::size_t columns, std::string_view ellipsis);
 
-/// The same, but a text that is longer begins with the ellipsis and keeps its end.
+/// The same, but a longer text keeps its end and begins with the ellipsis.
 std::string shortenedPath(std::string_view visible, std::size_t columns, std::string_view ellipsis);
 
 } // namespace DisplayText

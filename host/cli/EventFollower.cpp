@@ -32,7 +32,7 @@ void EventFollower::follow(std::uint64_t after, const Receiver& receiver) {
     try {
         while (!m_signals.isStopped()) {
             pause = connect(receiver) ? shortestPause : std::min(2 * pause, longestPause);
-            // The signal may have come when there was no connection to end.
+            // The signal may have come while there was no connection.
             if (m_signals.isStopped() || m_signals.wait(pause)) {
                 break;
             }

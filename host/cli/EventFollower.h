@@ -12,20 +12,20 @@
 
 namespace zrm::host {
 
-/// Follows the agent's live stream of events until it is stopped: each event behind the given one
-/// once and in order, also when the connection is lost on the way.
+/// Follows the agent's live event stream until stopped. Delivers each event after the given one
+/// once and in order, even when the connection is lost in between.
 class EventFollower {
 public:
     using Json = AgentClient::Json;
     using Receiver = std::function<void(const Json& event)>;
-    /// Tells the operator of a lost and of a new connection.
+    /// Informs the operator that the connection was lost or restored.
     using Note = std::function<void(const std::string& text)>;
 
-    /// All of them outlive the object. `filters` are those of the route.
+    /// All references must outlive the object. `filters` are the query parameters of the route.
     EventFollower(AgentClient& client, AgentClient::Query filters, StopSignals& signals, Note note);
 
-    /// Follows, beginning behind the event of this id. Returns after a signal; throws CliError
-    /// when the agent refuses.
+    /// Follows the events after this id. Returns after a signal; throws CliError when the agent
+    /// refuses.
     void follow(std::uint64_t after, const Receiver& receiver);
 
 private:
@@ -36,8 +36,8 @@ private:
     const AgentClient::Query m_filters;
     StopSignals& m_signals;
     const Note m_note;
-    std::uint64_t m_last = 0; ///< the latest event that was handed over
-    bool m_isLost = false;    ///< and the operator knows
+    std::uint64_t m_last = 0; ///< id of the latest event passed on
+    bool m_isLost = false;    ///< and the operator has been informed
 };
 
 } // namespace zrm::host

@@ -9,7 +9,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl events [-f]`: what was raised, and what is.
+/// `zrmctl events [-f]`: past events, and new ones as they are raised.
 class EventsCommand : public Command {
 public:
     explicit EventsCommand(CLI::App& program);

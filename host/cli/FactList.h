@@ -9,13 +9,13 @@
 
 namespace zrm::host {
 
-/// Names and what they are, one below the other.
+/// A list of names and values, one per line.
 class FactList {
 public:
-    /// Adds a fact; one whose value is empty is left out.
+    /// Adds a fact; a fact with an empty value is left out.
     void add(std::string name, const std::string& value, Colour colour = Colour::NONE);
 
-    /// The lines; values are whole, whatever the terminal's width.
+    /// The lines; values are never shortened to the terminal's width.
     std::string text(const Terminal& terminal) const;
 
 private:

@@ -9,7 +9,7 @@
 
 namespace zrm::host {
 
-/// A file that a command line names; "-" is standard input. One thread.
+/// A file named on the command line; "-" is standard input. Used by one thread.
 class InputFile {
 public:
     /// Throws CliError when the file cannot be opened.
@@ -19,7 +19,7 @@ public:
     /// mostLine bytes each such part is a line. Throws CliError when the file cannot be read.
     std::optional<std::string> line();
 
-    /// What is left. Throws CliError when that is more than mostText bytes, or cannot be read.
+    /// The rest of the file. Throws CliError when it exceeds mostText bytes or cannot be read.
     std::string text();
 
     static constexpr std::size_t mostLine = 65536;

@@ -124,7 +124,7 @@ void noteConfiguration(const Json& answer) {
     }
 }
 
-/// Whether the agent reads the log, and the log has a file and no warning.
+/// Whether the agent reads the log, and the log has a file and no warnings.
 bool isMonitored(const Json& log) {
     const Json& ledger = JsonText::member(log, "ledger");
     if (ledger.is_object() && !JsonText::member(ledger, "warnings").empty()) {
@@ -136,7 +136,7 @@ bool isMonitored(const Json& log) {
            size.get<std::int64_t>() >= 0;
 }
 
-/// Whether a configured log is not monitored, for whatever reason, or there is none.
+/// Whether any configured log is not monitored, or no log is configured.
 bool isSomethingWrong(const Json& answer) {
     const Json& logs = JsonText::member(answer, "logs");
     const Json& configuration = JsonText::member(answer, "configuration");

@@ -7,7 +7,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl logs [LOG]`: the monitored logs, or everything about one.
+/// `zrmctl logs [LOG]`: lists the monitored logs, or shows one in detail.
 class LogsCommand : public Command {
 public:
     explicit LogsCommand(CLI::App& program);

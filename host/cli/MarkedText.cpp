@@ -8,7 +8,7 @@ namespace zrm::host {
 
 namespace {
 
-constexpr std::size_t narrowest = 10; ///< columns of the text that are shown at least
+constexpr std::size_t narrowest = 10; ///< the fewest columns of the text that are shown
 
 } // namespace
 

@@ -9,12 +9,12 @@
 
 namespace zrm::host {
 
-/// A text with a caret under one of its places. Stateless.
+/// A text with a caret under one position. Stateless.
 class MarkedText {
 public:
-    /// Two lines, each with its end: the text, shown visibly, and the caret under the byte `at`
-    /// (behind the text when it is its size), both behind `indent` columns. On a terminal that is
-    /// too narrow, the part of the text around the place.
+    /// Two lines, each with its line end: the text in visible form, and the caret under byte `at`
+    /// (after the text when `at` is its size), both indented by `indent` columns. On a narrow
+    /// terminal, only the part of the text around the position.
     static std::string of(std::string_view text, std::size_t at, std::size_t indent,
                           const Terminal& terminal);
 };

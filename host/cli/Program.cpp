@@ -24,7 +24,7 @@ namespace zrm::host {
 
 namespace {
 
-/// What is wrong with a command line, with the word that stands where a command should.
+/// What is wrong with a command line, including the word in place of a command.
 std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
     if (!app.get_subcommands().empty()) {
         return error.what();
@@ -33,7 +33,7 @@ std::string problemOf(const CLI::App& app, const CLI::ParseError& error) {
     return rest.empty() ? "name a command" : '\'' + rest.front() + "' is not a command";
 }
 
-/// Where the operator finds what the command takes.
+/// Where the operator finds the usage of the command.
 std::string hintOf(const CLI::App& app) {
     std::string command = "zrmctl";
     for (const CLI::App* at = &app; !at->get_subcommands().empty();) {
@@ -65,7 +65,7 @@ Program::Program()
                      "Certificates to trust besides the system's (default: ZRM_CA_FILE)")
         ->type_name("FILE");
     m_app->add_flag("--json", m_options.json, "Print JSON");
-    m_app->fallthrough(); // these options may also stand behind the command
+    m_app->fallthrough(); // these options may also follow the command
     m_app->require_subcommand(1);
     m_app->footer("Exit status: 0 done, 1 refused or nothing found, 2 unusable command line or\n"
                   "configuration, 3 no agent answered, 4 no permission.");

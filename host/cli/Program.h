@@ -9,7 +9,7 @@
 
 namespace zrm::host {
 
-/// zrmctl: its commands, and the way from a command line to one of them.
+/// zrmctl: its commands, and how a command line selects one.
 class Program {
 public:
     Program();
@@ -17,7 +17,7 @@ public:
     Program(const Program&) = delete;
     Program& operator=(const Program&) = delete;
 
-    /// Reads the command line and does what it says; gives the exit status.
+    /// Parses the command line and runs the command. Returns the exit status.
     int run(int argc, const char* const* argv);
 
 private:

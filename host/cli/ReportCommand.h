@@ -8,7 +8,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl report LOG`: what a log held between two times.
+/// `zrmctl report LOG`: the entries of a log between two times.
 class ReportCommand : public Command {
 public:
     explicit ReportCommand(CLI::App& program);

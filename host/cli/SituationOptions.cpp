@@ -28,7 +28,7 @@ Json fileContent(const std::string& path) {
     return value;
 }
 
-/// Takes out what the agent tells of a situation beside its definition, and what is null.
+/// Removes what the agent reports about a situation besides its definition, and null members.
 Json withoutState(Json definition) {
     for (const char* const key : {"source", "state", "problem", "counts", "last_raised"}) {
         definition.erase(key);
@@ -48,7 +48,7 @@ Json SituationOptions::subject(const std::string& name, const std::string& file)
     if (file.empty()) {
         return {{"situation", name}};
     }
-    // Before the list begins: what throws within one is not always cleared away.
+    // Before the list begins: an exception inside one may leak memory.
     Json definition = withoutState(fileContent(file));
     return {{"definition", std::move(definition)}};
 }

@@ -13,27 +13,27 @@ class Option;
 
 namespace zrm::host {
 
-/// The options in which a command line describes a situation.
+/// The command-line options that describe a situation.
 class SituationOptions {
 public:
     using Json = nlohmann::ordered_json;
 
-    /// Declares them for a command. The object outlives the reading of the command line.
+    /// Adds the options to a command. The object must outlive the parsing of the command line.
     void addTo(CLI::App& command);
 
-    /// The definition: that of --file, or `base`, with the members that options name and without
-    /// those that they name with an empty value. Throws CliError when the file cannot be used.
+    /// The definition from --file, or else `base`, with the members set by options; an option with
+    /// an empty value removes its member. Throws CliError when the file cannot be used.
     Json definition(const Json& base) const;
 
-    /// What a request names: a situation by its name, or the definition of a file. Throws CliError
-    /// unless exactly one of them is given.
+    /// The subject of a request: a situation by name, or a definition from a file. Throws CliError
+    /// unless exactly one of the two is given.
     static Json subject(const std::string& name, const std::string& file);
 
     /// True when any option was given.
     bool areGiven() const;
 
 private:
-    /// A member of a definition, and the option of one command that gives it.
+    /// A member of a definition and the option that sets it.
     struct Member {
         const char* key;
         const CLI::Option* option;

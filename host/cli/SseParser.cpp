@@ -41,7 +41,7 @@ void SseParser::line(std::string_view line) {
     }
     constexpr std::string_view field = "data:";
     if (!line.starts_with(field)) {
-        return; // a comment, or what the data itself tells, too
+        return; // a comment, or a field that repeats what the data says
     }
     line.remove_prefix(line.starts_with("data: ") ? field.size() + 1 : field.size());
     m_data += m_hasData ? "\n" : "";

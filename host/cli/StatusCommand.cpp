@@ -42,7 +42,7 @@ std::string queueText(const Json& queue) {
                 : "");
 }
 
-/// Whether the history or a sink does not work; says which on standard error.
+/// Whether the history or a sink is failing; says which on standard error.
 bool isSomethingWrong(const Json& status) {
     bool isWrong = false;
     const std::string problem = JsonText::text(JsonText::member(status, "history"), "problem");

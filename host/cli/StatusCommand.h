@@ -5,7 +5,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl status`: how the agent itself fares.
+/// `zrmctl status`: the state of the agent itself.
 class StatusCommand : public Command {
 public:
     explicit StatusCommand(CLI::App& program);

@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// Ctrl-C (and SIGTERM) as a wish instead of a sudden end, as long as the object lives. Made
-/// before other threads are, so that they block the signals, too.
+/// While the object exists, Ctrl-C and SIGTERM request a stop instead of killing the process.
+/// Create it before any other thread, so that all threads block the signals.
 class StopSignals {
 public:
     StopSignals();
@@ -23,11 +23,11 @@ public:
 
     bool isStopped() const noexcept { return m_isStopped; }
 
-    /// Waits until the time is over or a signal has come; true when one has.
+    /// Waits for a signal or the timeout; true after a signal.
     bool wait(std::chrono::milliseconds time);
 
-    /// What is done, on a thread of the object, when a signal comes; done at once when one has
-    /// come already. An empty function: nothing any more; it does not run after this returns.
+    /// Sets what to run, on a thread of the object, when a signal comes; runs at once if one has
+    /// already come. An empty function removes the action, which does not run after this returns.
     void onStop(std::function<void()> action);
 
 private:

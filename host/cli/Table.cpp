@@ -11,7 +11,7 @@ namespace zrm::host {
 namespace {
 
 constexpr std::size_t gap = 2;        ///< blanks between columns
-constexpr std::size_t narrowest = 10; ///< a column that shrinks keeps so much
+constexpr std::size_t narrowest = 10; ///< the least width of a column that shrinks
 
 } // namespace
 
@@ -58,7 +58,7 @@ std::string Table::line(const std::vector<Cell>& row, const std::vector<std::siz
     const std::size_t edge =
         terminal.width > 0 ? terminal.width : std::numeric_limits<std::size_t>::max();
     std::string result;
-    std::size_t written = 0; // columns, without blanks at the end
+    std::size_t written = 0; // columns, without trailing blanks
     std::size_t begin = 0;   // of the cell
     for (std::size_t at = 0; at < row.size() && begin < edge; ++at) {
         const std::size_t width = std::min(widths[at], edge - begin);

@@ -10,15 +10,15 @@
 
 namespace zrm::host {
 
-/// Rows of text under headings, made to fit a terminal: columns that may shrink are shortened,
-/// the widest first; what still does not fit is cut at the edge.
+/// Rows of text under headings, fitted to a terminal: columns that may shrink are shortened, the
+/// widest first, and what still does not fit is cut off at the edge.
 class Table {
 public:
     enum class Kind {
         FIXED,  ///< keeps its width as long as it can
-        NUMBER, ///< the same, and stands at the right
+        NUMBER, ///< the same, right-aligned
         TEXT,   ///< shrinks
-        PATH,   ///< shrinks at its beginning: the names of files differ at their ends
+        PATH,   ///< shrinks at its beginning, since file names differ at the end
     };
     using enum Kind;
     struct Column {
@@ -26,10 +26,10 @@ public:
         Kind kind = TEXT;
     };
     struct Cell {
-        // A text alone is a cell. NOLINTNEXTLINE(google-explicit-constructor)
+        // A plain text is a cell. NOLINTNEXTLINE(google-explicit-constructor)
         Cell(std::string cellText, Colour cellColour = Colour::NONE)
             : text(std::move(cellText)), colour(cellColour) {}
-        std::string text; ///< as it came; shown visibly
+        std::string text; ///< as received; shown in visible form
         Colour colour;
     };
 
@@ -40,7 +40,7 @@ public:
     bool empty() const noexcept { return m_rows.empty(); }
     std::size_t size() const noexcept { return m_rows.size(); }
 
-    /// The headings and the rows, each line with its end.
+    /// The headings and the rows, each with its line end.
     std::string text(const Terminal& terminal) const;
 
 private:

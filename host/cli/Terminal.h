@@ -7,23 +7,23 @@
 
 namespace zrm::host {
 
-/// Colours by what they mean.
+/// Colours by meaning.
 enum class Colour { NONE, GOOD, NOTICE, BAD, FAINT, HEADING };
 
-/// What standard output is able to show.
+/// What standard output can show.
 struct Terminal {
     bool isTerminal = false;
     std::size_t width = 0; ///< columns; 0: no limit
     bool hasColours = false;
-    bool isUtf8 = true; ///< otherwise only the marks that zrmctl adds keep to ASCII
+    bool isUtf8 = true; ///< when false, the marks that zrmctl adds (and only those) are ASCII
 
-    /// Standard output as it is. The width comes from COLUMNS or the terminal; NO_COLOR and
-    /// TERM=dumb switch colours off. Outside a terminal lines have any width and no colours.
+    /// The current standard output. The width comes from COLUMNS or the terminal; NO_COLOR and
+    /// TERM=dumb switch colours off. Without a terminal there is no width limit and no colour.
     static Terminal ofStandardOutput();
 
-    /// The text in a colour, where there are colours.
+    /// The text in a colour, if colours are on.
     std::string coloured(std::string_view text, Colour colour) const;
-    /// What stands for the rest of a text that is cut.
+    /// The mark that replaces the rest of a shortened text.
     std::string_view ellipsis() const noexcept { return isUtf8 ? "…" : "..."; }
 };
 

@@ -25,7 +25,7 @@ std::string iso(std::time_t when) {
     return {text, length};
 }
 
-/// A time of the day that lies so many days before the day of `now`.
+/// A time of day on the day `daysBefore` days before that of `now`.
 std::string onDay(std::time_t now, int daysBefore, int hour, int minute, int second) {
     std::tm local{};
     localtime_r(&now, &local);
@@ -33,7 +33,7 @@ std::string onDay(std::time_t now, int daysBefore, int hour, int minute, int sec
     local.tm_hour = hour;
     local.tm_min = minute;
     local.tm_sec = second;
-    local.tm_isdst = -1; // as it is on that day
+    local.tm_isdst = -1; // let mktime determine DST for that day
     return iso(std::mktime(&local));
 }
 
@@ -54,7 +54,7 @@ std::optional<std::string> before(std::string_view text, std::time_t now) {
     return std::nullopt;
 }
 
-/// Two digits below the limit at the position; -1 when there are none.
+/// The two-digit number below the limit at the position; -1 when there is none.
 int twoDigits(std::string_view text, std::size_t at, int limit) {
     int value = -1;
     const char* const end = text.data() + at + 2;

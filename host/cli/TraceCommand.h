@@ -7,7 +7,7 @@
 
 namespace zrm::host {
 
-/// `zrmctl trace LEVELS`: what the agent traces from now on.
+/// `zrmctl trace LEVELS`: sets what the agent traces from now on.
 class TraceCommand : public Command {
 public:
     explicit TraceCommand(CLI::App& program);

@@ -41,7 +41,7 @@ std::string_view cell(const FormatTrial::Line& line, std::string_view column) {
     return {};
 }
 
-/// The columns that have something to show; of twins the second only where it differs.
+/// The non-empty columns; the second of a pair only if it differs.
 std::string columnsOf(const FormatTrial::Line& line, const Terminal& terminal) {
     std::string text;
     for (const auto& [column, value] : line.row) {
@@ -68,7 +68,7 @@ std::string textOf(std::size_t number, const FormatTrial::Line& line, const Term
     const std::string head =
         std::string(numberColumns - std::min(numberColumns, digits.size()), ' ') + digits + "  ";
     if (!line.matched && line.failedAt) {
-        // The number takes the place of the blanks in front of the text.
+        // The line number replaces the leading blanks.
         const std::string marked = MarkedText::of(line.line, *line.failedAt, indent, terminal);
         return head + marked.substr(indent) + reasonOf(line.reason, Colour::BAD, terminal);
     }

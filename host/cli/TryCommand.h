@@ -8,8 +8,8 @@
 
 namespace zrm::host {
 
-/// `zrmctl try FORMAT FILE`: what a format specifier makes of the lines of a file, or where they
-/// stop fitting. Needs no agent.
+/// `zrmctl try FORMAT FILE`: how a format specifier parses the lines of a file, or where they fail
+/// to match. Needs no agent.
 class TryCommand : public Command {
 public:
     explicit TryCommand(CLI::App& program);

@@ -10,8 +10,8 @@
 using namespace zrm::host;
 
 int main(int argc, char** argv) {
-    std::setlocale(LC_CTYPE, ""); // whether the terminal takes UTF-8
-    // The agent's code traces where it is used here; an operator sees that only on demand.
+    std::setlocale(LC_CTYPE, ""); // determines whether the terminal accepts UTF-8
+    // The agent's code used here also traces; show that to the operator only on demand.
     const char* const levels = std::getenv("QFW_TRC1");
     if (const std::string problem = TraceControl::configure(levels == nullptr ? "none" : levels);
         !problem.empty()) {

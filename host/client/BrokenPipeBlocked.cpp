@@ -13,9 +13,9 @@ BrokenPipeBlocked::BrokenPipeBlocked() {
 
 BrokenPipeBlocked::~BrokenPipeBlocked() {
     if (sigismember(&m_before, SIGPIPE) == 1) {
-        return; // it was blocked before and stays so
+        return; // it was already blocked and stays so
     }
-    // A signal that waits would come as soon as it is let through.
+    // A pending signal would be delivered as soon as it is unblocked.
     constexpr timespec atOnce{};
     sigtimedwait(&m_pipe, nullptr, &atOnce);
     pthread_sigmask(SIG_SETMASK, &m_before, nullptr);

@@ -5,9 +5,9 @@
 
 namespace zrm::host {
 
-/// While it lives, writing to a connection that the other side has closed does not signal the
-/// process, whose action for SIGPIPE stays as it is: children inherit that. One thread's, made and
-/// destroyed on it.
+/// While it exists, writing to a connection closed by the peer does not raise SIGPIPE. The
+/// process's SIGPIPE action is unchanged, since children inherit it. Created and destroyed on the
+/// same thread.
 class BrokenPipeBlocked {
 public:
     BrokenPipeBlocked();

@@ -12,11 +12,11 @@
 namespace zrm::host {
 
 struct NameLookup::Answer {
-    int code = 0; ///< of getaddrinfo
+    int code = 0; ///< error code of getaddrinfo
     std::vector<SocketAddress> addresses;
 };
 
-/// A lookup on its thread, which may live longer than everybody who asked.
+/// A lookup on its own thread, which may outlive all its callers.
 struct NameLookup::Lookup {
     std::mutex mutex;
     std::condition_variable_any changed;
@@ -40,7 +40,7 @@ NameLookup::Answer NameLookup::ask(const std::string& host, std::uint16_t port, 
     Answer answer;
     addrinfo wanted{};
     wanted.ai_flags = flags;
-    wanted.ai_socktype = SOCK_STREAM; // each address once; it is the same for datagrams
+    wanted.ai_socktype = SOCK_STREAM; // each address once; datagrams have the same addresses
     addrinfo* list = nullptr;
     answer.code = getaddrinfo(host.c_str(), std::to_string(port).c_str(), &wanted, &list);
     if (answer.code != 0) {
@@ -58,7 +58,7 @@ NameLookup::Answer NameLookup::ask(const std::string& host, std::uint16_t port, 
 std::vector<SocketAddress> NameLookup::find(Clock::time_point limit,
                                             const std::stop_token& giveUp) {
     if (Answer digits = ask(m_host, m_port, AI_NUMERICHOST); digits.code == 0) {
-        return std::move(digits.addresses); // needs nobody's help
+        return std::move(digits.addresses); // a numeric address needs no lookup
     }
     if (m_underWay == nullptr) {
         auto lookup = std::make_shared<Lookup>();

@@ -6,15 +6,15 @@
 
 namespace zrm::host {
 
-/// What conditions need to know of a column before the agent has registered its tables.
+/// What conditions need to know about a column before the agent registers its tables.
 struct Column {
     std::string_view name; ///< upper-case
     int width;             ///< bytes
-    bool isNumber;         ///< an integer column; otherwise a character column
+    bool isNumber;         ///< an integer column; false: a character column
     bool isTime;           ///< holds a 16-character time stamp
 };
 
-/// The columns of a table ("RMLOGENT", "RMMONLOG") in table order; none for another name.
+/// The columns of a table ("RMLOGENT", "RMMONLOG") in table order; empty for any other name.
 std::span<const Column> columnsOf(std::string_view table) noexcept;
 
 /// The column of this upper-case name, or null.

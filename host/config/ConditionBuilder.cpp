@@ -16,8 +16,8 @@ namespace zrm::host {
 namespace {
 
 constexpr std::size_t longestPattern = 4096; ///< bytes
-constexpr std::size_t mostValues = 1000;     ///< of a list
-constexpr std::size_t longestList = 16384;   ///< bytes of its values together
+constexpr std::size_t mostValues = 1000;     ///< values in a list
+constexpr std::size_t longestList = 16384;   ///< total bytes of the values of a list
 
 std::string quoted(std::string_view text) {
     return '\'' + std::string(text) + '\'';
@@ -35,7 +35,7 @@ ConditionProblem badValue(std::string what, std::string cure) {
     return {ConditionProblem::VALUE, std::move(what), std::move(cure)};
 }
 
-/// A value of a character column that is compared as a whole; false: `value` says what is wrong.
+/// Checks a value of a character column that is compared as a whole.
 std::optional<ConditionProblem> checkWhole(const Column& column, std::string& value) {
     if (column.isTime && !value.empty()) {
         std::optional<std::string> stamp = TimeText::toStamp(value);
@@ -64,8 +64,8 @@ std::optional<ConditionProblem> checkNumber(std::int64_t number) {
     return std::nullopt;
 }
 
-/// What is wrong with a regular expression. A compilation stops soon behind the largest size: the
-/// memory that it may use allows a few times as much.
+/// What is wrong with a regular expression. Compilation stops not far above the largest size: its
+/// memory limit allows a few times as much.
 std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudget& budget) {
     constexpr std::int64_t memory = 512 * 1024;
     constexpr const char* cure =
@@ -95,7 +95,7 @@ std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudg
     return std::nullopt;
 }
 
-/// A value of contains, starts or matches.
+/// Checks a value of contains, starts or matches.
 std::optional<ConditionProblem> checkPattern(_IntfOper op, const std::string& value,
                                              PatternBudget& budget) {
     if (value.empty() || value.size() > longestPattern) {
@@ -119,7 +119,7 @@ ConditionProblem notAText(const Column& column) {
 struct ConditionBuilder::Operator {
     std::string_view name;
     _IntfOper code;
-    bool forNumbers; ///< for columns of both kinds; otherwise for character columns alone
+    bool forNumbers; ///< true: for both kinds of columns; false: for character columns only
 };
 
 const std::array<ConditionBuilder::Operator, 10>& ConditionBuilder::operators() noexcept {

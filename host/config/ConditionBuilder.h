@@ -24,35 +24,35 @@ struct ConditionProblem {
     std::string cure;
 };
 
-/// A value as an operator gave it: one text or number, or a list of them.
+/// A value as written by the operator: one text or number, or a list of them.
 struct ConditionValue {
     using Item = std::variant<std::string, std::int64_t>;
     std::vector<Item> items;
     bool isList = false;
 };
 
-/// Puts conditions on a table's columns together and checks them; the one place that knows which
-/// operators and values a column takes. Immutable.
+/// Builds and checks conditions on a table's columns. The only place that knows which operators and
+/// values a column accepts. Immutable.
 class ConditionBuilder {
 public:
     using Result = std::variant<Condition, ConditionProblem>;
 
     explicit ConditionBuilder(std::string_view table);
 
-    /// The condition COLUMN OP VALUE, or what is wrong with it. Values of time columns may be
-    /// ISO 8601 times; the condition holds them as 16-character time stamps. Conditions that belong
-    /// together share a budget for their regular expressions.
+    /// The condition COLUMN OP VALUE, or what is wrong with it. Values of time columns may be ISO
+    /// 8601 times; the condition stores them as 16-character time stamps. Conditions of one
+    /// situation share a budget for their regular expressions.
     Result build(std::string_view column, std::string_view op, const ConditionValue& value,
                  PatternBudget& budget) const;
 
-    /// The conditions that hold for the entries of this log alone, or what is wrong with the path:
-    /// its directory and its name, in the columns that can hold them.
+    /// The conditions that only entries of this log meet, or what is wrong with the path:
+    /// conditions on its directory and its name, in the columns that can hold them.
     static std::variant<std::vector<Condition>, ConditionProblem> ofLog(std::string_view path);
 
-    /// The operator as conditions write it; empty for a code that none has.
+    /// The operator as written in conditions; empty for an unknown code.
     static std::string_view nameOf(_IntfOper op) noexcept;
 
-    /// The operators as conditions write them.
+    /// The operators as written in conditions.
     static std::vector<std::string_view> operatorNames();
 
 private:

@@ -12,7 +12,7 @@ namespace {
 
 constexpr const char* form = "write COLUMN OP VALUE, for example ENTRYDESC contains 'failed'";
 
-/// Reads the text from its front.
+/// Scans the text from its beginning.
 class Scanner {
 public:
     explicit Scanner(std::string_view text) : m_rest(text) {}
@@ -29,7 +29,7 @@ public:
         m_rest.remove_prefix(1);
         return true;
     }
-    /// The longest front of characters of which `belongs` holds.
+    /// The longest prefix of characters for which `belongs` holds.
     template <typename Predicate> std::string_view takeWhile(Predicate belongs) {
         const auto end = std::find_if_not(m_rest.begin(), m_rest.end(), belongs);
         const auto length = static_cast<std::size_t>(end - m_rest.begin());
@@ -146,7 +146,7 @@ ConditionBuilder::Result ConditionParser::parse(std::string_view text,
     if (!problem) {
         return m_builder.build(column, op, value, budget);
     }
-    // A wrong column or operator is the better thing to say than a value that it made unreadable.
+    // A wrong column or operator is a better message than a value that is unreadable because of it.
     ConditionBuilder::Result probe =
         m_builder.build(column, op, {{std::string("x")}, false}, budget);
     if (const auto* const earlier = std::get_if<ConditionProblem>(&probe);

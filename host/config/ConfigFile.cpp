@@ -67,7 +67,7 @@ void readAgent(const toml::table& table, ConfigProblems& problems, HostConfig& c
     section.refuseUnknownKeys();
 }
 
-/// An absolute path; the target is left alone where the key is missing.
+/// Reads an absolute path; the target is unchanged when the key is missing.
 void readPath(ConfigSection& section, std::string_view key, std::string& target) {
     if (const std::optional<std::string> path = section.text(key)) {
         requireAbsolute(section, key, *path);
@@ -75,7 +75,7 @@ void readPath(ConfigSection& section, std::string_view key, std::string& target)
     }
 }
 
-/// What a client of the agent needs of [http].
+/// Reads what a client of the agent needs from [http].
 void readHttpAccess(ConfigSection& section, HttpConfig& http) {
     const std::string listen = section.text("listen").value_or("127.0.0.1:7186");
     if (!listen.empty()) {
@@ -108,7 +108,7 @@ void readHttp(const toml::table& table, ConfigProblems& problems, HostConfig& co
     section.refuseUnknownKeys();
 }
 
-/// A number within bounds; none when the key is missing or the number is not.
+/// A number within bounds; none when the key is missing or the number is out of bounds.
 std::optional<std::int64_t> readBounded(ConfigSection& section, std::string_view key,
                                         std::int64_t least, std::int64_t most) {
     const std::optional<std::int64_t> number = section.number(key);
@@ -172,14 +172,14 @@ void readAccess(const toml::table& file, ConfigProblems& problems, HostConfig& c
     }
 }
 
-/// Why a file has no content that can be used.
+/// Why the contents of a file cannot be read.
 std::string unreadable(int number) {
     const ErrorText error(number);
     return std::string("cannot be read: ") + error.text();
 }
 
-/// Reads an open file into the text, which must be a regular one: a pipe could keep the reader
-/// waiting for ever. Returns what is wrong, empty when nothing is.
+/// Reads an open file into the text. It must be a regular file: a pipe could block the reader
+/// forever. Returns an error message, empty on success.
 std::string readContent(int fd, std::string& text) {
     struct stat status {};
     std::string problem;
@@ -199,7 +199,7 @@ std::string readContent(int fd, std::string& text) {
     return count == -1 ? unreadable(errno) : problem;
 }
 
-/// The content of a file; meaningless when a problem was noted.
+/// The contents of a file; meaningless when a problem was recorded.
 std::string readContent(const std::string& path, ConfigProblems& problems) {
     std::string text;
     const int fd = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
@@ -213,7 +213,7 @@ std::string readContent(const std::string& path, ConfigProblems& problems) {
     return text;
 }
 
-/// Notes why a text that was read while the file is in use cannot be the whole file.
+/// Records why a text read while the file is in use cannot be the complete file.
 void checkWhole(std::string_view text, ConfigProblems& problems) {
     if (text.find_first_not_of(" \t\r\n") == std::string_view::npos) {
         problems.add(0, "", "is empty", "write the configuration into it again");

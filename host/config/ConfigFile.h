@@ -13,21 +13,21 @@ namespace zrm::host {
 /// Reads host configuration files. Stateless.
 class ConfigFile {
 public:
-    /// A configuration, or every problem of its file.
+    /// A configuration, or all problems of its file.
     using Result = std::variant<HostConfig, std::vector<std::string>>;
 
     /// Reads a file.
     static Result load(const std::string& path);
 
-    /// Reads a file that has changed while it is in use. One that is empty or ends within a line is
-    /// being written, or was cut off: that is a problem then.
+    /// Reads a file that has changed while in use. An empty file, or one whose last line is
+    /// incomplete, is still being written or was truncated: that counts as a problem here.
     static Result reload(const std::string& path);
 
-    /// Reads only what a client of the agent needs: the state directory, and of [http] the address,
-    /// the certificate and the token's file. What else is wrong with the file is no problem then.
+    /// Reads only what a client of the agent needs: the state directory and, from [http], the
+    /// address, the certificate and the token file. Other problems of the file are ignored.
     static Result loadAccess(const std::string& path);
 
-    /// Reads the text of a file that is called `path` in messages.
+    /// Parses the text of a file; messages call it `path`.
     static Result parse(std::string_view text, const std::string& path);
 };
 

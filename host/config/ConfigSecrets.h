@@ -7,8 +7,8 @@
 
 namespace zrm::host {
 
-/// A warning when a configuration, read from the file of this path, holds a secret of a sink and
-/// every user can read the file; else empty.
+/// A warning when the configuration read from this file contains a secret of a sink and every user
+/// can read the file; otherwise empty.
 std::string warningOfSecrets(const HostConfig& config, const std::string& path);
 
 } // namespace zrm::host

@@ -78,7 +78,7 @@ std::optional<std::string> ConfigSection::text(std::string_view key) {
     return text;
 }
 
-/// Adds a text of a list, or says what is wrong with it.
+/// Adds a text of a list, or records what is wrong with it.
 void ConfigSection::addText(std::vector<Text>& texts, std::string_view key,
                             const toml::value<std::string>& text) {
     const unsigned line = lineOf(text.source());

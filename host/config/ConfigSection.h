@@ -14,18 +14,18 @@
 
 namespace zrm::host {
 
-/// One table of a configuration file while it is read: gives values by key and type, notes every
-/// problem, and knows which keys nobody asked for.
+/// One table of a configuration file while it is read: returns values by key and type, records
+/// every problem, and knows which keys have not been read.
 class ConfigSection {
 public:
-    /// A text and the line on which it stands.
+    /// A text and its line number.
     using Text = std::pair<std::string, unsigned>;
 
-    /// `name` stands before the keys in messages; empty for the file's own table. Both references
-    /// outlive the object.
+    /// `name` precedes the keys in messages; empty for the file's top-level table. Both references
+    /// must outlive the object.
     ConfigSection(std::string name, const toml::table& table, ConfigProblems& problems);
 
-    /// The value of a key; none when it is missing or of another type, which is a problem.
+    /// The value of a key; none when it is missing or, which is a problem, of another type.
     std::optional<std::string> text(std::string_view key);
     std::optional<std::int64_t> number(std::string_view key);
     std::optional<bool> truth(std::string_view key);
@@ -33,19 +33,19 @@ public:
     std::vector<Text> texts(std::string_view key);
     /// A table, as in [key]; null when it is missing.
     const toml::table* table(std::string_view key);
-    /// The tables of [[key]]; none when it is missing. An empty list is a list.
+    /// The tables of [[key]]; none when it is missing. An empty list is not missing.
     std::optional<std::vector<const toml::table*>> tables(std::string_view key);
 
     bool has(std::string_view key) const { return m_table.contains(key); }
-    /// The line of a key's value, or of the table where the key is missing.
+    /// The line of a key's value, or of the table when the key is missing.
     unsigned line(std::string_view key) const;
 
-    /// Notes a problem of a key.
+    /// Records a problem with a key.
     void problem(std::string_view key, const std::string& what, const std::string& cure);
     void problem(unsigned line, std::string_view key, const std::string& what,
                  const std::string& cure);
 
-    /// Every key that was not asked for is a problem. To be called when all were.
+    /// Records a problem for every key that has not been read. Call it last.
     void refuseUnknownKeys();
 
 private:
@@ -57,7 +57,7 @@ private:
     const std::string m_name;
     const toml::table& m_table;
     ConfigProblems& m_problems;
-    std::vector<std::string> m_known; ///< keys that were asked for, in that order
+    std::vector<std::string> m_known; ///< keys that have been read, in that order
 };
 
 } // namespace zrm::host

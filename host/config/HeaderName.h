@@ -5,10 +5,10 @@
 
 namespace zrm::host {
 
-/// True for what may be the name of a header that an operator adds to those that a sink sets.
+/// Whether an operator may add a header of this name to those that a sink sets.
 bool isAddableHeader(std::string_view name);
 
-/// True for the name of a header whose value usually is a secret, such as Authorization.
+/// Whether the value of this header is usually a secret, as for Authorization.
 bool isSecretHeader(std::string_view name);
 
 } // namespace zrm::host

@@ -13,7 +13,7 @@
 
 namespace zrm::host {
 
-/// An environment variable of the agent that the configuration sets where it is unset.
+/// An environment variable of the agent that the configuration sets if it is unset.
 struct EnvironmentSetting {
     std::string variable;
     std::string value;
@@ -24,7 +24,7 @@ struct EnvironmentSetting {
 struct HttpConfig {
     std::optional<ListenAddress> listen; ///< none: no HTTP
     std::string tokenFile;               ///< empty: api-token in the state directory
-    std::string certificate;             ///< empty: without TLS
+    std::string certificate;             ///< empty: no TLS
     std::string key;                     ///< of the certificate
     bool operator==(const HttpConfig&) const = default;
 };
@@ -34,7 +34,7 @@ struct HistoryConfig {
     bool enabled = true;
     std::string directory;                ///< empty: the state directory
     std::int64_t keepDays = 30;           ///< older events expire
-    std::uint64_t keepEvents = 5'000'000; ///< so many of the newest events are kept at most
+    std::uint64_t keepEvents = 5'000'000; ///< at most this many events are kept, the newest ones
     bool operator==(const HistoryConfig&) const = default;
 };
 
@@ -43,17 +43,17 @@ struct SituationConfig {
     std::string name;
     std::string text;
     std::string severity;
-    std::vector<Condition> conditions; ///< those of `log`, `when`, `frequency` and `period`
-    // As they were written.
+    std::vector<Condition> conditions; ///< from `log`, `when`, `frequency` and `period`
+    // As written by the operator.
     std::optional<std::string> log = std::nullopt; ///< none: every log
     std::vector<std::string> when = {};
     std::optional<std::string> frequency = std::nullopt;
     std::optional<std::string> period = std::nullopt;
-    std::size_t patternSize = 0; ///< instructions of its regular expressions (PatternBudget)
+    std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };
 
-/// A host configuration file as it was read; the defaults where it says nothing.
+/// The contents of a host configuration file, with defaults for missing keys.
 struct HostConfig {
     std::string stateDirectory = "/var/lib/zrm";
     std::vector<EnvironmentSetting> environment;

@@ -17,7 +17,7 @@ struct Scheme {
 
 constexpr std::array<Scheme, 2> schemes = {{{"http://", false, 80}, {"https://", true, 443}}};
 
-/// True for the characters that may stand in a path or a query.
+/// True for characters allowed in a path or a query.
 bool isTargetCharacter(char c) {
     constexpr std::string_view others = R"("<>\^`{|}#)";
     return c > ' ' && c < 0x7f && others.find(c) == std::string_view::npos;
@@ -36,7 +36,7 @@ std::optional<HttpUrl> HttpUrl::parse(std::string_view text) {
     const std::size_t end = std::min(text.find_first_of("/?"), text.size());
     const std::string_view place = text.substr(0, end);
     const std::string_view target = text.substr(end);
-    // A colon behind the last bracket, or any where there are none, begins the port.
+    // The port begins at a colon after the last bracket, or at any colon if there are no brackets.
     const std::size_t colon = place.rfind(':');
     const bool hasPort = colon != std::string_view::npos && !place.ends_with(']');
     const std::optional<ListenAddress> address = ListenAddress::parse(

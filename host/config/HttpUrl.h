@@ -8,21 +8,21 @@
 
 namespace zrm::host {
 
-/// The URL of something that is asked over HTTP.
+/// The URL of an HTTP server or resource.
 struct HttpUrl {
     bool isSecure = false;  ///< https
     std::string host;       ///< name or number, without brackets
-    std::uint16_t port = 0; ///< that of the scheme where the URL gives none
-    std::string target;     ///< path and query; "/" where the URL has none
+    std::uint16_t port = 0; ///< the scheme's default when the URL has none
+    std::string target;     ///< path and query; "/" when the URL has none
 
-    /// Reads "http://HOST[:PORT][/PATH][?QUERY]", or the same with https; none for any other text,
-    /// one with a user's name or a fragment among them.
+    /// Parses "http://HOST[:PORT][/PATH][?QUERY]", or the same with https. None for any other text,
+    /// including a URL with a user name or a fragment.
     static std::optional<HttpUrl> parse(std::string_view text);
 
     /// "HOST:PORT" as in a URL.
     std::string authority() const;
 
-    /// The target with this path behind its own and before its query.
+    /// The target with this path appended to its own, before the query.
     std::string withPath(std::string_view path) const;
 
     bool operator==(const HttpUrl&) const = default;

@@ -6,15 +6,15 @@
 
 namespace zrm::host {
 
-/// How large the regular expressions of several conditions may be together, in instructions of
-/// their programs. Compiling costs microseconds for each instruction, and a few bytes of memory for
-/// as long as the condition is in force; a pattern of a few bytes can have hundreds of thousands.
+/// Limits the total size of the regular expressions of several conditions, in instructions of their
+/// compiled programs. Each instruction costs microseconds to compile and a few bytes of memory
+/// while the condition is in force, and a pattern of a few bytes can have hundreds of thousands.
 /// Used by one thread.
 class PatternBudget {
 public:
     static constexpr std::size_t ofPattern = 10'000;
-    static constexpr std::size_t ofSituation = 20'000; ///< also of the filters of one request
-    /// Of the situations of the configuration file, and of those made through the API.
+    static constexpr std::size_t ofSituation = 20'000; ///< also for the filters of one request
+    /// For all situations of the configuration file, and for all those made through the API.
     static constexpr std::size_t ofSource = 1'000'000;
 
     explicit PatternBudget(std::size_t most = ofSituation) noexcept : m_most(most) {}
@@ -22,11 +22,11 @@ public:
     void spend(std::size_t size) noexcept { m_used += size; }
     std::size_t used() const noexcept { return m_used; }
     bool isExceeded() const noexcept { return m_used > m_most; }
-    /// What the next situation may spend of the budget of its source.
+    /// The part of its source's budget that the next situation may use.
     PatternBudget ofNext() const noexcept {
         return PatternBudget(isSpent() ? 0 : std::min(m_most - m_used, ofSituation));
     }
-    /// Whether nothing is left for another pattern.
+    /// Whether there is no budget left for another pattern.
     bool isSpent() const noexcept { return m_used >= m_most; }
 
 private:

@@ -16,21 +16,21 @@ struct SinkConfig {
     using Value = std::variant<std::string, std::int64_t, std::chrono::milliseconds, Texts>;
 
     std::string type; ///< one of SinkTypes
-    std::string name; ///< unique among the sinks, and the same from start to start
-    /// The options of the type: those of the file and the defaults of the others. An option
-    /// without a default that the file does not give is missing.
+    std::string name; ///< unique among the sinks, and stable across restarts
+    /// The options of the type: from the file, or their defaults. An option that is neither in the
+    /// file nor has a default is missing.
     std::map<std::string, Value, std::less<>> options;
 
     /// A sink of type "jsonl" that writes to this file, or to standard output ("-").
     static SinkConfig jsonl(const std::string& path);
 
-    /// An option that is a text; empty when it is missing.
+    /// A text option; empty when missing.
     std::string text(std::string_view option) const;
-    /// An option that is a number, and has a default or is required.
+    /// A numeric option that has a default or is required.
     std::int64_t number(std::string_view option) const;
-    /// An option that is a length of time, and has a default or is required.
+    /// A duration option that has a default or is required.
     std::chrono::milliseconds duration(std::string_view option) const;
-    /// An option that is a table of texts; empty when it is missing.
+    /// An option that is a table of texts; empty when missing.
     Texts texts(std::string_view option) const;
 
     bool operator==(const SinkConfig&) const = default;

@@ -52,12 +52,12 @@ bool isOutput(const SinkOption& option, std::string_view text) {
     return text == "-" || isPath(option, text);
 }
 
-/// What is accepted as an option of a kind that is a text.
+/// What a text option of some kind accepts.
 struct TextKind {
     SinkOption::Kind kind;
     bool (*accepts)(const SinkOption& option, std::string_view text);
-    const char* what; ///< what a text that is not accepted is not
-    const char* cure; ///< empty: cureOf makes it of the option
+    const char* what; ///< what a rejected text is not
+    const char* cure; ///< empty: cureOf derives it from the option
 };
 
 constexpr std::array textKinds = {
@@ -86,7 +86,7 @@ std::string cureOf(const SinkOption& option) {
     return text;
 }
 
-/// True for what may be the name of a label that an operator adds to those that an alert has.
+/// Whether an operator may add a label of this name to those of an alert.
 bool isLabelName(std::string_view name) {
     constexpr std::array<std::string_view, 4> own = {"alertname", "severity", "log", "node"};
     return !name.empty() && std::find(own.begin(), own.end(), name) == own.end() &&
@@ -99,7 +99,7 @@ bool isAttributeName(std::string_view name) {
     return !name.empty() && std::none_of(name.begin(), name.end(), isControl);
 }
 
-/// What is accepted as a name in an option of a kind that is a table of texts.
+/// What an option of some table kind accepts as a name.
 struct TableKind {
     SinkOption::Kind kind;
     bool (*accepts)(std::string_view name);
@@ -142,7 +142,7 @@ std::optional<SinkConfig::Value> SinkOptionReader::read(const SinkOption& option
 void SinkOptionReader::checkText(const SinkOption& option, const std::string& text) {
     const TextKind& kind = rowOf(textKinds, option.kind);
     if (!kind.accepts(option, text)) {
-        // A free text may be a secret, and the line says which it is.
+        // A free text may be a secret, and the line number identifies it anyway.
         const bool isShown =
             option.kind != SinkOption::TEXT && std::none_of(text.begin(), text.end(), isControl);
         m_section.problem(option.name, (isShown ? "'" + text + "' " : "") + kind.what,

@@ -12,15 +12,15 @@
 
 namespace zrm::host {
 
-/// Reads and checks the value of one option of a sink. The references that it is made of outlive
-/// it.
+/// Reads and checks the value of one option of a sink. The references passed to the constructor
+/// must outlive it.
 class SinkOptionReader {
 public:
     SinkOptionReader(ConfigSection& section, ConfigProblems& problems)
         : m_section(section), m_problems(problems) {}
 
-    /// The value in the section, or the default; none when there is neither, or when the value is
-    /// unusable, which is a problem.
+    /// The value in the section, or the default; none when there is neither or when the value is
+    /// invalid, which is recorded as a problem.
     std::optional<SinkConfig::Value> read(const SinkOption& option);
 
 private:

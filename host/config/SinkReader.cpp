@@ -9,8 +9,8 @@ namespace zrm::host {
 
 namespace {
 
-/// What a sink is called that was given no name. It holds nothing of a URL but host and port: the
-/// rest is often a secret.
+/// The default name of a sink. From a URL it takes only host and port, since the rest is often
+/// secret.
 std::string defaultName(const SinkType& type, const std::string& target) {
     if (const std::optional<HttpUrl> url = HttpUrl::parse(target)) {
         return std::string(type.name) + ' ' + url->authority();
@@ -34,7 +34,7 @@ SinkConfig SinkReader::read(const toml::table& table) {
     sink.type = sink.text("type");
     sink.name = sink.text("name");
     sink.options.clear();
-    // Which keys belong here depends on the type: without one nothing more can be said.
+    // The allowed keys depend on the type; without one nothing more can be checked.
     if (const SinkType* const type = SinkTypes::find(sink.type)) {
         for (const SinkOption& option : type->options) {
             readOption(section, option, sink);

@@ -14,10 +14,10 @@ namespace zrm::host {
 /// Reads the [[sink]] tables of a configuration file.
 class SinkReader {
 public:
-    /// Notes what is wrong with the tables.
+    /// Records what is wrong with the tables in `problems`.
     explicit SinkReader(ConfigProblems& problems);
 
-    /// The sink of one table; meaningless when a problem was noted.
+    /// The sink of one table; meaningless when a problem was recorded.
     SinkConfig read(const toml::table& table);
 
 private:
@@ -25,8 +25,8 @@ private:
     void checkUnique(ConfigSection& section, const SinkType& type, const SinkConfig& sink);
 
     ConfigProblems& m_problems;
-    std::map<std::string, unsigned> m_names;   ///< line of each sink's name
-    std::map<std::string, unsigned> m_targets; ///< line of the place to which each sink delivers
+    std::map<std::string, unsigned> m_names;   ///< line number of each sink's name
+    std::map<std::string, unsigned> m_targets; ///< line number of each sink's target
 };
 
 } // namespace zrm::host

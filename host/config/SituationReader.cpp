@@ -12,13 +12,13 @@ namespace zrm::host {
 
 namespace {
 
-/// Takes the fields of a situation out of its table.
+/// Reads the fields of a situation from its table.
 class Fields {
 public:
     explicit Fields(ConfigSection& section) : m_section(section) {}
 
-    /// A value of another type is a problem that the section has noted: an empty text stands for
-    /// it, and whatever is wrong with that is not worth saying.
+    /// The section has recorded a value of another type as a problem: an empty text replaces it,
+    /// and further problems with that are not worth reporting.
     std::optional<std::string> text(std::string_view key) {
         std::optional<std::string> value = m_section.text(key);
         if (!value && m_section.has(key)) {

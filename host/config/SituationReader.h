@@ -14,10 +14,10 @@ namespace zrm::host {
 /// Reads the [[situation]] tables of a configuration file.
 class SituationReader {
 public:
-    /// Notes what is wrong with the tables.
+    /// Records what is wrong with the tables in `problems`.
     explicit SituationReader(ConfigProblems& problems) : m_problems(problems) {}
 
-    /// The situation of one table; meaningless when a problem was noted.
+    /// The situation of one table; meaningless when a problem was recorded.
     SituationConfig read(const toml::table& table);
 
 private:
@@ -25,7 +25,7 @@ private:
 
     ConfigProblems& m_problems;
     PatternBudget m_patterns{PatternBudget::ofSource};
-    std::map<std::string, unsigned> m_names; ///< line of each situation's name
+    std::map<std::string, unsigned> m_names; ///< line number of each situation's name
 };
 
 } // namespace zrm::host

@@ -31,7 +31,7 @@ void checkName(const std::optional<std::string>& name, Problems& problems) {
         problems.push_back({"name", {}, "is missing", "give the situation a name"});
         return;
     }
-    // Clients take "." and ".." for directories, so no request could name such a situation.
+    // Clients treat "." and ".." as directories, so no request could name such a situation.
     if (name->empty() || name->size() > SituationValidator::longestName || *name == "." ||
         *name == ".." || std::any_of(name->begin(), name->end(), isControl)) {
         problems.push_back({"name",
@@ -69,13 +69,13 @@ void addLog(const std::string& log, SituationConfig& situation, Problems& proble
     situation.conditions = std::move(std::get<std::vector<Condition>>(conditions));
 }
 
-/// The thresholds that conditions state themselves. Conditions that put none in force are refused:
-/// the situation would run without the threshold that somebody has written.
+/// The thresholds stated as conditions. Conditions that put no threshold in force are refused: the
+/// situation would run without the threshold its author wrote.
 class WrittenThresholds {
 public:
     explicit WrittenThresholds(Problems& problems) : m_problems(problems) {}
 
-    /// Notes a condition on a threshold's column.
+    /// Records a condition on a threshold column.
     void add(std::size_t index, const Condition& condition) {
         Threshold& threshold = condition.column == "FREQTHRESH" ? m_frequency : m_period;
         if (threshold.index) {
@@ -90,7 +90,7 @@ public:
         }
     }
 
-    /// To be called when all conditions were added.
+    /// Call after all conditions have been added.
     void finish() {
         requireOther(m_frequency, m_period, "add PERIODTHRS = 60");
         requireOther(m_period, m_frequency, "add FREQTHRESH >= 5");
@@ -104,7 +104,7 @@ private:
         bool (*isInForce)(const Condition& condition);
         const char* what;
         const char* cure;
-        std::optional<std::size_t> index = {}; ///< of the condition that states it
+        std::optional<std::size_t> index = {}; ///< index of the condition that states it
     };
 
     void requireOther(const Threshold& one, const Threshold& other, const char* cure) {

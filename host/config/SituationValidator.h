@@ -12,7 +12,7 @@
 
 namespace zrm::host {
 
-/// A situation as somebody wrote it; none where a field was left out.
+/// A situation as written; none for a field that was left out.
 struct SituationText {
     std::optional<std::string> name;
     std::optional<std::string> text;
@@ -34,7 +34,7 @@ struct SituationProblem {
     std::string fieldText() const;
 };
 
-/// The one place that knows what makes a situation, wherever it comes from. Stateless.
+/// The only place that knows what makes a valid situation, wherever it comes from. Stateless.
 class SituationValidator {
 public:
     static constexpr std::size_t longestName = 128;  ///< bytes
@@ -42,8 +42,8 @@ public:
     static constexpr std::size_t mostConditions = 100;
     static constexpr std::size_t longestConditions = 65536; ///< bytes of all of them
 
-    /// Makes the situation of the text and returns everything that is wrong with it. The situation
-    /// is meaningless when there is something. The budget is for its regular expressions.
+    /// Builds the situation from the text and returns all problems. The situation is meaningless
+    /// when there are any. The budget is for its regular expressions.
     static std::vector<SituationProblem> check(const SituationText& text,
                                                SituationConfig& situation,
                                                PatternBudget budget = PatternBudget());

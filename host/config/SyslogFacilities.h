@@ -6,7 +6,7 @@
 
 namespace zrm::host {
 
-/// The facilities of RFC 5424 by their customary names; the index is the code.
+/// The facilities of RFC 5424 by their usual names; the index is the code.
 inline constexpr std::array<std::string_view, 24> syslogFacilities = {
     "kern",   "user",   "mail",     "daemon", "auth",   "syslog", "lpr",    "news",
     "uucp",   "cron",   "authpriv", "ftp",    "ntp",    "audit",  "alert",  "clock",

@@ -17,7 +17,7 @@ constexpr std::int64_t largest = std::numeric_limits<std::int32_t>::max();
 struct Bound {
     std::string_view sign;
     _IntfOper op;
-    std::int64_t least; ///< the smallest number that leaves a bound of one entry or more
+    std::int64_t least; ///< the smallest number that means a bound of at least one entry
 
     bool isReachable(std::int64_t number) const noexcept {
         return number >= least && number < largest;
@@ -29,7 +29,7 @@ constexpr std::array<Bound, 4> bounds = {{{">=", INTF_GREATER_OR_EQUAL, 1},
                                           {">", INTF_GREATER, 0},
                                           {"<", INTF_LESS, 2}}};
 
-/// Reads a number from the text's front and takes it off.
+/// Parses a number at the beginning of the text and removes it.
 std::optional<std::int64_t> takeNumber(std::string_view& text) {
     std::int64_t number = 0;
     if (text.empty() || text.front() == '-') {

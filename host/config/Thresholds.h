@@ -8,17 +8,17 @@
 
 namespace zrm::host {
 
-/// The event-rate thresholds of a situation as operators write them. Stateless.
+/// The event-rate thresholds of a situation as written by operators. Stateless.
 class Thresholds {
 public:
-    /// The FREQTHRESH condition of ">= 5", "> 4", "<= 2" or "< 3"; none for any other text, and
-    /// for a bound that the agent would not put in force (at most none, at least none).
+    /// The FREQTHRESH condition of ">= 5", "> 4", "<= 2" or "< 3"; none for any other text, and for
+    /// a bound that the agent would not apply (at most 0, at least 0).
     static std::optional<Condition> frequency(std::string_view text);
 
     /// The PERIODTHRS condition of "60s", "5m", "1h" or "1d"; none for any other text.
     static std::optional<Condition> period(std::string_view text);
 
-    /// Whether a condition on FREQTHRESH, or on PERIODTHRS, puts a threshold in force.
+    /// Whether a condition on FREQTHRESH or PERIODTHRS puts a threshold in force.
     static bool isFrequency(const Condition& condition) noexcept;
     static bool isPeriod(const Condition& condition) noexcept;
 };

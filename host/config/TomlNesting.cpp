@@ -6,7 +6,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Walks over a text, from one of its brackets, dots and line ends to the next.
+/// Scans a text, from one bracket, dot or line end to the next.
 class Walker {
 public:
     explicit Walker(std::string_view text) : m_text(text) {}
@@ -65,7 +65,7 @@ private:
             return;
         }
         ++m_at;
-        // One that its line does not end is an error there.
+        // A string not closed on its line is an error there.
         while (m_at < m_text.size() && m_text[m_at] != quote && m_text[m_at] != '\n') {
             m_at += quote == '"' && m_text[m_at] == '\\' ? 2 : 1;
         }
@@ -86,7 +86,7 @@ private:
             ++m_at;
         }
         m_at += three.size();
-        // Up to two quotes in front of the closing three belong to the string.
+        // Up to two quotes before the closing three belong to the string.
         for (int more = 0; more < 2 && m_at < m_text.size() && m_text[m_at] == quote; ++more) {
             ++m_at;
         }
@@ -95,8 +95,8 @@ private:
     const std::string_view m_text;
     std::size_t m_at = 0;
     unsigned m_line = 1;
-    int m_parts = 1; ///< of the name or value at hand
-    int m_open = 0;  ///< brackets
+    int m_parts = 1; ///< of the current name or value
+    int m_open = 0;  ///< open brackets
 };
 
 } // namespace

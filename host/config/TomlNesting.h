@@ -6,15 +6,15 @@
 
 namespace zrm::host {
 
-/// How deep a TOML text goes. The parser takes names of any number of parts, and what it makes of
-/// them is freed recursively, so a text is looked at before it is parsed. Stateless.
+/// Limits the nesting of a TOML text. The parser accepts names with any number of parts and frees
+/// the result recursively, so a text is checked before it is parsed. Stateless.
 class TomlNesting {
 public:
-    /// Most parts of a dotted name, and most brackets that are open at once.
+    /// The most parts of a dotted name, and the most brackets open at once.
     static constexpr int deepest = 32;
 
-    /// The line on which the text goes deeper, counted from 1; none when it does not. A text that
-    /// is not TOML may be misread, but only behind the place at which the parser refuses it.
+    /// The line, counted from 1, where the nesting exceeds the limit; none when it does not. A text
+    /// that is not TOML may be misread, but only after the point where the parser rejects it.
     static std::optional<unsigned> tooDeepAt(std::string_view text);
 };
 

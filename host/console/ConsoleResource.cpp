@@ -19,7 +19,7 @@ constexpr std::pair<std::string_view, const char*> contentTypes[] = {
     {".svg", "image/svg+xml"},
 };
 
-// The page runs its own files and nothing else, and no page of anyone else may frame it.
+// The page runs only its own files, and no other site may frame it.
 constexpr const char* contentSecurityPolicy =
     "default-src 'none'; script-src 'self'; style-src 'self'; img-src 'self'; connect-src 'self'; "
     "base-uri 'none'; form-action 'none'; frame-ancestors 'none'";
@@ -45,7 +45,7 @@ HttpAnswer answerWith(std::string_view name) {
         {"Content-Security-Policy", contentSecurityPolicy},
         {"Referrer-Policy", "no-referrer"},
         {"Cross-Origin-Opener-Policy", "same-origin"},
-        {"Cache-Control", "no-cache"}, // another version of the agent has other files
+        {"Cache-Control", "no-cache"}, // other versions of the agent have different files
     };
     return answer;
 }

@@ -5,8 +5,8 @@
 
 namespace zrm::host {
 
-/// The web console: `GET /` is its page, `GET /console/FILE` the files that the page is made of.
-/// None of them holds anything of this machine, so they need no token; the page asks for it.
+/// The web console: `GET /` is its page, `GET /console/FILE` are the files that the page uses. They
+/// contain nothing about this machine and need no token; the page asks the user for it.
 class ConsoleResource : public Resource {
 public:
     void addRoutes(Router& router) override;

@@ -18,7 +18,7 @@ TRC1_Anchor anchor{"Delivery.cpp"};
 
 constexpr std::size_t queuedEvents = 2048; ///< about 6 MB of Log Entries rows
 
-/// The history that the configuration wants; null and the reason when there can be none.
+/// The configured history; null with the reason when it cannot be opened.
 std::unique_ptr<History> openHistory(const HostConfig& config, std::string& problem) {
     if (!config.history.enabled) {
         return nullptr;
@@ -91,7 +91,7 @@ void Delivery::finish(EventQueue::Clock::time_point limit) {
 void Delivery::finishSinks(EventQueue::Clock::time_point limit) {
     const char* const rest =
         m_history == nullptr ? "" : "; it will get them when the agent runs again";
-    // All of them first: one that hangs until the limit leaves the others their time.
+    // First all of them: a sink that hangs until the limit must not take the others' time.
     for (const auto& sink : m_sinks) {
         sink->beginFinish();
     }

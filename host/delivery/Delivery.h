@@ -14,37 +14,37 @@
 
 namespace zrm::host {
 
-/// The way of events out of the process: the queue, the history, and one thread per sink. With a
-/// history the sinks get what it has committed, each from a place of its own; without one they
-/// get what is in the queue. start and finish are called by one thread at a time, the rest by any.
+/// Delivers events: the queue, the history, and one thread per sink. With a history, each sink
+/// reads committed events from its own position; without one, sinks read from the queue. start and
+/// finish are called by one thread at a time, the rest by any.
 class Delivery {
 public:
-    /// Room for events of rows of this layout, and the history where the configuration wants one;
-    /// no thread runs yet. Where there can be no history, it says why, and goes on without it.
+    /// Creates the queue for rows of this layout, and the history if configured; starts no thread.
+    /// If the history cannot be opened, says why and continues without it.
     Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize);
     ~Delivery();
     Delivery(const Delivery&) = delete;
     Delivery& operator=(const Delivery&) = delete;
 
-    /// Where events are put; lives as long as the object. Before finish, any thread.
+    /// The queue that takes new events; lives as long as the object. Before finish, any thread.
     EventQueue& queue() noexcept { return m_queue; }
 
     void start();
 
-    /// Stores and delivers what is queued, at the latest until the limit, and ends the threads.
-    /// Says which sink did not get everything. Any number of times.
+    /// Stores and delivers what is queued, until the limit at the latest, and ends the threads.
+    /// Says which sinks did not get everything. May be called more than once.
     void finish(EventQueue::Clock::time_point limit);
 
     /// The history; null when it is off. Lives as long as the object.
     History* history() noexcept { return m_history.get(); }
 
-    /// Why there is no history although the configuration wants one; else empty.
+    /// Why there is no history although one is configured; otherwise empty.
     const std::string& historyProblem() const noexcept { return m_historyProblem; }
 
-    /// How the queue stands.
+    /// The state of the queue.
     QueueState queueState() const { return m_queue.state(); }
 
-    /// How each sink stands, in the order of the configuration.
+    /// The state of each sink, in configuration order.
     std::vector<SinkState> sinkStates() const;
 
 private:

@@ -14,7 +14,7 @@ namespace {
 TRC1_Anchor anchor{"SinkThread.cpp"};
 
 constexpr std::size_t batch = 256;            ///< events per delivery
-constexpr std::chrono::seconds stallLimit{5}; ///< a wait that is longer is worth a word
+constexpr std::chrono::seconds stallLimit{5}; ///< a longer wait is reported
 constexpr std::chrono::seconds givingUpTime{1};
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{30'000};
@@ -58,7 +58,7 @@ void SinkThread::run() {
     m_changed.notify_all();
 }
 
-/// A sink that throws, for want of memory or of a thread, has failed like any other.
+/// A sink that throws, for lack of memory or of a thread, has failed like any other.
 std::size_t SinkThread::offer(std::span<const EventRecord> events) {
     m_exception.clear();
     try {
@@ -73,7 +73,7 @@ std::size_t SinkThread::deliver(std::span<const EventRecord> events) {
     const std::size_t delivered = offer(events);
     const bool failed = delivered < events.size();
     if (failed && m_giveUp.stop_requested()) {
-        // Nothing is tried again; who ends the thread tells what is left.
+        // No retry: the caller of finish reports what is left.
     } else if (failed) {
         tellOfFailure();
     } else if (m_state.condition == SinkState::Condition::FAILING) {
@@ -146,7 +146,7 @@ std::uint64_t SinkThread::finish(Clock::time_point limit) {
     return trace.result(m_source->backlog());
 }
 
-/// A delivery that waits has not failed yet, but nothing arrives.
+/// A waiting delivery has not failed yet, but nothing arrives.
 void SinkThread::noteStall(SinkState& state) const {
     const std::optional<Clock::time_point> since = m_sink->waitsSince();
     const auto waited = since ? Clock::now() - *since : Clock::duration::zero();

@@ -20,36 +20,36 @@
 
 namespace zrm::host {
 
-/// Carries events from their source to one sink, on a thread of its own. A delivery that fails is
-/// tried again after growing pauses, and nothing is passed over: while a sink is down its events
-/// stay where they are.
+/// Delivers events from their source to one sink on its own thread. A failed delivery is retried
+/// after growing pauses and nothing is skipped: while a sink is down, its events stay in the
+/// source.
 class SinkThread {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// `type` is the sink's in the configuration.
+    /// `type` is the sink's type in the configuration.
     SinkThread(std::unique_ptr<EventSource> source, std::unique_ptr<Sink> sink, std::string type);
     SinkThread(const SinkThread&) = delete;
     SinkThread& operator=(const SinkThread&) = delete;
-    /// Ends the thread at once when finish was not called.
+    /// Ends the thread at once if finish was not called.
     ~SinkThread();
 
     /// Starts the thread.
     void start();
 
-    /// Ends the source and cuts pauses short: a thread that can deliver the rest does so from now
-    /// on. Not on the sink's own thread; any number of times.
+    /// Ends the source and cuts pauses short, so that a thread which can deliver the rest does so
+    /// now. Not on the sink's own thread; may be called more than once.
     void beginFinish();
 
-    /// Does that, and ends the thread when it has delivered everything, at the latest at the
-    /// limit, or a second later when it does not give up at once. One that does not give up at all,
-    /// since the system does not let it, is left alone until the object is destroyed. Returns the
-    /// number of events that were not delivered. Not on the sink's own thread; any number of times.
+    /// Calls beginFinish and ends the thread when it has delivered everything, at the limit at the
+    /// latest, or a second later if it does not give up at once. A thread blocked in the system is
+    /// left running until the object is destroyed. Returns the number of undelivered events. Not on
+    /// the sink's own thread; may be called more than once.
     std::uint64_t finish(Clock::time_point limit);
 
     std::string name() const { return m_sink->name(); }
 
-    /// How the delivery stands. Any thread.
+    /// The state of delivery. Any thread.
     SinkState state() const;
 
 private:
@@ -66,12 +66,12 @@ private:
     const std::unique_ptr<Sink> m_sink;
     const std::string m_type;
     RetryPause m_pause;
-    std::string m_exception; ///< what the last delivery threw; empty when it did not
+    std::string m_exception; ///< what the last delivery threw; empty if nothing
 
-    mutable std::mutex m_mutex; ///< guards what follows
+    mutable std::mutex m_mutex; ///< guards the members below
     std::condition_variable m_changed;
-    SinkState m_state;             ///< without what belongs to the source or to the moment
-    Clock::time_point m_nextTry{}; ///< while a pause runs; else the beginning of time
+    SinkState m_state; ///< without the parts that come from the source or depend on the time
+    Clock::time_point m_nextTry{}; ///< during a pause; otherwise the epoch
     bool m_finishing = false;      ///< finish was called: pauses stay short
     bool m_ended = true;           ///< the thread's work is done
     std::stop_source m_giveUp;

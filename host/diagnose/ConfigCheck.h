@@ -10,51 +10,51 @@
 
 namespace zrm::host {
 
-/// Judges the lines of a log configuration as the agent does when it starts on this machine, with
-/// the agent's own code, and monitors nothing. Works without an agent; the process's locale and
-/// working directory count as the agent's would. Stateless.
+/// Checks the lines of a log configuration as the agent does when it starts on this machine, with
+/// the agent's own code, but monitors nothing. Works without a running agent; the process's locale
+/// and working directory apply as the agent's would. Stateless.
 class ConfigCheck {
 public:
     enum class Verdict {
         ACCEPTED,
         REFUSED,
         IGNORED,
-        OUTSIDE, ///< not judged: the file lies in none of the directories given
+        OUTSIDE, ///< not checked: the file is in none of the given directories
     };
-    /// What has decided against a line.
+    /// The reason for the verdict on a line.
     enum class Cause {
         NONE,
         TEXT, ///< the line itself
-        FILE, ///< the file that it names, as it is at present
+        FILE, ///< the current state of the file that it names
     };
 
     struct Line {
         std::size_t number; ///< counted from 1
-        std::string text;   ///< as it stands in the configuration, without its newline
+        std::string text;   ///< as in the configuration, without its newline
         Verdict verdict;
-        std::string log;    ///< the file that it names, where it names one; UTF-8
-        std::string reason; ///< the agent's messages, where it has some; also of accepted lines
+        std::string log;    ///< the file that it names, if any; UTF-8
+        std::string reason; ///< the agent's messages, if any, also for accepted lines
         Cause cause;
     };
 
     struct Result {
-        std::vector<Line> lines; ///< every line of the text
+        std::vector<Line> lines; ///< all lines of the text
         std::size_t accepted;
         std::size_t refused;
     };
 
-    /// Judges a log configuration. A user log whose format cannot be learned is refused too: the
-    /// agent would list that log, but never read it. Any thread.
+    /// Checks a log configuration. A user log with an invalid format is refused, too: the agent
+    /// would list that log, but never read it. Any thread.
     static Result check(std::string_view text);
 
     /// Directories with their last '/'.
     using Directories = std::set<std::string, std::less<>>;
-    /// The same for whoever may not learn which files this machine has: of a line whose file lies
-    /// in none of the directories, nothing is looked at.
+    /// The same for callers who must not learn which files exist on this machine: a line whose file
+    /// is in none of the directories is not checked at all.
     static Result check(std::string_view text, const Directories& directories);
 
     /// Why a log cannot be read from this path, as a sentence without its full stop; empty when it
-    /// can. Names no system call: it is meant for people who write configurations.
+    /// can. Names no system call, since it is meant for authors of configurations.
     static std::string problemOfFile(const std::string& path);
 
     /// "accepted", "refused", "ignored" or "outside".
@@ -62,7 +62,7 @@ public:
     /// "text" or "file"; null for none.
     static const char* name(Cause cause) noexcept;
 
-    /// A result as the JSON object that the API answers.
+    /// A result as the JSON object that the API returns.
     static std::string json(const Result& result);
 };
 

@@ -27,7 +27,7 @@ ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log
     }
 }
 
-/// `begin` is where the specifier begins in the original.
+/// `begin` is the offset of the specifier in the original.
 void ConfiguredFormat::expand(std::size_t begin) {
     std::string configured = m_written;
     const std::size_t firstBlank = configured.find_first_of(blanks);

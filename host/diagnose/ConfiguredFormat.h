@@ -8,34 +8,34 @@
 
 namespace zrm::host {
 
-/// A format specifier as the agent gets it when it stands in a line of the log configuration: the
-/// blanks in front are gone, a tab behind its first word is a blank, and "${@}" is the log's name.
-/// Remembers where each of its characters stood in the original.
+/// A format specifier as the agent gets it from a line of the log configuration: leading blanks are
+/// removed, a tab after its first word is a blank, and "${@}" is the log's name. Remembers the
+/// original position of each character.
 ///
-/// One that is too long for a line is not expanded: what it would take is decided by whoever wrote
-/// it, since every "${@}" may stand for a long name.
+/// A specifier that is too long for a line is not expanded: since every "${@}" may stand for a long
+/// name, its author would decide how much memory that takes.
 class ConfiguredFormat {
 public:
     /// `log` is the log's path.
     ConfiguredFormat(std::string_view format, std::string_view log);
 
-    /// Characters of the line of the log configuration, without its newline.
+    /// Length of the configuration line in characters, without its newline.
     std::size_t lineLength() const noexcept { return m_lineLength; }
-    /// Characters of what the agent learns, also where it is too long.
+    /// Length of the expanded format in characters, even if it is too long.
     std::size_t length() const noexcept { return m_length; }
     bool isTooLong() const noexcept { return m_lineLength > mostInLine || m_length > mostInLine; }
 
-    /// Why a format that has so many characters once it has the log's name is refused.
+    /// Why a format of this expanded length is refused.
     static std::string tooLong(std::size_t length);
-    /// What the agent learns; empty when it is too long.
+    /// The expanded format; empty when it is too long.
     const std::string& text() const noexcept { return m_text; }
-    /// The place in the original of the character at `position`; behind the end, of the end.
+    /// The original position of the character at `position`; past the end, that of the end.
     std::size_t original(std::size_t position) const;
     /// The line of the log configuration, without its newline.
     std::string line() const;
 
-    /// Most characters of a line of the log configuration, without its newline, and of the format
-    /// in it once it has the log's name.
+    /// The most characters of a line of the log configuration, without its newline, and of its
+    /// expanded format.
     static constexpr std::size_t mostInLine = 1022;
 
 private:
@@ -44,7 +44,7 @@ private:
     std::string m_log;
     std::size_t m_lineLength;
     std::size_t m_length;
-    std::string m_written; ///< the specifier without the blanks in front
+    std::string m_written; ///< the specifier without leading blanks
     std::string m_text;
     std::vector<std::size_t> m_original; ///< of each character, and of the end
 };

@@ -19,17 +19,17 @@ TRC1_Anchor anchor{"FormatTrial.cpp"};
 
 using Row = zrm_rmlogent_data_t;
 
-constexpr std::size_t longestPiece = 2047; ///< bytes that the agent reads as one line at most
+constexpr std::size_t longestPiece = 2047; ///< the most bytes that the agent reads as one line
 constexpr std::size_t mostValue = 2048;    ///< bytes of a printed value that are shown
 constexpr std::string_view countDirective = "%n";
 
-/// The column of each field name, in the order of the names.
+/// The column for each field name, in the order of the names.
 constexpr const char* columnOfField[] = {
     "ENTRYTIME", "ENTRYTIME", "ENTRYTIME", "ENTRYTIME",  "ENTRYTIME", "ENTRYTIME",
     "ENTRYSYS",  "ENTRYSRC",  "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC",
 };
 
-/// The columns that a line fills.
+/// The columns filled from a line.
 const std::array<RowColumn, 8>& entryColumns() {
     static const auto* const columns = new std::array<RowColumn, 8>{{
         {"ENTRYTIME", offsetof(Row, entrytime), sizeof Row::entrytime, COLUMN_CHARACTER},
@@ -44,7 +44,7 @@ const std::array<RowColumn, 8>& entryColumns() {
     return *columns; // never destroyed: threads outlive main
 }
 
-/// A scan directive in its two parts: the literal text in front, and the conversion.
+/// A scan directive in two parts: the literal text before it, and the conversion.
 struct Parts {
     explicit Parts(std::string_view directive) {
         std::size_t at = 0;
@@ -61,7 +61,7 @@ struct Parts {
     std::string_view conversion;
 };
 
-/// Why a line does not fit a directive.
+/// Why a line does not match a directive.
 std::string mismatch(const StringParser& directive, const StringParser::Place& place,
                      bool isAtEnd) {
     const Parts parts(directive.scanDirective());
@@ -84,7 +84,7 @@ std::string mismatch(const StringParser& directive, const StringParser::Place& p
     return where + wanted + " is expected here.";
 }
 
-/// Why a format without a message of the agent cannot be learned.
+/// Why a format is invalid for which the agent has no message.
 std::string refusal(const std::string& format, std::size_t position) {
     if (position >= format.size()) {
         return "The format ends too early: a double quote or the rest of a directive is missing.";
@@ -126,7 +126,7 @@ FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_form
 }
 
 FormatTrial::~FormatTrial() {
-    const TraceCapture quiet; // the end of a log is traced, too
+    const TraceCapture quiet; // destroying the log traces, too
     m_log.reset();
 }
 
@@ -172,7 +172,7 @@ FormatTrial::Line FormatTrial::scan(std::string_view line) {
     return scanPiece((std::string(line) + '\n').substr(0, longestPiece));
 }
 
-/// `piece` is a line as the agent reads it, with its line end where it has one.
+/// `piece` is a line as the agent reads it, including its line end, if any.
 FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
     TraceScope trace(anchor);
     TraceCapture errors;
@@ -198,7 +198,7 @@ FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
     return line;
 }
 
-/// Goes through the directives one by one, as the scan does, up to the one that does not fit.
+/// Applies the directives one by one, as the scan does, up to the one that does not match.
 void FormatTrial::explain(const char* text, Line& line) const {
     if (text[0] != '\0' && text[1] == '\0') {
         line.failedAt = 0;
@@ -223,7 +223,7 @@ void FormatTrial::explain(const char* text, Line& line) const {
             _FormatBuffer buffer{value.data(), static_cast<long>(value.size())};
             node->printValue(buffer);
             const Directive& directive = m_result.directives[index];
-            const std::size_t length = line.line.size(); // a value may take the line end
+            const std::size_t length = line.line.size(); // a value may include the line end
             line.fields.push_back(
                 {std::min(place.value, length), std::min(place.end, length), directive.field,
                  directive.column,
@@ -251,14 +251,14 @@ FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<
 }
 
 std::size_t FormatTrial::piecesOf(std::string_view line) noexcept {
-    return line.size() / longestPiece + 1; // with its line end
+    return line.size() / longestPiece + 1; // including its line end
 }
 
 double FormatTrial::percent(const Result& result) noexcept {
     if (result.lines.empty()) {
         return 0;
     }
-    // Rounded down: only when all lines fit it says 100.
+    // Rounded down, so 100 means that all lines match.
     return std::floor(1000.0 * static_cast<double>(result.matched) /
                       static_cast<double>(result.lines.size())) /
            10.0;

@@ -11,7 +11,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// A line as JSON can hold it.
+/// A line in a form that JSON can represent.
 class ShownLine {
 public:
     explicit ShownLine(std::string_view line) {
@@ -26,7 +26,7 @@ public:
         m_places.push_back(text.size());
     }
 
-    /// Where a byte of the line is in the text.
+    /// The position in the text of a byte of the line.
     std::size_t place(std::size_t byte) const {
         return byte < m_places.size() ? m_places[byte] : text.size();
     }

@@ -11,7 +11,7 @@ namespace zrm::host {
 
 namespace {
 
-/// The bytes from an offset on, as many as there are; none, with errno, on an error.
+/// The bytes from an offset on, as many as there are; none, with errno set, on an error.
 std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
     std::string text(size, '\0');
     std::size_t length = 0;
@@ -25,7 +25,7 @@ std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
             return std::nullopt;
         }
         if (count == 0) {
-            break; // the file has become shorter
+            break; // the file was truncated
         }
         length += static_cast<std::size_t>(count);
     }
@@ -57,7 +57,7 @@ std::optional<std::vector<std::string>> LastLines::read(int descriptor, std::siz
     while (lines.size() < count) {
         const std::size_t before = rest.rfind('\n');
         if (before == std::string_view::npos) {
-            if (offset == 0) { // else the line's beginning was not read
+            if (offset == 0) { // otherwise the beginning of the line was not read
                 lines.emplace_back(rest);
             }
             break;

@@ -10,35 +10,35 @@
 
 namespace zrm::host {
 
-/// Something about a log, monitored without an error, that wants an operator's attention.
+/// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
     std::string kind;   ///< missing, replaced, without_time or not_records
-    std::int64_t since; ///< when it was first noticed
-    std::string text;   ///< what is wrong and the cure, in sentences
+    std::int64_t since; ///< when it was first seen
+    std::string text;   ///< what is wrong and how to fix it, in sentences
 };
 
-/// What the monitor of one log has read and what it has passed over, since the log is monitored,
-/// at one moment. A refresh that changes the log's type or procedure begins a new one. Times are
-/// in milliseconds since 1970-01-01 UTC.
+/// A snapshot of what the monitor of one log has read and skipped since monitoring began. A refresh
+/// that changes the log's type or procedure starts a new ledger. Times are in milliseconds since
+/// 1970-01-01 UTC.
 struct LogLedgerView {
-    /// A line that did not fit; its bytes, without the line end.
+    /// A line that did not match; its bytes, without the line end.
     struct Rejected {
         std::int64_t time;
         std::string line;
-        std::string reason; ///< where it stops fitting and why
+        std::string reason; ///< where and why it does not match
     };
-    /// What a truncation has kept from the monitor.
+    /// What the monitor missed because of a truncation.
     struct Skipped {
         std::int64_t time;
-        std::int64_t from; ///< bytes of the present contents
+        std::int64_t from; ///< bytes of the current contents
         std::int64_t to;
-        std::optional<std::int64_t> unread; ///< bytes of the old contents; none: not known
-        bool isRegrown; ///< the file had grown past its old size again before it was noticed
+        std::optional<std::int64_t> unread; ///< bytes of the old contents; none: unknown
+        bool isRegrown; ///< the file was already larger than before when the truncation was seen
     };
 
-    std::string log;                      ///< the whole path, in UTF-8
+    std::string log;                      ///< the full path, in UTF-8
     std::string file;                     ///< the same in the process's code page
-    std::optional<FileIdentity> openFile; ///< that the monitor reads at present
+    std::optional<FileIdentity> openFile; ///< the file that the monitor currently reads
     char type = 'S';
     std::string procedure; ///< a user log's format
     std::int64_t bytesRead = 0;
@@ -51,9 +51,9 @@ struct LogLedgerView {
     std::int64_t restarts = 0;    ///< of the monitor
     std::optional<std::int64_t> lastEntry;
 
-    std::vector<LogWarning> warnings; ///< none unless LogWatch was asked
+    std::vector<LogWarning> warnings; ///< empty unless filled in from LogWatch
 
-    // The latest, the oldest first. Only of a log that was asked for by name.
+    // The latest ones, oldest first. Only for a log that was requested by name.
     std::vector<Rejected> rejected;
     std::vector<Skipped> skipped;
 };

@@ -12,9 +12,9 @@ namespace zrm::host {
 /// Reads the ledgers of the monitored logs. Stateless.
 class LogLedgers {
 public:
-    /// The ledgers of all monitored logs in the order of the Monitored Logs table, or that of the
-    /// one log with this path alone, with the lines and ranges that it keeps; empty when it is not
-    /// monitored. May wait for a refresh to end. Any thread, while the agent runs.
+    /// The ledgers of all monitored logs in the order of the Monitored Logs table, or only that of
+    /// the log with this path, including its rejected lines and skipped ranges; empty when it is
+    /// not monitored. May wait for a refresh to end. Any thread, while the agent runs.
     static std::vector<LogLedgerView> read(std::string_view log = {});
 
     /// A ledger as a JSON object; `withSamples` adds "rejected" and "skipped".

@@ -29,7 +29,7 @@ namespace {
 TRC1_Anchor anchor{"LogWarnings.cpp"};
 
 constexpr std::size_t linesTried = 20;
-constexpr std::size_t mostBytes = 64 * 1024; ///< of the file's end that are read
+constexpr std::size_t mostBytes = 64 * 1024; ///< bytes read from the end of the file
 constexpr std::size_t recordsTried = 50;
 
 constexpr const char* syslogCure =
@@ -38,13 +38,13 @@ constexpr const char* syslogCure =
 constexpr const char* accountingCure = "Linux's wtmp has other records and cannot be read as type "
                                        "A: remove its line from the log configuration.";
 
-/// A syslog file that nobody monitors.
+/// A syslog file that is not monitored.
 class TrialSyslog : public SysLogFile {
 public:
     explicit TrialSyslog(const ValidLog& line) : SysLogFile(line, Unmonitored{}) {}
 };
 
-/// What the name of an open file has become; none while it still names it.
+/// What has become of the name of an open file; none while it still leads to the file.
 std::optional<LogWarning> ofName(const LogLedgerView& log) {
     constexpr const char* cure =
         " Rotate with copytruncate. To have the new file read, restart the agent, or remove the "

@@ -20,7 +20,7 @@ TRC1_Anchor anchor{"LogWatch.cpp"};
 
 using Warnings = std::map<std::string, std::vector<LogWarning>>;
 
-/// When a warning began, by the warnings of the look before.
+/// When a warning began, according to the previous check.
 std::optional<std::int64_t> beginOf(const Warnings& before, const std::string& log,
                                     const std::string& kind) {
     const auto found = before.find(log);
@@ -35,13 +35,13 @@ std::optional<std::int64_t> beginOf(const Warnings& before, const std::string& l
 } // namespace
 
 struct LogWatch::Shared {
-    std::mutex mutex; ///< guards what follows
+    std::mutex mutex; ///< guards the members below
     std::condition_variable changed;
     bool isEnded = false;
-    std::optional<std::vector<LogLedgerView>> logs; ///< to be looked at
+    std::optional<std::vector<LogLedgerView>> logs; ///< logs to check
     Warnings warnings;
 
-    Announce announce; ///< the thread's
+    Announce announce; ///< used by the thread
 };
 
 LogWatch::LogWatch(Announce announce) : m_shared(std::make_shared<Shared>()) {
@@ -63,7 +63,7 @@ void LogWatch::tick(Clock::time_point now,
     {
         const std::lock_guard guard(m_shared->mutex);
         if (m_shared->logs) {
-            return; // a file system holds the last look up
+            return; // a file system blocks the previous check
         }
     }
     m_next = now + interval;
@@ -73,7 +73,7 @@ void LogWatch::tick(Clock::time_point now,
     m_shared->changed.notify_all();
 }
 
-/// Starts the thread, later where there is no room for one now.
+/// Starts the thread; tries again later if none can be started now.
 bool LogWatch::begin() {
     if (!m_hasThread) {
         try {

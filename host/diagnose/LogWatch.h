@@ -12,15 +12,15 @@
 
 namespace zrm::host {
 
-/// Looks at all monitored logs every few seconds and keeps the warnings about each, so that asking
-/// for them never waits for a file system. The looking is done on a thread of its own, which knows
-/// nothing of the agent's objects: one that a file system holds up for ever is left behind.
+/// Checks all monitored logs every few seconds and keeps the warnings about each, so that reading
+/// them never blocks on a file system. The checks run on their own thread, which uses none of the
+/// agent's objects: a thread that a file system blocks forever is abandoned.
 class LogWatch {
 public:
     using Clock = std::chrono::steady_clock;
     static constexpr std::chrono::seconds interval{5};
 
-    /// Given one line when a warning begins; called on the watch's thread.
+    /// Called with one line when a warning begins, on the watch's thread.
     using Announce = std::function<void(const std::string&)>;
 
     explicit LogWatch(Announce announce);
@@ -29,13 +29,13 @@ public:
     LogWatch(const LogWatch&) = delete;
     LogWatch& operator=(const LogWatch&) = delete;
 
-    /// Begins a look when the last one is over and the interval has passed. `read` gives the logs;
-    /// it is called only then. One thread.
+    /// Starts a check if the last one is over and the interval has passed. `read` returns the logs;
+    /// it is called only then. Used by one thread.
     void tick(Clock::time_point now, const std::function<std::vector<LogLedgerView>()>& read);
 
-    /// The warnings about one log, as the last look found them. Any thread.
+    /// The warnings about one log from the last check. Any thread.
     std::vector<LogWarning> of(const std::string& log) const;
-    /// Those about all logs that have any. Any thread.
+    /// The warnings about all logs that have any. Any thread.
     std::map<std::string, std::vector<LogWarning>> all() const;
 
 private:

@@ -26,14 +26,14 @@ TRC1_Anchor anchor{"UnmonitoredLogs.cpp"};
 
 constexpr std::string_view spaces = " \t\v\f\r";
 
-/// The log that a line names.
+/// The log named in a line.
 std::string_view nameIn(std::string_view line) {
     line.remove_prefix(std::min(line.find_first_not_of(spaces), line.size()));
     return line.substr(0, line.find_first_of(" \t"));
 }
 
-/// The text without the lines of monitored logs, whose verdicts nobody asks for; the other lines
-/// keep their numbers. Empty when none is left.
+/// The text without the lines of monitored logs, which need no verdict; the other lines keep their
+/// numbers. Empty when none is left.
 std::string others(std::string_view text, const std::set<std::string>& monitored) {
     std::string left;
     bool isAnyLeft = false;
@@ -51,7 +51,7 @@ std::string others(std::string_view text, const std::set<std::string>& monitored
     return isAnyLeft ? left : std::string();
 }
 
-/// A name in UTF-8, which the API and the metrics need; the process has another code page perhaps.
+/// A name in UTF-8, as the API and the metrics need; the process may use another code page.
 std::string inUtf8(std::string_view name) {
     if (Utf8::validPrefix(name) == name.size()) {
         return std::string(name);
@@ -69,7 +69,7 @@ std::string inUtf8(std::string_view name) {
     return text;
 }
 
-/// Whether the agent remembers the configuration's modification time, which counts in seconds.
+/// Whether the agent has recorded the configuration's modification time, which is in seconds.
 bool isTakenOver(const char* path) {
     struct stat status;
     const LogManager* const manager = pTheLogManager;
@@ -102,7 +102,7 @@ UnmonitoredLogs::Result UnmonitoredLogs::read() {
         return {};
     }
     Result result{path, ConfigCheck::problemOfFile(path), {}};
-    if (!result.problem.empty()) { // a pipe would hold up who opens it
+    if (!result.problem.empty()) { // opening a pipe would block
         return result;
     }
     std::ifstream stream(path, std::ios::binary);

@@ -17,8 +17,8 @@ public:
     /// Appends one event's object, without a newline.
     void append(std::string& text, const Event& event) const;
 
-    /// Appends the whole path of the event's log: the directory and the name, as UTF-8; the
-    /// columns that keep their own code page serve where the UTF-8 ones are empty.
+    /// Appends the full path of the event's log, directory and name, as UTF-8. If the UTF-8 columns
+    /// are empty, uses the ones in the log's own code page.
     void appendLog(std::string& text, const Event& event) const;
 
 private:

@@ -9,13 +9,13 @@ namespace zrm::host {
 
 namespace {
 
-/// How long a reader that was woken lets more events gather, unless many have come before.
+/// How long a woken reader waits for more events, unless many have already arrived.
 constexpr std::chrono::milliseconds gatherTime{5};
 
 } // namespace
 
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
-    // The rows are left uninitialised: pages that no event has reached cost no memory.
+    // The rows are left uninitialised: pages not yet used by an event cost no memory.
     : m_rowSize(rowSize), m_last(last), m_events(capacity),
       m_rows(std::make_unique_for_overwrite<char[]>(capacity * rowSize)) {
     for (std::size_t slot = 0; slot < capacity; ++slot) {
@@ -65,7 +65,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
     return true;
 }
 
-/// Puts an event into the next slot of the ring, which is free.
+/// Puts an event into the next, free slot of the ring.
 void EventQueue::put(const Event& event, const char* row) {
     const std::size_t number = m_next % m_events.size();
     Event& slot = m_events[number];
@@ -83,7 +83,7 @@ void EventQueue::takeFromAside() {
     }
 }
 
-/// Who waits for room is woken when there is room for many.
+/// Threads waiting for room are woken when there is room for many events.
 void EventQueue::noteRoom() {
     const std::uint64_t used = m_next - slowest();
     const bool isFull =
@@ -114,7 +114,7 @@ void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader
         m_changed.wait_until(lock, limit, hasThem);
     }
     if (m_cursor[reader] != m_next) {
-        // Waking a thread costs more than an event does, so one wake-up is to serve many.
+        // Waking a thread costs more than an event, so one wake-up should serve many.
         m_awaited[reader] = m_cursor[reader] + quarter();
         m_changed.wait_for(lock, gatherTime, hasThem);
     }
@@ -126,7 +126,7 @@ std::span<const Event> EventQueue::read(Reader reader, std::size_t most, Clock::
     waitForEvents(lock, reader, limit);
     const std::size_t first = m_cursor[reader] % m_events.size();
     const auto waiting = static_cast<std::size_t>(m_next - m_cursor[reader]);
-    // A run ends at the ring's end, so that it is one span.
+    // Stops at the end of the ring, so that the events are one span.
     const std::size_t count = std::min({most, waiting, m_events.size() - first});
     return std::span<const Event>(m_events).subspan(first, count);
 }
@@ -138,7 +138,7 @@ void EventQueue::release(Reader reader, std::size_t count) {
         takeFromAside();
         noteRoom();
         if (isAwaited()) {
-            m_changed.notify_all(); // another reader, which waits for what stood aside
+            m_changed.notify_all(); // other readers waiting for the events kept aside
         }
     }
 }

@@ -9,23 +9,23 @@
 
 namespace zrm::host {
 
-/// Where one sink's events come from, in order and with a place that is the sink's own. read and
-/// release are called by the sink's thread, the others by any.
+/// The source of one sink's events, in order and with a position of its own. read and release are
+/// called by the sink's thread, the rest by any.
 class EventSource {
 public:
     virtual ~EventSource() = default;
 
-    /// Waits for events and gives the oldest that were not released, at most `most`. They stay as
-    /// they are until the next read. Empty only after end, when everything has been released.
+    /// Waits for events and returns the oldest unreleased ones, at most `most`. They stay unchanged
+    /// until the next read. Empty only after end, when everything has been released.
     virtual std::span<const EventRecord> read(std::size_t most) = 0;
 
-    /// Moves the place past the oldest `count` events of the last read.
+    /// Moves the position past the oldest `count` events of the last read.
     virtual void release(std::size_t count) = 0;
 
-    /// Number of events that were not released.
+    /// Number of unreleased events.
     virtual std::uint64_t backlog() const = 0;
 
-    /// Nobody adds events any more: a read gives what is left, and does not wait.
+    /// No more events are added: a read returns what is left and does not wait.
     virtual void end() = 0;
 };
 

@@ -7,14 +7,14 @@
 
 namespace zrm::host {
 
-/// The whole path of the log of a row, of either table. Any thread.
+/// The full path of a row's log, for either table. Any thread.
 class LogPath {
 public:
-    /// Appends the directory and the name, as UTF-8; the columns that keep their own code page
-    /// serve where the UTF-8 ones are empty.
+    /// Appends the directory and the name as UTF-8. If the UTF-8 columns are empty, uses the ones
+    /// in the log's own code page.
     static void append(std::string& text, const RowLayout& layout, const char* row);
 
-    /// The same as a text of its own.
+    /// The same as a new text.
     static std::string of(const RowLayout& layout, const char* row);
 };
 

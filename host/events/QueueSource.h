@@ -10,11 +10,11 @@
 
 namespace zrm::host {
 
-/// Events straight from the queue, for a sink without a history: what the sink has not taken stays
-/// in the queue.
+/// Reads events directly from the queue, for a sink without a history: what the sink has not taken
+/// stays in the queue.
 class QueueSource : public EventSource {
 public:
-    /// Takes a place among the queue's readers; the queue outlives the object.
+    /// Registers as a reader of the queue, which must outlive the object.
     QueueSource(EventQueue& queue, EventJson format);
 
     std::span<const EventRecord> read(std::size_t most) override;
@@ -26,8 +26,8 @@ private:
     EventQueue& m_queue;
     const EventQueue::Reader m_reader;
     const EventJson m_format;
-    std::vector<std::string> m_texts; ///< of one read: the events as JSON
-    std::vector<std::string> m_logs;  ///< of one read: the logs
+    std::vector<std::string> m_texts; ///< events of the last read as JSON
+    std::vector<std::string> m_logs;  ///< logs of the last read
     std::vector<EventRecord> m_records;
 };
 

@@ -7,12 +7,12 @@
 
 namespace zrm::host {
 
-/// How the queue stands between the log threads and those who take the events.
+/// The state of the queue between the log threads and its readers.
 struct QueueState {
-    std::size_t size = 0;               ///< events that somebody has still to take
-    std::size_t capacity = 0;           ///< events that find room
-    std::uint64_t waits = 0;            ///< times that a log thread had to wait for room
-    std::chrono::nanoseconds waited{0}; ///< how long in all
+    std::size_t size = 0;               ///< events that some reader has not yet taken
+    std::size_t capacity = 0;           ///< events that fit
+    std::uint64_t waits = 0;            ///< how often a log thread had to wait for room
+    std::chrono::nanoseconds waited{0}; ///< total time of these waits
 };
 
 } // namespace zrm::host

@@ -25,7 +25,7 @@ constexpr bool hasByte(std::uint64_t word, char c) {
     return hasByteBelow(word ^ (each * static_cast<unsigned char>(c)), 1);
 }
 
-/// True for eight bytes of ASCII that stand in a JSON string as they are.
+/// True for eight bytes of ASCII that need no escape in a JSON string.
 bool isPlain(std::uint64_t word) {
     return (word & highBits) == 0 && !hasByteBelow(word, ' ') && !hasByte(word, '"') &&
            !hasByte(word, '\\');
@@ -36,7 +36,7 @@ bool isPlain(char c) {
     return byte >= ' ' && byte < 0x80 && c != '"' && c != '\\';
 }
 
-/// Length of the leading part that stands as it is.
+/// Length of the leading part that needs no escape.
 std::size_t plainPrefix(std::string_view text) {
     std::size_t position = 0;
     std::uint64_t word;
@@ -53,8 +53,8 @@ std::size_t plainPrefix(std::string_view text) {
     return position;
 }
 
-/// The control characters, the quote and the backslash. Those without a letter of their own are
-/// written by number.
+/// Escapes the control characters, the quote and the backslash; numerically if they have no short
+/// form.
 void appendEscaped(std::string& out, char c) {
     constexpr std::string_view shortText = "\"\\\b\f\n\r\t";
     constexpr std::string_view letters = "\"\\bfnrt";
@@ -71,7 +71,7 @@ void appendEscaped(std::string& out, char c) {
     }
 }
 
-/// A character beyond ASCII.
+/// Appends a non-ASCII character.
 void appendCharacter(std::string& out, std::string_view sequence) {
     if (const char32_t character = Utf8::character(sequence); Utf8::isSteering(character)) {
         SteeringText::appendEscape(out, character);
@@ -80,7 +80,7 @@ void appendCharacter(std::string& out, std::string_view sequence) {
     }
 }
 
-/// Takes the first sequence, which does not stand as it is in ASCII, off the text.
+/// Removes the first sequence, which needs an escape or is not ASCII, from the text.
 void appendSpecial(std::string& out, std::string_view& text) {
     const Utf8::Sequence sequence = Utf8::firstSequence(text);
     if (!sequence.valid) {

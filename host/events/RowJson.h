@@ -8,11 +8,11 @@
 
 namespace zrm::host {
 
-/// Writes rows as JSON, at the speed of events. Any thread.
+/// Writes rows as JSON, fast enough for every event. Any thread.
 class RowJson {
 public:
     /// Appends one row as an object: the columns under their upper-case names in table order,
-    /// character columns as RowText gives them, integers as numbers.
+    /// character columns as returned by RowText, integers as numbers.
     static void append(std::string& out, const RowLayout& layout, const char* row);
 
     /// Appends a text as a JSON string; bytes that are not UTF-8 become U+FFFD.

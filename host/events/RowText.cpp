@@ -8,7 +8,7 @@ namespace zrm::host {
 
 namespace {
 
-/// No character of one byte takes more bytes in UTF-8, and no longer one takes more for each.
+/// No single-byte character needs more bytes in UTF-8, and no longer one needs more per byte.
 constexpr std::size_t maxGrowth = 3;
 
 const LOC2_Locale& codeSetOf(const RowColumn& column) {

@@ -8,13 +8,13 @@
 
 namespace zrm::host {
 
-/// Character columns as people and other systems read them. Any thread.
+/// Character columns as text for people and other systems. Any thread.
 class RowText {
 public:
-    /// The column's text without padding, in valid UTF-8: a view into the row where it is that
-    /// already, else into `room`, which is overwritten. Text that is not UTF-8 is taken to be in
-    /// the process's code page, a column of type UTF-8 excepted; what is valid in neither is
-    /// replaced by U+FFFD.
+    /// The column's text without padding, in valid UTF-8: a view into the row if it is already
+    /// valid, otherwise into `room`, which is overwritten. Text that is not UTF-8 is assumed to be
+    /// in the process's code page, except in columns of type UTF-8; what is valid in neither
+    /// becomes U+FFFD.
     static std::string_view of(const RowColumn& column, const char* row, std::string& room);
 };
 

@@ -5,8 +5,8 @@
 
 namespace zrm::host {
 
-/// What a situation writes on its events. Immutable; shared by the situation and by its events that
-/// are still on their way.
+/// What a situation adds to its events. Immutable; shared by the situation and its undelivered
+/// events.
 struct SituationLabel {
     std::string name;
     std::string severity;  ///< info, minor, warning, major or critical

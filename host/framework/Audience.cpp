@@ -13,10 +13,10 @@ namespace {
 
 constexpr std::size_t wordSize = sizeof(std::uint64_t);
 
-/// Logs come and go; what is known of those that went is forgotten once there are so many.
+/// Logs come and go; the cache is cleared once it has this many.
 constexpr std::size_t mostLogs = 8192;
 
-/// A word whose first `length` bytes in memory are those of the text, the others 0.
+/// A word whose first `length` bytes in memory are those of the text, and the rest 0.
 std::uint64_t wordOf(std::string_view text, std::size_t length) noexcept {
     char bytes[wordSize] = {};
     std::memcpy(bytes, text.data(), length);
@@ -52,7 +52,7 @@ LinkedList& Audience::of(char* row, std::size_t rowSize) {
     return m_chosen;
 }
 
-/// Finds the members whose beginning and checks the row meets, in their order in the list.
+/// Finds the members whose prefix and checks the row meets, in list order.
 void Audience::findMet(char* row) {
     m_met.clear();
     bool isSorted = true;
@@ -94,7 +94,7 @@ const Audience::Groups& Audience::groupsOf(char* row) {
     return recent->second;
 }
 
-/// Whether the row is one of the log's.
+/// Whether the row belongs to the log.
 bool Audience::isOf(const char* row, const std::string& log) const noexcept {
     const char* bytes = log.data();
     for (const Span& span : m_logColumns) {
@@ -122,7 +122,7 @@ const Audience::Logs::value_type& Audience::findLog(char* row) {
     return *m_logs.emplace(std::move(log), groupsThatMean(row)).first;
 }
 
-/// The members whose conditions on the log hold for a row of it.
+/// The members whose conditions on the log hold for its rows.
 Audience::Groups Audience::groupsThatMean(char* row) {
     Groups groups;
     const auto groupOf = [&groups](const Beginning& beginning) -> Group& {

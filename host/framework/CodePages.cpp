@@ -12,7 +12,7 @@ constexpr bool multiByteSet = false;
 
 constexpr LOC2_Locale unknown{"", 0, singleByteSet};
 
-// Where several names have one number, the first is the one that iconv is asked for.
+// If several names have the same number, the first one is passed to iconv.
 constexpr LOC2_Locale codeSets[] = {
     {"UTF-8", LOC2_UTF8, multiByteSet},
     {"ANSI_X3.4-1968", LOC2_ASCII, singleByteSet},

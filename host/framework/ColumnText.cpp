@@ -10,7 +10,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Most columns are mostly padding, so eight blanks are taken at a time.
+/// Most columns are mostly padding, so eight blanks are compared at a time.
 constexpr std::uint64_t blanks = 0x2020202020202020;
 
 std::uint64_t wordAt(const char* bytes) noexcept {

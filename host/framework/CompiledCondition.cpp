@@ -21,11 +21,11 @@ namespace {
 
 TRC1_Anchor anchor{"CompiledCondition.cpp"};
 
-/// For the program of a pattern and its states that have come up in matching, bytes.
+/// Memory for a pattern's program and its cached matching states, in bytes.
 constexpr std::int64_t patternMemory = 2 * 1024 * 1024;
 
-/// The columns that name a log. Most situations are on one log, and most rows are another's; names
-/// differ more than directories do.
+/// The columns that name a log. Most situations are for one log, and most rows come from others;
+/// names differ more than directories.
 constexpr std::pair<std::string_view, int> logColumns[] = {
     {"LOGNAME", 1}, {"ULOGNAME", 1}, {"LOGPATH", 2}, {"ULOGPATH", 2}};
 
@@ -59,8 +59,8 @@ std::string_view cut(std::string_view value, const RowColumn& column) {
                                       : value.substr(0, column.width);
 }
 
-/// Columns in the local code page are matched byte by byte where that is not UTF-8; the pattern
-/// must be ASCII then.
+/// Columns in a local code page other than UTF-8 are matched byte by byte; the pattern must then be
+/// ASCII.
 bool isByteMatch(const RowColumn& column, std::string_view pattern) {
     return column.type != COLUMN_UTF8 && Utf8::asciiPrefix(pattern) == pattern.size() &&
            LOC2_GetLocaleNumInfo(LOC2_GetLocale(0, 0, 0, nullptr), LOC2_CODEPAGE, nullptr) !=
@@ -158,7 +158,7 @@ int CompiledCondition::rankOf(const RowColumn* column) const noexcept {
             return rank;
         }
     }
-    // The kinds stand in the order of their cost; one that never holds spares all others.
+    // The kinds are ordered by cost; a condition that never holds makes all others unnecessary.
     return m_kind == Kind::NEVER ? 0 : 2 + static_cast<int>(m_kind);
 }
 
@@ -228,7 +228,7 @@ bool CompiledCondition::holdsFor(const char* row, std::string_view text) const n
 }
 
 bool CompiledCondition::isEqual(const char* field) const noexcept {
-    // The value holds no NUL, so where its bytes are the field's, the field's text reaches as far.
+    // The value contains no NUL, so if the bytes are equal, the field's text is at least as long.
     const std::size_t length = m_value.size();
     return std::memcmp(field, m_value.data(), length) == 0 &&
            ColumnText::isPadding(field + length, m_width - length);
@@ -239,7 +239,7 @@ bool CompiledCondition::startsWith(const char* field) const noexcept {
     if (length > m_width || std::memcmp(field, m_value.data(), length) != 0) {
         return false;
     }
-    // A value that ends in a blank must not be met by padding.
+    // Padding must not match a value that ends in a blank.
     return length == 0 || m_value.back() != ' ' ||
            ColumnText::unpadded(field, m_width).size() >= length;
 }

@@ -18,15 +18,15 @@ class ctreq;
 
 namespace zrm::host {
 
-/// One condition made ready for evaluation: the column found, numbers read, the pattern compiled.
-/// A column compares without its padding; a value longer than the column is cut to the column's
-/// width when it is compared by order, since that is all the column can hold. A condition that
-/// makes no sense (no number for an integer column, a bad pattern, an unknown operator) never
-/// holds. Evaluation neither locks nor allocates, patterns excepted: these are RE2's.
+/// One condition prepared for evaluation: column found, numbers parsed, pattern compiled. A column
+/// is compared without its padding; a value longer than the column is cut to the column's width
+/// when compared by order, since that is all the column can hold. An invalid condition (no number
+/// for an integer column, a bad pattern, an unknown operator) never holds. Evaluation neither locks
+/// nor allocates, except in RE2 for patterns.
 class CompiledCondition {
 public:
-    /// `column` is null for a column that the table does not describe: then the table itself is
-    /// asked. The filter's texts must outlive the object.
+    /// `column` is null for a column that the table does not describe: then the table itself
+    /// evaluates it. The filter's texts must outlive the object.
     CompiledCondition(const SEL1_FILTERINFO& filter, const RowColumn* column);
     CompiledCondition(CompiledCondition&&) noexcept;
     CompiledCondition& operator=(CompiledCondition&&) noexcept;
@@ -35,24 +35,24 @@ public:
     /// Whether the row meets the condition. `request` is asked about columns unknown here.
     bool holds(ctreq* request, char* row) const;
 
-    /// The same for a condition of which isOnText() tells, with the text of its column in that row
+    /// The same for a condition with isOnText(), given the text of its column in that row
     /// (ColumnText::unpadded).
     bool holdsFor(const char* row, std::string_view text) const noexcept;
 
-    /// True for a condition on a column that names a log: what it says of a row is the same for all
-    /// rows of that log.
+    /// True for a condition on a column that names a log: its result is the same for all rows of
+    /// that log.
     bool isOnLog() const noexcept { return m_isOnLog; }
     bool neverHolds() const noexcept { return m_kind == Kind::NEVER; }
     /// True for a condition on a character column that is cheap to evaluate.
     bool isOnText() const noexcept;
-    /// What the column must begin with, as far as it is wide, for the condition to hold; of one on
-    /// a character column. Empty when that cannot be said.
+    /// For a condition on a character column: the prefix, cut to the column's width, without which
+    /// the condition cannot hold. Empty when there is none.
     std::string_view prefix() const noexcept;
-    /// Place of the column in the row, bytes.
+    /// Offset of the column in the row, in bytes.
     std::size_t offset() const noexcept { return m_offset; }
     std::size_t width() const noexcept { return m_width; }
 
-    /// Rank in the order of evaluation: what is cheap and refuses most comes first.
+    /// Rank in the order of evaluation: cheap conditions that refuse most rows come first.
     int rank() const noexcept { return m_rank; }
 
 private:

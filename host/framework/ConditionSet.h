@@ -9,15 +9,15 @@ namespace zrm::host {
 
 class FilterList;
 
-/// The conditions of one request on its rows, ready for evaluation, in the order in which a row is
-/// refused soonest. The thresholds of a situation are not among them. Immutable once built; the
-/// filters and the request must outlive it.
+/// The conditions of one request on its rows, prepared for evaluation and ordered so that rows are
+/// refused as early as possible. A situation's thresholds are not included. Immutable once built;
+/// the filters and the request must outlive it.
 class ConditionSet {
 public:
-    /// Asks the request for its columns, so it must be fully constructed.
+    /// Asks the request for its columns, so the request must be fully constructed.
     ConditionSet(const FilterList& filters, ctreq& request);
 
-    /// True when every condition holds; so also when there is none.
+    /// True when every condition holds, also when there is none.
     bool holds(char* row) const;
 
     /// In the order of evaluation.

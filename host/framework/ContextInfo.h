@@ -7,14 +7,14 @@ namespace zrm::host {
 
 class RequestCounts;
 
-/// Receives what a request dispatches. For a situation this is called on a log's thread under the
-/// table manager's lock and may wait while the event queue is full; for a report on the thread
+/// Receives what a request dispatches. For a situation it is called on a log's thread under the
+/// table manager's lock and may wait while the event queue is full; for a report, on the thread
 /// that takes the sample.
 class RowReceiver {
 public:
     virtual ~RowReceiver() = default;
-    /// Takes `count` rows (back to back, request.rowSize bytes each); copies what it keeps.
-    /// Returns 0 or a status.
+    /// Takes `count` contiguous rows of request.rowSize bytes each; copies what it keeps. Returns 0
+    /// or a status.
     virtual unsigned receive(const ctreq& request, const char* rows, unsigned count) = 0;
     /// The agent has marked the request as stopped (reason of ctreq::Stopped).
     virtual void stopped(const ctreq& request, unsigned reason) = 0;
@@ -22,10 +22,10 @@ public:
 
 } // namespace zrm::host
 
-/// The surroundings of a request: where its rows go and where it counts. Outlives the request.
+/// The context of a request: where its rows go and where it counts. Must outlive the request.
 class ContextInfo {
 public:
-    /// Without counts of its opener's, which outlive it, the request keeps its own.
+    /// Without counts from its opener, which must outlive it, the request keeps its own.
     explicit ContextInfo(zrm::host::RowReceiver& receiver,
                          zrm::host::RequestCounts* counts = nullptr)
         : m_receiver(receiver), m_counts(counts) {}

@@ -17,13 +17,13 @@ std::string_view substituteOf(const LOC2_Locale& codeSet) noexcept {
     return codeSet.singleByte ? "\x1A" : "?";
 }
 
-/// The target of one conversion and how far it is filled.
+/// The target of one conversion and its fill level.
 class Target {
 public:
     Target(const LOC2_Locale& codeSet, char* data, std::size_t size) noexcept
         : m_data(data), m_size(size), m_substitute(substituteOf(codeSet)) {}
 
-    /// Appends a text of single-byte characters as far as it fits; true when it fits whole.
+    /// Appends as much of a text of single-byte characters as fits; true when all of it fits.
     bool put(std::string_view text) noexcept {
         const std::size_t fitting = std::min(text.size(), room());
         std::copy_n(text.data(), fitting, m_data + m_written);
@@ -95,17 +95,17 @@ std::size_t refusedLength(const LOC2_Locale& from, std::string_view source, int 
     return error == EINVAL ? source.size() : 1;
 }
 
-/// One call of iconv on the rest of the source, or, without a source, for what the converter still
-/// holds back. Returns 0, or errno.
+/// One call of iconv on the rest of the source or, without a source, to flush the converter.
+/// Returns 0, or errno.
 int step(iconv_t converter, Target& target, std::string_view* source) noexcept {
-    // A character that does not fit may have been begun: what it has overwritten is put back.
+    // A character that does not fit may be partly written: restore what it has overwritten.
     constexpr std::size_t maxCharacter = 8;
     char saved[maxCharacter];
     const std::size_t savedSize = std::min(target.room(), maxCharacter);
     char* const limit = target.end() + target.room();
     std::copy_n(limit - savedSize, savedSize, saved);
 
-    // iconv does not write to its source, whatever its declaration says.
+    // iconv does not write to its source despite its declaration.
     char* in = source != nullptr ? const_cast<char*>(source->data()) : nullptr;
     std::size_t inLeft = source != nullptr ? source->size() : 0;
     char* out = target.end();
@@ -144,7 +144,7 @@ bool convertWith(iconv_t converter, Target& target, const LOC2_Locale& from,
 Converted Converter::convert(const LOC2_Locale& to, char* target, std::size_t targetSize,
                              const LOC2_Locale& from, std::string_view source) noexcept {
     Target out(to, target, targetSize);
-    // Most text is ASCII, which every code set holds as it is.
+    // Most text is ASCII, which is the same in every code set.
     const std::size_t ascii = Utf8::asciiPrefix(source);
     if (!out.put(source.substr(0, ascii))) {
         return {out.written(), false};

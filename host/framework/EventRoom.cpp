@@ -12,7 +12,7 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-/// How often a thread that waits looks whether its row is still wanted.
+/// How often a waiting thread checks whether its row is still wanted.
 constexpr std::chrono::milliseconds lookInterval{250};
 
 struct Room {
@@ -21,13 +21,13 @@ struct Room {
     bool isHeld = false;
     bool isFull = false;
     bool isClosed = false;
-    unsigned waiting = 0;          ///< threads that wait for a full queue
-    Clock::duration begins{};      ///< the sum of the times at which they began
-    EventRoomControl::Waits ended; ///< how long those that are over took; the number of all
+    unsigned waiting = 0;          ///< threads waiting because the queue is full
+    Clock::duration begins{};      ///< sum of the times at which their waits began
+    EventRoomControl::Waits ended; ///< total time of finished waits; number of all waits
     std::atomic<std::uint64_t> passedOver{0};
 };
 
-/// Never destroyed: log threads may wait while the process exits.
+/// Never destroyed: log threads may still wait while the process exits.
 Room& room() {
     static auto* const theRoom = new Room;
     return *theRoom;

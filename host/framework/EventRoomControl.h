@@ -6,27 +6,27 @@
 
 namespace zrm::host {
 
-/// The host's side of EventRoom: who decides whether there is room. Any thread.
+/// The host's side of EventRoom, which decides whether there is room. Any thread.
 namespace EventRoomControl {
 
-/// Waits for room so far, those under way included.
+/// The waits for room so far, including current ones.
 struct Waits {
     std::uint64_t count = 0;
     std::chrono::nanoseconds waited{0};
 };
 
-/// Lets nothing be offered until open: from before the first log is monitored.
+/// Holds back all rows until open. Called before the first log is monitored.
 void hold();
-/// The situations are open; takes back a close too, for the next begin in one process.
+/// The situations are open. Also undoes a close, for the next begin in the same process.
 void open();
-/// Nothing is offered any more; whoever waits is released.
+/// No more rows are offered; waiting threads are released.
 void close();
-/// The queue of events is full, or has room again.
+/// The event queue is full or has room again.
 void setFull(bool isFull);
 
 /// The waits for a full queue.
 Waits waits();
-/// Entries that were passed over since the process is ending.
+/// The number of entries skipped because the process is ending.
 std::uint64_t passedOver() noexcept;
 
 } // namespace EventRoomControl

@@ -8,7 +8,7 @@ namespace zrm::host {
 
 namespace {
 
-/// The agent takes a time stamp as 16 bytes, whatever the length of the value.
+/// The agent reads a time stamp as 16 bytes, whatever the length of the value.
 constexpr std::size_t readable = 16;
 constexpr std::size_t maxLength = std::numeric_limits<std::int16_t>::max();
 
@@ -28,7 +28,7 @@ std::string joined(const std::vector<std::string>& values) {
     return result;
 }
 
-/// The bytes that a condition compares with; a text ends at its first NUL.
+/// The bytes that a condition compares; a text ends at its first NUL.
 std::string valueOf(const Condition& condition) {
     if (condition.isNumber && condition.op != INTF_IN) {
         return numberValue(condition.number);
@@ -41,13 +41,13 @@ std::string valueOf(const Condition& condition) {
 } // namespace
 
 FilterList::FilterList(const std::vector<Condition>& conditions) {
-    // The filters point into the values, which therefore must not move.
+    // The filters point into the values, so these must not move.
     m_values.reserve(conditions.size());
     m_filters.reserve(conditions.size());
     for (const Condition& condition : conditions) {
         std::string& value = m_values.emplace_back(valueOf(condition));
         const auto length = static_cast<std::int16_t>(value.size());
-        // With NULs: ColumnIsException is handed a value without its length.
+        // Padded with NULs: ColumnIsException gets a value without its length.
         value.resize(std::max(value.size(), readable));
         const bool isNumber = condition.isNumber && condition.op != INTF_IN;
         m_filters.push_back({condition.column.c_str(), condition.op,

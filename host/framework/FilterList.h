@@ -12,10 +12,10 @@ namespace zrm::host {
 /// Data type of text filter values.
 inline constexpr std::int16_t SEL1_CHARACTER = 452;
 
-/// A request's conditions in the form in which the agent reads them. A number is published as 8
-/// bytes in host order. A text is published without padding and with a NUL behind it; 16 bytes can
-/// be read whatever its length. The values of INTF_IN are one text with a newline between them,
-/// which no log entry holds. Not locked: one thread walks at a time.
+/// A request's conditions in the form that the agent reads. A number is published as 8 bytes in
+/// host order. A text is published without padding, followed by a NUL; 16 bytes are readable
+/// whatever its length. The values of INTF_IN are one text, separated by newlines, which no log
+/// entry contains. Not locked: one thread iterates at a time.
 class FilterList {
 public:
     /// The conditions must outlive the list.
@@ -23,9 +23,9 @@ public:
     FilterList(const FilterList&) = delete;
     FilterList& operator=(const FilterList&) = delete;
 
-    /// The next condition of the walk; null at its end.
+    /// The next condition; null after the last one.
     SEL1_FILTERINFO* next() noexcept;
-    /// Starts the walk afresh.
+    /// Restarts the iteration.
     void reset() noexcept { m_position = 0; }
 
     const std::vector<SEL1_FILTERINFO>& all() const noexcept { return m_filters; }

@@ -25,7 +25,7 @@ struct Slot {
     std::uint32_t nextFree = none; ///< guarded by the mutex
 };
 
-// Constant-initialised and without destructors: requests are used while the process exits.
+// Constant-initialised and without destructors: requests are still used while the process exits.
 std::atomic<Slot*> g_chunks[chunks];
 constinit std::mutex g_mutex;
 // The free slots, oldest first; guarded by the mutex.
@@ -146,7 +146,7 @@ void HandleTable::close(unsigned handle) noexcept {
             return;
         }
     } while (!slot->state.compare_exchange_weak(state, state | closed, std::memory_order_relaxed));
-    // Acquire pairs with the release of the last unpin: what its holder did is done.
+    // Acquire pairs with the release of the last unpin, making its holder's writes visible.
     while (((state = slot->state.load(std::memory_order_acquire)) & pins) != 0) {
         slot->state.wait(state, std::memory_order_acquire);
     }

@@ -6,7 +6,7 @@ namespace zrm::host {
 
 namespace {
 
-// A process converts between UTF-8 and its own code set, one way and the other.
+// A process converts between UTF-8 and its own code set, in both directions.
 constexpr unsigned entries = 4;
 
 struct Entry {
@@ -19,8 +19,8 @@ thread_local Entry t_entries[entries];
 thread_local unsigned t_used = 0;
 thread_local unsigned t_oldest = 0;
 
-/// Closes the thread's converters at its end. The entries themselves need no destructor, so that
-/// they can be used after it has run.
+/// Closes the thread's converters when it ends. The entries themselves have no destructor, so they
+/// can be used afterwards.
 struct Closer {
     ~Closer() {
         while (t_used > 0) {
@@ -28,7 +28,7 @@ struct Closer {
         }
         t_oldest = 0;
     }
-    /// The first call in a thread makes sure that the destructor runs at the thread's end.
+    /// The first call in a thread registers the destructor to run when the thread ends.
     void arm() noexcept {}
 };
 
@@ -54,7 +54,7 @@ iconv_t IconvCache::find(const LOC2_Locale& to, const LOC2_Locale& from) noexcep
             return entry.converter;
         }
     }
-    // Opening may read files.
+    // iconv_open may read files.
     const CancellationOff guard;
     const iconv_t converter = iconv_open(to.codeSet.data(), from.codeSet.data());
     if (converter != none()) {

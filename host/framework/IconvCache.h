@@ -7,8 +7,8 @@
 
 namespace zrm::host {
 
-/// The calling thread's open converters. They close when the thread ends; a conversion that a
-/// thread makes later still, while the process exits, opens its converter afresh.
+/// The calling thread's open converters. They are closed when the thread ends; a later conversion
+/// on that thread, while the process exits, reopens its converter.
 namespace IconvCache {
 
 /// What iconv_open returns when it fails.
@@ -16,7 +16,7 @@ inline iconv_t none() noexcept {
     return reinterpret_cast<iconv_t>(-1);
 }
 
-/// The converter of this pair in its initial state; none() when the system has no such converter.
+/// The converter for this pair in its initial state; none() when the system has no such converter.
 iconv_t find(const LOC2_Locale& to, const LOC2_Locale& from) noexcept;
 
 } // namespace IconvCache

@@ -32,7 +32,7 @@ std::uint32_t statusOf(const Converted& converted) noexcept {
 LOC2_Locale* LOC2_GetLocale(int /*category*/, int /*territory*/, int /*flags*/,
                             std::uint32_t* status) {
     report(status, STATUS_OK);
-    // The agent's handle is not const; nobody writes through it.
+    // The agent's handle is not const, but nothing writes through it.
     return const_cast<LOC2_Locale*>(CodePages::byName(nl_langinfo(CODESET)));
 }
 
@@ -73,7 +73,7 @@ std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
                                   const char* source, std::uint32_t sourceLength,
                                   std::uint32_t* resultLength, int flags, std::uint32_t* status) {
     const bool terminates = (flags & LOC2_NO_TERMINATOR) == 0;
-    // Nearly all text is this: ASCII, which every known code page holds as it is, and it fits.
+    // The common case: ASCII, which is the same in every known code page, and it fits.
     if (!terminates && sourceLength > 0 && sourceLength <= targetSize &&
         CodePages::isKnown(targetCodePage) && CodePages::isKnown(sourceCodePage) &&
         Utf8::isAscii({source, sourceLength})) {

@@ -12,7 +12,7 @@ namespace {
 
 TRC1_Anchor anchor{"Locks.cpp"};
 
-/// Going on without the lock would corrupt what it guards, so a lock that fails ends the process.
+/// Continuing without the lock would corrupt what it guards, so a failing lock ends the process.
 [[noreturn]] void fail(const char* call, int code) {
     const ErrorText error(code);
     TRC1_Printf(anchor, __LINE__, "Error calling %s(); Return code = %d; %s", call, error.number(),

@@ -16,7 +16,7 @@ Request::Request(TableManager& manager, RequestDetail detail, RowReceiver& recei
     if (m_request != nullptr && m_request->handle() == 0) {
         m_request.reset();
     }
-    // A report in the list would be handed live rows while it samples.
+    // A report in the list would get live rows while it samples.
     if (m_request != nullptr && isSituation()) {
         const LockGuard guard(m_manager.lock());
         m_manager.requests().Add(m_request.get());

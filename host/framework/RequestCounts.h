@@ -6,11 +6,11 @@
 
 namespace zrm::host {
 
-/// What a request has judged so far. One thread counts at a time, the one that the request is used
-/// by; any thread reads.
+/// The number of rows that a request has judged so far. Written by one thread at a time, the one
+/// that uses the request; read by any thread.
 class RequestCounts {
 public:
-    /// Also the rows that the request was spared because it would have refused them.
+    /// Includes the rows that the request was not offered because it would have refused them.
     std::uint64_t judged() const noexcept {
         return m_judged.load(std::memory_order_relaxed) + spared();
     }
@@ -20,10 +20,10 @@ public:
     void countJudged() noexcept { count(m_judged); }
     void countMatched() noexcept { count(m_matched); }
 
-    // While a situation is open, its table's Audience counts the rows of all logs, and which of
-    // them the situation was offered; the difference was spared it.
+    // While a situation is open, its table's Audience counts the rows of all logs and those that
+    // the situation was offered; the difference was skipped.
 
-    /// From now on rows are counted in `rows`; once more changes nothing.
+    /// From now on rows are counted in `rows`; a second call changes nothing.
     void joinAudience(const std::atomic<std::uint64_t>& rows) noexcept {
         if (m_rows.load(std::memory_order_relaxed) == nullptr) {
             m_offered.store(rows.load(std::memory_order_relaxed), std::memory_order_relaxed);
@@ -40,14 +40,14 @@ public:
     }
 
 private:
-    /// A row is counted before it is offered, and so the other way round here: never negative.
+    /// A row is counted before it is offered, so it is read here in reverse order: never negative.
     std::uint64_t spared() const noexcept {
         const std::atomic<std::uint64_t>* const rows = m_rows.load(std::memory_order_acquire);
         const std::uint64_t offered = m_offered.load(std::memory_order_acquire);
         return rows != nullptr ? rows->load(std::memory_order_relaxed) - offered : 0;
     }
 
-    /// Without a locked instruction: there is one writer.
+    /// Needs no locked instruction, since there is only one writer.
     static void count(std::atomic<std::uint64_t>& counter) noexcept {
         counter.store(counter.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
     }

@@ -7,8 +7,8 @@
 #include <string>
 #include <vector>
 
-/// What a request asks for: its name, kind and conditions. Built by whoever opens a request and
-/// kept alive until the request object is destroyed; immutable meanwhile.
+/// What a request asks for: its name, kind and conditions. Built by the opener of a request and
+/// kept alive until the request is destroyed; immutable meanwhile.
 class RequestDetail {
 public:
     std::string name; ///< the situation's name, or the report's label

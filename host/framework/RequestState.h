@@ -18,7 +18,7 @@ class ctreq::Framework {
     zrm::host::RequestCounts m_ownCounts;
 
 public:
-    /// Both outlive the object, and so do the context's counts where it has any.
+    /// Both must outlive the object, and so do the context's counts where it has any.
     Framework(const RequestDetail& detail, ContextInfo& context)
         : filters(detail.conditions), receiver(context.receiver()),
           counts(context.counts() != nullptr ? *context.counts() : m_ownCounts) {}
@@ -36,7 +36,7 @@ public:
     zrm::host::RowReceiver& receiver;
     zrm::host::RequestCounts& counts;
     std::atomic<bool> stopped{false};
-    std::size_t capacity = 0; ///< rows that fit into the memory of the data array
+    std::size_t capacity = 0; ///< rows that fit into the allocated data array
 };
 
 #endif

@@ -10,7 +10,7 @@ namespace zrm::host {
 
 namespace {
 
-/// The tables give internal names, which are the public ones in lower case.
+/// The tables return internal names, which are the public ones in lower case.
 std::string upperCase(std::string_view name) {
     std::string result(name);
     std::transform(result.begin(), result.end(), result.begin(), [](char c) {

@@ -15,7 +15,7 @@ namespace zrm::host {
 
 /// One column of a table's rows.
 struct RowColumn {
-    std::string name; ///< upper-case, as conditions and outputs name it
+    std::string name; ///< upper-case, as in conditions and output
     std::size_t offset;
     std::size_t width;
     ColumnType type;
@@ -27,7 +27,7 @@ struct RowColumn {
     std::string_view text(const char* row) const noexcept;
 };
 
-/// The columns of a table in table order, learnt from one of its requests. Immutable, so any
+/// The columns of a table in table order, obtained from one of its requests. Immutable, so any
 /// thread; independent of the request once built.
 class RowLayout {
 public:

@@ -11,7 +11,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Keeps the rows that a report dispatches.
+/// Collects the rows that a report dispatches.
 class Collector : public RowReceiver {
 public:
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override {
@@ -52,7 +52,7 @@ std::optional<Sample> Sample::take(std::string_view table, std::vector<Condition
     }
     ctreq& sampled = *request.get();
     sampled.TakeSample();
-    // The table leaves its rows with the request.
+    // The table leaves its rows in the request.
     sampled.Dispatch();
     return Sample(RowLayout(sampled), sampled.rowSize, collector.takeRows(),
                   sampled.framework().counts.judged());

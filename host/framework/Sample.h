@@ -13,18 +13,18 @@
 
 namespace zrm::host {
 
-/// The rows of one sample of a table, in the order in which the table gave them.
+/// The rows of one sample of a table, in the table's order.
 class Sample {
 public:
-    /// Takes a sample: a report of the log entries, or the monitored logs. `label` names the
-    /// request in the agent's trace. Nothing when there is no such table, or when it opens no
-    /// request. Any thread, several at once; waits while the agent refreshes its logs.
+    /// Takes a sample: a report on log entries, or the monitored logs. `label` names the request in
+    /// the agent's trace. None when there is no such table or it opens no request. Any thread,
+    /// several at once; waits while the agent refreshes its logs.
     static std::optional<Sample> take(std::string_view table, std::vector<Condition> conditions,
                                       std::string label = "report");
 
     const RowLayout& layout() const noexcept { return m_layout; }
     std::size_t size() const noexcept { return m_rowSize == 0 ? 0 : m_rows.size() / m_rowSize; }
-    /// Number of rows that the table offered, before the conditions.
+    /// Number of rows that the table offered, before the conditions were applied.
     std::uint64_t offered() const noexcept { return m_offered; }
     /// The row of this index, less than size().
     const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }

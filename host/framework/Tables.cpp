@@ -9,8 +9,8 @@ namespace zrm::host {
 
 namespace {
 
-// Far more than the agent has. Constant-initialised and without a destructor, since requests may
-// be asked for while the process exits.
+// Far more than the agent has. Constant-initialised and without a destructor, since requests may be
+// opened while the process exits.
 constexpr unsigned maxTables = 16;
 std::atomic<TableManager*> g_tables[maxTables];
 

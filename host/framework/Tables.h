@@ -10,16 +10,16 @@ namespace zrm::host {
 /// The tables that the agent has registered. Any thread; neither locks nor allocates.
 namespace Tables {
 
-/// Makes a table known (TableManager::RegisterWithManager); returns 0 or a status.
+/// Registers a table (TableManager::RegisterWithManager); returns 0 or a status.
 unsigned add(TableManager* manager) noexcept;
 
-/// Forgets a table; nothing happens when it is not known.
+/// Removes a table; does nothing when it is not registered.
 void remove(const TableManager* manager) noexcept;
 
-/// The manager of this table ("RMLOGENT", "RMMONLOG"), or null.
+/// The manager of the table with this name ("RMLOGENT", "RMMONLOG"), or null.
 TableManager* find(std::string_view table) noexcept;
 
-/// Forgets every table; for an orderly end.
+/// Removes all tables, for an orderly shutdown.
 void clear() noexcept;
 
 } // namespace Tables

@@ -20,7 +20,7 @@ std::atomic<int> g_count{0};
 TraceCapture::TraceCapture() : m_outer(t_current) {
     t_current = this;
     ++g_count;
-    // From here on no source file's level is the one that it has learnt.
+    // From now on no source file may use its cached level.
     if (TRC1_Generation.fetch_add(1) + 1 == 0) {
         ++TRC1_Generation;
     }
@@ -52,7 +52,7 @@ void TraceCapture::add(const char* format, std::va_list arguments) noexcept {
             m_errors += text;
         }
     } catch (const std::bad_alloc&) {
-        // A reason less.
+        // One reason fewer.
     }
 }
 

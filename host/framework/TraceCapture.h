@@ -6,10 +6,10 @@
 
 namespace zrm::host {
 
-/// While it lives, the errors that the constructing thread traces are kept here and not written,
-/// whatever the trace levels are; other threads trace as always. For what is only tried: the agent
-/// says why it refuses something, and the operator's trace stays free of it. Of several on
-/// a thread the latest keeps them.
+/// While it exists, the errors that the constructing thread traces are collected here instead of
+/// being written, whatever the trace levels are; other threads trace as usual. Used for trials: the
+/// agent says why it refuses something without filling the operator's trace. If a thread has
+/// several, the latest collects them.
 class TraceCapture {
 public:
     TraceCapture();
@@ -17,26 +17,26 @@ public:
     TraceCapture(const TraceCapture&) = delete;
     TraceCapture& operator=(const TraceCapture&) = delete;
 
-    /// The errors since the last call, a blank between them; empty without any.
+    /// The errors since the last call, separated by blanks; empty if there were none.
     std::string take();
 
     // For the trace facility.
 
-    /// That of the calling thread, or null.
+    /// The one of the calling thread, or null.
     static TraceCapture* current() noexcept;
-    /// True while any thread has one: levels are asked for at each operation then.
+    /// True while any thread has one; levels are then looked up at each operation.
     static bool exists() noexcept;
     void add(const char* format, std::va_list arguments) noexcept
         __attribute__((format(printf, 2, 0)));
 
 private:
-    TraceCapture* m_outer; ///< goes on when this one ends
+    TraceCapture* m_outer; ///< active again when this one ends
     std::string m_errors;
 };
 
-/// While it lives, nothing that the constructing thread traces is written; other threads trace as
-/// always, and at the same cost. For entries that are judged again to answer a question: the trace
-/// of what is monitored stays free of them.
+/// While it exists, nothing that the constructing thread traces is written; other threads trace as
+/// usual and at the same cost. Used when entries are judged again to answer a query, which does not
+/// belong in the trace of monitoring.
 class TraceSilence {
 public:
     TraceSilence() noexcept;

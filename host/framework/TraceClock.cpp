@@ -14,8 +14,8 @@ namespace {
 
 constexpr std::int64_t quarterHour = 15 * 60;
 
-/// What was learnt last: the quarter (counted from the epoch) in the upper half, the offset from
-/// UTC in seconds in the lower. 0 is midnight of the epoch, at UTC.
+/// The cached value: the quarter (counted from the epoch) in the upper half, the offset from UTC in
+/// seconds in the lower. 0 is midnight of the epoch, at UTC.
 std::atomic<std::uint64_t> g_learnt{0};
 
 std::uint64_t pack(std::int64_t quarter, std::int64_t offset) noexcept {

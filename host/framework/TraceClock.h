@@ -5,10 +5,10 @@
 
 namespace zrm::host {
 
-/// Local time of trace records, without the C library's time-zone lock where that could be held by
-/// a thread that a forked child does not have. The offset from UTC is remembered and learnt afresh
-/// each quarter of an hour, since zones change at no other moments; a forked child uses what its
-/// parent last learnt. Any thread.
+/// Local time for trace records. Does not take the C library's time-zone lock in a forked child,
+/// where a thread that no longer exists could hold it. The offset from UTC is cached and updated
+/// every quarter of an hour, the only moments at which zones change; a forked child uses its
+/// parent's last value. Any thread.
 namespace TraceClock {
 
 struct Time {
@@ -21,7 +21,7 @@ struct Time {
     long microsecond;
 };
 
-/// The local time of a moment.
+/// The local time of a point in time.
 Time local(const std::timespec& moment) noexcept;
 
 } // namespace TraceClock

@@ -16,22 +16,22 @@ namespace {
 
 constexpr const char* defaultLevels = "error";
 
-/// Levels that were set.
+/// Levels set by configure.
 struct Setting {
     std::string text;
     TraceLevels levels;
-    std::unique_ptr<Setting> earlier; ///< those that a thread may still be reading
+    std::unique_ptr<Setting> earlier; ///< earlier settings that a thread may still be reading
 };
 
-/// Looks for a moment at which no thread reads the levels. Reading takes nanoseconds.
+/// How often to check for a moment at which no thread reads the levels. Reading takes nanoseconds.
 constexpr int mostLooks = 1000;
 
 constinit std::mutex g_mutex; ///< serialises changes, and guards the texts
 std::atomic<Setting*> g_setting{nullptr};
 std::atomic<int> g_readers{0};
 
-/// Keeps the setting that the calling thread reads. Neither locks nor allocates, so that a child
-/// between fork and exec may read too.
+/// Protects the setting that the calling thread reads. Neither locks nor allocates, so a child
+/// between fork and exec may read, too.
 class Reader {
 public:
     Reader() noexcept { ++g_readers; }
@@ -41,8 +41,8 @@ public:
     const Setting* setting() const noexcept { return g_setting.load(); }
 };
 
-/// Frees the settings before this one, which is in force: a thread that begins to read from now on
-/// reads this one. When threads keep reading, the next change frees them.
+/// Frees the settings before this one, which is in force: threads that start reading now read this
+/// one. If threads keep reading, the next change frees them.
 void freeEarlier(Setting& current) {
     for (int look = 0; look < mostLooks; ++look) {
         if (g_readers.load() == 0) {
@@ -55,7 +55,7 @@ void freeEarlier(Setting& current) {
     }
 }
 
-/// No anchor has learnt generation 0.
+/// No anchor has cached generation 0.
 void bumpGeneration() {
     if (TRC1_Generation.fetch_add(1) + 1 == 0) {
         ++TRC1_Generation;

@@ -30,7 +30,7 @@ std::string_view trimmed(std::string_view text) {
     return text.substr(first, text.find_last_not_of(" \t") - first + 1);
 }
 
-/// Takes the part before the separator, trimmed, off the text.
+/// Removes the part before the separator from the text and returns it trimmed.
 std::string_view takePart(std::string_view& text, char separator) {
     const std::size_t end = std::min(text.find(separator), text.size());
     const std::string_view part = trimmed(text.substr(0, end));
@@ -57,13 +57,13 @@ std::optional<unsigned> classOf(std::string_view name) {
     return found != std::end(traceClasses) ? found->level : numberOf(name);
 }
 
-/// The unit's name without the ending of the source file.
+/// The unit's name without its file extension.
 std::string_view stemOf(std::string_view unit) {
     return unit.substr(0, unit.rfind('.'));
 }
 
-/// Whether a source file is one of a class's: LogFile and LogFileTail are of LogFile,
-/// LogFiles is not.
+/// Whether a source file belongs to a class: LogFile and LogFileTail belong to LogFile, LogFiles
+/// does not.
 bool isUnitOf(std::string_view className, std::string_view stem) {
     if (!stem.starts_with(className)) {
         return false;

@@ -11,7 +11,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Whether a byte is shown by every terminal as it is, or is a line end or tab.
+/// Whether every terminal shows a byte as it is, or it is a line end or tab.
 bool isPlain(char c) {
     return (c >= ' ' && c < 0x7f) || c == '\n' || c == '\t';
 }
@@ -35,7 +35,7 @@ void TraceRecord::add(const char* format, ...) noexcept {
 void TraceRecord::addList(const char* format, std::va_list arguments) noexcept {
     const std::size_t room = maxSize - m_size;
     const int length = std::vsnprintf(m_text + m_size, room, format, arguments);
-    // The place of the terminator is the newline's at last.
+    // The newline finally replaces the terminator.
     m_size += std::min(static_cast<std::size_t>(std::max(length, 0)), room - 1);
 }
 
@@ -47,7 +47,7 @@ std::string_view TraceRecord::finish() noexcept {
                                                          : escaped();
 }
 
-/// The record with escapes in the place of what steers a terminal, cut where it becomes too long.
+/// The record with terminal controls escaped, cut if it becomes too long.
 std::string_view TraceRecord::escaped() noexcept {
     std::size_t size =
         SteeringText::copyVisible({m_text, m_size - 1}, m_escaped, sizeof m_escaped - 1);

@@ -8,13 +8,13 @@
 
 namespace zrm::host {
 
-/// One trace record: local time with microseconds, thread, unit and line, text, and one newline at
-/// its end. Characters that steer a terminal are escaped, line ends and tabs excepted, which the
-/// agent's own texts have. What does not fit is cut. Lives on the stack of one thread; neither
-/// locks nor allocates.
+/// One trace record: local time with microseconds, thread, unit and line, text, and a final
+/// newline. Terminal control characters are escaped, except line ends and tabs, which the agent's
+/// own texts contain. What does not fit is cut off. Lives on the stack of one thread; neither locks
+/// nor allocates.
 class TraceRecord {
 public:
-    static constexpr std::size_t maxSize = 16384; ///< bytes, with the newline
+    static constexpr std::size_t maxSize = 16384; ///< bytes, including the newline
 
     TraceRecord(const std::timespec& moment, long thread, const char* unit, int line) noexcept;
 
@@ -23,7 +23,7 @@ public:
         __attribute__((format(printf, 2, 0)));
     void add(const char* format, ...) noexcept __attribute__((format(printf, 2, 3)));
 
-    /// Ends the record and returns it whole; it stays valid as long as the object lives.
+    /// Completes the record and returns it; valid as long as the object lives.
     std::string_view finish() noexcept;
 
 private:
@@ -31,7 +31,7 @@ private:
 
     std::size_t m_size = 0;
     char m_text[maxSize];
-    char m_escaped[maxSize]; ///< used where something is to be escaped
+    char m_escaped[maxSize]; ///< used when something must be escaped
 };
 
 } // namespace zrm::host

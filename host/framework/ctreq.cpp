@@ -58,8 +58,8 @@ unsigned ctreq::InsertRow(char* row) {
         return STATUS_INVALID_ARGUMENT;
     }
     if (count >= allocated) {
-        // The room is counted in steps of allocSize, but the memory doubles, so that a report of
-        // many rows is not copied for every few of them.
+        // Room is counted in steps of allocSize, but the memory doubles, so that a large report is
+        // not copied for every few rows.
         const std::size_t room = std::size_t{allocated} + std::max(allocSize, 1u);
         if (room > m_framework->capacity) {
             const std::size_t capacity = std::max(room, m_framework->capacity * 2);

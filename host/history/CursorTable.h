@@ -9,20 +9,20 @@
 
 namespace zrm::host {
 
-/// How far each sink has got, as the history keeps it. Used by one thread at a time. Throws
+/// The position of each sink, as stored in the history. Used by one thread at a time. Throws
 /// DatabaseError.
 class CursorTable {
 public:
     explicit CursorTable(Database& database);
 
-    /// The id of the last event that a sink has got; none for a sink that is not known.
+    /// The id of the last event delivered to a sink; none for an unknown sink.
     std::optional<std::uint64_t> find(std::string_view sink);
 
-    /// Keeps the id of the last event that a sink has got, and that it was in use at this time
-    /// (milliseconds since 1970).
+    /// Stores the id of the last event delivered to a sink, and that the sink was in use at this
+    /// time (milliseconds since 1970).
     void keep(std::string_view sink, std::uint64_t event, std::int64_t used);
 
-    /// Removes what belongs to sinks that were last in use before this time.
+    /// Removes the positions of sinks last used before this time.
     void removeUnusedSince(std::int64_t time);
 
 private:

@@ -12,20 +12,20 @@
 
 namespace zrm::host {
 
-/// How far one sink has got; moved by its thread, looked at by any.
+/// The position of one sink; moved by its thread, read by any.
 using Cursor = std::atomic<std::uint64_t>;
 
-/// The cursors of the sinks that run, and which of them are not stored yet. Cursors are added
-/// before the first use of unsaved and saved, which one thread at a time calls.
+/// The cursors of the running sinks, and which of them are not stored yet. Cursors are added before
+/// the first call of unsaved or saved, which are used by one thread at a time.
 class Cursors {
 public:
-    /// Adds a sink's cursor, which lives as long as the object.
+    /// Adds a cursor for a sink; it lives as long as the object.
     Cursor& add(std::string sink, std::uint64_t event) {
         Entry& entry = m_entries.emplace_back(std::move(sink), event);
         return entry.cursor;
     }
 
-    /// Those that moved since they were saved.
+    /// The cursors that have moved since they were saved.
     std::vector<CursorValue> unsaved() const {
         std::vector<CursorValue> values;
         for (const Entry& entry : m_entries) {
@@ -46,7 +46,7 @@ public:
         }
     }
 
-    /// What was saved is gone, or is to be saved anew.
+    /// The saved values are lost, or must be saved again.
     void forgetSaved() {
         for (Entry& entry : m_entries) {
             entry.saved = notSaved;

@@ -9,13 +9,13 @@ struct sqlite3;
 
 namespace zrm::host {
 
-/// A call of the database that failed; what() is its text with that of the system's error.
+/// A failed database call; what() is its message with that of the system error.
 class DatabaseError : public std::runtime_error {
 public:
-    /// Of the last call on this connection, which returned `code`. A connection may be null.
+    /// For the last call on this connection, which returned `code`. The connection may be null.
     DatabaseError(sqlite3* connection, int code);
 
-    /// The file's content is not, or no longer, a database.
+    /// Whether the file's content is not, or no longer, a database.
     bool isCorruption() const noexcept;
 
 private:
@@ -27,7 +27,7 @@ private:
 class Database {
 public:
     enum class Use {
-        WRITE, ///< makes the file when it is missing
+        WRITE, ///< creates the file if it is missing
         READ,  ///< changes nothing
     };
 
@@ -36,7 +36,7 @@ public:
     Database(const Database&) = delete;
     Database& operator=(const Database&) = delete;
 
-    /// Runs statements that give no rows.
+    /// Runs statements that return no rows.
     void run(const std::string& sql);
 
     /// The first column of the first row; 0 when there is none.
@@ -48,7 +48,7 @@ private:
     sqlite3* m_connection = nullptr;
 };
 
-/// A transaction; what was not committed is taken back. Nothing is locked before the first write.
+/// A transaction; rolled back unless committed. Nothing is locked before the first write.
 class Transaction {
 public:
     explicit Transaction(Database& database);

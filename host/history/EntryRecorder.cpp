@@ -14,7 +14,7 @@ TRC1_Anchor anchor{"EntryRecorder.cpp"};
 
 constexpr std::int64_t millisecondsPerMinute = 60'000;
 
-/// Entries since the last sample. A log that is monitored anew counts from zero.
+/// Entries since the last sample. A log that is monitored again counts from zero.
 std::uint64_t difference(std::int32_t before, std::int32_t now) {
     return static_cast<std::uint32_t>(now < before ? now : now - before);
 }

@@ -10,18 +10,18 @@
 
 namespace zrm::host {
 
-/// Gives the history, once a minute, the entries that the minute brought, log by log: what the
-/// Monitored Logs table counts, less what it counted before. One thread.
+/// Records in the history, once a minute, how many entries each log had in that minute: the count
+/// in the Monitored Logs table minus the previous one. Used by one thread.
 class EntryRecorder {
 public:
-    /// The history outlives the object.
+    /// The history must outlive the object.
     explicit EntryRecorder(History& history) : m_history(history) {}
 
-    /// Records the minute that is over, if one is. Called more often than that; `now` is in
+    /// Records the last minute if it is over. Called more than once a minute; `now` is in
     /// milliseconds since 1970.
     void tick(std::int64_t now);
 
-    /// Records what there is of the current minute.
+    /// Records the current minute so far.
     void finish();
 
 private:

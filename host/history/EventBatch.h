@@ -13,27 +13,27 @@
 
 namespace zrm::host {
 
-/// Events in a row, with their texts in one piece of memory. Filled by one thread; sealed, it no
-/// longer changes and any thread reads it.
+/// Consecutive events with their texts in one block of memory. Filled by one thread; once sealed it
+/// no longer changes and any thread may read it.
 class EventBatch {
 public:
     EventBatch() = default;
     EventBatch(const EventBatch&) = delete;
     EventBatch& operator=(const EventBatch&) = delete;
 
-    /// Makes room for texts of so many bytes in all.
+    /// Reserves memory for texts of this total size.
     void reserve(std::size_t bytes) { m_text.reserve(bytes); }
 
-    /// Adds one event of the queue, rendered. Not after seal.
+    /// Adds one event from the queue, rendered as JSON. Not after seal.
     void add(const Event& event, const EventJson& format);
 
     /// Adds a copy of one event. Not after seal.
     void add(const EventRecord& event);
 
-    /// Makes the records. Once.
+    /// Builds the records. Called once.
     void seal();
 
-    /// The events; after seal, and as long as the batch.
+    /// The events; only after seal. Valid as long as the batch.
     std::span<const EventRecord> records() const noexcept { return m_records; }
 
     std::size_t size() const noexcept { return m_records.size(); }
@@ -41,9 +41,9 @@ public:
     /// The first and the last id of a batch that is not empty.
     std::uint64_t first() const noexcept { return m_records.front().id; }
     std::uint64_t last() const noexcept { return m_records.back().id; }
-    /// Length of the texts, in bytes.
+    /// Total length of the texts in bytes.
     std::size_t textBytes() const noexcept { return m_text.size(); }
-    /// Memory taken, in bytes.
+    /// Memory used, in bytes.
     std::size_t bytes() const noexcept {
         return m_text.capacity() + m_records.capacity() * sizeof(EventRecord);
     }
@@ -53,7 +53,7 @@ private:
         std::size_t begin = 0;
         std::size_t size = 0;
     };
-    /// Where the texts of one event lie; the memory moves while it grows.
+    /// The offsets of one event's texts; the memory may move as it grows.
     struct Places {
         Piece situation;
         Piece severity;
@@ -66,7 +66,7 @@ private:
         return std::string_view(m_text).substr(piece.begin, piece.size);
     }
     Piece pieceFrom(std::size_t begin) const noexcept { return {begin, m_text.size() - begin}; }
-    /// Events in a row mostly have these texts in common.
+    /// Consecutive events usually share these texts.
     Piece sameOr(std::string_view text, Piece Places::*which);
 
     std::string m_text;

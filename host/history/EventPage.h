@@ -9,12 +9,12 @@
 
 namespace zrm::host {
 
-/// What one query of the history found.
+/// The result of one query of the history.
 struct EventPage {
     std::vector<StoredEvent> events; ///< in the filter's order
-    /// Ids of events whose stored form is not what was written: they are not among the events.
+    /// Ids of corrupted events, which are not among the events.
     std::vector<std::uint64_t> damaged = {};
-    /// Set when the search for a text stopped before its end: the id of the last event looked at.
+    /// Set when a text search stopped early: the id of the last event examined.
     std::optional<std::uint64_t> reached = std::nullopt;
 };
 

@@ -78,8 +78,8 @@ std::optional<std::int64_t> EventTable::firstMomentFrom(std::uint64_t id, std::i
 
 void EventTable::removeUntil(std::uint64_t id) {
     m_remove.bind(1, id).run();
-    // The part of the next event is kept, with what it had of removed ones: a mark may be wider
-    // than its events.
+    // The part of the next event keeps its marks, also those of removed events: a mark may cover
+    // more than its events.
     m_removeMarks.bind(1, (id + 1) / partSize).run();
 }
 

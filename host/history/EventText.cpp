@@ -14,7 +14,7 @@ namespace {
 
 using nlohmann::json;
 
-/// Digits of times, and what all events of one agent have in common, are not what people look for.
+/// Nobody searches for digits of times or for what all events of an agent have in common.
 constexpr std::array leftOut = {"ORIGINNODE", "ENTRYTIME", "TIMESTAMP"};
 
 constexpr char lower(char c) {
@@ -27,8 +27,8 @@ std::string lowered(std::string_view text) {
     return result;
 }
 
-/// Whether events have the character as it is in their JSON, whichever version of this program
-/// wrote them: no controls, no quotes, and no characters of the blocks in which invisible ones are.
+/// Whether the JSON of events contains the character unescaped, whichever version of this program
+/// wrote it: no controls, no quotes, and no characters of blocks with invisible ones.
 bool isPlain(std::string_view character) {
     constexpr std::string_view leadsOfOthers = "\xc2\xd8\xe2\xef";
     const char first = character.front();
@@ -90,7 +90,7 @@ bool EventText::isIn(std::string_view log, std::string_view document) const {
     if (m_whole.isIn(log)) {
         return true;
     }
-    if (!m_plain.isIn(document)) { // most events are told apart without parsing them
+    if (!m_plain.isIn(document)) { // rules out most events without parsing them
         return false;
     }
     const json event = json::parse(document, nullptr, false);

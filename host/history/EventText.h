@@ -8,22 +8,22 @@
 
 namespace zrm::host {
 
-/// A text that readers look for in events. Letters A to Z are found in either case. Immutable, so
-/// any thread.
+/// A text to search for in events. The letters A to Z match in either case. Immutable, so any
+/// thread.
 class EventText {
 public:
-    /// The empty text is in every event.
+    /// The empty text matches every event.
     explicit EventText(std::string_view text);
 
     bool isEmpty() const noexcept { return m_whole.isEmpty(); }
 
-    /// Whether the text is in the log's whole path, the situation's name, or a character column of
-    /// the row other than the node and the times. `document` is the event's JSON; in one that
-    /// cannot be parsed, whether its bytes have the text.
+    /// Whether the text occurs in the log's full path, the situation's name, or a character column
+    /// of the row other than the node and the times. `document` is the event's JSON; if it cannot
+    /// be parsed, its raw bytes are searched.
     bool isIn(std::string_view log, std::string_view document) const;
 
 private:
-    /// Finds one text in others, skipping what cannot begin it (Horspool's algorithm).
+    /// Finds one text in others by Horspool's algorithm.
     class Pattern {
     public:
         explicit Pattern(std::string lowerCase);
@@ -32,11 +32,11 @@ private:
 
     private:
         std::string m_text;                     ///< in lower case
-        std::array<std::uint8_t, 256> m_skip{}; ///< by the byte below the pattern's last one
+        std::array<std::uint8_t, 256> m_skip{}; ///< by the byte aligned with the pattern's last one
     };
 
     Pattern m_whole;
-    Pattern m_plain; ///< its longest part that JSON never escapes
+    Pattern m_plain; ///< the longest part of the text that JSON never escapes
 };
 
 } // namespace zrm::host

@@ -16,13 +16,13 @@ namespace {
 
 TRC1_Anchor anchor{"History.cpp"};
 
-/// For the newest events: what a sink that keeps up is behind, and more.
+/// Memory for the newest events: more than a sink that keeps up lags behind.
 constexpr std::size_t bytesInMemory = std::size_t{8} * 1024 * 1024;
 
-/// Damaged events that are remembered, so that each is traced once.
+/// The most damaged events remembered, so that each is traced only once.
 constexpr std::size_t mostDamaged = 10'000;
 
-/// The newest id of a file that is about to be moved aside, as far as it can be told.
+/// The newest id of a file about to be moved aside, as far as it can be determined.
 std::uint64_t newestOfCorrupt(const std::string& path) {
     try {
         Database database(path, Database::Use::READ);
@@ -32,15 +32,15 @@ std::uint64_t newestOfCorrupt(const std::string& path) {
     }
 }
 
-/// The id behind which a file goes on whose newest event is this one: where the file is new, or an
-/// older copy, ids that were given since are not given again.
+/// The id after which a file with this newest event continues: if the file is new or an older copy,
+/// ids used since then are not reused.
 std::uint64_t newestWith(const HistoryDirectory& directory, std::uint64_t newest) {
     const std::uint64_t reserved = directory.reservedIds();
     const bool isLost = newest == 0 || newest + HistoryDirectory::idsAtOnce < reserved;
     return isLost ? reserved : newest;
 }
 
-/// The file, or what is wrong with it. A corrupt one is exchanged.
+/// The file, or what is wrong with it. A corrupt one is replaced.
 std::variant<std::unique_ptr<HistoryFile>, std::string>
 openOrReplace(const HistoryDirectory& directory) {
     const auto problem = [&](const char* why) {
@@ -148,7 +148,7 @@ EventPage History::query(const EventFilter& filter) {
     return page;
 }
 
-/// Traces what was not known to be damaged.
+/// Traces newly found damage.
 void History::noteDamage(const std::vector<std::uint64_t>& events) {
     TraceScope trace(anchor);
     const std::lock_guard guard(m_mutex);

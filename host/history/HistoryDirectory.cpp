@@ -23,11 +23,11 @@ namespace {
 
 TRC1_Anchor anchor{"HistoryDirectory.cpp"};
 
-/// What SQLite keeps beside its file: the write-ahead log and the index of it.
+/// SQLite's additional files: the write-ahead log and its index.
 constexpr const char* logEnding = "-wal";
 constexpr const char* indexEnding = "-shm";
 
-/// Log entries are not for everybody's eyes.
+/// Log entries must not be readable by everyone.
 constexpr int fileMode = 0640;
 constexpr int directoryMode = 0750;
 
@@ -36,8 +36,8 @@ std::string because(const std::string& what, int number) {
     return what + ": " + error.text();
 }
 
-/// Opens a file of the history, which is made when it is missing; -1 and the reason when it cannot
-/// be opened, or when something else is in its place. Never waits, and follows no link.
+/// Opens a file of the history, creating it if missing. Returns -1 and the reason when it cannot be
+/// opened or is not a regular file. Never blocks, and follows no link.
 int openFile(const std::string& path, std::string& problem) {
     const int fd =
         ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, fileMode);
@@ -55,7 +55,7 @@ int openFile(const std::string& path, std::string& problem) {
     return fd;
 }
 
-/// Takes the lock; false leaves errno.
+/// Takes the lock; false with errno set.
 bool lockWhole(int fd) {
     struct flock whole {};
     whole.l_type = F_WRLCK;
@@ -63,7 +63,7 @@ bool lockWhole(int fd) {
     return fcntl(fd, F_SETLK, &whole) == 0;
 }
 
-/// Numbers in the lock's file are written over one another.
+/// Numbers in the lock file overwrite each other.
 constexpr int digitsOfId = 20;
 
 std::string timeNow() {
@@ -96,7 +96,7 @@ HistoryDirectory::open(const std::string& directory) {
     return opened;
 }
 
-/// Whether the name of the lock's file still leads to the file that is locked.
+/// Whether the lock file's name still leads to the locked file.
 bool HistoryDirectory::hasLock() const {
     struct stat named {};
     struct stat locked {};
@@ -183,7 +183,7 @@ std::string HistoryDirectory::moveAside(const std::string& why) const {
     if (rename(m_file.c_str(), aside.c_str()) != 0) {
         return because("cannot move " + m_file + " aside", errno);
     }
-    // The log holds what the file does not have yet; the index is made anew from it.
+    // The log contains what is not yet in the file; its index is rebuilt from it.
     rename((m_file + logEnding).c_str(), (aside + logEnding).c_str());
     unlink((m_file + indexEnding).c_str());
     say("the history %s is corrupt (%s); it is kept as %s, and a new one begins", m_file.c_str(),

@@ -8,12 +8,12 @@
 
 namespace zrm::host {
 
-/// The directory in which a history lives, locked against other processes as long as the object
-/// lives. Used by one thread at a time, but file and bytes by any.
+/// The directory of a history, locked against other processes while the object exists. Used by one
+/// thread at a time, except file and bytes, which any thread may call.
 class HistoryDirectory {
 public:
-    /// Makes the directory when only it is missing, locks it, and sees that the history's file can
-    /// be written. Gives what is wrong and its cure instead when that cannot be.
+    /// Creates the directory if only its last part is missing, locks it, and checks that the
+    /// history file is writable. Returns what is wrong and how to fix it when that fails.
     static std::variant<std::unique_ptr<HistoryDirectory>, std::string>
     open(const std::string& directory);
 
@@ -24,37 +24,37 @@ public:
     /// The path of the history's file.
     const std::string& file() const noexcept { return m_file; }
 
-    /// Bytes on disk, of the file and of those that SQLite keeps beside it.
+    /// Size on disk in bytes, of the file and SQLite's files next to it.
     std::uint64_t bytes() const;
 
-    /// Makes anew what is missing: the directory, the lock's file, an empty history. Returns what
-    /// went wrong, empty when nothing did.
+    /// Recreates what is missing: the directory, the lock file, an empty history. Returns an error
+    /// message, empty on success.
     std::string restore();
 
     /// Ids of events are reserved this many at a time.
     static constexpr std::uint64_t idsAtOnce = 65536;
 
-    /// Keeps, in the lock's file, that ids up to this one may have been given to events, so that
-    /// they are not given again when the history's file is lost.
+    /// Records in the lock file that ids up to this one may be in use, so that they are not reused
+    /// if the history file is lost.
     void reserveIds(std::uint64_t last) const;
-    /// The id up to which ids may have been given; 0 when that is not known.
+    /// The last id that may be in use; 0 when unknown.
     std::uint64_t reservedIds() const;
 
-    /// Renames the file to one that says when it was found corrupt, and makes an empty one. Nobody
-    /// has it open. Says so; returns what went wrong, empty when nothing did.
+    /// Renames the file to a name with the time it was found corrupt, creates an empty one, and
+    /// logs it. Nobody may have the file open. Returns an error message, empty on success.
     std::string moveAside(const std::string& why) const;
 
 private:
     HistoryDirectory(const std::string& directory, int lock);
 
-    /// Makes the file where it is missing; returns what went wrong, empty when nothing did.
+    /// Creates the file if it is missing. Returns an error message, empty on success.
     std::string makeFile() const;
     std::string lockPath() const { return m_directory + "/history.lock"; }
     bool hasLock() const;
 
     const std::string m_directory;
     const std::string m_file;
-    int m_lock; ///< descriptor of the file that is locked
+    int m_lock; ///< descriptor of the locked file
 };
 
 } // namespace zrm::host

@@ -14,19 +14,19 @@ constexpr std::int64_t millisecondsPerMinute = 60'000;
 constexpr std::int64_t millisecondsPerDay = 24 * 60 * millisecondsPerMinute;
 constexpr std::size_t removedAtOnce = 1024;
 
-/// Free pages that are left alone: new events take them.
+/// Free pages that are kept for new events.
 constexpr std::int64_t mostFreePages = 1024;
 constexpr int pagesAtOnce = 64;
 
-/// Makes a connection one for the writer. Page size and vacuum are settings of a file that is made
-/// here: pages in which many events find room, and free pages that can be given back.
+/// Sets up the writer's connection. Page size and vacuum mode apply to a file created here: pages
+/// large enough for many events, and free pages that can be returned.
 Database& prepare(Database& database) {
-    if (database.number("PRAGMA page_count") == 0) { // else they would be written all the same
+    if (database.number("PRAGMA page_count") == 0) { // otherwise they would be written anyway
         database.run("PRAGMA page_size = 16384");
         database.run("PRAGMA auto_vacuum = INCREMENTAL");
     }
     database.run("PRAGMA journal_mode = WAL");
-    // A commit survives the process; a power failure may take the last ones.
+    // A commit survives a crash of the process; a power failure may lose the last ones.
     database.run("PRAGMA synchronous = NORMAL");
     database.run("PRAGMA journal_size_limit = 67108864");
     database.run("PRAGMA cache_size = -8192");
@@ -34,9 +34,9 @@ Database& prepare(Database& database) {
     return database;
 }
 
-/// An event cannot be older than the one before it, nor raised in the future: where a clock was
-/// wrong, the neighbours tell the time. This is the time until which the oldest event was raised;
-/// none when every clock seems wrong.
+/// An event cannot be older than the one before it, nor be raised in the future: if the clock was
+/// wrong, the neighbours bound the time. Returns the latest time at which the oldest event can have
+/// been raised; none when all times seem wrong.
 std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& oldest,
                                          EventTable& events, std::int64_t now) {
     for (const EventTable::Moment& event : oldest) {
@@ -55,7 +55,7 @@ HistoryFile::HistoryFile(const std::string& path)
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
-    m_database.number("SELECT count(*) FROM cursors"); // a corrupt table shows it now
+    m_database.number("SELECT count(*) FROM cursors"); // detects a corrupt table now
 }
 
 template <class Work> void HistoryFile::inTransaction(Work&& work) {

@@ -17,48 +17,48 @@
 
 namespace zrm::host {
 
-/// How far one sink has got.
+/// The position of one sink.
 struct CursorValue {
     std::string sink;
-    std::uint64_t event = 0; ///< id of the last event that it has got
+    std::uint64_t event = 0; ///< id of the last event delivered to it
     bool operator==(const CursorValue&) const = default;
 };
 
-/// What one minute brought, log by log.
+/// The entries of one minute, per log.
 struct MinuteCounts {
     std::int64_t minute = 0;                                    ///< since 1970, UTC
-    std::vector<std::pair<std::string, std::uint64_t>> entries; ///< path and entries read
+    std::vector<std::pair<std::string, std::uint64_t>> entries; ///< path and number of entries read
 };
 
-/// An open history, as its one writer sees it. Each operation is one transaction: it is done as a
-/// whole or not at all. Used by one thread at a time. Throws DatabaseError.
+/// An open history as seen by its only writer. Each operation is one transaction: all or nothing.
+/// Used by one thread at a time. Throws DatabaseError.
 class HistoryFile {
 public:
-    /// Opens the file and brings it up to date; a new one is made. Throws SchemaTooNew, too.
+    /// Opens the file, creating it if necessary, and updates its schema. Also throws SchemaTooNew.
     explicit HistoryFile(const std::string& path);
 
-    /// Id of the newest event that was ever stored; 0 when there was none.
+    /// Id of the newest event ever stored; 0 when there was none.
     std::uint64_t newest() const noexcept { return m_newest; }
     /// Id of the oldest event held; 0 when there is none.
     std::uint64_t oldest() const noexcept { return m_oldest; }
 
-    /// Lets the ids of a history without events follow this one.
+    /// Makes the ids of a history without events start after this one.
     void continueAfter(std::uint64_t id);
 
-    /// Stores events whose ids follow the newest, what they add to the rates, and cursors.
+    /// Stores events, whose ids follow the newest, their part of the rates, and cursors.
     void store(const EventBatch& batch, const std::vector<CursorValue>& cursors);
 
     void keepCursors(const std::vector<CursorValue>& cursors);
     std::optional<std::uint64_t> cursor(const std::string& sink) { return m_cursors.find(sink); }
-    /// Forgets sinks that were not in use for so many days.
+    /// Removes sinks that have not been used for this many days.
     void removeOldCursors(int days);
 
     /// Adds the entries of minutes that are over.
     void addEntries(const std::vector<MinuteCounts>& minutes);
 
-    /// Removes expired events, a limited number: those before the newest `events`, and those
-    /// raised before `time` as `now` has it, both in milliseconds since 1970. The newest event
-    /// always stays. False when there are no more such events.
+    /// Removes a limited number of expired events: those older than the newest `events`, and those
+    /// raised before `time` given that it is `now`, both in milliseconds since 1970. The newest
+    /// event always stays. False when no more events have expired.
     struct Limits {
         std::uint64_t events;
         std::int64_t time;
@@ -69,11 +69,11 @@ public:
     /// The files as they were opened.
     const OpenFiles& files() const noexcept { return m_files; }
 
-    /// Puts what is in the write-ahead log into the file, when nobody reads it.
+    /// Moves the write-ahead log into the file when there are no readers.
     void emptyLog();
 
-    /// Gives the file system back a little of what removed events leave, once that is much. False
-    /// when there is nothing to do.
+    /// Returns a little of the space of removed events to the file system, once there is a lot of
+    /// it. False when there is nothing to do.
     bool shrink();
 
 private:

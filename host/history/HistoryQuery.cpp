@@ -18,7 +18,7 @@ namespace {
 constexpr auto noBound = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 constexpr auto partSize = static_cast<std::int64_t>(EventTable::partSize);
 
-/// A search looks at the clock once in so many events.
+/// A search checks the clock once per this many events.
 constexpr std::size_t eventsBetweenLooksAtTheClock = 64;
 
 std::string condition(std::string_view column, std::size_t values) {
@@ -53,7 +53,7 @@ EventPage HistoryQuery::run() {
     return std::move(m_found);
 }
 
-/// Narrows the bounds to the parts that have events of the window.
+/// Narrows the bounds to the parts with events in the time window.
 void HistoryQuery::narrowToTime() {
     Statement parts(m_database, "SELECT min(part), max(part) FROM marks"
                                 " WHERE latest >= ? AND earliest <= ?");
@@ -111,9 +111,9 @@ void HistoryQuery::walkLabels(const std::vector<std::int64_t>& labels) {
     const std::string sql = std::string("SELECT id FROM events INDEXED BY events_by_label"
                                         " WHERE label = ? AND id BETWEEN ? AND ? ORDER BY id") +
                             direction();
-    // Each label has a walk of its own; the one whose next event is first in order is taken.
+    // Each label has its own cursor; take the one whose next event comes first.
     std::deque<Statement> walks;
-    std::priority_queue<std::pair<std::int64_t, std::size_t>> nexts; // rank and walk
+    std::priority_queue<std::pair<std::int64_t, std::size_t>> nexts; // rank and index of the cursor
     const auto advance = [&](std::size_t walk) {
         if (walks[walk].step()) {
             const std::int64_t id = walks[walk].integer(0);
@@ -135,12 +135,12 @@ void HistoryQuery::walkLabels(const std::vector<std::int64_t>& labels) {
     }
 }
 
-/// Whether the page is complete, or the time for the search is over.
+/// Whether the page is complete or the search time is up.
 bool HistoryQuery::isDone() const noexcept {
     return m_found.events.size() >= m_filter.limit || m_found.reached;
 }
 
-/// Takes the event if it is wanted, and ends a search whose time is over.
+/// Takes the event if it is wanted, and ends the search when its time is up.
 void HistoryQuery::look(const Statement& statement) {
     const StoredEventRow row(statement);
     const EventRecord event = row.record();
@@ -160,7 +160,7 @@ void HistoryQuery::look(const Statement& statement) {
 }
 
 bool HistoryQuery::isWanted(const EventRecord& event) const {
-    // The parts of a window have others beside its events.
+    // The parts of a window also contain events outside of it.
     return (!m_filter.from || event.raised >= *m_filter.from) &&
            (!m_filter.to || event.raised <= *m_filter.to) &&
            (m_text.isEmpty() || m_text.isIn(event.log, event.json));

@@ -15,17 +15,17 @@
 
 namespace zrm::host {
 
-/// One query of the events of a history. Its work grows with what it gives, not with what the
-/// history holds; the search for a text, which looks at every event that the rest of the filter
-/// lets through, is limited in time. Used once, by one thread. Throws DatabaseError.
+/// One query for events of a history. Its cost grows with the result, not with the history. A text
+/// search, which examines every event that passes the rest of the filter, is limited in time. Used
+/// once, by one thread. Throws DatabaseError.
 class HistoryQuery {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// A search for a text stops about then; whoever asked goes on where it stopped.
+    /// A text search stops after about this time; the caller can continue where it stopped.
     static constexpr std::chrono::milliseconds searchTime{250};
 
-    /// Both references outlive the object.
+    /// Both references must outlive the object.
     HistoryQuery(Database& database, const EventFilter& filter,
                  std::chrono::milliseconds longest = searchTime);
 
@@ -48,7 +48,7 @@ private:
     std::int64_t m_last;
     const EventText m_text;
     const Clock::time_point m_searchLimit;
-    std::size_t m_looked = 0; ///< at so many events
+    std::size_t m_looked = 0; ///< number of events examined
     EventPage m_found;
 };
 

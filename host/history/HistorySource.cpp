@@ -35,11 +35,11 @@ std::span<const EventRecord> HistorySource::read(std::size_t most) {
     return rest.first(std::min(most, rest.size()));
 }
 
-/// False at the end; otherwise there may be events now.
+/// False at the end; otherwise events may have arrived.
 bool HistorySource::fetch() {
     m_batch.reset();
     const std::uint64_t id = m_cursor.load();
-    // Ended first: what was committed before the end is seen then.
+    // Read `ended` first, so that everything committed before the end is seen.
     const bool ended = m_recent.ended();
     if (m_recent.newest() <= id) {
         if (!ended) {
@@ -63,14 +63,14 @@ void HistorySource::use(std::shared_ptr<const EventBatch> batch) {
     m_batch = std::move(batch);
 }
 
-/// Goes on at the event `next`: those before it are gone.
+/// Continues at event `next`: those before it are gone.
 void HistorySource::passOver(std::uint64_t next) {
     say("%s did not get the events %" PRIu64 " to %" PRIu64 ": the history no longer contains them",
         m_sink.c_str(), m_cursor.load() + 1, next - 1);
     m_cursor.store(next - 1);
 }
 
-/// False when the file could not be read; that is told once, and a pause made.
+/// False when the file could not be read; logs that once, and pauses.
 bool HistorySource::load() {
     TraceScope trace(anchor);
     try {
@@ -80,7 +80,7 @@ bool HistorySource::load() {
             trace.error()("The history can be read again for %s.", m_sink.c_str());
         }
         m_failing = false;
-        // After a corrupt file was exchanged, memory reaches further back than the new one.
+        // After a corrupt file was replaced, memory reaches further back than the new file.
         const std::shared_ptr<const EventBatch> recent = m_recent.oldest();
         if (recent != nullptr && (batch->empty() || recent->first() < batch->first())) {
             batch = recent;
@@ -105,7 +105,7 @@ bool HistorySource::load() {
     return false;
 }
 
-/// The events behind the cursor, up to the first that is damaged; those in front are passed over.
+/// The events after the cursor, up to the first damaged one; damaged ones at the front are skipped.
 std::shared_ptr<const EventBatch> HistorySource::readFile() {
     auto batch = std::make_shared<EventBatch>();
     ReaderPool::Lease lease = m_readers.take();
@@ -122,7 +122,7 @@ std::shared_ptr<const EventBatch> HistorySource::readFile() {
     return batch;
 }
 
-/// False when the event is damaged and others are to be delivered before it.
+/// False when the event is damaged and others must be delivered before it.
 bool HistorySource::addTo(EventBatch& batch, const StoredEventRow& row) {
     const EventRecord event = row.record();
     if (row.isIntact()) {

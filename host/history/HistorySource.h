@@ -15,11 +15,11 @@ namespace zrm::host {
 
 class StoredEventRow;
 
-/// The committed events of the history behind a sink's cursor: from memory where the sink keeps
-/// up, else from the file. What was removed before the sink got to it is passed over, and told.
+/// The committed events after a sink's cursor: from memory if the sink keeps up, otherwise from the
+/// file. Events removed before the sink got to them are skipped, which is logged.
 class HistorySource : public EventSource {
 public:
-    /// `sink` is how messages call it. The references outlive the object.
+    /// `sink` is its name in messages. The references must outlive the object.
     HistorySource(std::string sink, RecentEvents& recent, ReaderPool& readers, Cursor& cursor);
 
     std::span<const EventRecord> read(std::size_t most) override;
@@ -38,10 +38,10 @@ private:
     const std::string m_sink;
     RecentEvents& m_recent;
     ReaderPool& m_readers;
-    Cursor& m_cursor; ///< id of the last event that the sink has got
+    Cursor& m_cursor; ///< id of the last event delivered to the sink
     std::shared_ptr<const EventBatch> m_batch;
-    std::size_t m_position = 0; ///< in the batch: the next event
-    bool m_failing = false;     ///< the last reading of the file failed
+    std::size_t m_position = 0; ///< index of the next event in the batch
+    bool m_failing = false;     ///< the last read of the file failed
 };
 
 } // namespace zrm::host

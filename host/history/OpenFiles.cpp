@@ -25,7 +25,7 @@ std::optional<OpenFiles::Identity> OpenFiles::identity(std::size_t which) const 
 bool OpenFiles::isInPlace(std::size_t which) const {
     errno = 0;
     const std::optional<Identity> now = identity(which);
-    // A directory that cannot be looked at for now says nothing about its files.
+    // A directory that currently cannot be read says nothing about its files.
     return now ? now == m_opened[which] : !m_opened[which] || (errno != ENOENT && errno != ENOTDIR);
 }
 

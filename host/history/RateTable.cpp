@@ -13,7 +13,7 @@ constexpr std::int64_t minutesKept = 24 * 60;
 
 constexpr const char* forget = " WHERE minute < ? OR minute > ?";
 
-/// Steps of a window, in minutes.
+/// The steps of a window, in minutes.
 struct Steps {
     std::int64_t start;
     std::int64_t each;
@@ -33,7 +33,7 @@ Steps stepsOf(std::int64_t from, std::int64_t to, std::int64_t step) {
     return {start * each, each, static_cast<std::size_t>(end - start)};
 }
 
-/// Counts of zero where a minute was watched, none elsewhere.
+/// Counts of zero for watched minutes, none for others.
 LogRates::Counts watchedCounts(Database& database, const Steps& steps) {
     LogRates::Counts counts(steps.count);
     Statement minutes(database, "SELECT minute FROM minutes WHERE minute >= ? AND minute < ?");
@@ -66,7 +66,7 @@ void RateTable::add(std::int64_t minute, std::int64_t log, std::uint64_t entries
 void RateTable::watched(std::int64_t minute) {
     m_watched.bind(1, minute).run();
     for (Statement* const statement : {&m_forgetMinutes, &m_forgetRates}) {
-        // Those far ahead were counted by a clock that has been put right since.
+        // Minutes far ahead were counted by a clock that has since been corrected.
         statement->bind(1, minute - minutesKept).bind(2, minute + minutesKept).run();
     }
 }

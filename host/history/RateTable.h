@@ -14,10 +14,10 @@ class RateTable {
 public:
     explicit RateTable(Database& database);
 
-    /// Adds to the counts of a log, which goes by its number in the table of logs.
+    /// Adds to the counts of a log, identified by its number in the table of logs.
     void add(std::int64_t minute, std::int64_t log, std::uint64_t entries, std::uint64_t events);
 
-    /// Remembers that the minute was watched, and forgets those more than a day from it.
+    /// Records that the minute was watched, and removes minutes more than a day away from it.
     void watched(std::int64_t minute);
 
     /// The counts from the step in which `from` lies to the one before `to`; times and step in

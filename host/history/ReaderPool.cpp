@@ -47,8 +47,8 @@ void ReaderPool::giveBack(std::unique_ptr<Database> database) {
         if (database != nullptr && !m_suspended && m_idle.size() < mostIdle) {
             m_idle.push_back(std::move(database));
         }
-        // Closed before it counts as given back: a connection that closes late would clear up
-        // after a file that is not its own any more.
+        // Closed before it counts as returned: a connection closed later would clean up files that
+        // are no longer its own.
         database.reset();
         --m_leased;
     }

@@ -13,10 +13,10 @@
 
 namespace zrm::host {
 
-/// Connections for those who read the history, opened on demand and used again. Any thread.
+/// Connections for readers of the history, opened on demand and reused. Any thread.
 class ReaderPool {
 public:
-    /// One connection, for the time of one reading.
+    /// One connection, borrowed for one read.
     class Lease {
     public:
         Lease(ReaderPool& pool, std::unique_ptr<Database> database);
@@ -38,14 +38,14 @@ public:
     /// Waits while the pool is suspended. Throws DatabaseError.
     Lease take();
 
-    /// Waits for every lease to end, closes the connections, and gives none until resume: the file
-    /// is about to be exchanged.
+    /// Waits for all leases to end, closes the connections, and hands out none until resume. Used
+    /// before the file is replaced.
     void suspend();
     void resume();
 
-    /// A reader has found the file corrupt; its writer will see to it.
+    /// Records that a reader has found the file corrupt; the writer will replace it.
     void noteCorruption() noexcept { m_corrupt.store(true); }
-    /// True once after such a finding.
+    /// True once after noteCorruption.
     bool takeCorruption() noexcept { return m_corrupt.exchange(false); }
 
 private:

@@ -14,19 +14,19 @@
 
 namespace zrm::host {
 
-/// The newest committed events, in memory: who keeps up reads them here and not from the file.
-/// Tells everyone who waits that there is more. Any thread.
+/// The newest committed events, in memory: readers that keep up read them here instead of from the
+/// file. Wakes waiting readers when there are more. Any thread.
 class RecentEvents {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// Keeps at most about so many bytes, and at least the newest batch. `newest` is the id of the
-    /// newest event committed before.
+    /// Keeps about this many bytes at most, but at least the newest batch. `newest` is the id of
+    /// the newest event committed so far.
     RecentEvents(std::size_t bytes, std::uint64_t newest);
     RecentEvents(const RecentEvents&) = delete;
     RecentEvents& operator=(const RecentEvents&) = delete;
 
-    /// Adds a committed batch, which is not empty and whose ids follow the newest.
+    /// Adds a committed, non-empty batch whose ids follow the newest.
     void publish(std::shared_ptr<const EventBatch> batch);
 
     /// The id of the newest committed event; 0 when there was none.
@@ -38,12 +38,12 @@ public:
     /// The oldest batch in memory; null when there is none.
     std::shared_ptr<const EventBatch> oldest() const;
 
-    /// Waits until an event with a greater id is there, the time is up, a stop is requested or the
-    /// end has come. Returns newest().
+    /// Waits until an event with a greater id arrives, the time is up, a stop is requested or end
+    /// is called. Returns newest().
     std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
                              const std::stop_token& stop) const;
 
-    /// No event follows. Ends every wait.
+    /// No more events will follow. Ends all waits.
     void end();
     bool ended() const noexcept { return m_ended.load(std::memory_order_acquire); }
 

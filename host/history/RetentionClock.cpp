@@ -6,7 +6,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// More than a clock is off between two looks when it is set a little, or when the machine slept.
+/// More than a clock differs between two calls after a small adjustment or a sleep of the machine.
 constexpr std::chrono::milliseconds leap = 1h;
 constexpr std::chrono::milliseconds patience = 1h;
 

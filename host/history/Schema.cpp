@@ -8,12 +8,12 @@ namespace zrm::host {
 
 namespace {
 
-/// Each entry makes, of the version before it, the version that is its place in the table.
-/// Published entries never change; a new version is a new entry.
+/// Each entry upgrades the previous version to the version of its position in the table. Published
+/// entries never change; a new version is a new entry.
 constexpr std::array<const char*, 4> steps = {
-    // 1: events. Labels intern what is written on many events; one narrow index serves every
-    // filter on them, and the marks narrow a window of time down, so that storing an event costs
-    // one row and one index entry.
+    // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
+    // and the marks narrow a time window, so that storing an event costs one row and one index
+    // entry.
     "CREATE TABLE logs (id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE);"
     "CREATE TABLE labels (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
     " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
@@ -23,17 +23,17 @@ constexpr std::array<const char*, 4> steps = {
     "CREATE INDEX events_by_label ON events (label);"
     "CREATE TABLE marks (part INTEGER PRIMARY KEY, earliest INTEGER NOT NULL,"
     " latest INTEGER NOT NULL);"
-    // The events of an empty history follow the origin, if it has one.
+    // The event ids of an empty history follow the origin, if there is one.
     "CREATE TABLE origin (event INTEGER NOT NULL);"
     "CREATE TABLE cursors (sink TEXT PRIMARY KEY, event INTEGER NOT NULL,"
     " used INTEGER NOT NULL) WITHOUT ROWID;",
-    // 2: entries and events per minute and log. A minute that has no row in `minutes` was not
-    // watched; a watched one without a count had none.
+    // 2: entries and events per minute and log. A minute without a row in `minutes` was not
+    // watched; a watched one without a count had no entries.
     "CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
     "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL REFERENCES logs,"
     " entries INTEGER NOT NULL, events INTEGER NOT NULL, PRIMARY KEY (minute, log))"
     " WITHOUT ROWID;",
-    // 3: a label has the situation's text, too.
+    // 3: labels also have the situation's text.
     "CREATE TABLE labels_with_text (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
     " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs, text TEXT NOT NULL,"
     " UNIQUE (situation, severity, log, text));"

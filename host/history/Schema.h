@@ -12,14 +12,14 @@ class SchemaTooNew : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
-/// The tables of a history. Their version is the file's user_version.
+/// The tables of a history. Their version is stored as the file's user_version.
 namespace Schema {
 
 /// The version that this program writes.
 extern const int version;
 
-/// Brings a new or an older file to this version, one version at a time: each is a transaction, so
-/// that a failure leaves a whole older version. Throws DatabaseError or SchemaTooNew.
+/// Upgrades a new or older file to this version, one version at a time. Each step is a transaction,
+/// so a failure leaves a complete older version. Throws DatabaseError or SchemaTooNew.
 void bringUpToDate(Database& database);
 
 } // namespace Schema

@@ -22,7 +22,7 @@ Statement::Statement(Statement&& other) noexcept
     : m_database(other.m_database), m_statement(std::exchange(other.m_statement, nullptr)) {}
 
 void Statement::fail(int code) {
-    // The text is the connection's last one; a reset would write its own.
+    // The message is the connection's last one, and a reset would overwrite it.
     const DatabaseError error(m_database->handle(), code);
     reset();
     throw error;

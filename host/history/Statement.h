@@ -11,9 +11,9 @@ struct sqlite3_stmt;
 
 namespace zrm::host {
 
-/// A prepared statement. Used by its connection's thread; the connection outlives it. Parameters
-/// and columns are counted as SQLite counts them: parameters from 1, columns from 0. Every failure
-/// throws DatabaseError.
+/// A prepared statement. Used by its connection's thread; the connection must outlive it.
+/// Parameters and columns are numbered as in SQLite: parameters from 1, columns from 0. Every
+/// failure throws DatabaseError.
 class Statement {
 public:
     Statement(Database& database, const std::string& sql);
@@ -25,20 +25,20 @@ public:
 
     Statement& bind(int parameter, std::int64_t value);
     Statement& bind(int parameter, std::uint64_t value);
-    /// The text stays as it is until the statement is reset.
+    /// The text must stay unchanged until the statement is reset.
     Statement& bind(int parameter, std::string_view text);
 
-    /// Goes to the next row; false when there is none.
+    /// Moves to the next row; false when there is none.
     bool step();
 
-    /// Runs a statement that gives no rows, and resets it.
+    /// Runs a statement that returns no rows, and resets it.
     void run();
 
     /// Ends the current execution; the parameters keep their values.
     void reset() noexcept;
 
     std::int64_t integer(int column) const noexcept;
-    /// A view that lasts until the next step or reset.
+    /// A view valid until the next step or reset.
     std::string_view text(int column) const noexcept;
     bool isNull(int column) const noexcept;
 

@@ -6,7 +6,7 @@
 
 namespace zrm::host {
 
-/// One event as the history gives it to a reader, which owns the texts.
+/// One event as returned by the history to a reader, which owns the texts.
 struct StoredEvent {
     std::uint64_t id = 0;
     std::int64_t raised = 0; ///< milliseconds since 1970-01-01, UTC

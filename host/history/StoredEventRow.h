@@ -8,20 +8,20 @@
 
 namespace zrm::host {
 
-/// The current row of a statement that begins with `select`: one event as the file has it. Its
-/// texts last until the statement's next step or reset.
+/// The current row of a statement that begins with `select`: one event as stored. Its texts are
+/// valid until the statement's next step or reset.
 class StoredEventRow {
 public:
-    /// "SELECT ... WHERE ", to which the conditions are added. Columns are events.id, raised,
-    /// label; a label that a damaged event names may not exist.
+    /// "SELECT ... WHERE ", to which conditions are appended. Columns are events.id, raised, label;
+    /// the label of a damaged event may not exist.
     static const char* const select;
 
     explicit StoredEventRow(const Statement& row) : m_row(row) {}
 
     EventRecord record() const;
 
-    /// Whether the event is what was written. Of one that was written without a checksum, whether
-    /// it is JSON.
+    /// Whether the event is as it was written. For an event without a checksum, whether it is valid
+    /// JSON.
     bool isIntact() const;
 
 private:

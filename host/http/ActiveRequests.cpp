@@ -4,7 +4,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Requests of this thread: the thread that ends the process does not wait for itself.
+/// Requests of this thread: a thread that ends the process must not wait for itself.
 thread_local int ownRequests = 0;
 
 } // namespace

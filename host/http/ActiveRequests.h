@@ -7,10 +7,10 @@
 
 namespace zrm::host {
 
-/// Counts the requests under way, so that the end of the process can wait for them. Any thread.
+/// Counts the requests in progress, so that process exit can wait for them. Any thread.
 class ActiveRequests {
 public:
-    /// One request, while it lives; false when no more requests are begun.
+    /// One request while it exists; false when no more requests may begin.
     class Guard {
     public:
         explicit Guard(ActiveRequests& requests);
@@ -24,7 +24,7 @@ public:
         bool m_isCounted;
     };
 
-    /// Lets no more requests begin and waits for those of other threads, at most until the limit.
+    /// Prevents new requests and waits for those of other threads, until the limit at the latest.
     void close(std::chrono::steady_clock::time_point limit);
 
 private:

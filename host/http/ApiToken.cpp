@@ -36,7 +36,7 @@ std::string because(const std::string& what, int number) {
     return what + ": " + error.text();
 }
 
-/// New random characters; none when the system has no random bytes.
+/// A new random token; none when the system has no random bytes.
 std::optional<std::string> newToken() {
     const Stream random(std::fopen("/dev/urandom", "re"));
     std::array<unsigned char, randomBytes> bytes{};
@@ -53,7 +53,7 @@ std::optional<std::string> newToken() {
     return token;
 }
 
-/// Writes and syncs the whole text; false leaves errno.
+/// Writes and syncs the whole text; false with errno set.
 bool writeAll(int fd, std::string_view text) {
     while (!text.empty()) {
         const ssize_t written = write(fd, text.data(), text.size());
@@ -65,8 +65,8 @@ bool writeAll(int fd, std::string_view text) {
     return fsync(fd) == 0;
 }
 
-/// Makes the file appear with its whole content; one that has appeared meanwhile is left as it is.
-/// Returns what is wrong, empty when nothing is.
+/// Creates the file atomically with its contents; a file that has appeared meanwhile is left as it
+/// is. Returns an error message, empty on success.
 std::string make(const std::string& path) {
     const std::string directory = path.substr(0, path.rfind('/'));
     if (!directory.empty() && mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
@@ -77,7 +77,7 @@ std::string make(const std::string& path) {
         return "cannot read /dev/urandom";
     }
     std::string temporary = path + ".XXXXXX";
-    const int fd = mkstemp(temporary.data()); // readable for the owner alone
+    const int fd = mkstemp(temporary.data()); // readable only by the owner
     if (fd == -1) {
         return because("cannot create a file in " + directory, errno);
     }
@@ -100,7 +100,7 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     TraceScope trace(anchor);
     struct stat status {};
     if (stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode)) {
-        return path + " is not a file that can contain a token"; // opening a pipe would wait
+        return path + " is not a file that can contain a token"; // opening a pipe would block
     }
     Stream stream(std::fopen(path.c_str(), "re"));
     if (stream == nullptr && errno == ENOENT) {

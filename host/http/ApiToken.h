@@ -12,12 +12,12 @@ class ApiToken {
 public:
     explicit ApiToken(std::string token);
 
-    /// Reads the token from its file. A missing file is made, readable for the owner alone, with
-    /// 32 random bytes in hexadecimal, and so is its directory. Gives what is wrong when there is
-    /// no token in the end.
+    /// Reads the token from its file. If the file is missing, creates it and its directory,
+    /// readable only by the owner, with 32 random bytes in hexadecimal. Returns an error message
+    /// when there is no token in the end.
     static std::variant<ApiToken, std::string> load(const std::string& path);
 
-    /// True when the text is the token. The time it takes does not tell how much of it is right.
+    /// True when the text is the token. The time taken does not reveal how much of it is right.
     bool matches(std::string_view presented) const noexcept;
 
 private:

@@ -36,7 +36,7 @@ private:
     tcp::socket m_socket;
 };
 
-/// The library's own handle of a context that others hold too.
+/// The library's own handle of a shared context.
 asio::ssl::context shared(const TlsContext& tls) {
     SSL_CTX_up_ref(tls.handle());
     return asio::ssl::context(tls.handle());

@@ -46,8 +46,8 @@ Credentials::Change Credentials::refresh() {
     return change;
 }
 
-/// Certificate and key are two files: between the changes of the two they do not fit together. So
-/// what is wrong counts when it is still wrong at the next look.
+/// Certificate and key are two files, which do not match while only one has been replaced. So a
+/// problem counts only if it is still there at the next check.
 void Credentials::refreshTls(Change& change) {
     const bool isCertificateNew = m_certificateFile.hasChanged();
     const bool isKeyNew = m_keyFile.hasChanged();

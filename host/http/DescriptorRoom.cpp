@@ -11,12 +11,12 @@ namespace zrm::host {
 
 namespace {
 
-/// Descriptors beside those of the agent and of connections.
+/// Descriptors besides those of the agent and of connections.
 constexpr rlim_t spare = 64;
 
-/// Lets the system enlarge the process's table of descriptors up to this one. It does so when a
-/// descriptor needs it, and where there are threads that takes it many milliseconds, for which the
-/// first client would wait.
+/// Makes the system enlarge the process's descriptor table up to this one. Otherwise it does so on
+/// demand, which in a process with threads takes many milliseconds that the first client would have
+/// to wait.
 void enlargeTable(int descriptor) {
     const int opened = open("/dev/null", O_RDONLY | O_CLOEXEC);
     const int moved = opened != -1 ? fcntl(opened, F_DUPFD_CLOEXEC, descriptor) : -1;
@@ -30,7 +30,7 @@ void enlargeTable(int descriptor) {
 } // namespace
 
 DescriptorRoom DescriptorRoom::make(std::size_t wanted) {
-    constexpr rlim_t low = FD_SETSIZE; // below these, select can be used
+    constexpr rlim_t low = FD_SETSIZE; // select can be used below this
     const rlim_t needed = low + static_cast<rlim_t>(wanted) + spare;
     rlimit limit{};
     if (getrlimit(RLIMIT_NOFILE, &limit) == -1) {

@@ -5,13 +5,13 @@
 
 namespace zrm::host {
 
-/// The part of the process's descriptors that connections may take.
+/// The descriptors of the process that connections may use.
 struct DescriptorRoom {
-    std::size_t count = 0; ///< of connections
-    int lowest = 0;        ///< the smallest descriptor of a connection
+    std::size_t count = 0; ///< number of connections
+    int lowest = 0;        ///< the lowest descriptor for a connection
 
-    /// Room for so many connections, or for as many as there can be: raises the process's soft
-    /// limit of descriptors where it is too low, and leaves enough of them to the agent.
+    /// Room for this many connections, or for as many as possible. Raises the process's soft limit
+    /// of descriptors if it is too low, and leaves enough of them for the agent.
     static DescriptorRoom make(std::size_t wanted);
 };
 

@@ -23,7 +23,7 @@ namespace zrm::host {
 
 class StreamChannel;
 
-/// What the connections of a server share. Outlives them.
+/// What the connections of a server share. Must outlive them.
 struct ConnectionContext {
     RequestDispatcher& dispatcher;
     WorkerPool& workers;      ///< for Router::USUAL
@@ -32,16 +32,16 @@ struct ConnectionContext {
     std::atomic<bool> isStopping{false};
 };
 
-/// One client's connection: requests in, answers out, one after the other, each with a time by
-/// which it must be over. Nothing here waits: every step begins when the one before it is done, or
-/// when its time is up. Everything runs on the one thread of the socket's executor, except for the
-/// handlers of requests, which run on workers.
+/// One client's connection: requests in, answers out, one after the other, each with a deadline.
+/// Nothing here blocks: each step begins when the previous one is done or its time is up.
+/// Everything runs on the one thread of the socket's executor, except the request handlers, which
+/// run on workers.
 class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
 public:
-    /// This many requests are served over one connection.
+    /// The most requests served over one connection.
     static constexpr std::size_t requestsPerConnection = 1000;
 
-    /// `address` is the client's, whose place among the connections was taken.
+    /// `address` is the client's; its place in ConnectionShares has been taken.
     HttpConnection(ConnectionContext& context, std::unique_ptr<ClientStream> stream, bool isTls,
                    std::string address);
     ~HttpConnection();
@@ -49,11 +49,11 @@ public:
     HttpConnection& operator=(const HttpConnection&) = delete;
 
     void start();
-    /// The server stops: an answer under way is sent, everything else ends now.
+    /// The server stops: the current answer is still sent, everything else ends now.
     void stop();
-    /// Nobody needs the answer under way any more; streams end.
+    /// The current answer is no longer needed; streams end.
     void cancel();
-    /// Ends at once.
+    /// Closes the connection at once.
     void close();
 
 private:
@@ -117,30 +117,30 @@ private:
     boost::asio::steady_timer m_timer;
     Phase m_phase = OPENING;
 
-    std::array<char, 4096> m_piece; ///< what is read at a time
+    std::array<char, 4096> m_piece; ///< buffer for one read
     bool m_isReading = false;
-    bool m_isEnded = false;    ///< the client sends no more
-    std::string m_in;          ///< received and not yet taken
-    std::size_t m_dropped = 0; ///< bytes thrown away while leaving
+    bool m_isEnded = false;    ///< the client sends no more data
+    std::string m_in;          ///< received and not yet parsed
+    std::size_t m_dropped = 0; ///< bytes discarded while closing
 
     std::optional<RequestParser> m_parser;
     std::size_t m_requests = 0;
-    std::size_t m_bodyBytes = 0; ///< received behind the head
-    bool m_isLast = false;       ///< the connection ends with the answer
+    std::size_t m_bodyBytes = 0; ///< received after the head
+    bool m_isLast = false;       ///< the connection ends after the answer
     bool m_isHead = false;       ///< the answer has no body
     bool m_isHttp10 = false;
     bool m_waitsForContinue = false;
     std::optional<RequestDispatcher::Admission> m_admission;
     std::shared_ptr<Job> m_job;
 
-    std::string m_head; ///< of what is written
+    std::string m_head; ///< head of the answer being written
     std::string m_body;
-    std::size_t m_written = 0; ///< of both
+    std::size_t m_written = 0; ///< bytes written of head and body
     Clock::time_point m_writeLimit;
 
     std::shared_ptr<StreamChannel> m_channel;
-    std::string m_streamText;      ///< in chunks, not yet being written
-    std::size_t m_streamBytes = 0; ///< of it, what was handed over
+    std::string m_streamText;      ///< as chunks, not yet being written
+    std::size_t m_streamBytes = 0; ///< of these, the payload bytes
     bool m_isWritingStream = false;
     bool m_isStreamOver = false;
 };

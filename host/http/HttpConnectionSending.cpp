@@ -15,7 +15,7 @@ using namespace std::chrono_literals;
 using std::chrono::milliseconds;
 
 constexpr milliseconds sendingTime = 60s;       ///< for an answer that is not a stream
-constexpr milliseconds noProgress = 5s;         ///< for a client that takes no byte
+constexpr milliseconds noProgress = 5s;         ///< for a client that takes no data
 constexpr milliseconds noProgressAtTheEnd = 1s; ///< the same while the server stops
 constexpr milliseconds leavingTime = 1s;
 
@@ -67,7 +67,7 @@ void HttpConnection::onWritten(const Error& error, std::size_t count,
     } else if (m_phase == WRITING && Clock::now() >= m_writeLimit) {
         close();
     } else {
-        if (m_phase != READING_BODY) { // what asks for a body does not put the end of its time off
+        if (m_phase != READING_BODY) { // "100 Continue" must not extend the time for the body
             setTimer(progressTime());
         }
         writeParts(std::move(whenWritten));
@@ -84,8 +84,8 @@ void HttpConnection::afterAnswer() {
     }
 }
 
-/// Lets the client have what was sent: says that there is no more, and throws away what it still
-/// sends, for a short time. Closing at once would take away what it has not read yet.
+/// Lets the client read what was sent: ends the sending side and discards what the client still
+/// sends, for a short time. Closing at once would destroy data that it has not read yet.
 void HttpConnection::leave() {
     enter(LEAVING, leavingTime);
     m_stream->sayFarewell([self = shared_from_this()](const Error&, std::size_t) {

@@ -6,10 +6,10 @@
 
 namespace zrm::host {
 
-/// Times as the headers of HTTP have them, whatever the locale. Stateless.
+/// Times in the form of HTTP headers, whatever the locale. Stateless.
 class HttpDate {
 public:
-    /// A time in seconds since 1970-01-01 UTC, as in "Sun, 06 Nov 1994 08:49:37 GMT".
+    /// Formats a time in seconds since 1970-01-01 UTC as in "Sun, 06 Nov 1994 08:49:37 GMT".
     static std::string text(std::int64_t seconds);
 
     static std::string now();

@@ -8,17 +8,17 @@
 
 namespace zrm::host {
 
-/// What a resource sees of a request, which has passed every rule of access by then.
+/// A request as a resource sees it, after all access checks.
 struct HttpRequest {
-    std::string method;                ///< GET stands for HEAD too
-    std::string path;                  ///< as it was sent, without the query
+    std::string method;                ///< GET also for HEAD requests
+    std::string path;                  ///< as sent, without the query
     std::vector<std::string> captures; ///< the pattern's {names} in order, decoded, valid UTF-8
     std::multimap<std::string, std::string> query; ///< decoded, valid UTF-8
     std::string body;                              ///< empty, or sent as application/json
-    std::string lastEventId;                       ///< header Last-Event-ID, empty without
-    std::string accept;                            ///< header Accept, empty without
-    /// Once it is requested, nobody needs the answer: long work ends early. A token without a state
-    /// is never requested.
+    std::string lastEventId;                       ///< header Last-Event-ID; empty if absent
+    std::string accept;                            ///< header Accept; empty if absent
+    /// Requested once the answer is no longer needed, so that long work ends early. A token without
+    /// a state is never requested.
     std::stop_token cancelled;
 };
 

@@ -16,21 +16,21 @@ namespace zrm::host {
 class RequestStatistics;
 class Router;
 
-/// Serves the routes of a router over HTTP, with limits on everything that a client can do. A few
-/// threads do all reading and writing, handlers run on workers. start, renew, stop and abandon are
-/// called by one thread at a time.
+/// Serves the routes of a router over HTTP, with limits on everything a client can do. A few
+/// threads do all network I/O; handlers run on workers. start, renew, stop and abandon are called
+/// by one thread at a time.
 class HttpServer {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// How many may be served at a time, and how many threads do so.
+    /// The number of connections served at a time, and of threads.
     struct Size {
-        std::size_t connections = 2048; ///< fewer where the process may have few descriptors
+        std::size_t connections = 2048; ///< fewer if the process may have only few descriptors
         std::size_t workers = 16;
         std::size_t quickWorkers = 2; ///< for routes on Router::QUICK
     };
 
-    /// `router` outlives the object.
+    /// `router` must outlive the object.
     explicit HttpServer(const Router& router);
     HttpServer(const Router& router, const Size& size);
     HttpServer(const HttpServer&) = delete;
@@ -38,31 +38,31 @@ public:
     /// Stops the server and waits for its threads.
     ~HttpServer();
 
-    /// Begins to listen and to serve, on threads of its own; under TLS when there is a certificate.
-    /// Returns what is wrong, empty when nothing is.
+    /// Starts listening and serving on its own threads, under TLS when there is a certificate.
+    /// Returns an error message, empty on success.
     std::string start(const ListenAddress& address, ApiToken token,
                       std::shared_ptr<const TlsContext> tls = nullptr);
 
-    /// From now on requests carry this token, and new connections use this certificate; null where
-    /// the server was started without one. Connections that are open live on.
+    /// From now on requests must carry this token, and new connections use this certificate, which
+    /// is null if the server was started without one. Open connections stay open.
     void renew(ApiToken token, std::shared_ptr<const TlsContext> tls);
 
     /// The port at which it listens.
     std::uint16_t port() const noexcept;
 
-    /// What was answered so far, and how many connections are open. Any thread.
+    /// Statistics on the requests answered so far, and the number of open connections. Any thread.
     const RequestStatistics& statistics() const noexcept;
     std::size_t connections() const;
     /// Connections that were refused because the limit was reached.
     std::uint64_t refusedConnections() const;
 
-    /// Ends the serving: requests under way are cancelled and answered first, streams end. At the
-    /// limit it returns although a client is still being served; no request is answered from then
-    /// on. Any number of times; not on a thread of the server.
+    /// Stops serving: current requests are cancelled and answered first, streams end. Returns at
+    /// the limit even if a client is still being served; no request is answered after that. May be
+    /// called more than once; not on a thread of the server.
     void stop(Clock::time_point limit);
 
-    /// For the end of the process on any thread, also on one of the server's: answers no further
-    /// requests, cancels those under way and waits for them, at most until the limit.
+    /// For process exit on any thread, including the server's own: answers no more requests,
+    /// cancels the current ones and waits for them, until the limit at the latest.
     void abandon(Clock::time_point limit);
 
 private:

@@ -18,13 +18,13 @@ using nlohmann::json;
 
 constexpr int deepest = 32;
 
-/// A key as a part of a place: also the empty one can be seen.
+/// A key as part of a location; makes even an empty key visible.
 std::string shown(std::string_view key) {
     return key.empty() ? "\"\"" : std::string(key);
 }
 
-/// Watches a body while it is parsed: the parser itself takes any depth, and the last of several
-/// members of one name.
+/// Checks a body while it is parsed: the parser itself accepts any depth, and takes the last of
+/// several members with the same name.
 class BodyRules {
 public:
     bool operator()(int depth, json::parse_event_t event, const json& parsed) {
@@ -42,7 +42,7 @@ public:
     }
 
 private:
-    std::vector<std::set<std::string>> m_keys; ///< of the objects that are open
+    std::vector<std::set<std::string>> m_keys; ///< keys of the open objects
 };
 
 std::shared_ptr<const json> parse(std::string_view body) {
@@ -155,7 +155,7 @@ JsonFields JsonFields::object(std::string_view key) {
     if (!value.is_object()) {
         refuse(key, "write an object");
     }
-    // Shares the body, of which the object is a part.
+    // Shares ownership of the body that contains the object.
     return {std::shared_ptr<const json>(m_object, &value), place(key) + "."};
 }
 

@@ -13,20 +13,20 @@
 
 namespace zrm::host {
 
-/// The members of a JSON object of a request's body while they are read: gives values by key and
-/// type and knows which keys nobody asked for. Whatever is wrong is thrown as RequestRefused, with
-/// status 400 and the place in the body as its field. A member that is null counts as missing.
+/// Reads the members of a JSON object in a request's body: returns values by key and type and knows
+/// which keys have not been read. Errors are thrown as RequestRefused, with status 400 and the
+/// location in the body as the field. A null member counts as missing.
 class JsonFields {
 public:
-    /// Reads a body, which must be one object; an empty body counts as {}. Objects and lists that
-    /// lie deeper than 32, a key that comes twice, and texts that are no UTF-8 are refused.
+    /// Parses a body, which must be one object; an empty body counts as {}. Refuses nesting deeper
+    /// than 32, duplicate keys, and texts that are not UTF-8.
     explicit JsonFields(std::string_view body);
     JsonFields(JsonFields&& other) noexcept;
     ~JsonFields();
 
     bool has(std::string_view key) const;
 
-    /// A text without NUL characters; empty texts too.
+    /// A text without NUL characters; may be empty.
     std::string text(std::string_view key);
     std::optional<std::string> optionalText(std::string_view key);
 
@@ -42,17 +42,17 @@ public:
     JsonFields object(std::string_view key);
     std::optional<JsonFields> optionalObject(std::string_view key);
 
-    /// Any value; null when the key is missing. It lives as long as the body's own fields.
+    /// Any value; null when the key is missing. Valid as long as the fields of the whole body.
     const nlohmann::json& value(std::string_view key);
 
-    /// The place of a member in the body, for example definition.when[0].
+    /// The location of a member in the body, for example definition.when[0].
     std::string place(std::string_view key) const;
     std::string place(std::string_view key, std::size_t index) const;
 
-    /// Refuses the request because of a member.
+    /// Refuses the request, naming a member.
     [[noreturn]] void refuse(std::string_view key, const std::string& detail) const;
 
-    /// Every member that was not asked for is refused. To be called when all were.
+    /// Refuses members that have not been read. Call it last.
     void refuseUnknown() const;
 
 private:
@@ -62,8 +62,8 @@ private:
     const nlohmann::json& required(std::string_view key);
 
     std::shared_ptr<const nlohmann::json> m_object;
-    std::string m_prefix;             ///< stands before a key in a place
-    std::vector<std::string> m_known; ///< keys that were asked for, in that order
+    std::string m_prefix;             ///< precedes a key in a location
+    std::vector<std::string> m_known; ///< keys that have been read, in that order
 };
 
 } // namespace zrm::host

@@ -11,17 +11,17 @@
 
 namespace zrm::host {
 
-/// The parameters of a request's query while they are read. Whatever is wrong is thrown as
-/// RequestRefused, with status 400 and the parameter's name as its field.
+/// Reads the parameters of a request's query. Errors are thrown as RequestRefused, with status 400
+/// and the parameter's name as the field.
 class QueryFields {
 public:
-    /// `request` outlives the object.
+    /// `request` must outlive the object.
     explicit QueryFields(const HttpRequest& request) : m_query(request.query) {}
 
-    /// The value of a parameter that comes at most once.
+    /// The value of a parameter that may occur at most once.
     std::optional<std::string> text(const std::string& name);
 
-    /// Every value of a parameter.
+    /// All values of a parameter.
     std::vector<std::string> texts(const std::string& name);
 
     /// A whole number within the limits.
@@ -31,12 +31,12 @@ public:
     /// A time: milliseconds since 1970-01-01 UTC.
     std::optional<std::int64_t> time(const std::string& name);
 
-    /// Every parameter that was not asked for is refused. To be called when all were.
+    /// Refuses parameters that have not been read. Call it last.
     void refuseUnknown() const;
 
 private:
     const std::multimap<std::string, std::string>& m_query;
-    std::vector<std::string> m_known; ///< names that were asked for, in that order
+    std::vector<std::string> m_known; ///< names that have been read, in that order
 };
 
 } // namespace zrm::host

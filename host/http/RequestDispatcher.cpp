@@ -57,7 +57,7 @@ bool isJson(const std::string& contentType) {
     return type.size() == json.size() && strncasecmp(type.data(), json.data(), json.size()) == 0;
 }
 
-/// What speaks against a body before it is read.
+/// Refuses a body before it is read.
 void checkBody(const IncomingRequest& incoming) {
     if (!incoming.hasBody) {
         return;
@@ -70,14 +70,14 @@ void checkBody(const IncomingRequest& incoming) {
     }
 }
 
-/// What may read a whole log takes longer than the rest, and is ended then.
+/// Requests that may read a whole log get more time than others before they are ended.
 bool mayBeLong(std::string_view pattern) {
     constexpr std::string_view patterns[] = {"/api/v1/reports", "/api/v1/explain",
                                              "/api/v1/backtest", "/api/v1/tables/{table}/sample"};
     return std::ranges::find(patterns, pattern) != std::end(patterns);
 }
 
-/// Ends what the handler reads when the time is over or nobody waits for it any more.
+/// Ends the handler's reading when the time is up or the answer is no longer needed.
 HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& request,
                         std::string_view pattern, ActiveRequests& active) {
     const std::chrono::milliseconds limit =
@@ -151,7 +151,7 @@ std::shared_ptr<const RequestGuard> RequestDispatcher::guard() {
     return m_guard;
 }
 
-/// Does a part of the work on a request; what it throws becomes the answer.
+/// Does part of the work on a request; what it throws becomes the answer.
 template <class Work>
 std::optional<HttpAnswer> RequestDispatcher::problemOf(const HttpRequest& request, Work work) {
     TraceScope trace(anchor);
@@ -204,7 +204,7 @@ void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission
     decodeCaptures(match, request);
     decodeQuery(incoming);
     if (!isRead(request.method)) {
-        QueryFields(request).refuseUnknown(); // what changes something is told by bodies alone
+        QueryFields(request).refuseUnknown(); // changes take their parameters from the body only
     }
     checkBody(incoming);
     if (request.method == "HEAD") {

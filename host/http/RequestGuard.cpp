@@ -7,7 +7,7 @@ namespace zrm::host {
 
 namespace {
 
-// The ports that an authority may leave out.
+// The default ports, which an authority may leave out.
 constexpr std::uint16_t httpPort = 80;
 constexpr std::uint16_t httpsPort = 443;
 

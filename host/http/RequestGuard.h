@@ -15,24 +15,24 @@
 
 namespace zrm::host {
 
-/// Decides which requests may reach the API: those that were meant for this server (a web page of
-/// another origin cannot make a browser ask it, also not through a name that it points here), and
-/// that carry the token. Immutable, so any thread.
+/// Decides which requests may reach the API: those that are meant for this server and carry the
+/// token. A web page of another origin cannot make a browser send requests here, not even through a
+/// name that it points here. Immutable, so any thread.
 class RequestGuard {
 public:
-    /// What the decision needs of a request; missing headers are absent.
+    /// The parts of a request that the decision needs; missing headers are none.
     struct Headers {
         std::optional<std::string> host;
         std::optional<std::string> origin;
         std::optional<std::string> authorization;
     };
 
-    /// `address` is where the server listens, with the port that it really has. Under TLS the
-    /// names of the certificate are names of the server too.
+    /// `address` is where the server listens, with its actual port. Under TLS, the names in the
+    /// certificate are also names of the server.
     RequestGuard(const ListenAddress& address, ApiToken token,
                  std::shared_ptr<const TlsContext> tls = nullptr);
 
-    /// Why the request is refused; none when it may pass. `isPublic`: needs no token.
+    /// Why the request is refused; none when it is allowed. `isPublic`: needs no token.
     std::optional<Problem> refuse(const Headers& headers, bool isPublic) const;
 
 private:
@@ -40,9 +40,9 @@ private:
     bool isInCertificate(std::string_view authority) const;
 
     std::vector<std::string>
-        m_authorities; ///< HOST:PORT as the Host header may have it, lower case
+        m_authorities; ///< accepted values of the Host header, HOST:PORT in lower case
     ApiToken m_token;
-    std::shared_ptr<const TlsContext> m_tls; ///< null: without TLS
+    std::shared_ptr<const TlsContext> m_tls; ///< null: no TLS
     std::uint16_t m_port;
 };
 

@@ -9,7 +9,7 @@
 
 namespace zrm::host {
 
-/// Thrown where a request turns out to be refused: its problem becomes the answer.
+/// Thrown to refuse a request: its problem becomes the answer.
 class RequestRefused : public std::exception {
 public:
     explicit RequestRefused(Problem problem) : m_problem(std::move(problem)) {}

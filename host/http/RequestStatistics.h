@@ -11,13 +11,13 @@
 
 namespace zrm::host {
 
-/// Counts the requests that were answered, by route. Any thread.
+/// Counts answered requests by route. Any thread.
 class RequestStatistics {
 public:
-    /// Requests that are counted together. There are only as many as the router has routes.
+    /// Requests that are counted together. Their number is limited by the router's routes.
     struct Kind {
         std::string method; ///< empty when the request's head could not be read
-        std::string route;  ///< its pattern; empty for paths at which nothing is
+        std::string route;  ///< pattern of the route; empty for unknown paths
         int status = 0;
         bool operator<(const Kind& other) const {
             return std::tie(method, route, status) <
@@ -25,12 +25,12 @@ public:
         }
     };
 
-    /// Upper ends of the classes of durations: seconds. What takes longer is in none.
+    /// Upper bounds of the histogram buckets, in seconds. Longer durations are in no bucket.
     static constexpr std::array limits = {0.001, 0.005, 0.025, 0.1, 0.5, 2.5, 10.0};
 
-    /// The time that the answers of one route took, until their body was known.
+    /// How long the answers of one route took, up to the point where their body was known.
     struct Durations {
-        std::array<std::uint64_t, limits.size()> upTo{}; ///< answers that took up to the limit
+        std::array<std::uint64_t, limits.size()> upTo{}; ///< answers within each limit
         std::uint64_t count = 0;
         double seconds = 0;
     };

@@ -5,7 +5,7 @@ namespace zrm::host {
 
 class Router;
 
-/// A group of routes that belong together. Made before the server starts, and outlives it.
+/// A group of related routes. Created before the server starts; must outlive it.
 class Resource {
 public:
     virtual ~Resource() = default;

@@ -17,18 +17,18 @@ namespace {
 
 namespace http = boost::beast::http;
 
-/// Headers of every answer that does not say otherwise. Answers are given whole: without ranges.
+/// Default headers of every answer. Answers are always complete: ranges are not supported.
 constexpr std::pair<const char*, const char*> usualHeaders[] = {
     {"Cache-Control", "no-store"},
     {"X-Content-Type-Options", "nosniff"},
     {"Accept-Ranges", "none"},
 };
-constexpr const char* onlyTls = "max-age=31536000"; ///< a browser asks no other way for a year
+constexpr const char* onlyTls = "max-age=31536000"; ///< browsers use only TLS for a year
 constexpr int noContent = 204;
 
 std::string text(const http::response<http::empty_body>& response) {
     http::response_serializer<http::empty_body> serializer(response);
-    serializer.split(true); // the head alone
+    serializer.split(true); // only the head
     std::string head;
     boost::beast::error_code error;
     while (!serializer.is_header_done() && !error) {
@@ -55,7 +55,7 @@ std::string ResponseText::head(const HttpAnswer& answer, const Connection& conne
     }
     response.set(http::field::date, HttpDate::now());
     for (const auto& [name, value] : answer.headers) {
-        response.set(name, value); // in place of a usual one
+        response.set(name, value); // may replace a default header
     }
     if (answer.status != noContent) {
         response.set(http::field::content_type, answer.contentType);

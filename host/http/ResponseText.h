@@ -7,25 +7,25 @@
 
 namespace zrm::host {
 
-/// Answers as they go over a connection. Stateless.
+/// Answers as bytes sent over a connection. Stateless.
 class ResponseText {
 public:
-    /// What the connection adds to an answer.
+    /// What an answer needs to know about the connection.
     struct Connection {
-        bool isLast = false;   ///< it ends with this answer
-        bool isHttp10 = false; ///< the client does not know chunks
+        bool isLast = false;   ///< it ends after this answer
+        bool isHttp10 = false; ///< the client does not support chunks
         bool isTls = false;
     };
 
-    /// Everything before the body. A stream is sent in chunks, to a client that knows them.
+    /// Everything before the body. A stream is sent in chunks if the client supports them.
     static std::string head(const HttpAnswer& answer, const Connection& connection);
 
-    /// A part of a body that is sent in chunks; not empty.
+    /// A non-empty part of a chunked body.
     static std::string chunk(const std::string& text);
-    /// The end of such a body.
+    /// The end of a chunked body.
     static std::string lastChunk();
 
-    /// Asks a client that waits for it to send the body.
+    /// Asks a client that waits for "100 Continue" to send the body.
     static std::string askForBody();
 };
 

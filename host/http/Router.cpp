@@ -8,7 +8,7 @@ namespace zrm::host {
 
 namespace {
 
-/// Where a part of a pattern stands among the alternatives for one part of a path.
+/// The rank of a pattern segment among the alternatives for a path segment.
 constexpr char literalRank = 'a';
 constexpr char captureRank = 'b';
 constexpr char restRank = 'c';
@@ -20,7 +20,7 @@ char rankOf(std::string_view part) {
     return part.starts_with('{') ? captureRank : literalRank;
 }
 
-/// The texts between the slashes; the path begins with one.
+/// The texts between the slashes; the path begins with a slash.
 std::vector<std::string> split(std::string_view path) {
     std::vector<std::string> parts;
     while (path.starts_with('/')) {
@@ -40,7 +40,7 @@ std::string joined(const std::vector<std::string>& parts, std::size_t from) {
     return text;
 }
 
-/// What the pattern's captures are in the path; none when it does not match.
+/// The values of the pattern's captures in the path; none when it does not match.
 std::optional<std::vector<std::string>> captures(const std::vector<std::string>& pattern,
                                                  const std::vector<std::string>& path) {
     std::vector<std::string> found;

@@ -12,45 +12,45 @@
 
 namespace zrm::host {
 
-/// Which handler answers which method and path. Filled before the server starts; then any thread.
+/// Maps methods and paths to handlers. Filled before the server starts; after that, any thread.
 class Router {
 public:
     /// Answers a request; may throw RequestRefused. Any other exception becomes a status 500.
     using Handler = std::function<HttpAnswer(const HttpRequest&)>;
 
-    /// Who may ask.
+    /// Who may send the request.
     enum class Access {
-        TOKEN,  ///< who carries the API token
-        PUBLIC, ///< anyone that reaches this server
+        TOKEN,  ///< clients with the API token
+        PUBLIC, ///< anyone who can reach this server
     };
     using enum Access;
 
     /// Where a handler runs.
     enum Lane {
-        USUAL, ///< among all others; may take its time
-        QUICK, ///< apart from them, so that no slow answer keeps it waiting; never waits itself
+        USUAL, ///< with all others; may be slow
+        QUICK, ///< separate, so that slow answers cannot delay it; never waits itself
     };
 
     /// The route of a request.
     struct Match {
         const Handler* handler = nullptr; ///< null: none for this method, or for this path
-        std::string pattern;              ///< empty when nothing is at this path
+        std::string pattern;              ///< empty when no route has this path
         Access access = TOKEN;
         Lane lane = USUAL;
-        std::vector<std::string> captures; ///< as they stand in the path, not decoded
-        std::string allow; ///< the methods of this path, as the header Allow names them
+        std::vector<std::string> captures; ///< as in the path, not decoded
+        std::string allow;                 ///< the methods of this path, as in the Allow header
     };
 
-    /// Adds a route. A pattern is a path; `{name}` stands for any one part of it that is not
-    /// empty, and `*` at the end for any rest. Literal parts win over these. A route for GET
-    /// answers HEAD too.
+    /// Adds a route. A pattern is a path in which `{name}` matches one non-empty segment and a
+    /// final `*` matches any rest. Literal segments take precedence. A route for GET also answers
+    /// HEAD.
     void add(std::string method, const std::string& pattern, Handler handler, Access access = TOKEN,
              Lane lane = USUAL);
 
-    /// Finds the route of a path as it was sent, without the query.
+    /// Finds the route for a path as sent, without the query.
     Match match(std::string_view method, std::string_view path) const;
 
-    /// Method and pattern of every route, in the order in which they were added.
+    /// Method and pattern of every route, in the order of addition.
     std::vector<std::pair<std::string, std::string>> routes() const;
 
 private:

@@ -11,7 +11,7 @@ namespace zrm::host {
 StreamChannel::StreamChannel(HttpConnection& connection, std::function<void()> changed)
     : m_connection(&connection), m_changed(std::move(changed)) {}
 
-/// Does work on the connection's own thread, where the connection is then still there. The mutex is
+/// Runs work on the connection's own thread, if the connection still exists then. The mutex is
 /// held.
 template <class Work> void StreamChannel::inConnection(Work work) {
     if (m_connection == nullptr) {

@@ -13,10 +13,10 @@ namespace zrm::host {
 
 class HttpConnection;
 
-/// The channel of a stream over a connection, which may end before it.
+/// The channel of a stream over a connection, which may end before the channel.
 class StreamChannel : public BodyChannel {
 public:
-    /// `changed` as in HttpAnswer::Stream; may be empty.
+    /// `changed` is as in HttpAnswer::Stream; may be empty.
     StreamChannel(HttpConnection& connection, std::function<void()> changed);
 
     void send(std::string text) override;
@@ -26,17 +26,17 @@ public:
 
     // For the connection.
 
-    /// The client has taken so many bytes that were handed over.
+    /// The client has taken this many of the bytes sent.
     void taken(std::size_t bytes);
-    /// There is nobody any more to whom this leads.
+    /// The connection is gone.
     void close();
 
 private:
     template <class Work> void inConnection(Work work);
 
-    mutable std::mutex m_mutex;   ///< guards what follows
+    mutable std::mutex m_mutex;   ///< guards the members below
     HttpConnection* m_connection; ///< null: closed
-    std::size_t m_unsent = 0;     ///< bytes handed over and not yet taken
+    std::size_t m_unsent = 0;     ///< bytes sent and not yet taken by the client
     const std::function<void()> m_changed;
 };
 

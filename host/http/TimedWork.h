@@ -8,14 +8,14 @@
 
 namespace zrm::host {
 
-/// Answers that come in time. The work for one is done on a thread of its own, which is left behind
-/// when the system does not let it go on: a file system that does not answer holds up the request
-/// that needs it and no other. Any thread.
+/// Answers within a time limit. The work for each answer runs on its own thread, which is abandoned
+/// if it blocks in the system: a file system that hangs delays only the request that needs it. Any
+/// thread.
 namespace TimedWork {
 
-/// The answer of the work, or whatever it throws; RequestRefused with status 503 when it has none
-/// within the limit, or when too much work is left behind already. Work that is left behind goes on
-/// when it can: what it refers to lives as long as the process.
+/// Returns the answer of the work, or throws what it throws. Throws RequestRefused with status 503
+/// when there is no answer within the limit, or when too much work has already been abandoned.
+/// Abandoned work continues when it can, so what it refers to must live as long as the process.
 HttpAnswer answer(std::function<HttpAnswer()> work, std::chrono::milliseconds limit);
 
 } // namespace TimedWork

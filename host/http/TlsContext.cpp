@@ -10,7 +10,7 @@ namespace zrm::host {
 
 namespace {
 
-/// What the library says of its last failure, or the system where a file cannot be read.
+/// The library's message for its last failure, or the system's when a file cannot be read.
 std::string because(const std::string& what) {
     const unsigned long code = ERR_get_error();
     ERR_clear_error();
@@ -22,11 +22,11 @@ std::string because(const std::string& what) {
     return what + ": " + (reason == nullptr ? "unknown reason" : reason);
 }
 
-/// For TLS 1.2: what cannot be read later with a stolen key, and is not open to padding attacks.
-/// The suites of TLS 1.3, which is spoken where the client can, are all of this kind.
+/// For TLS 1.2: suites with forward secrecy that are not open to padding attacks. All suites of TLS
+/// 1.3, which is used if the client supports it, are of this kind.
 constexpr const char* suites = "ECDHE+AESGCM:ECDHE+CHACHA20";
 
-/// In place of the question at the terminal, for whose answer the agent would wait.
+/// Replaces the prompt on the terminal, for which the agent would wait.
 int noPassphrase(char* /*text*/, int /*size*/, int /*isWriting*/, void* /*data*/) {
     return -1;
 }

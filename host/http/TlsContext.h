@@ -12,8 +12,8 @@ namespace zrm::host {
 /// A certificate and its key, for connections under TLS. Immutable, so any thread.
 class TlsContext {
 public:
-    /// Reads both files (PEM; the certificate's chain may follow it). Gives what is wrong when they
-    /// cannot be used.
+    /// Reads both files (PEM; the certificate's chain may follow it). Returns an error message when
+    /// they cannot be used.
     static std::variant<std::shared_ptr<const TlsContext>, std::string>
     load(const std::string& certificate, const std::string& key);
 
@@ -21,7 +21,7 @@ public:
     TlsContext(const TlsContext&) = delete;
     TlsContext& operator=(const TlsContext&) = delete;
 
-    /// True when the certificate was made out for this host name or address.
+    /// True when the certificate is valid for this host name or address.
     bool isFor(const std::string& host) const;
 
     ssl_ctx_st* handle() const noexcept { return m_context; }

@@ -35,7 +35,7 @@ bool WorkerPool::makeThread() {
         m_threads.emplace_back(&WorkerPool::run, this);
         ++m_idle;
         return true;
-    } catch (const std::system_error&) { // no thread can be had now
+    } catch (const std::system_error&) { // no thread can be started now
         return false;
     }
 }
@@ -52,7 +52,7 @@ void WorkerPool::run() {
         --m_idle;
         lock.unlock();
         work();
-        work = nullptr; // whatever it holds is gone before the thread counts as free
+        work = nullptr; // destroy what it holds before the thread counts as idle
         lock.lock();
         ++m_idle;
     }

@@ -11,11 +11,11 @@
 
 namespace zrm::host {
 
-/// A bounded number of threads for work that may wait, and a queue before them. A thread is started
-/// when there is work and none is free, and stays. Any thread.
+/// A bounded pool of threads with a queue, for work that may block. A thread is started when there
+/// is work and no idle thread, and then stays. Any thread.
 class WorkerPool {
 public:
-    /// At most this many threads, and so much work that waits for one.
+    /// Limits the number of threads and of queued work items.
     WorkerPool(std::size_t mostThreads, std::size_t mostWaiting)
         : m_mostThreads(mostThreads), m_mostWaiting(mostWaiting) {}
     WorkerPool(const WorkerPool&) = delete;
@@ -23,8 +23,8 @@ public:
     /// Waits until all work is done. Not on a thread of the pool.
     ~WorkerPool();
 
-    /// Has the work done, which throws nothing, in the order of submission. False when too much
-    /// waits already, or when there is no thread at all and none can be started.
+    /// Queues work, which must not throw; it runs in the order of submission. False when the queue
+    /// is full, or when there is no thread and none can be started.
     bool submit(std::function<void()> work);
 
 private:
@@ -33,10 +33,10 @@ private:
 
     const std::size_t m_mostThreads;
     const std::size_t m_mostWaiting;
-    std::mutex m_mutex; ///< guards what follows
+    std::mutex m_mutex; ///< guards the members below
     std::condition_variable m_changed;
     std::deque<std::function<void()>> m_waiting;
-    std::size_t m_idle = 0; ///< threads without work
+    std::size_t m_idle = 0; ///< idle threads
     bool m_isEnding = false;
     std::vector<std::thread> m_threads;
 };

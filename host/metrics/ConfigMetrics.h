@@ -7,16 +7,16 @@
 
 namespace zrm::host {
 
-/// How the last change of the configuration file went. Written by one thread, read by any.
+/// The result of the last change of the configuration file. Written by one thread, read by any.
 struct ConfigReload {
-    std::atomic<bool> isTakenOver{true};     ///< false: the file cannot be used as it is
-    std::atomic<bool> hasRemovedMost{false}; ///< more than half of the file's situations
+    std::atomic<bool> isTakenOver{true};     ///< false: the current file cannot be used
+    std::atomic<bool> hasRemovedMost{false}; ///< more than half of the situations are gone
 };
 
-/// Whether the agent's situations are those of its configuration file.
+/// Metrics on whether the agent's situations match its configuration file.
 class ConfigMetrics : public MetricSource {
 public:
-    /// The reload outlives the object.
+    /// The reload must outlive the object.
     explicit ConfigMetrics(const ConfigReload& reload) : m_reload(reload) {}
 
     void collect(MetricText& text) override;

@@ -7,10 +7,10 @@ namespace zrm::host {
 
 class Delivery;
 
-/// The way of events: the queue, the history, the sinks.
+/// Metrics of event delivery: the queue, the history, the sinks.
 class DeliveryMetrics : public MetricSource {
 public:
-    /// `delivery` outlives the object.
+    /// `delivery` must outlive the object.
     explicit DeliveryMetrics(Delivery& delivery) : m_delivery(delivery) {}
 
     void collect(MetricText& text) override;

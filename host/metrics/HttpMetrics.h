@@ -8,10 +8,10 @@ namespace zrm::host {
 class EventStream;
 class HttpServer;
 
-/// The server itself: requests, connections, clients of the event stream.
+/// Metrics of the server itself: requests, connections, event stream clients.
 class HttpMetrics : public MetricSource {
 public:
-    /// Both outlive the object.
+    /// Both must outlive the object.
     HttpMetrics(const HttpServer& server, const EventStream& stream)
         : m_server(server), m_stream(stream) {}
 

@@ -24,11 +24,11 @@ namespace {
 
 struct LogState {
     std::string status;
-    std::optional<LogLedgerView> ledger; ///< none: a refresh has just ended its monitoring
+    std::optional<LogLedgerView> ledger; ///< none: a refresh has just stopped its monitoring
 };
 using Logs = std::map<std::string, LogState>; ///< by path, so that no two have the same labels
 
-/// What the ledger of a log counts. The numbers of the table's rows have 32 bits.
+/// A count in the ledger of a log. The numbers in the table's rows have only 32 bits.
 struct Count {
     const char* name;
     const char* help;
@@ -70,7 +70,7 @@ Logs takeLogs() {
 
 void collectStates(MetricText& text, const Logs& logs) {
     std::vector<UnmonitoredLogs::Log> unmonitored = UnmonitoredLogs::read().logs;
-    // A refresh may come between the two.
+    // A refresh may happen between the two calls.
     std::erase_if(unmonitored,
                   [&](const UnmonitoredLogs::Log& log) { return logs.contains(log.log); });
     text.gauge("zrm_logs", "Number of monitored logs.");

@@ -7,10 +7,10 @@ namespace zrm::host {
 
 class LogWatch;
 
-/// The monitored logs: what the agent tells of each in the Monitored Logs table.
+/// Metrics of the monitored logs, from the Monitored Logs table.
 class LogMetrics : public MetricSource {
 public:
-    /// `watch` outlives the object.
+    /// `watch` must outlive the object.
     explicit LogMetrics(const LogWatch& watch) : m_watch(watch) {}
 
     void collect(MetricText& text) override;

@@ -5,12 +5,12 @@ namespace zrm::host {
 
 class MetricText;
 
-/// A part of the host that has metrics.
+/// A part of the host that provides metrics.
 class MetricSource {
 public:
     virtual ~MetricSource() = default;
 
-    /// Adds the metrics as they are now, each family once. Any thread, several at a time.
+    /// Adds the current metrics, each family once. Any thread, several at a time.
     virtual void collect(MetricText& text) = 0;
 };
 

@@ -45,7 +45,7 @@ void MetricText::histogram(const std::string& name, const std::string& help) {
 
 void MetricText::add(double value, const Labels& labels) {
     ClientMetric& metric = m_families->add(labels);
-    metric.counter.value = value; // the family's type decides which one is written
+    metric.counter.value = value; // the family's type determines which one is written
     metric.gauge.value = value;
 }
 

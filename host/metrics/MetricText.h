@@ -10,7 +10,7 @@
 
 namespace zrm::host {
 
-/// Metrics while they are gathered for one scrape. One thread.
+/// Collects metrics for one scrape. Used by one thread.
 class MetricText {
 public:
     /// Names and values; values are UTF-8.
@@ -21,20 +21,20 @@ public:
     MetricText(const MetricText&) = delete;
     MetricText& operator=(const MetricText&) = delete;
 
-    // Begins a family; the values that are added next belong to it. Without a value it is left out.
+    // Begins a family; values added next belong to it. A family without values is left out.
     void counter(const std::string& name, const std::string& help);
     void gauge(const std::string& name, const std::string& help);
     void histogram(const std::string& name, const std::string& help);
 
-    /// A value of a counter or gauge. No two of a family have the same labels.
+    /// Adds a value of a counter or gauge. Labels must be unique within a family.
     void add(double value, const Labels& labels = {});
     void add(std::uint64_t value, const Labels& labels = {});
 
-    /// A value of a histogram: how many were up to each limit, how many there were, and their sum.
+    /// Adds a value of a histogram: the count up to each limit, the total count, and the sum.
     void add(std::span<const double> limits, std::span<const std::uint64_t> upTo,
              std::uint64_t count, double sum, const Labels& labels);
 
-    /// Everything in the form in which Prometheus reads it.
+    /// All metrics in the Prometheus text format.
     std::string text() const;
 
 private:

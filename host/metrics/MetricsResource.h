@@ -10,10 +10,10 @@
 
 namespace zrm::host {
 
-/// `GET /metrics`: every metric, for Prometheus.
+/// `GET /metrics`: all metrics, for Prometheus.
 class MetricsResource : public Resource {
 public:
-    /// Adds a part's metrics, behind those that were added before. Before the server starts.
+    /// Adds a source after those added before. Call before the server starts.
     void add(std::unique_ptr<MetricSource> source) { m_sources.push_back(std::move(source)); }
 
     void addRoutes(Router& router) override;

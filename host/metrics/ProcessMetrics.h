@@ -5,11 +5,11 @@
 
 namespace zrm::host {
 
-/// The process: version, start, processor time, memory, descriptors. What the system does not tell
-/// is left out.
+/// Metrics of the process: version, start, processor time, memory, descriptors. What the system
+/// does not report is left out.
 class ProcessMetrics : public MetricSource {
 public:
-    /// The process counts as started when this is made.
+    /// The process counts as started when this object is created.
     ProcessMetrics();
 
     void collect(MetricText& text) override;

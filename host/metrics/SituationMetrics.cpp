@@ -10,7 +10,7 @@ namespace zrm::host {
 
 namespace {
 
-/// What a situation counts.
+/// A count of a situation.
 struct Count {
     const char* name;
     const char* help;
@@ -27,7 +27,7 @@ constexpr Count counts[] = {
     {"zrm_situation_raised_total", "Events that the situation raised.", &SituationStatus::raised},
 };
 
-/// A name may come in both sources.
+/// A name may occur in both sources.
 MetricText::Labels labelsOf(const SituationStatus& situation) {
     return {{"situation", situation.config.name},
             {"source", situation.source == SituationStatus::FILE ? "file" : "api"}};

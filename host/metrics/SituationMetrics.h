@@ -7,10 +7,10 @@ namespace zrm::host {
 
 class SituationSet;
 
-/// The situations: their states and what they have counted.
+/// Metrics of the situations: their states and counts.
 class SituationMetrics : public MetricSource {
 public:
-    /// `situations` outlives the object.
+    /// `situations` must outlive the object.
     explicit SituationMetrics(const SituationSet& situations) : m_situations(situations) {}
 
     void collect(MetricText& text) override;

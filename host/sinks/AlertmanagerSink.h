@@ -7,8 +7,8 @@
 
 namespace zrm::host {
 
-/// Raises an alert at an Alertmanager (its API of version 2) for each event. An alert ends by
-/// itself some time after its event; an event that comes earlier with the same labels extends it.
+/// Raises an alert in an Alertmanager (API version 2) for each event. An alert ends by itself some
+/// time after its event; an event with the same labels before that extends it.
 class AlertmanagerSink : public JsonPostSink {
 public:
     explicit AlertmanagerSink(const SinkConfig& config);

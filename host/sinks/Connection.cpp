@@ -24,7 +24,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr int pollSlice = 100; ///< milliseconds
 
-/// More than this a receiver that is to answer nothing does not say between two deliveries.
+/// The most data accepted between two deliveries from a receiver that should send none.
 constexpr std::size_t mostHeard = 256 * 1024; ///< bytes
 
 } // namespace
@@ -35,7 +35,7 @@ Connection::Connection(ListenAddress receiver, Transport transport,
       m_lookup(m_receiver.host, m_receiver.port) {}
 
 Connection::~Connection() {
-    closeIfBroken(); // with something unread, the system would throw away what is still to be sent
+    closeIfBroken(); // closing with unread data would discard what is still to be sent
     close();
 }
 
@@ -61,7 +61,7 @@ bool Connection::wait(short events, const std::stop_token& giveUp) {
         const int ready =
             poll(&descriptor, 1, static_cast<int>(std::clamp<long>(left, 0, pollSlice)));
         if (ready > 0) {
-            return true; // whatever poll reports, the next call says it with its error number
+            return true; // whatever poll reports, the next call fails with the right errno
         }
         if (ready == -1 && errno != EINTR) {
             return fail("poll", errno);
@@ -122,7 +122,7 @@ void Connection::closeIfBroken() {
     while (isOpen() && m_transport == TCP) {
         const ssize_t count = recv(m_socket, buffer, sizeof buffer, MSG_DONTWAIT);
         if (count == -1 && errno == EAGAIN) {
-            return; // nothing to read: the connection stands
+            return; // nothing to read: the connection is up
         }
         heard += count > 0 ? static_cast<std::size_t>(count) : 0;
         if (count == 0 || (count == -1 && errno != EINTR) || heard > mostHeard) {
@@ -138,7 +138,7 @@ bool Connection::send(std::string_view bytes, const std::stop_token& giveUp) {
             bytes.remove_prefix(static_cast<std::size_t>(count));
         } else if (errno != EINTR &&
                    (errno == EAGAIN ? !wait(POLLOUT, giveUp) : !fail("send", errno))) {
-            // Over TCP a message may have gone out in part; a socket of UDP is bound to an address
+            // Over TCP a message may have been sent in part; a UDP socket is bound to an address
             // that this machine may have lost.
             close();
             return false;

@@ -41,7 +41,7 @@ std::string_view EventRow::source() const {
 }
 
 std::string_view EventRow::node() const {
-    // The type of the node follows a colon.
+    // The node type follows a colon.
     const std::string_view node = text("ORIGINNODE");
     return node.substr(0, node.rfind(':'));
 }

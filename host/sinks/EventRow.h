@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// The row of an event, read back from the event's JSON for the sinks that write it in another
-/// form. Immutable, so any thread.
+/// The row of an event, parsed from the event's JSON for sinks that write it in another form.
+/// Immutable, so any thread.
 class EventRow {
 public:
     struct Column {
@@ -21,19 +21,19 @@ public:
         std::variant<std::string, std::int64_t> value;
     };
 
-    /// Without columns when the record's JSON has no row.
+    /// Has no columns when the record's JSON contains no row.
     explicit EventRow(const EventRecord& event);
 
     /// The columns in table order.
     std::span<const Column> columns() const noexcept { return m_columns; }
 
-    /// A character column; empty when there is none of this name.
+    /// The text of a character column; empty when there is no column of this name.
     std::string_view text(std::string_view column) const;
 
-    /// What the entry says.
+    /// The text of the entry.
     std::string_view description() const;
 
-    /// The program or the part of it that wrote the entry.
+    /// The program, or part of a program, that wrote the entry.
     std::string_view source() const;
 
     /// The name of the system on which the entry was written.

@@ -23,11 +23,11 @@ TRC1_Anchor anchor{"HttpPost.cpp"};
 using Clock = std::chrono::steady_clock;
 using Outcome = HttpClientAnswer::Outcome;
 
-constexpr std::size_t longestAnswer = 64 * 1024; ///< bytes of the body that are kept
-constexpr std::size_t longestExcerpt = 200;      ///< bytes of the body in a message
+constexpr std::size_t longestAnswer = 64 * 1024; ///< bytes of the body kept
+constexpr std::size_t longestExcerpt = 200;      ///< bytes of the body shown in a message
 constexpr std::chrono::seconds longestPause{3600};
 
-/// What an outcome means to an operator.
+/// An outcome in words for the operator.
 struct OutcomeName {
     Outcome outcome;
     const char* text;
@@ -52,7 +52,7 @@ std::string textOf(const HttpClientAnswer& answer) {
     return found == outcomeNames.end() ? answer.detail : found->text;
 }
 
-/// The beginning of a body on one line.
+/// The beginning of a body, on one line.
 std::string excerpt(const std::string& body) {
     std::string text = body.substr(0, longestExcerpt);
     std::replace_if(
@@ -60,7 +60,7 @@ std::string excerpt(const std::string& body) {
     return text;
 }
 
-/// The pause that a busy receiver asks for; none when it gives no number of seconds.
+/// The pause that a busy receiver asks for; zero when it gives no number of seconds.
 std::chrono::seconds pauseOf(const HttpClientAnswer& answer) {
     const std::string& text = answer.retryAfter;
     std::int64_t seconds = 0;
@@ -94,7 +94,7 @@ private:
     const std::string m_headersFile;
     HttpClient m_client;
     Clock::time_point m_notBefore{}; ///< the end of the pause that the receiver asked for
-    std::string m_body;              ///< of the last answer
+    std::string m_body;              ///< body of the last answer
     std::string m_error;
 };
 
@@ -126,7 +126,7 @@ HttpClientRequest HttpPost::Implementation::requestOf(const std::string& body,
     return request;
 }
 
-/// Read anew each time, so that they can be changed while the agent runs.
+/// Reread each time, so that they can be changed while the agent runs.
 bool HttpPost::Implementation::addHeadersOfFile(HttpClientRequest& request) {
     if (m_headersFile.empty()) {
         return true;
@@ -150,7 +150,7 @@ bool HttpPost::Implementation::judge(const HttpClientAnswer& answer) {
                             : textOf(answer) + " (" + m_url.authority() + ')';
         return false;
     }
-    // The status counts, whatever came of the body.
+    // Only the status counts, not what happened to the body.
     if (answer.status >= 200 && answer.status < 300) {
         return true;
     }
@@ -165,7 +165,7 @@ bool HttpPost::Implementation::send(const std::string& body, const Headers& head
                                     const std::stop_token& giveUp) {
     TraceScope trace(anchor);
     if (Clock::now() < m_notBefore) {
-        return trace.result(false); // the last error holds
+        return trace.result(false); // the last error still applies
     }
     m_body.clear();
     HttpClientRequest request = requestOf(body, headers);
@@ -186,7 +186,7 @@ bool HttpPost::send(const std::string& body, const Headers& headers,
                     const std::stop_token& giveUp) {
     try {
         return m_implementation->send(body, headers, giveUp);
-    } catch (const std::exception& exception) { // no memory, or no thread
+    } catch (const std::exception& exception) { // no memory or no thread
         m_implementation->fail(exception.what());
         return false;
     }

@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// A sink that posts each delivery as one JSON body, taken as a whole or not at all. What the body
-/// says is the derived class's. Used by one thread.
+/// A sink that posts each delivery as one JSON body, accepted as a whole or not at all. The derived
+/// class provides the body. Used by one thread.
 class JsonPostSink : public Sink {
 public:
     std::string name() const override { return m_name; }
@@ -22,13 +22,13 @@ public:
     std::string error() const override { return m_http.error(); }
 
 protected:
-    /// `path` is added to the URL of the configuration.
+    /// `path` is appended to the configured URL.
     JsonPostSink(const SinkConfig& config, std::string_view path);
 
-    /// The body that says these events.
+    /// The body for these events.
     virtual std::string bodyOf(std::span<const EventRecord> events) const = 0;
 
-    /// Called with the receiver's answer when it has taken this many events.
+    /// Called with the receiver's answer after it has accepted this many events.
     virtual void taken(std::size_t events, const std::string& answer) const;
 
 private:

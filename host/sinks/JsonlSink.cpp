@@ -21,10 +21,10 @@ TRC1_Anchor anchor{"JsonlSink.cpp"};
 constexpr std::chrono::seconds lookInterval{1};
 constexpr int pollSlice = 100; ///< milliseconds
 
-/// Standard output, where it is a pipe or a terminal, as a file of the sink's own, so that no write
-/// waits: other processes that have it, too, fill the room that there was a moment before, and a
-/// terminal may have room for less than is written. Where there can be no such file, where it is
-/// not for writing, and for a file on disk, whose position others share, standard output itself.
+/// Reopens standard output, if it is a pipe or a terminal, as a file of the sink's own, so that no
+/// write blocks: other processes that share it may fill the room found a moment before, and a
+/// terminal may have room for less than is written. If that is not possible, if it is not writable,
+/// or if it is a file on disk, whose position is shared with others, uses standard output itself.
 int openStandardOutput() {
     struct stat status {};
     const int flags = fcntl(STDOUT_FILENO, F_GETFL);
@@ -52,7 +52,7 @@ void JsonlSink::fail(const char* call, int number) {
 
 bool JsonlSink::open() {
     TraceScope trace(anchor);
-    // Without waiting: a pipe in the file system that nobody reads must not hold the thread.
+    // Non-blocking: a named pipe without a reader must not block the thread.
     constexpr int flags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW;
     m_fd = m_isStandardOutput ? openStandardOutput() : ::open(m_path.c_str(), flags, 0640);
     if (m_fd == -1 && errno == ELOOP) {
@@ -81,14 +81,14 @@ bool JsonlSink::open() {
     return trace.result(true);
 }
 
-/// An agent that was killed while it wrote has left a line torn: it is ended, so that the next one
-/// stands alone. False when that failed.
+/// An agent killed while writing may have left an incomplete line: ends it, so that the next line
+/// is separate. False on failure.
 bool JsonlSink::endLastLine() {
     constexpr int flags = O_RDONLY | O_CLOEXEC | O_NONBLOCK;
     char last = '\n';
     const int fd = m_isStandardOutput ? ::open("/proc/self/fd/1", flags)
                                       : ::open(m_path.c_str(), flags | O_NOFOLLOW);
-    if (fd != -1) { // what this user may write but not read is taken as it is
+    if (fd != -1) { // a file that this user may write but not read is used as it is
         if (lseek(fd, -1, SEEK_END) == -1 || ::read(fd, &last, 1) != 1) {
             last = '\n';
         }
@@ -133,7 +133,7 @@ bool JsonlSink::waitWritable(const std::stop_token& giveUp) {
     while (!isReady && !giveUp.stop_requested()) {
         struct pollfd descriptor = {m_fd, POLLOUT, 0};
         const int ready = poll(&descriptor, 1, pollSlice);
-        // Whatever else poll reports, the write itself says it with its error number.
+        // Whatever else poll reports, the write itself fails with the right errno.
         isReady = ready > 0 || (ready == -1 && errno != EINTR);
         if (!isReady && m_waitsSince == 0) {
             m_waitsSince = begin.time_since_epoch().count();
@@ -176,7 +176,7 @@ void JsonlSink::takeBackTornLine() {
     if (m_torn == 0 || m_isStandardOutput || !m_isRegular) {
         return;
     }
-    // The file is ours alone when it ends where this sink's last write ended.
+    // Nobody else has written if the file ends where this sink's last write ended.
     const off_t end = lseek(m_fd, 0, SEEK_CUR);
     struct stat status {};
     if (end != -1 && fstat(m_fd, &status) == 0 && status.st_size == end &&
@@ -204,7 +204,7 @@ std::size_t JsonlSink::deliver(std::span<const EventRecord> events, const std::s
     if (delivered < events.size()) {
         takeBackTornLine();
         if (m_torn == 0) {
-            close(); // the next try begins with a fresh look at the path
+            close(); // the next try checks the path again
         }
     }
     return trace.result(delivered);

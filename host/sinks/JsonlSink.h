@@ -16,11 +16,11 @@
 
 namespace zrm::host {
 
-/// Writes one JSON object per event, one per line, to standard output or to a file. The file is
-/// appended to, made when missing, and opened again when it was moved away or removed; a symbolic
-/// link is not followed. A pipe of the file system and a device are written, too. A line is
-/// never torn or written twice: what a failed write left of a line is taken back, or, where that
-/// is not possible, completed before anything else is written. Used by one thread.
+/// Writes one JSON object per line and event to standard output or to a file. The file is appended
+/// to, created if missing, and reopened if it was moved or removed; symbolic links are not
+/// followed. Named pipes and devices are supported, too. A line is never torn or written twice: a
+/// partly written line is removed or, if that is not possible, completed before anything else is
+/// written. Used by one thread.
 class JsonlSink : public Sink {
 public:
     explicit JsonlSink(const SinkConfig& config);
@@ -51,14 +51,14 @@ private:
     const std::string m_path; ///< "-" for standard output
     const bool m_isStandardOutput;
     int m_fd = -1;
-    bool m_isRegular = false;         ///< a regular file never makes a write wait for a reader
-    std::size_t m_unblockedWrite = 0; ///< bytes that a pipe with room takes without waiting
-    std::size_t m_torn = 0;           ///< bytes of the next event's line that are written already
-    Clock::time_point m_lookAgain{};  ///< when the path is compared with the open file next
+    bool m_isRegular = false; ///< a regular file, for which a write never waits for a reader
+    std::size_t m_unblockedWrite = 0; ///< bytes that a writable pipe takes without blocking
+    std::size_t m_torn = 0;           ///< bytes of the next event's line already written
+    Clock::time_point m_lookAgain{};  ///< when to compare the path with the open file next
     std::string m_text;               ///< the lines of one delivery
-    std::vector<std::size_t> m_lines; ///< where each of them ends
+    std::vector<std::size_t> m_lines; ///< end offset of each line
     std::string m_error;
-    std::atomic<Clock::rep> m_waitsSince{0}; ///< 0: it does not
+    std::atomic<Clock::rep> m_waitsSince{0}; ///< 0: it is not waiting
 };
 
 } // namespace zrm::host

@@ -22,7 +22,7 @@ TRC1_Anchor anchor{"OtlpSink.cpp"};
 
 using Json = nlohmann::ordered_json;
 
-/// In the JSON encoding 64-bit integers are texts.
+/// In the JSON encoding, 64-bit integers are strings.
 Json attribute(std::string_view key, std::int64_t value) {
     return {{"key", key}, {"value", {{"intValue", std::to_string(value)}}}};
 }
@@ -57,9 +57,9 @@ Json recordOf(const EventRecord& event, const EventRow& row) {
             {"attributes", attributesOf(event, row)}};
 }
 
-constexpr std::size_t longestRemark = 200; ///< bytes of what a receiver says, in a message
+constexpr std::size_t longestRemark = 200; ///< bytes of a receiver's remark shown in a message
 
-/// A count in the JSON encoding, where it may be a text or a number; 0 for anything else.
+/// A count in the JSON encoding, which may be a string or a number; 0 for anything else.
 std::uint64_t countOf(const Json& value) {
     if (value.is_number_unsigned()) {
         return value.get<std::uint64_t>();
@@ -72,7 +72,7 @@ std::uint64_t countOf(const Json& value) {
     return count;
 }
 
-/// The beginning of what a receiver says, on one line.
+/// The beginning of a receiver's remark, on one line.
 std::string remarkOf(const Json& value) {
     std::string text = value.is_string() ? value.get<std::string>() : std::string();
     text.resize(std::min(text.size(), longestRemark));

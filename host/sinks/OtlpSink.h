@@ -5,9 +5,9 @@
 
 namespace zrm::host {
 
-/// Sends events as log records of OpenTelemetry: OTLP over HTTP in its JSON encoding. Records
-/// that the receiver takes a request without are told in the trace and not sent again, as the
-/// protocol demands.
+/// Sends events as OpenTelemetry log records: OTLP over HTTP in its JSON encoding. Records that the
+/// receiver rejects from an accepted request are traced and not sent again, as the protocol
+/// requires.
 class OtlpSink : public JsonPostSink {
 public:
     explicit OtlpSink(const SinkConfig& config);

@@ -14,7 +14,7 @@ namespace {
 
 constexpr std::size_t longestSecret = 4096; ///< bytes
 
-/// The whole content of an open file, or enough of it to show that it is too long.
+/// The contents of an open file, or enough of it to show that it is too long.
 std::optional<std::string> content(int fd) {
     std::string text;
     char buffer[1024];
@@ -28,7 +28,7 @@ std::optional<std::string> content(int fd) {
 } // namespace
 
 std::optional<std::string> SecretFile::read(const std::string& path, std::string& problem) {
-    // Without waiting: a pipe in the file system is told from a file only when it is open.
+    // Non-blocking: a named pipe can be distinguished from a file only after opening it.
     const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
     struct stat status {};
     std::optional<std::string> text;

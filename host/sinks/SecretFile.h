@@ -6,12 +6,12 @@
 
 namespace zrm::host {
 
-/// Secrets that are kept in files of their own. Stateless.
+/// Secrets kept in separate files. Stateless.
 class SecretFile {
 public:
-    /// The content of a file without the line end behind it; none when it is not a regular file, is
-    /// empty or longer than 4 kB, is open to every user, or cannot be read: then `problem` says
-    /// why.
+    /// The contents of a file without the final line end. None when it is not a regular file, is
+    /// empty or longer than 4 kB, is accessible to every user, or cannot be read; `problem` then
+    /// says why.
     static std::optional<std::string> read(const std::string& path, std::string& problem);
 };
 

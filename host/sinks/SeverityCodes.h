@@ -7,13 +7,13 @@
 
 namespace zrm::host {
 
-/// What other systems call a severity.
+/// The codes of a severity in other systems.
 struct SeverityCodes {
     std::string_view severity;
     int syslog; ///< RFC 5424: 6 informational, 5 notice, 4 warning, 3 error, 2 critical
     int otel;   ///< SeverityNumber of OpenTelemetry: 9 INFO, 10 INFO2, 13 WARN, 17 ERROR, 21 FATAL
 
-    /// Those of a severity; those of "warning" for a name that is none.
+    /// The codes of a severity; those of "warning" for an unknown name.
     static constexpr const SeverityCodes& of(std::string_view severity) noexcept;
 };
 

@@ -12,22 +12,22 @@
 
 namespace zrm::host {
 
-/// A place to which events are delivered. Used by one thread.
+/// A destination for events. Used by one thread.
 class Sink {
 public:
     virtual ~Sink() = default;
 
-    /// How the sink is called in messages.
+    /// The sink's name in messages.
     virtual std::string name() const = 0;
 
-    /// Delivers events in order and returns how many were delivered; fewer than all is a failure
-    /// that error() explains, and the caller offers the rest again, beginning with the first that
-    /// was not delivered. May wait for the receiver; ends a wait when `giveUp` is requested.
+    /// Delivers events in order and returns how many were delivered. Fewer than all is a failure,
+    /// explained by error(); the caller retries from the first event that was not delivered. May
+    /// wait for the receiver, but stops waiting when `giveUp` is requested.
     virtual std::size_t deliver(std::span<const EventRecord> events,
                                 const std::stop_token& giveUp) = 0;
 
-    /// Since when a delivery waits for a receiver that takes nothing; none when it does not. Any
-    /// thread.
+    /// Since when a delivery has been waiting for a receiver that accepts nothing; none if it is
+    /// not. Any thread.
     virtual std::optional<std::chrono::steady_clock::time_point> waitsSince() const {
         return std::nullopt;
     }

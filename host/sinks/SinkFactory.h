@@ -8,11 +8,11 @@
 
 namespace zrm::host {
 
-/// Makes sinks of every type in SinkTypes. Stateless.
+/// Creates sinks of all types in SinkTypes. Stateless.
 class SinkFactory {
 public:
-    /// The sink of a configuration that was read without a problem. It touches nothing outside
-    /// the process before its first delivery.
+    /// The sink for a valid configuration. It has no effect outside the process before its first
+    /// delivery.
     static std::unique_ptr<Sink> make(const SinkConfig& config);
 };
 

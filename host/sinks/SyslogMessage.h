@@ -12,18 +12,18 @@ namespace zrm::host {
 /// Writes events as syslog messages (RFC 5424). Immutable, so any thread.
 class SyslogMessage {
 public:
-    /// The size that every receiver should take, and beyond which a text is cut.
+    /// The size that every receiver should accept; longer texts are cut.
     static constexpr std::size_t longest = 2048;
 
     /// `facility` is one of syslogFacilities.
     explicit SyslogMessage(std::string_view facility);
 
-    /// The message, without a frame: header, structured data and the entry's text.
+    /// The message without framing: header, structured data and the entry's text.
     std::string text(const EventRecord& event) const;
 
 private:
-    std::size_t m_facility; ///< its code
-    std::string m_process;  ///< this one's number
+    std::size_t m_facility; ///< code of the facility
+    std::string m_process;  ///< the process id
 };
 
 } // namespace zrm::host

@@ -14,10 +14,10 @@
 
 namespace zrm::host {
 
-/// Sends events as syslog messages: over TCP in frames that tell their length (RFC 6587), over
-/// UDP one in each datagram. The receiver of syslog acknowledges nothing. Over TCP, what its
-/// system had not acknowledged when the connection broke, and at the least the last delivery, is
-/// therefore sent once more; over UDP nobody knows what arrived.
+/// Sends events as syslog messages: over TCP with octet counting (RFC 6587), over UDP one per
+/// datagram. Syslog receivers acknowledge nothing. Over TCP, what the receiver's system had not
+/// acknowledged when the connection broke, and at least the last delivery, is therefore sent again;
+/// over UDP it is unknown what arrived.
 class SyslogSink : public Sink {
 public:
     explicit SyslogSink(const SinkConfig& config);

@@ -22,8 +22,8 @@ std::string bodyOf(std::span<const EventRecord> events) {
     return body + "]}";
 }
 
-/// Tells a request from every other one of this agent. Identifiers alone would not: without a
-/// history they begin anew at every start.
+/// Distinguishes a request from all others of this agent. Event ids alone would not: without a
+/// history they start over at every start.
 std::string keyOf(std::span<const EventRecord> events) {
     return std::to_string(events.front().id) + '-' + std::to_string(events.back().id) + '-' +
            std::to_string(events.front().raised);
@@ -39,7 +39,7 @@ WebhookSink::WebhookSink(const SinkConfig& config)
 bool WebhookSink::sign(const std::string& body, HttpPost::Headers& headers) {
     std::string secret = m_secret;
     if (!m_secretFile.empty()) {
-        // Read anew each time, so that a secret can be changed while the agent runs.
+        // Reread each time, so that a secret can be changed while the agent runs.
         std::string problem;
         std::optional<std::string> text = SecretFile::read(m_secretFile, problem);
         if (!text) {

@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// Posts events as {"events": [...]} to a URL, signed when there is a secret. A request that
-/// failed is repeated as it was, so that its receiver can tell that it has it already.
+/// Posts events as {"events": [...]} to a URL, signed when there is a secret. A failed request is
+/// repeated unchanged, so that the receiver can recognise a duplicate.
 class WebhookSink : public Sink {
 public:
     explicit WebhookSink(const SinkConfig& config);
@@ -32,7 +32,7 @@ private:
     const std::string m_secret;
     const std::string m_secretFile;
     HttpPost m_http;
-    std::size_t m_again = 0; ///< events of the request that failed and is to be repeated
+    std::size_t m_again = 0; ///< number of events of the failed request to be repeated
     std::string m_error;
 };
 

@@ -50,7 +50,7 @@ void Situation::silence() {
 
 unsigned Situation::receive(const ctreq& request, const char* rows, unsigned count) {
     TraceScope trace(anchor);
-    // Before the wait for room: the events are raised, whenever they come to be delivered.
+    // Before waiting for room: the events count as raised, whenever they are delivered.
     m_counts->countRaised(count, now());
     for (unsigned index = 0; index < count; ++index) {
         if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {

@@ -19,7 +19,7 @@ namespace zrm::host {
 /// closed by one thread; rows arrive on the threads of the logs.
 class Situation : private RowReceiver {
 public:
-    /// Opens the situation on the table. The table's manager and the queue outlive the object.
+    /// Opens the situation on the table. The table's manager and the queue must outlive the object.
     Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
               std::shared_ptr<SituationCounts> counts);
     Situation(const Situation&) = delete;
@@ -28,11 +28,11 @@ public:
     bool isOpen() const noexcept { return m_request.isOpen(); }
     const std::string& name() const noexcept { return m_config.name; }
 
-    /// Why the agent has stopped it (a reason of ctreq::Stopped); 0: it has not. Any thread.
+    /// Why the agent has stopped it (a reason of ctreq::Stopped); 0 if it has not. Any thread.
     unsigned stopReason() const noexcept { return m_stopReason.load(); }
 
-    /// Lets no further entry pass from now on, although the situation is still open. Unlike its
-    /// end this waits for nobody. Any thread.
+    /// Raises nothing from now on, although the situation is still open. Unlike closing, this does
+    /// not wait. Any thread.
     void silence();
 
 private:
@@ -44,7 +44,7 @@ private:
     EventQueue& m_queue;
     const std::shared_ptr<SituationCounts> m_counts;
     std::atomic<unsigned> m_stopReason{0};
-    Request m_request; ///< last: rows may arrive while it is built
+    Request m_request; ///< last member: rows may arrive during its construction
 };
 
 } // namespace zrm::host

@@ -14,10 +14,10 @@ struct SituationStatus;
 /// Situations as JSON objects. Stateless.
 class SituationJson {
 public:
-    /// The fields of a situation as they were written; null for one that was left out.
+    /// The fields of a situation as written; null for one that was left out.
     static nlohmann::ordered_json definition(const SituationConfig& situation);
 
-    /// The same with how the situation stands.
+    /// The same with the state of the situation.
     static nlohmann::ordered_json status(const SituationStatus& status);
 
     /// A value as text; bytes that are not UTF-8 are replaced.

@@ -106,7 +106,7 @@ void SituationRunner::work() {
     }
 }
 
-/// Opens or closes with the lock given back. Slots are removed here alone, so that theirs stays.
+/// Opens or closes with the lock released. Slots are removed only here, so the slot stays valid.
 void SituationRunner::bringToState(std::unique_lock<std::mutex>& lock, const std::string& key) {
     TraceScope trace(anchor);
     const auto found = m_slots.find(key);
@@ -135,7 +135,7 @@ void SituationRunner::bringToState(std::unique_lock<std::mutex>& lock, const std
         slot.situation = std::move(situation);
         slot.running = asked;
         if (slot.counts == nullptr || slot.asked != asked) {
-            slot.situation->silence(); // changed meanwhile, and pending again
+            slot.situation->silence(); // changed meanwhile and pending again
         }
     }
 }

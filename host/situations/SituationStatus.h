@@ -8,7 +8,7 @@
 
 namespace zrm::host {
 
-/// How a situation stands at one moment.
+/// A snapshot of a situation's state.
 struct SituationStatus {
     enum Source { FILE, API };
     enum State { RUNNING, STOPPED, FAILED };
@@ -18,7 +18,7 @@ struct SituationStatus {
     State state = RUNNING;
     std::string problem; ///< empty: none
 
-    std::uint64_t offered = 0;   ///< entries handed to it
+    std::uint64_t offered = 0;   ///< entries offered to it
     std::uint64_t matched = 0;   ///< of these, those that met every condition
     std::uint64_t discarded = 0; ///< of these, those that the thresholds refused
     std::uint64_t raised = 0;

@@ -29,7 +29,7 @@ using nlohmann::json;
 using Content = SituationStore::Content;
 
 constexpr int version = 1;
-constexpr int deepest = 8;                             ///< nesting of the file
+constexpr int deepest = 8;                             ///< the deepest nesting of the file
 constexpr std::size_t largestFile = 128 * 1024 * 1024; ///< bytes
 constexpr mode_t fileMode = 0640;
 
@@ -38,7 +38,7 @@ std::string because(const std::string& what, int number) {
     return what + ": " + error.text();
 }
 
-/// Writes and syncs the whole text; false leaves errno.
+/// Writes and syncs the whole text; false with errno set.
 bool writeAll(int fd, std::string_view text) {
     while (!text.empty()) {
         const ssize_t written = write(fd, text.data(), text.size());
@@ -50,7 +50,7 @@ bool writeAll(int fd, std::string_view text) {
     return fsync(fd) == 0;
 }
 
-/// Reads the whole file; 0 or the error's number. A pipe in the file's place keeps nobody waiting.
+/// Reads the whole file; returns 0 or errno. A pipe in place of the file does not block.
 int readAll(const std::string& path, std::string& text) {
     const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
     if (fd == -1) {
@@ -69,14 +69,14 @@ int readAll(const std::string& path, std::string& text) {
 
 struct TooDeep {};
 
-/// Parses a text. The parser takes any depth, but what it gives is copied and printed recursively.
+/// Parses a text. The parser accepts any depth, but its result is copied and printed recursively.
 json documentOf(const std::string& text) {
     return json::parse(text, [](int depth, json::parse_event_t, const json&) {
         return depth <= deepest ? true : throw TooDeep();
     });
 }
 
-/// A rename lasts only once its directory is on the disk.
+/// A rename is durable only once its directory has been synced.
 void syncDirectory(const std::string& directory) {
     const int fd = open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
     if (fd != -1) {
@@ -85,7 +85,7 @@ void syncDirectory(const std::string& directory) {
     }
 }
 
-/// A member that is a text, null or missing; anything else throws.
+/// A member that may be a text, null or missing; anything else throws.
 std::optional<std::string> optionalText(const json& object, const char* key) {
     const auto found = object.find(key);
     if (found == object.end() || found->is_null()) {
@@ -114,7 +114,7 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     return made;
 }
 
-/// The content of a file's text; `reason` says why there is none.
+/// The content in a file's text; `reason` says why there is none.
 std::optional<Content> contentOf(const std::string& text, std::string& reason) {
     try {
         const json document = documentOf(text);
@@ -221,7 +221,7 @@ std::string SituationStore::replace(std::string_view text) const {
         return because("cannot create the directory " + directory, errno);
     }
     const std::string temporary = m_path + ".new";
-    unlink(temporary.c_str()); // of an agent that was killed, or whatever stands there
+    unlink(temporary.c_str()); // left by an agent that was killed, or anything else
     const int fd = open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, fileMode);
     if (fd == -1) {
         return because("cannot create " + temporary, errno);

@@ -28,8 +28,8 @@ void AGF_SetNodeType(const char* nodeType) {
     NodeType::set(nodeType);
 }
 
-// Affinities tell a monitoring server which of its features an agent has; the standalone host has
-// no server to tell.
+// Affinities announce an agent's features to a monitoring server; the standalone host has no
+// server.
 void AGF_SetAffinity(const char* affinity) {
     TraceScope trace(anchor);
     trace.detail()("Affinity %s.", affinity);

@@ -6,17 +6,17 @@
 
 namespace zrm::host {
 
-/// The command line of zrmagent, read.
+/// The parsed command line of zrmagent.
 class CommandLine {
 public:
-    /// Reads the arguments behind the program's name.
+    /// Parses the arguments after the program name.
     explicit CommandLine(std::span<const char* const> arguments);
 
     bool wantsHelp() const noexcept { return m_help; }
     bool wantsVersion() const noexcept { return m_version; }
     const std::string& config() const noexcept { return m_config; }       ///< empty: not given
     const std::string& traceFile() const noexcept { return m_traceFile; } ///< empty: not given
-    /// What is wrong with the command line; empty when nothing is.
+    /// What is wrong with the command line; empty if nothing.
     const std::string& error() const noexcept { return m_error; }
 
     /// The text of --help.

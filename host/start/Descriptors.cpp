@@ -12,8 +12,8 @@ namespace zrm::host {
 
 namespace {
 
-/// Far more logs than one agent has; a limit without an end costs memory in other programs' ways of
-/// closing what they inherit.
+/// Far more than one agent has logs. An unlimited number costs memory in other programs that close
+/// all inherited descriptors.
 constexpr rlim_t mostDescriptors = 65536;
 
 } // namespace

@@ -63,7 +63,7 @@ HostConfig readConfig(const std::string& path) {
     return std::move(config);
 }
 
-/// The trace goes where the command line says, at the level that the environment says.
+/// The trace goes where the command line says, at the level set in the environment.
 void setTrace(const std::string& file) {
     if (const std::string problem = TraceControl::openFile(file); !problem.empty()) {
         say("%s", problem.c_str());

@@ -20,7 +20,7 @@ TRC1_Anchor anchor{"ServiceNotifier.cpp"};
 
 constexpr const char* variable = "NOTIFY_SOCKET";
 
-/// One datagram to the address; false with errno where it was not taken.
+/// Sends one datagram to the address; false with errno set on failure.
 bool sendDatagram(const std::string& address, const char* message) {
     sockaddr_un target{};
     target.sun_family = AF_UNIX;

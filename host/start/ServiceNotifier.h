@@ -6,25 +6,25 @@
 
 namespace zrm::host {
 
-/// Tells the service manager that started this process how it is doing: one datagram per message
-/// to the socket that NOTIFY_SOCKET names. Without a service manager every message goes nowhere.
+/// Reports the state of this process to the service manager that started it: one datagram per
+/// message to the socket named by NOTIFY_SOCKET. Without a service manager, messages are dropped.
 /// Immutable; any thread.
 class ServiceNotifier {
 public:
-    /// Tells nobody.
+    /// Notifies nobody.
     ServiceNotifier() = default;
 
     /// @param address the path of a socket, or '@' and an abstract name; empty for nobody
     explicit ServiceNotifier(std::string address) : m_address(std::move(address)) {}
 
-    /// The service manager of the environment. NOTIFY_SOCKET is removed from it, so that no command
-    /// which the agent runs speaks in its place. While there is one thread.
+    /// The service manager named in the environment. Removes NOTIFY_SOCKET, so that no command run
+    /// by the agent can send messages in its place. Call while there is only one thread.
     static ServiceNotifier takeFromEnvironment();
 
-    /// The start is over: everything is served. A failure is traced.
+    /// Startup is complete. A failure is traced.
     void ready() const { send("READY=1"); }
 
-    /// The orderly end has begun. A failure is traced.
+    /// Shutdown has begun. A failure is traced.
     void stopping() const { send("STOPPING=1"); }
 
 private:

@@ -39,9 +39,9 @@ namespace {
 
 TRC1_Anchor anchor{"Serving.cpp"};
 
-/// For the opening of the situations at the start; nothing else waits for it longer.
+/// Time for opening the situations at startup; nothing else waits for it longer.
 constexpr std::chrono::seconds openingLimit{30};
-/// For the logs' threads, to count what they leave behind.
+/// Time for the logs' threads to count what they skip.
 constexpr std::chrono::milliseconds countingLimit{800};
 
 /// The receiver of a request that is opened only to learn its table's rows.
@@ -72,7 +72,7 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
         serving->m_delivery.start();
     } catch (const std::system_error& error) {
         static_cast<void>(
-            serving.release()); // some of its threads run; the process ends under them
+            serving.release()); // leaked: some of its threads are running while the process ends
         say("cannot start a thread (%s): raise the limits of threads and memory (TasksMax= and "
             "MemoryMax= of the service, ulimit -u), or end other programs; ending",
             error.code().message().c_str());
@@ -87,7 +87,7 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
             "them");
     }
     EventRoomControl::open();
-    countLogs(); // the first sample tells the log manager that requests are served
+    countLogs(); // the first sample signals the log manager that requests are served
     return serving;
 }
 

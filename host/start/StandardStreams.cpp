@@ -6,7 +6,7 @@
 namespace zrm::host {
 
 void StandardStreams::fill() noexcept {
-    // For reading alone: who writes to it is told so, instead of losing what was written.
+    // Read-only: writes fail instead of losing data silently.
     int fd = open("/dev/null", O_RDONLY);
     while (fd != -1 && fd <= STDERR_FILENO) {
         fd = open("/dev/null", O_RDONLY);

@@ -3,12 +3,12 @@
 
 namespace zrm::host {
 
-/// The descriptors 0, 1 and 2, which a program may be started without. Stateless.
+/// The descriptors 0, 1 and 2, which may be closed when a program starts. Stateless.
 class StandardStreams {
 public:
-    /// Opens those that are closed on a file that can neither be written nor says anything. The
-    /// next files that are opened would get their numbers otherwise: events and messages would be
-    /// written into logs and databases. Before the program opens anything.
+    /// Opens closed ones on a file that is empty and cannot be written. Otherwise the next files
+    /// opened would get their numbers, and events and messages would be written into logs and
+    /// databases. Call before the program opens anything.
     static void fill() noexcept;
 };
 

@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::chrono::milliseconds lookInterval{200};
 
-/// The manager's thread takes a signal at once when it is not stuck.
+/// The manager's thread takes a signal at once unless it is stuck.
 constexpr int looksUntilStuck = 2;
 constexpr int forcedStatus = 255;
 
