@@ -194,7 +194,7 @@ def test_a_changed_token_and_certificate_are_taken_over(agent, serving):
     wait_until(served, "the new certificate")
     assert key.exists() and status(renewed) == 200
     assert kept.sock.fileno() == descriptor, "the connection lives on"
-    assert len(agent.trace("the certificate before goes on")) == 1
+    assert len(agent.trace("the previous certificate stays in use")) == 1
     kept.close()
 
 

@@ -55,9 +55,9 @@ def test_a_rotation_by_renaming_is_said_everywhere(serving):
     serving.syslog.append(syslog_line("of the new file"))
     wait_until(lambda: kinds(serving) == ["replaced"], "the warning of another file")
     (warning,) = warnings_of(serving)
-    assert "Another file has this log's name" in warning["text"] and "copytruncate" in warning["text"]
+    assert "Another file now has this log's name" in warning["text"] and "copytruncate" in warning["text"]
     assert get(serving, "/api/v1/status")["warnings"] == [{"log": str(path), **warning}]
-    assert serving.wait_trace(f"{path}: Another file has this log's name")
+    assert serving.wait_trace(f"{path}: Another file now has this log's name")
     # What the monitor does not read explains nothing.
     status, _, explained = serving.api.request(
         "POST", "/api/v1/explain", {"definition": {"log": str(path)}, "last": 1}
@@ -71,7 +71,7 @@ def test_a_rotation_by_renaming_is_said_everywhere(serving):
     note = f"zrmctl: {path}: Another file"
     assert note in zrmctl(serving, "status").stderr and note in zrmctl(serving, "logs").stderr
     assert "Running (!)" in zrmctl(serving, "logs").stdout
-    assert "Another file has this log's name" in zrmctl(serving, "logs", str(path)).stdout
+    assert "Another file now has this log's name" in zrmctl(serving, "logs", str(path)).stdout
     # The file that was opened is back under its name.
     path.with_name("sys.log.1").replace(path)
     wait_until(lambda: kinds(serving) == [], "the end of the warning")
