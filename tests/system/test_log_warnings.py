@@ -62,7 +62,7 @@ def test_a_rotation_by_renaming_is_said_everywhere(serving):
     status, _, explained = serving.api.request(
         "POST", "/api/v1/explain", {"definition": {"log": str(path)}, "last": 1}
     )
-    assert status == 409 and "its name is another file's by now" in explained["detail"]
+    assert status == 409 and "another file now has its name" in explained["detail"]
     definition = {"log": str(path), "when": ["ENTRYDESC = 'x'"]}
     status, _, explained = serving.api.request(
         "POST", "/api/v1/explain", {"definition": definition, "line": syslog_line("x").rstrip()}
