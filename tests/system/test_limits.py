@@ -57,7 +57,7 @@ def says_why(said):
         sentence in said
         for sentence in (
             "manager thread",
-            "zrmagent: no thread can be started: raise the limit of processes",
+            "zrmagent: no thread can be started: raise the limit on processes",
             "zrmagent: cannot start a thread (Resource",
         )
     )
