@@ -157,9 +157,19 @@ std::uint64_t HistoryDirectory::reservedIds() const {
 
 std::string HistoryDirectory::makeFile() const {
     std::string problem;
-    if (const int fd = openFile(m_file, problem); fd != -1) {
-        close(fd);
+    const int fd = openFile(m_file, problem);
+    if (fd == -1) {
+        return problem;
     }
+    struct stat status {};
+    if (fstat(fd, &status) == 0 && status.st_size == 0) {
+        // A log and an index beside a new file are those of a lost one. SQLite would use the index
+        // as long as another program has it open.
+        for (const char* const ending : {logEnding, indexEnding}) {
+            unlink((m_file + ending).c_str());
+        }
+    }
+    close(fd);
     return problem;
 }
 

@@ -7,6 +7,7 @@ import sqlite3
 import subprocess
 import threading
 import time
+from contextlib import closing
 from pathlib import Path
 from signal import SIGKILL
 
@@ -30,7 +31,8 @@ def history_file(agent):
 
 def stored(agent):
     """The committed events: (id, description), by id."""
-    with sqlite3.connect(f"file:{history_file(agent)}?mode=ro", uri=True, timeout=20) as database:
+    uri = f"file:{history_file(agent)}?mode=ro"
+    with closing(sqlite3.connect(uri, uri=True, timeout=20)) as database:
         rows = database.execute("SELECT id, json FROM events ORDER BY id").fetchall()
     events = []
     for number, text in rows:
@@ -251,13 +253,15 @@ def test_a_history_that_is_removed_is_made_anew_and_ids_go_on(agent):
     assert descriptions(agent.wait_events(15)) == texts(range(15))
     assert [number for number, _ in stored(agent)] == list(range(11, 16))
     assert Api(agent).request("GET", "/api/v1/status")[2]["history"]["problem"] is None
-    assert agent.stop() == 0
-    history_file(agent).unlink()  # and while no agent runs
-    agent.start()
-    status = Api(agent).request("GET", "/api/v1/status")[2]
-    assert status["history"]["problem"] is None, "a history, which alone knows the ids"
-    log.append(lines(range(15, 16)))
-    assert agent.wait_events(1)[0]["id"] == 16, agent.stderr.text()
+    with closing(sqlite3.connect(history_file(agent))) as other:  # has the lost files open
+        assert other.execute("SELECT count(*) FROM events").fetchone() == (5,)
+        assert agent.stop() == 0
+        history_file(agent).unlink()  # and while no agent runs
+        agent.start()
+        status = Api(agent).request("GET", "/api/v1/status")[2]
+        assert status["history"]["problem"] is None, "a history, which alone knows the ids"
+        log.append(lines(range(15, 16)))
+        assert agent.wait_events(1)[0]["id"] == 16, agent.stderr.text()
     assert agent.stop() == 0
 
 
