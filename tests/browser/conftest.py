@@ -77,6 +77,10 @@ class Page:
     def find(self, xpath):
         return until(lambda: self.driver.find_element(By.XPATH, xpath), xpath)
 
+    def text_of(self, xpath):
+        """The text of an element that the page may exchange between finding and reading it."""
+        return until(lambda: self.driver.find_element(By.XPATH, xpath).text, f"a text in {xpath}")
+
     def all(self, css):
         return self.driver.find_elements(By.CSS_SELECTOR, css)
 

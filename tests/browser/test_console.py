@@ -115,7 +115,7 @@ def test_logs_tell_trouble_first_and_why(page, agent, fast_polls):
     page.wait_text("1 in trouble")
     page.wait_text("The format of this log cannot be used")
     page.wait_text("1 line does not fit the format")
-    first = page.find("//table//tbody/tr[1]").text
+    first = page.text_of("//table//tbody/tr[1]")
     assert "broken.log" in first and "Error" in first
     page.pictures("logs")
     page.find("//input[@aria-label='Find a log']").send_keys("auth")
@@ -314,10 +314,10 @@ def test_a_report_is_run_sorted_and_saved(page, agent):
     auth, _ = logs_agent(agent)
     page.on(agent, "reports")
     page.run_report(auth, "40 entries")
-    first = page.find("//tbody/tr[1]").text
+    first = page.text_of("//tbody/tr[1]")
     page.click("Time")
     until(lambda: page.find("//th[@aria-sort='ascending']"), "the order")
-    assert page.find("//tbody/tr[1]").text != first
+    assert page.text_of("//tbody/tr[1]") != first
     page.pictures("report")
     lines = page.saved("CSV").splitlines()
     assert lines[0].startswith("ORIGINNODE,LOGPATH") and len(lines) == 41

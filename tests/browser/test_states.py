@@ -29,7 +29,7 @@ def test_without_a_history_the_views_say_so_and_what_to_do(page, agent):
     page.wait_text("Monitored since")
     page.open("events")
     page.wait_text("Set enabled = true under [history]")
-    assert page.find("//*[@class='state bad']").text == "History off"
+    assert page.text_of("//*[@class='state bad']") == "History off"
     page.pictures("events-history-off")
 
 
@@ -107,7 +107,7 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     page.click("Take them")
     page.wait_text("10 of 10 lines")
     assert page.control("Lines").get_attribute("value").splitlines() == [app_entry(f"number {n}").strip() for n in range(5, 15)]
-    until(lambda: page.find("//*[@aria-label='Configuration line']").text == f"{app} {FIELDS}", "the configuration line")
+    until(lambda: page.text_of("//*[@aria-label='Configuration line']") == f"{app} {FIELDS}", "the configuration line")
     page.pictures("try-taken")
     page.type("Format", 'A , "%q" , year')
     page.click("Take them")
@@ -117,7 +117,7 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     page.pick("Log", str(empty))
     page.click("Take them")
     page.wait_text("This log has no lines yet.")
-    until(lambda: str(empty) in page.find("//*[@aria-label='Configuration line']").text, "the configuration line")
+    until(lambda: str(empty) in page.text_of("//*[@aria-label='Configuration line']"), "the configuration line")
     assert "of the lines fit" not in page.text()
     app.path.unlink()
     page.pick("Log", str(app))
@@ -133,7 +133,7 @@ def test_the_configuration_line_is_copied(page, agent, permission):
         page.driver.execute_cdp_cmd("Browser.setPermission", {"permission": {"name": name}, "setting": permission})
     try:
         page.on(agent, "try")
-        line = page.find("//*[@aria-label='Configuration line']").text
+        line = page.text_of("//*[@aria-label='Configuration line']")
         page.click("Copy")
         if permission == "granted":
             page.wait_text("Copied.")
@@ -221,8 +221,8 @@ def test_a_log_shows_rejected_lines_and_skipped_ranges(page, agent):
     page.on(agent)
     app.append(app_entry("fits") + "this does not fit\n" + "2026-11-20 07:03:09\n")
     counts = "//tbody/tr[contains(., 'app.log')]/td[@data-label='{}']"
-    until(lambda: page.find(counts.format("Rejected")).text == "2", "the count of rejected lines")
-    assert page.find(counts.format("Entries")).text == "1"  # a rejected line is not an entry
+    until(lambda: page.text_of(counts.format("Rejected")) == "2", "the count of rejected lines")
+    assert page.text_of(counts.format("Entries")) == "1"  # a rejected line is not an entry
 
     def ledger():
         return page.api.request("GET", f"/api/v1/logs?log={quote(str(app))}")[2]["logs"][0]["ledger"]
@@ -252,7 +252,7 @@ def test_a_log_that_cannot_be_shown_says_why(page, agent):
     page.on(agent)
     page.open_log(agent.directory / "broken.log")
     page.wait_text("The format of this log cannot be used")
-    assert page.find("//*[@class='state bad']").text == "Error"
+    assert page.text_of("//*[@class='state bad']") == "Error"
     page.pictures("log-error")
     page.open_log(agent.directory / "other.log")
     page.wait_text("This log is not monitored")
@@ -342,9 +342,9 @@ def test_a_log_that_is_not_monitored_says_why_until_it_is(page, agent, fast_poll
     agent.configure(f"{missing} ;N ;S", "relative.log", append=True)
     page.on(agent)
     page.wait_text("3 in trouble")
-    row = page.find(f"//tbody/tr[contains(., '{missing}')]").text
+    row = page.text_of(f"//tbody/tr[contains(., '{missing}')]")
     assert "Not read" in row and "No such file or directory. Create the file, or correct the path." in row
-    assert "Correct line 5 of the log configuration." in page.find("//tbody/tr[contains(., 'relative.log')]").text
+    assert "Correct line 5 of the log configuration." in page.text_of("//tbody/tr[contains(., 'relative.log')]")
     assert str(agent.logs_conf) in page.text()
     page.pictures("logs-not-monitored")
     page.open_log(missing)
@@ -359,7 +359,7 @@ def test_a_log_that_is_not_monitored_says_why_until_it_is(page, agent, fast_poll
     agent.configure(append=True)  # touched
     page.click("Re-read configuration")
     page.wait_text("2 in trouble")
-    assert "Running" in page.find(f"//tbody/tr[contains(., '{missing}')]").text
+    assert "Running" in page.text_of(f"//tbody/tr[contains(., '{missing}')]")
     agent.logs_conf.unlink()
     page.wait_text(f"The log configuration {agent.logs_conf} cannot be read: No such file or directory.")
     page.pictures("logs-no-configuration")
