@@ -10,6 +10,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <filesystem>
@@ -91,11 +92,12 @@ protected:
         }
         return ids;
     }
-    /// What the sink gets now, and has got then.
-    std::vector<std::uint64_t> take() {
+    /// What the sink gets now, at most `most` events, and has got then. A read gives no more than one
+    /// batch of the writer holds.
+    std::vector<std::uint64_t> take(std::size_t most = SIZE_MAX) {
         std::vector<std::uint64_t> ids;
-        while (sink->backlog() > 0) {
-            const auto events = sink->read(10);
+        while (ids.size() < most && sink->backlog() > 0) {
+            const auto events = sink->read(std::min<std::size_t>(10, most - ids.size()));
             for (const EventRecord& event : events) {
                 ids.push_back(event.id);
             }
@@ -167,8 +169,7 @@ TEST_F(HistoryTest, AnEventIsStoredAtOnce) {
 TEST_F(HistoryTest, IdsAndCursorsGoOnAfterARestart) {
     open();
     pushAndWait(50);
-    EXPECT_EQ(sink->read(10).size(), 10u);
-    sink->release(10);
+    EXPECT_EQ(take(10), idsFrom(1, 10));
     close();
     open();
     EXPECT_EQ(history->newest(), 50u);
@@ -345,8 +346,7 @@ TEST_F(HistoryTest, IdsGoOnAfterACorruptFileWhereTheyCanBeTold) {
 TEST_F(HistoryTest, AFileThatBecomesCorruptIsExchangedWhileTheAgentRuns) {
     open();
     pushAndWait(100);
-    EXPECT_EQ(sink->read(10).size(), 10u);
-    sink->release(10);
+    EXPECT_EQ(take(10), idsFrom(1, 10));
     testing::internal::CaptureStderr();
     disk.failWrites(SQLITE_CORRUPT);
     push(50);
