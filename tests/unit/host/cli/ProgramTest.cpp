@@ -7,9 +7,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <cstdlib>
 #include <functional>
+#include <mutex>
 #include <string>
+#include <utility>
 #include <vector>
 
 using namespace zrm::host;
@@ -23,17 +26,29 @@ class ProgramTest : public testing::Test {
 protected:
     void SetUp() override {
         setenv("ZRM_TOKEN", "the-token", 1);
-        answer = [](const HttpRequest&) { return HttpAnswer{200, "text/plain", ""}; };
+        answerBy([](const HttpRequest&) { return HttpAnswer{200, "text/plain", ""}; });
         for (const char* const method : {"GET", "POST", "PUT"}) {
-            agent.routes().add(method, "/*",
-                               [this](const HttpRequest& request) { return answer(request); });
+            agent.routes().add(method, "/*", [this](const HttpRequest& request) {
+                const std::lock_guard guard(mutex);
+                return answer(request);
+            });
         }
         agent.begin();
     }
     void TearDown() override { unsetenv("ZRM_TOKEN"); }
 
+    /// The handler runs in the server's threads, one call at a time.
+    void answerBy(std::function<HttpAnswer(const HttpRequest&)> handler) {
+        const std::lock_guard guard(mutex);
+        answer = std::move(handler);
+    }
     void answerWith(const std::string& body) {
-        answer = [=](const HttpRequest&) { return HttpAnswer::json(body); };
+        answerBy([=](const HttpRequest&) { return HttpAnswer::json(body); });
+    }
+    /// What the handler has noted.
+    std::string copy(const std::string& text) {
+        const std::lock_guard guard(mutex);
+        return text;
     }
     /// Runs zrmctl; its output and errors are kept.
     int run(std::vector<std::string> arguments) {
@@ -54,8 +69,9 @@ protected:
     }
 
     TemporaryDirectory directory;
-    TestAgent agent;
+    std::mutex mutex;
     std::function<HttpAnswer(const HttpRequest&)> answer;
+    TestAgent agent; // ends first: its threads call the handler
     std::string output;
     std::string errors;
 };
@@ -129,11 +145,11 @@ TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
 }
 
 TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
-    bool isAsked = false;
-    answer = [&](const HttpRequest&) {
+    std::atomic<bool> isAsked{false};
+    answerBy([&](const HttpRequest&) {
         isAsked = true;
         return HttpAnswer::json("{}");
-    };
+    });
     for (const std::vector<std::string>& command :
          {std::vector<std::string>{"situations", "add", "caf\xe9"},
           {"situations", "add", "x", "--text", "caf\xe9"},
@@ -148,18 +164,18 @@ TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
 
 TEST_F(ProgramTest, OneThingIsExplained) {
     std::string asked;
-    answer = [&](const HttpRequest& request) {
+    answerBy([&](const HttpRequest& request) {
         asked = request.body;
         return HttpAnswer::json(R"({"explanations":[{}]})");
-    };
+    });
     EXPECT_EQ(run({"explain", "x"}), CLI_DONE);
-    EXPECT_EQ(asked, R"({"situation":"x","last":5})");
+    EXPECT_EQ(copy(asked), R"({"situation":"x","last":5})");
     EXPECT_EQ(run({"explain", "x", "--line", "a b"}), CLI_DONE);
-    EXPECT_EQ(asked, R"({"situation":"x","line":"a b"})");
+    EXPECT_EQ(copy(asked), R"({"situation":"x","line":"a b"})");
     EXPECT_EQ(run({"explain", "x", "--log", "/l", "--last", "7"}), CLI_DONE);
-    EXPECT_EQ(asked, R"({"situation":"x","log":"/l","last":7})");
+    EXPECT_EQ(copy(asked), R"({"situation":"x","log":"/l","last":7})");
     EXPECT_EQ(run({"explain", "x", "--event", "7"}), CLI_DONE);
-    EXPECT_EQ(asked, R"({"situation":"x","event":7})");
+    EXPECT_EQ(copy(asked), R"({"situation":"x","event":7})");
     for (const std::vector<std::string>& both :
          {std::vector<std::string>{"explain", "x", "--line", "a", "--last", "2"},
           {"explain", "x", "--event", "1", "--last", "2"},
@@ -171,18 +187,18 @@ TEST_F(ProgramTest, OneThingIsExplained) {
 
 TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
     std::string put;
-    answer = [&](const HttpRequest& request) {
+    answerBy([&](const HttpRequest& request) {
         put = request.method == "PUT" ? request.body : put;
         return HttpAnswer::json(
             R"({"name":"x","text":"t","severity":"info","log":"/l",)"
             R"("when":["a"],"frequency":">= 5","period":"60s","state":"running"})");
-    };
+    });
     EXPECT_EQ(run({"situations", "set", "x", "--frequency", "", "--period", ""}), CLI_DONE);
-    EXPECT_EQ(put, R"({"name":"x","text":"t","severity":"info","log":"/l","when":["a"]})");
+    EXPECT_EQ(copy(put), R"({"name":"x","text":"t","severity":"info","log":"/l","when":["a"]})");
     EXPECT_EQ(run({"situations", "set", "x", "--log", "", "--when", "", "--severity", "major"}),
               CLI_DONE);
-    EXPECT_EQ(put, R"({"name":"x","text":"t","severity":"major","frequency":">= 5",)"
-                   R"("period":"60s"})");
+    EXPECT_EQ(copy(put), R"({"name":"x","text":"t","severity":"major","frequency":">= 5",)"
+                         R"("period":"60s"})");
     EXPECT_EQ(run({"situations", "set", "x"}), CLI_USAGE);
 }
 
