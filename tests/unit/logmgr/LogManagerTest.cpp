@@ -29,7 +29,9 @@ using testing::IsEmpty;
 /// A manager that monitors one log, or, in its variants, none.
 class LogManagerTest : public LogManagerFixture {
 protected:
-    std::vector<std::string> environmentMessages() { return messagesThatBegin({"No ", "\""}); }
+    std::vector<std::string> environmentMessages() {
+        return messagesThatBegin({"No ZRM", "No \"AGENT", "\""});
+    }
     std::string content(const std::string& path) const {
         std::ostringstream text;
         text << std::ifstream(path).rdbuf();

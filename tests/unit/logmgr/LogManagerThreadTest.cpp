@@ -77,6 +77,11 @@ TEST_F(LogManagerThreadTest, SigchldIsTracedInTheFineClassOnly) {
     trace.clear();
     trace.setLevel(TRC1_DETAIL | TRC1_ERROR);
     kill(getpid(), SIGCHLD);
+    // Of two pending signals, sigwait takes the one with the lower number first.
+    ASSERT_TRUE(waitUntil([] {
+        sigset_t pending;
+        return sigpending(&pending) == 0 && sigismember(&pending, SIGCHLD) == 0;
+    }));
     kill(getpid(), SIGHUP);
     ASSERT_TRUE(trace.waitFor(waiting));
     EXPECT_FALSE(trace.contains("SIGCHLD signal ignored."));

@@ -25,7 +25,8 @@ using testing::SizeIs;
 using ErrLogFileTest = ErrLogTest;
 
 TEST_F(ErrLogFileTest, TurnsTheLinesOfTheCommandIntoRows) {
-    const std::string command = printing(std::string(header) + entry + otherEntry);
+    // The shell holds the output open until it ends, so the monitor's signal comes too late for it.
+    const std::string command = printing(std::string(header) + entry + otherEntry) + "; exit";
     const auto monitor = start(command);
     ASSERT_TRUE(waitForStatus(*monitor, MONITOR_ERR_READ));
     const auto rows = EventRecorder::rows();

@@ -337,6 +337,7 @@ TEST_F(LogFileTest, StoppingAFailedMonitorLeavesItsStatus) {
 TEST_F(LogFileTest, ReconfigurationDumpsBeforeAndAfterInDetail) {
     TestLog log(*m_line);
     log.startThread();
+    ASSERT_TRUE(waitUntil([&] { return log.eof() == 0; })); // from here on the thread is silent
     RecordingTrace trace(TRC1_DETAIL);
     log = *m_line;
     const auto messages = trace.messages();
