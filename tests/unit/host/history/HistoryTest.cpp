@@ -92,8 +92,8 @@ protected:
         }
         return ids;
     }
-    /// What the sink gets now, at most `most` events, and has got then. A read gives no more than one
-    /// batch of the writer holds.
+    /// What the sink gets now, at most `most` events, and has got then. A read gives no more than
+    /// one batch of the writer holds.
     std::vector<std::uint64_t> take(std::size_t most = SIZE_MAX) {
         std::vector<std::uint64_t> ids;
         while (ids.size() < most && sink->backlog() > 0) {
