@@ -77,12 +77,27 @@ bool mayBeLong(std::string_view pattern) {
     return std::ranges::find(patterns, pattern) != std::end(patterns);
 }
 
+/// Does part of the work on a request; what it throws becomes the answer.
+template <class Work> std::optional<HttpAnswer> problemOf(const HttpRequest& request, Work work) {
+    TraceScope trace(anchor);
+    try {
+        return work();
+    } catch (const RequestRefused& refused) {
+        const Problem& problem = refused.problem();
+        trace.detail()("Request for %s refused: %s.", request.path.c_str(), problem.detail.c_str());
+        return RequestDispatcher::answerOf(problem);
+    } catch (const std::exception& exception) {
+        trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
+    }
+    return RequestDispatcher::answerOf({500, "the request failed", ""});
+}
+
 /// Ends the handler's reading when the time is up or the answer is no longer needed.
 HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& request,
                         std::string_view pattern, ActiveRequests& active) {
     const std::chrono::milliseconds limit =
         mayBeLong(pattern) ? RequestDispatcher::longLimit : RequestDispatcher::limit;
-    const auto work = [&handler, request, limit, &active] {
+    const auto read = [&handler, limit, &active](const HttpRequest& request) {
         // On this thread: a handler that ends the process must not wait for itself.
         const ActiveRequests::Guard guard(active);
         if (!guard) {
@@ -95,6 +110,9 @@ HttpAnswer answerInTime(const Router::Handler& handler, const HttpRequest& reque
             throw RequestRefused(503, "the request took too long and was ended: ask for less", "");
         }
         return answer;
+    };
+    const auto work = [request, read] {
+        return *problemOf(request, [&]() -> std::optional<HttpAnswer> { return read(request); });
     };
     return TimedWork::answer(work, limit + RequestDispatcher::endingTime);
 }
@@ -149,22 +167,6 @@ void RequestDispatcher::setGuard(RequestGuard guard) {
 std::shared_ptr<const RequestGuard> RequestDispatcher::guard() {
     const std::lock_guard lock(m_mutex);
     return m_guard;
-}
-
-/// Does part of the work on a request; what it throws becomes the answer.
-template <class Work>
-std::optional<HttpAnswer> RequestDispatcher::problemOf(const HttpRequest& request, Work work) {
-    TraceScope trace(anchor);
-    try {
-        return work();
-    } catch (const RequestRefused& refused) {
-        const Problem& problem = refused.problem();
-        trace.detail()("Request for %s refused: %s.", request.path.c_str(), problem.detail.c_str());
-        return answerOf(problem);
-    } catch (const std::exception& exception) {
-        trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
-    }
-    return answerOf({500, "the request failed", ""});
 }
 
 RequestDispatcher::Admission RequestDispatcher::admit(IncomingRequest incoming) {

@@ -74,8 +74,6 @@ public:
     const RequestStatistics& statistics() const noexcept { return m_statistics; }
 
 private:
-    template <class Work>
-    std::optional<HttpAnswer> problemOf(const HttpRequest& request, Work work);
     void tryAdmit(IncomingRequest& incoming, Admission& admission);
     void count(const Admission& admission, const HttpAnswer& answer);
     std::shared_ptr<const RequestGuard> guard();

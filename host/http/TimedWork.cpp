@@ -27,11 +27,7 @@ HttpAnswer TimedWork::answer(std::function<HttpAnswer()> work, std::chrono::mill
     std::future<HttpAnswer> future = promise->get_future();
     try {
         std::thread([promise, isLate, work = std::move(work)] {
-            try {
-                promise->set_value(work());
-            } catch (...) {
-                promise->set_exception(std::current_exception());
-            }
+            promise->set_value(work());
             if (isLate->exchange(true)) {
                 --leftBehind;
             }

@@ -13,9 +13,9 @@ namespace zrm::host {
 /// thread.
 namespace TimedWork {
 
-/// Returns the answer of the work, or throws what it throws. Throws RequestRefused with status 503
-/// when there is no answer within the limit, or when too much work has already been abandoned.
-/// Abandoned work continues when it can, so what it refers to must live as long as the process.
+/// Returns the answer of the work, which must not throw. Throws RequestRefused with status 503 when
+/// there is no answer within the limit, or when too much work has already been abandoned. Abandoned
+/// work continues when it can, so what it refers to must live as long as the process.
 HttpAnswer answer(std::function<HttpAnswer()> work, std::chrono::milliseconds limit);
 
 } // namespace TimedWork
