@@ -1,0 +1,38 @@
+#ifndef ZRM_FOLLOW_SETTINGS_H
+#define ZRM_FOLLOW_SETTINGS_H
+
+#include <chrono>
+#include <string>
+
+namespace zrm {
+
+/// How a log that is followed through rotations and restarts is read. A log without such settings
+/// is a line of the log configuration and is read as that file's logs always are. Not changed after
+/// it was made: shared by all threads without a lock.
+struct FollowSettings {
+    enum class Follow : unsigned char {
+        name, ///< what has the log's path, through rotation
+        file, ///< the file that was opened, whatever it is called later
+    };
+    enum class Start : unsigned char { end, beginning };
+
+    Follow follow = Follow::name;
+    /// Where a file without a stored position begins if it was there when monitoring started.
+    Start start = Start::end;
+    /// Continue at the stored position.
+    bool resume = true;
+    /// The file appeared after monitoring started: it begins at its beginning, whatever `start` is,
+    /// unless a position is stored.
+    bool isNewcomer = false;
+    /// How long a rotated file must have been quiet before its successor is read.
+    std::chrono::milliseconds rotateWait{2000};
+    /// What times without a zone mean, as a name of the time zone database. Empty: local time.
+    std::string timezone;
+
+    /// Logs of equal settings need no new monitor.
+    bool operator==(const FollowSettings&) const = default;
+};
+
+} // namespace zrm
+
+#endif
