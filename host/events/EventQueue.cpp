@@ -12,6 +12,12 @@ namespace {
 /// How long a woken reader waits for more events, unless many have already arrived.
 constexpr std::chrono::milliseconds gatherTime{5};
 
+std::int64_t now() {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(
+               std::chrono::system_clock::now().time_since_epoch())
+        .count();
+}
+
 } // namespace
 
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
@@ -36,33 +42,66 @@ std::uint64_t EventQueue::slowest() const {
 }
 
 bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row) {
-    using std::chrono::system_clock;
-    bool isReaderAwaiting = false;
-    {
-        const std::lock_guard guard(m_mutex);
-        if (m_closed) {
-            return false;
-        }
-        Event event;
-        event.id = m_last + m_next + m_aside.size() + 1;
-        event.raised = std::chrono::duration_cast<std::chrono::milliseconds>(
-                           system_clock::now().time_since_epoch())
-                           .count();
-        event.situation = situation;
-        if (m_aside.empty() && hasSlot()) {
-            put(event, row);
-        } else {
-            auto copy = std::make_unique_for_overwrite<char[]>(m_rowSize);
-            std::memcpy(copy.get(), row, m_rowSize);
-            m_aside.push_back({std::move(event), std::move(copy)});
-        }
-        noteRoom();
-        isReaderAwaiting = isAwaited();
+    if (EntryEvents* const entry = EntryEvents::ofThisThread) {
+        entry->add(situation, row, m_rowSize);
+        return true;
     }
+    std::unique_lock lock(m_mutex);
+    if (m_closed) {
+        return false;
+    }
+    Event event;
+    event.raised = now();
+    event.situation = situation;
+    add(std::move(event), row);
+    announce(lock);
+    return true;
+}
+
+std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
+                                    const std::shared_ptr<FollowedLog>& log,
+                                    const LogPosition& behind) {
+    std::unique_lock lock(m_mutex);
+    if (m_closed || events.empty()) {
+        return 0;
+    }
+    const std::int64_t raised = now();
+    for (std::size_t index = 0; index < events.size(); ++index) {
+        Event event;
+        event.raised = raised;
+        event.situation = events.situation(index);
+        event.endsEntry = index + 1 == events.size();
+        if (event.endsEntry) {
+            event.log = log;
+            event.behind = behind;
+        }
+        add(std::move(event), events.row(index));
+    }
+    const std::uint64_t last = m_last + m_next + m_aside.size();
+    announce(lock);
+    return last;
+}
+
+/// After a push: wakes the readers that have waited for so many events.
+void EventQueue::announce(std::unique_lock<std::mutex>& lock) {
+    noteRoom();
+    const bool isReaderAwaiting = isAwaited();
+    lock.unlock();
     if (isReaderAwaiting) {
         m_changed.notify_all();
     }
-    return true;
+}
+
+/// Gives an event its id and its place, behind all others.
+void EventQueue::add(Event event, const char* row) {
+    event.id = m_last + m_next + m_aside.size() + 1;
+    if (m_aside.empty() && hasSlot()) {
+        put(event, row);
+    } else {
+        auto copy = std::make_unique_for_overwrite<char[]>(m_rowSize);
+        std::memcpy(copy.get(), row, m_rowSize);
+        m_aside.push_back({std::move(event), std::move(copy)});
+    }
 }
 
 /// Puts an event into the next, free slot of the ring.
@@ -72,6 +111,9 @@ void EventQueue::put(const Event& event, const char* row) {
     slot.id = event.id;
     slot.raised = event.raised;
     slot.situation = event.situation;
+    slot.endsEntry = event.endsEntry;
+    slot.log = event.log;
+    slot.behind = event.behind;
     std::memcpy(m_rows.get() + number * m_rowSize, row, m_rowSize);
     ++m_next;
 }

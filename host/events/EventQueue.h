@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_EVENT_QUEUE_H
 #define ZRM_HOST_EVENT_QUEUE_H
 
+#include "host/events/EntryEvents.h"
 #include "host/events/Event.h"
 #include "host/events/QueueState.h"
 
@@ -45,8 +46,14 @@ public:
     /// Is told whenever the ring becomes full, or has room again; quick, and calls nothing here.
     void onFull(std::function<void(bool isFull)> listener) { m_listener = std::move(listener); }
 
-    /// Copies one row in. False when the row was not taken because the queue is closed.
+    /// Copies one row in. False when the row was not taken because the queue is closed. Where the
+    /// calling thread collects the events of an entry, the row is collected.
     bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
+
+    /// Copies all events of an entry in, which stay together. The last one carries the position
+    /// behind the entry. Returns its id; 0 if nothing was taken because the queue is closed.
+    std::uint64_t pushEntry(const EntryEvents& events, const std::shared_ptr<FollowedLog>& log,
+                            const LogPosition& behind);
 
     /// Waits for events, until the limit, and a few milliseconds for more once the first has come.
     /// Gives the oldest ones that the reader has not released, at most `most`; they stay as they
@@ -81,6 +88,8 @@ private:
     std::size_t quarter() const { return std::max<std::size_t>(m_events.size() / 4, 1); }
     static constexpr std::uint64_t nobody = std::numeric_limits<std::uint64_t>::max();
     bool hasSlot() const { return m_next - slowest() < m_events.size(); }
+    void announce(std::unique_lock<std::mutex>& lock);
+    void add(Event event, const char* row);
     void put(const Event& event, const char* row);
     void takeFromAside();
     void noteRoom();

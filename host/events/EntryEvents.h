@@ -1,0 +1,47 @@
+#ifndef ZRM_HOST_ENTRY_EVENTS_H
+#define ZRM_HOST_ENTRY_EVENTS_H
+
+#include "host/events/SituationLabel.h"
+
+#include <cstddef>
+#include <memory>
+#include <vector>
+
+namespace zrm::host {
+
+/// The events that one entry of a followed log has raised, collected on the log's thread until the
+/// entry ends. Keeps its memory from entry to entry.
+class EntryEvents {
+public:
+    /// Collects what the calling thread pushes into the queue; null: it goes into the queue at
+    /// once.
+    static inline constinit thread_local EntryEvents* ofThisThread = nullptr;
+
+    /// Copies the row in. All rows of an entry have the same size.
+    void add(const std::shared_ptr<const SituationLabel>& situation, const char* row,
+             std::size_t rowSize) {
+        m_rowSize = rowSize;
+        m_rows.insert(m_rows.end(), row, row + rowSize);
+        m_situations.push_back(situation);
+    }
+    void clear() noexcept {
+        m_situations.clear();
+        m_rows.clear();
+    }
+
+    bool empty() const noexcept { return m_situations.empty(); }
+    std::size_t size() const noexcept { return m_situations.size(); }
+    const std::shared_ptr<const SituationLabel>& situation(std::size_t index) const noexcept {
+        return m_situations[index];
+    }
+    const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }
+
+private:
+    std::size_t m_rowSize = 0;
+    std::vector<std::shared_ptr<const SituationLabel>> m_situations;
+    std::vector<char> m_rows;
+};
+
+} // namespace zrm::host
+
+#endif

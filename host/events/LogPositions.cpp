@@ -1,0 +1,70 @@
+// The host's implementation of LogPositions.h.
+#include "framework/LogPositions.h"
+
+#include "host/events/EntryEvents.h"
+#include "host/events/PositionBook.h"
+
+using namespace zrm::host;
+
+namespace zrm {
+
+class LogPositions::State {
+public:
+    explicit State(const char* name)
+        : book(PositionBook::current()), log(book->log(name)), follower(log->begin()) {}
+    State(const State&) = delete;
+    State& operator=(const State&) = delete;
+    ~State() {
+        leaveEntry();
+        log->end(follower);
+    }
+
+    void leaveEntry() noexcept {
+        if (EntryEvents::ofThisThread == &events) {
+            EntryEvents::ofThisThread = nullptr;
+        }
+        events.clear();
+    }
+
+    const std::shared_ptr<PositionBook> book;
+    const std::shared_ptr<FollowedLog> log;
+    const FollowedLog::Follower follower;
+    EntryEvents events;
+};
+
+LogPositions::LogPositions(const char* log) : m_state(std::make_unique<State>(log)) {}
+
+LogPositions::~LogPositions() = default;
+
+bool LogPositions::areKept() const noexcept {
+    return m_state->book->isKept();
+}
+
+std::optional<LogPosition> LogPositions::stored() const {
+    return m_state->log->newest();
+}
+
+void LogPositions::beginEntry() noexcept {
+    m_state->events.clear();
+    EntryEvents::ofThisThread = &m_state->events;
+}
+
+bool LogPositions::hasEvents() const noexcept {
+    return !m_state->events.empty();
+}
+
+void LogPositions::endEntry(const LogPosition& behind) {
+    if (hasEvents() && !m_state->book->isClosed()) {
+        m_state->log->push(m_state->follower, m_state->book->queue(), m_state->events, m_state->log,
+                           behind);
+    }
+    m_state->leaveEntry();
+}
+
+void LogPositions::reached(const LogPosition& position) {
+    if (!m_state->book->isClosed()) {
+        m_state->log->reached(m_state->follower, position);
+    }
+}
+
+} // namespace zrm

@@ -1,0 +1,171 @@
+#include "host/events/PositionBook.h"
+
+#include "host/events/EventQueue.h"
+
+#include <utility>
+
+namespace zrm::host {
+
+FollowedLog::Follower FollowedLog::begin() {
+    const std::lock_guard guard(m_mutex);
+    m_follower = ++m_followers;
+    return m_follower;
+}
+
+void FollowedLog::end(Follower follower) {
+    const std::lock_guard guard(m_mutex);
+    if (m_follower == follower) {
+        m_follower = 0;
+    }
+}
+
+bool FollowedLog::isFollowed() const {
+    const std::lock_guard guard(m_mutex);
+    return m_follower != 0;
+}
+
+std::optional<LogPosition> FollowedLog::newest() const {
+    const std::lock_guard guard(m_mutex);
+    return m_newest;
+}
+
+void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& events,
+                       const std::shared_ptr<FollowedLog>& self, const LogPosition& behind) {
+    const std::lock_guard guard(m_mutex);
+    if (follower != m_follower || m_hasRefused) {
+        return;
+    }
+    const std::uint64_t last = queue == nullptr ? 0 : queue->pushEntry(events, self, behind);
+    if (last == 0) {
+        m_hasRefused = true;
+        return;
+    }
+    m_lastEvent = last;
+    m_newest = behind;
+    m_reached.reset();
+}
+
+void FollowedLog::reached(Follower follower, const LogPosition& position) {
+    const std::lock_guard guard(m_mutex);
+    if (follower == m_follower && !m_hasRefused && position != m_newest) {
+        m_newest = m_reached = position;
+    }
+}
+
+std::optional<LogPosition> FollowedLog::unsaved(std::uint64_t event) const {
+    const std::lock_guard guard(m_mutex);
+    if (m_reached && m_lastEvent <= event) {
+        return m_reached;
+    }
+    return m_isSaved ? std::nullopt : m_kept;
+}
+
+void FollowedLog::saved(const LogPosition& position) {
+    const std::lock_guard guard(m_mutex);
+    m_kept = position;
+    m_isSaved = true;
+    if (m_reached == position) {
+        m_reached.reset();
+    }
+}
+
+void FollowedLog::forgetSaved() {
+    const std::lock_guard guard(m_mutex);
+    m_isSaved = false;
+}
+
+namespace {
+
+struct Current {
+    std::mutex mutex;
+    std::shared_ptr<PositionBook> book =
+        std::make_shared<PositionBook>(std::vector<PositionValue>{}, false);
+};
+
+/// Never destroyed: logs may still be followed while the process exits.
+Current& theCurrent() {
+    static auto* const current = new Current;
+    return *current;
+}
+
+} // namespace
+
+std::shared_ptr<PositionBook> PositionBook::current() {
+    const std::lock_guard guard(theCurrent().mutex);
+    return theCurrent().book;
+}
+
+void PositionBook::makeCurrent(std::shared_ptr<PositionBook> book) {
+    const std::lock_guard guard(theCurrent().mutex);
+    theCurrent().book = std::move(book);
+}
+
+PositionBook::PositionBook(const std::vector<PositionValue>& stored, bool isKept)
+    : m_isKept(isKept) {
+    for (const PositionValue& value : stored) {
+        m_logs.emplace(value.log, std::make_shared<FollowedLog>(value.log, value.position));
+    }
+}
+
+std::shared_ptr<FollowedLog> PositionBook::log(std::string_view name) {
+    const std::lock_guard guard(m_mutex);
+    auto found = m_logs.find(name);
+    if (found == m_logs.end()) {
+        found = m_logs.emplace(name, std::make_shared<FollowedLog>(std::string(name), std::nullopt))
+                    .first;
+    }
+    return found->second;
+}
+
+std::vector<PositionValue> PositionBook::unsaved(std::uint64_t event) const {
+    std::vector<PositionValue> values;
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, log] : m_logs) {
+        if (const std::optional<LogPosition> position = log->unsaved(event)) {
+            values.push_back({name, *position});
+        }
+    }
+    return values;
+}
+
+void PositionBook::saved(const std::vector<PositionValue>& values) {
+    const std::lock_guard guard(m_mutex);
+    for (const PositionValue& value : values) {
+        if (const auto found = m_logs.find(value.log); found != m_logs.end()) {
+            found->second->saved(value.position);
+        }
+    }
+}
+
+void PositionBook::forgetSaved() {
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, log] : m_logs) {
+        log->forgetSaved();
+    }
+}
+
+void PositionBook::renewFollowed() {
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, log] : m_logs) {
+        if (log->isFollowed()) {
+            log->forgetSaved();
+        }
+    }
+}
+
+void PositionBook::removed(const std::vector<std::string>& logs) {
+    const std::lock_guard guard(m_mutex);
+    for (const std::string& name : logs) {
+        const auto found = m_logs.find(name);
+        if (found == m_logs.end()) {
+            continue;
+        }
+        if (found->second->isFollowed()) {
+            found->second->forgetSaved();
+        } else {
+            m_logs.erase(found);
+        }
+    }
+}
+
+} // namespace zrm::host

@@ -1,0 +1,121 @@
+#ifndef ZRM_HOST_POSITION_BOOK_H
+#define ZRM_HOST_POSITION_BOOK_H
+
+#include "framework/LogPositions.h"
+
+#include <atomic>
+#include <cstdint>
+#include <functional>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace zrm::host {
+
+class EntryEvents;
+class EventQueue;
+
+/// The position of one log as the store has it or is to have it.
+struct PositionValue {
+    std::string log; ///< its name
+    LogPosition position;
+    bool operator==(const PositionValue&) const = default;
+};
+
+/// What is known of one followed log's position. Any thread.
+class FollowedLog {
+public:
+    FollowedLog(std::string name, std::optional<LogPosition> stored)
+        : m_name(std::move(name)), m_newest(stored), m_kept(stored) {}
+    FollowedLog(const FollowedLog&) = delete;
+    FollowedLog& operator=(const FollowedLog&) = delete;
+
+    const std::string& name() const noexcept { return m_name; }
+
+    // For the log's thread.
+
+    /// Identifies who follows the log; what others say of its position is ignored from now on.
+    using Follower = std::uint64_t;
+    Follower begin();
+    void end(Follower follower);
+    /// The newest position that the queue has or that was reached.
+    std::optional<LogPosition> newest() const;
+    /// Gives the events to the queue. When it does not take them, because it is closed or null,
+    /// later positions are ignored. `self` is this object.
+    void push(Follower follower, EventQueue* queue, const EntryEvents& events,
+              const std::shared_ptr<FollowedLog>& self, const LogPosition& behind);
+    void reached(Follower follower, const LogPosition& position);
+
+    // For the writer of the store.
+
+    bool isFollowed() const;
+    /// A position that is to be stored and stands behind events up to `event` only.
+    std::optional<LogPosition> unsaved(std::uint64_t event) const;
+    void saved(const LogPosition& position);
+    /// The store has no longer what it had.
+    void forgetSaved();
+
+private:
+    const std::string m_name;
+    mutable std::mutex m_mutex; ///< guards what follows
+    Follower m_follower = 0;    ///< 0: nobody
+    Follower m_followers = 0;   ///< so far
+    bool m_hasRefused = false;  ///< the queue did not take its events: later positions are void
+    std::optional<LogPosition> m_newest;
+    std::optional<LogPosition> m_reached; ///< without events, behind those up to m_lastEvent
+    std::uint64_t m_lastEvent = 0;        ///< the log's last event in the queue
+    std::optional<LogPosition> m_kept;    ///< stored last
+    bool m_isSaved = true;                ///< the store still has m_kept
+};
+
+/// The positions of all followed logs, between the logs' threads and the writer of the store.
+class PositionBook {
+public:
+    /// `isKept`: what the writer is given survives the process.
+    PositionBook(const std::vector<PositionValue>& stored, bool isKept);
+
+    /// The book that logs are followed with. One that keeps nothing at first. Any thread.
+    static std::shared_ptr<PositionBook> current();
+    static void makeCurrent(std::shared_ptr<PositionBook> book);
+
+    bool isKept() const noexcept { return m_isKept; }
+
+    /// What the position of this log is. Any thread.
+    std::shared_ptr<FollowedLog> log(std::string_view name);
+
+    /// The queue that takes events, from its creation on; null before and after. It outlives the
+    /// logs' threads.
+    void setQueue(EventQueue* queue) noexcept { m_queue.store(queue); }
+    EventQueue* queue() const noexcept { return m_queue.load(); }
+
+    /// No more events or positions are taken: from now on not every situation judges what is read.
+    void close() noexcept { m_isClosed.store(true); }
+    bool isClosed() const noexcept { return m_isClosed.load(); }
+
+    // For the writer of the store.
+
+    /// Positions that are to be stored once the events up to this one are.
+    std::vector<PositionValue> unsaved(std::uint64_t event) const;
+    void saved(const std::vector<PositionValue>& values);
+    /// The store has lost what it had: all of it is to be stored again.
+    void forgetSaved();
+    /// The positions of logs that are followed now are to be stored again, so that they stay new.
+    void renewFollowed();
+    /// The store has removed the positions of these logs. One that is followed is stored again.
+    void removed(const std::vector<std::string>& logs);
+
+private:
+    const bool m_isKept;
+    std::atomic<EventQueue*> m_queue{nullptr};
+    std::atomic<bool> m_isClosed{false};
+    mutable std::mutex m_mutex; ///< guards the map
+    std::map<std::string, std::shared_ptr<FollowedLog>, std::less<>> m_logs;
+};
+
+} // namespace zrm::host
+
+#endif

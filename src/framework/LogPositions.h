@@ -1,0 +1,62 @@
+#ifndef ZRM_FRAMEWORK_LOG_POSITIONS_H
+#define ZRM_FRAMEWORK_LOG_POSITIONS_H
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+
+namespace zrm {
+
+/// Where the next entry of a followed log begins.
+struct LogPosition {
+    std::uint64_t device = 0;
+    std::uint64_t inode = 0;
+    std::int64_t offset = 0;       ///< bytes before the next entry
+    std::uint64_t guard = 0;       ///< hash of the last `guardLength` bytes before the offset
+    std::uint32_t guardLength = 0; ///< bytes; 0 at the beginning of a file
+
+    bool operator==(const LogPosition&) const = default;
+};
+
+/// The position of one followed log in the framework's store of events. The events of an entry and
+/// the position behind it are stored together or not at all. Created, used and destroyed on the
+/// log's thread; one object per thread at a time. A newer object for the same log takes over: the
+/// older one stores nothing more, so that an entry that both read is stored once.
+class LogPositions {
+public:
+    /// `log` is the log's name in UTF-8.
+    explicit LogPositions(const char* log);
+    LogPositions(const LogPositions&) = delete;
+    LogPositions& operator=(const LogPositions&) = delete;
+    /// The events of an entry that was not ended are dropped.
+    ~LogPositions();
+
+    /// Whether positions survive the process. If not, the log has no position when it is followed
+    /// for the first time after a start.
+    bool areKept() const noexcept;
+
+    /// The newest position that this run or an earlier one has stored or is about to store. None
+    /// for a new log.
+    std::optional<LogPosition> stored() const;
+
+    /// The events that this thread raises from now on are those of one entry. Events of an entry
+    /// that was begun and not ended are dropped.
+    void beginEntry() noexcept;
+    /// Whether the entry has raised an event. Costs next to nothing; call it after every entry.
+    bool hasEvents() const noexcept;
+    /// Ends an entry that has raised events: gives them to the store together with the position
+    /// behind the entry. While the process ends, neither is taken any more, nor is any later
+    /// position; the next run judges the entry again.
+    void endEntry(const LogPosition& behind);
+    /// Everything before the position has been judged. Stored within about a second, never before
+    /// the events of earlier entries. Call it at most once a second, and when reading ends.
+    void reached(const LogPosition& position);
+
+private:
+    class State;
+    std::unique_ptr<State> m_state;
+};
+
+} // namespace zrm
+
+#endif
