@@ -2,6 +2,7 @@
 #define ZRM_LOG_MANAGER_H
 
 #include "framework/Pulse.h"
+#include "logs/FurtherLogs.h"
 #include "logs/ValidLog.h"
 
 #include <atomic>
@@ -74,15 +75,25 @@ private:
     /// only be cancelled here and in sleep and sigwait.
     int waitFor(pthread_cond_t& condition, const timespec* limit);
 
-    /// Re-reads the configuration. Returns the number of logs, or 0 if there is nothing to do.
+    /// Re-reads the configuration. Returns 0 if there is nothing to do and nothing to wait for.
     std::uint32_t refresh();
+    /// Takes the published list of further logs. True if it is another than before.
+    bool takeFurtherLogs();
     void waitForRequests();
     std::uint32_t getValidLogs();
     std::uint32_t getDefaultLogs();
     std::uint32_t createValidLogList(WhenceConfig whence, const char* path);
     void discardValidLogs();
     void buildLogObjects(unsigned validCount);
-    void buildLogObject(const ValidLog& log);
+    /// True if the object can continue as the monitor of this line, possibly in a new debug mode.
+    static bool canMonitor(const LogFile& object, const ValidLog& log);
+    /// Keeps the log's present object or creates a new one.
+    void buildLogObject(const ValidLog& log, LogFile* present);
+    /// Marks the objects that this refresh does not keep unless it builds them again. Returns the
+    /// number of others.
+    std::uint32_t markLogObjects(bool isConfigNew);
+    /// Builds the objects of the further logs. Returns their number.
+    std::uint32_t buildFurtherLogs();
     void retireMarkedLogs();
     /// Ends the monitoring of the logs taken off the chain. Runs without the lock, because a thread
     /// needs up to a second to end and requests need the lock in the meantime.
@@ -118,7 +129,10 @@ private:
     std::atomic<std::uint32_t> NumLogs{0};
     std::atomic<std::int32_t> UseCount{0};
     std::atomic<bool> RefreshWaiting{false};
-    LogFile* RetiredLogs = nullptr; ///< owns a chain of logs to delete; manager thread only
+    // Used by the manager thread only.
+    std::shared_ptr<const FurtherLogs::List> FurtherLogsTaken; ///< null: there are none
+    bool IsConfigEmptied = false;   ///< the log configuration was read and names no valid log
+    LogFile* RetiredLogs = nullptr; ///< owns a chain of logs to delete
     Pulse ManagerPulse{"the log manager"};
     /// Owns the circular chain of valid logs, which exists from reading the configuration until the
     /// monitoring objects are built.

@@ -22,6 +22,10 @@ std::uint32_t LogManager::getValidLogs() {
         return trace.result(std::uint32_t{0});
     }
     const std::time_t changed = LogManagerUtil::fileLastModified(ConfigFile.get());
+    if (changed == 0 && FurtherLogsTaken) {
+        trace.detail()("There is no log configuration %s.", ConfigFile.get());
+        return trace.result(std::uint32_t{0});
+    }
     if (changed == 0) {
         trace.error()("Attempting to build default list from syslog file %s.",
                       SyslogConfFile.get());
@@ -33,6 +37,12 @@ std::uint32_t LogManager::getValidLogs() {
         return trace.result(std::uint32_t{0});
     }
     const std::uint32_t count = createValidLogList(CONFIG_USER, ConfigFile.get());
+    if (count == 0 && FurtherLogsTaken) {
+        trace.detail()("No valid log files found in %s.", ConfigFile.get());
+        IsConfigEmptied = true;
+        ConfigFileLastChanged = changed;
+        return trace.result(count);
+    }
     if (count == 0) {
         trace.error()("No valid log files found in %s.  Attempting to build default list from "
                       "syslog file %s.",

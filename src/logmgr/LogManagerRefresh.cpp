@@ -3,11 +3,13 @@
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
+#include "logs/FollowSettings.h"
 #include "logtypes/createLogFile.h"
 #include "monitor/LogFile.h"
 
 #include <cstdlib>
 #include <cstring>
+#include <utility>
 
 namespace zrm {
 
@@ -17,12 +19,16 @@ TRC1_Anchor anchor{"LogManagerRefresh.cpp"};
 
 constexpr unsigned noWorkSeconds = 60; ///< how long an agent without logs runs before it ends
 
-/// True if the object can continue as the monitor of this line, possibly in a new debug mode.
-bool canMonitor(const LogFile& object, const ValidLog& log) {
-    return object.type() == log.type() && std::strcmp(object.procedure(), log.procedure()) == 0;
-}
-
 } // namespace
+
+bool LogManager::canMonitor(const LogFile& object, const ValidLog& log) {
+    const FollowSettings* const before = object.followSettings().get();
+    const FollowSettings* const now = log.followSettings().get();
+    const bool isFollowedAlike =
+        before == now || (before != nullptr && now != nullptr && *before == *now);
+    return isFollowedAlike && object.type() == log.type() &&
+           std::strcmp(object.procedure(), log.procedure()) == 0;
+}
 
 std::uint32_t LogManager::refresh() {
     TraceScope trace(anchor);
@@ -30,8 +36,9 @@ std::uint32_t LogManager::refresh() {
     if (DebugLog && DebugLogP == nullptr) {
         openDebugLog();
     }
+    const bool isFurtherNew = takeFurtherLogs();
     const std::uint32_t validCount = getValidLogs();
-    if (validCount > 0) {
+    if (validCount > 0 || isFurtherNew || IsConfigEmptied) {
         lockManager();
         waitForRequests();
         buildLogObjects(validCount);
@@ -42,6 +49,10 @@ std::uint32_t LogManager::refresh() {
         }
     } else if (NumLogs != 0) {
         trace.detail()("Continuing to monitor existing log files.");
+    }
+    if (NumLogs == 0 && FurtherLogsTaken) {
+        trace.detail()("Waiting for logs to appear.");
+        return trace.result(std::uint32_t{1});
     }
     if (NumLogs == 0) {
         trace.error()("Agent has no work to do.  Exiting...");
@@ -74,30 +85,38 @@ void LogManager::waitForRequests() {
 
 void LogManager::buildLogObjects(unsigned validCount) {
     TraceScope trace(anchor);
-    LogFile* object = FirstLogObject;
-    for (std::uint32_t i = 0; i < NumLogs; ++i) {
-        object->setMarked(true);
-        object = object->next();
-    }
+    std::uint32_t expected =
+        validCount + markLogObjects(validCount > 0 || std::exchange(IsConfigEmptied, false));
     const ValidLog* log = FirstValidLog;
     for (unsigned i = 0; i < validCount; ++i) {
-        buildLogObject(*log);
+        buildLogObject(*log, findLogObject(log->fileNameLocal()));
         log = log->next();
     }
+    expected += buildFurtherLogs();
     retireMarkedLogs();
-    if (NumLogs != validCount) {
+    if (NumLogs != expected) {
         trace.error()("Fatal error during refresh processing. No. of valid logs = %d: No. of "
                       "actual logs = %d. Agent is terminating.",
-                      static_cast<int>(validCount), static_cast<int>(NumLogs.load()));
+                      static_cast<int>(expected), static_cast<int>(NumLogs.load()));
         std::exit(-1);
     }
     discardValidLogs();
 }
 
-/// Keeps the log's existing object or creates a new one.
-void LogManager::buildLogObject(const ValidLog& log) {
+std::uint32_t LogManager::markLogObjects(bool isConfigNew) {
     TraceScope trace(anchor);
-    LogFile* const present = findLogObject(log.fileNameLocal());
+    std::uint32_t unmarked = 0;
+    LogFile* object = FirstLogObject;
+    for (std::uint32_t i = 0; i < NumLogs; ++i) {
+        object->setMarked(isConfigNew || object->followSettings() != nullptr);
+        unmarked += object->isMarked() ? 0 : 1;
+        object = object->next();
+    }
+    return trace.result(unmarked);
+}
+
+void LogManager::buildLogObject(const ValidLog& log, LogFile* present) {
+    TraceScope trace(anchor);
     if (present != nullptr && canMonitor(*present, log)) {
         *present = log;
         present->setMarked(false);
@@ -108,6 +127,9 @@ void LogManager::buildLogObject(const ValidLog& log) {
                       "%s. Log not monitored.",
                       static_cast<int>(log.type()), log.fileNameLocal());
         return;
+    }
+    if (present != nullptr && present->followSettings() != nullptr) {
+        present->stopThread(); // its successor continues where it ends
     }
     LogFile* const created = createLogFile(log, FirstLogObject);
     if (created == nullptr) {

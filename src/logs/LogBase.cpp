@@ -50,6 +50,7 @@ LogBase::LogBase(const LogBase& other) {
     LogDebugMode.store(other.debugMode(), std::memory_order_relaxed);
     LogType = other.LogType;
     setLogProcedure(other.LogProcedure.get());
+    LogFollowSettings = other.LogFollowSettings;
 }
 
 void LogBase::setLogFileName(const char* name, int isUTF8) {

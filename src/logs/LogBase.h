@@ -7,18 +7,21 @@
 
 namespace zrm {
 
+struct FollowSettings;
+
 /// Returns a heap copy of `name` and sets `pathLength` to the length of its directory part
 /// including the last '/'. If there is none, `pathLength` is 0 and the trace shows an error. Ends
 /// the process if memory runs out.
 std::unique_ptr<char[]> newLogFileName(std::size_t& pathLength, const char* name);
 
 /// The common part of a configuration line and a monitored log: the name in the local code page (to
-/// open) and in UTF-8 (to report), type, debug mode, procedure, and the links of a circular chain
-/// whose head the owner holds. Not locked; the log manager's lock guards the chain.
+/// open) and in UTF-8 (to report), type, debug mode, procedure, how it is followed, and the links
+/// of a circular chain whose head the owner holds. Not locked; the log manager's lock guards the
+/// chain.
 class LogBase {
 public:
     LogBase() = default;
-    /// Copies names, type, debug mode and procedure. The copy is not on a chain.
+    /// Copies everything but the links. The copy is not on a chain.
     LogBase(const LogBase& other);
     LogBase& operator=(const LogBase&) = delete;
     virtual ~LogBase() = default;
@@ -46,6 +49,10 @@ public:
     std::size_t pathLengthUTF8() const noexcept { return LogPathNameLengthUTF8; }
     char debugMode() const noexcept { return LogDebugMode.load(std::memory_order_relaxed); }
     char type() const noexcept { return LogType; }
+    /// How the log is followed. Null for a log of the log configuration.
+    const std::shared_ptr<const FollowSettings>& followSettings() const noexcept {
+        return LogFollowSettings;
+    }
     LogBase* next() const noexcept { return Next; }
     LogBase* prev() const noexcept { return Prev; }
 
@@ -59,6 +66,7 @@ protected:
     std::unique_ptr<char[]> LogFileNameUTF8;
     std::unique_ptr<char[]> LogFileNameLocal;
     std::unique_ptr<char[]> LogProcedure;
+    std::shared_ptr<const FollowSettings> LogFollowSettings;
     LogBase* Next = nullptr;
     LogBase* Prev = nullptr;
     std::size_t LogPathNameLengthLocal = 0;

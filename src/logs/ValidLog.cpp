@@ -1,6 +1,7 @@
 #include "logs/ValidLog.h"
 
 #include "base/TraceScope.h"
+#include "logs/FurtherLogs.h"
 #include "logs/LogManagerUtil.h"
 
 #include <cassert>
@@ -95,6 +96,19 @@ ValidLog::ValidLog(WhenceConfig whence, char* line, ValidLog* head) {
         if (trace.isOn(TRC1_FINE)) {
             printSelf();
         }
+    }
+}
+
+ValidLog::ValidLog(const FurtherLog& log) {
+    TraceScope trace(anchor);
+    addToChain(nullptr);
+    LogType = log.type;
+    LogDebugMode.store(log.debugMode, std::memory_order_relaxed);
+    LogFollowSettings = log.settings;
+    setLogFileName(log.name.c_str(), 1);
+    Valid = log.name.starts_with('/') && LogPathNameLengthLocal != 0 && isNameUsable(trace, 1);
+    if (!log.procedure.empty()) {
+        setLogProcedure(log.procedure.c_str());
     }
 }
 

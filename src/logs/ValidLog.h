@@ -6,6 +6,7 @@
 namespace zrm {
 
 class TraceScope;
+struct FurtherLog;
 
 /// The source of a configuration line.
 enum WhenceConfig : char {
@@ -14,13 +15,16 @@ enum WhenceConfig : char {
 };
 
 /// One accepted line of the log configuration, or a rejected one if isValid() is false. Stays on
-/// the log manager's chain of valid logs until the monitoring objects have been built. Manager
-/// thread only.
+/// the log manager's chain of valid logs until the monitoring objects have been built. Also a log
+/// that the framework configures. Manager thread only.
 class ValidLog : public LogBase {
 public:
     /// Parses `line` (which it modifies) and checks it against the chain that starts at `head`
     /// (null: empty). A valid line joins that chain.
     ValidLog(WhenceConfig whence, char* line, ValidLog* head);
+    /// A log that the framework configures; on no chain. The file need not exist. Invalid if the
+    /// name is not absolute or a conversion between code pages does not keep it.
+    explicit ValidLog(const FurtherLog& log);
     ValidLog(const ValidLog&) = delete;
     /// Leaves the chain if valid.
     ~ValidLog() override;

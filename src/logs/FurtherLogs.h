@@ -1,0 +1,41 @@
+#ifndef ZRM_FURTHER_LOGS_H
+#define ZRM_FURTHER_LOGS_H
+
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace zrm {
+
+struct FollowSettings;
+
+/// A log to follow that the log configuration does not name.
+struct FurtherLog {
+    std::string name; ///< absolute path, UTF-8
+    char type = 'S';
+    char debugMode = 'N';
+    std::string procedure; ///< empty: none
+    std::shared_ptr<const FollowSettings> settings;
+};
+
+/// The list of logs that the framework configures besides the log configuration: the framework
+/// publishes it, and the log manager takes it at each refresh. Any thread.
+namespace FurtherLogs {
+
+/// At most one log of each name.
+using List = std::vector<FurtherLog>;
+
+/// Exchanges the list. The log manager takes it over when it receives its next signal to refresh;
+/// what is published before the log manager exists needs no signal. From the first list on, even an
+/// empty one, the agent waits for logs rather than end without any, and does not fall back to the
+/// syslog configuration.
+void publish(std::shared_ptr<const List> logs);
+
+/// The list published last; null if there was none.
+std::shared_ptr<const List> published();
+
+} // namespace FurtherLogs
+
+} // namespace zrm
+
+#endif
