@@ -18,29 +18,35 @@ TRC1_Anchor anchor{"Delivery.cpp"};
 
 constexpr std::size_t queuedEvents = 2048; ///< about 6 MB of Log Entries rows
 
-/// The configured history; null with the reason when it cannot be opened.
-std::unique_ptr<History> openHistory(const HostConfig& config, std::string& problem) {
-    if (!config.history.enabled) {
-        return nullptr;
-    }
-    const std::string& directory =
-        config.history.directory.empty() ? config.stateDirectory : config.history.directory;
-    auto opened = History::open(config.history, directory);
-    if (auto* const history = std::get_if<std::unique_ptr<History>>(&opened)) {
-        return std::move(*history);
-    }
-    problem = std::get<std::string>(opened);
-    say("the history is off: %s. Until the next start sinks receive events without it, and one "
-        "that stays down stops the monitoring",
-        problem.c_str());
-    return nullptr;
-}
-
 } // namespace
 
-Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize)
-    : m_format(layout), m_history(openHistory(config, m_historyProblem)),
-      m_queue(queuedEvents, rowSize, m_history == nullptr ? 0 : m_history->newest()) {
+OpenedHistory openHistory(const HostConfig& config) {
+    OpenedHistory result;
+    if (config.history.enabled) {
+        const std::string& directory =
+            config.history.directory.empty() ? config.stateDirectory : config.history.directory;
+        auto opened = History::open(config.history, directory);
+        if (auto* const history = std::get_if<std::unique_ptr<History>>(&opened)) {
+            result.history = std::move(*history);
+        } else {
+            result.problem = std::get<std::string>(opened);
+            say("the history is off: %s. Until the next start sinks receive events without it, and "
+                "one that stays down stops the monitoring",
+                result.problem.c_str());
+        }
+    }
+    PositionBook::makeCurrent(result.history == nullptr ? PositionBook::unkept()
+                                                        : result.history->positions());
+    return result;
+}
+
+Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize,
+                   OpenedHistory opened)
+    : m_format(layout), m_historyProblem(std::move(opened.problem)),
+      m_history(std::move(opened.history)),
+      m_queue(queuedEvents, rowSize, m_history == nullptr ? 0 : m_history->newest()),
+      m_positions(PositionBook::current()) {
+    m_positions->setQueue(&m_queue);
     m_queue.onFull(EventRoomControl::setFull);
     for (const SinkConfig& sink : config.sinks) {
         m_sinks.push_back(
@@ -49,6 +55,7 @@ Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_
 }
 
 Delivery::~Delivery() {
+    m_positions->setQueue(nullptr);
     EventRoomControl::setFull(false);
     m_sinks.clear();
     if (m_history != nullptr) {

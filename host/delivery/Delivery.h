@@ -14,14 +14,24 @@
 
 namespace zrm::host {
 
+/// The history that the configuration asks for.
+struct OpenedHistory {
+    std::unique_ptr<History> history; ///< null: off
+    std::string problem;              ///< why it is off although it is configured; otherwise empty
+};
+
+/// Opens it; if it cannot be opened, says why. From now on logs are followed from the positions
+/// that it holds.
+OpenedHistory openHistory(const HostConfig& config);
+
 /// Delivers events: the queue, the history, and one thread per sink. With a history, each sink
 /// reads committed events from its own position; without one, sinks read from the queue. start and
 /// finish are called by one thread at a time, the rest by any.
 class Delivery {
 public:
-    /// Creates the queue for rows of this layout, and the history if configured; starts no thread.
-    /// If the history cannot be opened, says why and continues without it.
-    Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize);
+    /// Creates the queue for rows of this layout; starts no thread.
+    Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize,
+             OpenedHistory opened);
     ~Delivery();
     Delivery(const Delivery&) = delete;
     Delivery& operator=(const Delivery&) = delete;
@@ -30,6 +40,10 @@ public:
     EventQueue& queue() noexcept { return m_queue; }
 
     void start();
+
+    /// From now on the events and positions of followed logs are no longer taken: the situations
+    /// are about to close, and the next run judges again what comes now.
+    void closePositions() noexcept { m_positions->close(); }
 
     /// Stores and delivers what is queued, until the limit at the latest, and ends the threads.
     /// Says which sinks did not get everything. May be called more than once.
@@ -52,9 +66,10 @@ private:
     void finishSinks(EventQueue::Clock::time_point limit);
 
     const EventJson m_format;
-    std::string m_historyProblem;
+    const std::string m_historyProblem;
     const std::unique_ptr<History> m_history; ///< null: off
     EventQueue m_queue;
+    const std::shared_ptr<PositionBook> m_positions;
     std::vector<std::unique_ptr<SinkThread>> m_sinks;
     bool m_finished = false;
 };

@@ -78,8 +78,7 @@ namespace {
 
 struct Current {
     std::mutex mutex;
-    std::shared_ptr<PositionBook> book =
-        std::make_shared<PositionBook>(std::vector<PositionValue>{}, false);
+    std::shared_ptr<PositionBook> book = PositionBook::unkept();
 };
 
 /// Never destroyed: logs may still be followed while the process exits.

@@ -81,6 +81,10 @@ public:
     /// The book that logs are followed with. One that keeps nothing at first. Any thread.
     static std::shared_ptr<PositionBook> current();
     static void makeCurrent(std::shared_ptr<PositionBook> book);
+    /// A new book whose positions end with the process.
+    static std::shared_ptr<PositionBook> unkept() {
+        return std::make_shared<PositionBook>(std::vector<PositionValue>{}, false);
+    }
 
     bool isKept() const noexcept { return m_isKept; }
 

@@ -32,6 +32,17 @@ std::uint64_t newestOfCorrupt(const std::string& path) {
     }
 }
 
+/// The positions of logs in a file about to be moved aside, if they can be read. The files' guards
+/// tell whether they still fit.
+std::vector<PositionValue> positionsOfCorrupt(const std::string& path) {
+    try {
+        Database database(path, Database::Use::READ);
+        return PositionTable::read(database);
+    } catch (const DatabaseError&) {
+        return {};
+    }
+}
+
 /// The id after which a file with this newest event continues: if the file is new or an older copy,
 /// ids used since then are not reused.
 std::uint64_t newestWith(const HistoryDirectory& directory, std::uint64_t newest) {
@@ -62,10 +73,13 @@ openOrReplace(const HistoryDirectory& directory) {
                 throw;
             }
             const std::uint64_t newest = newestOfCorrupt(directory.file());
+            const std::vector<PositionValue> positions = positionsOfCorrupt(directory.file());
             if (std::string failure = directory.moveAside(error.what()); !failure.empty()) {
                 return failure;
             }
-            return open(newest);
+            auto file = open(newest);
+            file->keepPositions(positions);
+            return file;
         }
     } catch (const SchemaTooNew& error) {
         return problem(error.what()) +
@@ -96,8 +110,10 @@ std::variant<std::unique_ptr<History>, std::string> History::open(const HistoryC
 History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
                  std::unique_ptr<HistoryFile> file)
     : m_directory(std::move(directory)), m_recent(bytesInMemory, file->newest()),
-      m_readers(m_directory->file()), m_file(*file),
-      m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors) {}
+      m_readers(m_directory->file()),
+      m_positions(std::make_shared<PositionBook>(file->positions(), true)), m_file(*file),
+      m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors,
+               *m_positions) {}
 
 History::~History() {
     m_recent.end();

@@ -3,6 +3,7 @@
 
 #include "host/config/HostConfig.h"
 #include "host/events/EventSource.h"
+#include "host/events/PositionBook.h"
 #include "host/history/Cursors.h"
 #include "host/history/HistoryDirectory.h"
 #include "host/history/HistoryReader.h"
@@ -37,6 +38,9 @@ public:
     /// ran; a new one begins with the next event. `name` is how messages call it. Before start.
     std::unique_ptr<EventSource> source(const std::string& key, const std::string& name);
 
+    /// The positions of followed logs, as they were stored and as they move.
+    const std::shared_ptr<PositionBook>& positions() const noexcept { return m_positions; }
+
     /// Begins to store the queue's events, which `format` renders. Their ids follow newest().
     void start(EventQueue& queue, EventJson format);
 
@@ -68,6 +72,7 @@ private:
     RecentEvents m_recent;
     ReaderPool m_readers;
     Cursors m_cursors;
+    const std::shared_ptr<PositionBook> m_positions;
     HistoryFile& m_file; ///< the writer's, before start
     HistoryWriter m_writer;
     bool m_toldOfRest = false; ///< what could not be stored was said

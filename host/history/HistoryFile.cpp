@@ -51,7 +51,8 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
-      m_cursors(m_database), m_rates(m_database), m_files(path), m_oldest(m_events.oldest()),
+      m_cursors(m_database), m_positions(m_database), m_rates(m_database), m_files(path),
+      m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
@@ -91,10 +92,12 @@ void HistoryFile::putEvents(const EventBatch& batch) {
     }
 }
 
-void HistoryFile::store(const EventBatch& batch, const std::vector<CursorValue>& cursors) {
+void HistoryFile::store(const EventBatch& batch, const std::vector<CursorValue>& cursors,
+                        const std::vector<PositionValue>& positions) {
     inTransaction([&] {
         putEvents(batch);
         putCursors(cursors);
+        putPositions(positions);
     });
     m_newest = batch.last();
     if (m_oldest == 0) {
@@ -114,6 +117,22 @@ void HistoryFile::keepCursors(const std::vector<CursorValue>& cursors) {
 
 void HistoryFile::removeOldCursors(int days) {
     m_cursors.removeUnusedSince(WallClock::now() - days * millisecondsPerDay);
+}
+
+void HistoryFile::putPositions(const std::vector<PositionValue>& positions) {
+    for (const PositionValue& position : positions) {
+        m_positions.keep(position, WallClock::now());
+    }
+}
+
+void HistoryFile::keepPositions(const std::vector<PositionValue>& positions) {
+    inTransaction([&] { putPositions(positions); });
+}
+
+std::vector<std::string> HistoryFile::removeOldPositions(std::int64_t time) {
+    std::vector<std::string> logs;
+    inTransaction([&] { logs = m_positions.removeNotedBefore(time); });
+    return logs;
 }
 
 void HistoryFile::addEntries(const std::vector<MinuteCounts>& minutes) {

@@ -7,6 +7,7 @@
 #include "host/history/EventTable.h"
 #include "host/history/LabelTable.h"
 #include "host/history/OpenFiles.h"
+#include "host/history/PositionTable.h"
 #include "host/history/RateTable.h"
 
 #include <cstdint>
@@ -45,13 +46,21 @@ public:
     /// Makes the ids of a history without events start after this one.
     void continueAfter(std::uint64_t id);
 
-    /// Stores events, whose ids follow the newest, their part of the rates, and cursors.
-    void store(const EventBatch& batch, const std::vector<CursorValue>& cursors);
+    /// Stores events, whose ids follow the newest, their part of the rates, cursors, and the
+    /// positions behind the events' entries.
+    void store(const EventBatch& batch, const std::vector<CursorValue>& cursors,
+               const std::vector<PositionValue>& positions = {});
 
     void keepCursors(const std::vector<CursorValue>& cursors);
     std::optional<std::uint64_t> cursor(const std::string& sink) { return m_cursors.find(sink); }
     /// Removes sinks that have not been used for this many days.
     void removeOldCursors(int days);
+
+    void keepPositions(const std::vector<PositionValue>& positions);
+    std::vector<PositionValue> positions() { return PositionTable::read(m_database); }
+    /// Removes the positions of logs last followed before this time (milliseconds since 1970), and
+    /// returns their names.
+    std::vector<std::string> removeOldPositions(std::int64_t time);
 
     /// Adds the entries of minutes that are over.
     void addEntries(const std::vector<MinuteCounts>& minutes);
@@ -80,12 +89,14 @@ private:
     template <class Work> void inTransaction(Work&& work);
     std::uint64_t lastExpired(const Limits& limits);
     void putCursors(const std::vector<CursorValue>& cursors);
+    void putPositions(const std::vector<PositionValue>& positions);
     void putEvents(const EventBatch& batch);
 
     Database m_database;
     LabelTable m_labels;
     EventTable m_events;
     CursorTable m_cursors;
+    PositionTable m_positions;
     RateTable m_rates;
     const OpenFiles m_files;
     std::uint64_t m_oldest = 0;

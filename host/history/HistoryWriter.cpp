@@ -26,6 +26,8 @@ constexpr std::int64_t millisecondsPerDay = 24 * 60 * 60'000;
 /// The place of a sink that is no longer in the configuration is kept so long.
 constexpr int daysOfUnusedCursors = 30;
 constexpr std::chrono::hours tendingInterval{24};
+/// After the start; until then nobody knows which logs are still followed.
+constexpr std::chrono::minutes timeUntilLogsAreFollowed{1};
 
 /// Minutes of entries that are kept while they cannot be stored.
 constexpr std::size_t mostMinutes = 24 * 60;
@@ -34,9 +36,11 @@ constexpr std::size_t mostMinutes = 24 * 60;
 
 HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                              std::unique_ptr<HistoryFile> file, RecentEvents& recent,
-                             ReaderPool& readers, Cursors& cursors)
+                             ReaderPool& readers, Cursors& cursors, PositionBook& positions)
     : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
-      m_readers(readers), m_cursors(cursors), m_pause(firstPause), m_oldest(m_file->oldest()) {}
+      m_readers(readers), m_cursors(cursors), m_positions(positions),
+      m_nextTendingOfPositions(Clock::now() + timeUntilLogsAreFollowed), m_pause(firstPause),
+      m_oldest(m_file->oldest()) {}
 
 HistoryWriter::~HistoryWriter() {
     finish(Clock::now());
@@ -54,6 +58,7 @@ void HistoryWriter::start(EventQueue& queue, EventJson format) {
 
 void HistoryWriter::run() {
     TraceScope trace(anchor);
+    EntryBatch batch;
     for (;;) {
         const auto now = Clock::now();
         const std::span<const Event> events =
@@ -65,18 +70,18 @@ void HistoryWriter::run() {
             housekeep(true);
             continue;
         }
-        const auto batch = std::make_shared<EventBatch>();
-        batch->reserve(m_batchBytes + m_batchBytes / 8);
-        for (const Event& event : events) {
-            batch->add(event, *m_format);
+        const std::size_t added = batch.add(events, *m_format);
+        if (!batch.isWhole()) {
+            // An entry with more events than the queue gives at once: the rest is in the queue.
+            m_taken += added;
+            m_queue->release(m_reader, added);
+            continue;
         }
-        batch->seal();
-        m_batchBytes = batch->textBytes();
-        if (!store(*batch)) {
+        if (!store(batch)) {
             break;
         }
-        m_recent.publish(batch);
-        m_queue->release(m_reader, events.size());
+        m_queue->release(m_reader, added);
+        m_taken = 0;
         housekeep(false);
     }
     {
@@ -86,15 +91,20 @@ void HistoryWriter::run() {
     m_changed.notify_all();
 }
 
-/// False when the end comes before the batch can be stored.
-bool HistoryWriter::store(const EventBatch& batch) {
+/// Stores the batch, makes its events known, and begins the next. False when the end comes before
+/// it can be stored.
+bool HistoryWriter::store(EntryBatch& batch) {
+    batch.seal();
+    const std::shared_ptr<const EventBatch> events = batch.events();
+    const std::vector<PositionValue> positions = batch.positions();
     const auto work = [&] {
-        if (batch.last() > m_reserved) {
-            reserveIds(batch.last() + HistoryDirectory::idsAtOnce);
+        if (events->last() > m_reserved) {
+            reserveIds(events->last() + HistoryDirectory::idsAtOnce);
         }
         const std::vector<CursorValue> moved = m_cursors.unsaved();
-        m_file->store(batch, moved);
+        m_file->store(*events, moved, positions);
         m_cursors.saved(moved);
+        m_positions.saved(positions);
         m_oldest.store(m_file->oldest());
     };
     while (!attempt(work)) {
@@ -102,6 +112,9 @@ bool HistoryWriter::store(const EventBatch& batch) {
             return false;
         }
     }
+    m_recent.publish(events);
+    batch = EntryBatch();
+    batch.reserve(events->textBytes() + events->textBytes() / 8);
     return true;
 }
 
@@ -190,6 +203,7 @@ void HistoryWriter::replaceFile(const std::string& why) {
         return;
     }
     m_cursors.forgetSaved();
+    m_positions.forgetSaved();
     m_oldest.store(0);
 }
 
@@ -215,6 +229,7 @@ void HistoryWriter::leaveRemovedFiles() {
     files.removeLog();
     m_readers.resume();
     m_cursors.forgetSaved();
+    m_positions.forgetSaved();
     m_oldest.store(0);
     failed(state == State::WITHOUT_LOG
                ? "its write-ahead log was removed while the agent ran"
@@ -261,6 +276,23 @@ void HistoryWriter::tendCursors() {
     m_nextTending = Clock::now() + tendingInterval;
 }
 
+/// Only what stands behind stored events: an entry whose events are lost is judged again.
+void HistoryWriter::storePositions() {
+    const std::vector<PositionValue> moved = m_positions.unsaved(m_recent.newest());
+    if (!moved.empty()) {
+        m_file->keepPositions(moved);
+        m_positions.saved(moved);
+    }
+}
+
+/// The positions of logs that are followed stay new; the others expire as events do.
+void HistoryWriter::tendPositions() {
+    m_positions.renewFollowed();
+    storePositions();
+    m_positions.removed(m_file->removeOldPositions(limits().time));
+    m_nextTendingOfPositions = Clock::now() + tendingInterval;
+}
+
 /// What is done beside storing events, a little at a time.
 void HistoryWriter::housekeep(bool idle) {
     const auto now = Clock::now();
@@ -280,6 +312,11 @@ void HistoryWriter::housekeep(bool idle) {
         } else {
             storeCursors();
         }
+        if (now >= m_nextTendingOfPositions) {
+            tendPositions();
+        } else {
+            storePositions();
+        }
         storeEntries();
         m_hasMoreToDo = m_file->expire(limits()) || (idle && m_file->shrink());
         m_oldest.store(m_file->oldest());
@@ -298,12 +335,12 @@ std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
             m_giveUp = true;
         }
         m_changed.notify_all();
-        m_left = m_queue->backlog(m_reader);
+        m_left = m_queue->backlog(m_reader) + m_taken.load();
         std::unique_lock lock(m_mutex);
         if (m_changed.wait_for(lock, givingUpTime, [&] { return m_ended; })) {
             lock.unlock();
             m_thread.join();
-            m_left = m_queue->backlog(m_reader);
+            m_left = m_queue->backlog(m_reader) + m_taken.load();
         }
     }
     return trace.result(m_left);
@@ -317,6 +354,7 @@ void HistoryWriter::storeRest() {
     }
     const bool stored = attempt([&] {
         storeCursors();
+        storePositions();
         storeEntries();
     });
     if (!stored) {

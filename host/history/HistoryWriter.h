@@ -4,7 +4,9 @@
 #include "host/config/HostConfig.h"
 #include "host/events/EventJson.h"
 #include "host/events/EventQueue.h"
+#include "host/events/PositionBook.h"
 #include "host/history/Cursors.h"
+#include "host/history/EntryBatch.h"
 #include "host/history/HistoryDirectory.h"
 #include "host/history/HistoryFile.h"
 #include "host/history/ReaderPool.h"
@@ -13,6 +15,7 @@
 
 #include <atomic>
 #include <condition_variable>
+#include <cstddef>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -22,10 +25,12 @@
 namespace zrm::host {
 
 /// The one writer of the history, on a thread of its own: takes events from the queue, stores them
-/// in batches and makes them known; keeps the sinks' cursors and the rates; lets events expire, a
-/// few at a time. A failure is told once and tried again after growing pauses, with the events held
-/// in the queue: nothing is lost, and the logs wait. A corrupt file is exchanged for a new one, and
-/// files that were removed are made anew.
+/// in batches and makes them known; keeps the sinks' cursors, the logs' positions and the rates;
+/// lets events expire, a few at a time. The events of an entry are stored in one transaction with
+/// the position behind it, and a position without events is stored after the events before it. A
+/// failure is told once and tried again after growing pauses, with the events held in the queue:
+/// nothing is lost, and the logs wait. A corrupt file is exchanged for a new one, and files that
+/// were removed are made anew.
 class HistoryWriter {
 public:
     using Clock = EventQueue::Clock;
@@ -33,7 +38,7 @@ public:
     /// The references outlive the object. `file` is open on the directory's file.
     HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                   std::unique_ptr<HistoryFile> file, RecentEvents& recent, ReaderPool& readers,
-                  Cursors& cursors);
+                  Cursors& cursors, PositionBook& positions);
     ~HistoryWriter();
     HistoryWriter(const HistoryWriter&) = delete;
     HistoryWriter& operator=(const HistoryWriter&) = delete;
@@ -61,7 +66,7 @@ public:
 
 private:
     void run();
-    bool store(const EventBatch& batch);
+    bool store(EntryBatch& batch);
     template <class Work> bool attempt(Work&& work);
     void succeeded();
     void failed(const std::string& why);
@@ -73,6 +78,8 @@ private:
     void housekeep(bool idle);
     void storeCursors();
     void tendCursors();
+    void storePositions();
+    void tendPositions();
     void storeEntries();
     HistoryFile::Limits limits();
 
@@ -82,16 +89,18 @@ private:
     RecentEvents& m_recent;
     ReaderPool& m_readers;
     Cursors& m_cursors;
+    PositionBook& m_positions;
     EventQueue* m_queue = nullptr;
     EventQueue::Reader m_reader = 0;
     std::unique_ptr<EventJson> m_format;
-    std::size_t m_batchBytes = 0; ///< of the last batch's texts
-    std::uint64_t m_reserved = 0; ///< ids up to this one are kept as given
-    std::uint64_t m_left = 0;     ///< events that were not stored when the thread ended
+    std::uint64_t m_reserved = 0;        ///< ids up to this one are kept as given
+    std::uint64_t m_left = 0;            ///< events that were not stored when the thread ended
+    std::atomic<std::size_t> m_taken{0}; ///< events released by the queue before they are stored
     RetentionClock m_clock;
     Clock::time_point m_nextHousekeeping{};
     Clock::time_point m_nextTending{}; ///< of the cursors
-    bool m_hasMoreToDo = false;        ///< housekeeping that was not finished
+    Clock::time_point m_nextTendingOfPositions;
+    bool m_hasMoreToDo = false; ///< housekeeping that was not finished
     std::chrono::milliseconds m_pause;
     std::atomic<std::uint64_t> m_oldest{0};
 

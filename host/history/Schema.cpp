@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 4> steps = {
+constexpr std::array<const char*, 5> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -42,6 +42,10 @@ constexpr std::array<const char*, 4> steps = {
     "ALTER TABLE labels_with_text RENAME TO labels;",
     // 4: events have a checksum (EventChecksum.h); those stored before have none.
     "ALTER TABLE events ADD COLUMN checksum INTEGER;",
+    // 5: where the next entry of each followed log begins.
+    "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
+    " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
+    " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL) WITHOUT ROWID;",
 };
 
 } // namespace

@@ -49,6 +49,7 @@ void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifi
     m_config = std::move(config);
     m_file = std::move(file);
     m_notifier = std::move(notifier);
+    m_history = openHistory(m_config);
 }
 
 void Host::setState(State state) {
@@ -94,7 +95,8 @@ bool Host::begin() {
         trace.error()("The agent has not registered its Log Entries table.");
         return false;
     }
-    std::unique_ptr<Serving> serving = Serving::begin(m_config, *entries, m_watchdog);
+    std::unique_ptr<Serving> serving =
+        Serving::begin(m_config, *entries, m_watchdog, std::move(m_history));
     if (serving == nullptr) {
         return false;
     }

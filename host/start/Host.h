@@ -31,7 +31,7 @@ public:
     Host& operator=(const Host&) = delete;
 
     /// Takes the configuration that was read at start-up from this file, and whom to tell of start
-    /// and orderly end. Main thread, first.
+    /// and orderly end. Opens the history, whose positions the first log needs. Main thread, first.
     void configure(HostConfig config, WatchedFile file, ServiceNotifier notifier = {});
     void setLoader(int (*loader)()) noexcept { m_loader = loader; }
 
@@ -66,6 +66,7 @@ private:
 
     Watchdog m_watchdog;
     HostConfig m_config;
+    OpenedHistory m_history; ///< until it is served
     WatchedFile m_file{""};
     ServiceNotifier m_notifier;
     int (*m_loader)() = nullptr;

@@ -54,7 +54,7 @@ public:
 } // namespace
 
 std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& entries,
-                                        Watchdog& watchdog) {
+                                        Watchdog& watchdog, OpenedHistory history) {
     TraceScope trace(anchor);
     NoRows receiver;
     RequestDetail detail;
@@ -67,8 +67,8 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
     }
     std::unique_ptr<Serving> serving;
     try {
-        serving.reset(
-            new Serving(config, entries, *request.get(), RowLayout(*request.get()), watchdog));
+        serving.reset(new Serving(config, entries, *request.get(), RowLayout(*request.get()),
+                                  watchdog, std::move(history)));
         serving->m_delivery.start();
     } catch (const std::system_error& error) {
         static_cast<void>(
@@ -92,8 +92,8 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
 }
 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
-                 const RowLayout& layout, Watchdog& watchdog)
-    : m_watchdog(watchdog), m_delivery(config, layout, request.rowSize),
+                 const RowLayout& layout, Watchdog& watchdog, OpenedHistory history)
+    : m_watchdog(watchdog), m_delivery(config, layout, request.rowSize, std::move(history)),
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
     if (History* const history = m_delivery.history()) {
@@ -206,6 +206,7 @@ void Serving::stop(Clock::time_point limit) {
     m_analysis->cancel();
     m_http.stop(limit);
     m_watchdog.noteStage("closing the situations");
+    m_delivery.closePositions();
     m_situations.close();
     if (m_entries) {
         m_entries->finish();

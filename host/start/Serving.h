@@ -38,7 +38,7 @@ public:
     /// manager know that requests are served. Null when the table opens no request.
     /// The watchdog outlives the object.
     static std::unique_ptr<Serving> begin(const HostConfig& config, TableManager& entries,
-                                          Watchdog& watchdog);
+                                          Watchdog& watchdog, OpenedHistory history);
 
     Serving(const Serving&) = delete;
     Serving& operator=(const Serving&) = delete;
@@ -72,7 +72,7 @@ public:
 
 private:
     Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
-            const RowLayout& layout, Watchdog& watchdog);
+            const RowLayout& layout, Watchdog& watchdog, OpenedHistory history);
 
     void renewCredentials();
     void addResources(TableManager& entries);

@@ -58,7 +58,8 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEventWithAndWithoutAHistory) {
         const std::string second = directory.file("b.jsonl");
         std::remove(first.c_str());
         std::remove(second.c_str());
-        Delivery delivery(configFor({first, second}, history), testLayout(), sizeof(TestRow));
+        const HostConfig used = configFor({first, second}, history);
+        Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
         EXPECT_EQ(delivery.history() != nullptr, history);
         delivery.start();
         for (int number = 0; number < 100; ++number) {
@@ -75,7 +76,8 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEventWithAndWithoutAHistory) {
 
 TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
     const std::string good = directory.file("good.jsonl");
-    Delivery delivery(configFor({"/dev/full", good}, false), testLayout(), sizeof(TestRow));
+    const HostConfig used = configFor({"/dev/full", good}, false);
+    Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
     delivery.start();
     push(delivery, "a");
     push(delivery, "b");
@@ -88,7 +90,8 @@ TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
 
 TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
     const std::string good = directory.file("good.jsonl");
-    Delivery delivery(configFor({"/dev/full", good}), testLayout(), sizeof(TestRow));
+    const HostConfig used = configFor({"/dev/full", good});
+    Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
     delivery.start();
     const int more = 3 * static_cast<int>(delivery.queueState().capacity);
     for (int number = 0; number < more; ++number) {
@@ -112,7 +115,8 @@ TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
 
 TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
     const std::string later = directory.file("later/events.jsonl");
-    Delivery delivery(configFor({"/dev/full", later}), testLayout(), sizeof(TestRow));
+    const HostConfig used = configFor({"/dev/full", later});
+    Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
     delivery.start();
     push(delivery, "a");
     // Both fail, with pauses that have grown.
@@ -134,7 +138,7 @@ TEST_F(DeliveryTest, WithoutADirectoryForTheHistoryItGoesOnWithoutOne) {
     HostConfig config = configFor({output});
     config.history.directory = directory.file("no/such");
     testing::internal::CaptureStderr();
-    Delivery delivery(config, testLayout(), sizeof(TestRow));
+    Delivery delivery(config, testLayout(), sizeof(TestRow), openHistory(config));
     const std::string problem = "cannot create the directory " + config.history.directory +
                                 ": No such file or directory; make it a directory that the agent "
                                 "may write, or set history.directory to one";

@@ -33,10 +33,7 @@ protected:
         PositionBook::makeCurrent(book);
         book->setQueue(&queue);
     }
-    ~LogPositionsTest() override {
-        PositionBook::makeCurrent(
-            std::make_shared<PositionBook>(std::vector<PositionValue>{}, false));
-    }
+    ~LogPositionsTest() override { PositionBook::makeCurrent(PositionBook::unkept()); }
 
     void raise(const std::string& text) {
         std::array<char, rowSize> row{};
@@ -218,7 +215,7 @@ TEST_F(LogPositionsTest, OnceTheSituationsCloseNothingMoves) {
 }
 
 TEST_F(LogPositionsTest, WithoutAStoreAPositionLivesAsLongAsTheProcess) {
-    PositionBook::makeCurrent(std::make_shared<PositionBook>(std::vector<PositionValue>{}, false));
+    PositionBook::makeCurrent(PositionBook::unkept());
     {
         LogPositions log("/log");
         EXPECT_FALSE(log.areKept());

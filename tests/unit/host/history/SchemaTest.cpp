@@ -52,8 +52,8 @@ protected:
 TEST_F(SchemaTest, MakesTheTablesOfANewFile) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
-    for (const char* const table :
-         {"events", "labels", "logs", "marks", "origin", "cursors", "minutes", "rates"}) {
+    for (const char* const table : {"events", "labels", "logs", "marks", "origin", "cursors",
+                                    "minutes", "rates", "log_positions"}) {
         EXPECT_TRUE(hasTable(database, table)) << table;
     }
     Schema::bringUpToDate(database);
@@ -114,6 +114,16 @@ TEST_F(SchemaTest, BringsAFileOfTheThirdVersionUpToDate) {
     EXPECT_EQ(event.integer(0), 41);
     EXPECT_EQ(event.text(1), "{}");
     EXPECT_TRUE(event.isNull(2)) << "what was stored before has no checksum";
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
+    database.run(firstVersion);
+    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER; PRAGMA user_version = 4");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    EXPECT_EQ(database.number("SELECT id FROM events"), 41);
+    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6)");
+    EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
 }
 
 TEST_F(SchemaTest, AStepThatFailsLeavesTheOlderVersionWhole) {

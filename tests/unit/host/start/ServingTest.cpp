@@ -72,7 +72,7 @@ protected:
 };
 
 TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     ASSERT_NE(serving, nullptr);
     EXPECT_EQ(arrive(), 0u);
     EXPECT_EQ(arrive(), 0u);
@@ -83,7 +83,7 @@ TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
 }
 
 TEST_F(ServingTest, TakesASampleOfTheLogsAtOnce) {
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     EXPECT_EQ(logSamples, 1);
     serving->stop(Clock::now() + 10s);
 }
@@ -91,7 +91,7 @@ TEST_F(ServingTest, TakesASampleOfTheLogsAtOnce) {
 TEST_F(ServingTest, ATableThatOpensNoRequestIsAFailure) {
     trace.setLevel(TRC1_ERROR);
     entries.gives = false;
-    EXPECT_EQ(Serving::begin(config, entries, watchdog), nullptr);
+    EXPECT_EQ(Serving::begin(config, entries, watchdog, openHistory(config)), nullptr);
     EXPECT_THAT(trace.messages(), testing::ElementsAre("The Log Entries table opens no request."));
 }
 
@@ -111,7 +111,7 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
 TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
     config.history.enabled = false; // the queue is all the room there is
     config.sinks = {SinkConfig::jsonl("/dev/full")};
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     std::atomic<int> taken{0};
     std::thread log([&] {
         while (EventRoom::wait([] { return true; }) != EventRoom::State::CLOSED) {
@@ -136,7 +136,7 @@ TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
 }
 
 TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     arrive();
     EventRoomControl::close();
     serving->abandonHttp(Clock::now() + 10s);
@@ -148,7 +148,7 @@ TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
 
 TEST_F(ServingTest, SaysWhereHttpIs) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_THAT(testing::internal::GetCapturedStderr(),
@@ -161,7 +161,7 @@ TEST_F(ServingTest, SaysWhereHttpIs) {
 TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     config.http.tokenFile = directory.file("no/such/token");
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
@@ -175,7 +175,7 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
 TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
     const std::vector<SinkConfig> good = config.sinks;
     config.sinks = {SinkConfig::jsonl(directory.file("no/such/directory/events.jsonl"))};
-    auto serving = Serving::begin(config, entries, watchdog);
+    auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     EXPECT_EQ(arrive(), 0u);
     testing::internal::CaptureStderr();
     serving->stop(Clock::now() + 50ms);
@@ -185,7 +185,7 @@ TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
                   "; it will get them when the agent runs again\n");
     serving.reset();
     std::filesystem::create_directories(directory.file("no/such/directory"));
-    serving = Serving::begin(config, entries, watchdog);
+    serving = Serving::begin(config, entries, watchdog, openHistory(config));
     EXPECT_EQ(arrive(), 0u);
     serving->stop(Clock::now() + 10s);
     std::ifstream stream(directory.file("no/such/directory/events.jsonl"));
@@ -193,7 +193,7 @@ TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
 }
 
 TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     const int before = logSamples;
     serving->tick();
     EXPECT_EQ(logSamples, before) << "no minute is over yet";
@@ -202,7 +202,7 @@ TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
 }
 
 TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
-    const auto serving = Serving::begin(config, entries, watchdog);
+    const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     testing::internal::CaptureStderr();
     serving->startHttp(config);
     EXPECT_EQ(testing::internal::GetCapturedStderr(), "");

@@ -1,0 +1,47 @@
+#include "host/history/PositionTable.h"
+
+namespace zrm::host {
+
+PositionTable::PositionTable(Database& database)
+    : m_keep(database, "INSERT OR REPLACE INTO log_positions"
+                       " (log, device, inode, offset, guard, guard_length, noted)"
+                       " VALUES (?, ?, ?, ?, ?, ?, ?)"),
+      m_remove(database, "DELETE FROM log_positions WHERE noted < ? RETURNING log") {}
+
+void PositionTable::keep(const PositionValue& value, std::int64_t noted) {
+    const LogPosition& position = value.position;
+    m_keep.bind(1, std::string_view(value.log))
+        .bind(2, position.device)
+        .bind(3, position.inode)
+        .bind(4, position.offset)
+        .bind(5, position.guard)
+        .bind(6, std::int64_t{position.guardLength})
+        .bind(7, noted)
+        .run();
+}
+
+std::vector<std::string> PositionTable::removeNotedBefore(std::int64_t time) {
+    std::vector<std::string> logs;
+    m_remove.bind(1, time);
+    while (m_remove.step()) {
+        logs.emplace_back(m_remove.text(0));
+    }
+    m_remove.reset();
+    return logs;
+}
+
+std::vector<PositionValue> PositionTable::read(Database& database) {
+    std::vector<PositionValue> values;
+    Statement rows(database, "SELECT log, device, inode, offset, guard, guard_length"
+                             " FROM log_positions");
+    while (rows.step()) {
+        values.push_back({std::string(rows.text(0)),
+                          {static_cast<std::uint64_t>(rows.integer(1)),
+                           static_cast<std::uint64_t>(rows.integer(2)), rows.integer(3),
+                           static_cast<std::uint64_t>(rows.integer(4)),
+                           static_cast<std::uint32_t>(rows.integer(5))}});
+    }
+    return values;
+}
+
+} // namespace zrm::host
