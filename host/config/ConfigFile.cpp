@@ -3,6 +3,7 @@
 #include "base/ErrorText.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
+#include "host/config/LogReader.h"
 #include "host/config/SinkReader.h"
 #include "host/config/SituationReader.h"
 #include "host/config/TomlNesting.h"
@@ -152,6 +153,12 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
         config.sinks.clear();
         for (const toml::table* const sink : *sinks) {
             config.sinks.push_back(reader.read(*sink));
+        }
+    }
+    if (const auto logs = section.tables("log")) {
+        LogReader reader(config, problems); // what was read so far decides what a log may be
+        for (const toml::table* const log : *logs) {
+            config.logs.push_back(reader.read(*log));
         }
     }
     if (const auto situations = section.tables("situation")) {

@@ -2,6 +2,7 @@
 #define ZRM_HOST_HOST_CONFIG_H
 
 #include "host/base/ListenAddress.h"
+#include "host/config/LogConfig.h"
 #include "host/config/SinkConfig.h"
 #include "host/framework/Condition.h"
 
@@ -60,6 +61,7 @@ struct HostConfig {
     HttpConfig http;
     HistoryConfig history;
     std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
+    std::vector<LogConfig> logs;
     std::vector<SituationConfig> situations;
 };
 

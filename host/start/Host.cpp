@@ -3,6 +3,7 @@
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/OwnFiles.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
 
@@ -12,6 +13,9 @@
 #include <string_view>
 #include <utility>
 #include <variant>
+
+#include <signal.h>
+#include <unistd.h>
 
 namespace zrm::host {
 
@@ -45,11 +49,28 @@ Host& Host::instance() {
     return *theHost;
 }
 
+/// The log manager takes a changed list when it is asked to refresh.
+Host::Host() : m_logs([] { ::kill(::getpid(), SIGHUP); }) {}
+
 void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifier) {
     m_config = std::move(config);
     m_file = std::move(file);
     m_notifier = std::move(notifier);
     m_history = openHistory(m_config);
+}
+
+void Host::findLogs(std::string traceFile) {
+    m_traceFile = std::move(traceFile);
+    m_logs.begin(m_config.logs, ownFiles(m_config));
+}
+
+LogList::OwnFiles Host::ownFiles(const HostConfig& config) const {
+    LogList::OwnFiles files = ownFilesOf(config);
+    files.merge(ownFilesOf(m_config)); // most of a changed configuration is not in force yet
+    files.emplace("/dev/stdout", "standard output");
+    files.emplace("/dev/stderr", "standard error");
+    files.emplace(m_traceFile, "the trace");
+    return files;
 }
 
 void Host::setState(State state) {
@@ -107,6 +128,10 @@ bool Host::begin() {
         m_isBusy = true;
     }
     m_changed.notify_all();
+    if (!m_logs.start()) {
+        say("no thread can be started that looks for new logs: files that appear later are not "
+            "followed");
+    }
     m_serving->startHttp(m_config);
     m_watchdog.noteStage("serving");
     m_notifier.ready();
@@ -129,20 +154,29 @@ bool Host::waitForTick() {
 
 void Host::tick(int number) {
     if (number <= ticksUntilNoLogs && Serving::countLogs() == 0 && number == ticksUntilNoLogs) {
-        const char* const file = std::getenv("ZRM_CONFIG_FILE");
-        if (file == nullptr || *file == '\0') {
-            say("no log to monitor: set log_config in %s, or ZRM_CONFIG_FILE in the environment, "
-                "to a file that names one log per line; exiting in a minute",
-                m_file.path().empty() ? "/etc/zrm/zrm.toml" : m_file.path().c_str());
-        } else {
-            say("no log to monitor: %s names none that can be monitored, and 'zrmctl check %s' "
-                "says why; exiting in a minute",
-                file, file);
-        }
+        sayNoLogs();
     }
     m_serving->tick();
     if (m_file.hasChanged()) {
         reload();
+    }
+}
+
+void Host::sayNoLogs() const {
+    const std::string path = m_file.path().empty() ? "/etc/zrm/zrm.toml" : m_file.path();
+    const char* const file = std::getenv("ZRM_CONFIG_FILE");
+    if (!m_config.logs.empty()) {
+        say("no log to monitor yet: 'zrmctl check --host %s' shows what its [[log]] tables match; "
+            "waiting for a file",
+            path.c_str());
+    } else if (file == nullptr || *file == '\0') {
+        say("no log to monitor: set log_config in %s, or ZRM_CONFIG_FILE in the environment, "
+            "to a file that names one log per line; exiting in a minute",
+            path.c_str());
+    } else {
+        say("no log to monitor: %s names none that can be monitored, and 'zrmctl check %s' "
+            "says why; exiting in a minute",
+            file, file);
     }
 }
 
@@ -167,10 +201,14 @@ void Host::reload() {
             m_file.path().c_str(), removed, m_config.situations.size());
     }
     m_serving->apply(config.situations, removesMost);
+    if (config.logs != m_config.logs) {
+        m_logs.apply(config.logs, ownFiles(config));
+    }
     if (config.environment != m_config.environment || config.http != m_config.http ||
         config.sinks != m_config.sinks || config.history != m_config.history ||
         config.stateDirectory != m_config.stateDirectory) {
-        say("%s: the situations are reloaded; every other change takes effect at the next start",
+        say("%s: logs and situations are reloaded; every other change takes effect at the next "
+            "start",
             m_file.path().c_str());
     }
     m_config = std::move(config);

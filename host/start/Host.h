@@ -3,6 +3,7 @@
 
 #include "host/base/WatchedFile.h"
 #include "host/config/HostConfig.h"
+#include "host/sources/LogList.h"
 #include "host/start/ServiceNotifier.h"
 #include "host/start/Serving.h"
 #include "host/start/Watchdog.h"
@@ -33,6 +34,9 @@ public:
     /// Takes the configuration that was read at start-up from this file, and whom to tell of start
     /// and orderly end. Opens the history, whose positions the first log needs. Main thread, first.
     void configure(HostConfig config, WatchedFile file, ServiceNotifier notifier = {});
+    /// Finds the logs of the configuration for the log manager, which must not exist yet.
+    /// `traceFile`: where the trace goes; empty: not to a file. Main thread, after configure.
+    void findLogs(std::string traceFile);
     void setLoader(int (*loader)()) noexcept { m_loader = loader; }
 
     /// The main loop: loads the agent, serves until a stop is requested, ends the serving. Returns
@@ -56,11 +60,13 @@ private:
     enum class State { BEFORE, STARTING, SERVING, STOPPING, ENDED };
     using enum State;
 
-    Host() = default;
+    Host();
     bool begin();
     bool waitForTick();
     void tick(int number);
     void reload();
+    void sayNoLogs() const;
+    LogList::OwnFiles ownFiles(const HostConfig& config) const;
     void stop();
     void setState(State state);
 
@@ -70,6 +76,8 @@ private:
     WatchedFile m_file{""};
     ServiceNotifier m_notifier;
     int (*m_loader)() = nullptr;
+    std::string m_traceFile;
+    LogList m_logs;
 
     std::mutex m_mutex; ///< guards what follows
     std::condition_variable m_changed;

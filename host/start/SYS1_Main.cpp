@@ -96,4 +96,5 @@ void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
     setTrace(commandLine.traceFile());
     Host::instance().configure(std::move(config), std::move(file),
                                ServiceNotifier::takeFromEnvironment());
+    Host::instance().findLogs(commandLine.traceFile());
 }

@@ -2,9 +2,19 @@
 #define ZRM_FOLLOW_SETTINGS_H
 
 #include <chrono>
+#include <cstdint>
 #include <string>
+#include <vector>
 
 namespace zrm {
+
+/// The difference between a zone's time and UTC from a moment on.
+struct ZoneOffset {
+    std::int64_t since; ///< seconds since 1970-01-01 UTC
+    std::int32_t seconds;
+
+    bool operator==(const ZoneOffset&) const = default;
+};
 
 /// How a log that is followed through rotations and restarts is read. A log without such settings
 /// is a line of the log configuration and is read as that file's logs always are. Not changed after
@@ -28,6 +38,7 @@ struct FollowSettings {
     std::chrono::milliseconds rotateWait{2000};
     /// What times without a zone mean, as a name of the time zone database. Empty: local time.
     std::string timezone;
+    std::vector<ZoneOffset> zone; ///< the offsets of `timezone`, oldest first
 
     /// Logs of equal settings need no new monitor.
     bool operator==(const FollowSettings&) const = default;

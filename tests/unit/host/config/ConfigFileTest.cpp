@@ -143,7 +143,7 @@ keep_days = 30
 )"),
         ElementsAre(
             "zrm.toml:1: colour: unknown key; the keys here are state_directory, agent, http, "
-            "history, sink, situation",
+            "history, sink, log, situation",
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
@@ -152,7 +152,7 @@ keep_days = 30
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
-            "http, history, sink, situation"));
+            "http, history, sink, log, situation"));
 }
 
 TEST(ConfigFile, RefusesValuesOfAnotherType) {

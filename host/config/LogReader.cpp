@@ -1,0 +1,300 @@
+#include "host/config/LogReader.h"
+
+#include "host/base/DurationText.h"
+#include "host/config/OwnFiles.h"
+#include "host/config/PathPattern.h"
+#include "host/config/TimeZones.h"
+#include "host/framework/TraceCapture.h"
+#include "logtypes/UserLogFile.h"
+#include "parser/StringParser.h"
+
+#include <algorithm>
+#include <array>
+#include <chrono>
+#include <cstring>
+#include <optional>
+#include <string_view>
+#include <utility>
+
+#include <sys/utsname.h>
+
+namespace zrm::host {
+
+namespace {
+
+constexpr std::size_t longestPath = 4095;
+constexpr std::size_t mostPaths = 1000;
+
+struct LogType {
+    const char* name;
+    char letter;
+};
+
+constexpr std::array<LogType, 4> types = {
+    {{"syslog", 'S'}, {"text", 'U'}, {"accounting", 'A'}, {"errorlog", 'E'}}};
+
+bool isErrorLogSystem() {
+    utsname names;
+    return ::uname(&names) == 0 && std::strcmp(names.sysname, "AIX") == 0;
+}
+
+/// A text of a list of choices; none when the key is missing or a problem was recorded.
+std::optional<std::size_t> readChoice(ConfigSection& section, std::string_view key,
+                                      const std::vector<const char*>& choices) {
+    const std::optional<std::string> text = section.text(key);
+    if (!text) {
+        return std::nullopt;
+    }
+    std::string list;
+    for (std::size_t index = 0; index < choices.size(); ++index) {
+        if (*text == choices[index]) {
+            return index;
+        }
+        list += (index == 0                    ? ""
+                 : index + 1 == choices.size() ? " or "
+                                               : ", ") +
+                ('"' + std::string(choices[index]) + '"');
+    }
+    section.problem(key, "'" + *text + "' is not a choice here", "write " + list);
+    return std::nullopt;
+}
+
+void refuse(ConfigSection& section, std::string_view key, const LogConfig& log) {
+    if (section.has(key)) {
+        section.problem(key, std::string("has no meaning for type \"") + log.typeName() + '"',
+                        "leave it out");
+    }
+}
+
+/// Why a path or a glob cannot be used, and what to write instead; empty if it can.
+std::pair<std::string, std::string> problemOfPath(const std::string& path) {
+    if (path.empty() || path.front() != '/') {
+        return {"'" + path + "' is not an absolute path", "begin it with '/'"};
+    }
+    if (path.back() == '/') {
+        return {"'" + path + "' names a directory",
+                "name the files in it, for example \"" + path + "*.log\""};
+    }
+    if (path.size() > longestPath) {
+        return {"the path has " + std::to_string(path.size()) + " bytes",
+                "write at most " + std::to_string(longestPath)};
+    }
+    if (path.find("**") != std::string::npos) {
+        return {"'" + path + "' holds '**', which does not search directories of every depth",
+                "write one '*' for each level of directories"};
+    }
+    return {};
+}
+
+} // namespace
+
+const char* LogConfig::typeName() const noexcept {
+    return std::find_if(types.begin(), types.end(),
+                        [this](const LogType& one) { return one.letter == type; })
+        ->name;
+}
+
+LogReader::LogReader(const HostConfig& config, ConfigProblems& problems)
+    : m_config(config), m_problems(problems), m_ownFiles(ownFilesOf(config)) {}
+
+LogConfig LogReader::read(const toml::table& table) {
+    ConfigSection section("log", table, m_problems);
+    LogConfig log;
+    log.line = static_cast<unsigned>(table.source().begin.line);
+    readType(section, log);
+    readExcludes(section, log);
+    readPaths(section, log);
+    readFormat(section, log);
+    log.debug = section.truth("debug").value_or(false);
+    readFollowing(section, log);
+    readResumption(section, log);
+    readTimezone(section, log);
+    section.refuseUnknownKeys();
+    return log;
+}
+
+void LogReader::readPaths(ConfigSection& section, LogConfig& log) {
+    constexpr const char* cure = R"(write path = "/var/log/syslog", or a list of paths and globs)";
+    const std::vector<ConfigSection::Text> paths = section.texts("path");
+    if (!section.has("path")) {
+        section.problem("path", "is missing", cure);
+        return;
+    }
+    if (paths.empty()) {
+        section.problem("path", "names no file", cure);
+        return;
+    }
+    if (paths.size() > mostPaths) {
+        section.problem("path", "has " + std::to_string(paths.size()) + " items",
+                        "write at most " + std::to_string(mostPaths) + ", and globs for the rest");
+        return;
+    }
+    for (const auto& [path, line] : paths) {
+        const auto [what, itsCure] = problemOfPath(path);
+        if (!what.empty()) {
+            section.problem(line, "path", what, itsCure);
+            continue;
+        }
+        const auto [first, isNew] = m_paths.emplace(path, line);
+        if (!isNew) {
+            section.problem(line, "path",
+                            "'" + path + "' is named at line " + std::to_string(first->second) +
+                                " already",
+                            "name it once");
+            continue;
+        }
+        if (log.type == 'E' && PathPattern::isPattern(path)) {
+            section.problem(line, "path", "'" + path + "' is a glob",
+                            "name the one file of the error log");
+        }
+        checkOwnFiles(section, path, line, log);
+        log.paths.push_back(path);
+    }
+}
+
+/// A log that the agent writes itself would raise events that add lines to it, without an end.
+void LogReader::checkOwnFiles(ConfigSection& section, const std::string& path, unsigned line,
+                              const LogConfig& log) {
+    for (const auto& [file, what] : m_ownFiles) {
+        const bool isExcluded =
+            std::any_of(log.excludes.begin(), log.excludes.end(), [&file](const auto& pattern) {
+                return PathPattern::excludes(pattern, file);
+            });
+        if (isExcluded || (path != file && !PathPattern::matches(path, file))) {
+            continue;
+        }
+        const bool isPattern = path != file;
+        section.problem(line, "path",
+                        "'" + path + (isPattern ? "' matches " + file + ", " : "' is ") +
+                            (isPattern ? "" : "") + what +
+                            ": the agent writes this file, and each event would raise the next",
+                        isPattern ? "exclude the file, or name the logs more narrowly"
+                                  : "leave it out");
+        return;
+    }
+}
+
+void LogReader::readExcludes(ConfigSection& section, LogConfig& log) {
+    for (const auto& [pattern, line] : section.texts("exclude")) {
+        if (pattern.empty() || (pattern.find('/') != std::string::npos && pattern[0] != '/')) {
+            section.problem(line, "exclude", "'" + pattern + "' is neither a path nor a file name",
+                            "begin a path with '/', or write a file name without any '/'");
+        } else if (pattern.size() > longestPath) {
+            section.problem(line, "exclude",
+                            "the pattern has " + std::to_string(pattern.size()) + " bytes",
+                            "write at most " + std::to_string(longestPath));
+        } else {
+            log.excludes.push_back(pattern);
+        }
+    }
+}
+
+void LogReader::readType(ConfigSection& section, LogConfig& log) {
+    std::vector<const char*> names;
+    for (const LogType& type : types) {
+        names.push_back(type.name);
+    }
+    if (const auto choice = readChoice(section, "type", names)) {
+        log.type = types[*choice].letter;
+    }
+    if (log.type == 'E' && !isErrorLogSystem()) {
+        section.problem("type", "an error log is read only on AIX", "write another type");
+    }
+}
+
+void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
+    if (log.type != 'U' && log.type != 'E') {
+        refuse(section, "format", log);
+        static_cast<void>(section.text("format")); // a known key
+        return;
+    }
+    const std::optional<std::string> format = section.text("format");
+    if (!section.has("format")) {
+        section.problem(
+            "format", std::string("is missing, and type \"") + log.typeName() + "\" needs it",
+            log.type == 'U' ? "describe the lines, for example 'A,\"%d-%d-%d %255[^\\n]\" "
+                              ", year month day description'"
+                            : "write the command that prints the error log");
+        return;
+    }
+    log.format = format.value_or("");
+    if (format && log.type == 'U') {
+        checkTextFormat(section, log);
+    }
+}
+
+void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
+    constexpr std::size_t longest = 1022;
+    if (log.format.size() > longest) {
+        section.problem("format", "has " + std::to_string(log.format.size()) + " bytes",
+                        "write at most " + std::to_string(longest));
+        return;
+    }
+    TraceCapture errors;
+    const StringParser parser(log.format.c_str(), UserLogFile::fields());
+    if (parser.status() != OBJECT_FORMAT_LEARNED) {
+        std::string why = errors.take();
+        why.erase(why.find_last_not_of(" .") + 1);
+        section.problem("format", "cannot be used" + (why.empty() ? std::string() : ": " + why),
+                        "correct it; 'zrmctl try FORMAT FILE' shows where it stops matching");
+    }
+}
+
+void LogReader::readFollowing(ConfigSection& section, LogConfig& log) {
+    using std::chrono::seconds;
+    constexpr seconds longestWait = std::chrono::hours(1);
+    if (log.type == 'E') {
+        for (const char* const key : {"follow", "start", "rotate_wait"}) {
+            refuse(section, key, log);
+        }
+    }
+    if (const auto choice = readChoice(section, "follow", {"name", "file"})) {
+        log.follow.follow =
+            *choice == 0 ? FollowSettings::Follow::name : FollowSettings::Follow::file;
+    }
+    if (const auto choice = readChoice(section, "start", {"end", "beginning"})) {
+        log.follow.start =
+            *choice == 0 ? FollowSettings::Start::end : FollowSettings::Start::beginning;
+    }
+    if (const std::optional<std::string> text = section.text("rotate_wait")) {
+        const std::optional<seconds> wait = DurationText::parse(*text);
+        if (!wait || *wait > longestWait) {
+            section.problem("rotate_wait",
+                            "'" + *text + "' is not a duration from a second to an hour",
+                            "write for example \"2s\" or \"5m\"");
+        } else {
+            log.follow.rotateWait = *wait;
+        }
+    }
+}
+
+void LogReader::readResumption(ConfigSection& section, LogConfig& log) {
+    if (log.type == 'E') {
+        refuse(section, "resume", log);
+    }
+    const std::optional<bool> resume = section.truth("resume");
+    if (resume.value_or(false) && !m_config.history.enabled) {
+        section.problem("resume", "needs the history, which stores how far each log was read",
+                        "write enabled = true in [history], or resume = false");
+    }
+    log.follow.resume = resume.value_or(m_config.history.enabled);
+}
+
+void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
+    if (log.type == 'A' || log.type == 'E') {
+        refuse(section, "timezone", log);
+    }
+    const std::optional<std::string> zone = section.text("timezone");
+    if (!zone) {
+        return;
+    }
+    log.follow.timezone = *zone;
+    log.follow.zone = TimeZones::offsetsOf(*zone);
+    if (log.follow.zone.empty()) {
+        section.problem("timezone", "'" + *zone + "' is not a time zone of this machine",
+                        "write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
+                        "list-timezones lists them)");
+    }
+}
+
+} // namespace zrm::host

@@ -1,0 +1,329 @@
+#include "host/sources/LogFinder.h"
+
+#include "base/ErrorText.h"
+#include "host/base/Utf8.h"
+#include "host/config/PathPattern.h"
+#include "host/sources/PathSearch.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <string_view>
+#include <tuple>
+#include <utility>
+
+namespace zrm::host {
+
+namespace {
+
+constexpr std::array<std::string_view, 5> compressedEnds = {".gz", ".xz", ".zst", ".bz2", ".lz4"};
+
+bool isCompressed(std::string_view name) {
+    return std::any_of(compressedEnds.begin(), compressedEnds.end(),
+                       [name](std::string_view end) { return name.ends_with(end); });
+}
+
+bool isDigit(char character) {
+    return character >= '0' && character <= '9';
+}
+
+bool isSeparator(char character) {
+    return character == '.' || character == '-' || character == '_';
+}
+
+/// What a rotation has put into a name: a number at its end ("app.log.1"), or a date
+/// ("app.log-20261122", "app-2026-11-22.log").
+struct RotationMark {
+    std::size_t begin; ///< of its separator
+    std::size_t end;
+};
+
+/// The mark that begins at this separator, if there is one.
+std::optional<RotationMark> markAt(std::string_view name, std::size_t begin) {
+    constexpr std::size_t digitsOfDate = 6;
+    std::size_t digits = 0;
+    std::size_t end = begin + 1;
+    for (; end < name.size(); ++end) {
+        const bool isWithin = isDigit(name[end]);
+        digits += isWithin ? 1 : 0;
+        if (!isWithin && (name[end] == '.' || end == begin + 1 || end + 1 == name.size() ||
+                          !isDigit(name[end + 1]))) {
+            break;
+        }
+    }
+    const bool isNumber = name[begin] == '.' && end == name.size() && digits > 0;
+    const bool isDate = digits >= digitsOfDate && (end == name.size() || name[end] == '.');
+    return isNumber || isDate ? std::optional(RotationMark{begin, end}) : std::nullopt;
+}
+
+/// The names of the file of which a rotation may have made this one.
+std::vector<std::string> originsOf(const std::string& path) {
+    std::vector<std::string> origins;
+    for (std::size_t at = path.rfind('/') + 2; at < path.size(); ++at) {
+        if (!isSeparator(path[at])) {
+            continue;
+        }
+        if (const std::optional<RotationMark> mark = markAt(path, at)) {
+            origins.push_back(path.substr(0, mark->begin) + path.substr(mark->end));
+        }
+    }
+    return origins;
+}
+
+} // namespace
+
+/// A path that is named or matched.
+struct LogFinder::Candidate {
+    std::string name;
+    std::size_t source;
+    bool isNamed; ///< by itself, not by a glob
+    bool isThere = false;
+    Identity identity{};
+    bool isNewcomer = false;
+};
+
+/// The work of one look.
+class LogFinder::Look {
+public:
+    Look(LogFinder& finder, const std::vector<LogConfig>& logs,
+         const std::map<std::string, std::string>& ownFiles, Clock::time_point now)
+        : m_finder(finder), m_logs(logs), m_now(now) {
+        for (const auto& [path, what] : ownFiles) {
+            struct stat status;
+            if (::stat(path.c_str(), &status) == 0) {
+                m_ownFiles.emplace(Identity{status.st_dev, status.st_ino}, what);
+            }
+        }
+    }
+
+    FoundLogs run() {
+        m_found.sources.resize(m_logs.size());
+        collect();
+        std::vector<Candidate> candidates;
+        for (Candidate& candidate : m_candidates) {
+            if (isUsable(candidate)) {
+                candidates.push_back(std::move(candidate));
+            }
+        }
+        // Who is followed already stays; of new ones, those that are named come first.
+        std::stable_sort(
+            candidates.begin(), candidates.end(),
+            [this](const Candidate& a, const Candidate& b) { return rank(a) < rank(b); });
+        for (Candidate& candidate : candidates) {
+            m_names.insert(candidate.name);
+        }
+        std::vector<Candidate> chosen;
+        for (Candidate& candidate : candidates) {
+            if (isChosen(candidate, chosen.size())) {
+                chosen.push_back(std::move(candidate));
+            }
+        }
+        std::sort(chosen.begin(), chosen.end(), [](const Candidate& a, const Candidate& b) {
+            return std::tie(a.source, a.name) < std::tie(b.source, b.name);
+        });
+        list(chosen);
+        remember(chosen);
+        return std::move(m_found);
+    }
+
+private:
+    void collect() {
+        for (std::size_t index = 0; index < m_logs.size(); ++index) {
+            FoundLogs::Source& source = m_found.sources[index];
+            source.line = m_logs[index].line;
+            source.paths = m_logs[index].paths;
+            for (const std::string& path : m_logs[index].paths) {
+                if (!PathPattern::isPattern(path)) {
+                    add({path, index, true});
+                    continue;
+                }
+                PathSearch search(path);
+                source.problem = search.problem.empty() ? source.problem : search.problem;
+                const bool isNew = m_finder.m_searched.contains(path);
+                for (std::string& name : search.paths) {
+                    Candidate candidate{std::move(name), index, false};
+                    candidate.isNewcomer = isNew;
+                    add(std::move(candidate));
+                }
+                keepAbsent(path, index);
+            }
+        }
+    }
+
+    /// A followed file that the glob does not match at this moment.
+    void keepAbsent(const std::string& pattern, std::size_t index) {
+        for (const auto& [name, known] : m_finder.m_known) {
+            if (m_now - known.seen < keptAbsent && !m_sourceOf.contains(name) &&
+                PathPattern::matches(pattern, name)) {
+                add({name, index, false});
+            }
+        }
+    }
+
+    void add(Candidate candidate) {
+        const LogConfig& log = m_logs[candidate.source];
+        const bool isExcluded =
+            std::any_of(log.excludes.begin(), log.excludes.end(), [&](const auto& pattern) {
+                return PathPattern::excludes(pattern, candidate.name);
+            });
+        if (isExcluded) {
+            return;
+        }
+        const auto [first, isFirst] = m_sourceOf.emplace(candidate.name, candidate.source);
+        if (isFirst) {
+            m_candidates.push_back(std::move(candidate));
+        } else if (first->second != candidate.source) {
+            passOver(candidate, "The [[log]] at line " +
+                                    std::to_string(m_logs[first->second].line) +
+                                    " names it, too, and applies");
+        }
+    }
+
+    bool isUsable(Candidate& candidate) {
+        if (Utf8::validPrefix(candidate.name) != candidate.name.size()) {
+            return passOver(candidate, "Its name is not UTF-8");
+        }
+        if (!candidate.isNamed && isCompressed(candidate.name)) {
+            return passOver(candidate, "It is compressed");
+        }
+        struct stat status;
+        if (::stat(candidate.name.c_str(), &status) != 0) {
+            const ErrorText error(errno);
+            const bool isGone = error.number() == ENOENT || error.number() == ENOTDIR;
+            const bool isKept = candidate.isNamed || m_finder.m_known.contains(candidate.name);
+            return isKept || passOver(candidate, isGone ? "It is a link that leads nowhere"
+                                                        : std::string("It cannot be looked at: ") +
+                                                              error.text());
+        }
+        if (!S_ISREG(status.st_mode)) {
+            return passOver(candidate, S_ISDIR(status.st_mode) ? "It is a directory"
+                                                               : "It is not a regular file");
+        }
+        candidate.isThere = true;
+        candidate.identity = {status.st_dev, status.st_ino};
+        if (const auto own = m_ownFiles.find(candidate.identity); own != m_ownFiles.end()) {
+            return passOver(candidate, "It is " + own->second +
+                                           ", to which the agent itself writes: each event would "
+                                           "raise the next");
+        }
+        return true;
+    }
+
+    int rank(const Candidate& candidate) const {
+        if (m_finder.m_known.contains(candidate.name)) {
+            return 0;
+        }
+        return candidate.isNamed ? 1 : 2;
+    }
+
+    bool isChosen(const Candidate& candidate, std::size_t chosen) {
+        if (!candidate.isNamed) {
+            for (const std::string& origin : originsOf(candidate.name)) {
+                if (m_names.contains(origin) || m_finder.m_known.contains(origin)) {
+                    return passOver(candidate, "It is an older generation of " + origin);
+                }
+            }
+        }
+        if (candidate.isThere && !isFirstName(candidate)) {
+            return false;
+        }
+        if (chosen >= mostFiles) {
+            m_found.sources[candidate.source].problem =
+                "More than " + std::to_string(mostFiles) +
+                " files match; name the files more narrowly";
+            return passOver(candidate, "There are too many files");
+        }
+        return true;
+    }
+
+    /// False if the file is, or was until it was rotated, followed under another name.
+    bool isFirstName(const Candidate& candidate) {
+        const auto [same, isFirst] = m_identities.emplace(candidate.identity, candidate.name);
+        if (!isFirst) {
+            return passOver(candidate, "It is the same file as " + same->second);
+        }
+        if (m_finder.m_known.contains(candidate.name) || candidate.isNamed) {
+            return true;
+        }
+        const auto rotated = m_finder.m_rotated.find(candidate.name);
+        bool isRotated =
+            rotated != m_finder.m_rotated.end() && rotated->second == candidate.identity;
+        for (const auto& [name, known] : m_finder.m_known) {
+            isRotated = isRotated || known.identity == candidate.identity;
+        }
+        if (isRotated) {
+            m_rotated.emplace(candidate.name, candidate.identity);
+            return passOver(candidate, "It was followed under another name before it was rotated");
+        }
+        return true;
+    }
+
+    /// Always false.
+    bool passOver(const Candidate& candidate, std::string reason) {
+        FoundLogs::Source& source = m_found.sources[candidate.source];
+        ++source.passedOverCount;
+        if (source.passedOver.size() < FoundLogs::mostPassedOver) {
+            source.passedOver.push_back({candidate.name, std::move(reason)});
+        }
+        return false;
+    }
+
+    void list(std::vector<Candidate>& chosen) {
+        std::vector<std::array<std::shared_ptr<const FollowSettings>, 2>> settings(m_logs.size());
+        for (Candidate& candidate : chosen) {
+            const LogConfig& log = m_logs[candidate.source];
+            const auto known = m_finder.m_known.find(candidate.name);
+            if (known != m_finder.m_known.end()) {
+                candidate.isNewcomer = known->second.isNewcomer;
+            }
+            auto& shared = settings[candidate.source][candidate.isNewcomer ? 1 : 0];
+            if (shared == nullptr) {
+                auto own = std::make_shared<FollowSettings>(log.follow);
+                own->isNewcomer = candidate.isNewcomer;
+                shared = std::move(own);
+            }
+            m_found.logs.push_back(
+                {candidate.name, log.type, log.debug ? 'Y' : 'N', log.format, shared});
+            m_found.sources[candidate.source].files.push_back(candidate.name);
+        }
+    }
+
+    void remember(const std::vector<Candidate>& chosen) {
+        std::map<std::string, Known> known;
+        for (const Candidate& candidate : chosen) {
+            const auto before = m_finder.m_known.find(candidate.name);
+            Known now{candidate.isThere ? std::optional(candidate.identity) : std::nullopt, m_now,
+                      candidate.isNewcomer};
+            if (!candidate.isThere && before != m_finder.m_known.end()) {
+                now.identity = before->second.identity;
+                now.seen = before->second.seen;
+            }
+            known.emplace(candidate.name, now);
+        }
+        m_finder.m_known = std::move(known);
+        m_finder.m_rotated = std::move(m_rotated);
+        m_finder.m_searched.clear();
+        for (const LogConfig& log : m_logs) {
+            m_finder.m_searched.insert(log.paths.begin(), log.paths.end());
+        }
+    }
+
+    LogFinder& m_finder;
+    const std::vector<LogConfig>& m_logs;
+    const Clock::time_point m_now;
+    FoundLogs m_found;
+    std::vector<Candidate> m_candidates;
+    std::map<std::string, std::size_t> m_sourceOf; ///< of each candidate's name
+    std::set<std::string> m_names;
+    std::map<Identity, std::string> m_identities;
+    std::map<Identity, std::string> m_ownFiles;
+    std::map<std::string, Identity> m_rotated;
+};
+
+FoundLogs LogFinder::look(const std::vector<LogConfig>& logs,
+                          const std::map<std::string, std::string>& ownFiles,
+                          Clock::time_point now) {
+    return Look(*this, logs, ownFiles, now).run();
+}
+
+} // namespace zrm::host

@@ -1,0 +1,76 @@
+#ifndef ZRM_HOST_LOG_FINDER_H
+#define ZRM_HOST_LOG_FINDER_H
+
+#include "host/config/LogConfig.h"
+#include "logs/FurtherLogs.h"
+
+#include <chrono>
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <sys/stat.h>
+
+namespace zrm::host {
+
+/// What one look at the file system finds for the [[log]] tables.
+struct FoundLogs {
+    /// A file that a glob matches, or a path that is named, and that is not followed.
+    struct PassedOver {
+        std::string file;
+        std::string reason; ///< a sentence without its full stop
+    };
+    /// One table.
+    struct Source {
+        unsigned line = 0;                  ///< in the configuration
+        std::vector<std::string> paths;     ///< as configured
+        std::vector<std::string> files;     ///< that are followed
+        std::vector<PassedOver> passedOver; ///< the first mostPassedOver
+        std::size_t passedOverCount = 0;
+        std::string problem; ///< why the look is incomplete, without a full stop; empty if complete
+    };
+    static constexpr std::size_t mostPassedOver = 100;
+
+    std::vector<Source> sources; ///< in the order of the configuration
+    FurtherLogs::List logs;
+};
+
+/// Finds the files of [[log]] tables, again and again. Remembers the files that it found, so that a
+/// file that appears later, one that was rotated, and one that is gone for a moment are known as
+/// such. Used by one thread at a time.
+class LogFinder {
+public:
+    using Clock = std::chrono::steady_clock;
+    static constexpr std::size_t mostFiles = 10'000;
+    /// How long a file that a glob no longer matches stays in the list, so that its log survives a
+    /// rotation that creates the new file late.
+    static constexpr std::chrono::seconds keptAbsent{60};
+
+    /// Looks once. `ownFiles`: the files that the agent writes, by path, and what each is.
+    FoundLogs look(const std::vector<LogConfig>& logs,
+                   const std::map<std::string, std::string>& ownFiles, Clock::time_point now);
+
+private:
+    /// A file's device and inode.
+    using Identity = std::pair<dev_t, ino_t>;
+    struct Known {
+        std::optional<Identity> identity; ///< when it was last there
+        Clock::time_point seen;
+        bool isNewcomer;
+    };
+    struct Candidate;
+    class Look;
+
+    std::map<std::string, Known> m_known;      ///< the followed files by name
+    std::map<std::string, Identity> m_rotated; ///< followed under another name before
+    /// The paths and globs of the last look: a file that one of these matches now is new.
+    std::set<std::string> m_searched;
+};
+
+} // namespace zrm::host
+
+#endif

@@ -1,0 +1,120 @@
+#include "host/sources/LogList.h"
+
+#include "logs/FollowSettings.h"
+
+#include <algorithm>
+#include <condition_variable>
+#include <mutex>
+#include <system_error>
+#include <thread>
+#include <utility>
+
+namespace zrm::host {
+
+namespace {
+
+bool isSame(const FurtherLog& a, const FurtherLog& b) {
+    return a.name == b.name && a.type == b.type && a.debugMode == b.debugMode &&
+           a.procedure == b.procedure && *a.settings == *b.settings;
+}
+
+void publish(const FoundLogs& found) {
+    FurtherLogs::publish(std::make_shared<const FurtherLogs::List>(found.logs));
+}
+
+} // namespace
+
+struct LogList::Shared {
+    std::mutex mutex; ///< guards the members below
+    std::condition_variable changed;
+    bool isEnded = false;
+    bool isAsked = false; ///< the tables have changed since the last look
+    bool isUsed = false;  ///< there are tables, or were since the start
+    std::vector<LogConfig> logs;
+    OwnFiles ownFiles;
+    std::shared_ptr<const FoundLogs> found = std::make_shared<const FoundLogs>();
+
+    LogFinder finder; ///< used by the thread, and before it starts
+    std::function<void()> announce;
+};
+
+LogList::LogList(std::function<void()> changed) : m_shared(std::make_shared<Shared>()) {
+    m_shared->announce = std::move(changed);
+}
+
+LogList::~LogList() {
+    const std::lock_guard guard(m_shared->mutex);
+    m_shared->isEnded = true;
+    m_shared->changed.notify_all();
+}
+
+void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
+    apply(logs, std::move(ownFiles));
+    if (logs.empty()) {
+        return;
+    }
+    const std::lock_guard guard(m_shared->mutex);
+    m_shared->isAsked = false;
+    auto found = std::make_shared<const FoundLogs>(
+        m_shared->finder.look(m_shared->logs, m_shared->ownFiles, LogFinder::Clock::now()));
+    m_shared->found = found;
+    publish(*found);
+}
+
+bool LogList::start() {
+    try {
+        std::thread(run, m_shared).detach();
+    } catch (const std::system_error&) {
+        return false;
+    }
+    return true;
+}
+
+void LogList::apply(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
+    const std::lock_guard guard(m_shared->mutex);
+    m_shared->logs = logs;
+    m_shared->ownFiles = std::move(ownFiles);
+    m_shared->isUsed = m_shared->isUsed || !logs.empty();
+    m_shared->isAsked = true;
+    m_shared->changed.notify_all();
+}
+
+std::shared_ptr<const FoundLogs> LogList::found() const {
+    const std::lock_guard guard(m_shared->mutex);
+    return m_shared->found;
+}
+
+void LogList::run(const std::shared_ptr<Shared>& shared) {
+    std::unique_lock lock(shared->mutex);
+    for (;;) {
+        shared->changed.wait_for(lock, interval,
+                                 [&] { return shared->isEnded || shared->isAsked; });
+        if (shared->isEnded) {
+            return;
+        }
+        shared->isAsked = false;
+        if (!shared->isUsed) {
+            continue;
+        }
+        const std::vector<LogConfig> logs = shared->logs;
+        const OwnFiles ownFiles = shared->ownFiles;
+        lock.unlock();
+        auto found = std::make_shared<const FoundLogs>(
+            shared->finder.look(logs, ownFiles, LogFinder::Clock::now()));
+        lock.lock();
+        if (shared->isEnded) {
+            return;
+        }
+        const auto before = std::exchange(shared->found, found);
+        const bool isPublished = FurtherLogs::published() != nullptr;
+        lock.unlock();
+        if (!isPublished || !std::equal(before->logs.begin(), before->logs.end(),
+                                        found->logs.begin(), found->logs.end(), isSame)) {
+            publish(*found);
+            shared->announce();
+        }
+        lock.lock();
+    }
+}
+
+} // namespace zrm::host

@@ -1,0 +1,52 @@
+#ifndef ZRM_HOST_LOG_LIST_H
+#define ZRM_HOST_LOG_LIST_H
+
+#include "host/sources/LogFinder.h"
+
+#include <chrono>
+#include <functional>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace zrm::host {
+
+/// Keeps the agent's list of further logs (FurtherLogs) equal to what the [[log]] tables name and
+/// match. The looks at the file system run on a thread of their own: one that a file system blocks
+/// forever is abandoned at the end.
+class LogList {
+public:
+    static constexpr std::chrono::seconds interval{5};
+
+    /// Looked at besides the files of the configuration, for example by way of a descriptor.
+    using OwnFiles = std::map<std::string, std::string>;
+
+    /// `changed` is called on the list's thread after a changed list was published.
+    explicit LogList(std::function<void()> changed);
+    /// Does not wait for the thread.
+    ~LogList();
+    LogList(const LogList&) = delete;
+    LogList& operator=(const LogList&) = delete;
+
+    /// Takes the tables of the configuration and looks at once, on the calling thread; for the
+    /// start, before the log manager exists. Publishes nothing if there are no tables.
+    void begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles);
+    /// Starts the thread. Returns false if no thread can be started.
+    bool start();
+    /// Takes the tables of a changed configuration. The thread looks soon.
+    void apply(const std::vector<LogConfig>& logs, OwnFiles ownFiles);
+
+    /// What the last look found. Never null. Any thread.
+    std::shared_ptr<const FoundLogs> found() const;
+
+private:
+    struct Shared;
+    static void run(const std::shared_ptr<Shared>& shared);
+
+    std::shared_ptr<Shared> m_shared;
+};
+
+} // namespace zrm::host
+
+#endif

@@ -1,0 +1,178 @@
+#include "host/config/ConfigFile.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <variant>
+#include <vector>
+
+using namespace zrm;
+using namespace zrm::host;
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+std::vector<LogConfig> accepted(const std::string& text) {
+    const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
+    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        ADD_FAILURE() << problems->front();
+        return {};
+    }
+    return std::get<HostConfig>(result).logs;
+}
+
+std::vector<std::string> refused(const std::string& text) {
+    const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
+    const auto* const problems = std::get_if<std::vector<std::string>>(&result);
+    return problems == nullptr ? std::vector<std::string>{} : *problems;
+}
+
+TEST(LogReader, APathAloneIsASyslogFileFollowedByName) {
+    const std::vector<LogConfig> logs = accepted("\n[[log]]\npath = '/var/log/syslog'\n");
+    ASSERT_EQ(logs.size(), 1U);
+    LogConfig expected;
+    expected.paths = {"/var/log/syslog"};
+    expected.line = 2;
+    EXPECT_EQ(logs[0], expected);
+    EXPECT_TRUE(logs[0].follow.resume);
+    EXPECT_EQ(logs[0].follow.rotateWait, std::chrono::seconds(2));
+}
+
+TEST(LogReader, ReadsEverythingThatATableMaySay) {
+    const std::vector<LogConfig> logs = accepted(R"(
+[[log]]
+path        = ["/srv/a.log", "/srv/*/app-?[0-9].log"]
+exclude     = ["*.gz", "/srv/old/*"]
+type        = "text"
+format      = 'A,"%d-%d-%d %255[^\n]" , year month day description'
+follow      = "file"
+resume      = false
+start       = "beginning"
+rotate_wait = "5s"
+debug       = true
+timezone    = "Europe/Berlin"
+
+[[log]]
+path = "/var/log/account"
+type = "accounting"
+)");
+    ASSERT_EQ(logs.size(), 2U);
+    const LogConfig& log = logs[0];
+    EXPECT_THAT(log.paths, ElementsAre("/srv/a.log", "/srv/*/app-?[0-9].log"));
+    EXPECT_THAT(log.excludes, ElementsAre("*.gz", "/srv/old/*"));
+    EXPECT_EQ(log.type, 'U');
+    EXPECT_EQ(log.format, "A,\"%d-%d-%d %255[^\\n]\" , year month day description");
+    EXPECT_TRUE(log.debug);
+    EXPECT_EQ(log.follow.follow, FollowSettings::Follow::file);
+    EXPECT_EQ(log.follow.start, FollowSettings::Start::beginning);
+    EXPECT_FALSE(log.follow.resume);
+    EXPECT_EQ(log.follow.rotateWait, std::chrono::seconds(5));
+    EXPECT_EQ(log.follow.timezone, "Europe/Berlin");
+    EXPECT_GT(log.follow.zone.size(), 50U);
+    EXPECT_EQ(logs[1].type, 'A');
+}
+
+TEST(LogReader, WithoutAHistoryNothingIsResumed) {
+    const std::vector<LogConfig> logs =
+        accepted("[history]\nenabled = false\n[[log]]\npath = '/var/log/syslog'\n");
+    ASSERT_EQ(logs.size(), 1U);
+    EXPECT_FALSE(logs[0].follow.resume);
+    EXPECT_THAT(refused("[history]\nenabled = false\n[[log]]\npath = '/a'\nresume = true\n"),
+                ElementsAre("zrm.toml:5: log.resume: needs the history, which stores how far each "
+                            "log was read; write enabled = true in [history], or resume = false"));
+}
+
+TEST(LogReader, SaysWhatIsWrongWithAPath) {
+    EXPECT_THAT(refused("[[log]]\n"),
+                ElementsAre("zrm.toml:1: log.path: is missing; write path = \"/var/log/syslog\", "
+                            "or a list of paths and globs"));
+    EXPECT_THAT(refused("[[log]]\npath = []\n"),
+                ElementsAre("zrm.toml:2: log.path: names no file; write path = "
+                            "\"/var/log/syslog\", or a list of paths and globs"));
+    EXPECT_THAT(
+        refused("[[log]]\npath = [\n'relative',\n'/var/log/',\n'/var/**/x.log'\n]\n"),
+        ElementsAre("zrm.toml:3: log.path: 'relative' is not an absolute path; begin it with '/'",
+                    "zrm.toml:4: log.path: '/var/log/' names a directory; name the files in it, "
+                    "for example \"/var/log/*.log\"",
+                    "zrm.toml:5: log.path: '/var/**/x.log' holds '**', which does not search "
+                    "directories of every depth; write one '*' for each level of directories"));
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\n[[log]]\npath = ['/b', '/a']\n"),
+                ElementsAre("zrm.toml:4: log.path: '/a' is named at line 2 already; name it once"));
+    EXPECT_THAT(refused("[[log]]\npath = '/" + std::string(5000, 'a') + "'\n"),
+                ElementsAre("zrm.toml:2: log.path: the path has 5001 bytes; write at most 4095"));
+}
+
+TEST(LogReader, RefusesWhatTheAgentWritesItself) {
+    const std::string sink = "[[sink]]\ntype = 'jsonl'\npath = '/var/log/zrm/events.log'\n";
+    EXPECT_THAT(refused(sink + "[[log]]\npath = '/var/log/zrm/events.log'\n"),
+                ElementsAre("zrm.toml:5: log.path: '/var/log/zrm/events.log' is the output of a "
+                            "sink: the agent writes this file, and each event "
+                            "would raise the next; leave it out"));
+    EXPECT_THAT(
+        refused(sink + "[[log]]\npath = '/var/log/*/*.log'\n"),
+        ElementsAre("zrm.toml:5: log.path: '/var/log/*/*.log' matches /var/log/zrm/events.log, the "
+                    "output of a sink: the agent writes this file, and each "
+                    "event would raise the next; exclude the file, or name the logs more "
+                    "narrowly"));
+    EXPECT_THAT(refused(sink + "[[log]]\npath = '/var/log/*/*.log'\nexclude = 'events.*'\n"),
+                IsEmpty());
+    EXPECT_EQ(refused("[[log]]\npath = '/var/lib/zrm/*'\n").size(), 1U);
+    EXPECT_EQ(refused("[agent]\ndebug_log = '/d.log'\n[[log]]\npath = '/d.log'\n").size(), 1U);
+}
+
+TEST(LogReader, SaysWhatIsWrongWithTheRest) {
+    EXPECT_THAT(refused(R"([[log]]
+path = '/a'
+type = "sylog"
+follow = "inode"
+start = "now"
+rotate_wait = "2 s"
+timezone = "Nowhere/Town"
+exclude = "sub/x"
+entry = 1
+)"),
+                ElementsAre("zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
+                            "\"text\", \"accounting\" or \"errorlog\"",
+                            "zrm.toml:4: log.follow: 'inode' is not a choice here; write \"name\" "
+                            "or \"file\"",
+                            "zrm.toml:5: log.start: 'now' is not a choice here; write \"end\" or "
+                            "\"beginning\"",
+                            "zrm.toml:6: log.rotate_wait: '2 s' is not a duration from a second to "
+                            "an hour; write for example \"2s\" or \"5m\"",
+                            "zrm.toml:7: log.timezone: 'Nowhere/Town' is not a time zone of this "
+                            "machine; write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
+                            "list-timezones lists them)",
+                            "zrm.toml:8: log.exclude: 'sub/x' is neither a path nor a file name; "
+                            "begin a path with '/', or write a file name without any '/'",
+                            "zrm.toml:9: log.entry: unknown key; the keys here are type, exclude, "
+                            "path, format, debug, follow, start, rotate_wait, resume, timezone"));
+}
+
+TEST(LogReader, RefusesKeysThatHaveNoMeaningForAType) {
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\nformat = '%s'\n"),
+                ElementsAre("zrm.toml:3: log.format: has no meaning for type \"syslog\"; leave it "
+                            "out"));
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\ntype = 'accounting'\ntimezone = 'UTC'\n"),
+                ElementsAre("zrm.toml:4: log.timezone: has no meaning for type \"accounting\"; "
+                            "leave it out"));
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\ntype = 'errorlog'\nformat = 'errpt -a'\n"),
+                ElementsAre("zrm.toml:3: log.type: an error log is read only on AIX; write another "
+                            "type"));
+}
+
+TEST(LogReader, ChecksTheFormatOfATextLog) {
+    EXPECT_EQ(refused("[[log]]\npath = '/a'\ntype = 'text'\n").size(), 1U);
+    const std::vector<std::string> problems =
+        refused("[[log]]\npath = '/a'\ntype = 'text'\nformat = '\"%d\" , nonsense'\n");
+    ASSERT_EQ(problems.size(), 1U);
+    EXPECT_TRUE(problems[0].starts_with("zrm.toml:4: log.format: cannot be used")) << problems[0];
+    EXPECT_EQ(
+        refused("[[log]]\npath = '/a'\ntype = 'text'\nformat = '" + std::string(2000, 'a') + "'\n")
+            .size(),
+        1U);
+}
+
+} // namespace

@@ -1,0 +1,257 @@
+#include "host/sources/LogFinder.h"
+
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <filesystem>
+#include <map>
+#include <string>
+#include <vector>
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+using namespace zrm;
+using namespace zrm::host;
+
+namespace {
+
+using namespace std::chrono_literals;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class LogFinderTest : public testing::Test {
+protected:
+    static LogConfig table(std::vector<std::string> paths, std::vector<std::string> excludes = {}) {
+        LogConfig log;
+        log.paths = std::move(paths);
+        log.excludes = std::move(excludes);
+        log.line = 1;
+        return log;
+    }
+    std::string file(const std::string& name) { return directory.file(name); }
+    std::string create(const std::string& name) { return directory.write(name, "x\n"); }
+    void rename(const std::string& from, const std::string& to) {
+        std::filesystem::rename(file(from), file(to));
+    }
+    void look() { found = finder.look(logs, ownFiles, now); }
+    std::vector<std::string> names() const {
+        std::vector<std::string> list;
+        for (const FurtherLog& log : found.logs) {
+            list.push_back(log.name);
+        }
+        return list;
+    }
+    bool isNewcomer(const std::string& name) const {
+        for (const FurtherLog& log : found.logs) {
+            if (log.name == name) {
+                return log.settings->isNewcomer;
+            }
+        }
+        ADD_FAILURE() << name << " is not in the list";
+        return false;
+    }
+    /// Why the file is passed over; empty if it is not.
+    std::string reason(const std::string& name) const {
+        for (const FoundLogs::Source& source : found.sources) {
+            for (const FoundLogs::PassedOver& passed : source.passedOver) {
+                if (passed.file == name) {
+                    return passed.reason;
+                }
+            }
+        }
+        return "";
+    }
+
+    TemporaryDirectory directory;
+    LogFinder finder;
+    std::vector<LogConfig> logs;
+    std::map<std::string, std::string> ownFiles;
+    LogFinder::Clock::time_point now{};
+    FoundLogs found;
+};
+
+TEST_F(LogFinderTest, APathThatIsNamedNeedNotExist) {
+    logs = {table({file("a.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    create("a.log");
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    EXPECT_FALSE(isNewcomer(file("a.log")));
+}
+
+TEST_F(LogFinderTest, AGlobMatchesFilesInEveryDirectory) {
+    std::filesystem::create_directories(file("one/logs"));
+    std::filesystem::create_directories(file("two/logs"));
+    const std::string a = create("one/logs/a.log");
+    const std::string b = create("two/logs/b.log");
+    create("two/logs/b.txt");
+    create("two/logs/.hidden.log");
+    logs = {table({file("*/logs/*.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(a, b));
+    EXPECT_THAT(found.sources[0].files, ElementsAre(a, b));
+    EXPECT_EQ(found.sources[0].problem, "");
+}
+
+TEST_F(LogFinderTest, ExcludesPathsAndNames) {
+    const std::string a = create("a.log");
+    create("b.log");
+    create("c.log");
+    logs = {table({file("*.log")}, {"b.*", file("c.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(a));
+}
+
+TEST_F(LogFinderTest, PassesOverWhatIsNoFile) {
+    const std::string a = create("a.log");
+    std::filesystem::create_directory(file("directory.log"));
+    ASSERT_EQ(mkfifo(file("pipe.log").c_str(), 0600), 0);
+    ASSERT_EQ(symlink("/absent", file("dangling.log").c_str()), 0);
+    create("old.log.gz");
+    create("b\xff.log");
+    logs = {table({file("*.log"), file("*.gz"), file("directory.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(a));
+    EXPECT_EQ(reason(file("directory.log")), "It is a directory");
+    EXPECT_EQ(reason(file("pipe.log")), "It is not a regular file");
+    EXPECT_EQ(reason(file("dangling.log")), "It is a link that leads nowhere");
+    EXPECT_EQ(reason(file("old.log.gz")), "It is compressed");
+    EXPECT_EQ(reason(file("b\xff.log")), "Its name is not UTF-8");
+}
+
+TEST_F(LogFinderTest, AFileThatAppearsLaterIsANewcomerAndStaysOne) {
+    create("a.log");
+    logs = {table({file("*.log")})};
+    look();
+    create("b.log");
+    look();
+    EXPECT_FALSE(isNewcomer(file("a.log")));
+    EXPECT_TRUE(isNewcomer(file("b.log")));
+    look();
+    EXPECT_TRUE(isNewcomer(file("b.log")));
+}
+
+TEST_F(LogFinderTest, FilesOfANewTableAreNoNewcomers) {
+    create("a.log");
+    create("b.txt");
+    logs = {table({file("*.log")})};
+    look();
+    logs.push_back(table({file("*.txt")}));
+    look();
+    EXPECT_FALSE(isNewcomer(file("b.txt")));
+}
+
+TEST_F(LogFinderTest, PassesOverOlderGenerations) {
+    create("app.log");
+    for (const char* const name :
+         {"app.log.1", "app.log-20261122", "app.log.2026-11-22", "app-20261122.log", "app.log.2"}) {
+        create(name);
+    }
+    create("app-2.log"); // a second instance, not a generation
+    create("other.log.1");
+    logs = {table({file("*")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app-2.log"), file("app.log"), file("other.log.1")));
+    EXPECT_EQ(reason(file("app.log.1")), "It is an older generation of " + file("app.log"));
+    // Who names it means it.
+    logs = {table({file("*"), file("app.log.1")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app-2.log"), file("app.log"), file("other.log.1")));
+    logs = {table({file("app.log.1"), file("*")})};
+    look();
+    EXPECT_THAT(names(), testing::Contains(file("app.log.1")));
+}
+
+TEST_F(LogFinderTest, AFileThatIsRenamedIsNotANewOne) {
+    create("app.log");
+    logs = {table({file("*.log")})};
+    look();
+    rename("app.log", "previous.log");
+    create("app.log");
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log")));
+    EXPECT_EQ(reason(file("previous.log")),
+              "It was followed under another name before it was rotated");
+    EXPECT_FALSE(isNewcomer(file("app.log")));
+    now += 10min;
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log")));
+}
+
+TEST_F(LogFinderTest, AFileThatIsGoneStaysForAWhile) {
+    create("app.log");
+    logs = {table({file("*.log")})};
+    look();
+    rename("app.log", "app.log.1");
+    now += LogFinder::keptAbsent - 1s;
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log")));
+    now += 1s;
+    look();
+    EXPECT_THAT(names(), IsEmpty());
+    create("app.log");
+    look();
+    EXPECT_TRUE(isNewcomer(file("app.log")));
+}
+
+TEST_F(LogFinderTest, OneFileOfTwoNamesIsFollowedOnce) {
+    create("a.log");
+    ASSERT_EQ(symlink(file("a.log").c_str(), file("current.log").c_str()), 0);
+    logs = {table({file("*.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    EXPECT_EQ(reason(file("current.log")), "It is the same file as " + file("a.log"));
+}
+
+TEST_F(LogFinderTest, TheFirstTableThatNamesAFileApplies) {
+    create("a.log");
+    logs = {table({file("*.log")}), table({file("a.*")})};
+    logs[0].line = 7;
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    EXPECT_THAT(found.sources[1].files, IsEmpty());
+    EXPECT_EQ(reason(file("a.log")), "The [[log]] at line 7 names it, too, and applies");
+}
+
+TEST_F(LogFinderTest, PassesOverWhatTheAgentWritesItself) {
+    create("a.log");
+    create("events.jsonl");
+    ASSERT_EQ(symlink(file("events.jsonl").c_str(), file("events.log").c_str()), 0);
+    ownFiles = {{file("events.jsonl"), "the output of a sink"}};
+    logs = {table({file("*.log")})};
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    EXPECT_THAT(reason(file("events.log")), HasSubstr("the agent itself writes"));
+}
+
+TEST_F(LogFinderTest, TakesAtMostTenThousandFiles) {
+    std::filesystem::create_directory(file("many"));
+    const std::string first = create("many/00000.log");
+    for (int number = 1; number <= 10'000; ++number) {
+        std::filesystem::create_hard_link(first, file("many/" + std::to_string(number) + ".log"));
+    }
+    logs = {table({file("many/*.log")})};
+    look();
+    EXPECT_EQ(found.sources[0].problem,
+              "More than 10000 paths match; name the files more narrowly");
+    EXPECT_EQ(found.logs.size(), 1U);
+    EXPECT_EQ(found.sources[0].passedOverCount, 9'999U);
+    EXPECT_EQ(found.sources[0].passedOver.size(), FoundLogs::mostPassedOver);
+}
+
+TEST_F(LogFinderTest, SaysThatADirectoryCannotBeRead) {
+    create("a.log");
+    logs = {table({file("*.log")}), table({file("loop/*.log")})};
+    ASSERT_EQ(symlink(file("loop").c_str(), file("loop").c_str()), 0);
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    EXPECT_THAT(found.sources[1].problem, HasSubstr("cannot be read"));
+}
+
+} // namespace
