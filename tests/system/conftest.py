@@ -116,6 +116,7 @@ class Agent:
         self.zrm_toml = self.directory / "zrm.toml"
         self.syslog_conf = self.directory / "syslog.conf"
         self.environment = {}
+        self.tables = []  # keys of each [[log]]
         self.situations = []
         self.sink = "-"
         self.more_sinks = []
@@ -144,6 +145,11 @@ class Agent:
         if before is not None:
             os.utime(self.logs_conf, (before + 2, before + 2))
 
+    def follow(self, path, **keys):
+        """Adds a [[log]] table for a path or a glob, or a list of them."""
+        paths = path if isinstance(path, list) else [path]
+        self.tables.append({"path": [str(one) for one in paths], **keys})
+
     def situation(self, name="every-entry", log=None, when=(), **keys):
         """A situation on a log; every entry of it unless told otherwise."""
         keys = {"name": name, "text": name, "severity": "info", **keys}
@@ -167,6 +173,9 @@ class Agent:
         for sink in self.more_sinks:
             text += "\n[[sink]]\n"
             text += "".join(f"{k} = {toml_value(v)}\n" for k, v in sink.items())
+        for table in self.tables:
+            text += "\n[[log]]\n"
+            text += "".join(f"{k} = {toml_value(v)}\n" for k, v in table.items())
         for situation in self.situations:
             text += "\n[[situation]]\n"
             text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in situation.items())
@@ -195,10 +204,15 @@ class Agent:
         self.stderr = Lines(self.process.stderr)
         if wait:
             self.wait_trace("Agent server is listening; signal sent.")
-            for line in self.logs_conf.read_text(encoding="utf-8").splitlines():
+            text = self.logs_conf.read_text(encoding="utf-8") if self.logs_conf.exists() else ""
+            for line in text.splitlines():
                 if line.startswith("/") and os.access(line.split()[0], os.R_OK):
                     self.wait_open(line.split()[0])
         return self
+
+    def reload(self):
+        """Writes the host configuration again, as it is now; the agent takes it by itself."""
+        self._write_toml()
 
     def running(self):
         return self.process.poll() is None

@@ -159,7 +159,7 @@ TEST_F(HostTest, AnUnusableConfigurationEndsTheProcessWithEveryProblem) {
     const std::string file = write("a = 1\nb = 2\n");
     const std::string keys =
         "unknown key; the keys here are state_directory, agent, http, history, sink, "
-        "situation\n";
+        "log, situation\n";
     EXPECT_EXIT(start({"--config", file}), testing::ExitedWithCode(2),
                 "^zrmagent: " + file + ":1: a: " + keys + "zrmagent: " + file + ":2: b: " + keys +
                     "$");
@@ -261,12 +261,12 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
         testing::ExitedWithCode(0), "");
     EXPECT_EQ(lines(), 5);
     const std::string file = directory + "/zrm.toml";
-    EXPECT_THAT(errors(),
-                testing::MatchesRegex("zrmagent: " + file +
-                                      ": the situations are reloaded; every other change takes "
-                                      "effect at the next start\nzrmagent: " +
-                                      file + ":1: .*; correct the TOML here\nzrmagent: " + file +
-                                      " was not loaded; the situations stay as they were\n"));
+    EXPECT_THAT(errors(), testing::MatchesRegex(
+                              "zrmagent: " + file +
+                              ": logs and situations are reloaded; every other change takes "
+                              "effect at the next start\nzrmagent: " +
+                              file + ":1: .*; correct the TOML here\nzrmagent: " + file +
+                              " was not loaded; the situations stay as they were\n"));
 }
 
 TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
