@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "framework/agent_calls.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/delivery/Delivery.h"

@@ -1,7 +1,7 @@
 #include "host/config/SinkOptionReader.h"
 
-#include "host/base/DurationText.h"
 #include "host/base/ListenAddress.h"
+#include "host/base/TimeText.h"
 #include "host/config/HeaderName.h"
 #include "host/config/HttpUrl.h"
 

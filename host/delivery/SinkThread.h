@@ -3,7 +3,7 @@
 
 #include "host/base/RetryPause.h"
 #include "host/delivery/SinkState.h"
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 #include "host/events/EventSource.h"
 #include "host/sinks/Sink.h"
 

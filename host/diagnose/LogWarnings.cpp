@@ -1,7 +1,7 @@
 #include "host/diagnose/LogWarnings.h"
 
 #include "base/TraceScope.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "host/framework/TraceCapture.h"

@@ -1,6 +1,6 @@
 #include "host/framework/IconvCache.h"
 
-#include "host/framework/CancellationOff.h"
+#include "host/framework/ScopeGuards.h"
 
 namespace zrm::host {
 

@@ -2,8 +2,7 @@
 
 #include "framework/TableManager.h"
 #include "host/framework/HandleTable.h"
-#include "host/framework/LockGuard.h"
-#include "host/framework/RequestCounts.h"
+#include "host/framework/ScopeGuards.h"
 
 #include <utility>
 

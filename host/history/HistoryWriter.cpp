@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <cinttypes>

@@ -3,7 +3,6 @@
 #include "host/diagnose/LogLedgers.h"
 #include "host/diagnose/LogWatch.h"
 #include "host/diagnose/UnmonitoredLogs.h"
-#include "host/events/LogPath.h"
 #include "host/events/RowText.h"
 #include "host/framework/Sample.h"
 #include "host/metrics/MetricText.h"

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_EVENT_ROW_H
 #define ZRM_HOST_EVENT_ROW_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <cstdint>
 #include <span>

@@ -13,7 +13,7 @@
 #include "host/api/SampleResource.h"
 #include "host/api/SituationsResource.h"
 #include "host/base/Say.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "host/console/ConsoleResource.h"
 #include "host/diagnose/LogLedgers.h"
 #include "host/framework/EventRoomControl.h"

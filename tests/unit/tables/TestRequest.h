@@ -2,7 +2,7 @@
 #define ZRM_TESTS_TEST_REQUEST_H
 
 #include "framework/ctreq.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 
 #include <cstdint>
 #include <deque>

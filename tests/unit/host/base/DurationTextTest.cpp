@@ -1,4 +1,4 @@
-#include "host/base/DurationText.h"
+#include "host/base/TimeText.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 
 #include <gtest/gtest.h>
 

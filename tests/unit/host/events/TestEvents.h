@@ -1,8 +1,8 @@
 #ifndef ZRM_TESTS_TEST_EVENTS_H
 #define ZRM_TESTS_TEST_EVENTS_H
 
+#include "host/events/Event.h"
 #include "host/events/EventJson.h"
-#include "host/events/EventRecord.h"
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "unit/host/framework/TestTable.h"

@@ -1,8 +1,7 @@
 #include "host/framework/Audience.h"
 
-#include "host/framework/LockGuard.h"
 #include "host/framework/Request.h"
-#include "host/framework/RequestCounts.h"
+#include "host/framework/ScopeGuards.h"
 #include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>

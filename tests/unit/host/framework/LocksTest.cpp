@@ -1,6 +1,6 @@
 #include "framework/locks.h"
 
-#include "host/framework/LockGuard.h"
+#include "host/framework/ScopeGuards.h"
 #include "support/Faults.h"
 
 #include <gtest/gtest.h>

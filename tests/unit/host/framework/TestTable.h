@@ -3,8 +3,7 @@
 
 #include "framework/TableManager.h"
 #include "framework/ctreq.h"
-#include "host/framework/ContextInfo.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 
 #include <cstddef>
 #include <cstdint>

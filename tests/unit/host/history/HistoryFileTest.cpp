@@ -1,7 +1,7 @@
 #include "host/history/HistoryFile.h"
 
 #include "TestBatch.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "support/FaultyDisk.h"
 #include "support/TemporaryDirectory.h"
 

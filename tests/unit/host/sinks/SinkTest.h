@@ -1,9 +1,9 @@
 #ifndef ZRM_TESTS_SINK_TEST_H
 #define ZRM_TESTS_SINK_TEST_H
 
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/config/ConfigFile.h"
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <gtest/gtest.h>
 

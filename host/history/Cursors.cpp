@@ -1,4 +1,4 @@
-#include "host/history/CursorTable.h"
+#include "host/history/Cursors.h"
 
 namespace zrm::host {
 
