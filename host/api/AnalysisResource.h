@@ -4,9 +4,8 @@
 #include "host/analysis/Explanation.h"
 #include "host/analysis/Reach.h"
 #include "host/config/HostConfig.h"
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
-#include "host/http/Resource.h"
+#include "host/http/Message.h"
+#include "host/http/Router.h"
 #include "host/situations/SituationSet.h"
 
 #include <atomic>

@@ -2,7 +2,6 @@
 
 #include "base/TraceScope.h"
 #include "host/http/ConnectionShares.h"
-#include "host/http/DescriptorRoom.h"
 #include "host/http/HttpConnection.h"
 #include "host/http/RequestDispatcher.h"
 #include "host/http/WorkerPool.h"

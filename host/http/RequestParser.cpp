@@ -9,10 +9,11 @@
 #include <string>
 #include <utility>
 
+#include <strings.h>
+
 #include <boost/asio/buffer.hpp>
 #include <boost/beast/http/parser.hpp>
 #include <boost/beast/http/string_body.hpp>
-#include <strings.h>
 
 namespace zrm::host {
 

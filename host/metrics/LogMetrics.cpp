@@ -1,4 +1,4 @@
-#include "host/metrics/LogMetrics.h"
+#include "host/metrics/MetricSources.h"
 
 #include "host/diagnose/LogLedgers.h"
 #include "host/diagnose/LogWatch.h"

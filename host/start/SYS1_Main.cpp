@@ -9,7 +9,6 @@
 #include "host/start/Descriptors.h"
 #include "host/start/Host.h"
 #include "host/start/ServiceNotifier.h"
-#include "host/start/StandardStreams.h"
 
 #include <cstddef>
 #include <cstdio>

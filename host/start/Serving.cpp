@@ -7,7 +7,6 @@
 #include "host/api/DiagnoseResource.h"
 #include "host/api/EventStream.h"
 #include "host/api/EventsResource.h"
-#include "host/api/HealthResource.h"
 #include "host/api/LogsResource.h"
 #include "host/api/ReportResource.h"
 #include "host/api/SampleResource.h"
@@ -20,12 +19,8 @@
 #include "host/framework/PulseRegistry.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
-#include "host/metrics/DeliveryMetrics.h"
-#include "host/metrics/HttpMetrics.h"
-#include "host/metrics/LogMetrics.h"
+#include "host/metrics/MetricSources.h"
 #include "host/metrics/MetricsResource.h"
-#include "host/metrics/ProcessMetrics.h"
-#include "host/metrics/SituationMetrics.h"
 #include "host/start/Watchdog.h"
 
 #include <cinttypes>

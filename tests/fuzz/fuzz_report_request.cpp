@@ -1,4 +1,4 @@
-#include "host/api/ReportRequest.h"
+#include "host/api/ReportResource.h"
 #include "host/http/RequestRefused.h"
 
 #include <cstdint>

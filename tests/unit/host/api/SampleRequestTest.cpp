@@ -1,4 +1,4 @@
-#include "host/api/SampleRequest.h"
+#include "host/api/SampleResource.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "host/api/TableSampler.h"
+#include "host/api/SampleSource.h"
 
 #include "base/ProcessValues.h"
 #include "host/framework/Tables.h"

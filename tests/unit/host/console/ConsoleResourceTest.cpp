@@ -1,6 +1,5 @@
 #include "host/console/ConsoleResource.h"
 
-#include "host/console/ConsoleFile.h"
 #include "unit/host/http/TestRouter.h"
 
 #include <gmock/gmock.h>

@@ -1,4 +1,4 @@
-#include "host/http/ActiveRequests.h"
+#include "host/http/RequestDispatcher.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "host/http/DescriptorRoom.h"
+#include "host/http/ConnectionShares.h"
 
 #include <gtest/gtest.h>
 

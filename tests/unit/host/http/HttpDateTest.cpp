@@ -1,4 +1,4 @@
-#include "host/http/HttpDate.h"
+#include "host/http/ResponseText.h"
 
 #include <gtest/gtest.h>
 

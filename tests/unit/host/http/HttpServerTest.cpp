@@ -1,6 +1,6 @@
 #include "host/http/HttpServer.h"
 
-#include "host/api/HealthResource.h"
+#include "host/api/AgentResource.h"
 #include "host/api/SampleResource.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"

@@ -3,7 +3,6 @@
 
 #include "host/base/UrlText.h"
 #include "host/http/RequestRefused.h"
-#include "host/http/Resource.h"
 #include "host/http/Router.h"
 
 #include <string>

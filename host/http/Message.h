@@ -1,15 +1,31 @@
-#ifndef ZRM_HOST_HTTP_ANSWER_H
-#define ZRM_HOST_HTTP_ANSWER_H
+#ifndef ZRM_HOST_MESSAGE_H
+#define ZRM_HOST_MESSAGE_H
 
 #include "host/base/SteeringText.h"
 
 #include <functional>
+#include <map>
 #include <memory>
+#include <stop_token>
 #include <string>
 #include <utility>
 #include <vector>
 
 namespace zrm::host {
+
+/// A request as a resource sees it, after all access checks.
+struct HttpRequest {
+    std::string method;                ///< GET also for HEAD requests
+    std::string path;                  ///< as sent, without the query
+    std::vector<std::string> captures; ///< the pattern's {names} in order, decoded, valid UTF-8
+    std::multimap<std::string, std::string> query; ///< decoded, valid UTF-8
+    std::string body;                              ///< empty, or sent as application/json
+    std::string lastEventId;                       ///< header Last-Event-ID; empty if absent
+    std::string accept;                            ///< header Accept; empty if absent
+    /// Requested once the answer is no longer needed, so that long work ends early. A token without
+    /// a state is never requested.
+    std::stop_token cancelled;
+};
 
 /// The way of a body to its client while the body comes into being. Any thread; nothing here waits.
 class BodyChannel {
