@@ -2,7 +2,7 @@
 #define ZRM_HOST_ANALYSIS_RESOURCE_H
 
 #include "host/analysis/Explanation.h"
-#include "host/analysis/Reach.h"
+#include "host/analysis/LogTail.h"
 #include "host/config/HostConfig.h"
 #include "host/http/Message.h"
 #include "host/http/Router.h"

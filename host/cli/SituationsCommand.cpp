@@ -1,9 +1,8 @@
-#include "host/cli/SituationsCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
-#include "host/cli/FactList.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"

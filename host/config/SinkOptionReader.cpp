@@ -2,8 +2,8 @@
 
 #include "host/base/ListenAddress.h"
 #include "host/base/TimeText.h"
-#include "host/config/HeaderName.h"
 #include "host/config/HttpUrl.h"
+#include "host/config/SinkTypes.h"
 
 #include <algorithm>
 #include <array>

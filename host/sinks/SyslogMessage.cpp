@@ -3,9 +3,8 @@
 #include "host/base/SteeringText.h"
 #include "host/base/TimeText.h"
 #include "host/base/Utf8.h"
-#include "host/config/SyslogFacilities.h"
+#include "host/config/SinkTypes.h"
 #include "host/sinks/EventRow.h"
-#include "host/sinks/SeverityCodes.h"
 
 #include <algorithm>
 

@@ -2,7 +2,6 @@
 #include "host/base/Say.h"
 #include "host/base/WatchedFile.h"
 #include "host/config/ConfigFile.h"
-#include "host/config/ConfigSecrets.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
 #include "host/start/CommandLine.h"

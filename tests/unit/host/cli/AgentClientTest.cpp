@@ -3,7 +3,7 @@
 #include "../sinks/ScriptedServer.h"
 #include "TestAgent.h"
 #include "host/cli/CliError.h"
-#include "host/cli/SseParser.h"
+#include "host/cli/EventFollower.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "host/cli/SseParser.h"
+#include "host/cli/EventFollower.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

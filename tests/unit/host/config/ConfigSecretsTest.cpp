@@ -1,6 +1,5 @@
-#include "host/config/ConfigSecrets.h"
-
 #include "host/config/ConfigFile.h"
+
 #include "support/TemporaryDirectory.h"
 
 #include <gtest/gtest.h>

@@ -1,7 +1,5 @@
 #include "host/sinks/EventRow.h"
 
-#include "host/sinks/SeverityCodes.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

@@ -1,7 +1,7 @@
 #include "host/sinks/SyslogMessage.h"
 
 #include "SinkTest.h"
-#include "host/config/SyslogFacilities.h"
+#include "host/config/SinkTypes.h"
 
 #include <gtest/gtest.h>
 

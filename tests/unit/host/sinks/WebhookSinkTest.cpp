@@ -2,7 +2,6 @@
 
 #include "ScriptedServer.h"
 #include "SinkTest.h"
-#include "host/sinks/HmacSha256.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 

@@ -1,4 +1,4 @@
-#include "host/analysis/ExplanationJson.h"
+#include "host/analysis/Explanation.h"
 
 #include <nlohmann/json.hpp>
 
