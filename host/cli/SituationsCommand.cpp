@@ -1,5 +1,6 @@
 #include "host/cli/Commands.h"
 
+#include "host/base/UrlText.h"
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
@@ -99,7 +100,7 @@ int SituationsCommand::run(Context& context) {
 }
 
 std::string SituationsCommand::path(const char* below) const {
-    return route + '/' + AgentClient::pathPart(m_name) + below;
+    return route + '/' + UrlText::encode(m_name) + below;
 }
 
 int SituationsCommand::done(Context& context, const Json& answer, const char* what) const {

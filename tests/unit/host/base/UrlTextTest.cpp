@@ -26,6 +26,20 @@ TEST(UrlText, RefusesWhatIsNoText) {
     }
 }
 
+TEST(UrlText, EncodesWhateverHasAMeaningInAUrl) {
+    EXPECT_EQ(UrlText::encode(""), "");
+    EXPECT_EQ(UrlText::encode("ssh-brute_force.1~"), "ssh-brute_force.1~");
+    EXPECT_EQ(UrlText::encode("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
+}
+
+TEST(UrlText, DecodesWhatItEncodes) {
+    std::string text;
+    for (char c = 1; c != '\x7f'; ++c) {
+        text += c;
+    }
+    EXPECT_EQ(UrlText::decode(UrlText::encode(text)), text);
+}
+
 TEST(UrlText, ReadsQueries) {
     EXPECT_EQ(UrlText::query(""), Query());
     EXPECT_EQ(UrlText::query("a=1&b=x+y%2B&a=2"), (Query{{"a", "1"}, {"a", "2"}, {"b", "x y+"}}));

@@ -145,11 +145,6 @@ TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
         "what answers is not a zrmagent: an event of its stream is longer than 1 MB");
 }
 
-TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {
-    EXPECT_EQ(AgentClient::pathPart("ssh-brute_force.1~"), "ssh-brute_force.1~");
-    EXPECT_EQ(AgentClient::pathPart("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
-}
-
 TEST_F(AgentClientTest, AStreamThatBeginsAfterStopEnds) {
     std::shared_ptr<BodyChannel> stream; // without end
     agent.routes().add("GET", "/stream", [&](const HttpRequest&) {
