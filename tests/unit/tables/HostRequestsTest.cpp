@@ -8,8 +8,8 @@
 #include "host/framework/Sample.h"
 #include "host/framework/Tables.h"
 
-#include "AllocationCount.h"
 #include "TestLogs.h"
+#include "support/AllocationCount.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"

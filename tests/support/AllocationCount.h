@@ -2,6 +2,6 @@
 #define ZRM_TESTS_ALLOCATION_COUNT_H
 
 /// Number of allocations that the calling thread has made with new, of any form but the aligned.
-int allocationCount();
+long allocationCount() noexcept;
 
 #endif

@@ -1,17 +1,19 @@
-#include "AllocationCount.h"
+#include "support/AllocationCount.h"
 
 #include <cstdlib>
 #include <new>
 
-// The program's operator new, which counts.
-
 namespace {
+
 thread_local long allocations = 0;
-}
+
+} // namespace
 
 long allocationCount() noexcept {
     return allocations;
 }
+
+// The replaceable allocation functions: the library's other forms come down to these.
 
 void* operator new(std::size_t size) {
     ++allocations;
