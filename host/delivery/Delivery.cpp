@@ -8,7 +8,6 @@
 
 #include <cinttypes>
 #include <utility>
-#include <variant>
 
 namespace zrm::host {
 
@@ -26,10 +25,10 @@ std::unique_ptr<History> openHistory(const HostConfig& config, std::string& prob
     const std::string& directory =
         config.history.directory.empty() ? config.stateDirectory : config.history.directory;
     auto opened = History::open(config.history, directory);
-    if (auto* const history = std::get_if<std::unique_ptr<History>>(&opened)) {
-        return std::move(*history);
+    if (opened) {
+        return std::move(*opened);
     }
-    problem = std::get<std::string>(opened);
+    problem = opened.error().text();
     say("the history is off: %s. Until the next start sinks receive events without it, and one "
         "that stays down stops the monitoring",
         problem.c_str());

@@ -53,8 +53,7 @@ class EntryRecorderTest : public testing::Test {
 protected:
     EntryRecorderTest() {
         TableManager::RegisterWithManager(&logs);
-        auto opened = History::open({}, directory.file("state"));
-        history = std::move(std::get<std::unique_ptr<History>>(opened));
+        history = std::move(History::open({}, directory.file("state")).value());
         recorder = std::make_unique<EntryRecorder>(*history);
     }
     ~EntryRecorderTest() override { Tables::clear(); }

@@ -1,6 +1,7 @@
 #include "host/history/HistoryDirectory.h"
 
 #include "support/Faults.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -28,12 +29,10 @@ constexpr const char* cure = "; make it a directory that the agent may write, or
 class HistoryDirectoryTest : public testing::Test {
 protected:
     static std::string problemOf(const std::string& path) {
-        auto opened = HistoryDirectory::open(path);
-        const auto* const problem = std::get_if<std::string>(&opened);
-        return problem == nullptr ? "" : *problem;
+        return reasonOf(HistoryDirectory::open(path));
     }
     static std::unique_ptr<HistoryDirectory> opened(const std::string& path) {
-        return std::get<std::unique_ptr<HistoryDirectory>>(HistoryDirectory::open(path));
+        return HistoryDirectory::open(path).value();
     }
 
     RecordingTrace trace{TRC1_ERROR};
@@ -134,7 +133,7 @@ TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
 TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
     const auto place = opened(path);
     std::filesystem::remove_all(path);
-    EXPECT_EQ(place->restore(), "");
+    EXPECT_EQ(reasonOf(place->restore()), "");
     EXPECT_TRUE(std::filesystem::exists(place->file()));
     const pid_t child = fork();
     if (child == 0) {
@@ -153,7 +152,7 @@ TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
         std::ofstream(place->file() + "-wal") << "more";
         std::ofstream(place->file() + "-shm") << "index";
         testing::internal::CaptureStderr();
-        EXPECT_EQ(place->moveAside("file is not a database"), "");
+        EXPECT_EQ(reasonOf(place->moveAside("file is not a database")), "");
         told.push_back(testing::internal::GetCapturedStderr());
         EXPECT_EQ(place->bytes(), 0u);
         EXPECT_TRUE(std::filesystem::exists(place->file()));
@@ -177,7 +176,7 @@ TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
 TEST_F(HistoryDirectoryTest, SaysWhyAFileCannotBeMovedAside) {
     const auto place = opened(path);
     std::filesystem::remove(place->file());
-    EXPECT_EQ(place->moveAside("why"),
+    EXPECT_EQ(reasonOf(place->moveAside("why")),
               "cannot move " + place->file() + " aside: No such file or directory");
 }
 

@@ -3,6 +3,7 @@
 #include "TestBatch.h"
 #include "host/history/Schema.h"
 #include "support/FaultyDisk.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "unit/host/events/TestEvents.h"
@@ -44,12 +45,11 @@ protected:
         testing::internal::CaptureStderr();
         auto opened = History::open(config, state);
         told = testing::internal::GetCapturedStderr();
-        problem.clear();
-        if (auto* const text = std::get_if<std::string>(&opened)) {
-            problem = *text;
+        problem = reasonOf(opened);
+        if (!opened) {
             return;
         }
-        history = std::move(std::get<std::unique_ptr<History>>(opened));
+        history = std::move(*opened);
         sink = history->source("key", "the sink");
         queue = std::make_unique<EventQueue>(100, sizeof(TestRow), history->newest());
         history->start(*queue, EventJson(testLayout()));
@@ -187,7 +187,7 @@ TEST_F(HistoryTest, ANewSinkBeginsWithTheNextEvent) {
     pushAndWait(5);
     close();
     auto opened = History::open(config, state);
-    history = std::move(std::get<std::unique_ptr<History>>(opened));
+    history = std::move(opened.value());
     EXPECT_EQ(history->source("other", "other")->backlog(), 0u);
     EXPECT_EQ(history->source("key", "the sink")->backlog(), 5u);
 }
