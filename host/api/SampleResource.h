@@ -4,11 +4,9 @@
 #include "host/api/SampleSource.h"
 #include "host/framework/Condition.h"
 #include "host/http/Message.h"
-#include "host/http/Problem.h"
 #include "host/http/Router.h"
 
 #include <string_view>
-#include <variant>
 #include <vector>
 
 namespace zrm::host {
@@ -17,10 +15,9 @@ namespace zrm::host {
 class SampleRequest {
 public:
     /// The conditions of {"filters": [{"column": .., "op": .., "value": ..}, ..]} on a table's
-    /// columns, or what is wrong with the body. A report on Log Entries must name its log and both
-    /// ends of its time window.
-    static std::variant<std::vector<Condition>, Problem> parse(std::string_view table,
-                                                               std::string_view body);
+    /// columns. A report on Log Entries must name its log and both ends of its time window. Throws
+    /// RequestRefused.
+    static std::vector<Condition> parse(std::string_view table, std::string_view body);
 };
 
 /// `POST /api/v1/tables/{table}/sample`: the rows of one sample of a table.

@@ -117,9 +117,9 @@ template <class Work> std::optional<HttpAnswer> problemOf(const HttpRequest& req
     try {
         return work();
     } catch (const RequestRefused& refused) {
-        const Problem& problem = refused.problem();
-        trace.detail()("Request for %s refused: %s.", request.path.c_str(), problem.detail.c_str());
-        return RequestDispatcher::answerOf(problem);
+        trace.detail()("Request for %s refused: %s.", request.path.c_str(),
+                       refused.problem().text().c_str());
+        return RequestDispatcher::answerOf(refused.refusal());
     } catch (const std::exception& exception) {
         trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
     }
@@ -168,21 +168,21 @@ RequestRefused RequestDispatcher::tooLong() {
     return {413, "the body has more than " + std::to_string(largestBody) + " bytes", "body"};
 }
 
-HttpAnswer RequestDispatcher::answerOf(const Problem& problem) {
-    HttpAnswer answer{problem.status, "application/problem+json", problem.json()};
-    if (problem.status == 401) {
+HttpAnswer RequestDispatcher::answerOf(const Refusal& refusal) {
+    HttpAnswer answer{refusal.status, "application/problem+json", refusal.json()};
+    if (refusal.status == 401) {
         answer.headers.emplace_back("WWW-Authenticate", "Bearer");
     }
     return answer;
 }
 
-HttpAnswer RequestDispatcher::refuse(const Problem& problem) {
-    m_statistics.count("", "", problem.status, {});
-    return answerOf(problem);
+HttpAnswer RequestDispatcher::refuse(const Refusal& refusal) {
+    m_statistics.count("", "", refusal.status, {});
+    return answerOf(refusal);
 }
 
-HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Problem& problem) {
-    HttpAnswer answer = answerOf(problem);
+HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Refusal& refusal) {
+    HttpAnswer answer = answerOf(refusal);
     count(admission, answer);
     return answer;
 }
@@ -221,8 +221,8 @@ RequestDispatcher::Admission RequestDispatcher::admit(IncomingRequest incoming) 
 
 void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission) {
     HttpRequest& request = incoming.request;
-    if (incoming.problem) {
-        throw RequestRefused(*incoming.problem);
+    if (incoming.refusal) {
+        throw RequestRefused(*incoming.refusal);
     }
     if (incoming.hasBody && !mayHaveBody(request.method)) {
         throw RequestRefused(400, "this method has no body", "");
@@ -230,8 +230,8 @@ void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission
     const Router::Match match = m_router.match(request.method, request.path);
     admission.route = match.pattern;
     const bool isPublic = match.handler != nullptr && match.access == Router::PUBLIC;
-    if (std::optional<Problem> problem = guard()->refuse(incoming.headers, isPublic)) {
-        throw RequestRefused(std::move(*problem));
+    if (const auto allowed = guard()->check(incoming.headers, isPublic); !allowed) {
+        throw RequestRefused(allowed.error());
     }
     if (match.handler == nullptr) {
         admission.refusal = unrouted(match);

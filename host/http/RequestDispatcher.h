@@ -83,16 +83,16 @@ public:
     HttpAnswer answer(Admission& admission);
 
     /// The answer to a request that was admitted and cannot be answered otherwise.
-    HttpAnswer refuse(const Admission& admission, const Problem& problem);
+    HttpAnswer refuse(const Admission& admission, const Refusal& refusal);
 
     /// The answer to a request of which not even the head could be read.
-    HttpAnswer refuse(const Problem& problem);
+    HttpAnswer refuse(const Refusal& refusal);
 
     /// What refuses a body that is too long.
     static RequestRefused tooLong();
 
     /// The answer that is a problem document.
-    static HttpAnswer answerOf(const Problem& problem);
+    static HttpAnswer answerOf(const Refusal& refusal);
 
     /// Lets no more requests be answered and waits for those under way, at most until the limit.
     void close(std::chrono::steady_clock::time_point limit) { m_active.close(limit); }

@@ -2,7 +2,7 @@
 #define ZRM_HOST_REQUEST_PARSER_H
 
 #include "host/http/Message.h"
-#include "host/http/Problem.h"
+#include "host/http/Refusal.h"
 #include "host/http/RequestGuard.h"
 
 #include <cstddef>
@@ -25,7 +25,7 @@ struct IncomingRequest {
     bool isHttp10 = false;             ///< the client does not know chunks
     bool waitsForContinue = false;     ///< the body comes when the client is asked for it
     std::optional<std::size_t> length; ///< of the body, where the client tells it
-    std::optional<Problem> problem;    ///< what makes the request unclear; none when nothing
+    std::optional<Refusal> refusal;    ///< what makes the request unclear; none when nothing
 };
 
 /// Reads one request as its bytes come in. A head that another reader, for example a proxy on the
@@ -60,8 +60,8 @@ public:
 
     /// Before the body: the largest one that is taken, in bytes.
     void limitBody(std::size_t most);
-    /// What is wrong with the body; none when nothing is.
-    const std::optional<Problem>& bodyProblem() const noexcept;
+    /// Why the body is refused; none when it is not.
+    const std::optional<Refusal>& bodyRefusal() const noexcept;
     /// The body, once, when the request is whole.
     std::string takeBody();
 

@@ -18,7 +18,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
             std::abort();
         }
     } catch (const RequestRefused& refused) {
-        if (refused.problem().status != 400 || refused.problem().detail.empty() ||
+        if (refused.refusal().status != 400 || refused.problem().what.empty() ||
             refused.problem().field.empty()) {
             std::abort();
         }

@@ -15,8 +15,8 @@ std::string refused(const std::string& body) {
     try {
         ReportRequest::parse(body);
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }

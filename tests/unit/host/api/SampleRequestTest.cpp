@@ -1,21 +1,24 @@
 #include "host/api/SampleResource.h"
 
+#include "host/http/RequestRefused.h"
+
 #include <gtest/gtest.h>
 
 #include <string>
+#include <vector>
 
 using namespace zrm::host;
 
 namespace {
 
 std::string refused(const std::string& body, const char* table = "RMMONLOG") {
-    const auto result = SampleRequest::parse(table, body);
-    const auto* const problem = std::get_if<Problem>(&result);
-    if (problem == nullptr) {
-        return "accepted";
+    try {
+        SampleRequest::parse(table, body);
+    } catch (const RequestRefused& refusal) {
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
-    EXPECT_EQ(problem->status, 400);
-    return problem->field + ": " + problem->detail;
+    return "accepted";
 }
 
 std::string filter(const std::string& inner) {
@@ -23,13 +26,11 @@ std::string filter(const std::string& inner) {
 }
 
 TEST(SampleRequest, ReadsFilters) {
-    const auto result = SampleRequest::parse(
+    const std::vector<Condition> conditions = SampleRequest::parse(
         "RMMONLOG", R"({"filters":[{"column":"LOGNAME","op":"starts","value":"auth"},
                                    {"column":"LOGSIZE","op":">=","value":5},
                                    {"column":"LOGTYPE","op":"in","value":["S","U"]},
                                    {"column":"MONTIME","op":"<","value":"2026-11-20T07:03:09"}]})");
-    ASSERT_TRUE(std::holds_alternative<std::vector<Condition>>(result));
-    const auto& conditions = std::get<std::vector<Condition>>(result);
     ASSERT_EQ(conditions.size(), 4u);
     EXPECT_EQ(conditions[0].op, INTF_STARTS);
     EXPECT_EQ(conditions[0].text, "auth");

@@ -1,5 +1,6 @@
 #include "host/http/Credentials.h"
 
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -38,7 +39,7 @@ protected:
     /// What comes of looking until a change is noticed, or three times.
     static Credentials::Change look(Credentials& credentials) {
         Credentials::Change change;
-        for (int count = 0; count < 3 && !change.isNew && change.problem.empty(); ++count) {
+        for (int count = 0; count < 3 && !change.isNew && !change.problem; ++count) {
             change = credentials.refresh();
         }
         return change;
@@ -47,7 +48,7 @@ protected:
         for (int count = 0; count < 3; ++count) {
             const Credentials::Change change = credentials.refresh();
             EXPECT_FALSE(change.isNew);
-            EXPECT_EQ(change.problem, "");
+            EXPECT_FALSE(change.problem);
         }
     }
 
@@ -60,7 +61,7 @@ protected:
 
 TEST_F(CredentialsTest, TakesAChangedToken) {
     Credentials credentials(token, "", "");
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     EXPECT_TRUE(credentials.token().matches(first));
     EXPECT_EQ(credentials.tls(), nullptr);
     expectNothingNew(credentials);
@@ -73,9 +74,9 @@ TEST_F(CredentialsTest, TakesAChangedToken) {
 
 TEST_F(CredentialsTest, ATokenThatCannotBeUsedIsReportedOnce) {
     Credentials credentials(token, "", "");
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     writeToken("short");
-    EXPECT_THAT(look(credentials).problem,
+    EXPECT_THAT(look(credentials).problem.value().text(),
                 testing::StartsWith("the previous token stays in use: " + token));
     EXPECT_TRUE(credentials.token().matches(first));
     expectNothingNew(credentials);
@@ -88,7 +89,7 @@ TEST_F(CredentialsTest, TakesAChangedCertificate) {
     take(certificate);
     take(key);
     Credentials credentials(token, certificate, key);
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     const auto before = credentials.tls();
     EXPECT_TRUE(before->isFor("one.example"));
     makePair("two.example");
@@ -106,10 +107,10 @@ TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
     take(certificate);
     take(key);
     Credentials credentials(token, certificate, key);
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     directory.write("agent.pem", "nonsense");
     EXPECT_THAT(
-        look(credentials).problem,
+        look(credentials).problem.value().text(),
         testing::StartsWith("the previous certificate stays in use: cannot use the certificate " +
                             certificate));
     EXPECT_TRUE(credentials.tls()->isFor("one.example"));
@@ -122,10 +123,10 @@ TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
 }
 
 TEST_F(CredentialsTest, WithoutAUsableFileThereIsAProblemAtOnce) {
-    EXPECT_THAT(Credentials(token, certificate, key).load(),
+    EXPECT_THAT(reasonOf(Credentials(token, certificate, key).load()),
                 testing::StartsWith("cannot use the certificate"));
     writeToken("short");
-    EXPECT_THAT(Credentials(token, "", "").load(),
+    EXPECT_THAT(reasonOf(Credentials(token, "", "").load()),
                 testing::StartsWith(token + " does not contain a token"));
 }
 

@@ -3,6 +3,7 @@
 #include "host/http/HttpServer.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
 #include "unit/host/http/TestClient.h"
@@ -43,7 +44,7 @@ protected:
             router.add(method, "/answer",
                        [this](const HttpRequest& request) { return handle(request); });
         }
-        ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     }
     /// Gives the answer that the test has set.
     HttpAnswer handle(const HttpRequest& request) {
@@ -137,7 +138,7 @@ TEST_F(HttpConnectionTest, ARequestIsReadAsItWasSent) {
         return HttpAnswer::json("{}");
     });
     HttpServer another(other);
-    ASSERT_EQ(another.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+    ASSERT_EQ(reasonOf(another.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     TestClient asking("127.0.0.1", another.port(), secret);
     EXPECT_EQ(asking
                   .get("/a/x%2Fy%25?b=1%202&b=%26",
@@ -368,7 +369,7 @@ TEST(HttpConnection, WhoGetsNoWorkerIsToldSoAndOthersAreServedMeanwhile) {
         "GET", "/quick", [](const HttpRequest&) { return HttpAnswer::json("{}"); }, Router::TOKEN,
         Router::QUICK);
     HttpServer server(router, {.workers = 1, .quickWorkers = 1});
-    ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+    ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     const auto ask = [&](const std::string& path) {
         return TestClient("127.0.0.1", server.port(), secret).get(path);
     };

@@ -4,6 +4,7 @@
 #include "host/api/SampleResource.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
 #include "unit/host/http/TestClient.h"
@@ -60,7 +61,7 @@ protected:
         HealthResource().addRoutes(router);
         samples.addRoutes(router);
         std::signal(SIGPIPE, SIG_IGN); // the agent's threads block it
-        ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     }
 
     using Reply = std::optional<TestClient::Reply>;
@@ -260,11 +261,11 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
 
 TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
     HttpServer second(router);
-    EXPECT_EQ(second.start({"127.0.0.1", server.port()}, ApiToken(secret)),
+    EXPECT_EQ(reasonOf(second.start({"127.0.0.1", server.port()}, ApiToken(secret))),
               "cannot listen on 127.0.0.1:" + std::to_string(server.port()) +
                   ": is another agent running?");
     HttpServer elsewhere(router);
-    EXPECT_EQ(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret)),
+    EXPECT_EQ(reasonOf(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret))),
               "cannot listen on 203.0.113.1:0");
 }
 
@@ -358,7 +359,7 @@ TEST(HttpServerLife, ListensOnIpv6AndByName) {
     RecordingTrace trace(0);
     for (const char* const host : {"::1", "localhost"}) {
         HttpServer server(router);
-        ASSERT_EQ(server.start({host, 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({host, 0}, ApiToken(secret))), "");
         TestClient client(host, server.port());
         const auto result = client.get("/healthz");
         ASSERT_TRUE(result) << host;

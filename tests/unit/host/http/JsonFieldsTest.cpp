@@ -23,8 +23,8 @@ std::string refused(const std::string& body, const std::function<void(JsonFields
         read(fields);
         fields.refuseUnknown();
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }

@@ -29,8 +29,8 @@ std::string refused(std::multimap<std::string, std::string> query,
         read(fields);
         fields.refuseUnknown();
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }

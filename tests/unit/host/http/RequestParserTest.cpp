@@ -25,7 +25,7 @@ IncomingRequest read(const std::string& head) {
     }
     EXPECT_TRUE(slow.isHeadDone()) << head;
     const IncomingRequest same = slow.takeHead();
-    EXPECT_EQ(same.problem.has_value(), incoming.problem.has_value()) << head;
+    EXPECT_EQ(same.refusal.has_value(), incoming.refusal.has_value()) << head;
     EXPECT_EQ(same.request.path, incoming.request.path);
     EXPECT_EQ(same.length, incoming.length);
     return incoming;
@@ -33,7 +33,7 @@ IncomingRequest read(const std::string& head) {
 
 int statusOf(const std::string& head) {
     const IncomingRequest incoming = read(head);
-    return incoming.problem ? incoming.problem->status : 200;
+    return incoming.refusal ? incoming.refusal->status : 200;
 }
 
 TEST(RequestParserTest, TakesARequestApart) {
@@ -41,7 +41,7 @@ TEST(RequestParserTest, TakesARequestApart) {
         read("GET /a/b%20c?x=1&y=%2F#end HTTP/1.1\r\nhost:h:1\r\nORIGIN: http://h:1\r\n"
              "Authorization: \t Bearer a%41+b \t\r\nAccept: text/html\r\n"
              "Last-Event-ID: 7\r\nX-Empty:\r\nX-Twice: 1\r\nX-Twice: 2");
-    EXPECT_FALSE(incoming.problem);
+    EXPECT_FALSE(incoming.refusal);
     EXPECT_EQ(incoming.request.method, "GET");
     EXPECT_EQ(incoming.request.path, "/a/b%20c");
     EXPECT_EQ(incoming.rawQuery, "x=1&y=%2F");
@@ -71,7 +71,7 @@ TEST(RequestParserTest, ABodyHasALengthOrComesInChunks) {
     EXPECT_EQ(withLength.length, 12u);
     EXPECT_FALSE(withLength.isChunked || withLength.isLast);
     const IncomingRequest empty = read(post + "Content-Length: 0");
-    EXPECT_FALSE(empty.hasBody || empty.problem);
+    EXPECT_FALSE(empty.hasBody || empty.refusal);
     const IncomingRequest chunked = read(post + "Transfer-Encoding: chunked");
     EXPECT_TRUE(chunked.hasBody && chunked.isChunked);
     EXPECT_TRUE(chunked.isLast) << "nothing behind chunks is taken for a request";
@@ -114,8 +114,8 @@ TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
          {"host", "Origin", "Authorization", "Content-Type", "Last-Event-ID"}) {
         const IncomingRequest twice =
             read(std::string("GET / HTTP/1.1\r\n") + name + ": 1\r\n" + name + ": 1");
-        ASSERT_TRUE(twice.problem) << name;
-        EXPECT_EQ(twice.problem->detail, "the header appears more than once");
+        ASSERT_TRUE(twice.refusal) << name;
+        EXPECT_EQ(twice.refusal->problem.what, "the header appears more than once");
     }
 }
 
@@ -151,10 +151,10 @@ TEST(RequestParserTest, BoundsHeads) {
     RequestParser endless;
     endless.put(begin + "X: " + std::string(RequestParser::largestHead, 'x'));
     ASSERT_TRUE(endless.isHeadDone()) << "its end is not waited for";
-    EXPECT_EQ(endless.takeHead().problem->status, 431);
+    EXPECT_EQ(endless.takeHead().refusal->status, 431);
     RequestParser target;
     target.put("GET /" + std::string(RequestParser::largestHead, 'x'));
-    EXPECT_EQ(target.takeHead().problem->status, 431);
+    EXPECT_EQ(target.takeHead().refusal->status, 431);
     EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing reads it";
 }
 
@@ -184,7 +184,7 @@ Body readBody(const std::string& header, std::string bytes, std::size_t most = 1
         }
     }
     Body body;
-    body.status = parser.bodyProblem() ? parser.bodyProblem()->status : 200;
+    body.status = parser.bodyRefusal() ? parser.bodyRefusal()->status : 200;
     body.isDone = parser.isDone();
     body.rest = waiting;
     body.text = body.isDone ? parser.takeBody() : "";

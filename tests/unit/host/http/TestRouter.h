@@ -36,8 +36,8 @@ public:
         try {
             return (*match.handler)(request);
         } catch (const RequestRefused& refused) {
-            return {refused.problem().status, "",
-                    refused.problem().field + ": " + refused.problem().detail};
+            return {refused.refusal().status, "",
+                    refused.problem().field + ": " + refused.problem().text()};
         }
     }
 

@@ -1,4 +1,4 @@
-#include "host/http/Problem.h"
+#include "host/http/Refusal.h"
 
 #include "host/base/SteeringText.h"
 
@@ -33,17 +33,17 @@ constexpr std::array<std::pair<int, const char*>, 16> titles = {{
 
 } // namespace
 
-std::string Problem::json() const {
+std::string Refusal::json() const {
     const auto title = std::find_if(titles.begin(), titles.end(),
                                     [&](const auto& known) { return known.first == status; });
     nlohmann::ordered_json document = {
         {"type", "about:blank"},
         {"title", title == titles.end() ? "Error" : title->second},
         {"status", status},
-        {"detail", detail},
+        {"detail", problem.text()},
     };
-    if (!field.empty()) {
-        document["field"] = field;
+    if (!problem.field.empty()) {
+        document["field"] = problem.field;
     }
     // A detail may quote what the client sent: bytes that are not UTF-8 are replaced, and what
     // steers a terminal is escaped.
