@@ -7,6 +7,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <memory>
@@ -192,7 +193,10 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     std::string again;
     std::jthread reader([&] {
         const Socket second(listener);
-        while (again.find(frame(delivered + 9)) == std::string::npos) {
+        const std::string last = frame(delivered + 9);
+        std::size_t searched = 0;
+        while (again.find(last, searched) == std::string::npos) {
+            searched = again.size() - std::min(again.size(), last.size());
             const std::string some = second.readSome();
             if (some.empty()) {
                 return;
@@ -269,7 +273,7 @@ TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
     });
     const Clock::time_point begin = Clock::now();
     EXPECT_EQ(deliver(sink, 0, events.records().size()), 0u);
-    EXPECT_LT(Clock::now() - begin, 10s);
+    EXPECT_LT(Clock::now() - begin, 50s) << "it did not wait for its own limit";
     EXPECT_EQ(sink.error(),
               "the agent is stopping (127.0.0.1:" + std::to_string(listener.port) + ")");
 }
