@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstdint>
 
 using namespace zrm;
 
@@ -77,6 +78,15 @@ TEST(PrintDirective, IsTheTypesDefaultWhenNoneIsGiven) {
     EXPECT_STREQ(ParserProbe("A,\"%i\",day").next()->printDirective(), "%d");
     EXPECT_STREQ(ParserProbe("A,\"%5c\",day").next()->printDirective(), "%s");
     EXPECT_STREQ(StringParser::convertType2Char(static_cast<_DataType>(38)), "");
+}
+
+TEST(PrintDirective, TheTextOfATypeIsTheResultOfAnOperation) {
+    const RecordingTrace trace(TRC1_FLOW);
+    const char* const text = StringParser::convertType2Char(DATATYPE_LONGx);
+    EXPECT_THAT(trace.events(),
+                ElementsAre("StringParser.cpp entry",
+                            "StringParser.cpp exit " +
+                                std::to_string(reinterpret_cast<std::intptr_t>(text))));
 }
 
 TEST(PrintDirective, KeepsTextConversionAndText) {
