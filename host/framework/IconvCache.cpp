@@ -1,6 +1,6 @@
 #include "host/framework/IconvCache.h"
 
-#include "host/framework/ScopeGuards.h"
+#include "host/framework/CancellationOff.h"
 
 namespace zrm::host {
 

@@ -1,7 +1,7 @@
 // The host's implementation of trace.h.
 #include "framework/trace.h"
 
-#include "host/framework/ScopeGuards.h"
+#include "host/framework/CancellationOff.h"
 #include "host/framework/TraceCapture.h"
 #include "host/framework/TraceControl.h"
 #include "host/framework/TraceOutput.h"

@@ -1,7 +1,7 @@
 #include "host/framework/Audience.h"
 
+#include "base/LockGuard.h"
 #include "host/framework/Request.h"
-#include "host/framework/ScopeGuards.h"
 #include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
@@ -13,6 +13,7 @@
 #include <memory>
 #include <random>
 
+using namespace zrm;
 using namespace zrm::host;
 
 namespace {

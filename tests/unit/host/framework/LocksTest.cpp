@@ -1,6 +1,6 @@
 #include "framework/locks.h"
 
-#include "host/framework/ScopeGuards.h"
+#include "base/LockGuard.h"
 #include "support/Faults.h"
 
 #include <gtest/gtest.h>
@@ -9,7 +9,7 @@
 #include <thread>
 #include <vector>
 
-using namespace zrm::host;
+using namespace zrm;
 
 namespace {
 

@@ -1,9 +1,9 @@
 #include "host/framework/Request.h"
 
+#include "base/LockGuard.h"
 #include "framework/values.h"
 #include "host/framework/RequestState.h"
 #include "host/framework/Sample.h"
-#include "host/framework/ScopeGuards.h"
 #include "host/framework/Tables.h"
 #include "unit/host/framework/TestTable.h"
 
@@ -13,6 +13,7 @@
 #include <atomic>
 #include <thread>
 
+using namespace zrm;
 using namespace zrm::host;
 
 namespace {

@@ -1,7 +1,7 @@
 #include "host/situations/SituationRunner.h"
 
+#include "base/LockGuard.h"
 #include "host/events/EventQueue.h"
-#include "host/framework/ScopeGuards.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "support/RecordingTrace.h"
 #include "tables/zrm_rmlogent_manager.h"

@@ -1,23 +1,9 @@
-#ifndef ZRM_HOST_SCOPE_GUARDS_H
-#define ZRM_HOST_SCOPE_GUARDS_H
-
-#include "framework/locks.h"
+#ifndef ZRM_HOST_CANCELLATION_OFF_H
+#define ZRM_HOST_CANCELLATION_OFF_H
 
 #include <pthread.h>
 
 namespace zrm::host {
-
-/// Holds a lock of the framework for a scope.
-class LockGuard {
-public:
-    explicit LockGuard(SYS1_Lock* lock) : m_lock(lock) { SYS1_GetLock(m_lock); }
-    ~LockGuard() { SYS1_ReleaseLock(m_lock); }
-    LockGuard(const LockGuard&) = delete;
-    LockGuard& operator=(const LockGuard&) = delete;
-
-private:
-    SYS1_Lock* m_lock;
-};
 
 /// While it lives, the calling thread is not cancelled. Operations that must not be unwound, since
 /// they are declared not to throw, put one around the system calls that are cancellation points.
