@@ -112,6 +112,14 @@ std::vector<std::string> LogManagerFixture::messages() const {
     return all;
 }
 
+std::FILE* LogManagerFixture::debugLogStream() {
+    class Log : public LogFile {
+    public:
+        using LogFile::m_debugLog;
+    };
+    return Log::m_debugLog;
+}
+
 bool LogManagerFixture::waitUntil(const std::function<bool()>& condition) {
     const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
     while (!condition()) {

@@ -10,6 +10,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <functional>
 #include <memory>
 #include <string>
@@ -48,6 +49,8 @@ protected:
     std::vector<std::string> messagesThatBegin(const std::vector<std::string>& beginnings) const;
     /// The recorded messages but for state dumps, which begin with a newline.
     std::vector<std::string> messages() const;
+    /// The debug log that the manager has opened for the logs, or null.
+    static std::FILE* debugLogStream();
     static bool waitUntil(const std::function<bool()>& condition);
 
     TemporaryDirectory directory;

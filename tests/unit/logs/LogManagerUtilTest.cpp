@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <cstring>
 #include <string>
 #include <vector>
@@ -198,6 +199,17 @@ TEST_F(LogManagerUtilTest, TheHexadecimalDumpIsAlwaysEmpty) {
     EXPECT_STREQ(out, "");
     out[0] = 'x';
     EXPECT_STREQ(LogManagerUtil::xtoa(out, &word, 0), "");
+}
+
+TEST_F(LogManagerUtilTest, TheHexadecimalDumpIsAnOperationThatReturnsItsBuffer) {
+    trace.setLevel(TRC1_FLOW);
+    char out[9];
+    const unsigned word = 0xDEADBEEF;
+    LogManagerUtil::xtoa(out, &word, sizeof word);
+    EXPECT_THAT(trace.events(),
+                ElementsAre("LogManagerUtil.cpp entry",
+                            "LogManagerUtil.cpp exit " +
+                                std::to_string(reinterpret_cast<std::intptr_t>(out))));
 }
 
 } // namespace

@@ -48,7 +48,7 @@ TEST_F(LastLinesTest, ReadsNoMoreThanItsLimitAndNoBrokenLine) {
     }
     const auto lines = read("y" + text, 5000);
     ASSERT_TRUE(lines);
-    EXPECT_EQ(lines->size(), LastLines::defaultMostBytes / 1024 - 1);
+    EXPECT_EQ(lines->size(), LastLines::defaultByteLimit / 1024 - 1);
     for (const std::string& one : *lines) {
         ASSERT_EQ(one, line);
     }
