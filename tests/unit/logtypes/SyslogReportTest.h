@@ -4,7 +4,6 @@
 #include "SyslogTest.h"
 
 #include "logs/RequestThresholds.h"
-#include "logtypes/SyslogBufferInfo.h"
 
 #include <cstring>
 #include <string>

@@ -5,8 +5,7 @@
 
 #include "base/ProcessValues.h"
 #include "logs/RequestThresholds.h"
-#include "logtypes/EntryTimeBuffers.h"
-#include "logtypes/UserlogBufferInfo.h"
+#include "logtypes/EntryTime.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
 #include "support/LocaleDouble.h"

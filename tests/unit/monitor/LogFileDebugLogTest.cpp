@@ -1,6 +1,5 @@
 #include "OpenDebugLog.h"
 #include "TestLog.h"
-#include "monitor/DebugLogLoss.h"
 
 #include <gmock/gmock.h>
 
@@ -147,12 +146,12 @@ TEST_F(DebugLog, RecordsThatAFullDiskCutsAreReportedOnceAndCounted) {
     m_openDebugLog.emplace("/dev/full");
     TestLog log(*m_debugged);
     RecordingTrace trace(TRC1_ERROR);
-    const std::uint64_t before = DebugLogLoss::records();
+    const std::uint64_t before = LogFile::incompleteDebugRecords();
     const std::string row(500, 'r');
     for (int number = 0; number < 10; ++number) {
         log.writeToDebugLog("line\n", 5, row.data(), row.size());
     }
-    EXPECT_EQ(DebugLogLoss::records() - before, 10u);
+    EXPECT_EQ(LogFile::incompleteDebugRecords() - before, 10u);
     const auto messages = trace.messages();
     EXPECT_EQ(std::count(messages.begin(), messages.end(),
                          "The debug log does not take whole records.  errno = 28; No space left on "
@@ -161,7 +160,7 @@ TEST_F(DebugLog, RecordsThatAFullDiskCutsAreReportedOnceAndCounted) {
     m_openDebugLog.reset();
     m_openDebugLog.emplace(m_debugLog);
     log.writeToDebugLog("line\n", 5, nullptr, 0);
-    EXPECT_EQ(DebugLogLoss::records() - before, 10u) << "it takes whole records again";
+    EXPECT_EQ(LogFile::incompleteDebugRecords() - before, 10u) << "it takes whole records again";
 }
 
 TEST_F(DebugLog, EveryPieceOfALineIsCopiedWithItsRowOrWithoutOne) {

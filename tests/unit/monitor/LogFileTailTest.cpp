@@ -24,10 +24,10 @@ class Tail : public MonitoredFile {
 protected:
     void open() {
         m_log.openLogAndSeek();
-        ASSERT_NE(m_log.stream(), nullptr);
+        ASSERT_NE(m_log.reader(), nullptr);
     }
     ~Tail() override {
-        if (m_log.stream() != nullptr) {
+        if (m_log.reader() != nullptr) {
             m_log.closeLog();
         }
     }
@@ -55,10 +55,11 @@ TEST_F(Tail, OpensAtThePresentEnd) {
     append("before\n");
     open();
     EXPECT_EQ(m_log.eof(), 7);
-    EXPECT_EQ(m_log.fd(), fileno(m_log.stream()));
-    EXPECT_EQ(fcntl(m_log.fd(), F_GETFD, 0) & FD_CLOEXEC, FD_CLOEXEC);
+    const int fd = m_log.fd();
+    EXPECT_EQ(fcntl(fd, F_GETFD, 0), FD_CLOEXEC);
     m_log.closeLog();
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(fcntl(fd, F_GETFD, 0), -1);
+    EXPECT_EQ(m_log.reader(), nullptr);
     EXPECT_EQ(m_log.fd(), -1);
     EXPECT_EQ(m_log.eof(), -1);
 }
@@ -72,7 +73,7 @@ TEST_F(Tail, ALogThatCannotBeOpenedHasItsStatus) {
     EXPECT_THAT(trace.messages(),
                 ElementsAre("Error opening file " + m_path + ".  errno = 13; Permission denied"));
     EXPECT_EQ(m_log.monitorStatus(), MONITOR_ERR_OPEN);
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(m_log.reader(), nullptr);
 }
 
 TEST_F(Tail, ALogThatCannotBeSoughtIsClosed) {
@@ -84,7 +85,7 @@ TEST_F(Tail, ALogThatCannotBeSoughtIsClosed) {
     EXPECT_THAT(trace.messages(), ElementsAre("Error while seeking EOF for file " + m_path +
                                               ".  errno = 29; Illegal seek"));
     EXPECT_EQ(m_log.monitorStatus(), MONITOR_ERR_SEEK_EOF);
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(m_log.reader(), nullptr);
     EXPECT_EQ(m_log.fd(), -1);
     EXPECT_EQ(m_log.eof(), -1);
 }

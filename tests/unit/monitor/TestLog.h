@@ -46,6 +46,7 @@ public:
     using LogFile::lockLog;
     using LogFile::openLogAndSeek;
     using LogFile::openLogForReport;
+    using LogFile::ownRow;
     using LogFile::unlockDebugFile;
     using LogFile::unlockLog;
     using LogFile::waitForEventLoop;
@@ -55,7 +56,8 @@ public:
     void follow();
     std::int64_t eof() const { return LogEOF; }
     int fd() const { return LogFD; }
-    std::FILE* stream() const { return LogFileP; }
+    /// What reads the log; null while it is closed.
+    const LineReader* reader() const { return LogFileP; }
     pthread_mutex_t& lock() const { return LogLock; }
     std::int64_t blockSize() const { return OptimumBlockSize; }
     void setBlockSize(std::int64_t size) { OptimumBlockSize = size; }
