@@ -31,7 +31,7 @@ LogManagerFixture::~LogManagerFixture() {
     unsetenv("ZRM_CONFIG_FILE");
     unsetenv("ZRM_SYSLOG_CONF");
     unsetenv("AGENT_DEBUG_LOG");
-    // A signal that the manager no longer took must not reach the test program.
+    // A signal that the manager did not consume must not reach the test program.
     sigset_t pending;
     while (sigpending(&pending) == 0 && sigismember(&pending, SIGHUP) == 1) {
         sigset_t hangup;

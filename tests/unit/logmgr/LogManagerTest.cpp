@@ -65,7 +65,7 @@ TEST_F(LogManagerTest, HasDefaultsForAnUnsetEnvironment) {
                 Contains(HasSubstr("SyslogConfFile\t\t\t= \"/etc/syslog.conf\"")));
 }
 
-TEST_F(LogManagerTest, TakesEmptyEnvironmentVariablesForUnset) {
+TEST_F(LogManagerTest, TreatsEmptyEnvironmentVariablesAsUnset) {
     for (const char* name : {"ZRM_CONFIG_FILE", "ZRM_SYSLOG_CONF", "AGENT_DEBUG_LOG"}) {
         setenv(name, "", 1);
     }
@@ -108,7 +108,7 @@ TEST_F(LogManagerTest, TracesTheStartOfItsMutexAndConditions) {
                             "Log manager unlocked."));
 }
 
-TEST_F(LogManagerTest, TracesNoErrorInASoundLife) {
+TEST_F(LogManagerTest, TracesNoErrorIfNothingFails) {
     trace.setLevel(TRC1_ERROR);
     configure(a + "\n");
     manager = std::make_unique<LogManager>();
@@ -120,7 +120,7 @@ TEST_F(LogManagerTest, TracesNoErrorInASoundLife) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(LogManagerTest, GoesOnWhereItsThreadCannotBeMadeJoinable) {
+TEST_F(LogManagerTest, ContinuesIfItsThreadCannotBeMadeJoinable) {
     trace.setLevel(TRC1_ERROR);
     Fault fault("pthread_attr_setdetachstate", EINVAL);
     configure(a + "\n");
@@ -164,7 +164,7 @@ TEST_F(LogManagerTest, DumpsAllFieldsWhateverTheLevel) {
     manager->endRequest();
 }
 
-TEST_F(LogManagerTest, BothTimesOfTheDumpAreTheSyslogConfigurations) {
+TEST_F(LogManagerTest, BothDumpedTimesAreThatOfTheSyslogConfiguration) {
     configure("# empty\n");
     configureSyslog("*.err " + a + "\n");
     start();
@@ -232,7 +232,7 @@ TEST_F(LogManagerTest, TracesAFailedBroadcast) {
                 ElementsAre("Error signaling condition variable. errno = 22; Invalid argument"));
 }
 
-TEST_F(LogManagerTest, EachSampleMaySayThatTheServerIsUp) {
+TEST_F(LogManagerTest, TheServerMayBeReportedUpMoreThanOnce) {
     configure(a + "\n");
     start();
     trace.clear();
@@ -268,7 +268,7 @@ TEST_F(LogManagerTest, AnEmptyManagerHasNoLogs) {
     manager->setServerUp();
 }
 
-TEST_F(LogManagerTest, AChainOfThreeGivesEachLogOnce) {
+TEST_F(LogManagerTest, AChainOfThreeReturnsEachLogOnce) {
     configure(a + "\n" + b + "\n" + c + "\n");
     start();
     EXPECT_THAT(logs(), ElementsAre(a, b, c));

@@ -1,4 +1,4 @@
-// A log's own row is, after each entry, what any other row is after the same entry.
+// After each entry, a log's own row equals any other row built from the same entry.
 
 #include "TestLog.h"
 
@@ -16,7 +16,7 @@ std::string bytesOf(const zrm_rmlogent_data_t& row) {
 class EntryRowTest : public MonitoredFile {
 protected:
     zrm_rmlogent_data_t* own() { return m_log.ownRow(); }
-    /// A row with common columns and blank ones, by the log's own means.
+    /// A row with the common columns filled by the log and all others blank.
     zrm_rmlogent_data_t blankRow() const {
         zrm_rmlogent_data_t row;
         std::memset(&row, ' ', sizeof row);
@@ -64,7 +64,7 @@ struct Entry {
     }
 };
 
-TEST_F(EntryRowTest, BeginsWithCommonColumnsAlone) {
+TEST_F(EntryRowTest, BeginsWithOnlyTheCommonColumnsFilled) {
     zrm_rmlogent_data_t other;
     std::memset(&other, '#', sizeof other);
     for (zrm_rmlogent_data_t* const place : {own(), &other}) {
@@ -75,7 +75,7 @@ TEST_F(EntryRowTest, BeginsWithCommonColumnsAlone) {
     }
 }
 
-TEST_F(EntryRowTest, TheOwnRowIsAsAnyOtherAfterAnyEntries) {
+TEST_F(EntryRowTest, TheOwnRowEqualsAnyOtherAfterRandomEntries) {
     for (int i = 0; i < 5000 && !HasFailure(); ++i) {
         const Entry entry{.letter = static_cast<char>('a' + random(25)),
                           .isRejected = random(5) == 0,

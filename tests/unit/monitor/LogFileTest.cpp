@@ -19,7 +19,7 @@ using testing::IsEmpty;
 
 class LogFileTest : public MonitoredFile {
 protected:
-    /// Two records: that of LogBase, here only by its beginning, and that of LogFile.
+    /// Expects two records: the beginning of that of LogBase, and that of LogFile.
     void expectDump(const std::vector<std::string>& messages, std::size_t at,
                     const std::string& record) {
         ASSERT_GE(messages.size(), at + 2);
@@ -210,7 +210,7 @@ TEST_F(LogFileTest, RunsFromStartToStop) {
     EXPECT_EQ(log.reader(), nullptr);
     EXPECT_EQ(log.fd(), -1);
     EXPECT_EQ(log.eof(), -1);
-    log.stopThread(); // joined already
+    log.stopThread(); // already joined
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
 }
 
@@ -223,7 +223,7 @@ TEST_F(LogFileTest, StoppingANeverStartedLogLeavesItNotStarted) {
     EXPECT_EQ(counter.calls(), 0);
 }
 
-TEST_F(LogFileTest, AThreadAttributeThatCannotBeSetIsNoObstacle) {
+TEST_F(LogFileTest, AThreadAttributeThatCannotBeSetDoesNotPreventTheStart) {
     TestLog log(*m_line);
     RecordingTrace trace(TRC1_DETAIL);
     const Fault fault("pthread_attr_setdetachstate", EINVAL);
@@ -256,7 +256,7 @@ TEST_F(LogFileTest, ARestartThatFailsCanBeStoppedAndTriedAgain) {
     log.stopThread();
     {
         const Fault fault("pthread_create", EAGAIN);
-        log = *m_line; // joins nothing that was joined before
+        log = *m_line; // does not join the old thread again
     }
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
     log = *m_line;
@@ -417,11 +417,11 @@ TEST_F(CommonColumns, AreCutAtTheirWidths) {
     EXPECT_EQ(columnText(row.ulogpath), path.substr(0, 768));
     EXPECT_EQ(columnText(row.logname), name.substr(0, 128));
     EXPECT_EQ(columnText(row.ulogname), name);
-    EXPECT_EQ(columnText(row.entrytime), ""); // behind LOGNAME
-    EXPECT_EQ(columnText(row.uentrysrc), ""); // behind ULOGNAME
+    EXPECT_EQ(columnText(row.entrytime), ""); // after LOGNAME
+    EXPECT_EQ(columnText(row.uentrysrc), ""); // after ULOGNAME
 }
 
-TEST_F(CommonColumns, HoldAFullSystemNameAndNone) {
+TEST_F(CommonColumns, HoldAFullSystemNameOrNone) {
     char full[65];
     std::memset(full, 'x', 64);
     full[64] = '\0';
