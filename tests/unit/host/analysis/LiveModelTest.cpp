@@ -246,7 +246,7 @@ protected:
     EventQueue::Reader reader = queue.addReader();
 };
 
-TEST_F(LiveModel, AReplaySaysWhatMonitoringDoes) {
+TEST_F(LiveModel, AReplayAgreesWithMonitoring) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

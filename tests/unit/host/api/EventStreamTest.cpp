@@ -121,7 +121,7 @@ protected:
     TestRouter router{stream};
 };
 
-TEST_F(EventStreamTest, GivesWhatIsNewFromNowOn) {
+TEST_F(EventStreamTest, SendsOnlyNewEvents) {
     history.add(1);
     const HttpAnswer answer = open();
     EXPECT_EQ(answer.status, 200);
@@ -135,7 +135,7 @@ TEST_F(EventStreamTest, GivesWhatIsNewFromNowOn) {
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(3));
 }
 
-TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
+TEST_F(EventStreamTest, ContinuesAfterTheClientsLastEvent) {
     for (std::uint64_t id = 1; id <= 500; ++id) {
         history.add(id);
     }
@@ -155,7 +155,7 @@ TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
     EXPECT_TRUE(beyond.gets(message(501)));
 }
 
-TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
+TEST_F(EventStreamTest, SendsOnlyTheRequestedKinds) {
     Client client(open("?situation=a&situation=b"));
     EXPECT_TRUE(client.gets("retry: 2000\n\n"));
     history.add(1, "c");
@@ -166,7 +166,7 @@ TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(4));
 }
 
-TEST_F(EventStreamTest, TellsThatItIsAlive) {
+TEST_F(EventStreamTest, SendsKeepAlives) {
     EventStream often(&history, 20ms);
     const TestRouter asked(often);
     Client client(asked.ask("GET", "/api/v1/events/stream"));
@@ -186,7 +186,7 @@ TEST_F(EventStreamTest, EndsWhenTheClientHasGone) {
     EXPECT_TRUE(another.gets(message(1)));
 }
 
-TEST_F(EventStreamTest, AClientThatIsNotReadyGetsNothingAndHoldsNobodyUp) {
+TEST_F(EventStreamTest, AClientThatIsNotReadyGetsNothingAndDelaysNobody) {
     Client slow(open(), false);
     Client quick(open());
     for (int id = 1; id <= 3; ++id) {
@@ -220,7 +220,7 @@ TEST_F(EventStreamTest, TheEndOfTheResourceEndsEveryStream) {
     EXPECT_TRUE(tooLate.isEnded());
 }
 
-TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {
+TEST_F(EventStreamTest, LimitsTheNumberOfClients) {
     {
         std::vector<HttpAnswer> answers;
         for (std::size_t count = 0; count < EventStream::mostClients; ++count) {
@@ -236,7 +236,7 @@ TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {
     EXPECT_EQ(open().status, 200);
 }
 
-TEST_F(EventStreamTest, RefusesWhatMakesNoSense) {
+TEST_F(EventStreamTest, RefusesInvalidRequests) {
     EXPECT_EQ(open("", "x").body, "Last-Event-ID: the id of an event is a whole number");
     EXPECT_EQ(open("?after=x").body, "after: write a whole number from 0 to 9223372036854775807");
     EXPECT_EQ(open("?limit=5").body.substr(0, 26), "limit: unknown parameter; ");

@@ -41,13 +41,13 @@ TEST(ReportRequest, ReadsLogWindowAndConditions) {
     EXPECT_EQ(report.conditions[5].number, 5);
 }
 
-TEST(ReportRequest, GoesUpToTheNewestEntryWithoutAnEnd) {
+TEST(ReportRequest, WithoutAnEndGoesUpToTheNewestEntry) {
     const ReportRequest report = ReportRequest::parse(R"({"log":"/a","from":"2026-11-20"})");
     EXPECT_EQ(report.to, "1991231235959999");
     EXPECT_EQ(report.conditions.size(), 4u);
 }
 
-TEST(ReportRequest, NamesWhatIsWrong) {
+TEST(ReportRequest, ReportsTheWrongField) {
     EXPECT_EQ(refused(""), "log: is missing");
     EXPECT_EQ(refused(R"({"log":"auth.log","from":"2026-11-20"})"),
               "log: 'auth.log' is not the absolute path of a file; write the log's path as in the "

@@ -46,7 +46,7 @@ TEST(SampleRequest, NeedsNoFiltersForTheMonitoredLogs) {
     EXPECT_EQ(refused(R"({"filters":null})"), "accepted");
 }
 
-TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
+TEST(SampleRequest, RefusesInvalidBodies) {
     EXPECT_EQ(refused("{"), "body: the body is not JSON");
     EXPECT_EQ(refused("{\"filters\":\"\xff\"}"), "body: the body is not JSON");
     EXPECT_EQ(refused("[]"), "body: write an object");
@@ -63,7 +63,7 @@ TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
     EXPECT_EQ(refused(many + "]}"), "filters: write a list of at most 100 filters");
 }
 
-TEST(SampleRequest, NamesTheFilterThatIsWrong) {
+TEST(SampleRequest, NamesTheWrongFilter) {
     EXPECT_EQ(refused(R"({"filters":["x"]})"),
               "filters[0]: write an object with column, op and value");
     EXPECT_EQ(refused(filter(R"("op":"=","value":"a")")), "filters[0].column: write a text");
@@ -102,7 +102,7 @@ TEST(SampleRequest, RefusesUnusableValues) {
               "filters[0].column: 'COLOUR' is not a column; th");
 }
 
-TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
+TEST(SampleRequest, RegularExpressionsAreLimitedTogether) {
     std::string filters;
     for (int count = 0; count < 3; ++count) {
         filters += filters.empty() ? "" : ",";
@@ -114,7 +114,7 @@ TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
         << problem;
 }
 
-TEST(SampleRequest, AReportNamesItsLogAndItsWindow) {
+TEST(SampleRequest, AReportNeedsALogAndAWindow) {
     const std::string path = R"({"column":"LOGPATH","op":"=","value":"/var/log/"})";
     const std::string name = R"({"column":"LOGNAME","op":"=","value":"auth.log"})";
     const std::string start = R"({"column":"ENTRYTIME","op":">=","value":"2026-11-20"})";

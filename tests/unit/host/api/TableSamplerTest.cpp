@@ -40,7 +40,7 @@ protected:
     TableSampler sampler;
 };
 
-TEST_F(TableSamplerTest, GivesRowsAsJson) {
+TEST_F(TableSamplerTest, ReturnsRowsAsJson) {
     const SampleSource::Rows sample = sampler.take("RMLOGENT", {});
     const std::string row =
         R"({"LOGPATH":"/var/log/","LOGNAME":"a\"b.log","TEXT":"text","NUMBER":)";
@@ -49,7 +49,7 @@ TEST_F(TableSamplerTest, GivesRowsAsJson) {
     EXPECT_FALSE(sample.truncated);
 }
 
-TEST_F(TableSamplerTest, GivesTheRowsThatMeetTheConditions) {
+TEST_F(TableSamplerTest, ReturnsTheRowsThatMeetTheConditions) {
     Condition condition;
     condition.column = "NUMBER";
     condition.isNumber = true;

@@ -19,7 +19,7 @@ TEST(UrlText, DecodesPercentEncoding) {
     EXPECT_EQ(UrlText::decode("%C3%A4%e2%82%ac"), "\xc3\xa4\xe2\x82\xac");
 }
 
-TEST(UrlText, RefusesWhatIsNoText) {
+TEST(UrlText, RefusesWhatIsNotText) {
     for (const char* const broken :
          {"%", "a%", "%2", "%2x", "%x2", "%-1", "%+1", "% 1", "%00", "%ff", "%C3", "%ED%A0%80"}) {
         EXPECT_EQ(UrlText::decode(broken), std::nullopt) << broken;

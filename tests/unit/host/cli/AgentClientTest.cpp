@@ -79,7 +79,7 @@ TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
     EXPECT_TRUE(client.send("DELETE", "/x", nullptr).is_null());
 }
 
-TEST_F(AgentClientTest, AProblemIsToldWithItsField) {
+TEST_F(AgentClientTest, AProblemIsReportedWithItsField) {
     answer(400, R"({"status":400,"detail":"'is' is not an operator","field":"where[0]"})");
     expectAnswer(CLI_REFUSED, "where[0]: 'is' is not an operator");
 }
@@ -89,25 +89,25 @@ TEST_F(AgentClientTest, AProblemWithoutAField) {
     expectAnswer(CLI_REFUSED, "the history is off");
 }
 
-TEST_F(AgentClientTest, AnErrorThatIsNoProblemIsTold) {
+TEST_F(AgentClientTest, AnErrorWithoutAProblemDocumentIsReported) {
     answer(502, "<html>");
     expectAnswer(CLI_REFUSED, "the agent at " + url + " answered with status 502");
 }
 
-TEST_F(AgentClientTest, ATokenThatIsNotAcceptedIsTold) {
+TEST_F(AgentClientTest, ARejectedTokenIsReported) {
     answer(401, "{}");
     expectAnswer(CLI_FORBIDDEN, "the agent at " + url +
                                     " does not accept the token from its file: give the right one "
                                     "with --token-file or --config");
 }
 
-TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsTold) {
+TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsReported) {
     answer(200, "<html>");
     expectAnswer(CLI_UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
-TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
+TEST_F(AgentClientTest, AnAgentThatIsNotRunningIsReported) {
     agent.begin();
     url = agent.connection().url;
     agent.end();
@@ -116,7 +116,7 @@ TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
                                       "address: --url or --config)");
 }
 
-TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
+TEST_F(AgentClientTest, AnEndlessAnswerIsReportedAndTakesBoundedMemory) {
     const ScriptedServer server([](const ScriptedServer::Request&) {
         return ScriptedServer::Reply{"HTTP/1.1 400 Bad\r\nTransfer-Encoding: chunked\r\n\r\n",
                                      ScriptedServer::Reply::KEEP, "4\r\nmore\r\n"};
@@ -126,13 +126,13 @@ TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
                 "what answers at " + server.url() + " is not a zrmagent: its answer does not end");
 }
 
-TEST_F(AgentClientTest, AnAnswerThatIsNestedWithoutReasonIsTold) {
+TEST_F(AgentClientTest, ADeeplyNestedAnswerIsReported) {
     answer(200, R"({"a":)" + std::string(1'000'000, '[') + std::string(1'000'000, ']') + '}');
     expectAnswer(CLI_UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
-TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
+TEST_F(AgentClientTest, AnEndlessEventOfAStreamIsReported) {
     const ScriptedServer server([](const ScriptedServer::Request&) {
         return ScriptedServer::Reply{"HTTP/1.1 200 OK\r\n\r\ndata: ", ScriptedServer::Reply::KEEP,
                                      std::string(4096, 'x')};

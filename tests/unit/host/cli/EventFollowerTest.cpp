@@ -122,7 +122,7 @@ const std::string lost = "the connection to the agent was lost; reconnecting";
 
 } // namespace
 
-TEST_F(EventFollowerTest, GivesEventsUntilCtrlC) {
+TEST_F(EventFollowerTest, DeliversEventsUntilCtrlC) {
     parts = {{event(8) + ": keep-alive\n\n" + event(9)}};
     addRoutes();
     agent.begin();
@@ -132,7 +132,7 @@ TEST_F(EventFollowerTest, GivesEventsUntilCtrlC) {
     EXPECT_THAT(notes, ElementsAre());
 }
 
-TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
+TEST_F(EventFollowerTest, AfterALostConnectionItContinuesAfterTheLastWholeEvent) {
     parts = {
         {event(8) + event(9) + "id: 10\ndata: {\"id\":1"}, {event(9) + event(10)}, {event(11)}};
     addRoutes();
@@ -142,7 +142,7 @@ TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
     EXPECT_THAT(notes, ElementsAre(lost, "reconnected", lost, "reconnected"));
 }
 
-TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
+TEST_F(EventFollowerTest, ANewHistoryIsFollowedFromItsFirstEvent) {
     newest = 2;
     parts = {{event(500)}, {event(1) + event(2)}};
     addRoutes();
@@ -155,7 +155,7 @@ TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
                             "reconnected"));
 }
 
-TEST_F(EventFollowerTest, ARefusalEndsIt) {
+TEST_F(EventFollowerTest, ARefusalEndsTheFollowing) {
     parts = {{R"({"detail":"the history is off"})", 409}};
     addRoutes();
     agent.begin();
@@ -168,7 +168,7 @@ TEST_F(EventFollowerTest, ARefusalEndsIt) {
     }
 }
 
-TEST_F(EventFollowerTest, AnAgentThatIsStartedAgainIsFollowedFurther) {
+TEST_F(EventFollowerTest, FollowingContinuesAfterTheAgentRestarts) {
     parts = {{event(8)}, {event(9)}};
     addRoutes();
     agent.begin();

@@ -73,7 +73,7 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEventWithAndWithoutAHistory) {
     }
 }
 
-TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
+TEST_F(DeliveryTest, ReportsWhatWasNotDelivered) {
     const std::string good = directory.file("good.jsonl");
     Delivery delivery(configFor({"/dev/full", good}, false), testLayout(), sizeof(TestRow));
     delivery.start();
@@ -86,7 +86,7 @@ TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
     EXPECT_EQ(lines(good), 2);
 }
 
-TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
+TEST_F(DeliveryTest, ASinkThatIsDownDelaysNeitherTheOthersNorTheQueue) {
     const std::string good = directory.file("good.jsonl");
     Delivery delivery(configFor({"/dev/full", good}), testLayout(), sizeof(TestRow));
     delivery.start();
@@ -110,7 +110,7 @@ TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
                   "again\n");
 }
 
-TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
+TEST_F(DeliveryTest, ASinkThatHangsAtTheStopLeavesTheOthersTheirTime) {
     const std::string later = directory.file("later/events.jsonl");
     Delivery delivery(configFor({"/dev/full", later}), testLayout(), sizeof(TestRow));
     delivery.start();
@@ -129,7 +129,7 @@ TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
     EXPECT_EQ(lines(later), 1);
 }
 
-TEST_F(DeliveryTest, WithoutADirectoryForTheHistoryItGoesOnWithoutOne) {
+TEST_F(DeliveryTest, WithoutADirectoryItRunsWithoutAHistory) {
     const std::string output = directory.file("events.jsonl");
     HostConfig config = configFor({output});
     config.history.directory = directory.file("no/such");

@@ -116,7 +116,7 @@ TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
     EXPECT_THAT(trace.messages(), ElementsAre());
 }
 
-TEST_F(SinkThreadTest, AReaderThatTakesNothingForSomeSecondsIsAFailure) {
+TEST_F(SinkThreadTest, AReaderThatTakesNothingForSecondsIsAFailure) {
     thread.start();
     state->waitsSince = Clock::now();
     EXPECT_NE(thread.state().condition, SinkState::Condition::FAILING);
@@ -141,7 +141,7 @@ TEST_F(SinkThreadTest, DeliversAtOnce) {
     EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
 }
 
-TEST_F(SinkThreadTest, TriesAgainAfterGrowingPausesWhereItBrokeOff) {
+TEST_F(SinkThreadTest, RetriesAfterGrowingPausesFromWhereItStopped) {
     state->failures = 3;
     state->taken = 2;
     thread.start();
@@ -167,7 +167,7 @@ TEST_F(SinkThreadTest, ThePausesGrowWhileNothingIsDelivered) {
     EXPECT_GE(state->tries[3] - state->tries[2], 300ms);
 }
 
-TEST_F(SinkThreadTest, ADeliveryThatTheEndBreaksOffIsNotTriedAgain) {
+TEST_F(SinkThreadTest, ADeliveryInterruptedByTheStopIsNotRetried) {
     state->waits = true;
     thread.start();
     push(3);
@@ -179,7 +179,7 @@ TEST_F(SinkThreadTest, ADeliveryThatTheEndBreaksOffIsNotTriedAgain) {
     EXPECT_EQ(thread.state().error, "no room");
 }
 
-TEST_F(SinkThreadTest, ASinkThatThrowsHasFailed) {
+TEST_F(SinkThreadTest, AnExceptionIsAFailure) {
     state->failures = 2;
     state->throws = true;
     thread.start();
@@ -204,7 +204,7 @@ TEST_F(SinkThreadTest, FinishGivesUpAtTheLimitAndCountsWhatIsLeft) {
     EXPECT_FALSE(queue.push(label, "1234567"));
 }
 
-TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
+TEST_F(SinkThreadTest, FinishRetriesSoonHoweverLongThePauseHasGrown) {
     state->failures = -1;
     state->taken = 0;
     push(2);
@@ -224,7 +224,7 @@ TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
     EXPECT_EQ(state->seen(), upTo(2));
 }
 
-TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
+TEST_F(SinkThreadTest, AFailingSinkDoesNotDelayAnother) {
     auto otherState = std::make_shared<TestState>();
     SinkThread other(source(), std::make_unique<TestSink>(otherState), "jsonl");
     state->failures = -1;
@@ -241,7 +241,7 @@ TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
     EXPECT_EQ(other.finish(Clock::now() + 10s), 0u);
 }
 
-TEST_F(SinkThreadTest, TellsHowItStands) {
+TEST_F(SinkThreadTest, ReportsItsState) {
     EXPECT_STREQ(thread.state().conditionName(), "starting");
     EXPECT_EQ(thread.state().name, "test");
     EXPECT_EQ(thread.state().type, "jsonl");
@@ -274,7 +274,7 @@ TEST_F(SinkThreadTest, TellsHowItStands) {
     EXPECT_EQ(up.retryIn, std::nullopt);
 }
 
-TEST_F(SinkThreadTest, EndsWithoutHavingBeenFinished) {
+TEST_F(SinkThreadTest, EndsWithoutFinish) {
     thread.start();
     push(1);
 }

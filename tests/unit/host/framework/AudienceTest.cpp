@@ -72,7 +72,7 @@ TEST_F(AudienceTest, WithoutSituationsIsEmpty) {
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
 }
 
-TEST_F(AudienceTest, HasTheSituationsOfTheLogInTheirOrder) {
+TEST_F(AudienceTest, HasTheSituationsOfTheLogInOrder) {
     open({onLog("messages")});
     open({onLog("syslog")});
     open({});
@@ -112,7 +112,7 @@ TEST_F(AudienceTest, FollowsTheListOfSituations) {
     EXPECT_THAT(audienceOf(row), IsEmpty());
 }
 
-TEST_F(AudienceTest, LooksAtNoLogColumnThatNoConditionIsOn) {
+TEST_F(AudienceTest, IgnoresLogColumnsWithoutConditions) {
     // Otherwise each path would be a log of its own here, and known afresh.
     open({onLog("messages")});
     for (int number = 0; number < 20'000; ++number) {
@@ -121,7 +121,7 @@ TEST_F(AudienceTest, LooksAtNoLogColumnThatNoConditionIsOn) {
     }
 }
 
-TEST_F(AudienceTest, KnowsAnyNumberOfLogs) {
+TEST_F(AudienceTest, HandlesAnyNumberOfLogs) {
     open({textCondition("LOGNAME", INTF_STARTS, "app1")});
     open({textCondition("LOGNAME", INTF_MATCHES, "9$")});
     for (int number = 0; number < 20'000; ++number) {
@@ -137,7 +137,7 @@ TEST_F(AudienceTest, KnowsAnyNumberOfLogs) {
     }
 }
 
-TEST_F(AudienceTest, PassesOverWhatTheTextRefuses) {
+TEST_F(AudienceTest, SkipsSituationsThatTheTextRefuses) {
     open({textCondition("TEXT", INTF_STARTS, "Failed")});
     open({textCondition("TEXT", INTF_STARTS, "Accepted")});
     open({textCondition("TEXT", INTF_STARTS, "Failed password for")});
@@ -157,13 +157,13 @@ TEST_F(AudienceTest, PassesOverWhatTheTextRefuses) {
     EXPECT_THAT(audienceOf(TestRow("/", "a", "", 0)), ElementsAre(8, 11));
 }
 
-TEST_F(AudienceTest, LeavesTheJudgementOfNumbersAndUnknownColumnsToTheTable) {
+TEST_F(AudienceTest, LeavesNumbersAndUnknownColumnsToTheTable) {
     open({numberCondition("NUMBER", INTF_EQUAL, 99)});
     open({textCondition("UNKNOWN", INTF_EQUAL, "x")});
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), ElementsAre(0, 1));
 }
 
-TEST_F(AudienceTest, PassesOverAConditionThatMakesNoSense) {
+TEST_F(AudienceTest, SkipsASituationWithANonsensicalCondition) {
     open({textCondition("NUMBER", INTF_EQUAL, "seven")});
     open({textCondition("TEXT", static_cast<_IntfOper>(77), "x")});
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
@@ -173,7 +173,7 @@ TEST_F(AudienceTest, PassesOverAConditionThatMakesNoSense) {
     }
 }
 
-TEST_F(AudienceTest, CountsRowsThatItSparesARequestAsJudged) {
+TEST_F(AudienceTest, CountsSkippedRowsAsJudged) {
     Situation& mine = open({onLog("messages")});
     Situation& other = open({onLog("syslog"), textCondition("TEXT", INTF_CONTAINS, "x")});
     const auto offer = [&](TestRow row) {
@@ -231,7 +231,7 @@ Condition randomCondition(std::mt19937& random) {
 }
 
 // Whoever is left out would have refused the row, and nobody is left out for a number.
-TEST_F(AudienceTest, LeavesOutNobodyWhoWouldTakeTheRow) {
+TEST_F(AudienceTest, NeverLeavesOutASituationThatWouldTakeTheRow) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

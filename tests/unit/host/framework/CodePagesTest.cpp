@@ -32,7 +32,7 @@ TEST(CodePages, KnowsCodeSetsByName) {
     EXPECT_EQ(numberOf("KOI8-R"), 878u);
 }
 
-TEST(CodePages, TakesTheNamesAsSystemsWriteThem) {
+TEST(CodePages, AcceptsTheSpellingsOfVariousSystems) {
     EXPECT_EQ(numberOf("utf8"), 1208u);
     EXPECT_EQ(numberOf("UTF_8"), 1208u);
     EXPECT_EQ(numberOf("ISO8859-1"), 819u);
@@ -40,7 +40,7 @@ TEST(CodePages, TakesTheNamesAsSystemsWriteThem) {
     EXPECT_EQ(numberOf("eucJP"), 954u);
 }
 
-TEST(CodePages, HasNoNumberForWhatItDoesNotKnow) {
+TEST(CodePages, UnknownCodeSetsHaveNoNumber) {
     EXPECT_EQ(numberOf(""), 0u);
     EXPECT_EQ(numberOf("UTF"), 0u);
     EXPECT_EQ(numberOf("UTF-88"), 0u);

@@ -141,7 +141,7 @@ bool model(const Condition& condition, const TestRow& row) {
     return modelText(condition, std::string(row.text, sizeof row.text));
 }
 
-TEST(ConditionModel, RandomConditionsMeanWhatTheySay) {
+TEST(ConditionModel, RandomConditionsAgreeWithTheModel) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

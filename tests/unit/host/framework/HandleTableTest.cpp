@@ -60,7 +60,7 @@ TEST(HandleTable, ADropWithoutAPinChangesNothing) {
     HandleTable::close(handle);
 }
 
-TEST(HandleTable, DoesNotGiveAHandleOutAgainSoon) {
+TEST(HandleTable, DoesNotReuseAHandleSoon) {
     int object;
     std::set<unsigned> given;
     for (int round = 0; round < 100000; ++round) {
@@ -71,7 +71,7 @@ TEST(HandleTable, DoesNotGiveAHandleOutAgainSoon) {
     }
 }
 
-TEST(HandleTable, ServesManyAtOnceAndSaysWhenThereAreNoMore) {
+TEST(HandleTable, ServesManyAtOnceAndRefusesMore) {
     int object;
     std::vector<unsigned> handles;
     while (const unsigned handle = HandleTable::open(address(object))) {
@@ -112,7 +112,7 @@ TEST(HandleTable, CloseWaitsForTheLastPin) {
     EXPECT_TRUE(closed);
 }
 
-TEST(HandleTable, AnObjectIsWholeWhileItIsPinned) {
+TEST(HandleTable, AnObjectIsIntactWhileItIsPinned) {
     struct Watched {
         std::atomic<int> alive{1};
     };

@@ -43,7 +43,7 @@ TEST(LinkedList, RemovesTheFirstOccurrenceOnly) {
     EXPECT_THAT(walk(list), ElementsAre(&b, &a));
 }
 
-TEST(LinkedList, TellsItsLastElement) {
+TEST(LinkedList, KnowsItsLastElement) {
     int a, b;
     LinkedList list;
     EXPECT_EQ(list.Last(), nullptr);

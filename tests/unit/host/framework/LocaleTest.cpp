@@ -55,7 +55,7 @@ TEST_F(LocaleTest, TheProcesssLocaleHasItsCodePage) {
     EXPECT_EQ(codePageOf("C.UTF-8"), 1208u);
 }
 
-TEST_F(LocaleTest, HasNoOtherInformation) {
+TEST_F(LocaleTest, HasNoFurtherInformation) {
     LOC2_Locale* const locale = LOC2_GetLocale(0, 0, 0, nullptr);
     std::uint32_t status = 0;
     EXPECT_EQ(LOC2_GetLocaleNumInfo(locale, 8, &status), 0u);
@@ -102,7 +102,7 @@ TEST_F(LocaleTest, WithoutATerminatorThePaddingStays) {
     EXPECT_EQ(result.written, 0);
 }
 
-TEST_F(LocaleTest, ABytesThatIsNotValidIsReplaced) {
+TEST_F(LocaleTest, AnInvalidByteIsReplaced) {
     EXPECT_EQ(translate(1208, 1208, "a\xFFz", 10, 0).target, terminated("a\uFFFDz", 10));
     EXPECT_EQ(translate(1208, 367, "a\xE9z", 10, 0).target, terminated("a\uFFFDz", 10));
     EXPECT_EQ(translate(367, 1208, "aéz", 10, 0).target, terminated("a\x1Az", 10));
@@ -134,7 +134,7 @@ TEST_F(LocaleTest, AnUnknownCodePageConvertsNothing) {
     }
 }
 
-TEST_F(LocaleTest, NeedsNoPlaceForLengthAndStatus) {
+TEST_F(LocaleTest, LengthAndStatusAreOptional) {
     char target[8];
     EXPECT_EQ(LOC2_TranslateString(1208, target, sizeof target, 819, "abc", 3, nullptr, 0, nullptr),
               3);

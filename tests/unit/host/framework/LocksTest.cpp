@@ -13,7 +13,7 @@ using namespace zrm;
 
 namespace {
 
-TEST(Locks, LetOneThreadInAtATime) {
+TEST(Locks, AdmitOneThreadAtATime) {
     SYS1_Lock lock;
     int inside = 0;
     int total = 0;

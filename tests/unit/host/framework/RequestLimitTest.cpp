@@ -14,7 +14,7 @@ namespace {
 using namespace std::chrono_literals;
 using Clock = RequestLimit::Clock;
 
-TEST(RequestLimit, IsReachedWhenTheTimeIsOverOrNobodyWants) {
+TEST(RequestLimit, IsReachedWhenTheTimeIsUpOrTheWorkIsUnwanted) {
     EXPECT_FALSE(CTX1_IsCancelled());
     bool isUnwanted = false;
     const RequestLimit limit(Clock::now() + 1h, [&] { return isUnwanted; });
@@ -30,7 +30,7 @@ TEST(RequestLimit, IsReachedWhenTheTimeIsOverOrNobodyWants) {
     EXPECT_TRUE(CTX1_IsCancelled());
 }
 
-TEST(RequestLimit, TheLatestOfAThreadCountsAndOthersHaveNone) {
+TEST(RequestLimit, TheLatestOfAThreadAppliesAndOtherThreadsHaveNone) {
     const RequestLimit outer(Clock::now(), {});
     {
         const RequestLimit inner(Clock::now() + 1h, {});

@@ -93,7 +93,7 @@ TEST(Request, CountsWhatItJudgesAndWhatMatches) {
     EXPECT_EQ(other.get()->framework().counts.judged(), 0u);
 }
 
-TEST(Request, IsNotOpenWhenTheTableGivesNone) {
+TEST(Request, IsNotOpenWhenTheTableRefuses) {
     TestManager manager;
     manager.gives = false;
     TestReceiver receiver;
@@ -152,7 +152,7 @@ TEST(Request, IsDestroyedWhenTheLastPinIsDropped) {
 }
 
 // What a log's thread does with each row, on two threads, while situations come and go.
-TEST(Request, SituationsComeAndGoWhileRowsAreHandedOut) {
+TEST(Request, SituationsComeAndGoDuringFanOut) {
     TestManager manager;
     TestReceiver receiver;
     std::atomic<bool> done{false};
@@ -188,7 +188,7 @@ TEST(Request, SituationsComeAndGoWhileRowsAreHandedOut) {
     EXPECT_EQ(receiver.dispatches, offered.load());
 }
 
-TEST(Tables, KnowsWhatWasRegistered) {
+TEST(Tables, FindsRegisteredTables) {
     EXPECT_EQ(Tables::find("ONE"), nullptr);
     {
         TestManager one("ONE");
@@ -237,7 +237,7 @@ protected:
     TestManager manager;
 };
 
-TEST_F(SampleTest, GivesTheRowsThatMeetTheConditions) {
+TEST_F(SampleTest, ReturnsTheRowsThatMeetTheConditions) {
     const auto sample = Sample::take("TESTTABLE", {numberCondition("NUMBER", INTF_GREATER, 6)});
     ASSERT_TRUE(sample);
     ASSERT_EQ(sample->size(), 3u);

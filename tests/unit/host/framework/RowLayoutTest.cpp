@@ -46,7 +46,7 @@ TEST_F(RowLayoutTest, ReadsARow) {
 }
 
 // A column that the table cannot describe is left out; the table's count may promise too much.
-TEST_F(RowLayoutTest, LeavesOutWhatIsNotDescribed) {
+TEST_F(RowLayoutTest, LeavesOutUndescribedColumns) {
     class Partly : public TestRequest {
     public:
         using TestRequest::TestRequest;

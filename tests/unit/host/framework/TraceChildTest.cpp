@@ -101,7 +101,7 @@ private:
     std::vector<std::thread> m_threads;
 };
 
-TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
+TEST(TraceChild, TracesWhicheverLockAnotherThreadHeldAtTheFork) {
     constexpr int children = 100;
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
@@ -133,7 +133,7 @@ TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
         children + 1);
 }
 
-TEST(TraceChild, LeavesAMovedFileToItsParent) {
+TEST(TraceChild, LeavesAMovedFileToTheParent) {
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
     TRC1_Printf(anchor, 1, "parent");

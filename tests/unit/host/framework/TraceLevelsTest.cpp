@@ -20,7 +20,7 @@ std::string wrong(std::string_view text) {
     return error;
 }
 
-TEST(TraceLevels, IsTheErrorsWhereNothingIsSaid) {
+TEST(TraceLevels, DefaultsToErrors) {
     EXPECT_EQ(TraceLevels().levelOf("ValidLog.cpp"), 0x80u);
     EXPECT_EQ(level(""), 0x80u);
     EXPECT_EQ(level(" , ,"), 0x80u);
@@ -39,14 +39,14 @@ TEST(TraceLevels, KnowsTheClasses) {
     EXPECT_EQ(level("0"), 0u);
 }
 
-TEST(TraceLevels, AddsClassesUp) {
+TEST(TraceLevels, AddsUpClasses) {
     EXPECT_EQ(level("error,flow"), 0xC0u);
     EXPECT_EQ(level(" error , fine "), 0x81u);
     EXPECT_EQ(level("error+detail,0x01"), 0x91u);
     EXPECT_EQ(level("none,detail"), 0x10u);
 }
 
-TEST(TraceLevels, AUnitHasItsOwn) {
+TEST(TraceLevels, AUnitMayHaveItsOwnLevel) {
     EXPECT_EQ(level("ValidLog=fine"), 0x01u);
     EXPECT_EQ(level("ValidLog.cpp=fine+flow"), 0x41u);
     EXPECT_EQ(level("error,ValidLog=none"), 0u);
@@ -62,7 +62,7 @@ TEST(TraceLevels, AUnitHasItsOwn) {
     EXPECT_EQ(level("plain=fine", "plain"), 0x01u) << "a unit without an ending";
 }
 
-TEST(TraceLevels, AClassHasAllItsSourceFiles) {
+TEST(TraceLevels, AClassCoversAllItsSourceFiles) {
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFile.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFileReport.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFileTime.cpp"), 0x10u);
@@ -80,7 +80,7 @@ TEST(TraceLevels, AClassHasAllItsSourceFiles) {
     }
 }
 
-TEST(TraceLevels, NamesTheWordThatIsWrong) {
+TEST(TraceLevels, NamesTheWrongWord) {
     const std::string classes = " is not a trace class; the classes are error, flow, detail, fine, "
                                 "all, none, or a number from 0 to 255";
     EXPECT_EQ(wrong("detial"), "\"detial\" in \"detial\"" + classes);

@@ -128,7 +128,7 @@ TEST(Trace, ALongRecordIsCutAndKeepsItsNewline) {
     }
 }
 
-TEST(Trace, EventsTellEntryExitAndResult) {
+TEST(Trace, EventsShowEntryExitAndResult) {
     ErrorSocket errors;
     TRC1_Event(anchor, 1, TRC1_ENTRY);
     TRC1_Event(anchor, 1, TRC1_EXIT);
@@ -155,7 +155,7 @@ TEST(Trace, LeavesErrnoAsItWas) {
     EXPECT_EQ(seen, ENOTTY);
 }
 
-TEST(Trace, AChangedLevelHoldsFromTheNextOperationOn) {
+TEST(Trace, AChangedLevelAppliesFromTheNextOperation) {
     ErrorSocket errors;
     const auto traced = [&errors] {
         {
@@ -180,7 +180,7 @@ TEST(Trace, AChangedLevelHoldsFromTheNextOperationOn) {
 
 // Threads that learn the level while it changes may do so in any order; none may leave an older
 // level behind under the latest generation.
-TEST(Trace, NoThreadLeavesAnOlderLevelBehind) {
+TEST(Trace, NoThreadRestoresAnOlderLevel) {
     static TRC1_Anchor shared{"Shared.cpp"};
     constexpr int threadCount = 3;
     constexpr int rounds = 1500;
@@ -238,7 +238,7 @@ void* traceOnceCancelled(void* /*unused*/) {
 
 // A thread that is cancelled while it traces ends at its next cancellation point, and its record is
 // written: an unwind through the trace would end the process.
-TEST(Trace, IsNoCancellationPoint) {
+TEST(Trace, IsNotACancellationPoint) {
     ErrorSocket errors;
     pthread_t thread{};
     ASSERT_EQ(pthread_create(&thread, nullptr, traceOnceCancelled, nullptr), 0);

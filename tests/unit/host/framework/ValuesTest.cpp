@@ -6,7 +6,7 @@
 
 namespace {
 
-TEST(CopyUnpad, LeavesThePaddingAndTerminates) {
+TEST(CopyUnpad, DropsThePaddingAndTerminates) {
     char text[17];
     const auto copy = [&text](const char* source, int length) {
         std::memset(text, '#', sizeof text);

@@ -39,7 +39,7 @@ protected:
     std::unique_ptr<TestRequest> request;
 };
 
-TEST_F(CtreqTest, TellsWhatItWasOpenedWith) {
+TEST_F(CtreqTest, ReturnsWhatItWasOpenedWith) {
     const TestRequest& opened = open();
     EXPECT_STREQ(opened.name(), "situation");
     EXPECT_EQ(opened.sampleType(), 4u);
@@ -50,7 +50,7 @@ TEST_F(CtreqTest, TellsWhatItWasOpenedWith) {
     EXPECT_EQ(opened.allocated, 0u);
 }
 
-TEST_F(CtreqTest, HasDefaultsForWhatATableNeedNotHave) {
+TEST_F(CtreqTest, HasDefaultsForOptionalOperations) {
     class Bare : public ctreq {
     public:
         using ctreq::ctreq;
@@ -79,7 +79,7 @@ TEST_F(CtreqTest, GrowsTheDataArrayByTheTablesStep) {
                 ElementsAre(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19));
 }
 
-TEST_F(CtreqTest, UsesTheRoomAgainAfterTheCountWasSetBack) {
+TEST_F(CtreqTest, ReusesTheSpaceAfterTheCountWasReset) {
     open();
     insert(1);
     insert(2);

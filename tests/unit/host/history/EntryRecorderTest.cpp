@@ -68,7 +68,7 @@ protected:
     std::unique_ptr<EntryRecorder> recorder;
 };
 
-TEST_F(EntryRecorderTest, RecordsWhatEachMinuteBroughtToEachLog) {
+TEST_F(EntryRecorderTest, RecordsTheEntriesOfEachMinuteAndLog) {
     recorder->tick(start + 30'000);
     logs.counts = {{"a.log", 10}};
     recorder->tick(start + 59'999);

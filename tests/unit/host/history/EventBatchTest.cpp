@@ -54,7 +54,7 @@ TEST(EventBatch, KeepsCopiesOfEvents) {
     }
 }
 
-TEST(EventBatch, ATextThatEventsHaveInCommonTakesRoomOnce) {
+TEST(EventBatch, ASharedTextIsStoredOnce) {
     EventBatch batch;
     const std::string log(1000, 'x');
     for (std::uint64_t id = 1; id <= 100; ++id) {

@@ -40,7 +40,7 @@ protected:
     std::string path = directory.file("state");
 };
 
-TEST_F(HistoryDirectoryTest, MakesWhatIsMissingForItsOwnerAndGroupAlone) {
+TEST_F(HistoryDirectoryTest, CreatesWhatIsMissingForItsOwnerAndGroupOnly) {
     const auto place = opened(path);
     EXPECT_EQ(place->file(), path + "/history.db");
     struct stat status {};
@@ -51,7 +51,7 @@ TEST_F(HistoryDirectoryTest, MakesWhatIsMissingForItsOwnerAndGroupAlone) {
     EXPECT_EQ(place->bytes(), 0u);
 }
 
-TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
+TEST_F(HistoryDirectoryTest, ReportsWhatCannotBeCreatedAndWhatToDo) {
     EXPECT_EQ(problemOf(path + "/below"),
               "cannot create the directory " + path + "/below: No such file or directory" + cure);
     std::ofstream(directory.file("plain")) << "no directory";
@@ -71,7 +71,7 @@ TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
     EXPECT_EQ(problemOf(path), "cannot open " + path + "/history.db: Permission denied" + cure);
 }
 
-TEST_F(HistoryDirectoryTest, OpensRegularFilesOfItsOwnAlone) {
+TEST_F(HistoryDirectoryTest, OpensOnlyRegularFilesOfItsOwn) {
     std::filesystem::create_directory(path);
     for (const char* const name : {"/history.lock", "/history.db"}) {
         const std::string place = path + name;
@@ -114,7 +114,7 @@ TEST_F(HistoryDirectoryTest, CountsTheBytesOfAllItsFiles) {
     EXPECT_EQ(place->bytes(), 9u);
 }
 
-TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
+TEST_F(HistoryDirectoryTest, RecordsWhichIdsMayHaveBeenUsed) {
     auto place = opened(path);
     EXPECT_EQ(place->reservedIds(), 0u);
     place->reserveIds(123'456);
@@ -130,7 +130,7 @@ TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
     }
 }
 
-TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
+TEST_F(HistoryDirectoryTest, CreatesRemovedFilesAgainAndLocksThem) {
     const auto place = opened(path);
     std::filesystem::remove_all(path);
     EXPECT_EQ(reasonOf(place->restore()), "");
@@ -144,7 +144,7 @@ TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
     EXPECT_EQ(WEXITSTATUS(status), 1);
 }
 
-TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
+TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndReportsIt) {
     const auto place = opened(path);
     std::vector<std::string> told;
     for (int number = 0; number < 3; ++number) { // within the same second, or nearly
@@ -173,7 +173,7 @@ TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
     EXPECT_EQ(logs, 3);
 }
 
-TEST_F(HistoryDirectoryTest, SaysWhyAFileCannotBeMovedAside) {
+TEST_F(HistoryDirectoryTest, ReportsWhyAFileCannotBeMovedAside) {
     const auto place = opened(path);
     std::filesystem::remove(place->file());
     EXPECT_EQ(reasonOf(place->moveAside("why")),

@@ -134,7 +134,7 @@ protected:
     std::unique_ptr<EventSource> sink;
 };
 
-TEST_F(HistoryTest, StoresEventsAndGivesThemBack) {
+TEST_F(HistoryTest, StoresAndReturnsEvents) {
     open();
     EXPECT_EQ(history->newest(), 0u);
     EXPECT_EQ(history->state().events, 0u);
@@ -166,7 +166,7 @@ TEST_F(HistoryTest, AnEventIsStoredAtOnce) {
     EXPECT_LT(Clock::now() - begin, 500ms);
 }
 
-TEST_F(HistoryTest, IdsAndCursorsGoOnAfterARestart) {
+TEST_F(HistoryTest, IdsAndCursorsContinueAfterARestart) {
     open();
     pushAndWait(50);
     EXPECT_EQ(take(10), idsFrom(1, 10));
@@ -192,7 +192,7 @@ TEST_F(HistoryTest, ANewSinkBeginsWithTheNextEvent) {
     EXPECT_EQ(history->source("key", "the sink")->backlog(), 5u);
 }
 
-TEST_F(HistoryTest, ThePlaceOfASinkThatRunsIsKeptHoweverLongItWasDown) {
+TEST_F(HistoryTest, TheCursorOfARunningSinkIsKeptHoweverLongItWasDown) {
     open();
     pushAndWait(5);
     close();
@@ -208,7 +208,7 @@ TEST_F(HistoryTest, ThePlaceOfASinkThatRunsIsKeptHoweverLongItWasDown) {
     EXPECT_EQ(sink->backlog(), 5u);
 }
 
-TEST_F(HistoryTest, AtItsEndASinkWasInUseUntilThen) {
+TEST_F(HistoryTest, ASinkCountsAsInUseUntilTheStop) {
     open();
     pushAndWait(1);
     EXPECT_TRUE(eventually([&] { return number("SELECT count(*) FROM cursors") == 1; }));
@@ -227,7 +227,7 @@ TEST_F(HistoryTest, FinishStoresWhatIsQueued) {
     EXPECT_FALSE(queue->push(label, "1234567"));
 }
 
-TEST_F(HistoryTest, AFullDiskIsToldOnceAndNothingIsLost) {
+TEST_F(HistoryTest, AFullDiskIsReportedOnceAndNothingIsLost) {
     open();
     pushAndWait(5);
     disk.failWrites(SQLITE_FULL);
@@ -250,7 +250,7 @@ TEST_F(HistoryTest, AFullDiskIsToldOnceAndNothingIsLost) {
                                               "The history takes events again."));
 }
 
-TEST_F(HistoryTest, AHistoryIsOpenedOnAFullDiskAndTakesEventsWhenThereIsRoom) {
+TEST_F(HistoryTest, AHistoryOpensOnAFullDiskAndStoresEventsOnceThereIsSpace) {
     open();
     pushAndWait(5);
     close();
@@ -268,7 +268,7 @@ TEST_F(HistoryTest, AHistoryIsOpenedOnAFullDiskAndTakesEventsWhenThereIsRoom) {
     EXPECT_EQ(ids(), idsFrom(1, 8));
 }
 
-TEST_F(HistoryTest, AFullDiskDoesNotHoldUpTheEnd) {
+TEST_F(HistoryTest, AFullDiskDoesNotDelayTheStop) {
     open();
     disk.failWrites(SQLITE_FULL);
     push(7);
@@ -290,7 +290,7 @@ TEST_F(HistoryTest, AFullDiskDoesNotHoldUpTheEnd) {
     EXPECT_EQ(ids(), idsFrom(1, 1));
 }
 
-TEST_F(HistoryTest, CursorsThatCannotBeStoredAtTheEndAreTold) {
+TEST_F(HistoryTest, CursorsThatCannotBeStoredAtTheStopAreReported) {
     open();
     pushAndWait(3);
     EXPECT_EQ(take().size(), 3u);
@@ -322,7 +322,7 @@ TEST_F(HistoryTest, ACorruptFileIsMovedAsideAtTheStart) {
     EXPECT_EQ(ids(), idsFrom(1, 3));
 }
 
-TEST_F(HistoryTest, IdsGoOnAfterACorruptFileWhereTheyCanBeTold) {
+TEST_F(HistoryTest, IdsContinueAfterACorruptFileWhereTheyAreReadable) {
     open();
     pushAndWait(100);
     close();
@@ -343,7 +343,7 @@ TEST_F(HistoryTest, IdsGoOnAfterACorruptFileWhereTheyCanBeTold) {
     EXPECT_EQ(history->newest(), 102u);
 }
 
-TEST_F(HistoryTest, AFileThatBecomesCorruptIsExchangedWhileTheAgentRuns) {
+TEST_F(HistoryTest, AFileThatBecomesCorruptIsReplacedWhileTheAgentRuns) {
     open();
     pushAndWait(100);
     EXPECT_EQ(take(10), idsFrom(1, 10));
@@ -364,7 +364,7 @@ TEST_F(HistoryTest, AFileThatBecomesCorruptIsExchangedWhileTheAgentRuns) {
     EXPECT_EQ(history->newest(), 150u);
 }
 
-TEST_F(HistoryTest, CorruptionThatAReaderFindsIsSeenToAsWell) {
+TEST_F(HistoryTest, CorruptionFoundByAReaderIsHandledToo) {
     open();
     pushAndWait(10);
     disk.failReads(SQLITE_CORRUPT);
@@ -407,7 +407,7 @@ TEST_F(HistoryTest, ADamagedEventIsTracedOnceAndRefused) {
                                               " is damaged: its content is not what was written."));
 }
 
-TEST_F(HistoryTest, FilesThatAreRemovedAreMadeAnewAndIdsGoOn) {
+TEST_F(HistoryTest, RemovedFilesAreCreatedAgainAndIdsContinue) {
     for (const bool isWhole : {false, true}) {
         open();
         const std::uint64_t before = history->newest();
@@ -441,7 +441,7 @@ TEST_F(HistoryTest, FilesThatAreRemovedAreMadeAnewAndIdsGoOn) {
     }
 }
 
-TEST_F(HistoryTest, AWriteAheadLogThatIsRemovedTakesNothingWithIt) {
+TEST_F(HistoryTest, RemovingTheWriteAheadLogLosesNothing) {
     open();
     pushAndWait(10);
     std::filesystem::remove(file() + "-wal");
@@ -454,7 +454,7 @@ TEST_F(HistoryTest, AWriteAheadLogThatIsRemovedTakesNothingWithIt) {
     EXPECT_EQ(ids(), idsFrom(1, 15));
 }
 
-TEST_F(HistoryTest, WhileRemovedFilesCannotBeMadeAnewTheProblemSaysSo) {
+TEST_F(HistoryTest, TheProblemSaysWhenRemovedFilesCannotBeCreatedAgain) {
     open();
     pushAndWait(10);
     std::filesystem::remove_all(state);
@@ -484,7 +484,7 @@ TEST_F(HistoryTest, AnotherHistoryInItsPlaceIsMovedAside) {
     EXPECT_EQ(ids(), idsFrom(11, 15));
 }
 
-TEST_F(HistoryTest, IdsGoOnWhenTheFileWasRemovedBetweenTwoRuns) {
+TEST_F(HistoryTest, IdsContinueWhenTheFileWasRemovedBetweenTwoRuns) {
     open();
     pushAndWait(10);
     close();
@@ -497,7 +497,7 @@ TEST_F(HistoryTest, IdsGoOnWhenTheFileWasRemovedBetweenTwoRuns) {
     EXPECT_EQ(ids(), idsFrom(11, 15));
 }
 
-TEST_F(HistoryTest, WithoutAnOrderlyEndIdsOfALostFileAreSkippedAndThoseOfAKeptOneGoOn) {
+TEST_F(HistoryTest, AfterACrashIdsOfALostFileAreSkippedAndThoseOfAKeptOneContinue) {
     open();
     pushAndWait(10);
     history->finish(Clock::now() + 10s); // and nothing more
@@ -529,14 +529,14 @@ TEST_F(HistoryTest, AFileOfALaterVersionIsLeftAlone) {
     EXPECT_THAT(corruptFiles(), IsEmpty());
 }
 
-TEST_F(HistoryTest, AFileThatCannotBeOpenedForNowIsLeftAlone) {
+TEST_F(HistoryTest, AFileThatTemporarilyCannotBeOpenedIsLeftAlone) {
     disk.failWrites(SQLITE_FULL);
     open();
     EXPECT_EQ(problem, "cannot open " + file() + ": database or disk is full");
     EXPECT_THAT(corruptFiles(), IsEmpty());
 }
 
-TEST_F(HistoryTest, KeepsAsManyEventsAsItIsTold) {
+TEST_F(HistoryTest, KeepsTheConfiguredNumberOfEvents) {
     config.keepEvents = 100;
     open();
     for (int round = 0; round < 40; ++round) {
@@ -550,7 +550,7 @@ TEST_F(HistoryTest, KeepsAsManyEventsAsItIsTold) {
     testing::internal::GetCapturedStderr();
 }
 
-TEST_F(HistoryTest, KeepsEventsAsLongAsItIsTold) {
+TEST_F(HistoryTest, KeepsEventsForTheConfiguredTime) {
     open();
     pushAndWait(10);
     close();
@@ -561,7 +561,7 @@ TEST_F(HistoryTest, KeepsEventsAsLongAsItIsTold) {
     EXPECT_EQ(ids(), idsFrom(7, 10));
 }
 
-TEST_F(HistoryTest, GivesTheRatesOfEventsAndEntries) {
+TEST_F(HistoryTest, ReturnsTheRatesOfEventsAndEntries) {
     open();
     pushAndWait(20);
     const std::int64_t raised = history->event(1)->raised;

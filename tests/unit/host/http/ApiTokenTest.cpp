@@ -43,7 +43,7 @@ protected:
     std::string path = directory.file("api-token");
 };
 
-TEST_F(ApiTokenTest, MakesTheFileForTheOwnerAlone) {
+TEST_F(ApiTokenTest, CreatesTheFileForTheOwnerOnly) {
     EXPECT_EQ(problem(path), "");
     EXPECT_EQ(mode(path), 0600u);
     EXPECT_THAT(content(), testing::MatchesRegex("[0-9a-f]+\n"));
@@ -55,7 +55,7 @@ TEST_F(ApiTokenTest, MakesTheFileForTheOwnerAlone) {
         << "nothing else is left behind";
 }
 
-TEST_F(ApiTokenTest, EveryTokenIsAnother) {
+TEST_F(ApiTokenTest, EveryTokenIsDifferent) {
     problem(path);
     const std::string first = content();
     std::filesystem::remove(path);
@@ -63,27 +63,27 @@ TEST_F(ApiTokenTest, EveryTokenIsAnother) {
     EXPECT_NE(content(), first);
 }
 
-TEST_F(ApiTokenTest, MakesTheDirectory) {
+TEST_F(ApiTokenTest, CreatesTheDirectory) {
     const std::string inside = directory.file("state/api-token");
     EXPECT_EQ(problem(inside), "");
     EXPECT_EQ(mode(inside), 0600u);
     EXPECT_EQ(mode(directory.file("state")) & 0007u, 0u);
 }
 
-TEST_F(ApiTokenTest, TakesAnOperatorsOwnToken) {
+TEST_F(ApiTokenTest, AcceptsAnOperatorsOwnToken) {
     const auto loaded = ApiToken::load(withContent(secret + "\r\n", 0640));
     ASSERT_TRUE(loaded);
     EXPECT_TRUE(loaded->matches(secret));
 }
 
-TEST_F(ApiTokenTest, RefusesAFileThatEveryoneReads) {
+TEST_F(ApiTokenTest, RefusesAFileThatEveryoneCanRead) {
     EXPECT_EQ(problem(withContent(secret, 0644)),
               path +
                   " is accessible to every user: remove the permissions of other users (chmod o= " +
                   path + ") or remove it to have a new one created");
 }
 
-TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
+TEST_F(ApiTokenTest, RefusesTextsThatAreNotTokens) {
     const std::string expected = path + " does not contain a token of 32 to 1024 visible "
                                         "characters: remove it to have a new one created";
     for (const std::string& text :
@@ -94,7 +94,7 @@ TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
     EXPECT_EQ(problem(withContent(std::string(1024, 'x'))), "");
 }
 
-TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
+TEST_F(ApiTokenTest, RefusesWhatIsNotAFile) {
     const std::string itself = directory.path();
     EXPECT_EQ(problem(itself), itself + " is not a file that can contain a token");
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
@@ -102,14 +102,14 @@ TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
         << "nobody waits for it";
 }
 
-TEST_F(ApiTokenTest, NothingIsMadeWhereALinkLeads) {
+TEST_F(ApiTokenTest, CreatesNothingThroughALink) {
     const std::string target = directory.file("target");
     std::filesystem::create_symlink(target, path);
     EXPECT_FALSE(ApiToken::load(path));
     EXPECT_FALSE(std::filesystem::exists(target));
 }
 
-TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
+TEST_F(ApiTokenTest, ReportsWhyThereIsNoToken) {
     const std::string deep = directory.file("no/such/api-token");
     EXPECT_EQ(problem(deep), "cannot create the directory " + directory.file("no/such") +
                                  ": No such file or directory");
@@ -135,7 +135,7 @@ TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
     }
 }
 
-TEST(ApiToken, MatchesTheWholeTokenAlone) {
+TEST(ApiToken, MatchesOnlyTheWholeToken) {
     const ApiToken token(secret);
     EXPECT_TRUE(token.matches(secret));
     for (const std::string& wrong :

@@ -11,7 +11,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-TEST(ConnectionShares, NoAddressTakesAllPlaces) {
+TEST(ConnectionShares, NoAddressTakesAllConnections) {
     ConnectionShares shares;
     shares.setMost(80);
     EXPECT_EQ(shares.share(false), 10u);
@@ -31,7 +31,7 @@ TEST(ConnectionShares, NoAddressTakesAllPlaces) {
     EXPECT_TRUE(shares.take("203.0.113.1", false)) << "there is room again";
 }
 
-TEST(ConnectionShares, AllTogetherAreBounded) {
+TEST(ConnectionShares, TheTotalIsBounded) {
     ConnectionShares shares;
     shares.setMost(4);
     EXPECT_EQ(shares.share(false), 4u) << "a few are enough for a browser";
@@ -45,7 +45,7 @@ TEST(ConnectionShares, AllTogetherAreBounded) {
     EXPECT_EQ(shares.refused(), 2u);
 }
 
-TEST(ConnectionShares, TheLastOneIsWaitedFor) {
+TEST(ConnectionShares, WaitsForTheLastConnection) {
     ConnectionShares shares;
     shares.setMost(4);
     EXPECT_TRUE(shares.waitForNone(ConnectionShares::Clock::now()));

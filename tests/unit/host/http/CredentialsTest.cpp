@@ -59,7 +59,7 @@ protected:
     std::string key = directory.file("agent.key");
 };
 
-TEST_F(CredentialsTest, TakesAChangedToken) {
+TEST_F(CredentialsTest, LoadsAChangedToken) {
     Credentials credentials(token, "", "");
     EXPECT_EQ(reasonOf(credentials.load()), "");
     EXPECT_TRUE(credentials.token().matches(first));
@@ -84,7 +84,7 @@ TEST_F(CredentialsTest, ATokenThatCannotBeUsedIsReportedOnce) {
     expectNothingNew(credentials);
 }
 
-TEST_F(CredentialsTest, TakesAChangedCertificate) {
+TEST_F(CredentialsTest, LoadsAChangedCertificate) {
     makePair("one.example");
     take(certificate);
     take(key);
@@ -102,7 +102,7 @@ TEST_F(CredentialsTest, TakesAChangedCertificate) {
     EXPECT_TRUE(before->isFor("one.example")) << "connections that have it live on";
 }
 
-TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
+TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndThePreviousOneStays) {
     makePair("one.example");
     take(certificate);
     take(key);

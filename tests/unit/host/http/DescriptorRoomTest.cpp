@@ -57,7 +57,7 @@ int tableSize() {
     return size;
 }
 
-TEST(DescriptorRoom, IsThereBeforeTheFirstClientComes) {
+TEST(DescriptorRoom, IsReservedBeforeTheFirstClient) {
     const auto inAProcessOfItsOwn = [] {
         const bool wasSmall = tableSize() <= 1024;
         const DescriptorRoom room = DescriptorRoom::make(500);
@@ -67,7 +67,7 @@ TEST(DescriptorRoom, IsThereBeforeTheFirstClientComes) {
     EXPECT_EXIT(inAProcessOfItsOwn(), testing::ExitedWithCode(0), "");
 }
 
-TEST(DescriptorRoom, TakesHalfOfTheFewThatThereAre) {
+TEST(DescriptorRoom, TakesHalfOfFewDescriptors) {
     const auto inAProcessOfItsOwn = [] {
         const rlimit few{100, 100};
         setrlimit(RLIMIT_NOFILE, &few);

@@ -95,7 +95,7 @@ protected:
     HttpServer server{router};
 };
 
-TEST_F(HttpConnectionTest, AnswersHaveTheirOwnHeadersInPlaceOfTheUsualOnes) {
+TEST_F(HttpConnectionTest, AnswersMayReplaceTheUsualHeaders) {
     answer.headers = {{"Cache-Control", "max-age=60"}, {"X-Own", "1"}};
     const auto result = client().get("/answer");
     ASSERT_TRUE(result);
@@ -128,7 +128,7 @@ TEST_F(HttpConnectionTest, OneConnectionServesManyRequests) {
     EXPECT_EQ(server.connections(), 1u);
 }
 
-TEST_F(HttpConnectionTest, ARequestIsReadAsItWasSent) {
+TEST_F(HttpConnectionTest, PassesTheRequestToItsHandler) {
     HttpRequest seen;
     Router other;
     other.add("GET", "/a/{name}", [&](const HttpRequest& request) {
@@ -202,7 +202,7 @@ TEST_F(HttpConnectionTest, AStreamIsSentAsItIsWritten) {
     channel->end();
 }
 
-TEST_F(HttpConnectionTest, AnOlderClientGetsAStreamWithoutChunks) {
+TEST_F(HttpConnectionTest, AnHttp10ClientGetsAStreamWithoutChunks) {
     auto begun = streams();
     auto asked = std::async(std::launch::async, [&, asking = client()]() mutable {
         std::string request = head("/answer");
@@ -216,14 +216,14 @@ TEST_F(HttpConnectionTest, AnOlderClientGetsAStreamWithoutChunks) {
                                             testing::EndsWith("\r\n\r\ntext")));
 }
 
-TEST_F(HttpConnectionTest, HeadBeginsNoStream) {
+TEST_F(HttpConnectionTest, HeadStartsNoStream) {
     std::atomic<bool> hasBegun{false};
     answer.stream.begin = [&](const auto&) { hasBegun = true; };
     EXPECT_EQ(client().ask("HEAD", "/answer")->status, 200);
     EXPECT_FALSE(hasBegun);
 }
 
-TEST_F(HttpConnectionTest, AStreamLearnsThatItsClientHasGone) {
+TEST_F(HttpConnectionTest, AStreamNoticesThatItsClientHasGone) {
     auto begun = streams();
     const int fd = TestClient::connected(server.port());
     const std::string request = head("/answer");
@@ -278,7 +278,7 @@ TEST_F(HttpConnectionTest, AStopDoesNotWaitForAClientThatTakesNothing) {
     close(fd);
 }
 
-TEST_F(HttpConnectionTest, AHandlerLearnsThatItsClientHasGone) {
+TEST_F(HttpConnectionTest, AHandlerNoticesThatItsClientHasGone) {
     std::promise<void> begun;
     std::promise<bool> asked;
     work = [&](const HttpRequest& request) {
@@ -297,7 +297,7 @@ TEST_F(HttpConnectionTest, AHandlerLearnsThatItsClientHasGone) {
     EXPECT_TRUE(asked.get_future().get());
 }
 
-TEST_F(HttpConnectionTest, AHandlerLearnsThatTheServerStops) {
+TEST_F(HttpConnectionTest, AHandlerNoticesThatTheServerStops) {
     std::promise<void> begun;
     work = [&](const HttpRequest& request) {
         begun.set_value();
@@ -322,7 +322,7 @@ TEST_F(HttpConnectionTest, NothingIsCancelledWhileTheClientWaits) {
     EXPECT_EQ(client().get("/answer")->status, 200);
 }
 
-TEST_F(HttpConnectionTest, RequestsThatComeTogetherAreAnsweredInTheirOrder) {
+TEST_F(HttpConnectionTest, PipelinedRequestsAreAnsweredInOrder) {
     std::string last = head("/nothing");
     last.insert(last.size() - 2, "Connection: close\r\n");
     const std::string answers = client().raw("\r\n" + head("/answer") + "\r\n\r\n" +
@@ -336,7 +336,7 @@ TEST_F(HttpConnectionTest, RequestsThatComeTogetherAreAnsweredInTheirOrder) {
     EXPECT_EQ(answers.find("HTTP/1.1", third + 1), std::string::npos);
 }
 
-TEST_F(HttpConnectionTest, AClientThatWaitsIsAskedForTheBody) {
+TEST_F(HttpConnectionTest, AClientThatExpectsContinueGetsIt) {
     std::string request = head("/answer");
     request.replace(0, 3, "POST");
     request.insert(request.size() - 2, "Content-Type: application/json\r\nContent-Length: 2\r\n"
@@ -354,7 +354,7 @@ TEST_F(HttpConnectionTest, AClientThatWaitsIsAskedForTheBody) {
     close(fd);
 }
 
-TEST(HttpConnection, WhoGetsNoWorkerIsToldSoAndOthersAreServedMeanwhile) {
+TEST(HttpConnection, RequestsWithoutAFreeWorkerAreRefusedAndQuickOnesAreServed) {
     RecordingTrace trace(0);
     Router router;
     std::promise<void> go;
@@ -391,7 +391,7 @@ TEST(HttpConnection, WhoGetsNoWorkerIsToldSoAndOthersAreServedMeanwhile) {
     EXPECT_EQ(slow, 2) << "what was refused is not done later";
 }
 
-TEST_F(HttpConnectionTest, WhatWasAnsweredIsCounted) {
+TEST_F(HttpConnectionTest, AnsweredRequestsAreCounted) {
     client().get("/answer");
     client().ask("HEAD", "/answer");
     client().get("/nothing");

@@ -106,7 +106,7 @@ TEST_F(HttpServerTest, HealthNeedsNoToken) {
     EXPECT_EQ(result->header("content-type"), "application/json");
 }
 
-TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
+TEST_F(HttpServerTest, ASampleReturnsItsRowsAndTheirNumber) {
     source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
         EXPECT_EQ(table, "RMMONLOG");
         EXPECT_EQ(conditions.size(), 1u);
@@ -175,7 +175,7 @@ TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
                   "requests from other origins are refused", "Origin");
 }
 
-TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
+TEST_F(HttpServerTest, RefusesUnknownPaths) {
     expectProblem(sample("NOTABLE", "{}"), 404,
                   "no such table; the tables are RMLOGENT and RMMONLOG", "table");
     expectProblem(client().get("/nothing"), 404, "there is nothing at this path", "");
@@ -188,7 +188,7 @@ TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
                   "this path answers GET, HEAD, not this method", "");
 }
 
-TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
+TEST_F(HttpServerTest, RefusesInvalidBodies) {
     expectProblem(sample("RMMONLOG", "{"), 400, "the body is not JSON", "body");
     expectProblem(sample("RMMONLOG", R"({"filters":[{}]})"), 400, "write a text",
                   "filters[0].column");
@@ -225,7 +225,7 @@ TEST_F(HttpServerTest, ASampleThatFailsIsAnInternalError) {
                 testing::ElementsAre("Request for /api/v1/tables/RMMONLOG/sample failed: secret"));
 }
 
-TEST_F(HttpServerTest, SamplesWaitSideBySide) {
+TEST_F(HttpServerTest, SamplesRunConcurrently) {
     std::mutex mutex;
     std::condition_variable changed;
     int waiting = 0;
@@ -259,7 +259,7 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
     }
 }
 
-TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
+TEST_F(HttpServerTest, APortInUseIsReported) {
     HttpServer second(router);
     EXPECT_EQ(reasonOf(second.start({"127.0.0.1", server.port()}, ApiToken(secret))),
               "cannot listen on 127.0.0.1:" + std::to_string(server.port()) +
@@ -269,7 +269,7 @@ TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
               "cannot listen on 203.0.113.1:0");
 }
 
-TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
+TEST_F(HttpServerTest, StopAnswersRequestsInProgressAndClosesIdleConnections) {
     TestClient idle("127.0.0.1", server.port());
     EXPECT_EQ(idle.get("/healthz")->status, 200);
     std::promise<void> begun;
@@ -312,13 +312,13 @@ TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
     slow.join();
 }
 
-TEST_F(HttpServerTest, LeavesTheActionOfSignalsAsItWas) {
+TEST_F(HttpServerTest, LeavesSignalActionsUnchanged) {
     std::signal(SIGPIPE, SIG_DFL);
     { HttpServer another(router); }
     EXPECT_EQ(std::signal(SIGPIPE, SIG_IGN), SIG_DFL);
 }
 
-TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
+TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndStartsNoMore) {
     std::promise<void> begun;
     std::promise<void> go;
     std::shared_future<void> mayGo = go.get_future().share();

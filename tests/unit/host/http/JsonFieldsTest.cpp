@@ -31,7 +31,7 @@ std::string refused(const std::string& body, const std::function<void(JsonFields
 
 void nothing(JsonFields& /*fields*/) {}
 
-TEST(JsonFields, GivesMembersByType) {
+TEST(JsonFields, ReturnsMembersByType) {
     JsonFields fields(
         R"({"log":"/var/log/x","last":5,"where":["a","b"],"definition":{"name":"n"}})");
     EXPECT_EQ(fields.text("log"), "/var/log/x");
@@ -62,7 +62,7 @@ TEST(JsonFields, MissingAndNullAreTheSame) {
     }
 }
 
-TEST(JsonFields, RefusesBodiesThatAreNoObject) {
+TEST(JsonFields, RefusesBodiesThatAreNotObjects) {
     for (const char* const body : {"{", "{}x", "\"\xff\"", "{\"a\":1,}", "{\"a\":NaN}", "'"}) {
         EXPECT_EQ(refused(body, nothing), "body: the body is not JSON") << body;
     }
@@ -92,7 +92,7 @@ TEST(JsonFields, RefusesOtherTypes) {
     EXPECT_EQ(refused(R"({"a":[]})", [](JsonFields& f) { f.object("a"); }), "a: write an object");
 }
 
-TEST(JsonFields, RefusesMembersThatNobodyAskedFor) {
+TEST(JsonFields, RefusesUnknownMembers) {
     const auto read = [](JsonFields& f) {
         f.optionalText("log");
         f.optionalText("logs");

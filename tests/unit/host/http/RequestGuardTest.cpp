@@ -39,7 +39,7 @@ TEST_F(RequestGuardTest, TheHostIsTheListenAddressOrLocalhost) {
     EXPECT_EQ(status({"evil.example:7186", {}, {}}, true), 421) << "public paths too";
 }
 
-TEST_F(RequestGuardTest, ThePortMayBeLeftOutWhereItIsTheUsualOne) {
+TEST_F(RequestGuardTest, TheDefaultPortIsOptional) {
     const RequestGuard usual({"127.0.0.1", 80}, ApiToken(secret));
     EXPECT_TRUE(usual.check({"localhost", {}, bearer}, false));
     EXPECT_TRUE(usual.check({"localhost:80", {}, bearer}, false));
@@ -56,7 +56,7 @@ TEST_F(RequestGuardTest, ForeignOriginsAreRefused) {
     }
 }
 
-TEST_F(RequestGuardTest, EverythingThatIsNotPublicNeedsTheToken) {
+TEST_F(RequestGuardTest, EverythingElseNeedsTheToken) {
     const auto with = [&](const std::optional<std::string>& authorization) {
         return status({"localhost:7186", {}, authorization});
     };
@@ -71,7 +71,7 @@ TEST_F(RequestGuardTest, EverythingThatIsNotPublicNeedsTheToken) {
     EXPECT_EQ(status({"localhost:7186", {}, {}}, true), 200);
 }
 
-TEST_F(RequestGuardTest, SaysWhatIsMissingAndWhere) {
+TEST_F(RequestGuardTest, ReportsWhatIsMissing) {
     const auto allowed = guard.check({"localhost:7186", {}, {}}, false);
     ASSERT_FALSE(allowed);
     EXPECT_EQ(allowed.error().json(),

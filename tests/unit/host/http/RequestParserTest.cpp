@@ -36,7 +36,7 @@ int statusOf(const std::string& head) {
     return incoming.refusal ? incoming.refusal->status : 200;
 }
 
-TEST(RequestParserTest, TakesARequestApart) {
+TEST(RequestParserTest, ParsesARequest) {
     const IncomingRequest incoming =
         read("GET /a/b%20c?x=1&y=%2F#end HTTP/1.1\r\nhost:h:1\r\nORIGIN: http://h:1\r\n"
              "Authorization: \t Bearer a%41+b \t\r\nAccept: text/html\r\n"
@@ -54,7 +54,7 @@ TEST(RequestParserTest, TakesARequestApart) {
     EXPECT_FALSE(incoming.isLast);
 }
 
-TEST(RequestParserTest, TheHostMayStandInTheTarget) {
+TEST(RequestParserTest, TheHostMayBeInTheTarget) {
     const IncomingRequest whole = read("GET HTTP://localhost:7186/a?b HTTP/1.1\r\nHost: other");
     EXPECT_EQ(whole.headers.host, "localhost:7186");
     EXPECT_EQ(whole.request.path, "/a");
@@ -65,7 +65,7 @@ TEST(RequestParserTest, TheHostMayStandInTheTarget) {
     EXPECT_EQ(bare.rawQuery, "/healthz");
 }
 
-TEST(RequestParserTest, ABodyHasALengthOrComesInChunks) {
+TEST(RequestParserTest, ABodyHasALengthOrIsChunked) {
     const IncomingRequest withLength = read(post + "Content-Length: 12");
     EXPECT_TRUE(withLength.hasBody);
     EXPECT_EQ(withLength.length, 12u);
@@ -77,7 +77,7 @@ TEST(RequestParserTest, ABodyHasALengthOrComesInChunks) {
     EXPECT_TRUE(chunked.isLast) << "nothing behind chunks is taken for a request";
 }
 
-TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
+TEST(RequestParserTest, AmbiguousRequestsAreRefused) {
     for (const char* const line : {"Content-Length : 2",
                                    "Content-Length: %32",
                                    "Content-Length:",
@@ -119,7 +119,7 @@ TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
     }
 }
 
-TEST(RequestParserTest, WhatIsNoRequestLineIsRefused) {
+TEST(RequestParserTest, InvalidRequestLinesAreRefused) {
     for (const char* const line :
          {"", "GET", "GET /", "GET  / HTTP/1.1", "GET / HTTP/1.1 ", "GET / HTTP/1.2",
           "GET / http/1.1", "get / HTTP/1.1", "BREW / HTTP/1.1", " GET / HTTP/1.1",
@@ -139,7 +139,7 @@ TEST(RequestParserTest, LongTargetsAndHeadersAreRefused) {
     EXPECT_EQ(statusOf(post + line + "x"), 431);
 }
 
-TEST(RequestParserTest, BoundsHeads) {
+TEST(RequestParserTest, LimitsHeads) {
     const std::string begin = "GET / HTTP/1.1\r\n";
     std::string head = begin;
     while (head.size() + 7010 < RequestParser::largestHead) {
@@ -158,7 +158,7 @@ TEST(RequestParserTest, BoundsHeads) {
     EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing reads it";
 }
 
-TEST(RequestParserTest, ChunksNeedTheVersionThatHasThem) {
+TEST(RequestParserTest, ChunksNeedHttp11) {
     EXPECT_EQ(statusOf("POST / HTTP/1.0\r\nHost: h\r\nTransfer-Encoding: chunked"), 400);
 }
 
@@ -202,7 +202,7 @@ TEST(RequestParserTest, ReadsBodiesToTheirEnd) {
     EXPECT_EQ(chunks.rest, "X");
 }
 
-TEST(RequestParserTest, RefusesChunksThatAreUnclearOrTooLong) {
+TEST(RequestParserTest, RefusesChunksThatAreAmbiguousOrTooLong) {
     for (const char* const chunks :
          {"zz\r\n", "0x2\r\nbo", "-1\r\n", "2\nbo\n", "2\r\nbody", " 2\r\nbo", "2 \r\nbo\r\n",
           "2;=\r\n", "2\r\nbo\r\n0\r\nX: y\nz\r\n\r\n", "0\r\nContent-Length: 7\r\n\r\n"}) {
@@ -214,7 +214,7 @@ TEST(RequestParserTest, RefusesChunksThatAreUnclearOrTooLong) {
     EXPECT_NE(readBody("Transfer-Encoding: chunked", "fffffffffffffffff\r\n").status, 200);
 }
 
-TEST(RequestParserTest, TheClientSaysWhetherItsConnectionLivesOn) {
+TEST(RequestParserTest, TheClientDecidesWhetherItsConnectionIsKept) {
     const auto isLast = [](const std::string& head) { return read(head).isLast; };
     EXPECT_FALSE(isLast(post + "Connection: keep-alive"));
     EXPECT_TRUE(isLast(post + "Connection: close"));

@@ -12,7 +12,7 @@ using namespace zrm::host;
 
 namespace {
 
-TEST(WorkerPool, DoesItsWorkInOrderOnAsManyThreadsAsWanted) {
+TEST(WorkerPool, RunsWorkInOrderOnAtMostTheGivenThreads) {
     std::promise<void> go;
     std::shared_future<void> mayGo = go.get_future().share();
     std::atomic<int> begun{0};
@@ -39,7 +39,7 @@ TEST(WorkerPool, DoesItsWorkInOrderOnAsManyThreadsAsWanted) {
     EXPECT_EQ(done, 6) << "what was taken is done";
 }
 
-TEST(WorkerPool, AThreadThatIsFreeTakesTheNextWork) {
+TEST(WorkerPool, AnIdleThreadTakesTheNextWork) {
     WorkerPool pool(8, 8);
     std::set<std::thread::id> threads;
     for (int count = 0; count < 20; ++count) {

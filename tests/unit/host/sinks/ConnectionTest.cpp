@@ -25,7 +25,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsMadeAnew) {
+TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsOpenedAgain) {
     std::uint16_t port = 0;
     close(localSocket(SOCK_DGRAM, port)); // nobody has the port now
     Connection connection(ListenAddress{"127.0.0.1", port}, Connection::UDP, 1s);
@@ -39,7 +39,7 @@ TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsMadeAnew) {
     EXPECT_FALSE(connection.isOpen()) << "the address it is bound to may be this machine's no more";
 }
 
-TEST_F(ConnectionTest, ANameThatIsLookedUpForLongHoldsNobodyUp) {
+TEST_F(ConnectionTest, ASlowLookupEndsInTime) {
     FakeResolver resolver("127.0.0.1");
     std::uint16_t port = 0;
     const int listener = localSocket(SOCK_STREAM, port);

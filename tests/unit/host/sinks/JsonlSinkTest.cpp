@@ -67,7 +67,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
+TEST_F(JsonlSinkTest, CreatesTheFileAndAppendsALinePerEvent) {
     JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.name(), path);
     EXPECT_EQ(sink.deliver(from(0).first(1), giveUp.get_token()), 1u);
@@ -78,19 +78,19 @@ TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
     EXPECT_EQ(status.st_mode & 0007, 0u) << "events are not for every user";
 }
 
-TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
+TEST_F(JsonlSinkTest, KeepsTheFilesContents) {
     directory.write("events.jsonl", "earlier\n");
     JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n" + lines);
 }
 
-TEST_F(JsonlSinkTest, ALineThatAKilledAgentLeftTornIsEnded) {
+TEST_F(JsonlSinkTest, ALineTornByAKilledAgentIsTerminated) {
     directory.write("events.jsonl", "earlier\n{\"id\":1,\"situ");
     JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n{\"id\":1,\"situ\n" + lines);
 }
 
-TEST_F(JsonlSinkTest, ATornLineThatCannotBeEndedIsAFailure) {
+TEST_F(JsonlSinkTest, ATornLineThatCannotBeTerminatedIsAFailure) {
     directory.write("events.jsonl", "{\"id\":1");
     JsonlSink sink(SinkConfig::jsonl(path));
     {
@@ -112,7 +112,7 @@ TEST_F(JsonlSinkTest, AFileThatBecomesADirectoryIsAFailureUntilItIsOneAgain) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
+TEST_F(JsonlSinkTest, ReopensAFileThatWasMovedOrRemoved) {
     const std::string removed = directory.file("removed.jsonl");
     JsonlSink movedSink(SinkConfig::jsonl(path));
     JsonlSink removedSink(SinkConfig::jsonl(removed));
@@ -136,7 +136,7 @@ TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     EXPECT_THAT(content(removed), testing::StartsWith(TestEvents::line(2, "two")));
 }
 
-TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
+TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCanBe) {
     const std::string inside = directory.file("later/events.jsonl");
     JsonlSink sink(SinkConfig::jsonl(inside));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
@@ -163,7 +163,7 @@ TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
+TEST_F(JsonlSinkTest, AnInterruptedWriteContinues) {
     JsonlSink sink(SinkConfig::jsonl(path));
     Fault fault("write", EINTR, {.times = 3});
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
@@ -171,7 +171,7 @@ TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
+TEST_F(JsonlSinkTest, ATornLineIsRemovedAndWrittenInFullLater) {
     const std::size_t first = TestEvents::line(1, "one").size();
     JsonlSink sink(SinkConfig::jsonl(path));
     {
@@ -258,7 +258,7 @@ TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
     EXPECT_EQ(readAll(), lines);
 }
 
-TEST_F(JsonlSinkPipeTest, SaysSinceWhenItsReaderTakesNothing) {
+TEST_F(JsonlSinkPipeTest, ReportsSinceWhenItsReaderTakesNothing) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     EXPECT_EQ(sink.waitsSince(), std::nullopt);
     const auto begin = std::chrono::steady_clock::now();
@@ -287,7 +287,7 @@ TEST_F(JsonlSinkTest, ALinkIsNotFollowed) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
 }
 
-TEST_F(JsonlSinkTest, AFileThatALinkReplacedIsLeft) {
+TEST_F(JsonlSinkTest, AFileReplacedByALinkIsClosed) {
     JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     std::filesystem::rename(path, directory.file("moved"));
@@ -299,7 +299,7 @@ TEST_F(JsonlSinkTest, AFileThatALinkReplacedIsLeft) {
     EXPECT_EQ(content(directory.file("moved")), lines);
 }
 
-TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
+TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilGiveUp) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     std::string expected;
     std::string written;
@@ -325,7 +325,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
     EXPECT_EQ(written + readAll(), expected);
 }
 
-TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithThoseWhoWriteIntoItToo) {
+TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithOtherWriters) {
     std::fflush(stdout);
     const int output = dup(STDOUT_FILENO);
     const int file = ::open(path.c_str(), O_WRONLY | O_CREAT, 0600); // not for appending
@@ -371,7 +371,7 @@ private:
     int m_master = -1;
 };
 
-TEST_F(JsonlSinkTerminalTest, ATerminalWithLittleRoomDoesNotHoldUpTheEnd) {
+TEST_F(JsonlSinkTerminalTest, ATerminalWithLittleRoomDoesNotDelayTheStop) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     auto delivering = std::async(std::launch::async, [&] {
         while (sink.deliver(from(0), giveUp.get_token()) == 3) {

@@ -122,7 +122,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(SyslogSinkTest, FramesTellTheirLength) {
+TEST_F(SyslogSinkTest, FramesBeginWithTheirLength) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(sink.name(), "syslog 127.0.0.1:" + std::to_string(listener.port));
@@ -147,7 +147,7 @@ TEST_F(SyslogSinkTest, WithoutAReceiverThereIsNoDelivery) {
     EXPECT_EQ(Socket(back).read(frames(0, 3).size()), frames(0, 3));
 }
 
-TEST_F(SyslogSinkTest, ANameThatIsNotKnownIsTold) {
+TEST_F(SyslogSinkTest, AnUnknownNameIsReported) {
     SinkConfig unknown = config(514);
     unknown.options["address"] = std::string("nowhere.invalid:514");
     SyslogSink sink(unknown);
@@ -215,7 +215,7 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     }
 }
 
-TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
+TEST_F(SyslogSinkTest, WhatTheReceiverSendsIsDiscarded) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(deliver(sink, 0, 1), 1u);
@@ -225,7 +225,7 @@ TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
     EXPECT_EQ(connection.read(frames(0, 2).size()), frames(0, 2));
 }
 
-TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
+TEST_F(SyslogSinkTest, AReceiverThatNeverStopsSendingIsDisconnected) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(deliver(sink, 0, 1), 1u);
@@ -247,7 +247,7 @@ TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
     EXPECT_TRUE(listener.hasInput(0)) << "after " << again << " deliveries";
 }
 
-TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidSomething) {
+TEST_F(SyslogSinkTest, WhatWasSentArrivesAlthoughTheReceiverHasSentSomething) {
     const Socket listener(SOCK_STREAM);
     for (int count = 0; count < 300; ++count) {
         events.add({.description = std::string(1500, 'x')});
@@ -260,7 +260,7 @@ TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidS
     EXPECT_EQ(connection.read(frames(0, 303).size()), frames(0, 303));
 }
 
-TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
+TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsAbandonedOnGiveUp) {
     const Socket listener(SOCK_STREAM);
     const std::string large(1500, 'x');
     for (int count = 0; count < 5000; ++count) {
@@ -291,7 +291,7 @@ TEST_F(SyslogSinkTest, OverUdpEachMessageIsADatagram) {
     EXPECT_FALSE(receiver.hasInput(0));
 }
 
-TEST_F(SyslogSinkTest, OverUdpAPortThatNobodyHasIsAFailureOnceItIsTold) {
+TEST_F(SyslogSinkTest, OverUdpAnUnusedPortIsAFailureOnceItIsReported) {
     std::uint16_t port = 0;
     {
         const Socket gone(SOCK_DGRAM);

@@ -89,7 +89,7 @@ protected:
     std::unique_ptr<SituationSet> set;
 };
 
-TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
+TEST_F(SituationChanges, TakeEffectBeforeTheCallReturns) {
     EXPECT_EQ(done(set->add(situation("a"))).state, SituationStatus::RUNNING);
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
     EXPECT_EQ(done(set->replace(situation("a", {"ENTRYSRC = 'y'"}))).config.when.size(), 1u);
@@ -104,7 +104,7 @@ TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
     EXPECT_FALSE(set->find("a"));
 }
 
-TEST_F(SituationChanges, HaveALimitForTheirRegularExpressionsTogether) {
+TEST_F(SituationChanges, LimitTheirRegularExpressionsTogether) {
     SituationConfig large = situation("a");
     large.patternSize = PatternBudget::ofSource / 2 + 1;
     EXPECT_EQ(done(set->add(large)).state, SituationStatus::RUNNING);
@@ -118,7 +118,7 @@ TEST_F(SituationChanges, HaveALimitForTheirRegularExpressionsTogether) {
     EXPECT_EQ(done(set->replace(large)).state, SituationStatus::RUNNING);
 }
 
-TEST_F(SituationChanges, OutliveTheProcess) {
+TEST_F(SituationChanges, SurviveTheProcess) {
     set->apply({situation("filed")});
     set->add(situation("a"));
     set->add(situation("b"));
@@ -136,7 +136,7 @@ TEST_F(SituationChanges, OutliveTheProcess) {
     EXPECT_THAT(raisedBy("x"), testing::UnorderedElementsAre("filed", "other"));
 }
 
-TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
+TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStopped) {
     set->apply({situation("filed")});
     set->stop("filed");
     set->apply({});
@@ -152,7 +152,7 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
     EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
 }
 
-TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMoreAfterARestartEither) {
+TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStoppedAfterARestart) {
     set->apply({situation("filed"), situation("other")});
     set->stop("filed");
     set->stop("other");
@@ -164,7 +164,7 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMoreAfterARestartE
     EXPECT_EQ(set->find("other")->state, SituationStatus::STOPPED);
 }
 
-TEST_F(SituationChanges, AFileThatIsAppliedAgainWritesNothing) {
+TEST_F(SituationChanges, ApplyingAFileAgainSavesNothing) {
     set->apply({situation("filed")});
     set->stop("filed");
     const Fault fault("open", EIO);
@@ -173,7 +173,7 @@ TEST_F(SituationChanges, AFileThatIsAppliedAgainWritesNothing) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(SituationChanges, AFilesSituationIsForgottenAlsoWhenThatCannotBeSaved) {
+TEST_F(SituationChanges, ARemovedSituationOfTheFileIsForgottenEvenWhenThatCannotBeSaved) {
     set->apply({situation("filed")});
     set->stop("filed");
     {
@@ -226,7 +226,7 @@ TEST_F(SituationChanges, AreNotMadeWhenTheyCannotBeSaved) {
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
 }
 
-TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
+TEST_F(SituationChanges, TheFilesSituationHidesOneOfTheSameName) {
     set->add(situation("a", {}, "minor"));
     set->apply({situation("a", {}, "critical")});
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
@@ -250,7 +250,7 @@ TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
 }
 
-TEST_F(SituationChanges, CountsBeginAnewWithAnotherDefinitionOnly) {
+TEST_F(SituationChanges, CountsStartOverOnlyWithAnotherDefinition) {
     set->add(situation("a"));
     raisedBy("x");
     EXPECT_EQ(set->find("a")->raised, 1u);
@@ -269,7 +269,7 @@ TEST_F(SituationChanges, CountsBeginAnewWithAnotherDefinitionOnly) {
     EXPECT_EQ(set->find("a")->lastRaised, 0);
 }
 
-TEST_F(SituationChanges, ThereIsAMostNumber) {
+TEST_F(SituationChanges, TheirNumberIsLimited) {
     std::string text = R"({"version":1,"stopped":[],"situations":[)";
     for (std::size_t number = 0; number < SituationSet::mostMade; ++number) {
         text += (number == 0 ? "" : ",") + (R"({"name":"s)" + std::to_string(number)) +
@@ -286,7 +286,7 @@ TEST_F(SituationChanges, ThereIsAMostNumber) {
     EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
 }
 
-TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) {
+TEST_F(SituationChanges, WhatRunsIsWhatIsSavedHoweverReloadsAndChangesInterleave) {
     const std::vector<SituationConfig> both = {situation("a", {"ENTRYSRC = 'never'"}),
                                                situation("b", {"ENTRYSRC = 'never'"})};
     set->apply(both);
@@ -324,7 +324,7 @@ TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) 
     EXPECT_EQ(inForce.size(), 2u);
 }
 
-TEST_F(SituationChanges, MayBeAskedForByManyThreadsWhileEntriesArrive) {
+TEST_F(SituationChanges, MayComeFromManyThreadsWhileEntriesArrive) {
     set->apply({situation("filed", {"ENTRYSRC = 'never'"})});
     std::atomic<bool> isOver{false};
     std::thread log([&] {

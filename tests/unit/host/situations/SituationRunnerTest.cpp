@@ -70,7 +70,7 @@ TEST_F(SituationRunnerTest, OpensAndCloses) {
     EXPECT_EQ(counts->requests.matched(), 2u);
 }
 
-TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutWhoeverAsks) {
+TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutBlockingTheCaller) {
     SituationRunner runner(entries, queue);
     runner.start("old", named("old"), counts);
     ASSERT_TRUE(runner.settle(10s));
@@ -91,7 +91,7 @@ TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutWhoeverAsks) {
     EXPECT_EQ(newCounts->raised(), 1u);
 }
 
-TEST_F(SituationRunnerTest, TheLastWordCountsWhileItWaits) {
+TEST_F(SituationRunnerTest, TheLastRequestWinsWhileItWaits) {
     SituationRunner runner(entries, queue);
     auto later = std::make_shared<SituationCounts>();
     {
@@ -113,7 +113,7 @@ TEST_F(SituationRunnerTest, TheLastWordCountsWhileItWaits) {
     EXPECT_EQ(counts->raised(), 0u);
 }
 
-TEST_F(SituationRunnerTest, ClosesEverythingForGood) {
+TEST_F(SituationRunnerTest, CloseIsFinal) {
     SituationRunner runner(entries, queue);
     runner.start("a", named("a"), counts);
     runner.start("b", named("b"), std::make_shared<SituationCounts>());
@@ -126,7 +126,7 @@ TEST_F(SituationRunnerTest, ClosesEverythingForGood) {
     EXPECT_TRUE(runner.settle(0s));
 }
 
-TEST(SituationRunner, TellsWhatTheTableRefusedAndWhatTheAgentEnded) {
+TEST(SituationRunner, ReportsWhatTheTableRefusedAndWhatTheAgentStopped) {
     const RecordingTrace trace(TRC1_ERROR);
     TestManager table;
     EventQueue queue(1, sizeof(TestRow));

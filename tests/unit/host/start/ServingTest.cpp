@@ -71,7 +71,7 @@ protected:
     Watchdog watchdog; // not started: it looks after a whole process
 };
 
-TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
+TEST_F(ServingTest, DeliversEventsFromStartToStop) {
     const auto serving = Serving::begin(config, entries, watchdog);
     ASSERT_NE(serving, nullptr);
     EXPECT_EQ(arrive(), 0u);
@@ -108,7 +108,7 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
     EXPECT_EQ(Serving::countLogs(), 0u);
 }
 
-TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
+TEST_F(ServingTest, AStopReleasesAWaitingLogAndEndsAtItsLimit) {
     config.history.enabled = false; // the queue is all the room there is
     config.sinks = {SinkConfig::jsonl("/dev/full")};
     const auto serving = Serving::begin(config, entries, watchdog);
@@ -146,7 +146,7 @@ TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
     EXPECT_NE(arrive(), 0u);
 }
 
-TEST_F(ServingTest, SaysWhereHttpIs) {
+TEST_F(ServingTest, ReportsTheAddressOfHttp) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     const auto serving = Serving::begin(config, entries, watchdog);
     testing::internal::CaptureStderr();
@@ -158,7 +158,7 @@ TEST_F(ServingTest, SaysWhereHttpIs) {
     serving->stop(Clock::now() + 10s);
 }
 
-TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
+TEST_F(ServingTest, WithoutATokenOnlyHttpIsOff) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     config.http.tokenFile = directory.file("no/such/token");
     const auto serving = Serving::begin(config, entries, watchdog);
@@ -172,7 +172,7 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     EXPECT_EQ(lines(), 1);
 }
 
-TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
+TEST_F(ServingTest, UndeliveredEventsAreKeptForTheNextStart) {
     const std::vector<SinkConfig> good = config.sinks;
     config.sinks = {SinkConfig::jsonl(directory.file("no/such/directory/events.jsonl"))};
     auto serving = Serving::begin(config, entries, watchdog);
