@@ -21,7 +21,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// A client of a stream, which takes everything at once unless it is told not to.
+/// A client of a stream, which by default takes everything at once.
 class Client {
 public:
     explicit Client(const HttpAnswer& answer, bool takesAll = true)
@@ -29,7 +29,7 @@ public:
         answer.stream.begin(m_channel);
     }
     ~Client() { leave(); }
-    /// Waits for the text that came so far to end with this one.
+    /// Waits until the text received so far ends with this one.
     bool gets(const std::string& end) {
         return m_channel->waitFor([&] { return m_channel->text.ends_with(end); });
     }
@@ -148,7 +148,7 @@ TEST_F(EventStreamTest, ContinuesAfterTheClientsLastEvent) {
         EXPECT_TRUE(client.gets(message(500)));
         EXPECT_EQ(client.text(), expected);
     }
-    // Ids beyond the newest belong to a history that is no more.
+    // Ids beyond the newest belong to a history that no longer exists.
     Client beyond(open("?after=100000"));
     EXPECT_TRUE(beyond.gets("retry: 2000\n\n"));
     history.add(501);
@@ -179,7 +179,7 @@ TEST_F(EventStreamTest, EndsWhenTheClientHasGone) {
     EXPECT_EQ(stream.clients(), 1u);
     client.leave();
     EXPECT_TRUE(hasNoClients());
-    // Whoever comes then is served by a new thread.
+    // A later client is served by a new thread.
     Client another(open());
     EXPECT_TRUE(another.gets("retry: 2000\n\n"));
     history.add(1);

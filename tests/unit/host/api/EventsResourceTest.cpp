@@ -52,7 +52,7 @@ TEST_F(EventsResourceTest, ASearchThatStoppedSaysWhereToContinue) {
     history.add(8);
     EXPECT_EQ(get("/api/v1/events?text=x&limit=1"),
               R"(200 {"events":[{"id":8}],"next":8,"oldest":7,"newest":8,"damaged":[6,5]})")
-        << "a page that is full goes on behind its last event";
+        << "a full page continues after its last event";
     EXPECT_EQ(get("/api/v1/events?text=" + std::string(257, 'x')),
               "400 text: write at most 256 bytes");
 }

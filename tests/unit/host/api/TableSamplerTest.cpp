@@ -70,7 +70,7 @@ TEST_F(TableSamplerTest, IsTruncatedWhenTheAgentReadAsManyRowsAsItMay) {
     EXPECT_FALSE(sampler.take("RMLOGENT", {condition}).truncated);
     rows = 3;
     const SampleSource::Rows sample = sampler.take("RMLOGENT", {condition});
-    EXPECT_TRUE(sample.truncated) << "whatever the conditions left over";
+    EXPECT_TRUE(sample.truncated) << "however many rows the conditions leave";
     EXPECT_EQ(sample.count, 1u);
 }
 

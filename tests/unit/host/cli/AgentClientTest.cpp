@@ -65,7 +65,7 @@ TEST_F(AgentClientTest, SendsTokenQueryAndBody) {
     agent.begin();
     AgentClient client(agent.connection());
     const auto got = client.get("/events", {{"log", "/var/log/a b&c=d+e.log"}, {"log", "/x"}});
-    EXPECT_EQ(got.dump(), R"({"b":1,"a":2})") << "answered to those who carry the token alone";
+    EXPECT_EQ(got.dump(), R"({"b":1,"a":2})") << "only requests with the token are answered";
     EXPECT_EQ(seen().query.count("log"), 2u);
     EXPECT_EQ(seen().query.find("log")->second, "/var/log/a b&c=d+e.log");
     client.send("PUT", "/trace", {{"levels", "error"}});

@@ -25,8 +25,8 @@ using testing::ElementsAre;
 
 namespace {
 
-/// An agent whose stream gives what a test has scripted for each connection, and then ends it, or
-/// stays silent when that was the last. The operator presses Ctrl-C when the last event has come.
+/// An agent whose stream sends what a test has scripted for each connection and then ends it, or
+/// stays silent after the last. The operator presses Ctrl-C when the last event has arrived.
 class EventFollowerTest : public testing::Test {
 protected:
     struct Part {
@@ -34,7 +34,7 @@ protected:
         int status = 200;
     };
 
-    /// The threads of the server, too, leave the signal to the follower.
+    /// The server's threads leave the signal to the follower, too.
     void SetUp() override {
         sigset_t signals;
         sigemptyset(&signals);
@@ -96,7 +96,7 @@ protected:
         return ids;
     }
 
-    /// What the server's threads have noted.
+    /// What the server's threads have recorded.
     std::vector<std::string> copy(const std::vector<std::string>& texts) {
         const std::lock_guard guard(mutex);
         return texts;
@@ -173,7 +173,7 @@ TEST_F(EventFollowerTest, FollowingContinuesAfterTheAgentRestarts) {
     addRoutes();
     agent.begin();
     std::thread restart([this] {
-        while (received == 0) { // what is on its way when the agent ends may not arrive
+        while (received == 0) { // what is being sent when the agent ends may not arrive
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
         agent.end();

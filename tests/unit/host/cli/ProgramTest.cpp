@@ -45,7 +45,7 @@ protected:
     void answerWith(const std::string& body) {
         answerBy([=](const HttpRequest&) { return HttpAnswer::json(body); });
     }
-    /// What the handler has noted.
+    /// What the handler has recorded.
     std::string copy(const std::string& text) {
         const std::lock_guard guard(mutex);
         return text;

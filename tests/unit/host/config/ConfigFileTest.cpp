@@ -415,7 +415,7 @@ TEST(ConfigFile, APipeIsNotRead) {
 }
 
 TEST(ConfigFile, TheRegularExpressionsOfAFileAreLimitedTogether) {
-    // Each situation takes more than two thirds of what one may take.
+    // Each situation takes more than two thirds of its budget.
     const std::string pattern = "\"ENTRYDESC matches '[^,]{800}'\"";
     const auto file = [&](int situations) {
         std::string text;

@@ -86,7 +86,7 @@ TEST(SituationValidator, ChecksTheLimitsOfTextAndConditions) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("text", "when"));
     text.text.reset();
     text.when.assign(16, std::string(4096, 'x'));
-    EXPECT_EQ(fieldsOf(text).size(), 16u) << "each is looked at";
+    EXPECT_EQ(fieldsOf(text).size(), 16u) << "each is checked";
     text.when.emplace_back("x");
     EXPECT_THAT(fieldsOf(text), ElementsAre("when"));
 }

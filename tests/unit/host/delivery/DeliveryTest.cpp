@@ -115,7 +115,7 @@ TEST_F(DeliveryTest, ASinkThatHangsAtTheStopLeavesTheOthersTheirTime) {
     Delivery delivery(configFor({"/dev/full", later}), testLayout(), sizeof(TestRow));
     delivery.start();
     push(delivery, "a");
-    // Both fail, with pauses that have grown.
+    // Both fail, and their pauses have grown.
     const auto limit = Clock::now() + 20s;
     while (delivery.sinkStates()[1].retryIn.value_or(0ms) < 2s && Clock::now() < limit) {
         std::this_thread::sleep_for(1ms);

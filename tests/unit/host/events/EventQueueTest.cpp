@@ -141,7 +141,7 @@ TEST(EventQueue, ReportsWhenItIsFullAndWhenAQuarterIsFreeAgain) {
     EXPECT_THAT(told, testing::ElementsAre());
     push(queue, "7");
     EXPECT_THAT(told, testing::ElementsAre(true));
-    push(queue, "8"); // aside
+    push(queue, "8"); // kept aside
     queue.release(reader, 2);
     EXPECT_THAT(told, testing::ElementsAre(true));
     queue.release(reader, 1);
@@ -217,8 +217,8 @@ TEST(EventQueue, KeepsTheOrderOfEachThread) {
 TEST(EventQueue, GathersEventsForAWaitingReader) {
     EventQueue queue(400, rowSize);
     const EventQueue::Reader reader = queue.addReader();
-    // A hundred events, a quarter of the room, end the gathering; the first alone does not. A
-    // machine that is busy elsewhere may let the time of gathering pass, but not every time.
+    // A hundred events, a quarter of the capacity, end the wait for more; the first alone does not.
+    // On a busy machine the time for gathering may pass first, but not every time.
     bool gathered = false;
     for (int attempt = 0; attempt < 50 && !gathered; ++attempt) {
         auto woken = std::async(std::launch::async, [&] { return queue.read(reader, 400).size(); });

@@ -65,7 +65,7 @@ TEST(RowJson, EscapesCharactersThatJsonDoesNotAllow) {
     EXPECT_EQ(jsonText("a\xFF\xE2\x82z"), "\"a\uFFFD\uFFFDz\"");
 }
 
-// Each byte at each place of the eight that are examined together.
+// Each byte at each of the eight positions that are examined together.
 TEST(RowJson, EscapesAtEveryPosition) {
     for (int byte = 0; byte < 128; ++byte) {
         for (std::size_t place = 0; place < 20; ++place) {

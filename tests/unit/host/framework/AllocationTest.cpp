@@ -13,7 +13,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// Takes rows without keeping them.
+/// Accepts rows without keeping them.
 class Sink : public RowReceiver {
 public:
     unsigned receive(const ctreq& /*request*/, const char* /*rows*/, unsigned count) override {
@@ -41,7 +41,7 @@ TEST(Allocation, NoneForARowOfASituation) {
     TestRow row("/var/log/", "messages", "hello world", 7);
     long before = 0;
     for (int round = 0; round < 100; ++round) {
-        // The first row compiles the conditions and makes room.
+        // The first row compiles the conditions and allocates the space.
         if (round == 1) {
             before = allocationCount();
         }

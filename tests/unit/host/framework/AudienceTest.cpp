@@ -28,7 +28,7 @@ protected:
         std::unique_ptr<Request> request;
     };
 
-    /// Opens a situation; its place among `situations` tells it from the others.
+    /// Opens a situation; its index in `situations` identifies it.
     Situation& open(std::vector<Condition> conditions) {
         RequestDetail detail;
         detail.name = "test";
@@ -40,7 +40,7 @@ protected:
     }
     void close(std::size_t index) { situations[index]->request.reset(); }
 
-    /// The places of the situations that the row is offered to.
+    /// The indices of the situations that the row is offered to.
     std::vector<int> audienceOf(TestRow& row) {
         const LockGuard guard(manager.lock());
         std::vector<int> result;
@@ -104,7 +104,7 @@ TEST_F(AudienceTest, FollowsTheListOfSituations) {
     EXPECT_THAT(audienceOf(row), ElementsAre(0, 1));
     close(0);
     EXPECT_THAT(audienceOf(row), ElementsAre(1));
-    // The new request may take the place of the old one in memory.
+    // The new request may have the address of the old one.
     open({onLog("syslog")});
     EXPECT_THAT(audienceOf(row), ElementsAre(1));
     close(1);
@@ -113,7 +113,7 @@ TEST_F(AudienceTest, FollowsTheListOfSituations) {
 }
 
 TEST_F(AudienceTest, IgnoresLogColumnsWithoutConditions) {
-    // Otherwise each path would be a log of its own here, and known afresh.
+    // Otherwise each path would count as a log of its own here and be learned again.
     open({onLog("messages")});
     for (int number = 0; number < 20'000; ++number) {
         const std::string path = "/" + std::to_string(number);
@@ -167,7 +167,7 @@ TEST_F(AudienceTest, SkipsASituationWithANonsensicalCondition) {
     open({textCondition("NUMBER", INTF_EQUAL, "seven")});
     open({textCondition("TEXT", static_cast<_IntfOper>(77), "x")});
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
-    // It is on no log's columns, so that such a row is not taken for a new log's.
+    // It is not on a column that names a log, so such a row does not count as a new log's.
     for (int number = 0; number < 20'000; ++number) {
         ASSERT_THAT(audienceOf(TestRow("/", "a", std::to_string(number), number)), IsEmpty());
     }
@@ -195,12 +195,12 @@ TEST_F(AudienceTest, CountsSkippedRowsAsJudged) {
     EXPECT_EQ(other.counts.matched(), 1U);
     EXPECT_EQ(late.counts.judged(), 2U);
     EXPECT_EQ(late.counts.matched(), 2U);
-    // Closed, a situation keeps its counts and counts no more.
+    // A closed situation keeps its counts and counts nothing more.
     mine.request.reset();
     offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 5U);
     EXPECT_EQ(other.counts.judged(), 6U);
-    // And goes on with them when it is opened again.
+    // It continues with them when it is opened again.
     mine.request = std::make_unique<Request>(manager, RequestDetail(), receiver, &mine.counts);
     offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 6U);
@@ -230,7 +230,8 @@ Condition randomCondition(std::mt19937& random) {
     return textCondition(column, op, op == INTF_MATCHES ? "a.*b" : randomText(random, 12));
 }
 
-// Whoever is left out would have refused the row, and nobody is left out for a number.
+// A situation that is left out would have refused the row, and none is left out because of a
+// number.
 TEST_F(AudienceTest, NeverLeavesOutASituationThatWouldTakeTheRow) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =

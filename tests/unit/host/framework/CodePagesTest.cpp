@@ -61,7 +61,7 @@ TEST(CodePages, EveryNumberCanBeConvertedToUtf8AndBack) {
         EXPECT_EQ(codeSet->codePage, number);
         EXPECT_NE(IconvCache::find(utf8, *codeSet), IconvCache::none()) << codeSet->codeSet;
         EXPECT_NE(IconvCache::find(*codeSet, utf8), IconvCache::none()) << codeSet->codeSet;
-        // The fast path rests on this.
+        // The fast path relies on this.
         std::string ascii;
         for (char c = 1; c < 127; ++c) {
             ascii += c;

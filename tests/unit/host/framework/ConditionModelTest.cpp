@@ -12,7 +12,7 @@
 
 using namespace zrm::host;
 
-// Random conditions on random rows, held against the plainest reading of what they mean.
+// Random conditions on random rows, compared with the simplest implementation of their meaning.
 
 namespace {
 

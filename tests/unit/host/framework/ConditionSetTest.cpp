@@ -101,7 +101,7 @@ TEST_F(ConditionSetTest, NumbersAreComparedInFull) {
     EXPECT_FALSE(numberHolds(INTF_EQUAL, 0xffffffff, -1));
     EXPECT_TRUE(numberHolds(INTF_LESS, 0x100000000, 0x7fffffff));
     EXPECT_TRUE(holds({textCondition("NUMBER", INTF_EQUAL, "7")}, rowBytes))
-        << "digits are a number";
+        << "digits mean a number";
 }
 
 TEST_F(ConditionSetTest, NonsensicalConditionsNeverHold) {
@@ -125,7 +125,7 @@ TEST_F(ConditionSetTest, ABadPatternNeverHoldsAndIsReported) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-// In a code page of single bytes, text need not be UTF-8, and a dot stands for any byte.
+// In a single-byte code page, text need not be UTF-8, and a dot matches any byte.
 TEST_F(ConditionSetTest, PatternsFollowTheCodePageOfTheColumn) {
     const TestRow latin("caf\xE9.log", "", "", 0);
     EXPECT_TRUE(holds({textCondition("LOGPATH", INTF_MATCHES, "^caf.\\.log$")}, latin));
@@ -151,7 +151,7 @@ TEST_F(ConditionSetTest, AsksTheTableAboutUndescribedColumns) {
     EXPECT_EQ(asked[0], "YES 5 abc");
 }
 
-// What is asked last is not asked at all when something cheaper refuses the row.
+// What is evaluated last is skipped when something cheaper refuses the row.
 TEST_F(ConditionSetTest, TheLogIsCheckedFirst) {
     int asked = 0;
     onForeignColumn = [&](char*, const std::string&, _IntfOper, char*) {

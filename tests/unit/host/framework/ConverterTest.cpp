@@ -23,7 +23,7 @@ struct Outcome {
     bool complete;
 };
 
-/// Converts into a target of this size and checks that nothing behind it is touched.
+/// Converts into a target of this size and checks that nothing after it is touched.
 Outcome convert(std::uint32_t to, std::uint32_t from, std::string_view source,
                 std::size_t size = 1000) {
     std::string target(size + 8, '#');
@@ -119,7 +119,7 @@ TEST(Converter, AFullTargetEndsAtACharacter) {
     EXPECT_TRUE(convert(utf8, utf8, "", 0).complete);
 }
 
-// Some converters hold a letter back until they know that no accent follows.
+// Some converters hold a letter back until they know that no accent follows it.
 TEST(Converter, LosesNoCharacterThatAConverterHeldBack) {
     EXPECT_EQ(text(utf8, 1258, "\xE9 a"), "é a");
     EXPECT_EQ(text(utf8, 1258, "\xF0\xE2"), "đâ");
@@ -130,7 +130,7 @@ TEST(Converter, LosesNoCharacterThatAConverterHeldBack) {
     }
 }
 
-// Cuts at every size give a beginning of the whole, and never half a character.
+// A target of any size gets a prefix of the whole, and never half a character.
 TEST(Converter, FillsTargetsOfEverySize) {
     const std::string source = "a\xA4z\xE9\xE9 end";
     const std::string whole = text(utf8, latin9, source);

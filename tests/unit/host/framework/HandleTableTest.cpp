@@ -17,7 +17,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// The table only hands the address back, so any address serves.
+/// The table only returns the address, so any address will do.
 ctreq* address(int& object) {
     return reinterpret_cast<ctreq*>(&object);
 }
@@ -100,7 +100,7 @@ TEST(HandleTable, CloseWaitsForTheLastPin) {
         HandleTable::close(handle);
         closed = true;
     });
-    // Once it is closing, no further pin is given.
+    // Once it is closing, no more pins are given.
     while (HandleTable::pin(handle) != nullptr) {
         HandleTable::unpin(handle);
         std::this_thread::yield();

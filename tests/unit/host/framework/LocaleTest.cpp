@@ -14,7 +14,7 @@ class LocaleTest : public testing::Test {
 protected:
     ~LocaleTest() override { std::setlocale(LC_ALL, "C"); }
 
-    /// Code page of the process's locale after it was set so.
+    /// Code page of the process's locale after setting it.
     static std::uint32_t codePageOf(const char* locale) {
         EXPECT_NE(std::setlocale(LC_ALL, locale), nullptr) << locale;
         std::uint32_t status = 99;
@@ -31,7 +31,7 @@ protected:
         std::int32_t written;
         std::uint32_t length;
         std::uint32_t status;
-        std::string target; ///< the whole target and what stands behind it
+        std::string target; ///< the whole target and what follows it
     };
     static Result translate(std::uint32_t to, std::uint32_t from, std::string_view source,
                             std::uint32_t size, int flags) {
@@ -73,7 +73,7 @@ TEST_F(LocaleTest, FlagsOfZeroTerminateWithinTheTarget) {
     EXPECT_NE(result.status, 0u) << "it was cut";
     EXPECT_EQ(result.target, terminated("abcde", 6));
     result = translate(1208, 1208, "ab€", 5, 0);
-    EXPECT_EQ(result.written, 2) << "the terminator takes the last byte's place";
+    EXPECT_EQ(result.written, 2) << "the terminator replaces the last byte";
     EXPECT_EQ(result.target, terminated("ab", 5));
     result = translate(1208, 1208, "abc", 1, 0);
     EXPECT_EQ(result.target, terminated("", 1));

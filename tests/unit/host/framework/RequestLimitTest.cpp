@@ -21,10 +21,10 @@ TEST(RequestLimit, IsReachedWhenTheTimeIsUpOrTheWorkIsUnwanted) {
     EXPECT_FALSE(CTX1_IsCancelled());
     EXPECT_FALSE(limit.wasReached());
     isUnwanted = true;
-    EXPECT_FALSE(limit.wasReached()); // nothing has asked
+    EXPECT_FALSE(limit.wasReached()); // nothing has asked yet
     EXPECT_TRUE(CTX1_IsCancelled());
     isUnwanted = false;
-    EXPECT_TRUE(CTX1_IsCancelled()); // once ended, it stays so
+    EXPECT_TRUE(CTX1_IsCancelled()); // once reached, it stays reached
     EXPECT_TRUE(limit.wasReached());
     const RequestLimit overdue(Clock::now(), {});
     EXPECT_TRUE(CTX1_IsCancelled());

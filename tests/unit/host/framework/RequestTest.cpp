@@ -151,7 +151,7 @@ TEST(Request, IsDestroyedWhenTheLastPinIsDropped) {
     EXPECT_TRUE(destroyed);
 }
 
-// What a log's thread does with each row, on two threads, while situations come and go.
+// What a log's thread does with each row, on two threads while situations come and go.
 TEST(Request, SituationsComeAndGoDuringFanOut) {
     TestManager manager;
     TestReceiver receiver;
@@ -205,7 +205,7 @@ TEST(Tables, FindsRegisteredTables) {
         EXPECT_EQ(Tables::find("ONE"), nullptr);
         EXPECT_EQ(TableManager::RegisterWithManager(&one), 0u);
     }
-    EXPECT_EQ(Tables::find("ONE"), nullptr) << "a manager that ends is forgotten";
+    EXPECT_EQ(Tables::find("ONE"), nullptr) << "a destroyed manager is removed";
 }
 
 TEST(Tables, HasRoomForSixteen) {

@@ -108,7 +108,7 @@ public:
     std::function<void(TestRequest&)> onCreate;
 };
 
-/// Keeps what it is given.
+/// Keeps what it receives.
 class TestReceiver : public RowReceiver {
 public:
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override {

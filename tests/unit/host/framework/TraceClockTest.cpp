@@ -89,7 +89,7 @@ TEST_F(TraceClockTest, AForkedChildNeverAsksTheCLibrary) {
     }
     int status = -1;
     waitpid(child, &status, 0);
-    EXPECT_EQ(status, 0) << "the offset is that of summer still";
+    EXPECT_EQ(status, 0) << "the offset is still that of summer";
     EXPECT_EQ(localText(1830000000), "2027-12-28 14:20:00.000000");
     EXPECT_EQ(counter.calls(), 1);
 }

@@ -6,7 +6,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// The level of one unit under a text that must be right.
+/// The level of one unit after parsing a valid text.
 unsigned level(std::string_view text, std::string_view unit = "ValidLog.cpp") {
     TraceLevels levels;
     EXPECT_EQ(levels.parse(text), "") << text;
@@ -52,7 +52,7 @@ TEST(TraceLevels, AUnitMayHaveItsOwnLevel) {
     EXPECT_EQ(level("error,ValidLog=none"), 0u);
     EXPECT_EQ(level("flow,LogBase=fine"), 0x40u);
     EXPECT_EQ(level("LogBase=fine"), 0x80u) << "the others keep the errors";
-    EXPECT_EQ(level("ValidLog=fine,ValidLog=detail"), 0x10u) << "the last word holds";
+    EXPECT_EQ(level("ValidLog=fine,ValidLog=detail"), 0x10u) << "the last word applies";
     EXPECT_EQ(level("ValidLog=fine,ValidLog.cpp=detail"), 0x10u);
     EXPECT_EQ(level("ValidLog.cpp=fine,ValidLog=detail"), 0x10u);
     EXPECT_EQ(level(" ValidLog = fine + 0x80 "), 0x81u);
@@ -69,9 +69,9 @@ TEST(TraceLevels, AClassCoversAllItsSourceFiles) {
     EXPECT_EQ(level("zrm_rmlogent=detail", "zrm_rmlogent_report.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile.cpp=detail", "UserLogFileReport.cpp"), 0x80u) << "a file alone";
     EXPECT_EQ(level("LogFile=detail", "UserLogFile.cpp"), 0x80u);
-    EXPECT_EQ(level("StringParse=detail", "StringParser.cpp"), 0x80u) << "no class";
+    EXPECT_EQ(level("StringParse=detail", "StringParser.cpp"), 0x80u) << "not a class";
     EXPECT_EQ(level("UTF=detail", "UTF8Conv.cpp"), 0x80u);
-    // The longer name says more of a file, wherever it stands.
+    // The longer name is more specific, wherever it is.
     for (const char* text :
          {"UserLogFile=detail,UserLogFileReport=fine", "UserLogFileReport=fine,UserLogFile=detail",
           "UserLogFileReport.cpp=fine,UserLogFile=detail"}) {

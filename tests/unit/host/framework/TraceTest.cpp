@@ -33,7 +33,7 @@ using testing::IsEmpty;
 
 TRC1_Anchor anchor{"TraceTest.cpp"};
 
-/// Stands in for standard error. Each write becomes one message, so that the tests see what was
+/// Replaces standard error. Each write becomes one message, so that the tests see what was
 /// written in one piece.
 class ErrorSocket {
 public:
@@ -225,7 +225,7 @@ TEST(Trace, NoThreadRestoresAnOlderLevel) {
 std::atomic<bool> g_cancelled{false};
 std::atomic<bool> g_wentOn{false};
 
-/// Holds no objects of its own: a sanitizer would miss that the unwind has left their frame.
+/// Has no objects of its own: a sanitizer would not notice that the unwind has left their frame.
 void* traceOnceCancelled(void* /*unused*/) {
     while (!g_cancelled) {
         sched_yield();

@@ -19,7 +19,7 @@ TEST(CopyUnpad, DropsThePaddingAndTerminates) {
     EXPECT_STREQ(copy("    ", 4), "");
     EXPECT_STREQ(copy("abc", 0), "");
     EXPECT_STREQ(copy("abc", -1), "");
-    EXPECT_EQ(text[1], '#') << "nothing behind the terminator is written";
+    EXPECT_EQ(text[1], '#') << "nothing after the terminator is written";
 }
 
 } // namespace

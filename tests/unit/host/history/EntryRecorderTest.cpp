@@ -77,7 +77,7 @@ TEST_F(EntryRecorderTest, RecordsTheEntriesOfEachMinuteAndLog) {
     logs.counts = {{"a.log", 20}, {"b.log", 3}, {"quiet.log", 0}};
     recorder->tick(start + 2 * minute); // the second had 8 and 3
     logs.counts = {{"a.log", 5}, {"b.log", 3}};
-    recorder->tick(start + 5 * minute); // a.log was begun anew; nobody looked for two minutes
+    recorder->tick(start + 5 * minute); // a.log started over; nothing was recorded for two minutes
     logs.counts = {{"a.log", 6}, {"b.log", 4}};
     recorder->finish();
     history->storeRest();

@@ -54,7 +54,7 @@ TEST_F(HistoryDirectoryTest, CreatesWhatIsMissingForItsOwnerAndGroupOnly) {
 TEST_F(HistoryDirectoryTest, ReportsWhatCannotBeCreatedAndWhatToDo) {
     EXPECT_EQ(problemOf(path + "/below"),
               "cannot create the directory " + path + "/below: No such file or directory" + cure);
-    std::ofstream(directory.file("plain")) << "no directory";
+    std::ofstream(directory.file("plain")) << "not a directory";
     EXPECT_EQ(problemOf(directory.file("plain")),
               "cannot open " + directory.file("plain") + "/history.lock: Not a directory" + cure);
     {
@@ -75,7 +75,7 @@ TEST_F(HistoryDirectoryTest, OpensOnlyRegularFilesOfItsOwn) {
     std::filesystem::create_directory(path);
     for (const char* const name : {"/history.lock", "/history.db"}) {
         const std::string place = path + name;
-        std::filesystem::remove(place); // of the turn before
+        std::filesystem::remove(place); // of the previous round
         std::filesystem::create_symlink(directory.file("target"), place);
         EXPECT_EQ(problemOf(path),
                   place + " is a symbolic link, which the history does not follow" + cure);

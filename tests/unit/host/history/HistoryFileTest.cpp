@@ -170,11 +170,11 @@ TEST_F(HistoryFileTest, RemovesOldEventsButNeverTheNewest) {
     expireAll({1'000'000, testTime - 10 * day, testTime});
     EXPECT_EQ(file->oldest(), 20u);
     EXPECT_EQ(count(), 1);
-    EXPECT_FALSE(file->expire({1'000'000, testTime, testTime})) << "ids go on from it";
+    EXPECT_FALSE(file->expire({1'000'000, testTime, testTime})) << "ids continue from it";
 }
 
 TEST_F(HistoryFileTest, AClockThatWasAheadDoesNotKeepEventsForEver) {
-    // 3000 events of a clock that was years ahead, among others that are old by now.
+    // 3000 events from a clock that was years ahead, among others that have expired.
     file->store(*batchOf(1, 10, testTime - 50 * day), {});
     file->store(*batchOf(11, 3010, testTime + 4000 * day), {});
     file->store(*batchOf(3011, 3020, testTime - 49 * day), {});
@@ -204,7 +204,8 @@ TEST_F(HistoryFileTest, AClockThatIsBehindRemovesNothingByAge) {
     file->store(*batchOf(1, 3000, testTime), {});
     const std::int64_t now = testTime - 9000 * day;
     EXPECT_FALSE(file->expire({1'000'000, now - 30 * day, now}));
-    EXPECT_TRUE(file->expire({2000, now - 30 * day, now})) << "the number holds all the same";
+    EXPECT_TRUE(file->expire({2000, now - 30 * day, now}))
+        << "the limit of the number still applies";
 }
 
 TEST_F(HistoryFileTest, ReturnsSpaceALittleAtATime) {

@@ -139,7 +139,8 @@ TEST_F(HistoryQueryTest, ADamagedEventIsReportedAndNotReturned) {
     writer.run("UPDATE events SET raised = raised + 1 WHERE id = 4");
     writer.run("UPDATE events SET label = 99 WHERE id = 6");
     writer.run("UPDATE events SET json = '{\"row', checksum = NULL WHERE id = 7");
-    writer.run("UPDATE events SET checksum = NULL WHERE id = 8"); // of an earlier version
+    writer.run(
+        "UPDATE events SET checksum = NULL WHERE id = 8"); // as written by an earlier version
     const EventPage page = HistoryQuery(database, {.newestFirst = false}).run();
     EXPECT_THAT(page.damaged, ElementsAre(2, 4, 6, 7));
     EXPECT_THAT(ids({.newestFirst = false}), ElementsAre(1, 3, 5, 8, 9));
@@ -158,7 +159,7 @@ TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutScanningTheOthers) {
     EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(20));
 }
 
-/// What a plain walk over all events gives.
+/// What a plain scan of all events finds.
 std::vector<std::uint64_t> expected(const std::vector<EventRecord>& events,
                                     const EventFilter& filter) {
     const auto isOneOf = [](std::string_view text, const std::vector<std::string>& texts) {
@@ -193,7 +194,7 @@ TEST_F(HistoryQueryTest, AgreesWithAPlainScanWhateverTheFilterAndTheClock) {
     std::int64_t raised = testTime;
     const std::uint64_t first = 1 + upTo(3000);
     for (std::uint64_t id = first; id < first + 6000; ++id) {
-        // Now and then the clock is set, mostly back.
+        // Occasionally the clock is set, mostly back.
         raised += upTo(999) == 0 ? static_cast<std::int64_t>(upTo(900'000)) - 600'000
                                  : static_cast<std::int64_t>(upTo(100));
         events.push_back(testEvent(id, raised, names[upTo(3)], names[upTo(2)],

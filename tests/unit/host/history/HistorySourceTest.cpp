@@ -32,7 +32,7 @@ constexpr std::size_t plenty = 1'000'000;
 
 class HistorySourceTest : public testing::Test {
 protected:
-    /// Events on disk, and in memory where there is room for them.
+    /// Events on disk, and in memory as far as there is room.
     void commit(std::uint64_t first, std::uint64_t last) {
         const auto batch = batchOf(first, last);
         file.store(*batch, {});
@@ -181,7 +181,7 @@ TEST_F(HistorySourceTest, SkipsAndReportsDamagedEvents) {
 }
 
 TEST_F(HistorySourceTest, FindsOlderEventsInMemoryWhenTheFileIsNew) {
-    // The file was exchanged: event 1 to 20 are gone, 21 to 30 still in memory.
+    // The file was replaced: events 1 to 20 are gone, 21 to 30 are still in memory.
     recent.publish(batchOf(21, 30));
     testing::internal::CaptureStderr();
     EXPECT_EQ(takeUntil(30), idsFrom(21, 30));

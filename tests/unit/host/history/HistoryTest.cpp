@@ -40,7 +40,7 @@ class HistoryTest : public testing::Test {
 protected:
     ~HistoryTest() override { close(); }
 
-    /// Opens the history and starts it on a new queue; what is said about it is in `told`.
+    /// Opens the history and starts it on a new queue; its message is in `told`.
     void open() {
         testing::internal::CaptureStderr();
         auto opened = History::open(config, state);
@@ -54,7 +54,7 @@ protected:
         queue = std::make_unique<EventQueue>(100, sizeof(TestRow), history->newest());
         history->start(*queue, EventJson(testLayout()));
     }
-    /// Ends the history in order, as far as it goes.
+    /// Stops the history in order, as far as possible.
     void close(std::chrono::milliseconds time = 10s) {
         if (history != nullptr) {
             history->finish(Clock::now() + time);
@@ -74,7 +74,7 @@ protected:
         const std::uint64_t last = history->newest() + static_cast<std::uint64_t>(count);
         push(count);
         EXPECT_GE(history->waitBeyond(last - 1, Clock::now() + 10s, {}), last);
-        // The room in the queue is given back after the events are known.
+        // The room in the queue is released after the events become visible.
         EXPECT_TRUE(eventually([&] { return queue->state().size == 0; }));
     }
     static bool eventually(const std::function<bool()>& condition) {
@@ -92,8 +92,8 @@ protected:
         }
         return ids;
     }
-    /// What the sink gets now, at most `most` events, and has got then. A read gives no more than
-    /// one batch of the writer holds.
+    /// Delivers to the sink what it would get now, at most `most` events. A read returns no more
+    /// than one batch of the writer.
     std::vector<std::uint64_t> take(std::size_t most = SIZE_MAX) {
         std::vector<std::uint64_t> ids;
         while (ids.size() < most && sink->backlog() > 0) {
@@ -196,7 +196,7 @@ TEST_F(HistoryTest, TheCursorOfARunningSinkIsKeptHoweverLongItWasDown) {
     open();
     pushAndWait(5);
     close();
-    // As after a run of months in which neither of two sinks got an event.
+    // As after months in which neither of two sinks got an event.
     run("UPDATE cursors SET used = 1");
     run("INSERT INTO cursors VALUES ('removed', 2, 1)");
     open();
@@ -231,15 +231,15 @@ TEST_F(HistoryTest, AFullDiskIsReportedOnceAndNothingIsLost) {
     open();
     pushAndWait(5);
     disk.failWrites(SQLITE_FULL);
-    push(100); // as many as the queue holds
+    push(100); // fills the queue
     EXPECT_TRUE(trace.waitFor("Error writing the history " + file() +
                               ": database or disk is full. Trying again."));
     EXPECT_EQ(history->state().problem, "database or disk is full");
-    EXPECT_TRUE(eventually([&] { return disk.failed() > 3; })) << "it tries again";
+    EXPECT_TRUE(eventually([&] { return disk.failed() > 3; })) << "it retries";
     EXPECT_EQ(history->newest(), 5u);
-    EXPECT_EQ(ids(), idsFrom(1, 5)) << "readers go on";
+    EXPECT_EQ(ids(), idsFrom(1, 5)) << "readers are not affected";
     push(50);
-    EXPECT_EQ(queue->state().size, 150u) << "what rows raise beyond the queue's end waits too";
+    EXPECT_EQ(queue->state().size, 150u) << "events beyond the queue's end wait, too";
     disk.failWrites(0);
     EXPECT_GE(history->waitBeyond(154, Clock::now() + 20s, {}), 155u);
     EXPECT_EQ(ids(), idsFrom(1, 155));
@@ -259,7 +259,7 @@ TEST_F(HistoryTest, AHistoryOpensOnAFullDiskAndStoresEventsOnceThereIsSpace) {
     EXPECT_EQ(problem, "");
     ASSERT_NE(history, nullptr);
     EXPECT_EQ(sink->backlog(), 5u);
-    EXPECT_EQ(take(), idsFrom(1, 5)) << "what is stored is delivered";
+    EXPECT_EQ(take(), idsFrom(1, 5)) << "stored events are delivered";
     push(3);
     EXPECT_TRUE(trace.waitFor("Error writing the history " + file() +
                               ": database or disk is full. Trying again."));
@@ -296,7 +296,7 @@ TEST_F(HistoryTest, CursorsThatCannotBeStoredAtTheStopAreReported) {
     EXPECT_EQ(take().size(), 3u);
     history->finish(Clock::now() + 10s);
     sink->release(0);
-    // A cursor that is still to be stored, whatever was stored meanwhile.
+    // A cursor that is yet to be stored, whatever else has been stored meanwhile.
     std::unique_ptr<EventSource> other = history->source("late", "late");
     disk.failWrites(SQLITE_FULL);
     testing::internal::CaptureStderr();
@@ -326,7 +326,7 @@ TEST_F(HistoryTest, IdsContinueAfterACorruptFileWhereTheyAreReadable) {
     open();
     pushAndWait(100);
     close();
-    // The page of one table is rubbish; the events can still be read.
+    // The page of one table is garbage; the events can still be read.
     const auto page = Database(file(), Database::Use::READ)
                           .number("SELECT rootpage FROM sqlite_schema WHERE name = 'cursors'");
     std::fstream(file(), std::ios::in | std::ios::out | std::ios::binary)
@@ -357,10 +357,10 @@ TEST_F(HistoryTest, AFileThatBecomesCorruptIsReplacedWhileTheAgentRuns) {
                 HasSubstr("zrmagent: the history " + file() +
                           " is corrupt (database disk image is malformed); it is kept as "));
     EXPECT_EQ(ids(), idsFrom(101, 150));
-    EXPECT_EQ(take(), idsFrom(11, 150)) << "what was in memory is not lost to the sink";
+    EXPECT_EQ(take(), idsFrom(11, 150)) << "the sink gets what was in memory";
     close();
     open();
-    EXPECT_EQ(sink->backlog(), 0u) << "its place is in the new file";
+    EXPECT_EQ(sink->backlog(), 0u) << "its position is in the new file";
     EXPECT_EQ(history->newest(), 150u);
 }
 

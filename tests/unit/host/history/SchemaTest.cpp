@@ -113,7 +113,7 @@ TEST_F(SchemaTest, UpgradesAFileOfTheThirdVersion) {
     ASSERT_TRUE(event.step());
     EXPECT_EQ(event.integer(0), 41);
     EXPECT_EQ(event.text(1), "{}");
-    EXPECT_TRUE(event.isNull(2)) << "what was stored before has no checksum";
+    EXPECT_TRUE(event.isNull(2)) << "an older event has no checksum";
 }
 
 TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {
@@ -132,7 +132,7 @@ TEST_F(SchemaTest, RefusesAFileOfALaterVersion) {
     database.run("PRAGMA user_version = " + std::to_string(Schema::version + 1));
     try {
         Schema::bringUpToDate(database);
-        FAIL() << "it was taken";
+        FAIL() << "the file was accepted";
     } catch (const SchemaTooNew& error) {
         EXPECT_STREQ(error.what(),
                      ("it has version " + std::to_string(Schema::version + 1) +

@@ -50,7 +50,7 @@ TEST_F(ApiTokenTest, CreatesTheFileForTheOwnerOnly) {
     EXPECT_EQ(content().size(), 65u);
     const std::string first = content();
     EXPECT_EQ(problem(path), "");
-    EXPECT_EQ(content(), first) << "a token stays";
+    EXPECT_EQ(content(), first) << "the token is kept";
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(directory.path()), {}), 1)
         << "nothing else is left behind";
 }
@@ -99,7 +99,7 @@ TEST_F(ApiTokenTest, RefusesWhatIsNotAFile) {
     EXPECT_EQ(problem(itself), itself + " is not a file that can contain a token");
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
     EXPECT_EQ(problem(path), path + " is not a file that can contain a token")
-        << "nobody waits for it";
+        << "it does not wait for the pipe";
 }
 
 TEST_F(ApiTokenTest, CreatesNothingThroughALink) {
@@ -131,7 +131,7 @@ TEST_F(ApiTokenTest, ReportsWhyThereIsNoToken) {
         EXPECT_THAT(problem(path), testing::MatchesRegex("cannot write " + path +
                                                          "\\.......: No space left on device"));
         std::filesystem::remove(directory.file("file"));
-        EXPECT_TRUE(std::filesystem::is_empty(directory.path())) << "no half of a token stays";
+        EXPECT_TRUE(std::filesystem::is_empty(directory.path())) << "no partial token is left";
     }
 }
 

@@ -20,7 +20,7 @@ TEST(ConnectionShares, NoAddressTakesAllConnections) {
         EXPECT_TRUE(shares.take("203.0.113.1", false));
     }
     EXPECT_FALSE(shares.take("203.0.113.1", false));
-    EXPECT_TRUE(shares.take("203.0.113.2", false)) << "others have room";
+    EXPECT_TRUE(shares.take("203.0.113.2", false)) << "others are accepted";
     for (int count = 0; count < 60; ++count) {
         EXPECT_TRUE(shares.take("127.0.0.1", true));
     }
@@ -34,7 +34,7 @@ TEST(ConnectionShares, NoAddressTakesAllConnections) {
 TEST(ConnectionShares, TheTotalIsBounded) {
     ConnectionShares shares;
     shares.setMost(4);
-    EXPECT_EQ(shares.share(false), 4u) << "a few are enough for a browser";
+    EXPECT_EQ(shares.share(false), 4u) << "enough for a browser";
     for (const char* const address : {"a", "b", "c", "d"}) {
         EXPECT_FALSE(shares.isTight());
         EXPECT_TRUE(shares.take(address, false));

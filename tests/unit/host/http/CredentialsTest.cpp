@@ -27,7 +27,7 @@ protected:
         directory.write("token", text);
         chmod(token.c_str(), 0600);
     }
-    /// Makes a certificate for this name, and its key.
+    /// Creates a certificate for this name, and its key.
     void makePair(const std::string& name) const {
         const std::string command =
             "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -subj /CN=" +
@@ -36,7 +36,7 @@ protected:
         ASSERT_EQ(std::system(command.c_str()), 0);
     }
     void take(const std::string& path) const { std::filesystem::rename(path + ".new", path); }
-    /// What comes of looking until a change is noticed, or three times.
+    /// The result of up to three checks, until one notices a change.
     static Credentials::Change look(Credentials& credentials) {
         Credentials::Change change;
         for (int count = 0; count < 3 && !change.isNew && !change.problem; ++count) {
@@ -95,11 +95,11 @@ TEST_F(CredentialsTest, LoadsAChangedCertificate) {
     makePair("two.example");
     take(certificate);
     credentials.refresh();
-    credentials.refresh(); // between the two files nothing is said
+    credentials.refresh(); // nothing is reported between the two files
     take(key);
     EXPECT_TRUE(look(credentials).isNew);
     EXPECT_TRUE(credentials.tls()->isFor("two.example"));
-    EXPECT_TRUE(before->isFor("one.example")) << "connections that have it live on";
+    EXPECT_TRUE(before->isFor("one.example")) << "it stays valid for the connections that use it";
 }
 
 TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndThePreviousOneStays) {

@@ -46,7 +46,7 @@ TEST(DescriptorRoom, LeavesTheLowDescriptorsToTheAgent) {
     EXPECT_GE(softLimit(), 1024u + 500u) << "the soft limit was raised";
 }
 
-/// Descriptors that the process's table has room for at present.
+/// The current size of the process's descriptor table.
 int tableSize() {
     std::ifstream status("/proc/self/status");
     std::string word;

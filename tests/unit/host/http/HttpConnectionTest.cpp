@@ -46,7 +46,7 @@ protected:
         }
         ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     }
-    /// Gives the answer that the test has set.
+    /// Returns the answer that the test has set.
     HttpAnswer handle(const HttpRequest& request) {
         handoff.pass();
         body = request.body;
@@ -66,7 +66,7 @@ protected:
         return "GET " + path + " HTTP/1.1\r\nHost: localhost:" + std::to_string(server.port()) +
                "\r\nAuthorization: Bearer " + secret + "\r\n\r\n";
     }
-    /// Makes the answer a stream, whose channel comes to the test.
+    /// Makes the answer a stream whose channel the test gets.
     std::future<std::shared_ptr<BodyChannel>> streams() {
         auto begun = std::make_shared<std::promise<std::shared_ptr<BodyChannel>>>();
         answer.stream.begin = [begun](std::shared_ptr<BodyChannel> channel) {
@@ -87,7 +87,7 @@ protected:
     Handoff handoff;
     HttpAnswer answer = HttpAnswer::json("{}");
     std::string body;
-    std::function<void(const HttpRequest&)> work; ///< what the handler does besides
+    std::function<void(const HttpRequest&)> work; ///< what else the handler does
     std::stop_token cancelled;                    ///< of the last request
     std::mutex mutex;
     std::condition_variable changed; ///< a channel has changed
@@ -186,7 +186,7 @@ TEST_F(HttpConnectionTest, AStreamIsSentAsItIsWritten) {
     });
     const std::shared_ptr<BodyChannel> channel = begun.get();
     channel->send("first");
-    // What was written must have come before anything follows.
+    // What was written must arrive before anything follows.
     seen.get_future().wait();
     EXPECT_TRUE(waitFor([&] { return channel->isReady(); }));
     channel->send("");
@@ -242,9 +242,9 @@ TEST_F(HttpConnectionTest, AStreamIsNotReadyWhileItsClientTakesNothing) {
     send(fd, request.data(), request.size(), MSG_NOSIGNAL);
     const std::shared_ptr<BodyChannel> channel = begun.get();
     EXPECT_TRUE(channel->isReady());
-    channel->send(std::string(32 << 20, 'x')); // more than the sockets hold
+    channel->send(std::string(32 << 20, 'x')); // more than fits into the sockets
     EXPECT_FALSE(channel->isReady());
-    // Whoever takes nothing for five seconds is disconnected.
+    // A client that takes nothing for five seconds is disconnected.
     EXPECT_TRUE(waitFor([&] { return !channel->isOpen(); }));
     EXPECT_FALSE(channel->isReady());
     close(fd);
@@ -259,7 +259,7 @@ TEST_F(HttpConnectionTest, AStopEndsStreams) {
     const auto begin = Clock::now();
     server.stop(begin + 30s);
     EXPECT_LT(Clock::now() - begin, 5s);
-    EXPECT_EQ(asked.get(), 200) << "the stream has an orderly end";
+    EXPECT_EQ(asked.get(), 200) << "the stream ends in order";
     EXPECT_FALSE(channel->isOpen());
     EXPECT_EQ(server.connections(), 0u);
 }
@@ -310,7 +310,7 @@ TEST_F(HttpConnectionTest, AHandlerNoticesThatTheServerStops) {
     });
     begun.get_future().wait();
     server.stop(Clock::now() + 30s);
-    EXPECT_EQ(asked.get(), 200) << "what there is comes all the same";
+    EXPECT_EQ(asked.get(), 200) << "the body is complete";
 }
 
 TEST_F(HttpConnectionTest, NothingIsCancelledWhileTheClientWaits) {
@@ -387,8 +387,8 @@ TEST(HttpConnection, RequestsWithoutAFreeWorkerAreRefusedAndQuickOnesAreServed) 
     EXPECT_THAT(busy->body, testing::HasSubstr("the agent is busy with other requests"));
     go.set_value();
     EXPECT_EQ(first.get(), 200);
-    EXPECT_EQ(ask("/slow")->status, 200) << "there are workers again";
-    EXPECT_EQ(slow, 2) << "what was refused is not done later";
+    EXPECT_EQ(ask("/slow")->status, 200) << "workers are free again";
+    EXPECT_EQ(slow, 2) << "refused work is not done later";
 }
 
 TEST_F(HttpConnectionTest, AnsweredRequestsAreCounted) {

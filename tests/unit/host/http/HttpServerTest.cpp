@@ -40,7 +40,7 @@ using nlohmann::json;
 const std::string secret(64, 'a');
 const std::string tables = "/api/v1/tables/";
 
-/// Samples of a test: what `onTake` gives.
+/// Samples for tests: what `onTake` returns.
 class TestSource : public SampleSource {
 public:
     Rows take(std::string_view table, const std::vector<Condition>& conditions) override {
@@ -202,7 +202,7 @@ TEST_F(HttpServerTest, RefusesLongBodies) {
     expectProblem(sample("RMMONLOG", std::string(1048577, ' ')), 413, tooLong, "body");
     expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is not JSON",
                   "body");
-    // A body that does not tell its length is cut off too.
+    // A body without a length is cut off, too.
     std::string chunks;
     for (int count = 0; count < 500; ++count) {
         chunks += "2000\r\n" + std::string(8192, ' ') + "\r\n";
@@ -234,7 +234,7 @@ TEST_F(HttpServerTest, SamplesRunConcurrently) {
         std::unique_lock lock(mutex);
         ++waiting;
         changed.notify_all();
-        changed.wait(lock, [&] { return go; }); // as while a refresh runs
+        changed.wait(lock, [&] { return go; }); // as during a refresh
         return SampleSource::Rows{"[]", 0, false};
     };
     std::vector<std::future<int>> results;
@@ -248,7 +248,7 @@ TEST_F(HttpServerTest, SamplesRunConcurrently) {
         std::unique_lock lock(mutex);
         EXPECT_TRUE(changed.wait_for(lock, 10s, [&] { return waiting == 3; }));
     }
-    EXPECT_EQ(client().get("/healthz")->status, 200) << "others are served meanwhile";
+    EXPECT_EQ(client().get("/healthz")->status, 200) << "others are served in the meantime";
     {
         const std::lock_guard guard(mutex);
         go = true;
@@ -334,11 +334,11 @@ TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndStartsNoMore) {
     begun.get_future().wait();
     const auto begin = Clock::now();
     server.abandon(begin + 30ms);
-    EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is under way";
+    EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is in progress";
     expectProblem(sample("RMMONLOG", "{}"), 503, "the agent is stopping", "");
     go.set_value();
     EXPECT_EQ(answer.get(), 200);
-    server.abandon(Clock::now() + 10s); // nothing is under way: returns at once
+    server.abandon(Clock::now() + 10s); // nothing is in progress: returns at once
 }
 
 TEST_F(HttpServerTest, ASampleMayEndTheProcess) {

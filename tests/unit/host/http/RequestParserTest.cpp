@@ -10,7 +10,7 @@ namespace {
 
 const std::string post = "POST /a HTTP/1.1\r\nHost: h\r\n";
 
-/// The request with this head; also when it comes byte by byte, which must not matter.
+/// The request with this head; the same when it arrives byte by byte.
 IncomingRequest read(const std::string& head) {
     const std::string bytes = head + "\r\n\r\n";
     RequestParser whole;
@@ -74,7 +74,7 @@ TEST(RequestParserTest, ABodyHasALengthOrIsChunked) {
     EXPECT_FALSE(empty.hasBody || empty.refusal);
     const IncomingRequest chunked = read(post + "Transfer-Encoding: chunked");
     EXPECT_TRUE(chunked.hasBody && chunked.isChunked);
-    EXPECT_TRUE(chunked.isLast) << "nothing behind chunks is taken for a request";
+    EXPECT_TRUE(chunked.isLast) << "nothing after chunks is read as a request";
 }
 
 TEST(RequestParserTest, AmbiguousRequestsAreRefused) {
@@ -109,7 +109,7 @@ TEST(RequestParserTest, AmbiguousRequestsAreRefused) {
         EXPECT_EQ(statusOf(post + line), 400) << line;
     }
     EXPECT_EQ(statusOf(post + "X: a" + std::string(1, '\0')), 400);
-    EXPECT_EQ(statusOf(post + "X: \ta\t\xc3\xa9"), 200) << "tabs and other bytes harm nobody";
+    EXPECT_EQ(statusOf(post + "X: \ta\t\xc3\xa9"), 200) << "tabs and other bytes are harmless";
     for (const char* const name :
          {"host", "Origin", "Authorization", "Content-Type", "Last-Event-ID"}) {
         const IncomingRequest twice =
@@ -127,7 +127,7 @@ TEST(RequestParserTest, InvalidRequestLinesAreRefused) {
         EXPECT_EQ(statusOf(line), 400) << line;
     }
     const IncomingRequest brewing = read("BREW / HTTP/1.1");
-    EXPECT_EQ(brewing.request.method, "") << "only methods that there are get into the statistics";
+    EXPECT_EQ(brewing.request.method, "") << "only known methods appear in the statistics";
 }
 
 TEST(RequestParserTest, LongTargetsAndHeadersAreRefused) {
@@ -150,22 +150,22 @@ TEST(RequestParserTest, LimitsHeads) {
     EXPECT_EQ(statusOf(head + std::string(RequestParser::largestHead - head.size() + 1, 'x')), 431);
     RequestParser endless;
     endless.put(begin + "X: " + std::string(RequestParser::largestHead, 'x'));
-    ASSERT_TRUE(endless.isHeadDone()) << "its end is not waited for";
+    ASSERT_TRUE(endless.isHeadDone()) << "it does not wait for the end";
     EXPECT_EQ(endless.takeHead().refusal->status, 431);
     RequestParser target;
     target.put("GET /" + std::string(RequestParser::largestHead, 'x'));
     EXPECT_EQ(target.takeHead().refusal->status, 431);
-    EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing reads it";
+    EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing uses it";
 }
 
 TEST(RequestParserTest, ChunksNeedHttp11) {
     EXPECT_EQ(statusOf("POST / HTTP/1.0\r\nHost: h\r\nTransfer-Encoding: chunked"), 400);
 }
 
-/// What becomes of a body that comes in two parts.
+/// The result of a body that arrives in two parts.
 struct Body {
     std::string text;
-    std::string rest; ///< what is not of the request
+    std::string rest; ///< what follows the request
     int status = 200;
     bool isDone = false;
 };

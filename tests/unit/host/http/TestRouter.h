@@ -9,7 +9,7 @@
 
 using namespace zrm::host;
 
-/// Asks a resource without a server between.
+/// Sends requests to a resource without a server.
 class TestRouter {
 public:
     explicit TestRouter(Resource& resource) { resource.addRoutes(m_router); }

@@ -32,11 +32,11 @@ TEST(WorkerPool, RunsWorkInOrderOnAtMostTheGivenThreads) {
         for (int count = 0; count < 4; ++count) {
             EXPECT_TRUE(pool.submit(work));
         }
-        EXPECT_FALSE(pool.submit(work)) << "too much waits";
+        EXPECT_FALSE(pool.submit(work)) << "the queue is full";
         EXPECT_EQ(begun, 2) << "there are no more threads";
         go.set_value();
     }
-    EXPECT_EQ(done, 6) << "what was taken is done";
+    EXPECT_EQ(done, 6) << "accepted work is done";
 }
 
 TEST(WorkerPool, AnIdleThreadTakesTheNextWork) {

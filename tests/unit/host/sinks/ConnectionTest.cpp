@@ -27,7 +27,7 @@ protected:
 
 TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsOpenedAgain) {
     std::uint16_t port = 0;
-    close(localSocket(SOCK_DGRAM, port)); // nobody has the port now
+    close(localSocket(SOCK_DGRAM, port)); // nobody uses the port now
     Connection connection(ListenAddress{"127.0.0.1", port}, Connection::UDP, 1s);
     ASSERT_TRUE(connection.open(giveUp.get_token()));
     int sent = 0;
@@ -36,7 +36,8 @@ TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsOpenedAgain) {
     }
     EXPECT_EQ(connection.error(),
               "send failed: Connection refused (127.0.0.1:" + std::to_string(port) + ")");
-    EXPECT_FALSE(connection.isOpen()) << "the address it is bound to may be this machine's no more";
+    EXPECT_FALSE(connection.isOpen())
+        << "this machine may no longer have the address it is bound to";
 }
 
 TEST_F(ConnectionTest, ASlowLookupEndsInTime) {

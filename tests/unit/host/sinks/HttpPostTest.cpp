@@ -68,7 +68,7 @@ TEST_F(HttpPostTest, KeepsTheConnection) {
 }
 
 TEST_F(HttpPostTest, AConnectionThatTheReceiverClosedIsOpenedAgain) {
-    // Closed behind an answer, and closed as soon as it is used again.
+    // Closed after an answer, and closed as soon as it is used again.
     ScriptedServer receiver([count = 0](const Request&) mutable {
         ++count;
         Reply reply = ScriptedServer::status(200);
@@ -202,7 +202,7 @@ TEST_F(HttpPostTest, EndsAtOnceOnGiveUp) {
               "the agent is stopping (127.0.0.1:" + std::to_string(receiver.port()) + ")");
 }
 
-/// A port at which connections are neither taken nor refused: its queue of them is full.
+/// A port at which connections are neither accepted nor refused: its backlog is full.
 class FullPort {
 public:
     FullPort() : m_listener(localSocket(SOCK_STREAM, port)) {
@@ -318,7 +318,7 @@ TEST_F(HttpPostTest, APauseThatIsNotANumberOfSecondsIsIgnored) {
 }
 
 TEST_F(HttpPostTest, LeavesTheActionAndTheMaskOfSigpipeUnchanged) {
-    std::signal(SIGPIPE, SIG_DFL); // a signal that came through would end this program
+    std::signal(SIGPIPE, SIG_DFL); // a signal that got through would end this program
     sigset_t before;
     pthread_sigmask(SIG_SETMASK, nullptr, &before);
     ScriptedServer receiver([](const Request&) { return Reply{"", Reply::CLOSE}; });

@@ -75,7 +75,7 @@ TEST_F(JsonlSinkTest, CreatesTheFileAndAppendsALinePerEvent) {
     EXPECT_EQ(content(path), lines);
     struct stat status {};
     stat(path.c_str(), &status);
-    EXPECT_EQ(status.st_mode & 0007, 0u) << "events are not for every user";
+    EXPECT_EQ(status.st_mode & 0007, 0u) << "not every user may read events";
 }
 
 TEST_F(JsonlSinkTest, KeepsTheFilesContents) {
@@ -120,7 +120,7 @@ TEST_F(JsonlSinkTest, ReopensAFileThatWasMovedOrRemoved) {
     removedSink.deliver(from(0).first(1), giveUp.get_token());
     std::filesystem::rename(path, directory.file("events.jsonl.1"));
     std::filesystem::remove(removed);
-    // The path is looked at once a second; until then the open file is written.
+    // The path is checked once a second; until then the open file is written.
     std::string expected = TestEvents::line(1, "one");
     std::string added;
     const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
@@ -292,7 +292,7 @@ TEST_F(JsonlSinkTest, AFileReplacedByALinkIsClosed) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     std::filesystem::rename(path, directory.file("moved"));
     std::filesystem::create_symlink(directory.file("moved"), path);
-    std::this_thread::sleep_for(std::chrono::milliseconds(1100)); // it looks once a second
+    std::this_thread::sleep_for(std::chrono::milliseconds(1100)); // it checks once a second
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(),
               path + " is a symbolic link, which is not followed; name the file itself");
@@ -304,7 +304,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilGiveUp) {
     std::string expected;
     std::string written;
     std::jthread stopper;
-    // The pipe takes a certain number of lines before it is full.
+    // The pipe takes some lines before it is full.
     std::size_t delivered = 3;
     while (delivered == 3) {
         if (!stopper.joinable() && expected.size() > 32768) {
@@ -319,7 +319,7 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilGiveUp) {
     EXPECT_EQ(sink.error(), "the reader does not read");
     written = readAll();
     EXPECT_TRUE(expected.starts_with(written));
-    // Offered again, the rest follows where the stream broke off.
+    // When they are offered again, the rest follows where the stream was interrupted.
     const std::stop_source anew;
     EXPECT_EQ(sink.deliver(from(delivered), anew.get_token()), 3 - delivered);
     EXPECT_EQ(written + readAll(), expected);
@@ -342,7 +342,7 @@ TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithOtherWriters) {
     EXPECT_EQ(content(path), "first\n" + lines + "last\n");
 }
 
-/// Standard output is a terminal of which nobody takes what is written.
+/// Standard output is a terminal that nobody reads.
 class JsonlSinkTerminalTest : public JsonlSinkTest {
 protected:
     JsonlSinkTerminalTest() {

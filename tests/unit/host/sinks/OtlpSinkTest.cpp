@@ -84,7 +84,7 @@ TEST_F(OtlpSinkTest, ReportsRecordsThatTheReceiverRejected) {
         trace.clear();
         server.set(answer, std::string(R"({"partialSuccess":{"rejectedLogRecords":)") + count +
                                R"(,"errorMessage":"too old"}})");
-        EXPECT_EQ(deliver(sink), 1u) << "they are not to be sent again";
+        EXPECT_EQ(deliver(sink), 1u) << "they must not be sent again";
         EXPECT_THAT(trace.messages(),
                     ElementsAre("collector has rejected 1 of 1 events for good: too old"));
     }
@@ -118,7 +118,7 @@ TEST_F(OtlpSinkTest, AHostileAnswerDoesNoHarm) {
     const std::string deep = std::string(20'000, '[') + std::string(20'000, ']');
     server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":)" + deep + "}}");
     EXPECT_EQ(deliver(sink), 1u);
-    EXPECT_THAT(trace.messages(), IsEmpty()) << "that is no count";
+    EXPECT_THAT(trace.messages(), IsEmpty()) << "that is not a count";
     server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":"1","errorMessage":"two\nlines)" +
                            std::string(1000, 'x') + R"("}})");
     EXPECT_EQ(deliver(sink), 1u);

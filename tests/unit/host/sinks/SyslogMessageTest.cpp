@@ -90,7 +90,7 @@ TEST(SyslogMessage, IsCutAtTheEndOfACharacter) {
     const std::string whole(room, 'x');
     EXPECT_EQ(messageOf({.description = whole}), expected(26, usualData, whole));
     EXPECT_EQ(messageOf({.description = whole + "y"}), expected(26, usualData, whole));
-    // The mark takes three bytes; the character at the end has two, of which one has room.
+    // The mark takes three bytes; the last character has two, of which only one fits.
     const std::string cut(room - 4, 'x');
     EXPECT_EQ(messageOf({.description = cut + "\xc3\xa9"}),
               expected(26, usualData, "\xef\xbb\xbf" + cut));

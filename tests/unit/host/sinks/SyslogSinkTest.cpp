@@ -76,7 +76,7 @@ public:
         EXPECT_EQ(::send(m_socket, text.data(), text.size(), MSG_NOSIGNAL),
                   static_cast<ssize_t>(text.size()));
     }
-    /// Sends what the other side takes at once; false when it is gone.
+    /// Sends what the other side accepts at once; false when it is gone.
     bool talk() const {
         static const std::string text(65536, 'x');
         pollfd descriptor = {m_socket, POLLOUT, 0};
@@ -178,14 +178,14 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     EXPECT_EQ(deliver(sink, 0, 3), 3u);
     const Socket first(listener);
     EXPECT_EQ(first.read(frames(0, 3).size()), frames(0, 3));
-    // The receiver takes nothing any more: the systems between hold what is sent.
+    // The receiver stops reading: what is sent stays in the systems' buffers.
     std::size_t delivered = 3;
     while (deliver(sink, delivered, 10) == 10) {
         delivered += 10;
         ASSERT_LT(delivered, 4900u);
     }
     EXPECT_EQ(sink.error(), "127.0.0.1:" + std::to_string(listener.port) + " takes nothing");
-    // What its system has acknowledged is what it can still read; the rest comes again.
+    // It can still read what its system has acknowledged; the rest is sent again.
     std::string seen;
     for (std::string some; !(some = first.readSome()).empty();) {
         seen += some;
@@ -236,7 +236,7 @@ TEST_F(SyslogSinkTest, AReceiverThatNeverStopsSendingIsDisconnected) {
         }
         first.reset();
     });
-    // However much it says, each delivery ends, and at last the connection does.
+    // However much it sends, each delivery ends, and finally the connection.
     std::size_t again = 0;
     const Clock::time_point limit = Clock::now() + 20s;
     while (!listener.hasInput(0) && Clock::now() < limit) {
@@ -298,7 +298,7 @@ TEST_F(SyslogSinkTest, OverUdpAnUnusedPortIsAFailureOnceItIsReported) {
         port = gone.port;
     }
     SyslogSink sink(config(port, "udp"));
-    // The first datagram goes out; the answer to it refuses the second.
+    // The first datagram is sent; the reply to it makes the second fail.
     const std::size_t delivered = deliver(sink, 0, 3);
     EXPECT_LT(delivered, 3u);
     EXPECT_EQ(sink.error(),

@@ -91,7 +91,7 @@ TEST_F(WebhookSinkTest, AFailedRequestIsRepeatedUnchanged) {
     receiver.set(statuses, std::vector<int>{500});
     WebhookSink sink(config());
     EXPECT_EQ(sink.deliver(from(0).first(2), giveUp.get_token()), 0u);
-    // More events have come by now; the receiver may have the first request nevertheless.
+    // More events have arrived by now; the receiver may still have got the first request.
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
     EXPECT_THAT(receiver.bodies(), ElementsAre(body(1, 2), body(1, 2), body(3, 5)));
     const std::vector<Request> requests = receiver.requests();
@@ -115,7 +115,7 @@ TEST_F(WebhookSinkTest, RereadsTheSecretForEachRequest) {
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
         EXPECT_EQ(sink.error(), path + " is not a file with a secret of 1 to 4096 bytes");
     }
-    EXPECT_TRUE(receiver.requests().empty()) << "nothing goes out unsigned";
+    EXPECT_TRUE(receiver.requests().empty()) << "nothing is sent unsigned";
     for (const char* const secret : {"first", "second key"}) {
         directory.write("secret", std::string(secret) + "\n");
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);

@@ -54,7 +54,7 @@ class SituationChanges : public testing::Test {
 protected:
     SituationChanges() { begin(); }
 
-    /// As a new process begins.
+    /// As in a new process.
     void begin() {
         set.reset();
         set = std::make_unique<SituationSet>(entries, queue, directory.file("situations.json"));
@@ -149,7 +149,7 @@ TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStopped) {
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
     set->stop("filed");
     set->apply({situation("filed", {}, "major")});
-    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "although it has changed";
 }
 
 TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStoppedAfterARestart) {
@@ -183,7 +183,7 @@ TEST_F(SituationChanges, ARemovedSituationOfTheFileIsForgottenEvenWhenThatCannot
                                                   directory.file("situations.json.new") +
                                                   ": No space left on device."));
     }
-    set->apply({situation("filed")}); // saves what could not be saved then
+    set->apply({situation("filed")}); // saves what could not be saved before
     begin();
     set->apply({situation("filed")});
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
@@ -238,10 +238,10 @@ TEST_F(SituationChanges, TheFilesSituationHidesOneOfTheSameName) {
     EXPECT_EQ(all[1].state, SituationStatus::FAILED);
     EXPECT_THAT(all[1].problem, HasSubstr("the configuration file has a situation of this name"));
     EXPECT_EQ(set->find("a")->config.severity, "critical");
-    // Changed, it still waits.
+    // It still waits after a change.
     EXPECT_EQ(done(set->replace(situation("a", {}, "info"))).state, SituationStatus::FAILED);
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
-    // A stop is the file's.
+    // A stop applies to the file's situation.
     set->stop("a");
     EXPECT_THAT(raisedBy("x"), IsEmpty());
     set->apply({});
@@ -299,7 +299,7 @@ TEST_F(SituationChanges, WhatRunsIsWhatIsSavedHoweverReloadsAndChangesInterleave
     for (const char* const name : {"a", "b"}) {
         threads.emplace_back([&, name] {
             for (int round = 0; round < 30; ++round) {
-                set->stop(name); // or the file does not name it
+                set->stop(name); // or the file does not have it
                 if (round % 2 == 0) {
                     set->start(name);
                 }

@@ -61,7 +61,7 @@ TEST_F(SituationRunnerTest, OpensAndCloses) {
     EXPECT_EQ(runner.state("a"), State::ABSENT);
     arrive();
     EXPECT_EQ(raised(), 1u);
-    // The counts go on where they were.
+    // The counts continue where they were.
     runner.start("a", named("a"), counts);
     EXPECT_TRUE(runner.settle(10s));
     arrive();
@@ -76,7 +76,7 @@ TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutBlockingTheCaller) {
     ASSERT_TRUE(runner.settle(10s));
     auto newCounts = std::make_shared<SituationCounts>();
     {
-        // As a log thread holds it that waits for room in the queue.
+        // As a log thread does that waits for room in the queue.
         const LockGuard guard(entries.lock());
         runner.stop("old");
         runner.start("new", named("new"), newCounts);

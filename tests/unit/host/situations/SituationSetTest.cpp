@@ -54,7 +54,7 @@ SituationConfig twoOf(const char* source) {
                       number("PERIODTHRS", INTF_EQUAL, 3600)});
 }
 
-/// The time as rows have it.
+/// The time in the form of rows.
 std::string now() {
     const std::time_t time = std::time(nullptr);
     std::tm local{};
@@ -150,17 +150,17 @@ TEST_F(SituationSetTest, AChangedSituationStartsOver) {
     severe.severity = "critical";
     situations.apply({severe});
     arrive("cron");
-    EXPECT_THAT(raised(), ElementsAre()) << "another severity is another situation";
+    EXPECT_THAT(raised(), ElementsAre()) << "a situation with another severity is a new one";
 }
 
 TEST_F(SituationSetTest, AFullQueueTakesTheEventsOfARowAndAClosedOneDoesNot) {
     situations.apply({situation("a", {}), situation("b", {})});
-    for (int count = 0; count < 3; ++count) { // the queue has room for four
+    for (int count = 0; count < 3; ++count) { // the queue holds four
         EXPECT_EQ(arrive("sshd"), 0u);
     }
     EXPECT_EQ(queue.backlog(reader), 6u);
     queue.close();
-    EXPECT_NE(arrive("sshd"), 0u) << "the log learns that its row was not taken";
+    EXPECT_NE(arrive("sshd"), 0u) << "the log is told that its row was refused";
     EXPECT_EQ(raised().size(), 6u);
 }
 

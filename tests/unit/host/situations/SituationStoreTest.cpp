@@ -75,7 +75,7 @@ TEST_F(SituationStoreTest, LoadsWhatWasSaved) {
     EXPECT_TRUE(loaded.made[1].isStopped);
     EXPECT_EQ(loaded.made[0].problem, "");
     EXPECT_THAT(loaded.stoppedFiles, ElementsAre("filed"));
-    EXPECT_THAT(names(), ElementsAre("situations.json")) << "no temporary is left";
+    EXPECT_THAT(names(), ElementsAre("situations.json")) << "no temporary file is left";
     struct stat status {};
     stat(file.c_str(), &status);
     EXPECT_EQ(status.st_mode & S_IRWXO, 0u);
@@ -203,7 +203,7 @@ TEST_F(SituationStoreTest, MovesAnUnusableFileAside) {
             << written;
         ASSERT_EQ(names().size(), 1u);
         EXPECT_THAT(names()[0], HasSubstr("situations.json.bad-"));
-        EXPECT_EQ(fresh.save(content()), "") << "a new one is begun";
+        EXPECT_EQ(fresh.save(content()), "") << "a new file is created";
     }
 }
 

@@ -33,7 +33,7 @@ TestManager& entries() {
 
 bool hasLogs = true;
 
-/// Two tables, and one log unless a test has none.
+/// Two tables, and one log unless a test removes it.
 int loadTables() {
     static auto* const logs = new TestManager("RMMONLOG");
     logs->onCreate = [](TestRequest& created) {
@@ -52,7 +52,7 @@ int loadNothing() {
     return 0;
 }
 
-/// Waits until there are situations, and hands each of them a row.
+/// Waits until there are situations and offers each of them a row.
 void arrive(std::size_t situations = 1) {
     while (entries().linked().size() != situations) {
         std::this_thread::sleep_for(1ms);
@@ -226,7 +226,7 @@ TEST_F(HostTest, AnExitOnAnotherThreadDeliversWhatIsQueued) {
                 std::exit(3);
             }).detach();
             run();
-            std::_Exit(98); // the main loop must not come back
+            std::_Exit(98); // the main loop must not return
         },
         testing::ExitedWithCode(3), "");
     EXPECT_EQ(lines(), 100);
@@ -319,7 +319,7 @@ TEST_F(HostTest, ReportsOnceThatThereIsNoLogToMonitor) {
             errorsToFile();
             std::thread([this] {
                 waitForError("no log");
-                std::this_thread::sleep_for(1100ms); // one more look at the logs
+                std::this_thread::sleep_for(1100ms); // one more check of the logs
                 stop();
             }).detach();
             std::exit(run());

@@ -41,7 +41,7 @@ protected:
     }
     ~ServingTest() override { Tables::clear(); }
 
-    /// A log's thread that hands rows over until one is not taken.
+    /// A log's thread that offers rows until one is refused.
     unsigned arrive() {
         unsigned status = 0;
         SYS1_GetLock(entries.lock());
@@ -68,7 +68,7 @@ protected:
     TestManager entries{"RMLOGENT"};
     TestManager logs{"RMMONLOG"};
     int logSamples = 0;
-    Watchdog watchdog; // not started: it looks after a whole process
+    Watchdog watchdog; // not started: it watches a whole process
 };
 
 TEST_F(ServingTest, DeliversEventsFromStartToStop) {
@@ -78,7 +78,7 @@ TEST_F(ServingTest, DeliversEventsFromStartToStop) {
     EXPECT_EQ(arrive(), 0u);
     serving->stop(Clock::now() + 10s);
     EXPECT_EQ(lines(), 2);
-    arrive(); // nobody listens any more
+    arrive(); // nobody receives it any more
     EXPECT_EQ(lines(), 2);
 }
 
@@ -109,7 +109,7 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
 }
 
 TEST_F(ServingTest, AStopReleasesAWaitingLogAndEndsAtItsLimit) {
-    config.history.enabled = false; // the queue is all the room there is
+    config.history.enabled = false; // only the queue holds events
     config.sinks = {SinkConfig::jsonl("/dev/full")};
     const auto serving = Serving::begin(config, entries, watchdog);
     std::atomic<int> taken{0};
@@ -120,7 +120,7 @@ TEST_F(ServingTest, AStopReleasesAWaitingLogAndEndsAtItsLimit) {
         }
         EventRoom::notePassedOver(7);
     });
-    while (EventRoomControl::waits().count == 0) { // the queue is full, and the log stands still
+    while (EventRoomControl::waits().count == 0) { // the queue is full, and the log waits
         std::this_thread::sleep_for(1ms);
     }
     testing::internal::CaptureStderr();
@@ -198,7 +198,7 @@ TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
     serving->tick();
     EXPECT_EQ(logSamples, before) << "no minute is over yet";
     serving->stop(Clock::now() + 10s);
-    EXPECT_EQ(logSamples, before + 1) << "the end of the agent ends the minute";
+    EXPECT_EQ(logSamples, before + 1) << "the minute ends with the agent";
 }
 
 TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
