@@ -11,7 +11,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <csignal>
@@ -352,43 +351,6 @@ TEST_F(HttpConnectionTest, AClientThatExpectsContinueGetsIt) {
     recv(fd, got.data(), got.size(), MSG_WAITALL);
     EXPECT_EQ(got, "HTTP/1.1 200");
     close(fd);
-}
-
-TEST(HttpConnection, RequestsWithoutAFreeWorkerAreRefusedAndQuickOnesAreServed) {
-    RecordingTrace trace(0);
-    Router router;
-    std::promise<void> go;
-    std::shared_future<void> mayGo = go.get_future().share();
-    std::atomic<int> slow{0};
-    router.add("GET", "/slow", [&](const HttpRequest&) {
-        ++slow;
-        mayGo.wait();
-        return HttpAnswer::json("{}");
-    });
-    router.add(
-        "GET", "/quick", [](const HttpRequest&) { return HttpAnswer::json("{}"); }, Router::TOKEN,
-        Router::QUICK);
-    HttpServer server(router, {.workers = 1, .quickWorkers = 1});
-    ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
-    const auto ask = [&](const std::string& path) {
-        return TestClient("127.0.0.1", server.port(), secret).get(path);
-    };
-    auto first = std::async(std::launch::async, [&] { return ask("/slow")->status; });
-    while (slow == 0) {
-        std::this_thread::sleep_for(1ms);
-    }
-    auto second = std::async(std::launch::async, [&] { return ask("/slow"); });
-    EXPECT_EQ(ask("/quick")->status, 200);
-    const auto busy = second.get();
-    ASSERT_TRUE(busy);
-    EXPECT_EQ(busy->status, 503);
-    EXPECT_EQ(busy->header("content-type"), "application/problem+json");
-    EXPECT_EQ(busy->header("retry-after"), "5");
-    EXPECT_THAT(busy->body, testing::HasSubstr("the agent is busy with other requests"));
-    go.set_value();
-    EXPECT_EQ(first.get(), 200);
-    EXPECT_EQ(ask("/slow")->status, 200) << "workers are free again";
-    EXPECT_EQ(slow, 2) << "refused work is not done later";
 }
 
 TEST_F(HttpConnectionTest, AnsweredRequestsAreCounted) {
