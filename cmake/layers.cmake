@@ -17,6 +17,10 @@ function(zrm_layer name)
     # The contract's implementation closes a circle of libraries, which a linker that reads them in
     # order has to go around a few times.
     set_target_properties(${name} PROPERTIES LINK_INTERFACE_MULTIPLICITY 4)
+    if(ZRM_COVERAGE)
+      target_compile_options(${name} PRIVATE -O0 --coverage -fprofile-update=atomic)
+      target_link_options(${name} PUBLIC --coverage)
+    endif()
     set(scope PUBLIC)
   else()
     add_library(${name} INTERFACE)

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_BACKTEST_H
 #define ZRM_HOST_BACKTEST_H
 
-#include "host/analysis/Reach.h"
+#include "host/analysis/LogTail.h"
 #include "host/analysis/Replay.h"
 #include "host/config/HostConfig.h"
 

@@ -2,7 +2,7 @@
 #define ZRM_HOST_EXPLAINER_H
 
 #include "host/analysis/Explanation.h"
-#include "host/analysis/Reach.h"
+#include "host/analysis/LogTail.h"
 #include "host/analysis/Replay.h"
 #include "host/config/HostConfig.h"
 #include "logs/zrm_rmlogent_data.h"

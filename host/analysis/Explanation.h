@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include <nlohmann/json_fwd.hpp>
+
 namespace zrm::host {
 
 /// Why an entry does or does not raise a situation.
@@ -27,6 +29,12 @@ struct Explanation {
     std::optional<Window> window;
     bool isRaised = false;
     std::string decision; ///< one sentence
+};
+
+/// Explanations as JSON objects. Stateless.
+class ExplanationJson {
+public:
+    static nlohmann::ordered_json of(const Explanation& explanation);
 };
 
 } // namespace zrm::host

@@ -16,11 +16,26 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <nlohmann/json.hpp>
+
 namespace zrm::host {
 
 namespace {
 
 TRC1_Anchor anchor{"LogTail.cpp"};
+
+} // namespace
+
+void Reach::addTo(nlohmann::ordered_json& object) const {
+    const auto orNull = [](const std::string& text) {
+        return text.empty() ? nlohmann::ordered_json() : nlohmann::ordered_json(text);
+    };
+    object["complete"] = isComplete();
+    object["reached"] = orNull(reached);
+    object["reason"] = orNull(reason);
+}
+
+namespace {
 
 constexpr char errorLog = 'E'; ///< this log is read through a command
 

@@ -1,7 +1,6 @@
 #ifndef ZRM_HOST_LOG_TAIL_H
 #define ZRM_HOST_LOG_TAIL_H
 
-#include "host/analysis/Reach.h"
 #include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
@@ -10,11 +9,23 @@
 #include <string>
 #include <string_view>
 
+#include <nlohmann/json_fwd.hpp>
+
 namespace zrm {
 class LogFile;
 } // namespace zrm
 
 namespace zrm::host {
+
+/// How far back logs were read and why reading stopped.
+struct Reach {
+    std::string reached; ///< ENTRYTIME of the oldest entry read; empty: none was read
+    std::string reason;  ///< why reading stopped early, as a clause; empty: everything was read
+
+    bool isComplete() const noexcept { return reason.empty(); }
+    /// Adds `complete`, `reached` and `reason` to a JSON object.
+    void addTo(nlohmann::ordered_json& object) const;
+};
 
 /// Reads what a log holds last, and lines that it might hold, as its monitor would: in the same
 /// pieces and by the log's own operation that makes rows. The monitor goes on undisturbed: rows

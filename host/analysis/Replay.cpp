@@ -1,8 +1,7 @@
 #include "host/analysis/Replay.h"
 
 #include "base/TraceScope.h"
-#include "host/framework/ContextInfo.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 #include "tables/zrm_rmlogent_agent.h"
 
 #include <cstring>

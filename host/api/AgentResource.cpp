@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "framework/agent_calls.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/delivery/Delivery.h"
@@ -18,17 +18,18 @@
 #include <chrono>
 #include <string>
 
-#include <nlohmann/json.hpp>
 #include <signal.h>
 #include <unistd.h>
+
+#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
 namespace {
 
-using nlohmann::ordered_json;
-
 TRC1_Anchor anchor{"AgentResource.cpp"};
+
+using nlohmann::ordered_json;
 
 constexpr std::size_t longestLevels = 4096; ///< bytes
 constexpr int tracedLevels = 200;           ///< bytes of the levels shown in the trace
@@ -174,6 +175,18 @@ HttpAnswer AgentResource::status(const HttpRequest& request) {
                        {"sinks", sinksOf(m_delivery)},
                        {"warnings", warningsOf(m_watch)},
                        {"trace", TraceControl::levels()}});
+}
+
+void HealthResource::addRoutes(Router& router) {
+    router.add(
+        "GET", "/healthz",
+        [problem = m_problem](const HttpRequest&) {
+            if (std::string reason = problem(); !reason.empty()) {
+                throw RequestRefused(503, std::move(reason), "");
+            }
+            return HttpAnswer::json(R"({"status":"ok"})");
+        },
+        Router::PUBLIC, Router::QUICK);
 }
 
 } // namespace zrm::host

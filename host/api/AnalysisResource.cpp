@@ -2,7 +2,7 @@
 
 #include "host/analysis/Backtest.h"
 #include "host/analysis/Explainer.h"
-#include "host/analysis/ExplanationJson.h"
+#include "host/analysis/Explanation.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/MonitoredLogs.h"
 #include "host/analysis/StoredRow.h"

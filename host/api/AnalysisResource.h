@@ -2,11 +2,10 @@
 #define ZRM_HOST_ANALYSIS_RESOURCE_H
 
 #include "host/analysis/Explanation.h"
-#include "host/analysis/Reach.h"
+#include "host/analysis/LogTail.h"
 #include "host/config/HostConfig.h"
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
-#include "host/http/Resource.h"
+#include "host/http/Message.h"
+#include "host/http/Router.h"
 #include "host/situations/SituationSet.h"
 
 #include <atomic>

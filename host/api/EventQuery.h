@@ -1,7 +1,6 @@
 #ifndef ZRM_HOST_EVENT_QUERY_H
 #define ZRM_HOST_EVENT_QUERY_H
 
-#include "host/history/EventFilter.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"

@@ -1,9 +1,8 @@
 #ifndef ZRM_HOST_EVENT_STREAM_H
 #define ZRM_HOST_EVENT_STREAM_H
 
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
-#include "host/http/Resource.h"
+#include "host/http/Message.h"
+#include "host/http/Router.h"
 
 #include <chrono>
 #include <cstddef>

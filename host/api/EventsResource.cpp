@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/api/EventQuery.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/events/RowJson.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/QueryFields.h"

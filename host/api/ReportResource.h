@@ -2,11 +2,28 @@
 #define ZRM_HOST_REPORT_RESOURCE_H
 
 #include "host/api/SampleSource.h"
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
-#include "host/http/Resource.h"
+#include "host/framework/Condition.h"
+#include "host/http/Message.h"
+#include "host/http/Router.h"
+
+#include <string>
+#include <string_view>
+#include <vector>
 
 namespace zrm::host {
+
+/// What a report is asked for.
+struct ReportRequest {
+    std::string log;  ///< whole path
+    std::string from; ///< 16-character time stamp, as `to`
+    std::string to;
+    std::vector<Condition> conditions; ///< all of it, as the agent takes it
+
+    /// Reads {"log", "from", "to", "where": [condition, ..]}; without `to`, up to the newest
+    /// entry.
+    /// Throws RequestRefused.
+    static ReportRequest parse(std::string_view body);
+};
 
 /// `POST /api/v1/reports`: the entries of a log between two times that meet conditions.
 class ReportResource : public Resource {

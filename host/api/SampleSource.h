@@ -34,6 +34,12 @@ public:
     bool isMonitored(const std::vector<Condition>& report);
 };
 
+/// Takes samples of the agent's registered tables.
+class TableSampler : public SampleSource {
+public:
+    Rows take(std::string_view table, const std::vector<Condition>& conditions) override;
+};
+
 } // namespace zrm::host
 
 #endif

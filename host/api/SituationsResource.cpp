@@ -1,6 +1,7 @@
 #include "host/api/SituationsResource.h"
 
 #include "host/api/SituationBody.h"
+#include "host/base/UrlText.h"
 #include "host/http/JsonFields.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
@@ -49,23 +50,6 @@ HttpAnswer answerOf(const SituationSet::Change& change) {
     }
     const Json status = SituationJson::status(std::get<SituationStatus>(change));
     return HttpAnswer::json(SituationJson::text(status));
-}
-
-/// A name as one path segment.
-std::string encoded(const std::string& name) {
-    constexpr const char* digits = "0123456789ABCDEF";
-    constexpr std::string_view unreserved =
-        "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-._~";
-    std::string text;
-    for (const char c : name) {
-        if (unreserved.find(c) != std::string_view::npos) {
-            text += c;
-        } else {
-            const auto byte = static_cast<unsigned char>(c);
-            text += {'%', digits[byte >> 4], digits[byte & 0x0f]};
-        }
-    }
-    return text;
 }
 
 } // namespace
@@ -120,7 +104,8 @@ HttpAnswer SituationsResource::add(const HttpRequest& request) {
     const SituationConfig situation = SituationBody::situation(fields);
     HttpAnswer answer = answerOf(m_situations.add(situation));
     answer.status = 201;
-    answer.headers.emplace_back("Location", "/api/v1/situations/" + encoded(situation.name));
+    answer.headers.emplace_back("Location",
+                                "/api/v1/situations/" + UrlText::encode(situation.name));
     return answer;
 }
 
@@ -158,7 +143,7 @@ HttpAnswer SituationsResource::validate(const HttpRequest& request) {
     } catch (const RequestRefused& refused) {
         // A member of the wrong type prevents the others from being read.
         problems.push_back(
-            {{"field", refused.problem().field}, {"detail", refused.problem().detail}});
+            {{"field", refused.problem().field}, {"detail", refused.problem().text()}});
     }
     return HttpAnswer::json(SituationJson::text({{"problems", std::move(problems)}}));
 }

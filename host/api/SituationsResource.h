@@ -1,9 +1,8 @@
 #ifndef ZRM_HOST_SITUATIONS_RESOURCE_H
 #define ZRM_HOST_SITUATIONS_RESOURCE_H
 
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
-#include "host/http/Resource.h"
+#include "host/http/Message.h"
+#include "host/http/Router.h"
 #include "host/situations/SituationSet.h"
 
 namespace zrm::host {

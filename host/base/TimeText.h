@@ -1,12 +1,44 @@
 #ifndef ZRM_HOST_TIME_TEXT_H
 #define ZRM_HOST_TIME_TEXT_H
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
 
 namespace zrm::host {
+
+/// The wall-clock time in the form in which the host stores it.
+namespace WallClock {
+
+/// Milliseconds since 1970-01-01, UTC.
+inline std::int64_t now() {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(
+               std::chrono::system_clock::now().time_since_epoch())
+        .count();
+}
+
+} // namespace WallClock
+
+/// The host's times in the form that other systems read. Stateless.
+class UtcTime {
+public:
+    /// Appends a time in milliseconds since 1970-01-01 UTC, formatted as
+    /// "2026-11-20T07:03:09.412Z".
+    static void append(std::string& text, std::int64_t milliseconds);
+
+    /// The same as a new text.
+    static std::string text(std::int64_t milliseconds);
+};
+
+/// Durations as written by operators. Stateless.
+class DurationText {
+public:
+    /// The duration of "60s", "5m", "1h" or "1d"; none for any other text, for zero ("0s"), and for
+    /// more than 2147483647 seconds.
+    static std::optional<std::chrono::seconds> parse(std::string_view text);
+};
 
 /// Times as written by operators. Stateless.
 class TimeText {

@@ -29,6 +29,22 @@ std::optional<std::string> UrlText::decode(std::string_view encoded) {
     return isText ? std::optional(std::move(text)) : std::nullopt;
 }
 
+std::string UrlText::encode(std::string_view text) {
+    constexpr std::string_view plain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz"
+                                       "0123456789-._~";
+    constexpr const char* digits = "0123456789ABCDEF";
+    std::string part;
+    for (const char c : text) {
+        if (plain.find(c) != std::string_view::npos) {
+            part += c;
+        } else {
+            const auto byte = static_cast<unsigned char>(c);
+            part += {'%', digits[byte >> 4], digits[byte & 0x0f]};
+        }
+    }
+    return part;
+}
+
 std::optional<std::multimap<std::string, std::string>> UrlText::query(std::string_view encoded) {
     std::multimap<std::string, std::string> query;
     while (!encoded.empty()) {

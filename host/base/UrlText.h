@@ -8,12 +8,15 @@
 
 namespace zrm::host {
 
-/// Decodes parts of a URL strictly. Stateless.
+/// Decodes parts of a URL, strictly, and encodes them. Stateless.
 class UrlText {
 public:
     /// Decodes percent-encoding; none when an encoding is invalid, or when the result is not UTF-8
     /// or contains a NUL character.
     static std::optional<std::string> decode(std::string_view encoded);
+
+    /// A text as one part of a URL: everything but letters, digits, '-', '.', '_' and '~' as %XX.
+    static std::string encode(std::string_view text);
 
     /// Names and values of a query, where '+' means a blank; none when one of them cannot be
     /// decoded.

@@ -1,5 +1,6 @@
 #include "host/cli/AgentClient.h"
 
+#include "host/base/UrlText.h"
 #include "host/cli/CliError.h"
 #include "host/cli/InputFile.h"
 #include "host/cli/JsonText.h"
@@ -37,8 +38,7 @@ bool isSuccess(int status) {
 std::string withQuery(const std::string& path, const AgentClient::Query& query) {
     std::string text = path;
     for (const auto& [name, value] : query) {
-        text +=
-            (text.size() == path.size() ? '?' : '&') + name + '=' + AgentClient::pathPart(value);
+        text += (text.size() == path.size() ? '?' : '&') + name + '=' + UrlText::encode(value);
     }
     return text;
 }
@@ -228,22 +228,6 @@ void AgentClient::stream(const std::string& path, const Query& query,
 
 void AgentClient::stop() {
     m_implementation->stop();
-}
-
-std::string AgentClient::pathPart(std::string_view text) {
-    constexpr std::string_view plain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz"
-                                       "0123456789-._~";
-    constexpr const char* digits = "0123456789ABCDEF";
-    std::string part;
-    for (const char c : text) {
-        if (plain.find(c) != std::string_view::npos) {
-            part += c;
-        } else {
-            const auto byte = static_cast<unsigned char>(c);
-            part += {'%', digits[byte >> 4], digits[byte & 0x0f]};
-        }
-    }
-    return part;
 }
 
 } // namespace zrm::host

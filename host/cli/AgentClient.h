@@ -36,10 +36,6 @@ public:
     /// Ends a request under way, and every later one before it begins. Any thread.
     void stop();
 
-    /// A text as one part of a path: everything but letters, digits, '-', '.', '_' and '~' as
-    /// %XX.
-    static std::string pathPart(std::string_view text);
-
 private:
     class Implementation;
     std::unique_ptr<Implementation> m_implementation;

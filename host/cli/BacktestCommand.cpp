@@ -1,4 +1,4 @@
-#include "host/cli/BacktestCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"

@@ -1,11 +1,10 @@
-#include "host/cli/CheckCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
 #include "host/config/ConfigFile.h"
-#include "host/config/ConfigSecrets.h"
 #include "host/diagnose/ConfigCheck.h"
 
 #include <algorithm>

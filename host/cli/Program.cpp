@@ -1,19 +1,9 @@
 #include "host/cli/Program.h"
 
-#include "host/cli/BacktestCommand.h"
-#include "host/cli/CheckCommand.h"
 #include "host/cli/CliError.h"
+#include "host/cli/Commands.h"
 #include "host/cli/Context.h"
-#include "host/cli/EventsCommand.h"
-#include "host/cli/ExplainCommand.h"
-#include "host/cli/LogsCommand.h"
-#include "host/cli/RefreshCommand.h"
-#include "host/cli/ReportCommand.h"
-#include "host/cli/SituationsCommand.h"
-#include "host/cli/StatusCommand.h"
 #include "host/cli/Terminal.h"
-#include "host/cli/TraceCommand.h"
-#include "host/cli/TryCommand.h"
 
 #include <new>
 

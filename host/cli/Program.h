@@ -2,7 +2,7 @@
 #define ZRM_HOST_CLI_PROGRAM_H
 
 #include "host/cli/AgentAccess.h"
-#include "host/cli/Command.h"
+#include "host/cli/Commands.h"
 
 #include <memory>
 #include <vector>

@@ -1,9 +1,9 @@
-#include "host/cli/SituationsCommand.h"
+#include "host/cli/Commands.h"
 
+#include "host/base/UrlText.h"
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
-#include "host/cli/FactList.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"
@@ -100,7 +100,7 @@ int SituationsCommand::run(Context& context) {
 }
 
 std::string SituationsCommand::path(const char* below) const {
-    return route + '/' + AgentClient::pathPart(m_name) + below;
+    return route + '/' + UrlText::encode(m_name) + below;
 }
 
 int SituationsCommand::done(Context& context, const Json& answer, const char* what) const {

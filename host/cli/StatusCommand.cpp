@@ -1,8 +1,7 @@
-#include "host/cli/StatusCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
-#include "host/cli/FactList.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"

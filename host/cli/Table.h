@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace zrm::host {
@@ -50,6 +51,24 @@ private:
 
     std::vector<Column> m_columns;
     std::vector<std::vector<Cell>> m_rows;
+};
+
+/// A list of names and values, one per line.
+class FactList {
+public:
+    /// Adds a fact; a fact with an empty value is left out.
+    void add(std::string name, const std::string& value, Colour colour = Colour::NONE);
+
+    /// The lines; values are never shortened to the terminal's width.
+    std::string text(const Terminal& terminal) const;
+
+private:
+    struct Fact {
+        std::string name;
+        std::string value;
+        Colour colour;
+    };
+    std::vector<Fact> m_facts;
 };
 
 } // namespace zrm::host

@@ -1,4 +1,4 @@
-#include "host/cli/TraceCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"

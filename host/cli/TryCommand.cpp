@@ -1,18 +1,20 @@
-#include "host/cli/TryCommand.h"
+#include "host/cli/Commands.h"
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
-#include "host/cli/MarkedText.h"
+#include "host/cli/Terminal.h"
 #include "host/cli/TimeDisplay.h"
 #include "host/diagnose/FormatTrial.h"
 
 #include <algorithm>
 #include <array>
+#include <cstddef>
 #include <cstdio>
 #include <filesystem>
 #include <optional>
+#include <string>
 #include <string_view>
 #include <system_error>
 #include <utility>
@@ -24,6 +26,35 @@
 namespace zrm::host {
 
 namespace {
+
+constexpr std::size_t narrowest = 10; ///< the fewest columns of the text that are shown
+
+/// A text with a caret under one position. Two lines, each with its line end: the text in visible
+/// form, and the caret under byte `at` (after the text when `at` is its size), both indented by
+/// `indent` columns. On a narrow terminal, only the part of the text around the position.
+std::string markedAt(std::string_view text, std::size_t at, std::size_t indent,
+                     const Terminal& terminal) {
+    at = std::min(at, text.size());
+    std::string before = DisplayText::visible(text.substr(0, at));
+    std::string rest = DisplayText::visible(text.substr(at));
+    if (terminal.width > 0) {
+        const std::size_t room =
+            std::max(narrowest, terminal.width > indent ? terminal.width - indent : 0);
+        const std::size_t columns = DisplayText::width(before);
+        if (columns + std::max<std::size_t>(DisplayText::width(rest), 1) > room &&
+            columns > room / 2) {
+            const std::size_t mark = DisplayText::width(terminal.ellipsis());
+            const std::size_t dropped = columns - room / 2 + mark;
+            before.erase(0, DisplayText::beginning(before, dropped).size());
+            before.insert(0, terminal.ellipsis());
+        }
+        rest = DisplayText::shortened(rest, room - std::min(room, DisplayText::width(before)),
+                                      terminal.ellipsis());
+    }
+    const std::string blanks(indent, ' ');
+    return blanks + before + rest + '\n' + blanks + std::string(DisplayText::width(before), ' ') +
+           terminal.coloured("^", Colour::BAD) + '\n';
+}
 
 using Json = nlohmann::ordered_json;
 
@@ -69,7 +100,7 @@ std::string textOf(std::size_t number, const FormatTrial::Line& line, const Term
         std::string(numberColumns - std::min(numberColumns, digits.size()), ' ') + digits + "  ";
     if (!line.matched && line.failedAt) {
         // The line number replaces the leading blanks.
-        const std::string marked = MarkedText::of(line.line, *line.failedAt, indent, terminal);
+        const std::string marked = markedAt(line.line, *line.failedAt, indent, terminal);
         return head + marked.substr(indent) + reasonOf(line.reason, Colour::BAD, terminal);
     }
     const std::string shown = DisplayText::visible(line.line);
@@ -82,7 +113,7 @@ std::string textOf(std::size_t number, const FormatTrial::Line& line, const Term
 
 std::string refusalOf(const std::string& format, const FormatTrial::Result& result,
                       const Terminal& terminal) {
-    return (result.position ? MarkedText::of(format, *result.position, 0, terminal) : "") +
+    return (result.position ? markedAt(format, *result.position, 0, terminal) : "") +
            terminal.coloured(DisplayText::visible(result.reason), Colour::BAD) + '\n';
 }
 

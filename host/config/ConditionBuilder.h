@@ -2,10 +2,11 @@
 #define ZRM_HOST_CONDITION_BUILDER_H
 
 #include "host/config/Columns.h"
-#include "host/config/PatternBudget.h"
 #include "host/framework/Condition.h"
 
+#include <algorithm>
 #include <array>
+#include <cstddef>
 #include <cstdint>
 #include <span>
 #include <string>
@@ -14,6 +15,34 @@
 #include <vector>
 
 namespace zrm::host {
+
+/// Limits the total size of the regular expressions of several conditions, in instructions of their
+/// compiled programs. Each instruction costs microseconds to compile and a few bytes of memory
+/// while the condition is in force, and a pattern of a few bytes can have hundreds of thousands.
+/// Used by one thread.
+class PatternBudget {
+public:
+    static constexpr std::size_t ofPattern = 10'000;
+    static constexpr std::size_t ofSituation = 20'000; ///< also for the filters of one request
+    /// For all situations of the configuration file, and for all those made through the API.
+    static constexpr std::size_t ofSource = 1'000'000;
+
+    explicit PatternBudget(std::size_t most = ofSituation) noexcept : m_most(most) {}
+
+    void spend(std::size_t size) noexcept { m_used += size; }
+    std::size_t used() const noexcept { return m_used; }
+    bool isExceeded() const noexcept { return m_used > m_most; }
+    /// The part of its source's budget that the next situation may use.
+    PatternBudget ofNext() const noexcept {
+        return PatternBudget(isSpent() ? 0 : std::min(m_most - m_used, ofSituation));
+    }
+    /// Whether there is no budget left for another pattern.
+    bool isSpent() const noexcept { return m_used >= m_most; }
+
+private:
+    std::size_t m_most;
+    std::size_t m_used = 0;
+};
 
 /// What is wrong with a condition, and where.
 struct ConditionProblem {

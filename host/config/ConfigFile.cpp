@@ -5,6 +5,7 @@
 #include "host/config/ConfigSection.h"
 #include "host/config/LogReader.h"
 #include "host/config/SinkReader.h"
+#include "host/config/SinkTypes.h"
 #include "host/config/SituationReader.h"
 #include "host/config/TomlNesting.h"
 #include "host/framework/TraceLevels.h"
@@ -285,6 +286,29 @@ ConfigFile::Result ConfigFile::reload(const std::string& path) {
         return problems.texts();
     }
     return result;
+}
+
+namespace {
+
+bool holdsSecret(const SinkConfig& sink) {
+    const SinkConfig::Texts headers = sink.texts("headers");
+    return !sink.text("secret").empty() ||
+           std::any_of(headers.begin(), headers.end(),
+                       [](const auto& header) { return isSecretHeader(header.first); });
+}
+
+} // namespace
+
+std::string warningOfSecrets(const HostConfig& config, const std::string& path) {
+    struct stat status {};
+    if (stat(path.c_str(), &status) != 0 || (status.st_mode & S_IROTH) == 0 ||
+        std::none_of(config.sinks.begin(), config.sinks.end(), holdsSecret)) {
+        return "";
+    }
+    return path +
+           " contains secrets and every user can read it: move them into separate files "
+           "(secret_file, headers_file), or remove the permissions of other users (chmod o= " +
+           path + ')';
 }
 
 } // namespace zrm::host

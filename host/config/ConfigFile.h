@@ -31,6 +31,10 @@ public:
     static Result parse(std::string_view text, const std::string& path);
 };
 
+/// A warning when the configuration read from this file contains a secret of a sink and every user
+/// can read the file; otherwise empty.
+std::string warningOfSecrets(const HostConfig& config, const std::string& path);
+
 } // namespace zrm::host
 
 #endif

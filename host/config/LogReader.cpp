@@ -1,6 +1,6 @@
 #include "host/config/LogReader.h"
 
-#include "host/base/DurationText.h"
+#include "host/base/TimeText.h"
 #include "host/config/OwnFiles.h"
 #include "host/config/PathPattern.h"
 #include "host/config/TimeZones.h"

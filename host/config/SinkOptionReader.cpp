@@ -1,9 +1,9 @@
 #include "host/config/SinkOptionReader.h"
 
-#include "host/base/DurationText.h"
 #include "host/base/ListenAddress.h"
-#include "host/config/HeaderName.h"
+#include "host/base/TimeText.h"
 #include "host/config/HttpUrl.h"
+#include "host/config/SinkTypes.h"
 
 #include <algorithm>
 #include <array>

@@ -1,11 +1,24 @@
 #ifndef ZRM_HOST_SINK_TYPES_H
 #define ZRM_HOST_SINK_TYPES_H
 
+#include <array>
 #include <cstdint>
 #include <span>
 #include <string_view>
 
 namespace zrm::host {
+
+/// The facilities of RFC 5424 by their usual names; the index is the code.
+inline constexpr std::array<std::string_view, 24> syslogFacilities = {
+    "kern",   "user",   "mail",     "daemon", "auth",   "syslog", "lpr",    "news",
+    "uucp",   "cron",   "authpriv", "ftp",    "ntp",    "audit",  "alert",  "clock",
+    "local0", "local1", "local2",   "local3", "local4", "local5", "local6", "local7"};
+
+/// Whether an operator may add a header of this name to those that a sink sets.
+bool isAddableHeader(std::string_view name);
+
+/// Whether the value of this header is usually a secret, as for Authorization.
+bool isSecretHeader(std::string_view name);
 
 /// One key of a [[sink]]: what the reader of configurations accepts and what the documentation
 /// says.

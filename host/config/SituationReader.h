@@ -1,10 +1,10 @@
 #ifndef ZRM_HOST_SITUATION_READER_H
 #define ZRM_HOST_SITUATION_READER_H
 
+#include "host/config/ConditionBuilder.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
 #include "host/config/HostConfig.h"
-#include "host/config/PatternBudget.h"
 
 #include <map>
 #include <string>

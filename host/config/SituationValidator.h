@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_SITUATION_VALIDATOR_H
 #define ZRM_HOST_SITUATION_VALIDATOR_H
 
+#include "host/config/ConditionBuilder.h"
 #include "host/config/HostConfig.h"
-#include "host/config/PatternBudget.h"
 
 #include <cstddef>
 #include <optional>

@@ -1,6 +1,6 @@
 #include "host/config/Thresholds.h"
 
-#include "host/base/DurationText.h"
+#include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <array>

@@ -1,6 +1,5 @@
 #include "host/console/ConsoleResource.h"
 
-#include "host/console/ConsoleFile.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
 

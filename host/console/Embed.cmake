@@ -16,7 +16,7 @@ foreach(entry IN LISTS ENTRIES)
   math(EXPR index "${index} + 1")
 endforeach()
 
-file(WRITE ${OUTPUT} "#include \"host/console/ConsoleFile.h\"
+file(WRITE ${OUTPUT} "#include \"host/console/ConsoleResource.h\"
 
 #include <cstddef>
 

@@ -8,7 +8,6 @@
 
 #include <cinttypes>
 #include <utility>
-#include <variant>
 
 namespace zrm::host {
 
@@ -26,10 +25,10 @@ OpenedHistory openHistory(const HostConfig& config) {
         const std::string& directory =
             config.history.directory.empty() ? config.stateDirectory : config.history.directory;
         auto opened = History::open(config.history, directory);
-        if (auto* const history = std::get_if<std::unique_ptr<History>>(&opened)) {
-            result.history = std::move(*history);
+        if (opened) {
+            result.history = std::move(*opened);
         } else {
-            result.problem = std::get<std::string>(opened);
+            result.problem = opened.error().text();
             say("the history is off: %s. Until the next start sinks receive events without it, and "
                 "one that stays down stops the monitoring",
                 result.problem.c_str());

@@ -2,7 +2,6 @@
 #define ZRM_HOST_DELIVERY_H
 
 #include "host/config/HostConfig.h"
-#include "host/delivery/SinkState.h"
 #include "host/delivery/SinkThread.h"
 #include "host/events/EventQueue.h"
 #include "host/framework/RowLayout.h"

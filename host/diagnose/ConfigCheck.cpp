@@ -2,7 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
-#include "host/diagnose/ConfiguredFormat.h"
+#include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
 #include "host/framework/TraceCapture.h"
 #include "logs/LogManagerUtil.h"

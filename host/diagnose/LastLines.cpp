@@ -36,12 +36,12 @@ std::optional<std::string> readFrom(int fd, off_t offset, std::size_t size) {
 } // namespace
 
 std::optional<std::vector<std::string>> LastLines::read(int descriptor, std::size_t count,
-                                                        std::size_t mostBytes) {
+                                                        std::size_t byteLimit) {
     struct stat status;
     if (::fstat(descriptor, &status) != 0) {
         return std::nullopt;
     }
-    const auto size = std::min(static_cast<std::size_t>(status.st_size), mostBytes);
+    const auto size = std::min(static_cast<std::size_t>(status.st_size), byteLimit);
     const off_t offset = status.st_size - static_cast<off_t>(size);
     const std::optional<std::string> text = readFrom(descriptor, offset, size);
     if (!text) {

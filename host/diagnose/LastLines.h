@@ -11,13 +11,13 @@ namespace zrm::host {
 /// The end of a text file. Stateless.
 class LastLines {
 public:
-    static constexpr std::size_t defaultMostBytes = std::size_t{4} << 20; ///< that are read at most
+    static constexpr std::size_t defaultByteLimit = std::size_t{4} << 20;
 
     /// The last lines of an open regular file, at most `count`, the oldest first and without their
-    /// line ends; fewer when they have more than `mostBytes`. None, with errno, when it cannot be
-    /// read. Any thread.
+    /// line ends; fewer when they have more than `byteLimit` bytes. None, with errno, when it
+    /// cannot be read. Any thread.
     static std::optional<std::vector<std::string>> read(int descriptor, std::size_t count,
-                                                        std::size_t mostBytes = defaultMostBytes);
+                                                        std::size_t byteLimit = defaultByteLimit);
 };
 
 } // namespace zrm::host

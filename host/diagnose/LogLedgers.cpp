@@ -1,7 +1,7 @@
 #include "host/diagnose/LogLedgers.h"
 
 #include "base/TraceScope.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
 #include "logmgr/LogManager.h"

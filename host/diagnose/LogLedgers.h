@@ -1,13 +1,63 @@
 #ifndef ZRM_HOST_LOG_LEDGERS_H
 #define ZRM_HOST_LOG_LEDGERS_H
 
-#include "host/diagnose/LogLedgerView.h"
+#include "monitor/FileIdentity.h"
 
+#include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
 namespace zrm::host {
+
+/// Something that needs an operator's attention in a log that is monitored without an error.
+struct LogWarning {
+    std::string kind;   ///< missing, replaced, without_time or not_records
+    std::int64_t since; ///< when it was first seen
+    std::string text;   ///< what is wrong and how to fix it, in sentences
+};
+
+/// A snapshot of what the monitor of one log has read and skipped since monitoring began. A refresh
+/// that changes the log's type or procedure starts a new ledger. Times are in milliseconds since
+/// 1970-01-01 UTC.
+struct LogLedgerView {
+    /// A line that did not match; its bytes, without the line end.
+    struct Rejected {
+        std::int64_t time;
+        std::string line;
+        std::string reason; ///< where and why it does not match
+    };
+    /// What the monitor missed because of a truncation.
+    struct Skipped {
+        std::int64_t time;
+        std::int64_t from; ///< bytes of the current contents
+        std::int64_t to;
+        std::optional<std::int64_t> unread; ///< bytes of the old contents; none: unknown
+        bool isRegrown; ///< the file was already larger than before when the truncation was seen
+    };
+
+    std::string log;                      ///< the full path, in UTF-8
+    std::string file;                     ///< the same in the process's code page
+    std::optional<FileIdentity> openFile; ///< the file that the monitor currently reads
+    char type = 'S';
+    std::string procedure; ///< a user log's format
+    std::int64_t bytesRead = 0;
+    std::int64_t lines = 0;
+    std::int64_t rows = 0;
+    std::int64_t formatErrors = 0;
+    std::int64_t truncations = 0;
+    std::int64_t skippedBytes = 0;
+    std::int64_t withoutTime = 0; ///< rows
+    std::int64_t restarts = 0;    ///< of the monitor
+    std::optional<std::int64_t> lastEntry;
+
+    std::vector<LogWarning> warnings; ///< empty unless filled in from LogWatch
+
+    // The latest ones, oldest first. Only for a log that was requested by name.
+    std::vector<Rejected> rejected;
+    std::vector<Skipped> skipped;
+};
 
 /// Reads the ledgers of the monitored logs. Stateless.
 class LogLedgers {

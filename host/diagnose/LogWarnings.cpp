@@ -1,7 +1,7 @@
 #include "host/diagnose/LogWarnings.h"
 
 #include "base/TraceScope.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "host/framework/TraceCapture.h"
@@ -29,7 +29,7 @@ namespace {
 TRC1_Anchor anchor{"LogWarnings.cpp"};
 
 constexpr std::size_t linesTried = 20;
-constexpr std::size_t mostBytes = 64 * 1024; ///< bytes read from the end of the file
+constexpr std::size_t byteLimit = 64 * 1024; ///< bytes read from the end of the file
 constexpr std::size_t recordsTried = 50;
 
 constexpr const char* syslogCure =
@@ -146,7 +146,7 @@ std::string LogWarnings::ofSyslogFile(const std::string& path) {
     TraceScope trace(anchor);
     const MonitoredLogFile file(path, std::nullopt);
     const auto lines = file.problem().empty()
-                           ? LastLines::read(file.descriptor(), linesTried, mostBytes)
+                           ? LastLines::read(file.descriptor(), linesTried, byteLimit)
                            : std::nullopt;
     if (!lines) {
         return "";

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_LOG_WARNINGS_H
 #define ZRM_HOST_LOG_WARNINGS_H
 
-#include "host/diagnose/LogLedgerView.h"
+#include "host/diagnose/LogLedgers.h"
 
 #include <optional>
 #include <string>

@@ -1,7 +1,7 @@
 #include "host/diagnose/LogWatch.h"
 
 #include "base/TraceScope.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "host/diagnose/LogWarnings.h"
 
 #include <algorithm>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_LOG_WATCH_H
 #define ZRM_HOST_LOG_WATCH_H
 
-#include "host/diagnose/LogLedgerView.h"
+#include "host/diagnose/LogLedgers.h"
 
 #include <chrono>
 #include <functional>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_ENTRY_EVENTS_H
 #define ZRM_HOST_ENTRY_EVENTS_H
 
-#include "host/events/SituationLabel.h"
+#include "host/events/Event.h"
 
 #include <cstddef>
 #include <memory>

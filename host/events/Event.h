@@ -2,14 +2,23 @@
 #define ZRM_HOST_EVENT_H
 
 #include "framework/LogPositions.h"
-#include "host/events/SituationLabel.h"
 
 #include <cstdint>
 #include <memory>
+#include <string>
+#include <string_view>
 
 namespace zrm::host {
 
 class FollowedLog;
+
+/// What a situation adds to its events. Immutable; shared by the situation and its undelivered
+/// events.
+struct SituationLabel {
+    std::string name;
+    std::string severity;  ///< info, minor, warning, major or critical
+    std::string text = {}; ///< its description for people; may be empty
+};
 
 /// One event in the queue.
 struct Event {
@@ -20,6 +29,18 @@ struct Event {
     bool endsEntry = true;            ///< false: its entry has raised the next event, too
     std::shared_ptr<FollowedLog> log; ///< with the last event of an entry of a followed log
     LogPosition behind;               ///< where the log's next entry begins
+};
+
+/// One event in the form in which it leaves the process. The texts belong to the provider of the
+/// record, which says how long they are valid.
+struct EventRecord {
+    std::uint64_t id = 0;       ///< increases from event to event
+    std::int64_t raised = 0;    ///< milliseconds since 1970-01-01, UTC
+    std::string_view situation; ///< its name
+    std::string_view severity;  ///< info, minor, warning, major or critical
+    std::string_view log;       ///< the monitored log's full path
+    std::string_view json;      ///< the event as one JSON object, on one line, without a newline
+    std::string_view text = {}; ///< the situation's description for people; may be empty
 };
 
 } // namespace zrm::host

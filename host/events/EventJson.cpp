@@ -1,8 +1,8 @@
 #include "host/events/EventJson.h"
 
-#include "host/base/UtcTime.h"
-#include "host/events/LogPath.h"
+#include "host/base/TimeText.h"
 #include "host/events/RowJson.h"
+#include "host/events/RowText.h"
 
 #include <charconv>
 #include <utility>

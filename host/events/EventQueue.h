@@ -3,7 +3,6 @@
 
 #include "host/events/EntryEvents.h"
 #include "host/events/Event.h"
-#include "host/events/QueueState.h"
 
 #include <algorithm>
 #include <chrono>
@@ -20,6 +19,14 @@
 #include <vector>
 
 namespace zrm::host {
+
+/// The state of the queue between the log threads and its readers.
+struct QueueState {
+    std::size_t size = 0;               ///< events that some reader has not yet taken
+    std::size_t capacity = 0;           ///< events that fit
+    std::uint64_t waits = 0;            ///< how often a log thread had to wait for room
+    std::chrono::nanoseconds waited{0}; ///< total time of these waits
+};
 
 /// The bounded way of events from the log threads to the sinks: one ring of rows with a cursor per
 /// reader, so that every reader gets every event in order and the memory does not grow with their

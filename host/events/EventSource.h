@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_EVENT_SOURCE_H
 #define ZRM_HOST_EVENT_SOURCE_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -2,24 +2,70 @@
 
 #include "base/TraceScope.h"
 #include "framework/ctreq.h"
+#include "framework/filters.h"
 #include "framework/locale.h"
 #include "host/base/Utf8.h"
 #include "host/framework/ColumnText.h"
-#include "host/framework/Comparison.h"
 #include "host/framework/Condition.h"
 
 #include <algorithm>
+#include <charconv>
+#include <cstdint>
 #include <cstring>
+#include <optional>
+#include <string_view>
 #include <utility>
 
-#include <re2/re2.h>
 #include <string.h>
+
+#include <re2/re2.h>
 
 namespace zrm::host {
 
 namespace {
 
 TRC1_Anchor anchor{"CompiledCondition.cpp"};
+
+/// True for the six operators that compare by order.
+bool isRelational(_IntfOper op) noexcept {
+    return op >= INTF_EQUAL && op <= INTF_GREATER;
+}
+
+/// Whether the operator holds for two values, given their order: negative if the first is less, 0
+/// if they are equal, positive if it is greater. False for operators that do not compare by order.
+bool compares(_IntfOper op, std::int64_t order) noexcept {
+    switch (op) {
+    case INTF_EQUAL:
+        return order == 0;
+    case INTF_NOT_EQUAL:
+        return order != 0;
+    case INTF_GREATER_OR_EQUAL:
+        return order >= 0;
+    case INTF_LESS_OR_EQUAL:
+        return order <= 0;
+    case INTF_LESS:
+        return order < 0;
+    case INTF_GREATER:
+        return order > 0;
+    }
+    return false;
+}
+
+/// Parses a number: decimal digits with an optional minus sign and nothing else.
+std::optional<std::int64_t> numberOf(std::string_view text) noexcept {
+    std::int64_t value = 0;
+    const char* const end = text.data() + text.size();
+    const auto result = std::from_chars(text.data(), end, value);
+    if (result.ec != std::errc() || result.ptr != end) {
+        return std::nullopt;
+    }
+    return value;
+}
+
+/// -1, 0 or 1 if the first number is less than, equal to or greater than the second.
+int orderOf(std::int64_t left, std::int64_t right) noexcept {
+    return left < right ? -1 : left > right ? 1 : 0;
+}
 
 /// Memory for a pattern's program and its cached matching states, in bytes.
 constexpr std::int64_t patternMemory = 2 * 1024 * 1024;
@@ -93,20 +139,20 @@ CompiledCondition::~CompiledCondition() = default;
 void CompiledCondition::compileInteger(const SEL1_FILTERINFO& filter) {
     if (m_op == INTF_IN) {
         for (const std::string_view text : linesOf(m_value)) {
-            if (const auto number = Comparison::number(text)) {
+            if (const auto number = numberOf(text)) {
                 m_numbers.push_back(*number);
             }
         }
         m_kind = Kind::INTEGER_IN;
         return;
     }
-    if (!Comparison::isRelational(m_op)) {
+    if (!isRelational(m_op)) {
         return;
     }
     if (filter.dataType == SEL1_INTEGER) {
         std::memcpy(&m_number, filter.value, sizeof m_number);
         m_kind = Kind::INTEGER;
-    } else if (const auto number = Comparison::number(m_value)) {
+    } else if (const auto number = numberOf(m_value)) {
         m_number = *number;
         m_kind = Kind::INTEGER;
     }
@@ -116,7 +162,7 @@ void CompiledCondition::compileText(const RowColumn& column) {
     if (m_filter->dataType == SEL1_INTEGER) {
         return;
     }
-    if (Comparison::isRelational(m_op)) {
+    if (isRelational(m_op)) {
         m_value = ColumnText::withoutTrailingBlanks(cut(m_value, column));
         m_kind = m_op == INTF_EQUAL ? Kind::TEXT_EQUAL : Kind::TEXT_ORDER;
     } else if (m_op == INTF_IN) {
@@ -170,14 +216,14 @@ bool CompiledCondition::holds(ctreq* request, char* row) const {
         return false;
     case Kind::INTEGER:
         std::memcpy(&number, field, sizeof number);
-        return Comparison::holds(m_op, Comparison::order(number, m_number));
+        return compares(m_op, orderOf(number, m_number));
     case Kind::INTEGER_IN:
         std::memcpy(&number, field, sizeof number);
         return std::find(m_numbers.begin(), m_numbers.end(), number) != m_numbers.end();
     case Kind::TEXT_EQUAL:
         return isEqual(field);
     case Kind::TEXT_ORDER:
-        return Comparison::holds(m_op, ColumnText::compare(field, m_width, m_value));
+        return compares(m_op, ColumnText::compare(field, m_width, m_value));
     case Kind::TEXT_IN:
         return isOneOf(field);
     case Kind::STARTS:
@@ -215,7 +261,7 @@ bool CompiledCondition::holdsFor(const char* row, std::string_view text) const n
     case Kind::TEXT_EQUAL:
         return text == m_value;
     case Kind::TEXT_ORDER:
-        return Comparison::holds(m_op, ColumnText::compare(row + m_offset, m_width, m_value));
+        return compares(m_op, ColumnText::compare(row + m_offset, m_width, m_value));
     case Kind::TEXT_IN:
         return std::find(m_values.begin(), m_values.end(), text) != m_values.end();
     case Kind::STARTS:

@@ -1,9 +1,8 @@
 #include "host/framework/Request.h"
 
+#include "base/LockGuard.h"
 #include "framework/TableManager.h"
 #include "host/framework/HandleTable.h"
-#include "host/framework/LockGuard.h"
-#include "host/framework/RequestCounts.h"
 
 #include <utility>
 

@@ -1,13 +1,111 @@
 #ifndef ZRM_HOST_REQUEST_H
 #define ZRM_HOST_REQUEST_H
 
-#include "host/framework/ContextInfo.h"
-#include "host/framework/RequestDetail.h"
+#include "framework/ctreq.h"
+#include "host/framework/Condition.h"
 
+#include <atomic>
+#include <cstdint>
 #include <memory>
+#include <string>
+#include <vector>
 
 class TableManager;
 class ctreq;
+
+namespace zrm::host {
+
+/// The number of rows that a request has judged so far. Written by one thread at a time, the one
+/// that uses the request; read by any thread.
+class RequestCounts {
+public:
+    /// Includes the rows that the request was not offered because it would have refused them.
+    std::uint64_t judged() const noexcept {
+        return m_judged.load(std::memory_order_relaxed) + spared();
+    }
+    /// Rows that met every condition.
+    std::uint64_t matched() const noexcept { return m_matched.load(std::memory_order_relaxed); }
+
+    void countJudged() noexcept { count(m_judged); }
+    void countMatched() noexcept { count(m_matched); }
+
+    // While a situation is open, its table's Audience counts the rows of all logs and those that
+    // the situation was offered; the difference was skipped.
+
+    /// From now on rows are counted in `rows`; a second call changes nothing.
+    void joinAudience(const std::atomic<std::uint64_t>& rows) noexcept {
+        if (m_rows.load(std::memory_order_relaxed) == nullptr) {
+            m_offered.store(rows.load(std::memory_order_relaxed), std::memory_order_relaxed);
+            m_rows.store(&rows, std::memory_order_release);
+        }
+    }
+    void leaveAudience() noexcept {
+        const std::uint64_t rows = spared();
+        m_rows.store(nullptr, std::memory_order_relaxed);
+        m_judged.store(m_judged.load(std::memory_order_relaxed) + rows, std::memory_order_relaxed);
+    }
+    void countOffered() noexcept {
+        m_offered.store(m_offered.load(std::memory_order_relaxed) + 1, std::memory_order_release);
+    }
+
+private:
+    /// A row is counted before it is offered, so it is read here in reverse order: never negative.
+    std::uint64_t spared() const noexcept {
+        const std::atomic<std::uint64_t>* const rows = m_rows.load(std::memory_order_acquire);
+        const std::uint64_t offered = m_offered.load(std::memory_order_acquire);
+        return rows != nullptr ? rows->load(std::memory_order_relaxed) - offered : 0;
+    }
+
+    /// Needs no locked instruction, since there is only one writer.
+    static void count(std::atomic<std::uint64_t>& counter) noexcept {
+        counter.store(counter.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
+    }
+
+    std::atomic<const std::atomic<std::uint64_t>*> m_rows{nullptr};
+    std::atomic<std::uint64_t> m_offered{0};
+    std::atomic<std::uint64_t> m_judged{0};
+    std::atomic<std::uint64_t> m_matched{0};
+};
+
+/// Receives what a request dispatches. For a situation it is called on a log's thread under the
+/// table manager's lock and may wait while the event queue is full; for a report, on the thread
+/// that takes the sample.
+class RowReceiver {
+public:
+    virtual ~RowReceiver() = default;
+    /// Takes `count` contiguous rows of request.rowSize bytes each; copies what it keeps. Returns 0
+    /// or a status.
+    virtual unsigned receive(const ctreq& request, const char* rows, unsigned count) = 0;
+    /// The agent has marked the request as stopped (reason of ctreq::Stopped).
+    virtual void stopped(const ctreq& request, unsigned reason) = 0;
+};
+
+} // namespace zrm::host
+
+/// The context of a request: where its rows go and where it counts. Must outlive the request.
+class ContextInfo {
+public:
+    /// Without counts from its opener, which must outlive it, the request keeps its own.
+    explicit ContextInfo(zrm::host::RowReceiver& receiver,
+                         zrm::host::RequestCounts* counts = nullptr)
+        : m_receiver(receiver), m_counts(counts) {}
+    zrm::host::RowReceiver& receiver() const noexcept { return m_receiver; }
+    zrm::host::RequestCounts* counts() const noexcept { return m_counts; }
+
+private:
+    zrm::host::RowReceiver& m_receiver;
+    zrm::host::RequestCounts* m_counts;
+};
+
+/// What a request asks for: its name, kind and conditions. Built by the opener of a request and
+/// kept alive until the request is destroyed; immutable meanwhile.
+class RequestDetail {
+public:
+    std::string name; ///< the situation's name, or the report's label
+    SampleType sampleType = SAMPLE_SITUATION;
+    unsigned interval = 0;                        ///< sampling interval, seconds; 0: event-driven
+    std::vector<zrm::host::Condition> conditions; ///< all must hold
+};
 
 namespace zrm::host {
 

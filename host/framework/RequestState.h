@@ -3,10 +3,8 @@
 
 #include "framework/ctreq.h"
 #include "host/framework/ConditionSet.h"
-#include "host/framework/ContextInfo.h"
 #include "host/framework/FilterList.h"
-#include "host/framework/RequestCounts.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 
 #include <atomic>
 #include <cstddef>

@@ -1,16 +1,47 @@
 #ifndef ZRM_HOST_CURSORS_H
 #define ZRM_HOST_CURSORS_H
 
-#include "host/history/HistoryFile.h"
+#include "host/history/Statement.h"
 
 #include <atomic>
 #include <cstdint>
 #include <deque>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
 namespace zrm::host {
+
+/// The position of each sink, as stored in the history. Used by one thread at a time. Throws
+/// DatabaseError.
+class CursorTable {
+public:
+    explicit CursorTable(Database& database);
+
+    /// The id of the last event delivered to a sink; none for an unknown sink.
+    std::optional<std::uint64_t> find(std::string_view sink);
+
+    /// Stores the id of the last event delivered to a sink, and that the sink was in use at this
+    /// time (milliseconds since 1970).
+    void keep(std::string_view sink, std::uint64_t event, std::int64_t used);
+
+    /// Removes the positions of sinks last used before this time.
+    void removeUnusedSince(std::int64_t time);
+
+private:
+    Statement m_find;
+    Statement m_keep;
+    Statement m_remove;
+};
+
+/// The position of one sink.
+struct CursorValue {
+    std::string sink;
+    std::uint64_t event = 0; ///< id of the last event delivered to it
+    bool operator==(const CursorValue&) const = default;
+};
 
 /// The position of one sink; moved by its thread, read by any.
 using Cursor = std::atomic<std::uint64_t>;

@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_EVENT_BATCH_H
 #define ZRM_HOST_EVENT_BATCH_H
 
+#include "host/events/Event.h"
 #include "host/events/EventJson.h"
-#include "host/events/EventRecord.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -1,10 +1,48 @@
 #include "host/history/EventTable.h"
 
-#include "host/history/EventChecksum.h"
-
 #include <algorithm>
 
+#include <xxhash.h>
+
+#include <nlohmann/json.hpp>
+
 namespace zrm::host {
+
+std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t label,
+                           std::string_view json) noexcept {
+    // Odd multipliers: different values of one number always give different seeds, on any machine.
+    const std::uint64_t seed = static_cast<std::uint64_t>(id) * 0x9e3779b97f4a7c15 +
+                               static_cast<std::uint64_t>(raised) * 0xc2b2ae3d27d4eb4f +
+                               static_cast<std::uint64_t>(label) * 0x165667b19e3779f9;
+    return static_cast<std::int64_t>(XXH3_64bits_withSeed(json.data(), json.size(), seed));
+}
+
+namespace {
+
+enum Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, LABEL, CHECKSUM };
+
+} // namespace
+
+const char* const StoredEventRow::select =
+    "SELECT events.id, raised, situation, severity, path, json, text, label, checksum FROM events"
+    " LEFT JOIN labels ON labels.id = label LEFT JOIN logs ON logs.id = log WHERE ";
+
+EventRecord StoredEventRow::record() const {
+    return {static_cast<std::uint64_t>(m_row.integer(ID)),
+            m_row.integer(RAISED),
+            m_row.text(SITUATION),
+            m_row.text(SEVERITY),
+            m_row.text(LOG),
+            m_row.text(JSON),
+            m_row.text(TEXT)};
+}
+
+bool StoredEventRow::isIntact() const {
+    return m_row.isNull(CHECKSUM)
+               ? nlohmann::json::accept(m_row.text(JSON))
+               : m_row.integer(CHECKSUM) == eventChecksum(m_row.integer(ID), m_row.integer(RAISED),
+                                                          m_row.integer(LABEL), m_row.text(JSON));
+}
 
 EventTable::EventTable(Database& database)
     : m_database(database),

@@ -1,16 +1,42 @@
 #ifndef ZRM_HOST_EVENT_TABLE_H
 #define ZRM_HOST_EVENT_TABLE_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 #include "host/history/Statement.h"
 
 #include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <span>
+#include <string_view>
 #include <vector>
 
 namespace zrm::host {
+
+/// The checksum stored beside an event: readers recompute it, so that data corrupted on disk is
+/// detected and not served. It covers the event's id, time, label and JSON.
+std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t label,
+                           std::string_view json) noexcept;
+
+/// The current row of a statement that begins with `select`: one event as stored. Its texts are
+/// valid until the statement's next step or reset.
+class StoredEventRow {
+public:
+    /// "SELECT ... WHERE ", to which conditions are appended. Columns are events.id, raised, label;
+    /// the label of a damaged event may not exist.
+    static const char* const select;
+
+    explicit StoredEventRow(const Statement& row) : m_row(row) {}
+
+    EventRecord record() const;
+
+    /// Whether the event is as it was written. For an event without a checksum, whether it is valid
+    /// JSON.
+    bool isIntact() const;
+
+private:
+    const Statement& m_row;
+};
 
 /// The events of a history, as the writer sees them: appended at one end and removed at the other.
 /// Used by the writer's thread. Throws DatabaseError.

@@ -51,11 +51,10 @@ std::uint64_t newestWith(const HistoryDirectory& directory, std::uint64_t newest
     return isLost ? reserved : newest;
 }
 
-/// The file, or what is wrong with it. A corrupt one is replaced.
-std::variant<std::unique_ptr<HistoryFile>, std::string>
-openOrReplace(const HistoryDirectory& directory) {
-    const auto problem = [&](const char* why) {
-        return "cannot open " + directory.file() + ": " + why;
+/// Opens the file. A corrupt one is replaced.
+Result<std::unique_ptr<HistoryFile>> openOrReplace(const HistoryDirectory& directory) {
+    const auto cannotOpen = [&](const char* why, const char* cure) {
+        return refused("cannot open " + directory.file() + ": " + why, cure);
     };
     const auto open = [&](std::uint64_t newest) {
         auto file = std::make_unique<HistoryFile>(directory.file());
@@ -74,37 +73,35 @@ openOrReplace(const HistoryDirectory& directory) {
             }
             const std::uint64_t newest = newestOfCorrupt(directory.file());
             const std::vector<PositionValue> positions = positionsOfCorrupt(directory.file());
-            if (std::string failure = directory.moveAside(error.what()); !failure.empty()) {
-                return failure;
+            if (const Result<void> moved = directory.moveAside(error.what()); !moved) {
+                return tl::unexpected(moved.error());
             }
             auto file = open(newest);
             file->keepPositions(positions);
             return file;
         }
     } catch (const SchemaTooNew& error) {
-        return problem(error.what()) +
-               "; use the program that wrote it, or move the file out of the way";
+        return cannotOpen(error.what(),
+                          "use the program that wrote it, or move the file out of the way");
     } catch (const DatabaseError& error) {
-        return problem(error.what());
+        return cannotOpen(error.what(), "");
     }
 }
 
 } // namespace
 
-std::variant<std::unique_ptr<History>, std::string> History::open(const HistoryConfig& config,
-                                                                  const std::string& directory) {
+Result<std::unique_ptr<History>> History::open(const HistoryConfig& config,
+                                               const std::string& directory) {
     TraceScope trace(anchor);
-    auto opened = HistoryDirectory::open(directory);
-    if (auto* const problem = std::get_if<std::string>(&opened)) {
-        return std::move(*problem);
+    auto place = HistoryDirectory::open(directory);
+    if (!place) {
+        return tl::unexpected(place.error());
     }
-    auto& place = std::get<std::unique_ptr<HistoryDirectory>>(opened);
-    auto file = openOrReplace(*place);
-    if (auto* const problem = std::get_if<std::string>(&file)) {
-        return std::move(*problem);
+    auto file = openOrReplace(**place);
+    if (!file) {
+        return tl::unexpected(file.error());
     }
-    return std::unique_ptr<History>(new History(
-        config, std::move(place), std::move(std::get<std::unique_ptr<HistoryFile>>(file))));
+    return std::unique_ptr<History>(new History(config, std::move(*place), std::move(*file)));
 }
 
 History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_HISTORY_H
 #define ZRM_HOST_HISTORY_H
 
+#include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 #include "host/events/EventSource.h"
 #include "host/events/PositionBook.h"
@@ -16,7 +17,6 @@
 #include <mutex>
 #include <set>
 #include <string>
-#include <variant>
 #include <vector>
 
 namespace zrm::host {
@@ -27,10 +27,9 @@ namespace zrm::host {
 class History : public HistoryReader {
 public:
     /// Opens the history of this directory; a new one is made, and a corrupt one is moved aside
-    /// for a new one, which is said. Gives what is wrong and its cure instead when there can be
-    /// none.
-    static std::variant<std::unique_ptr<History>, std::string> open(const HistoryConfig& config,
-                                                                    const std::string& directory);
+    /// for a new one, which is logged. Refused when there can be none.
+    static Result<std::unique_ptr<History>> open(const HistoryConfig& config,
+                                                 const std::string& directory);
 
     ~History() override;
 

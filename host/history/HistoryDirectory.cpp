@@ -31,28 +31,32 @@ constexpr const char* indexEnding = "-shm";
 constexpr int fileMode = 0640;
 constexpr int directoryMode = 0750;
 
-std::string because(const std::string& what, int number) {
-    const ErrorText error(number);
-    return what + ": " + error.text();
-}
+/// What makes it possible to open a history in the directory.
+constexpr const char* cure = "make it a directory that the agent may write, or set "
+                             "history.directory to one";
 
-/// Opens a file of the history, creating it if missing. Returns -1 and the reason when it cannot be
-/// opened or is not a regular file. Never blocks, and follows no link.
-int openFile(const std::string& path, std::string& problem) {
+/// Opens a file of the history, creating it if missing. Refused when it cannot be opened or is not
+/// a regular file. Never blocks, and follows no link.
+Result<int> openFile(const std::string& path) {
     const int fd =
         ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, fileMode);
     if (fd == -1) {
-        problem = errno == ELOOP ? path + " is a symbolic link, which the history does not follow"
-                                 : because("cannot open " + path, errno);
-        return -1;
+        return errno == ELOOP
+                   ? refused(path + " is a symbolic link, which the history does not follow")
+                   : refused(because("cannot open " + path, errno));
     }
     struct stat status {};
     if (fstat(fd, &status) != 0 || !S_ISREG(status.st_mode)) {
-        problem = path + " is not a regular file";
         close(fd);
-        return -1;
+        return refused(path + " is not a regular file");
     }
     return fd;
+}
+
+/// The same refusal with its cure.
+Problem cured(Problem problem) {
+    problem.cure = cure;
+    return problem;
 }
 
 /// Takes the lock; false with errno set.
@@ -86,12 +90,11 @@ HistoryDirectory::~HistoryDirectory() {
     }
 }
 
-std::variant<std::unique_ptr<HistoryDirectory>, std::string>
-HistoryDirectory::open(const std::string& directory) {
+Result<std::unique_ptr<HistoryDirectory>> HistoryDirectory::open(const std::string& directory) {
     TraceScope trace(anchor);
     std::unique_ptr<HistoryDirectory> opened(new HistoryDirectory(directory, -1));
-    if (std::string problem = opened->restore(); !problem.empty()) {
-        return problem;
+    if (const Result<void> restored = opened->restore(); !restored) {
+        return tl::unexpected(restored.error());
     }
     return opened;
 }
@@ -104,33 +107,36 @@ bool HistoryDirectory::hasLock() const {
            named.st_dev == locked.st_dev && named.st_ino == locked.st_ino;
 }
 
-std::string HistoryDirectory::restore() {
-    constexpr const char* cure = "; make it a directory that the agent may write, or set "
-                                 "history.directory to one";
+Result<void> HistoryDirectory::restore() {
     if (mkdir(m_directory.c_str(), directoryMode) == -1 && errno != EEXIST) {
-        return because("cannot create the directory " + m_directory, errno) + cure;
+        return refused(because("cannot create the directory " + m_directory, errno), cure);
     }
     if (!hasLock()) {
-        std::string problem;
-        const int fd = openFile(lockPath(), problem);
-        if (fd == -1) {
-            return problem + cure;
+        if (Result<void> locked = lock(); !locked) {
+            return locked;
         }
-        if (!lockWhole(fd)) {
-            const int number = errno;
-            close(fd);
-            return number == EACCES || number == EAGAIN
-                       ? m_directory +
-                             " is in use by another agent; give each its own history.directory"
-                       : because("cannot lock " + lockPath(), number) + cure;
-        }
-        if (m_lock != -1) {
-            close(m_lock);
-        }
-        m_lock = fd;
     }
-    const std::string problem = makeFile();
-    return problem.empty() ? problem : problem + cure;
+    return makeFile().map_error(cured);
+}
+
+Result<void> HistoryDirectory::lock() {
+    const Result<int> opened = openFile(lockPath());
+    if (!opened) {
+        return tl::unexpected(cured(opened.error()));
+    }
+    if (!lockWhole(*opened)) {
+        const int number = errno;
+        close(*opened);
+        return number == EACCES || number == EAGAIN
+                   ? refused(m_directory + " is in use by another agent",
+                             "give each its own history.directory")
+                   : refused(because("cannot lock " + lockPath(), number), cure);
+    }
+    if (m_lock != -1) {
+        close(m_lock);
+    }
+    m_lock = *opened;
+    return {};
 }
 
 void HistoryDirectory::reserveIds(std::uint64_t last) const {
@@ -155,22 +161,21 @@ std::uint64_t HistoryDirectory::reservedIds() const {
     return length == digitsOfId && error == std::errc() && stop == end && last <= mostId ? last : 0;
 }
 
-std::string HistoryDirectory::makeFile() const {
-    std::string problem;
-    const int fd = openFile(m_file, problem);
-    if (fd == -1) {
-        return problem;
+Result<void> HistoryDirectory::makeFile() const {
+    const Result<int> opened = openFile(m_file);
+    if (!opened) {
+        return tl::unexpected(opened.error());
     }
     struct stat status {};
-    if (fstat(fd, &status) == 0 && status.st_size == 0) {
+    if (fstat(*opened, &status) == 0 && status.st_size == 0) {
         // A log and an index beside a new file are those of a lost one. SQLite would use the index
         // as long as another program has it open.
         for (const char* const ending : {logEnding, indexEnding}) {
             unlink((m_file + ending).c_str());
         }
     }
-    close(fd);
-    return problem;
+    close(*opened);
+    return {};
 }
 
 std::uint64_t HistoryDirectory::bytes() const {
@@ -184,14 +189,14 @@ std::uint64_t HistoryDirectory::bytes() const {
     return sum;
 }
 
-std::string HistoryDirectory::moveAside(const std::string& why) const {
+Result<void> HistoryDirectory::moveAside(const std::string& why) const {
     TraceScope trace(anchor);
     std::string aside = m_file + ".corrupt-" + timeNow();
     for (int number = 2; access(aside.c_str(), F_OK) == 0; ++number) {
         aside = m_file + ".corrupt-" + timeNow() + '-' + std::to_string(number);
     }
     if (rename(m_file.c_str(), aside.c_str()) != 0) {
-        return because("cannot move " + m_file + " aside", errno);
+        return refused(because("cannot move " + m_file + " aside", errno));
     }
     // The log contains what is not yet in the file; its index is rebuilt from it.
     rename((m_file + logEnding).c_str(), (aside + logEnding).c_str());

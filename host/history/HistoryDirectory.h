@@ -1,10 +1,11 @@
 #ifndef ZRM_HOST_HISTORY_DIRECTORY_H
 #define ZRM_HOST_HISTORY_DIRECTORY_H
 
+#include "host/base/Result.h"
+
 #include <cstdint>
 #include <memory>
 #include <string>
-#include <variant>
 
 namespace zrm::host {
 
@@ -13,9 +14,8 @@ namespace zrm::host {
 class HistoryDirectory {
 public:
     /// Creates the directory if only its last part is missing, locks it, and checks that the
-    /// history file is writable. Returns what is wrong and how to fix it when that fails.
-    static std::variant<std::unique_ptr<HistoryDirectory>, std::string>
-    open(const std::string& directory);
+    /// history file is writable.
+    static Result<std::unique_ptr<HistoryDirectory>> open(const std::string& directory);
 
     ~HistoryDirectory();
     HistoryDirectory(const HistoryDirectory&) = delete;
@@ -27,9 +27,8 @@ public:
     /// Size on disk in bytes, of the file and SQLite's files next to it.
     std::uint64_t bytes() const;
 
-    /// Recreates what is missing: the directory, the lock file, an empty history. Returns an error
-    /// message, empty on success.
-    std::string restore();
+    /// Recreates what is missing: the directory, the lock file, an empty history.
+    Result<void> restore();
 
     /// Ids of events are reserved this many at a time.
     static constexpr std::uint64_t idsAtOnce = 65536;
@@ -41,14 +40,16 @@ public:
     std::uint64_t reservedIds() const;
 
     /// Renames the file to a name with the time it was found corrupt, creates an empty one, and
-    /// logs it. Nobody may have the file open. Returns an error message, empty on success.
-    std::string moveAside(const std::string& why) const;
+    /// logs it. Nobody may have the file open.
+    Result<void> moveAside(const std::string& why) const;
 
 private:
     HistoryDirectory(const std::string& directory, int lock);
 
-    /// Creates the file if it is missing. Returns an error message, empty on success.
-    std::string makeFile() const;
+    /// Takes the lock of the lock file, which is created if it is missing.
+    Result<void> lock();
+    /// Creates the file if it is missing.
+    Result<void> makeFile() const;
     std::string lockPath() const { return m_directory + "/history.lock"; }
     bool hasLock() const;
 

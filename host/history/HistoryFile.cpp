@@ -1,6 +1,6 @@
 #include "host/history/HistoryFile.h"
 
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "host/history/Schema.h"
 
 #include <algorithm>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_HISTORY_FILE_H
 #define ZRM_HOST_HISTORY_FILE_H
 
-#include "host/history/CursorTable.h"
+#include "host/history/Cursors.h"
 #include "host/history/Database.h"
 #include "host/history/EventBatch.h"
 #include "host/history/EventTable.h"
@@ -17,13 +17,6 @@
 #include <vector>
 
 namespace zrm::host {
-
-/// The position of one sink.
-struct CursorValue {
-    std::string sink;
-    std::uint64_t event = 0; ///< id of the last event delivered to it
-    bool operator==(const CursorValue&) const = default;
-};
 
 /// The entries of one minute, per log.
 struct MinuteCounts {

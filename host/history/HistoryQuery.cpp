@@ -1,7 +1,6 @@
 #include "host/history/HistoryQuery.h"
 
 #include "host/history/EventTable.h"
-#include "host/history/StoredEventRow.h"
 
 #include <algorithm>
 #include <deque>

@@ -1,11 +1,10 @@
 #ifndef ZRM_HOST_HISTORY_QUERY_H
 #define ZRM_HOST_HISTORY_QUERY_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 #include "host/history/Database.h"
-#include "host/history/EventFilter.h"
-#include "host/history/EventPage.h"
 #include "host/history/EventText.h"
+#include "host/history/HistoryReader.h"
 #include "host/history/Statement.h"
 
 #include <chrono>

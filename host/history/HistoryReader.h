@@ -1,18 +1,78 @@
 #ifndef ZRM_HOST_HISTORY_READER_H
 #define ZRM_HOST_HISTORY_READER_H
 
-#include "host/history/EventFilter.h"
-#include "host/history/EventPage.h"
-#include "host/history/HistoryState.h"
-#include "host/history/Rates.h"
-
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <stdexcept>
 #include <stop_token>
+#include <string>
+#include <vector>
 
 namespace zrm::host {
+
+/// Selects events of the history; everything that is set must match.
+struct EventFilter {
+    std::uint64_t after = 0;                            ///< only ids above this one
+    std::optional<std::uint64_t> before = std::nullopt; ///< only ids below this one
+    std::optional<std::int64_t> from =
+        std::nullopt; ///< raised then or later: milliseconds since 1970, UTC
+    std::optional<std::int64_t> to = std::nullopt; ///< raised then or earlier
+    std::vector<std::string> situations = {};      ///< any of these names; empty: all
+    std::vector<std::string> logs = {};            ///< any of these full paths; empty: all
+    std::vector<std::string> severities = {};      ///< any of these; empty: all
+    std::string text = {};                         ///< text that EventText must find; empty: all
+    std::size_t limit = 100;                       ///< the most events to return
+    bool newestFirst = true; ///< true: by descending id; false: by ascending id
+};
+
+/// One event as returned by the history to a reader, which owns the texts.
+struct StoredEvent {
+    std::uint64_t id = 0;
+    std::int64_t raised = 0; ///< milliseconds since 1970-01-01, UTC
+    std::string situation;   ///< its name
+    std::string severity;    ///< info, minor, warning, major or critical
+    std::string log;         ///< the monitored log's whole path
+    std::string json;        ///< the event as one JSON object, on one line, without a newline
+    bool operator==(const StoredEvent&) const = default;
+};
+
+/// The result of one query of the history.
+struct EventPage {
+    std::vector<StoredEvent> events; ///< in the filter's order
+    /// Ids of corrupted events, which are not among the events.
+    std::vector<std::uint64_t> damaged = {};
+    /// Set when a text search stopped early: the id of the last event examined.
+    std::optional<std::uint64_t> reached = std::nullopt;
+};
+
+/// The contents and condition of the history.
+struct HistoryState {
+    std::uint64_t events = 0;  ///< number of events held
+    std::uint64_t oldest = 0;  ///< id of the oldest event held; 0 when there is none
+    std::uint64_t newest = 0;  ///< id of the newest event ever committed; 0 when there was none
+    std::uint64_t bytes = 0;   ///< on disk, over all its files
+    std::uint64_t damaged = 0; ///< number of damaged events found by readers since the start
+    std::string problem;       ///< why it cannot store events now; empty: it can
+};
+
+/// How much came in of one log, step by step. A step of which nothing is known, because no agent
+/// ran, has no value.
+struct LogRates {
+    using Counts = std::vector<std::optional<std::uint64_t>>;
+
+    std::string log; ///< the monitored log's whole path
+    Counts entries;  ///< entries read
+    Counts events;   ///< events raised
+};
+
+/// How much came in of every log that had an entry or an event in a window of time.
+struct Rates {
+    std::int64_t start = 0;     ///< of the first step: milliseconds since 1970-01-01, UTC
+    std::int64_t step = 0;      ///< milliseconds
+    std::vector<LogRates> logs; ///< by path; each has as many counts as the window has steps
+};
 
 /// The history could not be read; what() says why.
 class HistoryError : public std::runtime_error {

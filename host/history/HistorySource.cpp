@@ -2,8 +2,8 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
+#include "host/history/EventTable.h"
 #include "host/history/Statement.h"
-#include "host/history/StoredEventRow.h"
 
 #include <algorithm>
 #include <chrono>

@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <cinttypes>
@@ -39,8 +39,8 @@ HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& dire
                              ReaderPool& readers, Cursors& cursors, PositionBook& positions)
     : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
       m_readers(readers), m_cursors(cursors), m_positions(positions),
-      m_nextTendingOfPositions(Clock::now() + timeUntilLogsAreFollowed), m_pause(firstPause),
-      m_oldest(m_file->oldest()) {}
+      m_nextTendingOfPositions(Clock::now() + timeUntilLogsAreFollowed),
+      m_pause(firstPause, longestPause), m_oldest(m_file->oldest()) {}
 
 HistoryWriter::~HistoryWriter() {
     finish(Clock::now());
@@ -141,8 +141,8 @@ template <class Work> bool HistoryWriter::attempt(Work&& work) {
 }
 
 void HistoryWriter::openFile() {
-    if (const std::string problem = m_directory.restore(); !problem.empty()) {
-        throw std::runtime_error(problem);
+    if (const Result<void> restored = m_directory.restore(); !restored) {
+        throw std::runtime_error(restored.error().text());
     }
     m_file = std::make_unique<HistoryFile>(m_directory.file());
     if (m_file->newest() > m_recent.newest()) {
@@ -160,7 +160,7 @@ void HistoryWriter::reserveIds(std::uint64_t last) {
 }
 
 void HistoryWriter::succeeded() {
-    m_pause = firstPause;
+    m_pause.reset();
     const std::lock_guard guard(m_mutex);
     if (!m_problem.empty()) {
         TraceScope trace(anchor);
@@ -184,10 +184,9 @@ void HistoryWriter::failed(const std::string& why) {
 /// False when it is time to give up.
 bool HistoryWriter::pause() {
     std::unique_lock lock(m_mutex);
-    const auto length = m_finishing ? firstPause : m_pause;
+    const auto length = m_finishing ? firstPause : m_pause.next();
     m_changed.wait_for(lock, length,
                        [&, early = !m_finishing] { return m_giveUp || (early && m_finishing); });
-    m_pause = std::min(2 * m_pause, longestPause);
     return !m_giveUp;
 }
 
@@ -196,10 +195,10 @@ void HistoryWriter::replaceFile(const std::string& why) {
     // SQLite clears up by name when it closes: nobody may have the file open when the name changes.
     m_readers.suspend();
     m_file.reset();
-    const std::string problem = m_directory.moveAside(why);
+    const Result<void> moved = m_directory.moveAside(why);
     m_readers.resume();
-    if (!problem.empty()) {
-        failed(problem);
+    if (!moved) {
+        failed(moved.error().text());
         return;
     }
     m_cursors.forgetSaved();

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_HISTORY_WRITER_H
 #define ZRM_HOST_HISTORY_WRITER_H
 
+#include "host/base/RetryPause.h"
 #include "host/config/HostConfig.h"
 #include "host/events/EventJson.h"
 #include "host/events/EventQueue.h"
@@ -100,8 +101,8 @@ private:
     Clock::time_point m_nextHousekeeping{};
     Clock::time_point m_nextTending{}; ///< of the cursors
     Clock::time_point m_nextTendingOfPositions;
-    bool m_hasMoreToDo = false; ///< housekeeping that was not finished
-    std::chrono::milliseconds m_pause;
+    bool m_hasMoreToDo = false;        ///< housekeeping that was not finished
+    RetryPause m_pause;
     std::atomic<std::uint64_t> m_oldest{0};
 
     mutable std::mutex m_mutex; ///< guards what follows

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_LABEL_TABLE_H
 #define ZRM_HOST_LABEL_TABLE_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 #include "host/history/Statement.h"
 
 #include <cstdint>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_RATE_TABLE_H
 #define ZRM_HOST_RATE_TABLE_H
 
-#include "host/history/Rates.h"
+#include "host/history/HistoryReader.h"
 #include "host/history/Statement.h"
 
 #include <cstdint>

@@ -1,7 +1,7 @@
 #include "host/http/ApiToken.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/WholeFile.h"
 
 #include <algorithm>
 #include <array>
@@ -31,11 +31,6 @@ struct CloseStream {
 };
 using Stream = std::unique_ptr<std::FILE, CloseStream>;
 
-std::string because(const std::string& what, int number) {
-    const ErrorText error(number);
-    return what + ": " + error.text();
-}
-
 /// A new random token; none when the system has no random bytes.
 std::optional<std::string> newToken() {
     const Stream random(std::fopen("/dev/urandom", "re"));
@@ -53,70 +48,60 @@ std::optional<std::string> newToken() {
     return token;
 }
 
-/// Writes and syncs the whole text; false with errno set.
-bool writeAll(int fd, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = write(fd, text.data(), text.size());
-        if (written == -1 && errno != EINTR) {
-            return false;
-        }
-        text.remove_prefix(static_cast<std::size_t>(std::max<ssize_t>(written, 0)));
-    }
-    return fsync(fd) == 0;
-}
-
 /// Creates the file atomically with its contents; a file that has appeared meanwhile is left as it
-/// is. Returns an error message, empty on success.
-std::string make(const std::string& path) {
+/// is.
+Result<void> make(const std::string& path) {
     const std::string directory = path.substr(0, path.rfind('/'));
     if (!directory.empty() && mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
-        return because("cannot create the directory " + directory, errno);
+        return refused(because("cannot create the directory " + directory, errno));
     }
     const std::optional<std::string> token = newToken();
     if (!token) {
-        return "cannot read /dev/urandom";
+        return refused("cannot read /dev/urandom");
     }
     std::string temporary = path + ".XXXXXX";
     const int fd = mkstemp(temporary.data()); // readable only by the owner
     if (fd == -1) {
-        return because("cannot create a file in " + directory, errno);
+        return refused(because("cannot create a file in " + directory, errno));
     }
-    std::string problem;
-    if (!writeAll(fd, *token + '\n')) {
-        problem = because("cannot write " + temporary, errno);
+    Result<void> made;
+    if (const auto written = WholeFile::write(fd, *token + '\n'); !written) {
+        made = refused(because("cannot write " + temporary, written.error()));
     } else if (link(temporary.c_str(), path.c_str()) == -1 && errno != EEXIST) {
-        problem = because("cannot create " + path, errno);
+        made = refused(because("cannot create " + path, errno));
     }
     close(fd);
     unlink(temporary.c_str());
-    return problem;
+    return made;
 }
 
 } // namespace
 
 ApiToken::ApiToken(std::string token) : m_token(std::move(token)) {}
 
-std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
+Result<ApiToken> ApiToken::load(const std::string& path) {
     TraceScope trace(anchor);
     struct stat status {};
     if (stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode)) {
-        return path + " is not a file that can contain a token"; // opening a pipe would block
+        return refused(path +
+                       " is not a file that can contain a token"); // opening a pipe would block
     }
     Stream stream(std::fopen(path.c_str(), "re"));
     if (stream == nullptr && errno == ENOENT) {
-        if (std::string problem = make(path); !problem.empty()) {
-            return problem;
+        if (const Result<void> made = make(path); !made) {
+            return tl::unexpected(made.error());
         }
         trace.detail()("New token in %s.", path.c_str());
         stream.reset(std::fopen(path.c_str(), "re"));
     }
     if (stream == nullptr || fstat(fileno(stream.get()), &status) == -1) {
-        return because("cannot read " + path, errno);
+        return refused(because("cannot read " + path, errno));
     }
     if ((status.st_mode & S_IRWXO) != 0) {
-        return path +
-               " is accessible to every user: remove the permissions of other users (chmod o= " +
-               path + ") or remove it to have a new one created";
+        return refused(path +
+                       " is accessible to every user: remove the permissions of other users "
+                       "(chmod o= " +
+                       path + ") or remove it to have a new one created");
     }
     char text[longestToken + 2];
     std::string token(text, std::fread(text, 1, sizeof text, stream.get()));
@@ -124,8 +109,9 @@ std::variant<ApiToken, std::string> ApiToken::load(const std::string& path) {
     const bool isPrintable =
         std::all_of(token.begin(), token.end(), [](char c) { return c > 0x20 && c < 0x7f; });
     if (token.size() < shortestToken || token.size() > longestToken || !isPrintable) {
-        return path + " does not contain a token of 32 to 1024 visible characters: remove it to "
-                      "have a new one created";
+        return refused(path +
+                       " does not contain a token of 32 to 1024 visible characters: remove it to "
+                       "have a new one created");
     }
     return ApiToken(std::move(token));
 }

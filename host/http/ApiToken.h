@@ -1,9 +1,10 @@
 #ifndef ZRM_HOST_API_TOKEN_H
 #define ZRM_HOST_API_TOKEN_H
 
+#include "host/base/Result.h"
+
 #include <string>
 #include <string_view>
-#include <variant>
 
 namespace zrm::host {
 
@@ -13,9 +14,9 @@ public:
     explicit ApiToken(std::string token);
 
     /// Reads the token from its file. If the file is missing, creates it and its directory,
-    /// readable only by the owner, with 32 random bytes in hexadecimal. Returns an error message
-    /// when there is no token in the end.
-    static std::variant<ApiToken, std::string> load(const std::string& path);
+    /// readable only by the owner, with 32 random bytes in hexadecimal. Refused when there is no
+    /// token in the end.
+    static Result<ApiToken> load(const std::string& path);
 
     /// True when the text is the token. The time taken does not reveal how much of it is right.
     bool matches(std::string_view presented) const noexcept;

@@ -1,7 +1,6 @@
 #include "host/http/Credentials.h"
 
 #include <utility>
-#include <variant>
 
 namespace zrm::host {
 
@@ -9,38 +8,32 @@ Credentials::Credentials(std::string token, std::string certificate, std::string
     : m_tokenFile(std::move(token)), m_certificateFile(std::move(certificate)),
       m_keyFile(std::move(key)) {}
 
-std::string Credentials::load() {
-    std::string problem = loadToken();
-    return problem.empty() ? loadTls() : problem;
+Result<void> Credentials::load() {
+    return loadToken().and_then([this] { return loadTls(); });
 }
 
-std::string Credentials::loadToken() {
-    auto loaded = ApiToken::load(m_tokenFile.path());
-    if (std::string* const problem = std::get_if<std::string>(&loaded)) {
-        return std::move(*problem);
-    }
-    m_token.emplace(std::get<ApiToken>(std::move(loaded)));
-    return "";
+Result<void> Credentials::loadToken() {
+    return ApiToken::load(m_tokenFile.path()).map([this](ApiToken&& token) {
+        m_token.emplace(std::move(token));
+    });
 }
 
-std::string Credentials::loadTls() {
+Result<void> Credentials::loadTls() {
     if (m_certificateFile.path().empty()) {
-        return "";
+        return {};
     }
-    auto loaded = TlsContext::load(m_certificateFile.path(), m_keyFile.path());
-    if (std::string* const problem = std::get_if<std::string>(&loaded)) {
-        return std::move(*problem);
-    }
-    m_tls = std::get<std::shared_ptr<const TlsContext>>(std::move(loaded));
-    return "";
+    return TlsContext::load(m_certificateFile.path(), m_keyFile.path())
+        .map([this](std::shared_ptr<const TlsContext>&& tls) { m_tls = std::move(tls); });
 }
 
 Credentials::Change Credentials::refresh() {
     Change change;
     if (m_tokenFile.hasChanged()) {
-        const std::string problem = loadToken();
-        change.isNew = problem.empty();
-        change.problem = problem.empty() ? "" : "the previous token stays in use: " + problem;
+        const Result<void> loaded = loadToken();
+        change.isNew = loaded.has_value();
+        if (!loaded) {
+            change.problem = Problem{"the previous token stays in use: " + loaded.error().text()};
+        }
     }
     refreshTls(change);
     return change;
@@ -55,13 +48,13 @@ void Credentials::refreshTls(Change& change) {
     if (!isCertificateNew && !isKeyNew && !isSecondTry) {
         return;
     }
-    const std::string problem = loadTls();
-    if (problem.empty()) {
+    const Result<void> loaded = loadTls();
+    if (loaded) {
         change.isNew = true;
     } else if (isCertificateNew || isKeyNew) {
         m_isTriedAgain = true;
     } else {
-        change.problem = "the previous certificate stays in use: " + problem;
+        change.problem = Problem{"the previous certificate stays in use: " + loaded.error().text()};
     }
 }
 

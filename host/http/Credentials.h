@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_CREDENTIALS_H
 #define ZRM_HOST_CREDENTIALS_H
 
+#include "host/base/Result.h"
 #include "host/base/WatchedFile.h"
 #include "host/http/ApiToken.h"
 #include "host/http/TlsContext.h"
@@ -18,13 +19,14 @@ public:
     /// Paths; certificate and key are empty without TLS.
     Credentials(std::string token, std::string certificate, std::string key);
 
-    /// Reads everything for the first time. Returns what is wrong, empty when nothing is.
-    std::string load();
+    /// Reads everything for the first time.
+    Result<void> load();
 
     /// What came of a look at the files.
     struct Change {
-        bool isNew = false;  ///< token() or tls() is another one
-        std::string problem; ///< why a changed file is not used, once for each change; else empty
+        bool isNew = false; ///< token() or tls() is another one
+        /// Why a changed file is not used, once for each change.
+        std::optional<Problem> problem = std::nullopt;
     };
     /// Looks whether the files have changed, and reads those that have. Called about once a second.
     Change refresh();
@@ -35,8 +37,8 @@ public:
     const std::shared_ptr<const TlsContext>& tls() const noexcept { return m_tls; }
 
 private:
-    std::string loadToken();
-    std::string loadTls();
+    Result<void> loadToken();
+    Result<void> loadTls();
     void refreshTls(Change& change);
 
     WatchedFile m_tokenFile;

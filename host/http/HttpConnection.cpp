@@ -31,7 +31,7 @@ constexpr std::size_t mostBehindHead = 8 * 1024 * 1024;
 constexpr std::size_t mostUnparsed = 16 * 1024; ///< no part of a body is longer, besides its data
 constexpr std::size_t mostAhead = 16 * 1024;    ///< of requests behind the one under way
 
-const Problem bodyIncomplete{400, "the body is incomplete", "body"};
+const Refusal bodyIncomplete{400, "the body is incomplete", "body"};
 
 } // namespace
 
@@ -274,7 +274,7 @@ void HttpConnection::parseHead() {
     }
     IncomingRequest incoming = m_parser->takeHead();
     const bool hasBody = incoming.hasBody;
-    m_isLast = incoming.isLast || incoming.problem || ++m_requests >= requestsPerConnection ||
+    m_isLast = incoming.isLast || incoming.refusal || ++m_requests >= requestsPerConnection ||
                m_context.isStopping;
     m_isHead = incoming.request.method == "HEAD";
     m_isHttp10 = incoming.isHttp10;
@@ -308,7 +308,7 @@ void HttpConnection::beginBody() {
 }
 
 void HttpConnection::parseBody() {
-    while (!m_parser->isDone() && !m_parser->bodyProblem()) {
+    while (!m_parser->isDone() && !m_parser->bodyRefusal()) {
         const std::size_t count = m_parser->put(m_in);
         m_bodyBytes += count;
         take(count);
@@ -319,11 +319,11 @@ void HttpConnection::parseBody() {
     if (m_parser->isDone()) {
         m_admission->request.body = m_parser->takeBody();
         submit();
-    } else if (m_parser->bodyProblem() || m_isEnded || m_bodyBytes > mostBehindHead ||
+    } else if (m_parser->bodyRefusal() || m_isEnded || m_bodyBytes > mostBehindHead ||
                m_in.size() > mostUnparsed) {
         m_isLast = true;
-        const Problem problem = m_parser->bodyProblem().value_or(bodyIncomplete);
-        write(m_context.dispatcher.refuse(*m_admission, problem));
+        const Refusal refusal = m_parser->bodyRefusal().value_or(bodyIncomplete);
+        write(m_context.dispatcher.refuse(*m_admission, refusal));
     } else {
         readMore();
     }
@@ -367,10 +367,10 @@ void HttpConnection::onWaitTimeOver() {
     refuseJob({503, "the agent is busy with other requests: try again in a few seconds", ""});
 }
 
-void HttpConnection::refuseJob(const Problem& problem) {
+void HttpConnection::refuseJob(const Refusal& refusal) {
     const std::shared_ptr<Job> job = std::move(m_job);
     m_job.reset();
-    HttpAnswer answer = m_context.dispatcher.refuse(job->admission, problem);
+    HttpAnswer answer = m_context.dispatcher.refuse(job->admission, refusal);
     answer.headers.emplace_back("Retry-After", "5");
     write(std::move(answer));
 }

@@ -94,7 +94,7 @@ private:
     void submit();
     void onWaitTimeOver();
     void answered(const std::shared_ptr<Job>& job, HttpAnswer answer);
-    void refuseJob(const Problem& problem);
+    void refuseJob(const Refusal& refusal);
 
     void write(HttpAnswer answer);
     void writeParts(std::function<void()> whenWritten);

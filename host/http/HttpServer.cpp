@@ -2,7 +2,6 @@
 
 #include "base/TraceScope.h"
 #include "host/http/ConnectionShares.h"
-#include "host/http/DescriptorRoom.h"
 #include "host/http/HttpConnection.h"
 #include "host/http/RequestDispatcher.h"
 #include "host/http/WorkerPool.h"
@@ -74,8 +73,8 @@ public:
     Network(const Router& router, Size size);
     ~Network();
 
-    std::string start(const ListenAddress& address, ApiToken token,
-                      std::shared_ptr<const TlsContext> tls);
+    Result<void> start(const ListenAddress& address, ApiToken token,
+                       std::shared_ptr<const TlsContext> tls);
     void renew(ApiToken token, std::shared_ptr<const TlsContext> tls);
     void stop(Clock::time_point limit);
     void abandon(Clock::time_point limit);
@@ -95,7 +94,7 @@ private:
 
     bool listen(const ListenAddress& address);
     bool listenAt(const tcp::endpoint& endpoint);
-    std::string startThreads();
+    Result<void> startThreads();
     static void run(Lane& lane);
     void waitForClient();
     void acceptClients();
@@ -132,23 +131,23 @@ HttpServer::Network::~Network() {
     stop(Clock::time_point::max());
 }
 
-std::string HttpServer::Network::start(const ListenAddress& address, ApiToken token,
-                                       std::shared_ptr<const TlsContext> tls) {
+Result<void> HttpServer::Network::start(const ListenAddress& address, ApiToken token,
+                                        std::shared_ptr<const TlsContext> tls) {
     TraceScope trace(anchor);
     if (!listen(address)) {
-        return "cannot listen on " + address.text() +
-               (address.port == 0 ? "" : ": is another agent running?");
+        return refused("cannot listen on " + address.text() +
+                       (address.port == 0 ? "" : ": is another agent running?"));
     }
     const DescriptorRoom room = DescriptorRoom::make(m_size.connections);
     m_shares.setMost(room.count);
     m_lowestDescriptor = room.lowest;
     renew(std::move(token), std::move(tls));
     waitForClient();
-    if (std::string problem = startThreads(); !problem.empty()) {
-        return problem;
+    if (const Result<void> started = startThreads(); !started) {
+        return started;
     }
     trace.detail()("Listening at %s.", m_address.text().c_str());
-    return "";
+    return {};
 }
 
 void HttpServer::Network::renew(ApiToken token, std::shared_ptr<const TlsContext> tls) {
@@ -195,7 +194,7 @@ bool HttpServer::Network::listenAt(const tcp::endpoint& endpoint) {
     return false;
 }
 
-std::string HttpServer::Network::startThreads() {
+Result<void> HttpServer::Network::startThreads() {
     m_isRunning = true;
     try {
         for (Lane& lane : m_lanes) {
@@ -203,9 +202,9 @@ std::string HttpServer::Network::startThreads() {
         }
     } catch (const std::system_error& error) {
         stop(Clock::now());
-        return std::string("cannot start a thread: ") + error.what();
+        return refused(std::string("cannot start a thread: ") + error.what());
     }
-    return "";
+    return {};
 }
 
 void HttpServer::Network::run(Lane& lane) {
@@ -354,8 +353,8 @@ HttpServer::HttpServer(const Router& router, const Size& size)
 
 HttpServer::~HttpServer() = default;
 
-std::string HttpServer::start(const ListenAddress& address, ApiToken token,
-                              std::shared_ptr<const TlsContext> tls) {
+Result<void> HttpServer::start(const ListenAddress& address, ApiToken token,
+                               std::shared_ptr<const TlsContext> tls) {
     return m_network->start(address, std::move(token), std::move(tls));
 }
 

@@ -2,6 +2,7 @@
 #define ZRM_HOST_HTTP_SERVER_H
 
 #include "host/base/ListenAddress.h"
+#include "host/base/Result.h"
 #include "host/http/ApiToken.h"
 #include "host/http/TlsContext.h"
 
@@ -39,9 +40,8 @@ public:
     ~HttpServer();
 
     /// Starts listening and serving on its own threads, under TLS when there is a certificate.
-    /// Returns an error message, empty on success.
-    std::string start(const ListenAddress& address, ApiToken token,
-                      std::shared_ptr<const TlsContext> tls = nullptr);
+    Result<void> start(const ListenAddress& address, ApiToken token,
+                       std::shared_ptr<const TlsContext> tls = nullptr);
 
     /// From now on requests must carry this token, and new connections use this certificate, which
     /// is null if the server was started without one. Open connections stay open.

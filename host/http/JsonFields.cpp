@@ -181,6 +181,11 @@ void JsonFields::refuse(std::string_view key, const std::string& detail) const {
     throw RequestRefused(400, detail, place(key));
 }
 
+void JsonFields::refuse(std::string_view key, Problem problem) const {
+    problem.field = place(key);
+    throw RequestRefused(400, std::move(problem));
+}
+
 void JsonFields::refuseUnknown() const {
     for (const auto& [key, value] : m_object->items()) {
         if (std::find(m_known.begin(), m_known.end(), key) != m_known.end()) {

@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_JSON_FIELDS_H
 #define ZRM_HOST_JSON_FIELDS_H
 
+#include "host/base/Result.h"
+
 #include <cstddef>
 #include <cstdint>
 #include <memory>
@@ -51,6 +53,7 @@ public:
 
     /// Refuses the request, naming a member.
     [[noreturn]] void refuse(std::string_view key, const std::string& detail) const;
+    [[noreturn]] void refuse(std::string_view key, Problem problem) const;
 
     /// Refuses members that have not been read. Call it last.
     void refuseUnknown() const;

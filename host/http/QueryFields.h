@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_QUERY_FIELDS_H
 #define ZRM_HOST_QUERY_FIELDS_H
 
-#include "host/http/HttpRequest.h"
+#include "host/http/Message.h"
 
 #include <cstdint>
 #include <map>

@@ -22,6 +22,40 @@ namespace {
 
 TRC1_Anchor anchor{"RequestDispatcher.cpp"};
 
+/// Requests of this thread: a thread that ends the process must not wait for itself.
+thread_local int ownRequests = 0;
+
+} // namespace
+
+ActiveRequests::Guard::Guard(ActiveRequests& requests) : m_requests(requests) {
+    const std::lock_guard guard(m_requests.m_mutex);
+    m_isCounted = !m_requests.m_isClosed;
+    if (m_isCounted) {
+        ++m_requests.m_count;
+        ++ownRequests;
+    }
+}
+
+ActiveRequests::Guard::~Guard() {
+    if (!m_isCounted) {
+        return;
+    }
+    --ownRequests;
+    {
+        const std::lock_guard guard(m_requests.m_mutex);
+        --m_requests.m_count;
+    }
+    m_requests.m_ended.notify_all();
+}
+
+void ActiveRequests::close(std::chrono::steady_clock::time_point limit) {
+    std::unique_lock lock(m_mutex);
+    m_isClosed = true;
+    m_ended.wait_until(lock, limit, [&] { return m_count <= ownRequests; });
+}
+
+namespace {
+
 void decodeCaptures(const Router::Match& match, HttpRequest& request) {
     for (const std::string& capture : match.captures) {
         std::optional<std::string> decoded = UrlText::decode(capture);
@@ -83,9 +117,9 @@ template <class Work> std::optional<HttpAnswer> problemOf(const HttpRequest& req
     try {
         return work();
     } catch (const RequestRefused& refused) {
-        const Problem& problem = refused.problem();
-        trace.detail()("Request for %s refused: %s.", request.path.c_str(), problem.detail.c_str());
-        return RequestDispatcher::answerOf(problem);
+        trace.detail()("Request for %s refused: %s.", request.path.c_str(),
+                       refused.problem().text().c_str());
+        return RequestDispatcher::answerOf(refused.refusal());
     } catch (const std::exception& exception) {
         trace.error()("Request for %s failed: %s", request.path.c_str(), exception.what());
     }
@@ -134,21 +168,21 @@ RequestRefused RequestDispatcher::tooLong() {
     return {413, "the body has more than " + std::to_string(largestBody) + " bytes", "body"};
 }
 
-HttpAnswer RequestDispatcher::answerOf(const Problem& problem) {
-    HttpAnswer answer{problem.status, "application/problem+json", problem.json()};
-    if (problem.status == 401) {
+HttpAnswer RequestDispatcher::answerOf(const Refusal& refusal) {
+    HttpAnswer answer{refusal.status, "application/problem+json", refusal.json()};
+    if (refusal.status == 401) {
         answer.headers.emplace_back("WWW-Authenticate", "Bearer");
     }
     return answer;
 }
 
-HttpAnswer RequestDispatcher::refuse(const Problem& problem) {
-    m_statistics.count("", "", problem.status, {});
-    return answerOf(problem);
+HttpAnswer RequestDispatcher::refuse(const Refusal& refusal) {
+    m_statistics.count("", "", refusal.status, {});
+    return answerOf(refusal);
 }
 
-HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Problem& problem) {
-    HttpAnswer answer = answerOf(problem);
+HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Refusal& refusal) {
+    HttpAnswer answer = answerOf(refusal);
     count(admission, answer);
     return answer;
 }
@@ -187,8 +221,8 @@ RequestDispatcher::Admission RequestDispatcher::admit(IncomingRequest incoming) 
 
 void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission) {
     HttpRequest& request = incoming.request;
-    if (incoming.problem) {
-        throw RequestRefused(*incoming.problem);
+    if (incoming.refusal) {
+        throw RequestRefused(*incoming.refusal);
     }
     if (incoming.hasBody && !mayHaveBody(request.method)) {
         throw RequestRefused(400, "this method has no body", "");
@@ -196,8 +230,8 @@ void RequestDispatcher::tryAdmit(IncomingRequest& incoming, Admission& admission
     const Router::Match match = m_router.match(request.method, request.path);
     admission.route = match.pattern;
     const bool isPublic = match.handler != nullptr && match.access == Router::PUBLIC;
-    if (std::optional<Problem> problem = guard()->refuse(incoming.headers, isPublic)) {
-        throw RequestRefused(std::move(*problem));
+    if (const auto allowed = guard()->check(incoming.headers, isPublic); !allowed) {
+        throw RequestRefused(allowed.error());
     }
     if (match.handler == nullptr) {
         admission.refusal = unrouted(match);

@@ -1,15 +1,15 @@
 #ifndef ZRM_HOST_REQUEST_DISPATCHER_H
 #define ZRM_HOST_REQUEST_DISPATCHER_H
 
-#include "host/http/ActiveRequests.h"
-#include "host/http/HttpAnswer.h"
-#include "host/http/IncomingRequest.h"
+#include "host/http/Message.h"
 #include "host/http/RequestGuard.h"
+#include "host/http/RequestParser.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
 
 #include <chrono>
+#include <condition_variable>
 #include <cstddef>
 #include <memory>
 #include <mutex>
@@ -17,6 +17,33 @@
 #include <string>
 
 namespace zrm::host {
+
+/// Counts the requests in progress, so that process exit can wait for them. Any thread.
+class ActiveRequests {
+public:
+    /// One request while it exists; false when no more requests may begin.
+    class Guard {
+    public:
+        explicit Guard(ActiveRequests& requests);
+        ~Guard();
+        Guard(const Guard&) = delete;
+        Guard& operator=(const Guard&) = delete;
+        explicit operator bool() const noexcept { return m_isCounted; }
+
+    private:
+        ActiveRequests& m_requests;
+        bool m_isCounted;
+    };
+
+    /// Prevents new requests and waits for those of other threads, until the limit at the latest.
+    void close(std::chrono::steady_clock::time_point limit);
+
+private:
+    std::mutex m_mutex;
+    std::condition_variable m_ended;
+    int m_count = 0;
+    bool m_isClosed = false;
+};
 
 /// Holds the rules of access against requests and lets the router's handlers answer them. What
 /// goes wrong becomes a problem document. Any thread.
@@ -56,16 +83,16 @@ public:
     HttpAnswer answer(Admission& admission);
 
     /// The answer to a request that was admitted and cannot be answered otherwise.
-    HttpAnswer refuse(const Admission& admission, const Problem& problem);
+    HttpAnswer refuse(const Admission& admission, const Refusal& refusal);
 
     /// The answer to a request of which not even the head could be read.
-    HttpAnswer refuse(const Problem& problem);
+    HttpAnswer refuse(const Refusal& refusal);
 
     /// What refuses a body that is too long.
     static RequestRefused tooLong();
 
     /// The answer that is a problem document.
-    static HttpAnswer answerOf(const Problem& problem);
+    static HttpAnswer answerOf(const Refusal& refusal);
 
     /// Lets no more requests be answered and waits for those under way, at most until the limit.
     void close(std::chrono::steady_clock::time_point limit) { m_active.close(limit); }

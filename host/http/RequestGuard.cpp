@@ -56,28 +56,30 @@ bool RequestGuard::isInCertificate(std::string_view authority) const {
     return named && named->port == m_port && m_tls->isFor(named->host);
 }
 
-std::optional<Problem> RequestGuard::refuse(const Headers& headers, bool isPublic) const {
+Result<void, Refusal> RequestGuard::check(const Headers& headers, bool isPublic) const {
     if (!headers.host || !isOurs(*headers.host)) {
-        return Problem{421, "the Host header must be the address at which the agent listens",
-                       "Host"};
+        return tl::unexpected(
+            Refusal(421, "the Host header must be the address at which the agent listens", "Host"));
     }
     const std::string_view scheme = m_tls == nullptr ? "http://" : "https://";
     if (headers.origin && (!headers.origin->starts_with(scheme) ||
                            !isOurs(std::string_view(*headers.origin).substr(scheme.size())))) {
-        return Problem{403, "requests from other origins are refused", "Origin"};
+        return tl::unexpected(Refusal(403, "requests from other origins are refused", "Origin"));
     }
     if (isPublic) {
-        return std::nullopt;
+        return {};
     }
     constexpr std::string_view bearer = "bearer ";
     const std::string& authorization = headers.authorization.value_or("");
     if (lowerCase(std::string_view(authorization).substr(0, bearer.size())) != bearer) {
-        return Problem{401, "send the API token: Authorization: Bearer TOKEN", "Authorization"};
+        return tl::unexpected(
+            Refusal(401, "send the API token: Authorization: Bearer TOKEN", "Authorization"));
     }
     if (!m_token.matches(std::string_view(authorization).substr(bearer.size()))) {
-        return Problem{401, "the token is not the one in the agent's token file", "Authorization"};
+        return tl::unexpected(
+            Refusal(401, "the token is not the one in the agent's token file", "Authorization"));
     }
-    return std::nullopt;
+    return {};
 }
 
 } // namespace zrm::host

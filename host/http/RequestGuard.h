@@ -3,7 +3,7 @@
 
 #include "host/base/ListenAddress.h"
 #include "host/http/ApiToken.h"
-#include "host/http/Problem.h"
+#include "host/http/Refusal.h"
 #include "host/http/TlsContext.h"
 
 #include <cstdint>
@@ -32,8 +32,8 @@ public:
     RequestGuard(const ListenAddress& address, ApiToken token,
                  std::shared_ptr<const TlsContext> tls = nullptr);
 
-    /// Why the request is refused; none when it is allowed. `isPublic`: needs no token.
-    std::optional<Problem> refuse(const Headers& headers, bool isPublic) const;
+    /// Whether the request is allowed. `isPublic`: it needs no token.
+    Result<void, Refusal> check(const Headers& headers, bool isPublic) const;
 
 private:
     bool isOurs(std::string_view authority) const;

@@ -9,10 +9,11 @@
 #include <string>
 #include <utility>
 
+#include <strings.h>
+
 #include <boost/asio/buffer.hpp>
 #include <boost/beast/http/parser.hpp>
 #include <boost/beast/http/string_body.hpp>
-#include <strings.h>
 
 namespace zrm::host {
 
@@ -86,7 +87,7 @@ private:
 };
 
 /// What the parser's refusal means to a client.
-Problem problemOf(const boost::beast::error_code& code) {
+Refusal refusalOf(const boost::beast::error_code& code) {
     using http::error;
     if (code == error::header_limit) {
         return {431,
@@ -205,14 +206,14 @@ public:
 
     std::size_t put(std::string_view bytes);
     bool hasBegun() const noexcept { return m_lines.total > 0; }
-    bool isHeadDone() const noexcept { return m_headProblem || m_parser.is_header_done(); }
+    bool isHeadDone() const noexcept { return m_headRefusal || m_parser.is_header_done(); }
     bool isDone() const noexcept { return m_parser.is_done(); }
     IncomingRequest takeHead();
     void limitBody(std::size_t most) {
         m_parser.body_limit(most);
         m_parser.eager(true);
     }
-    const std::optional<Problem>& bodyProblem() const noexcept { return m_bodyProblem; }
+    const std::optional<Refusal>& bodyRefusal() const noexcept { return m_bodyRefusal; }
     std::string takeBody() { return std::move(m_parser.get().body()); }
 
 private:
@@ -220,12 +221,12 @@ private:
 
     http::request_parser<http::string_body> m_parser;
     HeadLines m_lines;
-    std::optional<Problem> m_headProblem;
-    std::optional<Problem> m_bodyProblem;
+    std::optional<Refusal> m_headRefusal;
+    std::optional<Refusal> m_bodyRefusal;
 };
 
 std::size_t RequestParser::Engine::put(std::string_view bytes) {
-    if (bytes.empty() || isDone() || m_headProblem || m_bodyProblem) {
+    if (bytes.empty() || isDone() || m_headRefusal || m_bodyRefusal) {
         return 0;
     }
     if (!m_parser.is_header_done()) {
@@ -241,9 +242,9 @@ std::size_t RequestParser::Engine::put(std::string_view bytes) {
     const std::size_t taken =
         m_parser.put(boost::asio::const_buffer(bytes.data(), bytes.size()), error);
     if (error == http::error::body_limit) {
-        m_bodyProblem = RequestDispatcher::tooLong().problem();
+        m_bodyRefusal = RequestDispatcher::tooLong().refusal();
     } else if (error && error != http::error::need_more) {
-        m_bodyProblem = {400, "the body is incomplete", "body"};
+        m_bodyRefusal = Refusal{400, "the body is incomplete", "body"};
     }
     return taken;
 }
@@ -261,12 +262,12 @@ std::size_t RequestParser::Engine::putHead(std::string_view bytes) {
         error = http::error::header_limit;
     }
     if (error && error != http::error::need_more) {
-        m_headProblem = problemOf(error);
+        m_headRefusal = refusalOf(error);
     } else if (isEnded && m_lines.isFolded) {
-        m_headProblem = problemOf(http::error::bad_obs_fold);
+        m_headRefusal = refusalOf(http::error::bad_obs_fold);
     } else if (isEnded && m_lines.isTooLong) {
-        m_headProblem = {431, "a header has more than " + std::to_string(largestLine) + " bytes",
-                         ""};
+        m_headRefusal =
+            Refusal{431, "a header has more than " + std::to_string(largestLine) + " bytes", ""};
     }
     return taken;
 }
@@ -277,15 +278,15 @@ IncomingRequest RequestParser::Engine::takeHead() {
     const std::string method = text(message.method_string());
     const bool isKnown = std::find(methods.begin(), methods.end(), method) != methods.end();
     incoming.request.method = isKnown ? method : "";
-    incoming.problem = m_headProblem;
-    if (!incoming.problem && !isKnown) {
-        incoming.problem = {400, "the request cannot be read as HTTP", ""};
+    incoming.refusal = m_headRefusal;
+    if (!incoming.refusal && !isKnown) {
+        incoming.refusal = Refusal{400, "the request cannot be read as HTTP", ""};
     }
-    if (!incoming.problem) {
+    if (!incoming.refusal) {
         try {
             readMessage(message, m_parser.keep_alive(), incoming);
         } catch (const RequestRefused& refused) {
-            incoming.problem = refused.problem();
+            incoming.refusal = refused.refusal();
         }
     }
     return incoming;
@@ -319,8 +320,8 @@ void RequestParser::limitBody(std::size_t most) {
     m_engine->limitBody(most);
 }
 
-const std::optional<Problem>& RequestParser::bodyProblem() const noexcept {
-    return m_engine->bodyProblem();
+const std::optional<Refusal>& RequestParser::bodyRefusal() const noexcept {
+    return m_engine->bodyRefusal();
 }
 
 std::string RequestParser::takeBody() {

@@ -1,7 +1,9 @@
 #ifndef ZRM_HOST_REQUEST_PARSER_H
 #define ZRM_HOST_REQUEST_PARSER_H
 
-#include "host/http/IncomingRequest.h"
+#include "host/http/Message.h"
+#include "host/http/Refusal.h"
+#include "host/http/RequestGuard.h"
 
 #include <cstddef>
 #include <memory>
@@ -10,6 +12,21 @@
 #include <string_view>
 
 namespace zrm::host {
+
+/// A request as it came, before any rule was held against it.
+struct IncomingRequest {
+    HttpRequest request;  ///< without captures, query and body
+    std::string rawQuery; ///< what stands behind '?', as it was sent
+    RequestGuard::Headers headers;
+    std::string contentType;
+    bool hasBody = false;
+    bool isChunked = false;            ///< the body comes in chunks
+    bool isLast = false;               ///< the connection ends with the answer
+    bool isHttp10 = false;             ///< the client does not know chunks
+    bool waitsForContinue = false;     ///< the body comes when the client is asked for it
+    std::optional<std::size_t> length; ///< of the body, where the client tells it
+    std::optional<Refusal> refusal;    ///< what makes the request unclear; none when nothing
+};
 
 /// Reads one request as its bytes come in. A head that another reader, for example a proxy on the
 /// way, may understand differently is refused, so that no body is taken for a request. One thread.
@@ -43,8 +60,8 @@ public:
 
     /// Before the body: the largest one that is taken, in bytes.
     void limitBody(std::size_t most);
-    /// What is wrong with the body; none when nothing is.
-    const std::optional<Problem>& bodyProblem() const noexcept;
+    /// Why the body is refused; none when it is not.
+    const std::optional<Refusal>& bodyRefusal() const noexcept;
     /// The body, once, when the request is whole.
     std::string takeBody();
 

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_REQUEST_REFUSED_H
 #define ZRM_HOST_REQUEST_REFUSED_H
 
-#include "host/http/Problem.h"
+#include "host/http/Refusal.h"
 
 #include <exception>
 #include <string>
@@ -9,18 +9,20 @@
 
 namespace zrm::host {
 
-/// Thrown to refuse a request: its problem becomes the answer.
+/// Thrown to refuse a request: its refusal becomes the answer.
 class RequestRefused : public std::exception {
 public:
-    explicit RequestRefused(Problem problem) : m_problem(std::move(problem)) {}
-    RequestRefused(int status, std::string detail, std::string field)
-        : m_problem{status, std::move(detail), std::move(field)} {}
+    explicit RequestRefused(Refusal refusal) : m_refusal(std::move(refusal)) {}
+    RequestRefused(int status, Problem problem) : m_refusal(status, std::move(problem)) {}
+    RequestRefused(int status, std::string what, std::string field)
+        : m_refusal(status, std::move(what), std::move(field)) {}
 
-    const Problem& problem() const noexcept { return m_problem; }
-    const char* what() const noexcept override { return m_problem.detail.c_str(); }
+    const Refusal& refusal() const noexcept { return m_refusal; }
+    const Problem& problem() const noexcept { return m_refusal.problem; }
+    const char* what() const noexcept override { return m_refusal.problem.what.c_str(); }
 
 private:
-    Problem m_problem;
+    Refusal m_refusal;
 };
 
 } // namespace zrm::host

@@ -1,8 +1,7 @@
 #ifndef ZRM_HOST_ROUTER_H
 #define ZRM_HOST_ROUTER_H
 
-#include "host/http/HttpAnswer.h"
-#include "host/http/HttpRequest.h"
+#include "host/http/Message.h"
 
 #include <functional>
 #include <string>
@@ -65,6 +64,15 @@ private:
     };
 
     std::vector<Route> m_routes;
+};
+
+/// A group of related routes. Created before the server starts; must outlive it.
+class Resource {
+public:
+    virtual ~Resource() = default;
+
+    /// Adds the routes, once. Their handlers are called on any thread, several at a time.
+    virtual void addRoutes(Router& router) = 0;
 };
 
 } // namespace zrm::host

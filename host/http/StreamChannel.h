@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_STREAM_CHANNEL_H
 #define ZRM_HOST_STREAM_CHANNEL_H
 
-#include "host/http/HttpAnswer.h"
+#include "host/http/Message.h"
 
 #include <cstddef>
 #include <functional>

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_TIMED_WORK_H
 #define ZRM_HOST_TIMED_WORK_H
 
-#include "host/http/HttpAnswer.h"
+#include "host/http/Message.h"
 
 #include <chrono>
 #include <functional>

@@ -1,6 +1,6 @@
 #include "host/http/TlsContext.h"
 
-#include "base/ErrorText.h"
+#include <utility>
 
 #include <openssl/err.h>
 #include <openssl/ssl.h>
@@ -10,16 +10,15 @@ namespace zrm::host {
 
 namespace {
 
-/// The library's message for its last failure, or the system's when a file cannot be read.
-std::string because(const std::string& what) {
+/// Refused for the library's last failure, or the system's when a file cannot be read.
+tl::unexpected<Problem> refusedByLibrary(const std::string& what, std::string cure = {}) {
     const unsigned long code = ERR_get_error();
     ERR_clear_error();
     if (ERR_GET_LIB(code) == ERR_LIB_SYS) {
-        const ErrorText error(ERR_GET_REASON(code));
-        return what + ": " + error.text();
+        return refused(because(what, ERR_GET_REASON(code)), std::move(cure));
     }
     const char* const reason = ERR_reason_error_string(code);
-    return what + ": " + (reason == nullptr ? "unknown reason" : reason);
+    return refused(what + ": " + (reason == nullptr ? "unknown reason" : reason), std::move(cure));
 }
 
 /// For TLS 1.2: suites with forward secrecy that are not open to padding attacks. All suites of TLS
@@ -37,12 +36,12 @@ TlsContext::~TlsContext() {
     SSL_CTX_free(m_context);
 }
 
-std::variant<std::shared_ptr<const TlsContext>, std::string>
-TlsContext::load(const std::string& certificate, const std::string& key) {
+Result<std::shared_ptr<const TlsContext>> TlsContext::load(const std::string& certificate,
+                                                           const std::string& key) {
     ERR_clear_error();
     SSL_CTX* const context = SSL_CTX_new(TLS_server_method());
     if (context == nullptr) {
-        return because("TLS cannot be used");
+        return refusedByLibrary("TLS cannot be used");
     }
     const std::shared_ptr<const TlsContext> result(new TlsContext(context));
     SSL_CTX_set_min_proto_version(context, TLS1_2_VERSION);
@@ -51,14 +50,16 @@ TlsContext::load(const std::string& certificate, const std::string& key) {
     SSL_CTX_set_default_passwd_cb(context, noPassphrase);
     SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
     if (SSL_CTX_use_certificate_chain_file(context, certificate.c_str()) != 1) {
-        return because("cannot use the certificate " + certificate) + "; it must be a PEM file";
+        return refusedByLibrary("cannot use the certificate " + certificate,
+                                "it must be a PEM file");
     }
     if (SSL_CTX_use_PrivateKey_file(context, key.c_str(), SSL_FILETYPE_PEM) != 1) {
-        return because("cannot use the key " + key) +
-               "; it must be a PEM file without a passphrase";
+        return refusedByLibrary("cannot use the key " + key,
+                                "it must be a PEM file without a passphrase");
     }
     if (SSL_CTX_check_private_key(context) != 1) {
-        return because("the key " + key + " does not belong to the certificate " + certificate);
+        return refusedByLibrary("the key " + key + " does not belong to the certificate " +
+                                certificate);
     }
     return result;
 }

@@ -1,9 +1,10 @@
 #ifndef ZRM_HOST_TLS_CONTEXT_H
 #define ZRM_HOST_TLS_CONTEXT_H
 
+#include "host/base/Result.h"
+
 #include <memory>
 #include <string>
-#include <variant>
 
 struct ssl_ctx_st;
 
@@ -12,10 +13,10 @@ namespace zrm::host {
 /// A certificate and its key, for connections under TLS. Immutable, so any thread.
 class TlsContext {
 public:
-    /// Reads both files (PEM; the certificate's chain may follow it). Returns an error message when
-    /// they cannot be used.
-    static std::variant<std::shared_ptr<const TlsContext>, std::string>
-    load(const std::string& certificate, const std::string& key);
+    /// Reads both files (PEM; the certificate's chain may follow it). Refused when they
+    /// cannot be used.
+    static Result<std::shared_ptr<const TlsContext>> load(const std::string& certificate,
+                                                          const std::string& key);
 
     ~TlsContext();
     TlsContext(const TlsContext&) = delete;

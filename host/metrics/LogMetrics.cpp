@@ -1,14 +1,13 @@
-#include "host/metrics/LogMetrics.h"
+#include "host/metrics/MetricSources.h"
 
 #include "host/diagnose/LogLedgers.h"
 #include "host/diagnose/LogWatch.h"
 #include "host/diagnose/UnmonitoredLogs.h"
-#include "host/events/LogPath.h"
 #include "host/events/RowText.h"
 #include "host/framework/Sample.h"
 #include "host/metrics/MetricText.h"
-#include "monitor/DebugLogLoss.h"
 #include "monitor/DescriptorReserve.h"
+#include "monitor/LogFile.h"
 
 #include <cstdint>
 #include <map>
@@ -144,7 +143,7 @@ void LogMetrics::collect(MetricText& text) {
     collectSizes(text, logs);
     text.counter("zrm_debug_log_incomplete_records_total",
                  "Records that were not completely written to the debug log.");
-    text.add(DebugLogLoss::records());
+    text.add(LogFile::incompleteDebugRecords());
     text.counter("zrm_logs_without_descriptor_total",
                  "How often a log could not be opened because no descriptor was free.");
     text.add(DescriptorReserve::failures());

@@ -1,8 +1,8 @@
 #ifndef ZRM_HOST_METRICS_RESOURCE_H
 #define ZRM_HOST_METRICS_RESOURCE_H
 
-#include "host/http/Resource.h"
-#include "host/metrics/MetricSource.h"
+#include "host/http/Router.h"
+#include "host/metrics/MetricSources.h"
 
 #include <memory>
 #include <utility>

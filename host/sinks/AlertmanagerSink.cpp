@@ -1,7 +1,7 @@
 #include "host/sinks/AlertmanagerSink.h"
 
 #include "host/base/SteeringText.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/sinks/EventRow.h"
 
 #include <string_view>

@@ -3,7 +3,7 @@
 #include "base/TraceScope.h"
 #include "host/client/HttpClient.h"
 #include "host/config/HttpUrl.h"
-#include "host/sinks/HeadersFile.h"
+#include "host/sinks/SecretFile.h"
 
 #include <algorithm>
 #include <array>

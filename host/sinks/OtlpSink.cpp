@@ -3,7 +3,6 @@
 #include "base/TraceScope.h"
 #include "host/base/SteeringText.h"
 #include "host/sinks/EventRow.h"
-#include "host/sinks/SeverityCodes.h"
 
 #include <algorithm>
 #include <charconv>

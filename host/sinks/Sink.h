@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_SINK_H
 #define ZRM_HOST_SINK_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <chrono>
 #include <cstddef>

@@ -1,11 +1,10 @@
 #include "host/sinks/SyslogMessage.h"
 
 #include "host/base/SteeringText.h"
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/base/Utf8.h"
-#include "host/config/SyslogFacilities.h"
+#include "host/config/SinkTypes.h"
 #include "host/sinks/EventRow.h"
-#include "host/sinks/SeverityCodes.h"
 
 #include <algorithm>
 

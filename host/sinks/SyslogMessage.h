@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_SYSLOG_MESSAGE_H
 #define ZRM_HOST_SYSLOG_MESSAGE_H
 
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <cstddef>
 #include <string>

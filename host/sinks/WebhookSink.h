@@ -9,8 +9,16 @@
 #include <span>
 #include <stop_token>
 #include <string>
+#include <string_view>
 
 namespace zrm::host {
+
+/// Signs texts with a shared secret (RFC 2104 with SHA-256). Stateless.
+class HmacSha256 {
+public:
+    /// The signature of a text as 64 lower-case hexadecimal digits.
+    static std::string hex(std::string_view secret, std::string_view text);
+};
 
 /// Posts events as {"events": [...]} to a URL, signed when there is a secret. A failed request is
 /// repeated unchanged, so that the receiver can recognise a duplicate.

@@ -1,7 +1,7 @@
 #include "host/situations/SituationJson.h"
 
-#include "host/base/UtcTime.h"
-#include "host/situations/SituationStatus.h"
+#include "host/base/TimeText.h"
+#include "host/situations/SituationSet.h"
 
 #include <nlohmann/json.hpp>
 

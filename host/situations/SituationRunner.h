@@ -3,7 +3,6 @@
 
 #include "host/config/HostConfig.h"
 #include "host/situations/Situation.h"
-#include "host/situations/SituationCounts.h"
 
 #include <chrono>
 #include <condition_variable>

@@ -1,7 +1,7 @@
 #include "host/situations/SituationSet.h"
 
 #include "base/TraceScope.h"
-#include "host/config/PatternBudget.h"
+#include "host/config/ConditionBuilder.h"
 
 #include <algorithm>
 

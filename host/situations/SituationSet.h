@@ -2,14 +2,14 @@
 #define ZRM_HOST_SITUATION_SET_H
 
 #include "host/config/HostConfig.h"
-#include "host/situations/SituationCounts.h"
+#include "host/situations/Situation.h"
 #include "host/situations/SituationRunner.h"
-#include "host/situations/SituationStatus.h"
 #include "host/situations/SituationStore.h"
 
 #include <chrono>
 #include <condition_variable>
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <map>
 #include <memory>
@@ -22,6 +22,23 @@
 #include <vector>
 
 namespace zrm::host {
+
+/// A snapshot of a situation's state.
+struct SituationStatus {
+    enum Source { FILE, API };
+    enum State { RUNNING, STOPPED, FAILED };
+
+    SituationConfig config;
+    Source source = FILE;
+    State state = RUNNING;
+    std::string problem; ///< empty: none
+
+    std::uint64_t offered = 0;   ///< entries offered to it
+    std::uint64_t matched = 0;   ///< of these, those that met every condition
+    std::uint64_t discarded = 0; ///< of these, those that the thresholds refused
+    std::uint64_t raised = 0;
+    std::int64_t lastRaised = 0; ///< milliseconds since 1970, UTC; 0: never
+};
 
 /// Why the situations were not changed.
 struct SituationRefusal {

@@ -5,6 +5,15 @@
 
 namespace zrm::host {
 
+/// The descriptors 0, 1 and 2, which may be closed when a program starts. Stateless.
+class StandardStreams {
+public:
+    /// Opens closed ones on a file that is empty and cannot be written. Otherwise the next files
+    /// opened would get their numbers, and events and messages would be written into logs and
+    /// databases. Call before the program opens anything.
+    static void fill() noexcept;
+};
+
 /// The process's descriptors: one for each log, plus those of HTTP, the history and the sinks.
 class Descriptors {
 public:

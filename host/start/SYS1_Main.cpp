@@ -2,14 +2,12 @@
 #include "host/base/Say.h"
 #include "host/base/WatchedFile.h"
 #include "host/config/ConfigFile.h"
-#include "host/config/ConfigSecrets.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
 #include "host/start/CommandLine.h"
 #include "host/start/Descriptors.h"
 #include "host/start/Host.h"
 #include "host/start/ServiceNotifier.h"
-#include "host/start/StandardStreams.h"
 
 #include <cstddef>
 #include <cstdio>

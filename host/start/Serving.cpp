@@ -7,25 +7,20 @@
 #include "host/api/DiagnoseResource.h"
 #include "host/api/EventStream.h"
 #include "host/api/EventsResource.h"
-#include "host/api/HealthResource.h"
 #include "host/api/LogsResource.h"
 #include "host/api/ReportResource.h"
 #include "host/api/SampleResource.h"
 #include "host/api/SituationsResource.h"
 #include "host/base/Say.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "host/console/ConsoleResource.h"
 #include "host/diagnose/LogLedgers.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/PulseRegistry.h"
 #include "host/framework/Request.h"
 #include "host/framework/Sample.h"
-#include "host/metrics/DeliveryMetrics.h"
-#include "host/metrics/HttpMetrics.h"
-#include "host/metrics/LogMetrics.h"
+#include "host/metrics/MetricSources.h"
 #include "host/metrics/MetricsResource.h"
-#include "host/metrics/ProcessMetrics.h"
-#include "host/metrics/SituationMetrics.h"
 #include "host/start/Watchdog.h"
 
 #include <cinttypes>
@@ -125,8 +120,8 @@ void Serving::renewCredentials() {
     if (change.isNew) {
         m_http.renew(m_credentials->token(), m_credentials->tls());
     }
-    if (!change.problem.empty()) {
-        say("HTTP: %s", change.problem.c_str());
+    if (change.problem) {
+        say("HTTP: %s", change.problem->text().c_str());
     }
 }
 
@@ -178,13 +173,12 @@ void Serving::startHttp(const HostConfig& config) {
     const std::string path = config.http.tokenFile.empty() ? config.stateDirectory + "/api-token"
                                                            : config.http.tokenFile;
     m_credentials.emplace(path, config.http.certificate, config.http.key);
-    std::string problem = m_credentials->load();
-    if (problem.empty()) {
-        problem = m_http.start(*config.http.listen, m_credentials->token(), m_credentials->tls());
-    }
-    if (!problem.empty()) {
+    const Result<void> started = m_credentials->load().and_then([&] {
+        return m_http.start(*config.http.listen, m_credentials->token(), m_credentials->tls());
+    });
+    if (!started) {
         m_credentials.reset();
-        say("HTTP is off: %s", problem.c_str());
+        say("HTTP is off: %s", started.error().text().c_str());
         return;
     }
     const ListenAddress address{config.http.listen->host, m_http.port()};

@@ -1,7 +1,7 @@
 #ifndef ZRM_HOST_SERVING_H
 #define ZRM_HOST_SERVING_H
 
-#include "host/api/TableSampler.h"
+#include "host/api/SampleSource.h"
 #include "host/base/Say.h"
 #include "host/config/HostConfig.h"
 #include "host/delivery/Delivery.h"
@@ -9,9 +9,8 @@
 #include "host/history/EntryRecorder.h"
 #include "host/http/Credentials.h"
 #include "host/http/HttpServer.h"
-#include "host/http/Resource.h"
 #include "host/http/Router.h"
-#include "host/metrics/ConfigMetrics.h"
+#include "host/metrics/MetricSources.h"
 #include "host/situations/SituationSet.h"
 #include "host/start/Descriptors.h"
 

@@ -23,35 +23,37 @@ constexpr long displayedPosixVersion = 199506;
 constexpr long displayedPathMax = 1024;
 constexpr const char* constantDisplayed = ">> constant displayed <<";
 
+enum class Source { CONSTANT, SYSCONF };
+
 /// One system limit: a constant or the value of a selector. Formats of constants take an int, the
 /// others a long and a text.
 struct Limit {
     const char* format;
-    enum Source { CONSTANT, SYSCONF } source;
+    Source source;
     int value; ///< the constant or the selector
 };
 
-constexpr Limit posixVersion{"\nPOSIX_VERSION\t\t= %ld\tPOSIX version. %s", Limit::SYSCONF,
+constexpr Limit posixVersion{"\nPOSIX_VERSION\t\t= %ld\tPOSIX version. %s", Source::SYSCONF,
                              _SC_VERSION};
 
 constexpr Limit systemLimits[] = {
-    {"\nCHAR_BIT\t\t= %d\tNo. of bits per char.", Limit::CONSTANT, 8},
-    {"\nINT_MAX\t\t\t= %d\tMax. value of int.", Limit::CONSTANT, 2147483647},
+    {"\nCHAR_BIT\t\t= %d\tNo. of bits per char.", Source::CONSTANT, 8},
+    {"\nINT_MAX\t\t\t= %d\tMax. value of int.", Source::CONSTANT, 2147483647},
     // The format shows the low half of the number.
-    {"\nLONG_MAX\t\t= %d\tMax. value of long.", Limit::CONSTANT,
+    {"\nLONG_MAX\t\t= %d\tMax. value of long.", Source::CONSTANT,
      static_cast<int>(9223372036854775807LL)},
-    {"\nTHREADS\t\t\t= %ld\tThread support provided. %s", Limit::SYSCONF, _SC_THREADS},
-    {"\nTHREAD_THREADS_MAX\t= %ld\tMax. no. threads per process. %s", Limit::SYSCONF,
+    {"\nTHREADS\t\t\t= %ld\tThread support provided. %s", Source::SYSCONF, _SC_THREADS},
+    {"\nTHREAD_THREADS_MAX\t= %ld\tMax. no. threads per process. %s", Source::SYSCONF,
      _SC_THREAD_THREADS_MAX},
-    {"\nSYS1_PTHREAD_DRAFT\t= %d\tPOSIX thread draft.", Limit::CONSTANT, 199506},
-    {"\nARG_MAX\t\t\t= %ld\tMax. length of args to exec(). %s", Limit::SYSCONF, _SC_ARG_MAX},
-    {"\nCHILD_MAX\t\t= %ld\tMax. no. processes per real uid. %s", Limit::SYSCONF, _SC_CHILD_MAX},
-    {"\nOPEN_MAX\t\t= %ld\tMax. no. open files per process. %s", Limit::SYSCONF, _SC_OPEN_MAX},
-    {"\nSTREAM_MAX\t\t= %ld\tMax. no. std. i/o streams per process. %s", Limit::SYSCONF,
+    {"\nSYS1_PTHREAD_DRAFT\t= %d\tPOSIX thread draft.", Source::CONSTANT, 199506},
+    {"\nARG_MAX\t\t\t= %ld\tMax. length of args to exec(). %s", Source::SYSCONF, _SC_ARG_MAX},
+    {"\nCHILD_MAX\t\t= %ld\tMax. no. processes per real uid. %s", Source::SYSCONF, _SC_CHILD_MAX},
+    {"\nOPEN_MAX\t\t= %ld\tMax. no. open files per process. %s", Source::SYSCONF, _SC_OPEN_MAX},
+    {"\nSTREAM_MAX\t\t= %ld\tMax. no. std. i/o streams per process. %s", Source::SYSCONF,
      _SC_STREAM_MAX},
-    {"\nSAVED_IDS\t\t= %ld\tImplementation support for saved set-id's. %s", Limit::SYSCONF,
+    {"\nSAVED_IDS\t\t= %ld\tImplementation support for saved set-id's. %s", Source::SYSCONF,
      _SC_SAVED_IDS},
-    {"\nCLK_TCK\t\t\t= %ld\tNo. of clock ticks per second. %s", Limit::SYSCONF, _SC_CLK_TCK},
+    {"\nCLK_TCK\t\t\t= %ld\tNo. of clock ticks per second. %s", Source::SYSCONF, _SC_CLK_TCK},
 };
 
 /// One limit of the current directory's file system.
@@ -93,7 +95,7 @@ void printSystemLimits(const TraceScope& trace) {
         trace.always()(posixVersion.format, displayedPosixVersion, constantDisplayed);
     }
     for (const Limit& limit : systemLimits) {
-        if (limit.source == Limit::CONSTANT) {
+        if (limit.source == Source::CONSTANT) {
             trace.always()(limit.format, limit.value);
         } else {
             printSysconfLimit(limit.format, limit.value);

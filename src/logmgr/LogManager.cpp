@@ -203,7 +203,7 @@ void LogManager::shutdown() {
     DebugLog.reset();
     discardValidLogs();
     if (FirstLogObject != nullptr) {
-        deleteNextLog(FirstLogObject, 1);
+        deleteLogs();
     }
     if (DebugLogP != nullptr) {
         closeDebugLog();

@@ -52,8 +52,6 @@ public:
         return lastModified == ConfigFileLastChanged.load();
     }
     std::uint32_t numLogs() const noexcept { return NumLogs.load(); }
-    /// The open debug log, or null. It stays open as long as any log exists. Any thread.
-    std::FILE* debugLogStream() const noexcept { return DebugLogP.load(); }
 
     /// Writes one record with all fields, whatever the trace level. Any thread.
     void printSelf() const;
@@ -98,9 +96,8 @@ private:
     /// Ends the monitoring of the logs taken off the chain. Runs without the lock, because a thread
     /// needs up to a second to end and requests need the lock in the meantime.
     void deleteRetiredLogs();
-    /// Deletes the chain from its tail up to `log`, its member number `depth`. The manager passes
-    /// the head and 1.
-    void deleteNextLog(LogFile* log, unsigned depth);
+    /// Deletes the chain from its tail to its head.
+    void deleteLogs();
     void deleteLogObject(LogFile* log);
     /// Takes the log off the chain. Does not wait.
     void retireLogObject(LogFile* log);

@@ -183,29 +183,26 @@ void LogManager::discardValidLogs() {
     delete first;
 }
 
-void LogManager::deleteNextLog(LogFile* log, unsigned depth) {
+void LogManager::deleteLogs() {
     TraceScope trace(anchor);
-    // First find and count down to the tail, then delete.
-    const unsigned firstDepth = depth;
-    for (; depth <= NumLogs && log->next() != FirstLogObject; ++depth) {
-        log = log->next();
+    LogFile* tail = FirstLogObject;
+    std::uint32_t count = 1;
+    for (; count <= NumLogs && tail->next() != FirstLogObject; ++count) {
+        tail = tail->next();
     }
-    if (depth > NumLogs) {
+    if (count != NumLogs) {
         trace.error()("Log object chain corrupted. Expected number of logs = %d; actual number = "
                       "%d. Agent is terminating.",
-                      static_cast<int>(NumLogs.load()), static_cast<int>(depth));
+                      static_cast<int>(NumLogs.load()), static_cast<int>(count));
         std::exit(-1);
     }
-    if (depth == NumLogs) {
-        // Ask all of them before waiting for the first: together they take as long as one.
-        for (LogFile* member = log;; member = static_cast<LogFile*>(member->prev())) {
-            member->askToStop();
-            if (member == FirstLogObject) {
-                break;
-            }
-        }
+    // Ask all of them before waiting for the first: together they take as long as one.
+    LogFile* log = tail;
+    for (std::uint32_t left = count; left > 0; --left) {
+        log->askToStop();
+        log = static_cast<LogFile*>(log->prev());
     }
-    for (; depth >= firstDepth; --depth) {
+    for (log = tail; count > 0; --count) {
         auto* const previous = static_cast<LogFile*>(log->prev());
         deleteLogObject(log);
         log = previous;

@@ -4,11 +4,11 @@
 #include "base/TraceScope.h"
 #include "framework/agent_calls.h"
 #include "logmgr/LogManager.h"
-#include "logmgr/ManagerCancellation.h"
 #include "logs/LogManagerUtil.h"
 
 #include <cstdlib>
 
+#include <pthread.h>
 #include <signal.h>
 #include <time.h>
 #include <unistd.h>
@@ -43,6 +43,26 @@ void report(const TraceScope& trace, int code, const char* failure, const char* 
         trace.detail(line)("%s", success);
     }
 }
+
+/// Allows cancellation of the manager thread while the object lives, around calls in which the
+/// thread waits. Cancellation is disabled everywhere else: it would leak files, locks and
+/// half-built chains, and it cannot unwind through the noexcept calls of the trace.
+class ManagerCancellation {
+public:
+    ManagerCancellation() { set(PTHREAD_CANCEL_ENABLE); }
+    ~ManagerCancellation() { forbid(); }
+    ManagerCancellation(const ManagerCancellation&) = delete;
+    ManagerCancellation& operator=(const ManagerCancellation&) = delete;
+
+    /// Disables cancellation of the calling thread. Called at the thread's start.
+    static void forbid() { set(PTHREAD_CANCEL_DISABLE); }
+
+private:
+    static void set(int state) {
+        int previous = 0;
+        pthread_setcancelstate(state, &previous);
+    }
+};
 
 void unlockMutex(void* mutex) {
     pthread_mutex_unlock(static_cast<pthread_mutex_t*>(mutex));

@@ -24,14 +24,12 @@ constexpr std::string_view logTypes = "SEAU";
 constexpr std::string_view typesWithProcedure = "EU";
 constexpr std::string_view nameToken = "${@}"; ///< replaced with the log's name in a procedure
 
-/// The fields of a configuration line, numbered from 1.
-enum Field : int {
-    FIELD_FILE_NAME = 1,
-    FIELD_DEBUG_MODE,
-    FIELD_TYPE,
-    FIELD_PROCEDURE,
-    FIELD_MAX = FIELD_PROCEDURE,
-};
+// The fields of a configuration line by number.
+constexpr int fileNameField = 1;
+constexpr int debugModeField = 2;
+constexpr int typeField = 3;
+constexpr int procedureField = 4;
+constexpr int fieldCount = 4;
 
 char upperCase(char letter) {
     return static_cast<char>(std::toupper(static_cast<unsigned char>(letter)));
@@ -123,13 +121,13 @@ void ValidLog::extractTokens(char* line) {
     TraceScope trace(anchor);
     Tokens tokens(line);
     char* token = nullptr;
-    for (int field = FIELD_FILE_NAME; Valid && (token = tokens.next()) != nullptr; ++field) {
+    for (int field = fileNameField; Valid && (token = tokens.next()) != nullptr; ++field) {
         if (!hasSeparatorAsNeeded(trace, field, token)) {
             Valid = false;
-        } else if (field == FIELD_FILE_NAME) {
+        } else if (field == fileNameField) {
             takeFileName(trace, token);
         } else if (token[1] != '\0') { // else the field keeps its default
-            if (field == FIELD_PROCEDURE) {
+            if (field == procedureField) {
                 tokens.takeRest();
             }
             takeField(trace, field, token + 1);
@@ -142,7 +140,7 @@ void ValidLog::extractTokens(char* line) {
 /// True if the token begins with ';' exactly where it must.
 bool ValidLog::hasSeparatorAsNeeded(const TraceScope& trace, int field, const char* token) const {
     const bool isSeparated = *token == ';';
-    if (field == FIELD_FILE_NAME) {
+    if (field == fileNameField) {
         if (isSeparated) {
             trace.error()("File name cannot be defaulted. Skipping rest of line.");
         }
@@ -160,19 +158,19 @@ bool ValidLog::hasSeparatorAsNeeded(const TraceScope& trace, int field, const ch
 
 void ValidLog::takeField(const TraceScope& trace, int field, const char* token) {
     switch (field) {
-    case FIELD_DEBUG_MODE:
+    case debugModeField:
         LogDebugMode.store(upperCase(*token) == 'Y' ? 'Y' : 'N', std::memory_order_relaxed);
         break;
-    case FIELD_TYPE:
+    case typeField:
         takeType(trace, token);
         break;
-    case FIELD_PROCEDURE:
+    case procedureField:
         takeProcedure(trace, token);
         break;
     default:
         trace.error()("Field %d for log %s is out of bounds. Maximum number of fields is %d. "
                       "Value of %s is ignored",
-                      field, fileNameLocal(), static_cast<int>(FIELD_MAX), token);
+                      field, fileNameLocal(), fieldCount, token);
         break;
     }
 }

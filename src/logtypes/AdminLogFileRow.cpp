@@ -80,10 +80,10 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
     TraceScope trace(anchor);
     utmp entry;
     std::memcpy(&entry, record, sizeof entry);
-    auto& columns = *static_cast<zrm_rmlogent_data_t*>(row);
-    prepareRow(&columns);
+    EntryRow entryRow(*this, row);
+    auto& columns = entryRow.columns();
 
-    if (row == ownRow()) {
+    if (entryRow.isOwn()) {
         m_quarterHour.generateTimestamp(entry.ut_time, columns.entrytime);
     } else {
         BrevanTime::generateTimestamp(entry.ut_time, columns.entrytime);
@@ -98,7 +98,7 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
         description.write(columns.entrydesc, sizeof columns.entrydesc, false);
     const std::int32_t lengthInUTF8 =
         description.write(columns.uentrydesc, sizeof columns.uentrydesc, true);
-    noteDescriptions(&columns, static_cast<std::size_t>(length), lengthInUTF8);
+    entryRow.setDescriptionLengths(static_cast<std::size_t>(length), lengthInUTF8);
     return trace.result(0L);
 }
 

@@ -3,6 +3,18 @@
 
 namespace zrm {
 
+/// The texts of one entry's time fields, terminated. A field missing from the entry is empty.
+struct _EntryTimeBuffers {
+    static constexpr int room = 7; ///< characters per field
+
+    char year[room + 1];
+    char month[room + 1];
+    char day[room + 1];
+    char hour[room + 1];
+    char minute[room + 1];
+    char second[room + 1];
+};
+
 /// The known parts of a user log entry's time.
 struct EntryTime {
     static constexpr long unknown = -1;

@@ -7,7 +7,6 @@
 #include "framework/locale.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
-#include "logtypes/SyslogBufferInfo.h"
 
 #include <algorithm>
 #include <array>
@@ -170,10 +169,10 @@ void SysLogFile::processLogData() {
 
 long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     TraceScope trace(anchor);
-    auto& entry = *static_cast<zrm_rmlogent_data_t*>(row);
+    EntryRow entryRow(*this, row);
+    auto& entry = entryRow.columns();
     char* const columns = static_cast<char*>(row); // host and source may overrun their columns
     const char* const limit = columns + sizeof entry;
-    prepareRow(&entry);
     char* text = formatEntryTime(entry.entrytime, line, reportState);
     if (text == nullptr) {
         return trace.result(-1L);
@@ -192,9 +191,9 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     const std::int32_t lengthInUTF8 = UTF8Conv::Convert_toUTF8(
         entry.uentrydesc, sizeof entry.uentrydesc, text, length, LOC2_NO_TERMINATOR);
     if (text - line <= shortHeader) {
-        noteDescriptions(&entry, length, lengthInUTF8);
+        entryRow.setDescriptionLengths(length, lengthInUTF8);
     } else if (text - line > longestHeader) {
-        repairRow(&entry);
+        entryRow.restoreCommonColumns();
     }
     return trace.result(0L);
 }

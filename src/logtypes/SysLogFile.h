@@ -3,9 +3,17 @@
 
 #include "monitor/LogFile.h"
 
+#include <memory>
+
 namespace zrm {
 
-struct SyslogBufferInfo;
+/// The state of one report on a syslog file.
+struct SyslogBufferInfo : _LogBufferInfo {
+    /// ENTRYTIME of the last formatted entry, initially the time at which the report started.
+    /// Determines the year of the entries before it.
+    char timestamp[16];
+    std::unique_ptr<char[]> block; ///< owns what pBuffer points to
+};
 
 /// A file written by the system logger: lines with month, day, time, host, source and message, in
 /// this order and without a year. Monitoring starts on construction. Threads as in LogFile.

@@ -3,7 +3,6 @@
 #include "base/BrevanTime.h"
 #include "base/TraceScope.h"
 #include "logs/RequestThresholds.h"
-#include "logtypes/SyslogBufferInfo.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>

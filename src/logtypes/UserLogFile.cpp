@@ -1,12 +1,13 @@
 #include "logtypes/UserLogFile.h"
 
 #include "base/ErrorText.h"
+#include "base/LockGuard.h"
 #include "base/TraceScope.h"
 #include "base/UTF8Conv.h"
 #include "framework/locale.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
-#include "logtypes/EntryTimeBuffers.h"
+#include "logtypes/EntryTime.h"
 #include "parser/StringParser.h"
 
 #include <cerrno>
@@ -24,17 +25,6 @@ TRC1_Anchor anchor{"UserLogFile.cpp"};
 constexpr _KeywordFields validFields[] = {
     {"year", 2},   {"month", 2},  {"day", 2},  {"hour", 2},  {"minute", 2},      {"second", 2},
     {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2}, {"description", 2}, {nullptr, 0},
-};
-
-class ChainGuard {
-public:
-    explicit ChainGuard(SYS1_Lock& lock) : m_lock(lock) { SYS1_GetLock(&m_lock); }
-    ~ChainGuard() { SYS1_ReleaseLock(&m_lock); }
-    ChainGuard(const ChainGuard&) = delete;
-    ChainGuard& operator=(const ChainGuard&) = delete;
-
-private:
-    SYS1_Lock& m_lock;
 };
 
 } // namespace
@@ -59,7 +49,7 @@ UserLogFile::~UserLogFile() {
 void UserLogFile::printSelf() const {
     TraceScope trace(anchor);
     LogFile::printSelf();
-    const ChainGuard guard(m_chainLock);
+    const LockGuard guard(&m_chainLock);
     trace.always()("\n\tSPAnchor\t\t= %p\n\tNumericMonth\t\t= %d\n",
                    static_cast<const void*>(SPAnchor.get()), NumericMonth ? 1 : 0);
 }
@@ -84,7 +74,7 @@ const _KeywordFields* UserLogFile::fields() noexcept {
 }
 
 bool UserLogFile::hasFormat() const {
-    const ChainGuard guard(m_chainLock);
+    const LockGuard guard(&m_chainLock);
     return SPAnchor != nullptr;
 }
 
@@ -108,14 +98,13 @@ void UserLogFile::learnFormat() {
         setMonitorStatus(MONITOR_ERR_FORMAT);
         return;
     }
-    const ChainGuard guard(m_chainLock);
+    const LockGuard guard(&m_chainLock);
     SPAnchor = std::move(format);
 }
 
 long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     TraceScope trace(anchor);
-    auto* const columns = static_cast<zrm_rmlogent_data_t*>(row);
-    prepareRow(columns);
+    EntryRow columns(*this, row);
     _EntryTimeBuffers times{};
     _FormatBuffer buffers[] = {
         {times.year, _EntryTimeBuffers::room},
@@ -132,10 +121,10 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     };
     static_assert(std::size(buffers) == std::size(validFields) - 1);
     {
-        const ChainGuard guard(m_chainLock);
+        const LockGuard guard(&m_chainLock);
         if (!SPAnchor || SPAnchor->formatLine(line, buffers) < 1 ||
             formatEntryTime(columns->entrytime, &times, reportContext) != 0) {
-            dropRow(columns);
+            columns.reject();
             return trace.result(-1L);
         }
     }
@@ -145,8 +134,8 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
         UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
                                  columns->entrydesc, sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
     const _FormatBuffer& description = *(std::end(buffers) - 1);
-    noteDescriptions(columns, static_cast<std::size_t>(description.position - columns->entrydesc),
-                     lengthInUTF8);
+    columns.setDescriptionLengths(
+        static_cast<std::size_t>(description.position - columns->entrydesc), lengthInUTF8);
     return trace.result(0L);
 }
 

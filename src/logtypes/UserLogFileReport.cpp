@@ -5,7 +5,6 @@
 #include "logs/RequestThresholds.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/EntryTime.h"
-#include "logtypes/UserlogBufferInfo.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>

@@ -3,8 +3,6 @@
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "logtypes/EntryTime.h"
-#include "logtypes/EntryTimeBuffers.h"
-#include "logtypes/UserlogBufferInfo.h"
 
 #include <cerrno>
 #include <cstring>

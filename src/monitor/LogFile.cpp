@@ -3,7 +3,6 @@
 #include "base/BrevanTime.h"
 #include "base/ErrorText.h"
 #include "base/ProcessValues.h"
-#include "base/RowBytes.h"
 #include "base/TraceScope.h"
 #include "logs/LogManagerUtil.h"
 #include "logs/ValidLog.h"
@@ -226,62 +225,12 @@ void LogFile::fillCommonColumns(zrm_rmlogent_data_t* row) const {
 }
 
 /// The common columns that vary between a log's rows or that the table writes.
-void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) const {
+void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) {
     row->freqthresh = 0;
     row->periodthrs = 0;
     row->sampleno = 0;
     row->rowno = 0;
     BrevanTime::generateCurrentTimestamp(row->timestamp);
-}
-
-void LogFile::prepareRow(zrm_rmlogent_data_t* row) {
-    TraceScope trace(anchor);
-    char* const columns = reinterpret_cast<char*>(row);
-    // While the flow class is traced, fillCommonColumns must run for each row.
-    if (row == &m_row && m_isRowPrepared && !trace.isOn(TRC1_FLOW)) {
-        constexpr std::size_t entry = offsetof(zrm_rmlogent_data_t, entrytime);
-        constexpr std::size_t description = offsetof(zrm_rmlogent_data_t, entrydesc);
-        constexpr std::size_t entryInUTF8 = offsetof(zrm_rmlogent_data_t, uentrysrc);
-        constexpr std::size_t descriptionInUTF8 = offsetof(zrm_rmlogent_data_t, uentrydesc);
-        RowBytes::blank(columns + entry, description - entry + m_descriptionLength);
-        RowBytes::blank(columns + entryInUTF8,
-                        descriptionInUTF8 - entryInUTF8 + m_descriptionLengthInUTF8);
-        fillChangingColumns(row);
-    } else {
-        RowBytes::blank(columns, sizeof *row);
-        fillCommonColumns(row);
-    }
-    if (row == &m_row) {
-        m_isRowPrepared = true;
-        m_descriptionLength = sizeof row->entrydesc;
-        m_descriptionLengthInUTF8 = sizeof row->uentrydesc;
-    }
-}
-
-void LogFile::noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t length,
-                               std::int32_t lengthInUTF8) noexcept {
-    if (row == &m_row) {
-        m_descriptionLength = std::min(length, sizeof row->entrydesc);
-        // A negative length becomes huge, so the whole column counts.
-        m_descriptionLengthInUTF8 =
-            std::min(static_cast<std::size_t>(lengthInUTF8), sizeof row->uentrydesc);
-    }
-}
-
-void LogFile::repairRow(zrm_rmlogent_data_t* row) {
-    TraceScope trace(anchor);
-    fillCommonColumns(row);
-    if (row == &m_row) {
-        m_isRowPrepared = false; // the overrun left text where the next row must be blank
-    }
-}
-
-void LogFile::dropRow(zrm_rmlogent_data_t* row) {
-    TraceScope trace(anchor);
-    RowBytes::blank(reinterpret_cast<char*>(row), sizeof *row);
-    if (row == &m_row) {
-        m_isRowPrepared = false;
-    }
 }
 
 void LogFile::printSelf() const {
@@ -296,7 +245,7 @@ void LogFile::printSelf() const {
         "\n\tMonitorStartStopTime\t= %.*s\n\tNumEvents\t\t= %d\n\tNumFormatErrors\t\t= %d"
         "\n\tOptimumBlockSize\t= %ld\n\tDebugFileLock\t\t= %s\n",
         static_cast<int>(RefreshMode), LogManagerUtil::handleDump, LogManagerUtil::handleDump,
-        static_cast<void*>(LogFileP.load()), LogFD.load(), static_cast<long>(LogEOF.load()),
+        static_cast<const void*>(LogFileP.load()), LogFD.load(), static_cast<long>(LogEOF.load()),
         static_cast<int>(monitorStatus()), 24, changedText, static_cast<int>(numEvents()),
         static_cast<int>(numFormatErrors()), static_cast<long>(OptimumBlockSize.load()),
         LogManagerUtil::handleDump);

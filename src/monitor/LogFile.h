@@ -4,8 +4,8 @@
 #include "framework/Pulse.h"
 #include "logs/LogBase.h"
 #include "logs/zrm_rmlogent_data.h"
+#include "monitor/EntryRow.h"
 #include "monitor/LineReader.h"
-#include "monitor/LogBufferInfo.h"
 #include "monitor/LogLedger.h"
 #include "monitor/MonitorStatus.h"
 #include "monitor/ReadGuard.h"
@@ -23,6 +23,20 @@ namespace zrm {
 
 class ValidLog;
 
+/// The state of one report that reads a log backwards, block by block. Owned by the log type's
+/// report state. The descriptor is positioned at the start of the last block read (right after
+/// opening, at the end of the file).
+struct _LogBufferInfo {
+    char* pBuffer;            ///< the block, owned by the log type
+    std::int64_t bytesLeft;   ///< unread bytes before the block
+    std::int64_t bufferCount; ///< after a fill, the bytes read; before the next fill, the bytes at
+                              ///< the start of the block not yet consumed, which are pushed back
+    std::int32_t fd;          ///< the report's descriptor; -1: none
+    /// Capacity of pBuffer in bytes, without the terminator; 0: the log's OptimumBlockSize. Another
+    /// report may change OptimumBlockSize while this one reads.
+    std::int64_t blockSize = 0;
+};
+
 /// A monitored log with its own thread, which follows the file and turns new entries into Log
 /// Entries rows. Reports read the log backwards on the threads of their requests. The log manager's
 /// thread constructs, reconfigures and destroys it. Log types derive from this class; their
@@ -39,6 +53,8 @@ public:
     /// Sets the open debug log of all logs, or null. The stream must stay open as long as any log
     /// that may write to it exists.
     static void setDebugLog(std::FILE* stream) noexcept;
+    /// Number of records since the start that the debug log did not take whole. Any thread.
+    static std::uint64_t incompleteDebugRecords() noexcept;
 
     /// Copies the configuration line and joins the chain of logs after `chainHead` (null: none).
     LogFile(const ValidLog& log, LogFile* chainHead);
@@ -59,7 +75,7 @@ public:
     virtual void* startReportRequest(void* thresholds) = 0;
     /// Fills one row from one entry, which is a terminated line or a record. `context` is the
     /// report's state, or null while monitoring. Returns 0 if the row is built, non-zero if the
-    /// entry is rejected. Writes every byte of the row, which may still hold the previous entry.
+    /// entry is rejected. Writes every byte of the row, whatever it holds (see EntryRow).
     virtual long formatEntryAsRow(char* entry, void* row, void* context) = 0;
     /// The body of the monitoring thread: open, seek to the end, loop, close.
     virtual void processLogData() = 0;
@@ -113,19 +129,7 @@ protected:
     /// Fills the columns common to all kinds of logs, in a row whose common columns are blank.
     void fillCommonColumns(zrm_rmlogent_data_t* row) const;
     /// The row in which the log's thread offers its entries.
-    zrm_rmlogent_data_t* ownRow() noexcept { return &m_row; }
-    /// Blanks `row` except for the common columns. This is cheaper for the log's own row, which
-    /// keeps its common columns from the previous line.
-    void prepareRow(zrm_rmlogent_data_t* row);
-    /// Records the lengths of ENTRYDESC and UENTRYDESC in a built row in which no text overran its
-    /// column. Only that many characters are then blanked for the next entry. Without this call,
-    /// the columns are blanked to their ends.
-    void noteDescriptions(const zrm_rmlogent_data_t* row, std::size_t length,
-                          std::int32_t lengthInUTF8) noexcept;
-    /// Restores the common columns of a prepared row that a field has overrun.
-    void repairRow(zrm_rmlogent_data_t* row);
-    /// Blanks all of a prepared row because its entry was rejected.
-    void dropRow(zrm_rmlogent_data_t* row);
+    zrm_rmlogent_data_t* ownRow() noexcept { return m_ownRow.columns(); }
 
     // The debug log, shared by all logs.
     static void lockDebugFile(const char* who);
@@ -141,7 +145,8 @@ protected:
 
     bool RefreshMode = false;
     // The thread owns the open file and the counters. A dump may read them on another thread.
-    std::atomic<std::FILE*> LogFileP{nullptr};
+    /// What reads the lines of the open log; null while it is closed, and in logs of records.
+    std::atomic<LineReader*> LogFileP{nullptr};
     std::atomic<_MonitorStatus> MonitorStatus{MONITOR_NOT_STARTED};
     std::atomic<std::int64_t> LogEOF{-1};
     pthread_t LogThread{};
@@ -159,9 +164,10 @@ protected:
 
 private:
     friend void* logThread(void* logFile);
+    friend class EntryRow;
 
     void initializeLock();
-    void fillChangingColumns(zrm_rmlogent_data_t* row) const;
+    static void fillChangingColumns(zrm_rmlogent_data_t* row);
     bool checkForChange();
     bool readGrowth();
     void noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind);
@@ -181,10 +187,7 @@ private:
     std::chrono::steady_clock::time_point m_end{}; ///< when a log that has to end stops reading
     LineReader m_lineReader;
     ReadGuard m_guard;
-    zrm_rmlogent_data_t m_row{};
-    bool m_isRowPrepared = false;        ///< the common columns of m_row are filled
-    std::size_t m_descriptionLength = 0; ///< characters of m_row's ENTRYDESC that may not be blank
-    std::size_t m_descriptionLengthInUTF8 = 0; ///< the same for its UENTRYDESC
+    OwnRow m_ownRow;
 };
 
 /// The monitoring thread's start routine; its argument is the LogFile.

@@ -2,7 +2,6 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
-#include "monitor/DebugLogLoss.h"
 
 #include <atomic>
 #include <cerrno>
@@ -41,7 +40,7 @@ Piece writePiece(std::FILE* stream, const void* data, unsigned long length) {
 
 } // namespace
 
-std::uint64_t DebugLogLoss::records() noexcept {
+std::uint64_t LogFile::incompleteDebugRecords() noexcept {
     return incompleteRecords.load(std::memory_order_relaxed);
 }
 

@@ -40,18 +40,15 @@ void LogFile::openLogAndSeek() {
         fd = -1;
         errno = EMFILE;
     }
-    LogFileP = fd < 0 ? nullptr : fdopen(fd, "r");
-    if (LogFileP == nullptr) {
+    if (fd < 0) {
         const ErrorText error(errno);
         DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s.  errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
-        if (fd >= 0) {
-            close(fd);
-        }
         setMonitorStatus(MONITOR_ERR_OPEN);
         return;
     }
+    LogFileP = &m_lineReader;
     LogFD = fd;
     noteOpenFile();
     LogEOF = lseek(LogFD, 0, SEEK_END);
@@ -80,7 +77,7 @@ void LogFile::noteOpenFile() {
 
 void LogFile::closeLog() {
     TraceScope trace(anchor);
-    std::fclose(LogFileP);
+    close(LogFD);
     m_ledger.noteFile(std::nullopt);
     LogFileP = nullptr;
     LogFD = -1;
@@ -228,16 +225,17 @@ void LogFile::passOverRest() {
 
 long LogFile::readLog() {
     TraceScope trace(anchor);
+    zrm_rmlogent_data_t* const row = ownRow();
     m_lineReader.start(LogFD);
     while (char* const line = m_lineReader.next()) {
         if (isReadingOver()) {
             return trace.result(0L);
         }
         count(NumEvents);
-        const bool isRow = formatEntryAsRow(line, &m_row, nullptr) == 0;
+        const bool isRow = formatEntryAsRow(line, row, nullptr) == 0;
         if (isRow) {
-            m_ledger.noteTime(m_row.entrytime[0]);
-            if (!offer(&m_row)) {
+            m_ledger.noteTime(row->entrytime[0]);
+            if (!offer(row)) {
                 passOverRest();
                 return trace.result(0L);
             }
@@ -246,8 +244,8 @@ long LogFile::readLog() {
             m_ledger.noteRejected(line);
         }
         if (std::FILE* const debugLog = debugLogStream()) {
-            writeRecord(debugLog, line, std::strlen(line), isRow ? &m_row : nullptr,
-                        isRow ? sizeof m_row : 0);
+            writeRecord(debugLog, line, std::strlen(line), isRow ? row : nullptr,
+                        isRow ? sizeof *row : 0);
         } else {
             traceEntry();
         }

@@ -80,6 +80,10 @@ inline constexpr unsigned defaultTextSize = 31;  ///< maximum characters in a te
 inline constexpr std::string_view defaultTextWidth = "31";
 inline constexpr std::string_view consumedCount = "%n"; ///< ends each scan directive
 
+/// The character as an index.
+constexpr unsigned char byteOf(char character) noexcept {
+    return static_cast<unsigned char>(character);
+}
 /// White space as defined by the C library's scanner in the "C" locale.
 constexpr bool isWhiteSpace(char character) noexcept {
     return character == ' ' || (character >= '\t' && character <= '\r');

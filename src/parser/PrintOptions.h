@@ -5,15 +5,13 @@
 
 namespace zrm {
 
-/// The options of print directives, as bits of a set.
-enum PrintOptionFlag : unsigned {
-    OPTION_GROUPING = 1,
-    OPTION_LEFT = 2,
-    OPTION_SIGN = 4,
-    OPTION_BLANK = 8,
-    OPTION_ALTERNATE = 16,
-    OPTION_ZERO = 32,
-};
+// The options of print directives, as bits of a set.
+inline constexpr unsigned groupingFlag = 1;
+inline constexpr unsigned leftFlag = 2;
+inline constexpr unsigned signFlag = 4;
+inline constexpr unsigned blankFlag = 8;
+inline constexpr unsigned alternateFlag = 16;
+inline constexpr unsigned zeroFlag = 32;
 
 /// The scan data types that an option applies to.
 enum class OptionTypes { ALL, SIGNED, GROUPED, NUMBERS };
@@ -46,12 +44,12 @@ struct PrintOption {
 };
 
 inline constexpr PrintOption printOptions[] = {
-    {' ', OPTION_BLANK, OptionTypes::SIGNED, OptionRefusal::OPTION, OPTION_SIGN, true},
-    {'#', OPTION_ALTERNATE, OptionTypes::NUMBERS, OptionRefusal::OPTION, 0, false},
-    {'\'', OPTION_GROUPING, OptionTypes::GROUPED, OptionRefusal::THOUSANDS, 0, false},
-    {'-', OPTION_LEFT, OptionTypes::ALL, OptionRefusal::OPTION, OPTION_ZERO, false},
-    {'0', OPTION_ZERO, OptionTypes::NUMBERS, OptionRefusal::ZERO, OPTION_LEFT, true},
-    {'+', OPTION_SIGN, OptionTypes::SIGNED, OptionRefusal::OPTION, OPTION_BLANK, false},
+    {' ', blankFlag, OptionTypes::SIGNED, OptionRefusal::OPTION, signFlag, true},
+    {'#', alternateFlag, OptionTypes::NUMBERS, OptionRefusal::OPTION, 0, false},
+    {'\'', groupingFlag, OptionTypes::GROUPED, OptionRefusal::THOUSANDS, 0, false},
+    {'-', leftFlag, OptionTypes::ALL, OptionRefusal::OPTION, zeroFlag, false},
+    {'0', zeroFlag, OptionTypes::NUMBERS, OptionRefusal::ZERO, leftFlag, true},
+    {'+', signFlag, OptionTypes::SIGNED, OptionRefusal::OPTION, blankFlag, false},
 };
 
 } // namespace zrm

@@ -2,11 +2,33 @@
 #define ZRM_PRINT_PROGRAM_H
 
 #include "parser/DataType.h"
-#include "parser/FormatBuffer.h"
 
 #include <cstddef>
+#include <cstring>
 
 namespace zrm {
+
+/// The buffer for the texts of one keyword's fields, written one after the other without
+/// terminators. The caller sets it up before each line.
+struct _FormatBuffer {
+    char* position; ///< where the next text goes
+    long room;      ///< characters still free
+
+    /// Writes as much of the text as fits.
+    void append(const char* text, std::size_t length) noexcept {
+        if (room > 0 && length > 0) {
+            const std::size_t written =
+                length < static_cast<std::size_t>(room) ? length : static_cast<std::size_t>(room);
+            std::memcpy(position, text, written);
+            advance(written);
+        }
+    }
+    /// Skips `length` characters already written at the position. They must fit in the room.
+    void advance(std::size_t length) noexcept {
+        position += length;
+        room -= static_cast<long>(length);
+    }
+};
 
 /// A print directive compiled for values of one data type. It writes what snprintf would write but
 /// does not use it for common directives: constant text, plain texts and characters, and decimal

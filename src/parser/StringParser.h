@@ -3,8 +3,6 @@
 
 #include "parser/BuildArea.h"
 #include "parser/DataType.h"
-#include "parser/FormatBuffer.h"
-#include "parser/KeywordFields.h"
 #include "parser/PrintProgram.h"
 #include "parser/ScanProgram.h"
 
@@ -14,6 +12,15 @@
 namespace zrm {
 
 struct PrintOption;
+
+/// A name that a format may give its fields. A table of names holds at most maxKeywords entries and
+/// ends with an entry whose minimum is 0. The index of an entry is the field's print index.
+struct _KeywordFields {
+    static constexpr int maxKeywords = 100;
+
+    const char* keyword;
+    int minimum; ///< minimum number of leading characters to specify
+};
 
 /// How far a node of a format's chain, or the whole format, was learned.
 enum _ObjectStatus : int {

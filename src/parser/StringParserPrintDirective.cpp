@@ -110,7 +110,7 @@ bool StringParser::isPrintOptionKept(const PrintOption& option, unsigned given,
     if ((meetsRival && option.isYielding) || isRepeated) {
         return trace.result(false);
     }
-    if (option.flag == OPTION_GROUPING && trace.isOn(TRC1_FINE)) {
+    if (option.flag == groupingFlag && trace.isOn(TRC1_FINE)) {
         const char separator = *nl_langinfo(THOUSEP);
         // A locale without grouping has no separator. A blank keeps the record complete.
         trace.fine()("Integer \"thousands_sep\" is '%c'.", separator != '\0' ? separator : ' ');
@@ -142,11 +142,11 @@ void StringParser::warnOfRefusedOption(const PrintOption& option, const char* te
 
 void StringParser::warnOfRivalOption(const PrintOption& option) const {
     TraceScope trace(anchor);
-    if (option.flag == OPTION_BLANK) {
+    if (option.flag == blankFlag) {
         trace.detail()(
             "Warning: '%c' option overrides '%c' option in print directive for field %s.", '+', ' ',
             FieldName);
-    } else if (option.flag == OPTION_SIGN) {
+    } else if (option.flag == signFlag) {
         trace.detail()("Warning: '%c' option overrides '%c'option in print directive for field %s.",
                        '+', ' ', FieldName);
     } else {

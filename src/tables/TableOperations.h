@@ -1,12 +1,12 @@
 #ifndef ZRM_TABLE_OPERATIONS_H
 #define ZRM_TABLE_OPERATIONS_H
 
+#include "base/LockGuard.h"
+#include "framework/LinkedList.h"
 #include "framework/TableManager.h"
 #include "framework/ctreq.h"
 #include "framework/values.h"
-#include "tables/CtreqListIter.h"
 #include "tables/TableDescription.h"
-#include "tables/TableLock.h"
 
 #include <atomic>
 #include <new>
@@ -14,6 +14,12 @@
 namespace zrm {
 
 // The common operations of both tables' managers.
+
+/// Walks a table manager's open requests. Use it only while holding the manager's lock.
+class CtreqListIter : public LinkedListIter {
+public:
+    using LinkedListIter::LinkedListIter;
+};
 
 /// Creates the table's manager, stores it in `singleton` for the rest of the process and registers
 /// it. Returns tableNoManager if memory runs out, else the framework's status.
@@ -63,7 +69,7 @@ unsigned offerRowsTo(LinkedList& requests, Row* rows, int count) {
 /// time.
 template <typename RowHolder, typename Row>
 unsigned offerRows(TableManager& manager, Row* rows, int count) {
-    const TableLock lock(manager);
+    const LockGuard lock(manager.lock());
     return offerRowsTo<RowHolder>(manager.requests(), rows, count);
 }
 

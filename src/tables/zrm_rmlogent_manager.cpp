@@ -39,7 +39,7 @@ unsigned zrm_rmlogent_manager::EventArrived(zrm_rmlogent_data_t* rows, int count
 
 unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int count) {
     TraceScope trace(anchor);
-    const TableLock lock(*this);
+    const LockGuard guard(lock());
     // Checked under the lock, so that at most one row's events exceed the room.
     if (!EventRoom::mayOffer()) {
         return trace.result(tableNoRoom);

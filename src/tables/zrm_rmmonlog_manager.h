@@ -2,9 +2,10 @@
 #define ZRM_RMMONLOG_MANAGER_H
 
 #include "framework/TableManager.h"
-#include "tables/zrm_rmmonlog_data.h"
 
 namespace zrm {
+
+struct zrm_rmmonlog_data_t;
 
 /// Manager of the Monitored Logs table: creates its request objects. One per process, never
 /// destroyed.

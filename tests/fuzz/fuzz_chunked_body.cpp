@@ -39,7 +39,7 @@ Outcome read(std::string_view bytes, std::size_t piece) {
     }
     Outcome outcome;
     outcome.isDone = parser.isDone();
-    outcome.isRefused = parser.bodyProblem().has_value();
+    outcome.isRefused = parser.bodyRefusal().has_value();
     outcome.body = outcome.isDone ? parser.takeBody() : "";
     return outcome;
 }

@@ -2,7 +2,6 @@
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/UserLogFile.h"
-#include "logtypes/UserlogBufferInfo.h"
 
 #include <cstdint>
 #include <cstdlib>

@@ -1,4 +1,4 @@
-#include "host/api/ReportRequest.h"
+#include "host/api/ReportResource.h"
 #include "host/http/RequestRefused.h"
 
 #include <cstdint>
@@ -18,7 +18,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
             std::abort();
         }
     } catch (const RequestRefused& refused) {
-        if (refused.problem().status != 400 || refused.problem().detail.empty() ||
+        if (refused.refusal().status != 400 || refused.problem().what.empty() ||
             refused.problem().field.empty()) {
             std::abort();
         }

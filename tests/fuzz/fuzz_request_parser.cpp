@@ -34,10 +34,10 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     bool isDoneSlowly = false;
     const IncomingRequest incoming = read(text, size + 4, isDone);
     const IncomingRequest slow = read(text, 3, isDoneSlowly);
-    if (isDone != isDoneSlowly || incoming.problem.has_value() != slow.problem.has_value()) {
+    if (isDone != isDoneSlowly || incoming.refusal.has_value() != slow.refusal.has_value()) {
         std::abort();
     }
-    if (!isDone || incoming.problem) {
+    if (!isDone || incoming.refusal) {
         return 0;
     }
     if (incoming.request.method.empty() || (incoming.isChunked && incoming.length) ||

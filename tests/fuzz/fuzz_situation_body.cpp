@@ -28,7 +28,7 @@ std::optional<SituationConfig> read(std::string_view body) {
         JsonFields fields(body);
         return SituationBody::situation(fields);
     } catch (const RequestRefused& refused) {
-        const auto document = nlohmann::json::parse(refused.problem().json(), nullptr, false);
+        const auto document = nlohmann::json::parse(refused.refusal().json(), nullptr, false);
         if (document.is_discarded() || document["status"] != 400 ||
             document["field"].get<std::string>().empty() ||
             document["detail"].get<std::string>().empty()) {

@@ -1,7 +1,6 @@
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
-#include "logtypes/SyslogBufferInfo.h"
 
 #include <cstdint>
 #include <cstdio>

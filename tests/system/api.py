@@ -10,7 +10,7 @@ from conftest import PATIENCE
 
 
 class Api:
-    """Requests to a running agent, with its token unless told otherwise."""
+    """Requests to a running agent, with its token by default."""
 
     def __init__(self, agent):
         line = agent.wait_trace("HTTP at http://")[0]
@@ -21,7 +21,7 @@ class Api:
             self.token = stream.read().strip()
 
     def request(self, method, path, body=None, headers=None, content_type="application/json"):
-        """(status, content type, parsed body or None); a header of None is left out."""
+        """(status, content type, parsed body or None); a header that is None is not sent."""
         send = {"Authorization": f"Bearer {self.token}", "Content-Type": content_type}
         send.update(headers or {})
         if body is not None and not isinstance(body, (bytes, str)):
@@ -43,7 +43,7 @@ class Api:
         return self.request("POST", f"/api/v1/tables/{table}/sample", body, **keys)
 
     def report(self, log, begin, end, *filters):
-        """The answer of a report on a log over a window."""
+        """The answer to a report on a log over a window."""
         status, _, answer = self.sample(
             "RMLOGENT",
             ("LOGPATH", "=", f"{log.path.parent}/"),

@@ -26,7 +26,7 @@ SANITIZER = re.compile(
     r"ERROR: AddressSanitizer|ERROR: LeakSanitizer|WARNING: ThreadSanitizer|runtime error:"
 )
 
-# The variables that steer the agent; a test sets those that it means.
+# The variables that the agent reads; a test sets those that it needs.
 AGENT_VARIABLES = (
     "ZRM_CONFIG_FILE",
     "ZRM_SYSLOG_CONF",
@@ -36,7 +36,7 @@ AGENT_VARIABLES = (
     "QFW_TRC1",
 )
 
-# Errors of every unit, and what the log manager says of its decisions.
+# Errors of every unit, and the decisions of the log manager.
 DEFAULT_TRACE = "error," + ",".join(
     f"{path.stem}=error+detail" for path in sorted((ROOT / "src/logmgr").glob("LogManager*.cpp"))
 )
@@ -55,7 +55,7 @@ def wait_until(condition, what, seconds=PATIENCE):
 
 
 class Lines:
-    """The lines of one output of a process, collected by a thread until its end."""
+    """The lines of one output of a process, collected by a thread until it ends."""
 
     def __init__(self, stream):
         self._lines = []
@@ -100,7 +100,7 @@ def syslog_line(message, source="app[1]", host="web1", when=None):
 
 
 def toml_value(value):
-    """A text, a number or a table of texts, as TOML has it."""
+    """A text, a number or a table of texts, as TOML."""
     if isinstance(value, dict):
         inside = ", ".join(f"{json.dumps(k)} = {json.dumps(v)}" for k, v in value.items())
         return "{ " + inside + " }"
@@ -108,7 +108,7 @@ def toml_value(value):
 
 
 class Agent:
-    """One zrmagent in a directory of its own: configuration, process, outputs."""
+    """A zrmagent in a directory of its own: configuration, process, outputs."""
 
     def __init__(self, directory):
         self.directory = Path(directory)
@@ -131,7 +131,7 @@ class Agent:
     # ------------------------------------------------------------------ configuration
 
     def log(self, name="app.log", content=b"Jan  1 00:00:00 web1 old: before the start\n", fields=""):
-        """Makes a log file and its configuration line. It has an old line unless told otherwise."""
+        """Makes a log file and its configuration line. It has an old line by default."""
         log = Log(self.directory / name)
         log.path.write_bytes(content)
         self.configure(f"{log} {fields}".rstrip(), append=True)
@@ -151,7 +151,7 @@ class Agent:
         self.tables.append({"path": [str(one) for one in paths], **keys})
 
     def situation(self, name="every-entry", log=None, when=(), **keys):
-        """A situation on a log; every entry of it unless told otherwise."""
+        """A situation on a log; by default every entry raises it."""
         keys = {"name": name, "text": name, "severity": "info", **keys}
         if log is not None:
             keys["log"] = str(log)
@@ -224,7 +224,7 @@ class Agent:
         self.send(SIGHUP)
 
     def wait_end(self, seconds=PATIENCE):
-        """Waits for the process's end by itself; its exit status, negative for a signal."""
+        """Waits until the process ends by itself; its exit status, negative for a signal."""
         try:
             self.process.wait(seconds)
         except subprocess.TimeoutExpired:
@@ -296,7 +296,7 @@ class Agent:
         return self._alive_until(arrived, f"{count} events", seconds)
 
     def wait_debug_records(self, count):
-        """Waits until the debug log has that many records: so many lines were read and offered."""
+        """Waits until the debug log has that many records: lines that were read and offered."""
         path = Path(self.environment["AGENT_DEBUG_LOG"])
 
         def written():
@@ -305,7 +305,7 @@ class Agent:
         self._alive_until(written, f"{count} records in the debug log", PATIENCE)
 
     def wait_open(self, path):
-        """Waits until the agent has the file open and stands at its end: it monitors from here."""
+        """Waits until the agent has the file open and is at its end: it monitors from here."""
         path = os.path.realpath(str(path))
 
         def at_end():
@@ -356,7 +356,7 @@ def descriptions(events):
 
 @pytest.fixture
 def agents(tmp_path):
-    """Makes agents, and sees that none outlives its test or leaves a sanitizer's finding."""
+    """Makes agents, and checks that none outlives its test or leaves a sanitizer's finding."""
     made = []
 
     def make():
@@ -382,7 +382,7 @@ def agent(agents):
 
 @pytest.fixture
 def serving(agent):
-    """Starts the agent with HTTP on a free port and a log with this content; log and API."""
+    """Starts the agent with HTTP on a free port and a log with this content; (log, API)."""
     from api import Api  # which itself needs this module
 
     def start(content=b"", **keys):

@@ -1,4 +1,4 @@
-"""An HTTP server that takes what sinks send."""
+"""An HTTP server that receives what sinks send."""
 
 import json
 import socket
@@ -80,7 +80,7 @@ class Receiver:
         self._thread.start()
 
     def events(self):
-        """The events of all requests that were taken, in their order."""
+        """The events of all accepted requests, in order."""
         return [event for request in list(self.taken) for event in request.json["events"]]
 
     def close(self):
@@ -96,7 +96,7 @@ class Receiver:
 
 
 def slowly(seconds):
-    """An answer that takes its time."""
+    """An answer that comes late."""
 
     def answer(request):
         time.sleep(seconds)

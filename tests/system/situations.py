@@ -42,7 +42,7 @@ class Situations:
         return [situation["name"] for situation in self.list()]
 
     def wait_opened(self, count):
-        """Waits until there are so many and each that runs is open, not only to be opened."""
+        """Waits until there are this many and all that run have been opened."""
 
         def opened():
             now = self.list()

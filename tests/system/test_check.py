@@ -34,7 +34,7 @@ def test_every_line_has_its_verdict(serving):
 
 
 def test_a_file_outside_the_logs_directories_is_only_outside(serving):
-    """No token holder learns from the agent which files there are."""
+    """The agent does not reveal to a token's holder which files exist."""
     inside = serving.watched.path.parent / "none.log"
     config = f"/etc/passwd ;N\n/etc/none\n{serving.watched.path.parent}/../x\n{inside}\n"
     answer = judge(serving, config)
@@ -45,7 +45,7 @@ def test_a_file_outside_the_logs_directories_is_only_outside(serving):
 
 
 def test_the_logs_name_in_many_places_costs_nothing(serving):
-    """The format is measured with the name in it, and its directives take no stack."""
+    """The format's length includes the names in it, and its directives take no stack."""
     directory = serving.watched.path.parent
     name = directory / ("%c" * 120)
     name.write_bytes(b"")
@@ -61,7 +61,7 @@ def test_the_logs_name_in_many_places_costs_nothing(serving):
 
 
 def test_the_agent_agrees_at_its_next_start(serving, agents):
-    """The lines that are accepted are the logs that an agent of this configuration monitors."""
+    """The accepted lines are the logs that an agent with this configuration monitors."""
     other = agents()
     names = [serving.watched.path.parent / f"{number}.log" for number in range(4)]
     for name in names:

@@ -6,7 +6,7 @@ import time
 import pytest
 from api import Api, stamp
 from conftest import syslog_line
-from test_zrmctl import ZRMCTL
+from zrmctl import ZRMCTL
 
 FORMAT = ' ;N ;U ;A , "%d-%d-%dT%d:%d:%d %[^\\n]" , year month day hour minute second description'
 ELEVEN = "eleven lines in a row do not fit the log's format, and a report ends there"
@@ -29,7 +29,7 @@ def reach(answer):
 
 @pytest.fixture
 def serving(agent):
-    """Four hits, the newest of them behind something that ends a report."""
+    """Four hits, the newest of them after something that ends a report."""
     agent.listen = "127.0.0.1:0"
     agent.now = int(time.time()) - 600
     agent.hits = [text_line(agent.now + second, "hit") for second in range(4)]
@@ -55,7 +55,7 @@ def ask_all(agent):
     return report, backtest
 
 
-def test_what_was_read_whole_is_complete(serving):
+def test_a_log_that_was_read_whole_is_complete(serving):
     whole = (True, stamp(serving.now), None)
     report, backtest = ask_all(serving)
     assert (report["count"], reach(report)) == (4, whole)
@@ -75,7 +75,7 @@ def test_what_was_read_whole_is_complete(serving):
     ],
     ids=["eleven lines that do not fit", "a line of 2048 bytes"],
 )
-def test_what_ends_a_report_is_said(serving, obstacle, reason):
+def test_a_report_says_what_ended_it(serving, obstacle, reason):
     serving.text.path.write_text("".join(serving.hits[:3]) + obstacle + serving.hits[3])
     reached = stamp(serving.now + 3)
     report, backtest = ask_all(serving)
@@ -108,7 +108,7 @@ def test_a_log_that_is_gone_is_not_an_empty_one(serving):
     assert reach(backtest) == (False, None, f"{serving.text}: the log cannot be read")
 
 
-def test_the_limit_of_rows_is_a_reason_too(agent):
+def test_the_row_limit_is_a_reason_too(agent):
     agent.listen = "127.0.0.1:0"
     agent.agent_keys["max_rows"] = 20
     now = int(time.time()) - 600

@@ -1,4 +1,4 @@
-"""The bash completion of zrmctl, asked as bash asks it."""
+"""The bash completion of zrmctl, called as bash calls it."""
 
 import os
 import re
@@ -25,7 +25,7 @@ _zrmctl zrmctl "${COMP_WORDS[COMP_CWORD]}" ""
 
 
 def broken(line):
-    """The words of a command line as readline breaks them."""
+    """The words of a command line as readline splits them."""
     words = re.findall(r"""(?:[^\s=:'"\\]|\\.|'[^']*'?|"[^"]*"?)+|[=:]+""", line)
     return words + [""] if line[-1] in " =:" else words
 

@@ -1,4 +1,4 @@
-"""The debug log: every record as read and as row, for the logs whose debug mode is on."""
+"""The debug log: every line as read and as a row, for the logs whose debug mode is on."""
 
 import re
 

@@ -23,7 +23,7 @@ FOLLOW = f"echo '{HEADER}'; exec tail -n +1 -s 0.05 -f entries"
 # An entry that comes before the situations are open raises no event.
 AWAIT_SITUATIONS = "until [ -e situations-open ]; do sleep 0.02; done"
 
-# Beside the errors: what becomes of the children.
+# The errors, and what happens to the children.
 TRACE = "error,LogManager=error+detail,ErrLogFileChild=error+detail"
 
 
@@ -48,14 +48,14 @@ class ErrorLog:
         self.configure()
 
     def configure(self, command="errpt -c -smmddhhmmyy"):
-        """Makes the log the only one of the configuration, which so has changed."""
+        """Makes the log the only one of the configuration, and so changes the configuration."""
         self.agent.configure(f"{self.path} ;N ;E ;{command}")
 
     def __str__(self):
         return str(self.path)
 
     def errpt(self, following=FOLLOW, reporting="exit 1"):
-        """What errpt does when it is to follow the log, and for a report."""
+        """Sets what errpt does when it follows the log, and for a report."""
         program = self.bin / "errpt"
         new = self.bin / "errpt.new"
         new.write_text(
@@ -81,7 +81,7 @@ class ErrorLog:
         return [(int(pid), arguments) for pid, _, arguments in parts]
 
     def end_commands(self):
-        """Ends what a killed agent has left: it would keep the agent's outputs open."""
+        """Ends what a killed agent has left behind: it would keep the agent's outputs open."""
         for pid, _ in self.calls() + self.calls("report-calls"):
             try:
                 if os.readlink(f"/proc/{pid}/cwd") == str(self.agent.directory):
@@ -104,7 +104,7 @@ def log(agent, uname_aix):
             "TZ": "UTC0",
             "LD_PRELOAD": str(uname_aix),
             "PATH": f"{log.bin}:{os.environ['PATH']}",
-            # The preloaded library stands before a sanitizer's.
+            # The preloaded library comes before a sanitizer's.
             "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
         }
     )
@@ -116,7 +116,7 @@ def log(agent, uname_aix):
 
 
 def start(agent, **keys):
-    """The agent does not open an error log itself: it is up when it listens."""
+    """The agent does not open an error log itself: it has started when it listens."""
     situations_open = agent.directory / "situations-open"
     situations_open.unlink(missing_ok=True)
     agent.start(wait=False, trace=TRACE, **keys)
@@ -125,7 +125,7 @@ def start(agent, **keys):
 
 
 def has_ended(pid):
-    """True for a process that is gone; a zombie of the agent's is not."""
+    """True for a process that is gone; the agent's zombies are not."""
     try:
         return "\nState:\tZ" in Path(f"/proc/{pid}/status").read_text()
     except (FileNotFoundError, ProcessLookupError):
@@ -133,7 +133,7 @@ def has_ended(pid):
 
 
 def children(agent):
-    """The agent's children, running or not reaped."""
+    """The agent's children, running or not yet reaped."""
     found = []
     for status in Path("/proc").glob("[0-9]*/status"):
         try:
@@ -252,14 +252,14 @@ def test_a_line_may_come_in_parts(agent, log):
     assert agent.stop() == 0
 
 
-def test_the_shells_complaint_of_a_missing_command_ends_the_monitor(agent, log):
+def test_the_shells_complaint_about_a_missing_command_ends_the_monitor(agent, log):
     (log.bin / "errpt").unlink()
     start(agent)
     agent.wait_trace("has terminated normally; exit status = 127")
     assert agent.stop() == 0
 
 
-def test_a_log_that_leaves_the_configuration_takes_its_command_along(agent, log):
+def test_removing_a_log_from_the_configuration_ends_its_command(agent, log):
     other = agent.log("app.log")
     start(agent)
     pid = log.wait_calls(1)[0][0]
@@ -286,7 +286,7 @@ def test_refreshes_leave_neither_zombies_nor_descriptors(agent, log):
     assert agent.stop() == 0
 
 
-def test_the_command_finds_nothing_of_the_agents_open(agent, log):
+def test_the_command_inherits_no_descriptors(agent, log):
     agent.log("app.log")
     agent.listen = "127.0.0.1:0"
     agent.environment["AGENT_DEBUG_LOG"] = str(agent.directory / "debug.log")
@@ -313,7 +313,7 @@ def test_a_report_runs_a_command_of_its_own_over_its_window(agent, log):
     ]
     assert [words for _, words in log.calls("report-calls")] == ["-s1005070306 -e1031235906"]
     agent.wait_trace("Report command errpt -s1005070306 -e1031235906 ( pid = ")
-    # The monitor's command goes on.
+    # The monitor's command is still running.
     assert not has_ended(log.calls()[0][0])
     assert agent.stop() == 0
 

@@ -1,4 +1,4 @@
-"""What goes wrong around the agent: logs it may not read, sinks it cannot write."""
+"""Faults around the agent: logs that it may not read, sinks that it cannot write."""
 
 import json
 import os
@@ -7,14 +7,14 @@ from pathlib import Path
 
 from conftest import descriptions, syslog_line, wait_until
 
-# Root reads everything; without these two capabilities it reads what others do.
+# Root reads everything; without these two capabilities it reads only what others may.
 AS_ORDINARY_READER = [
     "setpriv", "--bounding-set", "-dac_override,-dac_read_search", "--inh-caps",
     "-dac_override,-dac_read_search",
 ]  # fmt: skip
 
 
-def test_an_unreadable_log_is_traced_and_cured_by_the_next_configuration(agent):
+def test_an_unreadable_log_is_traced_and_recovers_with_the_next_configuration(agent):
     readable, secret = agent.log("readable.log"), agent.log("secret.log")
     for log in (readable, secret):
         agent.situation(log.path.stem, log=log)
@@ -106,8 +106,8 @@ def test_a_reader_of_standard_output_that_goes_away_does_not_end_the_agent(agent
     assert agent.stop() == 0
 
 
-def test_closed_standard_streams_are_nobody_elses(agent):
-    """The files that the agent opens must not become what it takes for its outputs."""
+def test_closed_standard_streams_are_not_reused(agent):
+    """The files that the agent opens must not get the numbers of its standard streams."""
     log = agent.log()
     agent.situation(log=log)
     debug = agent.directory / "debug.log"

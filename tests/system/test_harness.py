@@ -1,4 +1,4 @@
-"""What the harness itself promises to the other tests."""
+"""What the other tests rely on in the harness."""
 
 from conftest import SANITIZER, syslog_line
 

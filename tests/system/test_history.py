@@ -46,7 +46,7 @@ def jsonl(path):
     return [json.loads(line) for line in Path(path).read_bytes().split(b"\n")[:-1]]
 
 
-def test_what_a_sink_missed_it_gets_after_a_restart(agent):
+def test_a_sink_gets_what_it_missed_after_a_restart(agent):
     log = agent.log()
     agent.situation(log=log)
     agent.sink = agent.directory / "not-yet" / "events.jsonl"
@@ -78,7 +78,7 @@ def test_a_sink_that_is_down_stops_neither_the_others_nor_the_monitoring(agent):
     late = agent.directory / "not-yet" / "late.jsonl"
     agent.more_sinks = [{"type": "jsonl", "path": str(late)}]
     agent.start()
-    for begin in range(0, 10_000, 1000):  # many times what the queue holds
+    for begin in range(0, 10_000, 1000):  # many times the queue's size
         log.append(lines(range(begin, begin + 1000)))
     assert descriptions(agent.wait_events(10_000)) == texts(range(10_000))
     late.parent.mkdir()
@@ -88,7 +88,7 @@ def test_a_sink_that_is_down_stops_neither_the_others_nor_the_monitoring(agent):
     assert agent.stop() == 0
 
 
-def test_a_slow_sink_gets_everything_in_order_and_delays_nobody(agent):
+def test_a_slow_sink_gets_everything_in_order_and_delays_no_other(agent):
     log = agent.log()
     agent.situation(log=log)
     agent.sink = agent.directory / "good.jsonl"
@@ -112,7 +112,7 @@ def test_a_slow_sink_gets_everything_in_order_and_delays_nobody(agent):
 
 
 class Appender:
-    """Appends numbered lines to a log until it is stopped."""
+    """Appends numbered lines to a log until stopped."""
 
     def __init__(self, log, first):
         self.log, self.next, self.stopped = log, first, False
@@ -169,7 +169,7 @@ def test_kill_at_random_moments_loses_nothing_that_was_committed(agent):
 
 
 def check_deliveries(path, events):
-    """Every event came, in order, and again only after an end of the agent."""
+    """Every event arrived in order, and repeatedly only after the agent had ended."""
     newest, times_back, torn = 0, 0, 0
     for line in path.read_text().split("\n")[:-1]:
         try:
@@ -197,7 +197,7 @@ def full_disk(tmp_path_factory):
     return library
 
 
-def test_a_full_disk_holds_events_up_and_loses_none(agent, full_disk):
+def test_a_full_disk_delays_events_and_loses_none(agent, full_disk):
     flag = agent.directory / "full"
     agent.environment.update(
         {
@@ -239,7 +239,7 @@ def test_a_corrupt_history_is_moved_aside(agent):
     assert len(stored(agent)) == 3
 
 
-def test_a_history_that_is_removed_is_made_anew_and_ids_go_on(agent):
+def test_a_removed_history_is_created_again_and_ids_continue(agent):
     log = agent.log()
     agent.situation(log=log)
     agent.listen = "127.0.0.1:0"
@@ -296,7 +296,7 @@ def test_a_flipped_byte_is_reported_and_not_served(agent):
     assert agent.stop() == 0
 
 
-def test_without_a_place_for_the_history_the_agent_says_so_and_goes_on(agent):
+def test_without_a_place_for_the_history_the_agent_says_so_and_continues(agent):
     log = agent.log()
     agent.situation(log=log)
     (agent.directory / "plain").write_text("no directory")

@@ -1,4 +1,4 @@
-"""Servers that answer what ends or fills a careless client: the agent's receivers, zrmctl's agents."""
+"""Servers whose answers crash or fill a careless client: the agent's receivers, zrmctl's agents."""
 
 import resource
 import socket
@@ -14,7 +14,7 @@ from receiver import Receiver
 ZRMCTL = str(Path(PROGRAM).with_name("zrmctl"))
 HEAD = b"HTTP/1.1 500 Bad\r\nTransfer-Encoding: chunked\r\n\r\n"
 
-# What is sent first, and then again and again; nothing stands for the connection's end. None of
+# What is sent first, and then repeatedly; nothing means the end of the connection. None of
 # these says that the events were taken.
 ANSWERS = {
     "reason phrase": (b"HTTP/1.1 500 " + 40_000 * b"x" + b"\r\nContent-Length: 0\r\n\r\n", b""),
@@ -31,7 +31,7 @@ ANSWERS = {
 
 
 class HostileServer:
-    """Answers every request likewise."""
+    """Gives every request the same answer."""
 
     def __init__(self, answer):
         self.begin, self.endless = answer
@@ -70,7 +70,7 @@ class HostileServer:
 
 
 @pytest.mark.parametrize("answer", ANSWERS.values(), ids=ANSWERS.keys())
-def test_no_answer_ends_the_agent_or_fills_its_memory(agent, answer):
+def test_no_answer_crashes_the_agent_or_fills_its_memory(agent, answer):
     log = agent.log()
     agent.situation("watch", log=log)
     with HostileServer(answer) as server:
@@ -92,13 +92,13 @@ def test_no_answer_ends_the_agent_or_fills_its_memory(agent, answer):
         assert agent.stop() == 0
 
 
-# A size without end is discarded as it comes, until the time for an answer is over, which is longer
+# An endless size is discarded as it arrives, until the time for an answer is over, which is longer
 # than a test has (HttpClientTest shows it with a shorter one).
 FOR_ZRMCTL = {name: answer for name, answer in ANSWERS.items() if name != "size of a chunk without end"}
 
 
 @pytest.mark.parametrize("answer", FOR_ZRMCTL.values(), ids=FOR_ZRMCTL.keys())
-def test_no_answer_ends_zrmctl_or_fills_its_memory(answer, tmp_path):
+def test_no_answer_crashes_zrmctl_or_fills_its_memory(answer, tmp_path):
     token = tmp_path / "token"
     token.write_text("token\n")
     with HostileServer(answer) as server:

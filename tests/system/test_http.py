@@ -35,7 +35,7 @@ def test_health_needs_no_token(serving):
     assert (status, kind, answer) == (200, "application/json", {"status": "ok"})
 
 
-def test_the_token_file_is_the_owners_alone(serving):
+def test_only_the_owner_can_read_the_token_file(serving):
     _, api = serving()
     assert stat.S_IMODE(os.stat(api.token_file).st_mode) == 0o600
     assert re.fullmatch("[0-9a-f]{64}", api.token)
@@ -71,7 +71,7 @@ def test_a_report_ends_at_the_row_limit(agent, serving):
     answer = api.report(log, *EVER)
     assert described(answer) == [f"number {i}" for i in range(299, 274, -1)]
     assert (answer["count"], answer["truncated"]) == (25, True)
-    # 25 entries were read, whatever a further filter leaves of them.
+    # 25 entries were read, however many a further filter leaves.
     answer = api.report(log, *EVER, ("ENTRYSRC", "=", "app"))
     assert described(answer) == [f"number {i}" for i in range(299, 274, -2)]
     assert answer["truncated"]
@@ -88,7 +88,7 @@ def test_reports_on_empty_and_shrinking_logs_end_with_what_there_is(serving):
     assert api.report(log, *EVER)["rows"] == []
 
 
-def test_a_report_sees_the_whole_log_also_what_was_there_before_the_start(serving):
+def test_a_report_includes_what_was_in_the_log_before_the_start(serving):
     _, text = lines_of_the_last_hour(3000)
     log, api = serving(text)
     log.append(syslog_line("the newest"))
@@ -97,7 +97,7 @@ def test_a_report_sees_the_whole_log_also_what_was_there_before_the_start(servin
     assert described(answer)[:2] == ["the newest", "number 2999"]
 
 
-def test_monitored_logs_tell_state_counts_size_and_time(agent, serving):
+def test_monitored_logs_show_state_counts_size_and_time(agent, serving):
     log, api = serving("x\n", fields=";Y")
     agent.wait_open(log)
     log.append(syslog_line("one") + syslog_line("two"))
@@ -149,7 +149,7 @@ def test_requests_during_refreshes_succeed(agent, serving):
                 answer = api.report(log, stamp(begin + 10), stamp(begin + 1000))
                 assert answer["count"] == 991, answer["count"]
                 assert "app.log" in api.logs()
-            except BaseException as error:  # noqa: BLE001 - told by the test's thread
+            except BaseException as error:  # noqa: BLE001 - raised by the test's thread
                 failures.append(error)
                 return
 
@@ -196,7 +196,7 @@ REFUSED = {
 
 
 @pytest.mark.parametrize("case", REFUSED)
-def test_filters_that_make_no_sense_are_a_problem_that_names_the_field(serving, case):
+def test_a_refused_filter_is_named_in_the_problem(serving, case):
     table, filters, field = REFUSED[case]
     _, api = serving()
     status, kind, problem = api.sample(table, *filters)
@@ -206,7 +206,7 @@ def test_filters_that_make_no_sense_are_a_problem_that_names_the_field(serving, 
     assert problem["detail"]
 
 
-def test_bodies_that_are_no_request_are_refused(serving):
+def test_invalid_bodies_are_refused(serving):
     _, api = serving()
     path = "/api/v1/tables/RMMONLOG/sample"
     for body, status, field in (
@@ -243,7 +243,7 @@ def test_strangers_are_refused(serving):
     assert (got, problem["field"]) == (415, "Content-Type")
 
 
-def test_what_is_not_there_is_not_found(serving):
+def test_unknown_paths_are_not_found(serving):
     _, api = serving()
     got, kind, problem = api.sample("RMNONE")
     assert (got, kind, problem["field"]) == (404, "application/problem+json", "table")
@@ -252,7 +252,7 @@ def test_what_is_not_there_is_not_found(serving):
         assert got in (404, 405) and kind == "application/problem+json", path
 
 
-def test_a_report_on_a_log_that_is_not_monitored_is_no_error_of_the_agent(agent, serving):
+def test_a_report_on_a_log_that_is_not_monitored_is_not_an_agent_error(agent, serving):
     log, api = serving()
     before = agent.trace(" Error")
     begin, end = EVER

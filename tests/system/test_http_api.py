@@ -22,14 +22,14 @@ def get(api, path):
 
 
 def problem(api, method, path, body=None, **keys):
-    """(status, field, detail) of a request that is refused."""
+    """(status, field, detail) of a refused request."""
     status, kind, answer = api.request(method, path, body, **keys)
     assert kind == "application/problem+json", answer
     assert answer["status"] == status
     return status, answer.get("field"), answer["detail"]
 
 
-def test_status_tells_how_the_agent_is(serving):
+def test_status_describes_the_agent(serving):
     _, api = serving()
     before = time.time()
     answer = get(api, "/api/v1/status")
@@ -90,7 +90,7 @@ def test_columns_are_those_of_conditions(serving):
     assert answer["operators"] == ["=", "!=", ">=", "<=", "<", ">", "contains", "starts", "matches", "in"]  # fmt: skip
 
 
-def test_logs_tell_path_and_row(agent, serving):
+def test_logs_show_path_and_row(agent, serving):
     other = agent.log("b+%ü.log")
     log, api = serving()
     agent.wait_open(log)
@@ -129,7 +129,7 @@ def test_configured_logs_that_are_not_monitored_say_why(agent, serving):
     assert get(api, f"/api/v1/logs?log={log}")["unmonitored"] == []
     gone.write_text("")
     (waiting,) = get(api, f"/api/v1/logs?log={gone}")["unmonitored"]
-    # The configuration is the one that the agent has read: a refresh would not read it again.
+    # The agent has read this version of the configuration: a refresh would not read it again.
     assert waiting["reason"].startswith("The agent has not read this line yet. A refresh alone")
     assert waiting["cause"] == "touch"
     agent.configure(append=True)  # touched
@@ -198,7 +198,7 @@ HOSTILE = [
 
 @pytest.mark.parametrize("text", HOSTILE)
 def test_hostile_texts_are_texts(serving, text):
-    """In every string field: an answer or a problem, and nothing breaks."""
+    """In every string field: an answer or a problem, and nothing fails."""
     _, api = serving()
     encoded = quote(text, safe="")
     requests = [
@@ -229,7 +229,7 @@ def test_hostile_texts_are_texts(serving, text):
     assert get(api, "/api/v1/status")["version"]
 
 
-def test_names_that_are_no_text_are_refused(serving):
+def test_names_that_are_not_text_are_refused(serving):
     _, api = serving()
     for path in ("/api/v1/events/%ff", "/api/v1/events/%00", "/api/v1/events/%", "/api/v1/events/%zz"):
         assert problem(api, "GET", path)[:2] == (400, "path"), path
@@ -252,10 +252,10 @@ def test_the_methods_of_a_path_are_named(serving):
         connection.close()
 
 
-def test_head_gives_the_headers_alone(serving):
+def test_head_returns_only_the_headers(serving):
     _, api = serving()
     connection = http.client.HTTPConnection("127.0.0.1", api.port)
-    for _ in range(2):  # nothing is left in the connection
+    for _ in range(2):  # nothing remains unread in the connection
         connection.request("HEAD", "/api/v1/status", headers={"Authorization": f"Bearer {api.token}"})
         response = connection.getresponse()
         assert response.status == 200

@@ -82,7 +82,7 @@ class Follower:
         self._connection.close()
 
 
-def test_events_can_be_asked_for(serving):
+def test_events_can_be_queried(serving):
     log, api = serving
     write(log, 5)
     write(log, 2, text="rare")
@@ -121,7 +121,7 @@ def test_followers_get_every_event_in_order(serving):
     rare.wait(1)
     event = json.loads(rare.messages[0]["data"])
     assert (event["situation"], rare.messages[0]["event"]) == ("rare", "event")
-    # Whoever comes back goes on where it was.
+    # A client that comes back continues where it was.
     live.close()
     write(log, 5)
     resumed = Follower(api, last=live.ids()[-1])
@@ -140,7 +140,7 @@ def metrics(api):
     return text
 
 
-def test_so_many_clients_follow_at_a_time(serving):
+def test_the_number_of_followers_is_limited(serving):
     log, api = serving
     followers = [Follower(api) for _ in range(32)]
     assert {follower.response.status for follower in followers} == {200}
@@ -157,7 +157,7 @@ def test_so_many_clients_follow_at_a_time(serving):
 
 
 @pytest.mark.slow
-def test_a_follower_that_takes_nothing_is_disconnected_and_holds_nobody_up(agent, serving):
+def test_a_follower_that_reads_nothing_is_disconnected_and_delays_nobody(agent, serving):
     log, api = serving
     with socket.socket() as client:
         client.setsockopt(socket.SOL_SOCKET, socket.SO_RCVBUF, 4096)
@@ -186,7 +186,7 @@ def test_a_stop_ends_the_streams(agent, serving):
 
 
 @pytest.mark.slow
-def test_rates_tell_what_came_in(serving):
+def test_rates_count_entries_and_events(serving):
     log, api = serving
     write(log, 4)
     write(log, 1, text="rare")
@@ -201,7 +201,7 @@ def test_rates_tell_what_came_in(serving):
     wait_until(counted, "5 entries and 6 events in the rates", seconds=150)
 
 
-def test_a_text_is_searched_in_the_whole_history_and_in_the_stream(serving):
+def test_a_text_search_covers_the_whole_history_and_the_stream(serving):
     log, api = serving
     write(log, 3000, text="usual")
     write(log, 1, begin=7, text="disk FULL on")

@@ -1,4 +1,4 @@
-"""What clients do that never end, send too much or are too many: others notice nothing."""
+"""Clients that never finish, send too much or are too many: others notice nothing."""
 
 import contextlib
 import json
@@ -31,9 +31,9 @@ def connect(api):
 
 
 def exchange(api, data, end=True):
-    """Sends bytes and gives the status and the body of the answer."""
+    """Sends bytes and returns the status and the body of the answer."""
     with connect(api) as client:
-        # A request that is refused early need not be taken whole; its answer is there all the same.
+        # A request that is refused early need not be read whole; it is answered all the same.
         with contextlib.suppress(OSError):
             client.sendall(data)
             if end:
@@ -53,7 +53,7 @@ def prompt(api, path="/healthz"):
 
 
 @pytest.mark.slow
-def test_a_thousand_idle_connections_and_slow_senders_hold_nobody_up(agent, serving):
+def test_a_thousand_idle_connections_and_slow_senders_delay_nobody(agent, serving):
     log, api = serving
     _, hard = resource.getrlimit(resource.RLIMIT_NOFILE)
     resource.setrlimit(resource.RLIMIT_NOFILE, (min(hard, 8192), hard))
@@ -84,7 +84,7 @@ def test_a_thousand_idle_connections_and_slow_senders_hold_nobody_up(agent, serv
         for client, begin in zip(slow, slow_heads + slow_bodies):
             client.sendall(begin)
         sender.start()
-        # Everyone is connected and waits; others and the logs go on.
+        # All are connected and wait; others and the logs are served.
         longest = 0.0
         for number in range(20):
             longest = max(longest, prompt(api), prompt(api, "/api/v1/logs"))
@@ -93,7 +93,7 @@ def test_a_thousand_idle_connections_and_slow_senders_hold_nobody_up(agent, serv
         assert longest < 5, "answered although a thousand others are connected"
         descriptors = len(os.listdir(f"/proc/{agent.process.pid}/fd"))
         assert descriptors > IDLE
-        # Whoever does not come to the end of a request is told so, and all of them leave.
+        # A client that does not finish its request gets an error, and all are disconnected.
         for client in slow[:1] + slow[-1:]:
             client.settimeout(40)
             assert client.recv(65536).startswith(b"HTTP/1.1 408 "), "told within the time of a request"
@@ -128,7 +128,7 @@ def test_long_heads_are_refused(serving):
     assert status == 431 and json.loads(body)["status"] == 431
     many = b"".join(b"X-%d: y\r\n" % number for number in range(3000))
     assert exchange(api, b"GET /healthz HTTP/1.1\r\n" + many + b"\r\n")[0] == 431
-    # A long path within that is simply not there.
+    # A long path within the limit is simply unknown.
     path = b"/" + b"x" * 7000
     head = f" HTTP/1.1\r\nHost: localhost:{api.port}\r\nAuthorization: Bearer {api.token}\r\n\r\n"
     assert exchange(api, b"GET " + path + head.encode())[0] == 404
@@ -174,7 +174,7 @@ def test_requests_that_could_be_read_in_two_ways_are_refused(serving, head, stat
 
 
 def test_no_body_becomes_the_next_request(serving):
-    """What a refused request leaves unread is never taken for another request."""
+    """What a refused request leaves unread is never read as another request."""
     _, api = serving
     inner = f"GET /healthz HTTP/1.1\r\nHost: localhost:{api.port}\r\n\r\n"
     for method, path in (("POST", "/healthz"), ("GET", "/healthz"), ("POST", "/api/v1/reports")):
@@ -191,7 +191,7 @@ def test_no_body_becomes_the_next_request(serving):
         assert b"Connection: close" in answer
 
 
-def test_bytes_that_are_no_http_are_answered_and_harm_nobody(serving):
+def test_bytes_that_are_not_http_are_answered_and_harm_nobody(serving):
     _, api = serving
     for data in (
         b"\x16\x03\x01\x02\x00\x01\x00\x01\xfc\x03\x03" + bytes(range(256)) + b"\r\n\r\n",
@@ -207,12 +207,12 @@ def test_bytes_that_are_no_http_are_answered_and_harm_nobody(serving):
         assert status in (400, 421), (data[:20], status)
         assert json.loads(body)["status"] == status
     for data in (b"", b"\r\n", b"\r\n\r\n", b"GET / HT"):
-        exchange(api, data)  # nothing to answer; it must just not be the end of anything
+        exchange(api, data)  # not answered; it must only not end anything
     prompt(api)
 
 
-def test_nothing_behind_chunks_is_a_request(serving):
-    """The form of chunks leaves much open; what another reader takes for their end is not used."""
+def test_nothing_after_chunks_is_a_request(serving):
+    """Chunks may be written in many ways; what another reader could end earlier is refused."""
     _, api = serving
     head = (
         f"POST /api/v1/tables/RMMONLOG/sample HTTP/1.1\r\nHost: localhost:{api.port}\r\n"
@@ -241,7 +241,7 @@ def test_every_answer_has_a_date(serving):
         assert abs(sent - time.time()) < 120
 
 
-def test_the_host_may_stand_in_the_request_line(serving):
+def test_the_host_may_be_in_the_request_line(serving):
     _, api = serving
     for host, status in ((f"localhost:{api.port}", 200), ("evil.example", 421)):
         request = f"GET http://{host}/healthz HTTP/1.1\r\nHost: localhost:{api.port}\r\nConnection: Close\r\n\r\n"
@@ -270,7 +270,7 @@ def test_chunked_bodies_are_read(serving):
 
 
 def test_more_connections_than_are_served_are_turned_away(agents):
-    """With few descriptors fewer connections are served, and the agent keeps enough for itself."""
+    """With few descriptors fewer connections are served, and enough are left for the agent."""
     agent = agents()
     log = agent.log()
     agent.situation(log=log)

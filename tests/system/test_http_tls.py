@@ -13,7 +13,7 @@ import pytest
 
 from conftest import PATIENCE, wait_until
 
-# Becomes another program that has a terminal, at which nobody sits.
+# Runs another program on a terminal at which nobody sits.
 WITH_TERMINAL = (
     sys.executable,
     "-c",
@@ -46,7 +46,7 @@ CERTIFICATES = {}
 
 
 def certificate_of(context):
-    """The file of the certificate that a client's context trusts."""
+    """The certificate file that a client's context trusts."""
     return CERTIFICATES[context]
 
 
@@ -126,7 +126,7 @@ def test_old_tls_and_no_tls_are_refused(serving):
     assert ask(port, token, context)[0] == 200
 
 
-def test_only_suites_with_forward_secrecy_are_spoken(serving):
+def test_only_suites_with_forward_secrecy_are_accepted(serving):
     port, token, context = serving()
 
     def agreed(ciphers):
@@ -175,7 +175,7 @@ def test_a_changed_token_and_certificate_are_taken_over(agent, serving):
     token_file.write_text(renewed)
     wait_until(lambda: status(renewed) == 200, "the new token")
     assert status(token) == 401
-    # A broken certificate is reported once, and the one before serves on.
+    # A broken certificate is reported once, and the previous one stays in use.
     certificate, key = agent.directory / "agent.pem", agent.directory / "agent.key"
     whole = certificate.read_text()
     certificate.write_text("nonsense")
@@ -198,7 +198,7 @@ def test_a_changed_token_and_certificate_are_taken_over(agent, serving):
     kept.close()
 
 
-def test_clients_that_never_finish_the_handshake_hold_nobody_up(agent, serving):
+def test_clients_that_never_finish_the_handshake_delay_nobody(agent, serving):
     port, token, context = serving()
     silent = [socket.create_connection(("127.0.0.1", port)) for _ in range(50)]
     for client in silent[:25]:
@@ -253,7 +253,7 @@ def test_other_machines_need_tls(agent):
     assert agent.trace("can be reached from other machines; write a loopback address")
 
 
-def test_a_client_that_takes_its_leave_from_a_stream_is_seen_to_go(serving):
+def test_a_client_that_closes_its_stream_is_noticed(serving):
     port, token, context = serving()
 
     def clients():
@@ -275,7 +275,7 @@ def test_a_client_that_takes_its_leave_from_a_stream_is_seen_to_go(serving):
     try:
         stream.unwrap()
     except ssl.SSLError:
-        pass  # what the server had sent meanwhile is not read
+        pass  # what the server has sent in the meantime is not read
     stream.close()
     wait_until(lambda: clients() == "0", "the end of the stream")
     assert time.monotonic() - left < 12, "not only when the stream has something to send"

@@ -1,4 +1,4 @@
-"""What the monitor of a log has read and what it has passed over, as the API tells it."""
+"""What the monitor of a log has read and what it has skipped, as the API reports it."""
 
 import os
 
@@ -86,7 +86,7 @@ def without_times(ranges):
     return ranges
 
 
-def test_a_rotation_by_copying_shows_what_it_has_taken_away(serving):
+def test_a_rotation_by_copying_shows_what_was_lost(serving):
     log = serving.syslog
     log.append(syslog_line("read"))
     wait_until(lambda: ledger_of(serving, log)["lines"] == 1, "the line")
@@ -102,12 +102,12 @@ def test_a_rotation_by_copying_shows_what_it_has_taken_away(serving):
     ]
 
 
-def test_a_truncation_that_nobody_could_see_is_noticed(serving):
+def test_a_truncation_between_two_polls_is_noticed(serving):
     log = serving.syslog
     log.append(syslog_line("read"))
     wait_until(lambda: ledger_of(serving, log)["lines"] == 1, "the line")
     size = log.path.stat().st_size
-    # Shorter and longer again between two looks: without a moment in which the file is short.
+    # Shorter and longer again between two polls: the agent never sees the file short.
     with open(log.path, "r+b", buffering=0) as stream:
         stream.write("".join(syslog_line(f"new {n}") for n in range(100)).encode())
     wait_until(lambda: ledger_of(serving, log)["truncations"] == 1, "the truncation")
@@ -136,7 +136,7 @@ def test_a_ledger_lasts_through_refreshes_that_keep_the_log(serving):
     serving.refresh()
     wait_until(lambda: str(other) in logs_of(serving), "the refresh")
     assert ledger_of(serving, serving.user) == kept
-    # A log with another format is another monitor.
+    # A log with another format gets another monitor.
     serving.configure(f'{serving.user} ;N ;U ;A , "%s" , type', append=False)
     serving.refresh()
     wait_until(lambda: ledger_of(serving, serving.user)["lines"] == 0, "the new monitor")

@@ -20,7 +20,7 @@ def few_threads(tmp_path_factory):
 
 @pytest.mark.parametrize("history", [True, False])
 def test_a_start_without_a_thread_ends_with_one_sentence(agents, few_threads, history):
-    """Whichever thread is the first that cannot be started, up to those of the sinks."""
+    """Whichever thread is the first that cannot be started, up to the sinks' threads."""
     ends = []
     for threads in range(10):
         agent = agents()
@@ -52,7 +52,7 @@ def test_a_start_without_a_thread_ends_with_one_sentence(agents, few_threads, hi
 
 
 def says_why(said):
-    """Whether the agent has said that it has no thread, whichever of them it was."""
+    """Whether the agent has reported that a thread could not be started, whichever it was."""
     return any(
         sentence in said
         for sentence in (
@@ -65,7 +65,7 @@ def says_why(said):
 
 def user_without_processes():
     """The wrapper that makes the agent one, and the limits to try: only root can change its user.
-    Any other one has this test's processes too, so that a limit of one process is always reached."""
+    Any other user has this test's processes, too: a limit of one process is always reached."""
     if os.geteuid() != 0:
         return (), (1,)
     user = str(400_000 + os.getpid() % 100_000)
@@ -74,8 +74,8 @@ def user_without_processes():
     return wrapper, (1, 2, 3, 4, 5, 12)
 
 
-def test_a_user_without_processes_left_is_told_so(agents):
-    """The limit itself, in the place of a library that stands for it."""
+def test_a_user_who_has_no_processes_left_gets_a_message(agents):
+    """The limit itself, in place of a library that imitates it."""
     as_user, limits = user_without_processes()
     ends = {}
     for processes in limits:

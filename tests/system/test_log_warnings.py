@@ -1,4 +1,4 @@
-"""Logs that are monitored without an error and want attention all the same."""
+"""Logs that are monitored without an error but need attention."""
 
 import os
 import subprocess
@@ -7,7 +7,7 @@ import time
 import pytest
 from api import Api
 from conftest import syslog_line, wait_until
-from test_zrmctl import ZRMCTL
+from zrmctl import ZRMCTL
 
 ISO = "2026-11-20T07:03:09.412000+01:00 web1 cron[1]: two\n"
 
@@ -47,7 +47,7 @@ def zrmctl(agent, *arguments):
     return told
 
 
-def test_a_rotation_by_renaming_is_said_everywhere(serving):
+def test_a_rotation_by_renaming_is_reported_everywhere(serving):
     assert warnings_of(serving) == []
     path = serving.syslog.path
     path.rename(path.with_name("sys.log.1"))
@@ -58,7 +58,7 @@ def test_a_rotation_by_renaming_is_said_everywhere(serving):
     assert "Another file now has this log's name" in warning["text"] and "copytruncate" in warning["text"]
     assert get(serving, "/api/v1/status")["warnings"] == [{"log": str(path), **warning}]
     assert serving.wait_trace(f"{path}: Another file now has this log's name")
-    # What the monitor does not read explains nothing.
+    # A file that the monitor does not read explains nothing.
     status, _, explained = serving.api.request(
         "POST", "/api/v1/explain", {"definition": {"log": str(path)}, "last": 1}
     )
@@ -103,7 +103,7 @@ def test_check_warns_of_files_that_are_not_of_their_type(agent):
     assert "its size, 384 bytes, is not a multiple of 40" in check(agent, f"{wtmp} ;N ;A")
 
 
-def test_a_change_that_no_refresh_would_see_says_what_helps(serving):
+def test_a_change_that_a_refresh_would_miss_says_what_helps(serving):
     other = serving.directory / "other.log"
     other.write_text("")
     config = serving.directory / "logs.conf"

@@ -1,4 +1,4 @@
-"""The man pages tell every command, option and key that there is, and are well-formed."""
+"""The man pages describe every command, option and key, and are well-formed."""
 
 import os
 import re
@@ -31,7 +31,7 @@ def sections(name):
 
 
 def items(part):
-    """What stands at the left of a part's descriptions."""
+    """The terms that a part describes."""
     return {
         word.strip(",")
         for line in re.findall(r"^\.TP\n(.*)", part, re.M)
@@ -99,7 +99,7 @@ def test_the_page_names_no_option_that_is_not_there():
 
 
 def documented_keys():
-    """The keys of each table in docs/configuration.md by the heading that they stand under."""
+    """The keys of each table in docs/configuration.md by the heading above them."""
     document = (ROOT / "docs/configuration.md").read_text(encoding="utf-8")
     parts = re.split(r"^#{3,4} (.*)\n", document, flags=re.M)
     for heading, part in zip(parts[1::2], parts[2::2]):

@@ -50,7 +50,7 @@ def serving(agent):
     return log, Api(agent)
 
 
-def test_metrics_tell_what_happens(agent, serving):
+def test_metrics_count_what_happens(agent, serving):
     log, api = serving
     before = log.path.stat().st_size
     for number in range(3):
@@ -116,7 +116,7 @@ def test_odd_names_of_logs_are_labels(agent):
     assert (linted.returncode, linted.stdout + linted.stderr) == (0, "")
 
 
-def test_a_configuration_that_cannot_be_taken_over_is_seen(agent, serving):
+def test_metrics_show_that_a_configuration_cannot_be_loaded(agent, serving):
     _, api = serving
     successful = lambda: value(metrics(api), "zrm_config_last_reload_successful")
     assert successful() == 1
@@ -127,7 +127,7 @@ def test_a_configuration_that_cannot_be_taken_over_is_seen(agent, serving):
     wait_until(lambda: successful() == 1, "the configuration to be taken over")
 
 
-def test_a_file_that_loses_most_situations_is_seen(agent):
+def test_metrics_show_that_most_situations_were_removed(agent):
     log = agent.log()
     agent.listen = "127.0.0.1:0"
     agent.start()
@@ -160,7 +160,7 @@ def test_metrics_need_the_token(serving):
     assert status == 401
 
 
-def test_promtool_has_nothing_to_say(agent, serving):
+def test_promtool_accepts_the_metrics(agent, serving):
     log, api = serving
     log.append(syslog_line("one"))
     agent.wait_events(1)

@@ -1,4 +1,4 @@
-"""Lines that no system logger should write, and texts of other code pages."""
+"""Lines that no system logger should write, and text in other code pages."""
 
 import subprocess
 
@@ -59,7 +59,7 @@ def test_an_odd_line_yields_a_row_and_the_next_line_is_whole(agent, started, cas
 def test_a_nul_byte_ends_the_text_of_its_line(agent, started):
     log = started()
     log.append(b"Oct  5 07:03:09 web1 app: one\0two\n" + syslog_line("next").encode())
-    # What stands before the NUL is the line; its description loses its last byte all the same.
+    # What is before the NUL is the line; its description still loses its last byte.
     assert descriptions(agent.wait_events(2)) == ["on", "next"]
 
 

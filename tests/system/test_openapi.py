@@ -37,7 +37,7 @@ def response_of(method, path, status):
 
 
 def validate(schema, value):
-    """Holds a value against a schema of the document."""
+    """Checks a value against a schema of the document."""
     jsonschema.Draft202012Validator(
         schema, resolver=jsonschema.RefResolver("", DOCUMENT)
     ).validate(value)
@@ -54,7 +54,7 @@ def test_every_route_is_documented_and_every_documented_one_exists():
     assert routes == OPERATIONS
 
 
-def test_every_schema_is_one():
+def test_every_schema_is_valid():
     for schema in DOCUMENT["components"]["schemas"].values():
         jsonschema.Draft202012Validator.check_schema(schema)
     used = set(re.findall(r'"#/components/(\w+)/(\w+)"', (ROOT / "docs/openapi.yaml").read_text()))
@@ -78,7 +78,7 @@ DEFINITION = {
 }
 FROM = "2026-01-01T00:00:00Z"
 
-# What is asked: method, path of the document, path and body of the request, expected status.
+# The requests: method, path of the document, path and body of the request, expected status.
 EXAMPLES = [
     ("GET", "/healthz", None, None, 200),
     ("GET", "/", None, None, 200),
@@ -128,7 +128,7 @@ EXAMPLES = [
 # Refusals that any request can meet: the default of every operation.
 GENERAL = (400, 401, 403, 405, 408, 413, 414, 415, 421, 431, 500)
 
-# Answered by their own tests: what they send does not end.
+# Tested elsewhere: their answers do not end.
 STREAMS = {("GET", "/api/v1/events/stream")}
 
 
@@ -146,7 +146,7 @@ def exchange(api, method, path, body=None, token=True):
 
 
 def check(method, path, status, kind, data):
-    """Holds an answer against what the document says of it."""
+    """Checks an answer against what the document says about it."""
     response, is_named = response_of(method, path, status)
     assert is_named or status in GENERAL, f"{method} {path}: {status} is not documented"
     content = response.get("content", {})
@@ -198,7 +198,7 @@ def test_every_refusal_is_as_documented(serving):
         if method in ("PUT", "POST"):
             for body in ([], {"no such member": 1}):
                 status, kind, data = exchange(api, method, url, body)
-                # Validation tells what is wrong in its answer; a table that is none comes first.
+                # Validation reports what is wrong in its answer; an unknown table comes first.
                 expected = {"/api/v1/situations/validate": (200, 400), "/api/v1/tables/{table}/sample": (404,)}
                 assert status in expected.get(path, (400,)), (method, path, status, data)
                 check(method, path, status, kind, data)

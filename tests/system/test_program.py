@@ -82,7 +82,7 @@ def test_a_bad_host_configuration_ends_with_status_2_and_says_what_is_wrong(tmp_
         assert name in result.stderr
 
 
-def test_every_problem_of_a_host_configuration_is_told_with_its_line_and_cure(tmp_path):
+def test_every_problem_of_a_host_configuration_is_reported_with_its_line_and_cure(tmp_path):
     path = tmp_path / "zrm.toml"
     path.write_text("[agent]\nlog = 5\n[[situation]]\n")
     result = run("--config", path)
@@ -140,7 +140,7 @@ def test_events_read_before_the_stop_are_delivered(agent):
     reading, writing = os.pipe()
     agent.start(stdout=writing)
     os.close(writing)
-    # More than the pipe holds: most events still wait for their reader when the agent is stopped.
+    # More than the pipe holds: most events are still waiting for their reader when the agent stops.
     log.append("".join(syslog_line(f"number {i}") for i in range(500)))
     agent.wait_debug_records(500)
     agent.send(SIGTERM)
@@ -157,6 +157,6 @@ def test_without_any_log_the_agent_says_so_and_ends_after_a_minute(agent):
     agent.wait_trace("Agent has no work to do.  Exiting...")
     assert agent.running()
     assert agent.wait_end(seconds=120) == 0
-    # Besides the trace, once, in plain words.
+    # Once, in plain words, apart from the trace.
     (words,) = agent.trace("zrmagent: no log to monitor: ")
     assert "set log_config in" in words and "ZRM_CONFIG_FILE" in words

@@ -106,7 +106,7 @@ def test_a_missing_configuration_starts_with_the_syslog_configuration(agent):
     agent.wait_trace(f"{agent.syslog_conf} has not changed since last refresh. No refresh performed")
 
 
-def test_bad_lines_are_named_and_the_good_ones_hold(agent):
+def test_bad_lines_are_named_and_the_good_ones_are_used(agent):
     good = agent.log("good.log")
     agent.situation(log=good)
     agent.configure(
@@ -133,7 +133,7 @@ def test_bad_lines_are_named_and_the_good_ones_hold(agent):
     assert descriptions(agent.wait_events(1)) == ["monitored"]
 
 
-def test_a_log_that_appears_later_is_taken_up_by_a_changed_configuration(agent):
+def test_a_log_that_appears_later_is_monitored_when_the_configuration_changes(agent):
     (log,) = watch(agent, "app.log")
     late = Log(agent.directory / "late.log")
     agent.configure(str(late), append=True)
@@ -150,7 +150,7 @@ def test_a_log_that_appears_later_is_taken_up_by_a_changed_configuration(agent):
 
 
 def test_many_logs_are_dropped_and_stopped_in_the_time_of_one(agent):
-    # Each monitor looks once a second whether it is to end; one after the other, the logs of this
+    # Each monitor checks once a second whether it is to end; one after the other, the logs of this
     # test take 20 seconds to drop and 20 to stop.
     kept = [agent.log(f"kept{i}.log") for i in range(20)]
     for i in range(20):

@@ -22,7 +22,7 @@ auth,authpriv.* action(type="omfile" file="{auth}" template="RSYSLOG_Traditional
 
 
 class SystemLogger:
-    """rsyslogd in the foreground, with a configuration and a socket of its own."""
+    """rsyslogd in the foreground, with its own configuration and socket."""
 
     def __init__(self, directory):
         self.directory = Path(directory)
@@ -56,7 +56,7 @@ class SystemLogger:
 
 @pytest.fixture
 def system_logger():
-    # A socket's path is short: not below pytest's long directories.
+    # A socket's path must be short: not below pytest's long directories.
     with tempfile.TemporaryDirectory(prefix="zrm-") as directory:
         logger = SystemLogger(directory)
         yield logger
@@ -92,7 +92,7 @@ def test_what_programs_log_becomes_events(agent, system_logger):
     assert len(events) == 4
 
 
-def test_the_form_with_iso_times_is_read_with_the_layout_that_dev_run_writes(agent, system_logger):
+def test_the_layout_that_dev_run_writes_reads_iso_times(agent, system_logger):
     text = (ROOT / "dev").read_text()
     layout = re.search(r"local iso='([^']+)'", text).group(1)
     rest = re.search(r'echo "\$1 ;N ;U ;\$iso ([a-z ]+)"', text).group(1)

@@ -5,7 +5,7 @@ import socket
 from conftest import PATIENCE
 
 
-def test_start_and_orderly_end_are_told_to_the_service_manager(agent):
+def test_start_and_orderly_end_are_reported_to_the_service_manager(agent):
     address = agent.directory / "notify"
     with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as manager:
         manager.bind(str(address))

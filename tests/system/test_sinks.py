@@ -1,4 +1,4 @@
-"""Events on their way to other systems: batches, signatures, TLS, receivers that fail."""
+"""Events sent to other systems: batches, signatures, TLS, receivers that fail."""
 
 import hashlib
 import hmac
@@ -120,7 +120,7 @@ def test_nothing_is_lost_or_out_of_order_while_a_receiver_fails_in_every_way(age
         assert receiver.refused
 
 
-def test_a_slow_receiver_holds_nobody_up(agent, log):
+def test_a_slow_receiver_delays_nobody(agent, log):
     with Receiver() as receiver:
         receiver.answer = slowly(2)
         agent.more_sinks.append({"type": "webhook", "url": receiver.url, "batch": 1})
@@ -155,7 +155,7 @@ def test_a_receiver_that_never_answers_does_not_hold_up_the_end(agent, log):
 
 @pytest.fixture(scope="module")
 def authority(tmp_path_factory):
-    """Makes certificates: for a host, signed by an authority of its own."""
+    """Makes certificates: for a host, each signed by its own authority."""
     directory = tmp_path_factory.mktemp("certificates")
 
     def openssl(*arguments):
@@ -223,7 +223,7 @@ def test_nothing_goes_to_a_server_without_modern_ciphers(agent, log, authority):
         assert receiver.taken == []
 
 
-def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, authority, tmp_path):
+def test_authorities_are_reported_until_they_can_be_read(agent, log, authority, tmp_path):
     trusted = tmp_path / "trusted.pem"
     with Receiver(certificate=certificate(authority, "right")) as receiver:
         agent.more_sinks.append(
@@ -240,8 +240,8 @@ def test_authorities_that_cannot_be_read_are_told_until_they_can(agent, log, aut
 # ------------------------------------------------------------------------------------ files
 
 
-def test_a_line_torn_at_the_end_of_standard_output_is_ended(agent, log):
-    """What an agent that was killed has left in a file that the next one appends to."""
+def test_a_line_torn_at_the_end_of_standard_output_is_terminated(agent, log):
+    """What a killed agent has left in a file to which the next one appends."""
     path = agent.directory / "out.jsonl"
     path.write_bytes(b'{"id": 1, "tor')
     agent.sink = "-"

@@ -11,7 +11,7 @@ from receiver import free_port
 
 
 class Alertmanager:
-    """prometheus-alertmanager alone, which notifies nobody."""
+    """A prometheus-alertmanager on its own, which notifies nobody."""
 
     def __init__(self, directory):
         self.directory = directory
@@ -146,5 +146,5 @@ def test_alerts_wait_for_an_alertmanager_that_is_down(agent, alertmanager):
     alertmanager.start()
     alerts = wait_for_alerts(alertmanager, agent, lambda alerts: len(alerts) == 2)
     assert {alert["labels"]["alertname"] for alert in alerts} == {"is-minor", "is-major"}
-    agent.wait_trace("Sink short takes events again.")  # alerts that are over are taken too
+    agent.wait_trace("Sink short takes events again.")  # expired alerts are accepted, too
     assert agent.stop() == 0

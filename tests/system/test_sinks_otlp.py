@@ -1,4 +1,4 @@
-"""Events become log records of OpenTelemetry, held to the published mapping of OTLP to JSON."""
+"""Events become OpenTelemetry log records, checked against the published JSON mapping of OTLP."""
 
 import re
 
@@ -65,7 +65,7 @@ SCALARS = {
 
 
 def check(value, kind, place="body"):
-    """Fails where the value is not the JSON of this kind."""
+    """Fails when the value is not JSON of this kind."""
     if isinstance(kind, list):
         assert isinstance(value, list), place
         for index, item in enumerate(value):
@@ -82,7 +82,7 @@ def check(value, kind, place="body"):
 
 
 def plain(attributes):
-    """Attributes as a dictionary; none stands twice."""
+    """Attributes as a dictionary; none occurs twice."""
     names = [attribute["key"] for attribute in attributes]
     assert len(set(names)) == len(names)
     return {
@@ -93,7 +93,7 @@ def plain(attributes):
 
 
 class Collector(Receiver):
-    """Takes nothing but what the mapping allows, and answers as the protocol has it."""
+    """Accepts only what the mapping allows, and answers as the protocol requires."""
 
     def __init__(self):
         super().__init__()
@@ -173,7 +173,7 @@ def test_log_records_follow_the_mapping_and_say_what_the_event_says(agent, colle
     assert agent.stop() == 0
 
 
-def test_rejected_records_are_told_and_not_sent_again(agent, collector):
+def test_rejected_records_are_reported_and_not_sent_again(agent, collector):
     collector.reply = (
         b'{"partialSuccess": {"rejectedLogRecords": "1", "errorMessage": "no room for them"}}'
     )

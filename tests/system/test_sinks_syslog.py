@@ -34,7 +34,7 @@ action(type="omfile" file="{output}" template="parsed")
 
 
 class SystemLogger:
-    """rsyslogd in the foreground, which listens at a port of its own."""
+    """rsyslogd in the foreground, listening on its own port."""
 
     def __init__(self, directory, transport):
         self.directory = directory
@@ -56,7 +56,7 @@ class SystemLogger:
         wait_until(self.listens, lambda: (self.directory / "stderr").read_text())
 
     def listens(self):
-        """The port is in the system's lists of sockets."""
+        """Whether the port is in the system's lists of sockets."""
         wanted = f"0100007F:{self.port:04X}"
         for name in ("tcp", "udp"):
             for line in open(f"/proc/net/{name}", encoding="ascii"):
@@ -136,7 +136,7 @@ def test_a_message_says_what_the_event_says(agent, loggers, transport):
 
 
 def test_a_restarted_logger_gets_every_message_in_order(agent, loggers):
-    """At least once: what was under way when the connection broke may come again."""
+    """At least once: what was being sent when the connection broke may arrive again."""
     logger = loggers("tcp")
     logger.start()
     log = agent.log()

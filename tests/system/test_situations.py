@@ -1,4 +1,4 @@
-"""Situations: thresholds, every operator's meaning from outside, changes of their file."""
+"""Situations: thresholds, every operator, changes of their file."""
 
 import time
 
@@ -23,7 +23,7 @@ def test_at_least_five_entries_within_a_minute(agent):
     events = agent.wait_events(5 + 3 + 3)
     many = [e for e in events if e["situation"] == "many"]
     assert descriptions(many) == [f"hit again {i}" for i in range(3)]
-    # The row tells the frequency that was observed.
+    # The row has the observed frequency.
     assert [e["row"]["FREQTHRESH"] for e in many] == [5, 6, 7]
     assert {e["row"]["PERIODTHRS"] for e in many} == {60}
 
@@ -93,7 +93,7 @@ def test_every_operator(agent):
     assert found == expected
 
 
-def test_a_changed_situation_file_is_taken_over_and_a_broken_one_is_not(agent):
+def test_a_changed_situation_file_is_loaded_and_a_broken_one_is_not(agent):
     log = agent.log()
     agent.situation("first", log=log)
     agent.start()

@@ -1,11 +1,11 @@
-"""Situations through the API: made, changed, stopped and removed while the agent runs."""
+"""Situations through the API: created, changed, stopped and removed while the agent runs."""
 
 import pytest
 from conftest import descriptions, syslog_line
 from situations import SITUATIONS, Situations, path, running  # noqa: F401 - running is a fixture
 
 
-def test_a_situation_is_made_raises_and_is_removed(running):
+def test_a_situation_is_created_raises_events_and_is_removed(running):
     api = running.situations_api
     made = api.add(
         "ssh",
@@ -79,7 +79,7 @@ def test_counts_are_right_with_several_situations(running):
     assert shown["few"] == ("<= 3", "1h")
     assert shown["many"] == ("> 4", "1h")
     assert shown["all"] == (None, None)
-    # They go on when the situation was stopped for a while.
+    # They continue after the situation was stopped for a while.
     assert api.post("all", "stop")["state"] == "stopped"
     running.watched.append(syslog_line("unseen", source="cron"))
     api.wait_counts("even", offered=11)
@@ -89,7 +89,7 @@ def test_counts_are_right_with_several_situations(running):
     assert running.stop() == 0
 
 
-def test_a_change_begins_anew_and_the_same_does_not(running):
+def test_only_a_situation_that_changed_starts_over(running):
     api = running.situations_api
     body = {"when": ["ENTRYDESC contains 'x'"], "frequency": ">= 2", "period": "1h"}
     api.add("a", **body)
@@ -180,7 +180,7 @@ def test_names_with_odd_characters(running):
         ("not json", "body", "not JSON"),
     ],
 )
-def test_what_cannot_be_a_situation(running, body, field, detail):
+def test_invalid_situations_are_refused(running, body, field, detail):
     api = running.situations_api
     status, answer = api.send("POST", SITUATIONS, body)
     assert (status, answer["field"]) == (400, field)

@@ -1,4 +1,4 @@
-"""Situations of the file and of the API: kept over restarts, kills and damage, changed under load."""
+"""Situations of the file and of the API across restarts, kills and damage, and under load."""
 
 import http.client
 import json
@@ -29,7 +29,7 @@ def test_the_file_and_the_api(agent):
     api.add("made")
     assert api.send("POST", SITUATIONS, {"name": "made"})[0] == 409
 
-    # The file comes to have the name of one made through the API: the file's runs.
+    # The file gets a situation with the name of one created through the API: the file's runs.
     good = agent.zrm_toml.read_text()
     agent.zrm_toml.write_text(good + '\n[[situation]]\nname = "made"\nseverity = "info"\n')
     api.wait_opened(3)
@@ -44,7 +44,7 @@ def test_the_file_and_the_api(agent):
         ("filed", "info"),
         ("made", "info"),
     ]
-    # When the file gives the name back, the other one runs again.
+    # When the file no longer has the name, the other one runs again.
     agent.zrm_toml.write_text(good)
     api.wait_opened(2)
     assert api.get("made")["state"] == "running"
@@ -54,7 +54,7 @@ def test_the_file_and_the_api(agent):
         ("filed", "info"),
         ("made", "warning"),
     ]
-    # One that is hidden can be removed.
+    # A hidden situation can be removed.
     agent.zrm_toml.write_text(good + '\n[[situation]]\nname = "made"\n')
     api.wait_opened(3)
     assert api.remove("made")[0] == 204
@@ -75,7 +75,7 @@ def test_what_is_stopped_stays_stopped(agent):
         assert api.post(name, "stop")["state"] == "stopped"
     log.append(syslog_line("one"))
     assert sorted(e["situation"] for e in agent.wait_events(2)) == ["other", "second"]
-    # A change of the file elsewhere leaves it stopped.
+    # Another change of the file leaves it stopped.
     agent.zrm_toml.write_text(agent.zrm_toml.read_text() + '\n[[situation]]\nname = "third"\n')
     api.wait_opened(5)
     assert api.get("filed")["state"] == "stopped"
@@ -94,12 +94,12 @@ def test_what_is_stopped_stays_stopped(agent):
     assert agent.stop() == 0
 
 
-def test_nothing_is_made_when_it_cannot_be_saved(running):
+def test_nothing_is_created_when_it_cannot_be_saved(running):
     api = running.situations_api
     api.add("kept")
     state = running.directory / "state" / "situations.json"
     before = state.read_bytes()
-    # A directory in the place of the temporary file: no user may write that.
+    # A directory in place of the temporary file: no user can write that.
     (state.parent / "situations.json.new").mkdir()
     for method, where, body in (
         ("POST", SITUATIONS, {"name": "lost"}),
@@ -139,7 +139,7 @@ def test_a_damaged_file_is_moved_aside(agent, text):
     assert agent.stop() == 0
 
 
-def test_what_was_saved_and_cannot_run_says_why(agent):
+def test_a_saved_situation_that_cannot_run_says_why(agent):
     agent.listen = "127.0.0.1:0"
     agent.log()
     state = agent.directory / "state"
@@ -221,9 +221,9 @@ def test_situations_change_while_entries_arrive(running):
     assert {e["situation"] for e in running.events()} == {"all"}
 
 
-def test_a_full_queue_holds_no_change_up_for_long(agent):
-    """A sink that takes nothing: the log thread waits, and holds no lock meanwhile."""
-    agent.history = {"enabled": False}  # the sink stands between the queue and the log
+def test_a_full_queue_does_not_delay_a_change_for_long(agent):
+    """A sink that takes nothing: the log thread waits without holding a lock."""
+    agent.history = {"enabled": False}  # so that the sink reads the queue itself
     agent.listen = "127.0.0.1:0"
     agent.sink = str(agent.directory / "pipe")
     os.mkfifo(agent.sink)

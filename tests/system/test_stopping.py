@@ -1,4 +1,4 @@
-"""Whatever a thread of the agent waits for: it ends when it is told to, and answers meanwhile."""
+"""Whatever its threads wait for, the agent ends when it is stopped and answers until then."""
 
 import http.client
 import json
@@ -13,69 +13,19 @@ from signal import SIGINT, SIGQUIT, SIGTERM
 import pytest
 from api import Api
 from conftest import descriptions, syslog_line, wait_until
+from stopping import (
+    ANSWER,
+    END,
+    FLOOD,
+    answers,
+    cpu_seconds,
+    flood,
+    queue_is_full,
+    queue_stands_still,
+    stop,
+)
 
 pytestmark = pytest.mark.slow
-
-END = 10  # seconds from the signal to the end, at most
-ANSWER = 5  # seconds to any answer, at most
-FLOOD = 6000  # lines, each an event: more than fit into the queue
-
-
-def flood(log, count=FLOOD):
-    log.append("".join(syslog_line(f"number {i}") for i in range(count)))
-
-
-def stop(agent, number=SIGTERM):
-    """The exit status of an agent that ends in time."""
-    begin = time.monotonic()
-    agent.send(number)
-    agent.wait_end(END + 20)
-    took = time.monotonic() - begin
-    assert took < END, f"the end took {took:.1f} s\n{agent.stderr.text()[-2000:]}"
-    return agent.process.returncode
-
-
-def answers(api):
-    """Every quick resource answers in time, with what it knows or that it is busy."""
-    for path in ("/api/v1/logs", "/metrics", "/api/v1/status", "/api/v1/situations", "/healthz"):
-        begin = time.monotonic()
-        if path == "/metrics":
-            status = status_of_text(api, path)
-        else:
-            status, _, _ = api.request("GET", path)
-        took = time.monotonic() - begin
-        assert took < ANSWER, f"{path} took {took:.1f} s"
-        assert status in (200, 503), path
-
-
-def status_of_text(api, path):
-    connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=30)
-    try:
-        connection.request("GET", path, headers={"Authorization": f"Bearer {api.token}"})
-        response = connection.getresponse()
-        response.read()
-        return response.status
-    finally:
-        connection.close()
-
-
-def cpu_seconds(agent):
-    fields = Path(f"/proc/{agent.process.pid}/stat").read_text().rpartition(")")[2].split()
-    return sum(map(int, fields[11:13])) / os.sysconf("SC_CLK_TCK")
-
-
-def queue_is_full(api):
-    _, _, status = api.request("GET", "/api/v1/status")
-    return status["queue"]["size"] >= status["queue"]["capacity"]
-
-
-def queue_stands_still(api):
-    """True when the queue is full, and not just for the moment."""
-    for _ in range(20):
-        if not queue_is_full(api):
-            return False
-        time.sleep(0.05)
-    return True
 
 
 # ------------------------------------------------------------------ sinks that take nothing
@@ -91,7 +41,7 @@ def stuck_webhook(agent):
 def stuck_syslog(agent):
     listener = socket.create_server(("127.0.0.1", 0), backlog=0)
     address = listener.getsockname()
-    waiting = [socket.socket() for _ in range(3)]  # nobody accepts them, nor whoever comes next
+    waiting = [socket.socket() for _ in range(3)]  # nobody accepts these, nor any later ones
     for client in waiting:
         client.setblocking(False)
         client.connect_ex(address)
@@ -128,7 +78,7 @@ def full_queue(agent, sink, logs=2):
 @pytest.mark.parametrize("number", (SIGTERM, SIGINT))
 @pytest.mark.parametrize("refresh", ("nothing", "drop", "replace"))
 @pytest.mark.parametrize("sink", STUCK)
-def test_a_full_queue_keeps_neither_signals_nor_requests_waiting(agent, sink, refresh, number):
+def test_a_full_queue_delays_neither_signals_nor_requests(agent, sink, refresh, number):
     api, logs, kept = full_queue(agent, sink)
     if refresh == "drop":
         agent.configure(str(logs[0]))
@@ -156,7 +106,7 @@ def test_quit_aborts_an_agent_whose_queue_is_full(agent, sink):
     assert kept is not None and api is not None
 
 
-def test_a_refresh_lets_go_of_a_log_and_the_others_lose_and_double_nothing(agent):
+def test_a_refresh_releases_a_log_and_the_others_neither_lose_nor_repeat_entries(agent):
     log, dropped = agent.log("stays.log"), agent.log("goes.log")
     agent.situation(log=log)
     agent.situation("other", log=dropped)
@@ -219,90 +169,10 @@ def test_a_log_that_waits_for_room_turns_health_red_and_green_again(agent):
     ended.set()
 
 
-# ------------------------------------------------------------------ disks
+# ------------------------------------------------------------------ files that are not files
 
 
-@pytest.fixture(scope="session")
-def disk(tmp_path_factory):
-    """A library to preload: writes of the database fail or wait while a file exists."""
-    library = tmp_path_factory.mktemp("preload") / "disk.so"
-    for name in ("full_disk", "frozen_disk"):
-        subprocess.run(
-            ["cc", "-shared", "-fPIC", "-o", library.with_name(name + ".so"),
-             Path(__file__).with_name(name + ".c"), "-ldl"],
-            check=True,
-        )  # fmt: skip
-    return library.parent
-
-
-@pytest.mark.parametrize("kind", ("full", "frozen"))
-@pytest.mark.parametrize("refresh", (False, True))
-def test_a_disk_that_takes_nothing_keeps_neither_signals_nor_requests_waiting(
-    agent, disk, kind, refresh
-):
-    flag = agent.directory / "flag"
-    agent.environment = {
-        "LD_PRELOAD": str(disk / f"{kind}_disk.so"),
-        f"{kind.upper()}_DISK": str(flag),
-        "ASAN_OPTIONS": "verify_asan_link_order=0",
-    }
-    agent.listen = "127.0.0.1:0"
-    log, other = agent.log(), agent.log("other.log")
-    agent.situation()
-    agent.start()
-    api = Api(agent)
-    flag.touch()
-    flood(log, 10_000)
-    wait_until(lambda: queue_is_full(api), "a full queue")
-    if refresh:
-        agent.configure(str(other))
-        agent.refresh()
-        agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
-    answers(api)
-    begin = time.monotonic()
-    api.request("GET", "/api/v1/events")
-    assert time.monotonic() - begin < ANSWER
-    stop(agent)
-    text = agent.stderr.text()
-    assert "2048 events were not stored in the history" in text
-    if not refresh:
-        assert "7952 lines that were waiting in the logs were not read" in text
-
-
-@pytest.mark.parametrize("history", (True, False))
-def test_a_sink_on_a_frozen_disk_keeps_neither_signals_nor_requests_waiting(agent, disk, history):
-    flag = agent.directory / "flag"
-    agent.environment = {
-        "LD_PRELOAD": str(disk / "frozen_disk.so"),
-        "FROZEN_DISK": str(flag),
-        "FROZEN_FILES": ".jsonl",
-        "ASAN_OPTIONS": "verify_asan_link_order=0",
-    }
-    agent.history = {"enabled": history}
-    agent.sink = agent.directory / "events.jsonl"
-    agent.listen = "127.0.0.1:0"
-    log, other = agent.log(), agent.log("other.log")
-    agent.situation()
-    agent.start()
-    api = Api(agent)
-    flag.touch()
-    flood(log)
-    if history:
-        wait_until(lambda: api.request("GET", "/api/v1/status")[2]["history"]["events"] == FLOOD, "the events")
-    else:
-        wait_until(lambda: queue_stands_still(api), "a full queue")
-    agent.configure(str(other))
-    agent.refresh()
-    agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
-    answers(api)
-    stop(agent)
-    assert agent.sink.read_bytes() == b""
-
-
-# ------------------------------------------------------------------ files that are none
-
-
-def test_a_log_that_became_a_pipe_holds_up_neither_reports_nor_its_restart(serving, agent):
+def test_a_log_that_became_a_pipe_delays_neither_reports_nor_its_restart(serving, agent):
     log, api = serving("Jan  1 00:00:00 web1 old: line\n")
     log.path.unlink()
     os.mkfifo(log.path)
@@ -354,7 +224,7 @@ def test_a_log_that_grows_by_a_terabyte_of_zeros_can_be_dropped_and_stopped(agen
     assert stop(agent) == 0
 
 
-def test_a_debug_log_that_is_a_pipe_holds_up_nothing(agent):
+def test_a_debug_log_that_is_a_pipe_delays_nothing(agent):
     path = agent.directory / "debug.fifo"
     os.mkfifo(path)
     agent.environment["AGENT_DEBUG_LOG"] = str(path)
@@ -377,7 +247,7 @@ def test_a_debug_log_that_is_a_pipe_holds_up_nothing(agent):
 # ------------------------------------------------------------------ standard error, starts
 
 
-def test_a_standard_error_that_nobody_reads_holds_up_nothing(agent):
+def test_a_standard_error_that_nobody_reads_delays_nothing(agent):
     log = agent.log()
     agent.sink = agent.directory / "events.jsonl"
     agent.situation(log=log)
@@ -417,7 +287,7 @@ def test_a_start_without_usable_logs_can_be_stopped(agent, number):
 
 
 def test_entries_that_come_before_the_situations_are_open_are_judged(agent):
-    """Every line that is written from the moment a log is being read is raised."""
+    """Every line that is written after the agent begins to read a log is raised."""
     log = agent.log()
     for number in range(200):  # they take a while to open
         agent.situation(f"pattern-{number}", log=log, when=[f"ENTRYDESC matches '(a|b){{{number % 20}}}x{number}'"])

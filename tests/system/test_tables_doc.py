@@ -11,7 +11,7 @@ from test_error_log import log, start, uname_aix  # noqa: F401 (fixtures)
 
 DOCUMENT = (ROOT / "docs/tables.md").read_text(encoding="utf-8")
 
-# What depends on the place and the moment.
+# What depends on the machine and the time.
 VARYING = ("ORIGINNODE", "LOGPATH", "ULOGPATH", "TIMESTAMP", "MONTIME", "LOGMODDATE")
 
 
@@ -21,19 +21,19 @@ def sample_rows():
 
 
 def monitored_rows():
-    """The cells of the last table, as texts."""
+    """The cells of the last table, as text."""
     lines = [line for line in DOCUMENT.splitlines() if line.startswith("|")][-6:]
     cells = [[cell.strip(" `") for cell in line[1:-1].split(" |")] for line in lines]
     return {row[0]: dict(zip(cells[0], row)) for row in cells[2:]}
 
 
 def indented(start):
-    """The indented line that begins so, without its place."""
+    """The indented line that begins like this, without its indentation."""
     line = next(s for s in DOCUMENT.splitlines() if s.startswith(f"    {start}"))
     return line.strip().replace("/srv/zrm-samples/", "")
 
 
-# A syslog line has no year, and the error log's system is this one.
+# A syslog line has no year, and the error log's system is this machine.
 ALSO_VARYING = {"auth.log": ("ENTRYTIME",), "errlog": ("ENTRYSYS",)}
 
 

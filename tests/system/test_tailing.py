@@ -65,7 +65,7 @@ def test_many_lines_keep_their_order(agent):
     assert descriptions(agent.wait_events(3000)) == [f"line {i}" for i in range(3000)]
 
 
-def test_a_last_line_without_newline_is_reported_as_it_stands_and_its_rest_as_a_new_line(agent):
+def test_a_last_line_without_newline_is_reported_as_it_is_and_its_rest_as_a_new_line(agent):
     log = started(agent)
     log.append(syslog_line("first half").rstrip("\n"))
     # The description loses its last byte, newline or not.
@@ -113,7 +113,7 @@ def test_truncation_to_nothing(agent):
     assert descriptions(agent.wait_events(2)) == ["before", "after"]
 
 
-def test_a_log_moved_away_is_followed_and_its_successor_is_not(agent):
+def test_a_log_that_is_moved_away_is_followed_and_its_successor_is_not(agent):
     log = started(agent)
     moved = log.path.with_suffix(".1")
     log.path.rename(moved)
@@ -151,7 +151,7 @@ def test_two_logs_at_once(agent):
         assert {e["row"]["LOGNAME"] for e in own} == {log.path.name}
 
 
-def test_conditions_choose_the_lines(agent):
+def test_conditions_select_the_lines(agent):
     log = agent.log()
     agent.situation(
         "failed", log=log, when=["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"]

@@ -71,7 +71,7 @@ def test_the_last_lines_of_a_monitored_log(serving):
 
 
 def test_only_the_file_that_is_monitored_is_read(serving):
-    """What has the log's name by now may be a link to anything."""
+    """The log's name may by now be a link to anything."""
     log = serving.watched.path
     log.rename(log.with_suffix(".1"))
     log.symlink_to("/etc/passwd")
@@ -91,8 +91,8 @@ def test_only_the_file_that_is_monitored_is_read(serving):
     assert answer["coverage"]["percent"] == 100.0
 
 
-def test_an_answer_has_its_bounds(serving):
-    """Each directive gives a value for each line."""
+def test_answers_are_bounded(serving):
+    """Each directive yields a value for each line."""
     format = 'A , "' + "%1c" * 100 + '" , ' + " ".join(["type"] * 100)
     assert attempt(serving, format=format, lines=["x" * 200] * 500)["coverage"]["percent"] == 100.0
     answer = attempt(serving, 400, format=format, lines=["x" * 200] * 501)
@@ -117,7 +117,7 @@ def test_an_answer_has_its_bounds(serving):
         ({"format": "A", "more": 1}, "more"),
     ],
 )
-def test_what_cannot_be_tried(serving, body, field):
+def test_invalid_trials_are_refused(serving, body, field):
     assert attempt(serving, 400, **body)["field"] == field
 
 

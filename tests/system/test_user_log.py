@@ -110,7 +110,7 @@ def test_a_report_over_a_user_log(agent):
     ]
 
 
-def test_the_name_of_the_log_stands_in_the_procedure(agent):
+def test_the_name_of_the_log_is_in_the_procedure(agent):
     log = watch(agent, 'A,"%63[^\\n]" , description = "${@}: %s"')
     agent.start()
     log.append("text\n")

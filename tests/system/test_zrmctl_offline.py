@@ -197,7 +197,7 @@ def test_the_place_where_a_format_is_refused(log):
     )
 
 
-def test_no_line_fits_and_no_line_is_there(log):
+def test_no_line_fits_or_there_is_none(log):
     out, _ = run("try", FORMAT, "-", given=b"x\n", status=1)
     assert out.endswith(f"\n0 of 1 lines fit (0.0 %)\n/path/to/the.log ;N ;U ;{FORMAT}\n")
     path = log()
@@ -207,7 +207,7 @@ def test_no_line_fits_and_no_line_is_there(log):
     )
 
 
-def test_so_many_lines_are_tried(log):
+def test_the_number_of_lines_is_limited(log):
     lines = f"{FITS}\n".encode() * 101
     for arguments, tried in (((), 100), (("--lines", 2), 2), (("--lines", 1000), 101)):
         answer = json.loads(run("try", FORMAT, "-", "--json", *arguments, given=lines)[0])
@@ -216,7 +216,7 @@ def test_so_many_lines_are_tried(log):
         assert run("try", FORMAT, "-", "--lines", wrong, status=2)[0] == ""
 
 
-def test_an_endless_file_comes_to_an_end():
+def test_an_endless_file_is_cut_off():
     out, _ = run("try", FORMAT, "/dev/zero", "--lines", 1, status=1)
     assert "0 of " in out
 
@@ -239,7 +239,7 @@ def test_log_text_does_not_reach_the_terminal(log):
     assert "\x1b" not in run("try", 'A , "\x1b%q" , year', path, status=1)[0]
 
 
-def test_the_caret_stands_under_wide_characters(log):
+def test_the_caret_is_under_wide_characters(log):
     path = log("日本 x")
     out, _ = run("try", 'A , "%s %d" , type year', path, status=1)
     assert out.splitlines()[:2] == ["    1  日本 x", " " * 12 + "^"]

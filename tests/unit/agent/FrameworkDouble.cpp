@@ -145,11 +145,11 @@ extern "C" void __wrap__Z13RPC1_ShutdownPj(unsigned* status) {
 extern "C" unsigned __wrap__ZN3zrm17zrm_rmlogent_initEv();
 extern "C" unsigned __wrap__ZN3zrm17zrm_rmlogent_initEv() {
     record("zrm_rmlogent_init");
-    return 1; // not looked at
+    return 1; // ignored by the agent
 }
 
 extern "C" unsigned __wrap__ZN3zrm17zrm_rmmonlog_initEv();
 extern "C" unsigned __wrap__ZN3zrm17zrm_rmmonlog_initEv() {
     record("zrm_rmmonlog_init");
-    return 1; // not looked at
+    return 1; // ignored by the agent
 }

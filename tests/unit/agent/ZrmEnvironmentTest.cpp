@@ -178,7 +178,7 @@ TEST_F(ZrmEnvironmentTest, TheDetailClassTracesAllLimitsAndTheLocale) {
     EXPECT_STREQ(std::setlocale(LC_ALL, nullptr), "C.UTF-8");
 }
 
-TEST_F(ZrmEnvironmentTest, ALocaleThatTheSystemDoesNotHaveIsNoLocale) {
+TEST_F(ZrmEnvironmentTest, ALocaleThatTheSystemDoesNotHaveIsTracedAsUnknown) {
     setenv("LC_ALL", "xx_XX.NONE", 1);
     trace.setLevel(TRC1_DETAIL);
     checkEnvironment();
@@ -246,7 +246,7 @@ TEST_F(ZrmEnvironmentTest, ALimitThatTheSystemDoesNotHaveIsMarked) {
     EXPECT_THAT(trace.messages(), ElementsAre("-1 >> Undefined <<", "-1 >> No limit <<"));
 }
 
-TEST_F(ZrmEnvironmentTest, ALimitThatCannotBeAskedForIsAnError) {
+TEST_F(ZrmEnvironmentTest, ALimitThatCannotBeQueriedIsAnError) {
     EXPECT_EQ(printSysconfLimit("%ld %s", 9999), -1);
     EXPECT_EQ(printPathconfLimit("%ld %s", _PC_NAME_MAX, "/missing"), -1);
     EXPECT_THAT(trace.messages(),

@@ -59,14 +59,14 @@ TEST_F(ZrmMainTest, TheNamesAreThoseOfTheFrameworkAndOfTheSystem) {
                 ElementsAre("AGF_SetNodeType ZRM", "DetermineLocalHost 65"));
 }
 
-TEST_F(ZrmMainTest, TheNodeTypeOfTheEnvironmentStays) {
+TEST_F(ZrmMainTest, TheNodeTypeOfTheEnvironmentIsKept) {
     setenv("CTREQ_NODETYPE", "", 1);
     getSystemName();
     EXPECT_THAT(FrameworkDouble::calls(), ElementsAre("DetermineLocalHost 65"));
     EXPECT_THAT(trace.messages(), ElementsAre());
 }
 
-TEST_F(ZrmMainTest, WithoutUnameTheHostHasAStandInName) {
+TEST_F(ZrmMainTest, WithoutUnameTheHostHasAPlaceholderName) {
     Fault fault("uname", EFAULT);
     getSystemName();
     EXPECT_STREQ(gHostName, "-1");
@@ -84,7 +84,7 @@ TEST_F(ZrmMainTest, ALongNodeNameIsCutTo256Characters) {
     EXPECT_STREQ(gHostName, "short");
 }
 
-TEST_F(ZrmMainTest, TheLoaderSaysWhatTheAgentIsAndRegistersItsTables) {
+TEST_F(ZrmMainTest, TheLoaderDescribesTheAgentAndRegistersItsTables) {
     EXPECT_EQ(loadAgents(), 0);
     EXPECT_THAT(FrameworkDouble::calls(),
                 ElementsAre("AGF_SetAffinity ZRM.logs", "AGF_SetAffinity framework.version-2",
@@ -131,7 +131,7 @@ TEST_F(ZrmMainDeathTest, StartsAndEndsInOrderWithTheMainLoopsStatus) {
             loading + "AGF_Shutdown 1\n");
 }
 
-TEST_F(ZrmMainDeathTest, TheLogManagerIsDestroyedBeforeTheFrameworkIsTold) {
+TEST_F(ZrmMainDeathTest, TheLogManagerIsDestroyedBeforeTheFrameworkIsNotified) {
     trace.setLevel(TRC1_DETAIL);
     EXPECT_EXIT(
         {

@@ -64,7 +64,7 @@ TEST(BrevanTime, TheCurrentStampFollowsTheClock) {
     EXPECT_EQ(currentStamp(), "0991231235959000");
 }
 
-TEST(BrevanTime, TheCurrentStampAsksForLocalTimeOncePerSecond) {
+TEST(BrevanTime, TheCurrentStampLooksUpLocalTimeOncePerSecond) {
     const TimeZone zone("UTC0");
     FakeClock clock(1000000000);
     const Fault counter("localtime_r", 0, {.times = 0});
@@ -77,7 +77,7 @@ TEST(BrevanTime, TheCurrentStampAsksForLocalTimeOncePerSecond) {
     EXPECT_EQ(counter.calls(), 2);
 }
 
-TEST(BrevanTime, EachCurrentStampIsAnOperationWhereTheFlowIsTraced) {
+TEST(BrevanTime, EachCurrentStampIsAnOperationWhileTheFlowIsTraced) {
     const TimeZone zone("UTC0");
     FakeClock clock(1000000000);
     currentStamp();
@@ -92,7 +92,7 @@ TEST(BrevanTime, EachCurrentStampIsAnOperationWhereTheFlowIsTraced) {
     currentStamp();
     const Fault counter("localtime_r", 0, {.times = 0});
     currentStamp();
-    EXPECT_EQ(counter.calls(), 0) << "without the flow a second has one";
+    EXPECT_EQ(counter.calls(), 0) << "without the flow, each second is looked up once";
     EXPECT_THAT(trace.events(), testing::IsEmpty());
 }
 

@@ -7,12 +7,12 @@
 
 using namespace zrm;
 
-TEST(ErrorText, GivesTheSystemsTextAndTheNumber) {
+TEST(ErrorText, HasTheSystemsTextAndTheNumber) {
     const ErrorText error(ENOENT);
     EXPECT_EQ(error.number(), ENOENT);
     EXPECT_STREQ(error.text(), "No such file or directory");
 }
 
-TEST(ErrorText, NamesNumbersThatTheSystemDoesNotKnow) {
+TEST(ErrorText, HasATextForNumbersUnknownToTheSystem) {
     EXPECT_NE(std::strstr(ErrorText(99999).text(), "Unknown error"), nullptr);
 }

@@ -82,7 +82,7 @@ TEST_F(UTF8ConvTest, TracesNothingOfASuccessInTheOtherClasses) {
                                             "UTF8Conv.cpp entry", "UTF8Conv.cpp exit 3"));
 }
 
-TEST_F(UTF8ConvTest, WithoutACodePageEachCallSaysSoAndConvertsNothing) {
+TEST_F(UTF8ConvTest, WithoutACodePageEachCallReportsItAndConvertsNothing) {
     LocaleDouble::setCodePage(0);
     RecordingTrace trace(0);
     for (int i = 0; i < 2; ++i) {
@@ -127,7 +127,7 @@ TEST_F(UTF8ConvDeathTest, EachDirectionLooksTheLocaleUpOnce) {
         ExitedWithCode(0), "^$");
 }
 
-TEST_F(UTF8ConvDeathTest, WithoutALocaleEachCallSaysSoAndConvertsNothing) {
+TEST_F(UTF8ConvDeathTest, WithoutALocaleEachCallReportsItAndConvertsNothing) {
     RecordingTrace trace(0);
     EXPECT_EXIT(
         {

@@ -30,8 +30,8 @@ protected:
         manager = std::make_unique<LogManager>();
         std::_Exit(0);
     }
-    /// Ends a manager in which one call fails. The child ends without looking for leaks, since a
-    /// call that did not happen leaves its object behind.
+    /// Ends a manager in which one call fails. The child ends without checking for leaks, because a
+    /// failed call leaves its object behind.
     [[noreturn]] void stopWithFault(const char* function, int skip) {
         manager = std::make_unique<LogManager>();
         manager->setServerUp();
@@ -64,7 +64,7 @@ constexpr StartFault startFaults[] = {
     {"pthread_create", 0, "starting manager thread\\. "},
 };
 
-TEST_F(LogManagerDeathTest, AStartThatFailsEndsTheProcess) {
+TEST_F(LogManagerDeathTest, AFailingStartEndsTheProcess) {
     for (const StartFault& fault : startFaults) {
         EXPECT_EXIT(startWithFault(fault.function, fault.skip), ExitedWithCode(255),
                     std::string("^Error ") + fault.message +
@@ -75,7 +75,7 @@ TEST_F(LogManagerDeathTest, AStartThatFailsEndsTheProcess) {
 }
 
 TEST_F(LogManagerDeathTest, ThreadAttributesThatCannotBeDestroyedEndTheProcess) {
-    // The manager thread may already be at work.
+    // The manager thread may already be running.
     EXPECT_EXIT(startWithFault("pthread_attr_destroy", 0), ExitedWithCode(255),
                 "Error destroying log manager thread attribute object\\. Return code = 11; "
                 "Resource temporarily unavailable\\.  Use the return code and message to "
@@ -134,8 +134,8 @@ constexpr StartFault stopFaults[] = {
     {"pthread_cond_destroy", 1, "Error destroying server-up condition variable\\."},
 };
 
-TEST_F(LogManagerDeathTest, AStopThatFailsGoesOn) {
-    // The thread has ended by itself, since a failing cancellation would leave it waiting.
+TEST_F(LogManagerDeathTest, AFailingStopContinues) {
+    // The thread has already ended: it would wait forever if its cancellation failed.
     for (const StartFault& fault : stopFaults) {
         EXPECT_EXIT(stopWithFault(fault.function, fault.skip), ExitedWithCode(0),
                     std::string("Agent has no work to do\\.  Exiting\\.\\.\\.\n") + fault.message +

@@ -31,7 +31,7 @@ LogManagerFixture::~LogManagerFixture() {
     unsetenv("ZRM_CONFIG_FILE");
     unsetenv("ZRM_SYSLOG_CONF");
     unsetenv("AGENT_DEBUG_LOG");
-    // A signal that the manager no longer took must not reach the test program.
+    // A signal that the manager did not consume must not reach the test program.
     sigset_t pending;
     while (sigpending(&pending) == 0 && sigismember(&pending, SIGHUP) == 1) {
         sigset_t hangup;
@@ -110,6 +110,14 @@ std::vector<std::string> LogManagerFixture::messages() const {
     std::vector<std::string> all = trace.messages();
     std::erase_if(all, [](const std::string& message) { return message.starts_with('\n'); });
     return all;
+}
+
+std::FILE* LogManagerFixture::debugLogStream() {
+    class Log : public LogFile {
+    public:
+        using LogFile::m_debugLog;
+    };
+    return Log::m_debugLog;
 }
 
 bool LogManagerFixture::waitUntil(const std::function<bool()>& condition) {

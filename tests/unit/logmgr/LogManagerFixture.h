@@ -10,6 +10,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <functional>
 #include <memory>
 #include <string>
@@ -33,7 +34,7 @@ protected:
     /// time that differs from all earlier ones.
     void configure(const std::string& text);
     void configureSyslog(const std::string& text);
-    /// Lets AGENT_DEBUG_LOG name this file.
+    /// Sets AGENT_DEBUG_LOG to this path.
     void setDebugLog(const std::string& path);
 
     /// Creates the manager and waits until it waits for a signal. Needs the detail class.
@@ -42,12 +43,14 @@ protected:
     void refresh();
     /// The names of the manager's logs, in the order of the chain.
     std::vector<std::string> logs();
-    /// A log that joins the chain behind the manager's back, and leaves it again.
+    /// A log that joins the chain without the manager's knowledge until it is destroyed.
     std::unique_ptr<LogFile> strangerBehind(LogFile* head);
     /// The recorded messages that begin with one of these texts.
     std::vector<std::string> messagesThatBegin(const std::vector<std::string>& beginnings) const;
-    /// The recorded messages but for state dumps, which begin with a newline.
+    /// The recorded messages without state dumps, which begin with a newline.
     std::vector<std::string> messages() const;
+    /// The debug log that the manager has opened for the logs, or null.
+    static std::FILE* debugLogStream();
     static bool waitUntil(const std::function<bool()>& condition);
 
     TemporaryDirectory directory;
@@ -66,7 +69,7 @@ private:
     long m_changed = 1000000000; ///< modification time of the next configuration
 };
 
-/// Waits for ever; for the initial thread of a death test's child that another thread ends.
+/// Waits forever, on the initial thread of a death test's child that another thread ends.
 [[noreturn]] void waitForEnd();
 
 #endif

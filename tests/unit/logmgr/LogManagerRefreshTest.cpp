@@ -25,7 +25,7 @@ using testing::Not;
 
 class LogManagerRefreshTest : public LogManagerFixture {
 protected:
-    /// Runs a manager that finds nothing to do until it has asked the framework to end.
+    /// Runs a manager without work until it has asked the framework to end.
     void runWithoutLogs() {
         manager = std::make_unique<LogManager>();
         manager->setServerUp();
@@ -118,7 +118,7 @@ TEST_F(LogManagerRefreshTest, AChangedTypeReplacesTheObject) {
     EXPECT_EQ(AgentDoubles::living(), 1);
 }
 
-TEST_F(LogManagerRefreshTest, ALineThatIsGoneDeletesItsObject) {
+TEST_F(LogManagerRefreshTest, ARemovedLineDeletesItsObject) {
     configure(a + "\n" + b + "\n" + c + "\n");
     start();
     LogFile* const last = manager->findLogObject(c.c_str());
@@ -132,7 +132,7 @@ TEST_F(LogManagerRefreshTest, ALineThatIsGoneDeletesItsObject) {
                             "Deleting log object for file " + b + "."));
 }
 
-TEST_F(LogManagerRefreshTest, AllLinesExchangedRebuildTheChain) {
+TEST_F(LogManagerRefreshTest, ReplacingAllLinesRebuildsTheChain) {
     configure(a + "\n");
     start();
     configure(b + "\n" + c + "\n");
@@ -267,7 +267,7 @@ TEST_F(LogManagerRefreshTest, AnEmptiedConfigurationFallsBackToTheSyslogConfigur
     EXPECT_THAT(logs(), ElementsAre(b));
 }
 
-TEST_F(LogManagerRefreshTest, AnEmptiedConfigurationWithoutSubstituteKeepsTheLogs) {
+TEST_F(LogManagerRefreshTest, AnEmptiedConfigurationWithoutAFallbackKeepsTheLogs) {
     configure(a + "\n");
     start();
     configure("\n");
@@ -296,7 +296,7 @@ TEST_F(LogManagerRefreshTest, ASwitchBetweenTheSourcesAlwaysRebuilds) {
     rename(config.c_str(), directory.file("away").c_str());
     refresh();
     EXPECT_THAT(logs(), ElementsAre(b));
-    // The same file, unchanged, comes back, and goes again.
+    // The same unchanged file comes back and disappears again.
     rename(directory.file("away").c_str(), config.c_str());
     refresh();
     EXPECT_THAT(logs(), ElementsAre(a));
@@ -311,7 +311,7 @@ protected:
         GTEST_FLAG_SET(death_test_style, "fast");
         trace.setLevel(TRC1_ERROR);
     }
-    /// Creates a manager that is to end the process.
+    /// Creates a manager that ends the process.
     [[noreturn]] void run() {
         manager = std::make_unique<LogManager>();
         waitForEnd();

@@ -65,7 +65,7 @@ TEST_F(LogManagerTest, HasDefaultsForAnUnsetEnvironment) {
                 Contains(HasSubstr("SyslogConfFile\t\t\t= \"/etc/syslog.conf\"")));
 }
 
-TEST_F(LogManagerTest, TakesEmptyEnvironmentVariablesForUnset) {
+TEST_F(LogManagerTest, TreatsEmptyEnvironmentVariablesAsUnset) {
     for (const char* name : {"ZRM_CONFIG_FILE", "ZRM_SYSLOG_CONF", "AGENT_DEBUG_LOG"}) {
         setenv(name, "", 1);
     }
@@ -108,7 +108,7 @@ TEST_F(LogManagerTest, TracesTheStartOfItsMutexAndConditions) {
                             "Log manager unlocked."));
 }
 
-TEST_F(LogManagerTest, TracesNoErrorInASoundLife) {
+TEST_F(LogManagerTest, TracesNoErrorIfNothingFails) {
     trace.setLevel(TRC1_ERROR);
     configure(a + "\n");
     manager = std::make_unique<LogManager>();
@@ -120,7 +120,7 @@ TEST_F(LogManagerTest, TracesNoErrorInASoundLife) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(LogManagerTest, GoesOnWhereItsThreadCannotBeMadeJoinable) {
+TEST_F(LogManagerTest, ContinuesIfItsThreadCannotBeMadeJoinable) {
     trace.setLevel(TRC1_ERROR);
     Fault fault("pthread_attr_setdetachstate", EINVAL);
     configure(a + "\n");
@@ -159,12 +159,12 @@ TEST_F(LogManagerTest, DumpsAllFieldsWhateverTheLevel) {
         static_cast<void*>(manager.get()), config.c_str(), std::ctime(&epoch), syslogConfig.c_str(),
         std::ctime(&epoch), static_cast<void*>(manager->getNextLogObject(nullptr, 0)),
         static_cast<void*>(nullptr), directory.file("debug.log").c_str(),
-        static_cast<void*>(manager->debugLogStream()));
+        static_cast<void*>(debugLogStream()));
     EXPECT_THAT(trace.messages(), ElementsAre(expected));
     manager->endRequest();
 }
 
-TEST_F(LogManagerTest, BothTimesOfTheDumpAreTheSyslogConfigurations) {
+TEST_F(LogManagerTest, BothDumpedTimesAreThatOfTheSyslogConfiguration) {
     configure("# empty\n");
     configureSyslog("*.err " + a + "\n");
     start();
@@ -232,7 +232,7 @@ TEST_F(LogManagerTest, TracesAFailedBroadcast) {
                 ElementsAre("Error signaling condition variable. errno = 22; Invalid argument"));
 }
 
-TEST_F(LogManagerTest, EachSampleMaySayThatTheServerIsUp) {
+TEST_F(LogManagerTest, TheServerMayBeReportedUpMoreThanOnce) {
     configure(a + "\n");
     start();
     trace.clear();
@@ -268,7 +268,7 @@ TEST_F(LogManagerTest, AnEmptyManagerHasNoLogs) {
     manager->setServerUp();
 }
 
-TEST_F(LogManagerTest, AChainOfThreeGivesEachLogOnce) {
+TEST_F(LogManagerTest, AChainOfThreeReturnsEachLogOnce) {
     configure(a + "\n" + b + "\n" + c + "\n");
     start();
     EXPECT_THAT(logs(), ElementsAre(a, b, c));
@@ -303,13 +303,13 @@ TEST_F(LogManagerTest, TheDebugLogIsAppendedLineByLineAndNotInherited) {
     configure(a + "\n");
     setDebugLog(path);
     start();
-    std::FILE* const stream = manager->debugLogStream();
+    std::FILE* const stream = debugLogStream();
     ASSERT_NE(stream, nullptr);
     EXPECT_EQ(fcntl(fileno(stream), F_GETFD, 0) & FD_CLOEXEC, FD_CLOEXEC);
     std::fputs("line\npart", stream);
     EXPECT_EQ(content(path), "before\nline\n");
     refresh();
-    EXPECT_EQ(manager->debugLogStream(), stream);
+    EXPECT_EQ(debugLogStream(), stream);
     manager.reset();
     EXPECT_EQ(content(path), "before\nline\npart");
 }
@@ -317,7 +317,7 @@ TEST_F(LogManagerTest, TheDebugLogIsAppendedLineByLineAndNotInherited) {
 TEST_F(LogManagerTest, WithoutItsVariableThereIsNoDebugLog) {
     configure(a + "\n");
     start();
-    EXPECT_EQ(manager->debugLogStream(), nullptr);
+    EXPECT_EQ(debugLogStream(), nullptr);
 }
 
 TEST_F(LogManagerTest, ADebugLogThatCannotBeOpenedIsTriedAgainAtTheNextRefresh) {
@@ -329,11 +329,11 @@ TEST_F(LogManagerTest, ADebugLogThatCannotBeOpenedIsTriedAgainAtTheNextRefresh) 
     ASSERT_TRUE(waitUntil([&] { return manager->numLogs() == 1; }));
     EXPECT_THAT(trace.messages(), ElementsAre("Error opening debug log \"" + path +
                                               "\"; errno = 2; No such file or directory"));
-    EXPECT_EQ(manager->debugLogStream(), nullptr);
+    EXPECT_EQ(debugLogStream(), nullptr);
     std::filesystem::create_directory(directory.file("missing"));
     trace.setLevel(TRC1_DETAIL);
     refresh();
-    EXPECT_NE(manager->debugLogStream(), nullptr);
+    EXPECT_NE(debugLogStream(), nullptr);
 }
 
 } // namespace

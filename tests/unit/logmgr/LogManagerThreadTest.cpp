@@ -35,7 +35,7 @@ protected:
         EXPECT_TRUE(trace.contains("Log manager mutex destroyed."));
         EXPECT_THAT(messagesThatBegin({"Error"}), IsEmpty());
     }
-    /// What a started manager with its server up traces when it receives this signal.
+    /// Starts a manager with its server up and returns what it traces for this signal.
     std::vector<std::string> end(int number) {
         trace.setLevel(TRC1_DETAIL);
         start();
@@ -143,7 +143,7 @@ TEST_F(LogManagerThreadTest, IsCancelledWhileItWaitsForTheServer) {
     EXPECT_EQ(AgentDoubles::shutdowns(), 0);
 }
 
-TEST_F(LogManagerThreadTest, IsCancelledWhileItSleepsForWantOfWork) {
+TEST_F(LogManagerThreadTest, IsCancelledWhileItSleepsWithoutWork) {
     configure("");
     manager = std::make_unique<LogManager>();
     ASSERT_TRUE(trace.waitFor("Agent has no work to do.  Exiting..."));
@@ -151,7 +151,7 @@ TEST_F(LogManagerThreadTest, IsCancelledWhileItSleepsForWantOfWork) {
 }
 
 TEST_F(LogManagerThreadTest, IsNotCancelledWhileItBuildsItsLogs) {
-    // Whenever the stop comes, the logs are whole and all of them are deleted.
+    // Whenever the stop comes, every log is complete and is deleted.
     for (int i = 0; i < 20; ++i) {
         configure(a + "\n" + b + "\n" + c + "\n");
         manager = std::make_unique<LogManager>();
@@ -196,7 +196,7 @@ TEST_F(LogManagerThreadDeathTest, AServerThatNeverComesUpEndsTheProcess) {
         },
         ExitedWithCode(255),
         std::string("\n") + suspended + "\nLog manager unlocked.\n" + timedOut);
-    // In no other class.
+    // The message is in no other class.
     EXPECT_EXIT(
         {
             const FakeTimedWait timeOut;

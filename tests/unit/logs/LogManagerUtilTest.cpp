@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <cstring>
 #include <string>
 #include <vector>
@@ -41,7 +42,7 @@ protected:
     }
 };
 
-TEST_F(LogManagerUtilTest, GivesTheModificationTimeOfARegularFile) {
+TEST_F(LogManagerUtilTest, ReturnsTheModificationTimeOfARegularFile) {
     const std::string path = directory.write("file", "");
     const utimbuf times{1000, 1234567890};
     ASSERT_EQ(utime(path.c_str(), &times), 0);
@@ -62,7 +63,7 @@ TEST_F(LogManagerUtilTest, ADirectoryHasNoModificationTime) {
     EXPECT_THAT(trace.messages(), ElementsAre("The file " + path + " is not a regular file."));
 }
 
-TEST_F(LogManagerUtilTest, CommentsBlankLinesAndOverlongLinesAreNoRecords) {
+TEST_F(LogManagerUtilTest, CommentsBlankLinesAndOverlongLinesAreNotRecords) {
     EXPECT_THAT(records("# comment\n\n   \t \n" + std::string(1024, 'x') + "\n#\n" +
                         std::string(5000, 'y') + "\n"),
                 ElementsAre());
@@ -95,12 +96,12 @@ TEST_F(LogManagerUtilTest, APieceThatBeginsLikeACommentTakesTheNextLineWithIt) {
                 ElementsAre("/kept"));
 }
 
-TEST_F(LogManagerUtilTest, ALastLineWithoutNewlineIsNoRecord) {
+TEST_F(LogManagerUtilTest, ALastLineWithoutNewlineIsNotARecord) {
     EXPECT_THAT(records("/a\n/b"), ElementsAre("/a"));
     EXPECT_THAT(records("/c\n"), ElementsAre("/c"));
 }
 
-TEST_F(LogManagerUtilTest, ALineThatBeginsWithNulIsDroppedWithItsSuccessor) {
+TEST_F(LogManagerUtilTest, ALineThatBeginsWithNulIsDroppedWithTheNextLine) {
     EXPECT_THAT(records(std::string("\0x\n/lost\n/kept\n", 15)), ElementsAre("/kept"));
 }
 
@@ -155,7 +156,7 @@ TEST_F(LogManagerUtilTest, StreamsAreNotInheritedAndKeepTheirMode) {
     std::fclose(stream);
 }
 
-TEST_F(LogManagerUtilTest, AFileToWriteIsForOwnerAndGroupAlone) {
+TEST_F(LogManagerUtilTest, AFileToWriteIsAccessibleToOwnerAndGroupOnly) {
     const mode_t before = umask(0);
     const std::string path = directory.file("stream");
     std::FILE* const stream = LogManagerUtil::openStream(path.c_str(), "a");
@@ -167,7 +168,7 @@ TEST_F(LogManagerUtilTest, AFileToWriteIsForOwnerAndGroupAlone) {
     EXPECT_EQ(status.st_mode & 0777, 0640u);
 }
 
-TEST_F(LogManagerUtilTest, AFileToWriteIsNotWhereALinkLeads) {
+TEST_F(LogManagerUtilTest, AFileToWriteIsNotOpenedThroughALink) {
     const std::string path = directory.file("stream");
     const std::string target = directory.file("target");
     ASSERT_EQ(symlink(target.c_str(), path.c_str()), 0);
@@ -176,11 +177,11 @@ TEST_F(LogManagerUtilTest, AFileToWriteIsNotWhereALinkLeads) {
     EXPECT_NE(access(target.c_str(), F_OK), 0);
     directory.write("target", "line\n");
     std::FILE* const stream = LogManagerUtil::openStream(path.c_str(), "r");
-    ASSERT_NE(stream, nullptr) << "what is read may be a link";
+    ASSERT_NE(stream, nullptr) << "a file to read may be a link";
     std::fclose(stream);
 }
 
-TEST_F(LogManagerUtilTest, AStreamThatCannotBeMadeLeavesNoDescriptor) {
+TEST_F(LogManagerUtilTest, AStreamThatCannotBeCreatedLeavesNoDescriptor) {
     const std::string path = directory.write("file", "");
     Fault fault("fdopen", ENOMEM);
     Fault closed("close", EIO, {.times = 0});
@@ -198,6 +199,17 @@ TEST_F(LogManagerUtilTest, TheHexadecimalDumpIsAlwaysEmpty) {
     EXPECT_STREQ(out, "");
     out[0] = 'x';
     EXPECT_STREQ(LogManagerUtil::xtoa(out, &word, 0), "");
+}
+
+TEST_F(LogManagerUtilTest, TheHexadecimalDumpIsAnOperationThatReturnsItsBuffer) {
+    trace.setLevel(TRC1_FLOW);
+    char out[9];
+    const unsigned word = 0xDEADBEEF;
+    LogManagerUtil::xtoa(out, &word, sizeof word);
+    EXPECT_THAT(trace.events(),
+                ElementsAre("LogManagerUtil.cpp entry",
+                            "LogManagerUtil.cpp exit " +
+                                std::to_string(reinterpret_cast<std::intptr_t>(out))));
 }
 
 } // namespace

@@ -44,7 +44,7 @@ protected:
     RecordingTrace trace{TRC1_ERROR};
 };
 
-TEST_F(ValidLogTest, ANameAloneIsASyslogWithoutDebug) {
+TEST_F(ValidLogTest, ANameAloneIsASyslogWithoutDebugMode) {
     const auto line = user(log);
     EXPECT_TRUE(line->isValid());
     EXPECT_EQ(line->type(), 'S');
@@ -127,7 +127,7 @@ TEST_F(ValidLogTest, AnErrorLogIsAcceptedOnAix) {
     EXPECT_STREQ(user(log + " ;N ;E")->procedure(), "");
 }
 
-TEST_F(ValidLogTest, AnErrorLogIsAcceptedWhereTheSystemCannotBeTold) {
+TEST_F(ValidLogTest, AnErrorLogIsAcceptedIfTheSystemIsUnknown) {
     Fault fault("uname", EFAULT);
     const auto line = user(log + " ;N ;E");
     EXPECT_TRUE(line->isValid());
@@ -168,7 +168,7 @@ TEST_F(ValidLogTest, ANamelessLogSubstitutesNothingForTheName) {
     EXPECT_STREQ(line->procedure(), "");
 }
 
-TEST_F(ValidLogTest, TheProcedureKeepsItsInnerSpacesButForATabBehindItsFirstWord) {
+TEST_F(ValidLogTest, TheProcedureKeepsItsInnerSpacesExceptATabAfterItsFirstWord) {
     EXPECT_STREQ(user(log + " ; ;U ;a  b\tc ;d ")->procedure(), "a  b\tc ;d ");
     EXPECT_STREQ(user(log + " ; ;U ;a\tb\tc")->procedure(), "a b\tc");
     EXPECT_STREQ(user(log + " ; ;U ;a ")->procedure(), "a");
@@ -250,7 +250,7 @@ TEST_F(ValidLogTest, AMissingFileAndADirectoryAreRefused) {
                                               "Ignoring remainder of line."));
 }
 
-TEST_F(ValidLogTest, AFileOfTheEpochCountsAsMissing) {
+TEST_F(ValidLogTest, AFileModifiedAtTheEpochCountsAsMissing) {
     const utimbuf epoch{0, 0};
     ASSERT_EQ(utime(log.c_str(), &epoch), 0);
     EXPECT_FALSE(user(log)->isValid());
@@ -265,7 +265,7 @@ TEST_F(ValidLogTest, ANameThatHasNoLocalFormIsRefused) {
 }
 
 TEST_F(ValidLogTest, ANameThatItsConversionChangesIsRefused) {
-    // The conversion of the damaged character gives the name of another file, which is there.
+    // The conversion turns the damaged character into the name of another, existing file.
     const std::string other = directory.write("cafx", "");
     const std::string damaged = directory.write("caf\xE9x", "");
     EXPECT_FALSE(user(damaged)->isValid());
@@ -293,7 +293,7 @@ TEST_F(ValidLogTest, TheActionOfASyslogLineIsInTheLocalCodePage) {
     EXPECT_EQ(line->fileNameUTF8(), directory.file("l\xC3\xB6g"));
 }
 
-TEST_F(ValidLogTest, SyslogActionsThatAreNoFilesAreDroppedSilently) {
+TEST_F(ValidLogTest, SyslogActionsThatAreNotFilesAreDroppedSilently) {
     trace.setLevel(TRC1_ERROR | TRC1_DETAIL);
     EXPECT_FALSE(syslog("*.alert root")->isValid());
     EXPECT_FALSE(syslog("*.emerg *")->isValid());

@@ -20,7 +20,7 @@ struct AccountingRecord {
     std::int16_t exit = 0;
     std::int64_t time = 0;
 
-    /// The 40 bytes as they stand in the file, put together byte by byte.
+    /// The 40 bytes of the record in the file, assembled byte by byte.
     std::string bytes() const {
         return field(user, 8) + field(id, 4) + field(line, 12) + number(pid, 2) + number(type, 2) +
                number(termination, 2) + number(exit, 2) + number(time, 8);

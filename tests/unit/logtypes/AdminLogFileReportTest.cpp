@@ -29,7 +29,7 @@ constexpr std::int64_t dayStart = 1159920000; // 4 October 2006 00:00:00 UTC
 
 class AdminLogFileReportTest : public LogTypeTest {
 protected:
-    // Reports need no monitor: this one ends at once.
+    // Reports need no monitor, so this one ends immediately.
     AdminLogFileReportTest() {
         const Fault fault("open", EACCES);
         m_monitor = std::make_unique<AdminLogFile>(*validLog(log, " ;N ;A"), nullptr);
@@ -37,7 +37,8 @@ protected:
         trace.clear();
     }
 
-    /// A file of `count` records, one a minute from the day's start, by users "u0", "u1" and so on.
+    /// A file of `count` records, one per minute from the start of the day, for users "u0", "u1",
+    /// ...
     void write(int count, const std::string& tail = "") {
         std::string bytes;
         for (int i = 0; i < count; ++i) {
@@ -47,7 +48,7 @@ protected:
         directory.write("wtmp", bytes + tail);
     }
 
-    /// How often this process has the log open.
+    /// How many times this process has the log open.
     std::ptrdiff_t descriptorsOfTheLog() const {
         std::ptrdiff_t count = 0;
         for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
@@ -57,7 +58,7 @@ protected:
         return count;
     }
 
-    /// The users of the rows that a report over the window returns, in its order.
+    /// The users of the rows that a report on the window returns, in that order.
     std::vector<std::string> report(const char* start, const char* end) {
         _RequestThresholds thresholds = window(start, end);
         void* state = m_monitor->startReportRequest(&thresholds);
@@ -99,10 +100,10 @@ private:
     std::unique_ptr<AdminLogFile> m_monitor;
 };
 
-TEST_F(AdminLogFileReportTest, GivesTheRecordsOfTheWindowNewestFirst) {
+TEST_F(AdminLogFileReportTest, ReturnsTheRecordsOfTheWindowNewestFirst) {
     write(10);
     EXPECT_EQ(report("1061004000200000", "1061004000500000"), users(5, 2));
-    // An older record ends the report: the file's start is not reached.
+    // An older record ends the report before the start of the file.
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
@@ -151,7 +152,7 @@ TEST_F(AdminLogFileReportTest, ReadsRecordsAcrossTheBlocksOfAFileSystem) {
 
 TEST_F(AdminLogFileReportTest, TakesTheLast40BytesOfAFileThatEndsWithinARecord) {
     write(2, std::string(10, '\0'));
-    // Each record starts 10 bytes late, where no user's name is; at the start 10 bytes remain.
+    // Each record starts 10 bytes late, where there is no user name; 10 bytes remain at the start.
     EXPECT_THAT(wholeReport(), ElementsAre("", ""));
     EXPECT_THAT(trace.messages(), ElementsAre(endMessage(10)));
     trace.clear();
@@ -160,7 +161,7 @@ TEST_F(AdminLogFileReportTest, TakesTheLast40BytesOfAFileThatEndsWithinARecord) 
     EXPECT_THAT(trace.messages(), ElementsAre(endMessage(39)));
 }
 
-TEST_F(AdminLogFileReportTest, SaysWhyItEnds) {
+TEST_F(AdminLogFileReportTest, ReportsWhyItEnds) {
     const auto endOf = [this](int count, const std::string& tail) {
         write(count, tail);
         const ReportOutcome outcome;
@@ -174,7 +175,7 @@ TEST_F(AdminLogFileReportTest, SaysWhyItEnds) {
     EXPECT_EQ(endOf(10, ""), ReportEnd::readError);
 }
 
-TEST_F(AdminLogFileReportTest, OfAnEmptyLogDoesNotStart) {
+TEST_F(AdminLogFileReportTest, DoesNotStartOnAnEmptyLog) {
     trace.setLevel(TRC1_DETAIL);
     EXPECT_THAT(wholeReport(), ElementsAre("no report"));
     EXPECT_TRUE(trace.contains("Log " + log + " is empty; report request terminating."));

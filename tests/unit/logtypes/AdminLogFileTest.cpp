@@ -81,7 +81,7 @@ protected:
     /// Starts a monitor and waits until it follows the file.
     std::unique_ptr<AdminLogFile> startAndFollow() {
         auto monitor = start();
-        // The loop looks at the file's size before it waits for the first time.
+        // The loop checks the size of the file before its first wait.
         EXPECT_TRUE(waitUntil([&] { return polling.calls() > 0; }));
         return monitor;
     }
@@ -123,7 +123,7 @@ protected:
                                 .exit = 1,
                                 .time = oneMoment};
 
-    // Counts the loop's looks at the file, of which each ends with a wait.
+    // Counts the loop's checks of the file: each ends with a wait.
     const Fault polling{"select", 0, {.times = 0}};
     const ShortSelect shortSelect;
 };
@@ -210,7 +210,7 @@ TEST_F(AdminLogFileTest, AnIncompleteRecordEndsTheMonitorAndARefreshRestartsIt) 
     EXPECT_THAT(trace.messages(), ElementsAre("Incomplete record read from file " + log +
                                               ". Bytes read = 20; bytes expected = 40"));
 
-    // The bytes of the incomplete record are lost: what follows them starts a record.
+    // The bytes of the incomplete record are lost; the next byte starts a record.
     trace.clear();
     const int looks = polling.calls();
     static_cast<LogFile&>(*monitor) = *validLog(log, " ;N ;A");
@@ -224,7 +224,7 @@ TEST_F(AdminLogFileTest, AnIncompleteRecordEndsTheMonitorAndARefreshRestartsIt) 
 
 // The reader takes many records at once, and finds the first part of the last one. By the time
 // that record's turn comes its rest is there, as when every record is read by itself.
-TEST_F(AdminLogFileTest, ARecordWhoseRestComesBeforeItsTurnIsWhole) {
+TEST_F(AdminLogFileTest, ARecordCompletedBeforeItsTurnIsWhole) {
     const auto monitor = startAndFollow();
     AccountingRecord split = root;
     split.user = "split";
@@ -244,7 +244,7 @@ TEST_F(AdminLogFileTest, ARecordWhoseRestComesBeforeItsTurnIsWhole) {
     EXPECT_THAT(trace.messages(), ElementsAre());
 }
 
-TEST_F(AdminLogFileTest, ARecordOfWhichMoreCameByItsTurnIsStillIncomplete) {
+TEST_F(AdminLogFileTest, APartialRecordThatGrewBeforeItsTurnIsStillIncomplete) {
     const auto monitor = startAndFollow();
     EventRecorder::onRow([&](std::size_t count) {
         if (count == 1) {
@@ -287,7 +287,7 @@ TEST_F(AdminLogFileTest, AFileThatCannotBeOpenedEndsTheMonitor) {
                                               ". errno = 2; No such file or directory"));
 }
 
-TEST_F(AdminLogFileTest, AFailedSearchForTheEndEndsTheMonitor) {
+TEST_F(AdminLogFileTest, AFailedSeekToTheEndEndsTheMonitor) {
     const Fault fault("lseek", EOVERFLOW);
     const auto monitor = start();
     ASSERT_TRUE(waitForStatus(*monitor, MONITOR_ERR_SEEK_EOF));
@@ -316,7 +316,7 @@ TEST_F(AdminLogFileTest, DumpsItselfAtTheStartWhenTheDetailClassIsOn) {
     }));
 }
 
-TEST_F(AdminLogFileTest, ItsDescriptorDoesNotReachOtherPrograms) {
+TEST_F(AdminLogFileTest, OtherProgramsDoNotInheritItsDescriptor) {
     const Fault opened("open", 0, {.times = 0});
     const auto monitor = startAndFollow();
     EXPECT_GE(opened.calls(), 1);

@@ -16,8 +16,8 @@ namespace {
 
 class CreateLogFile : public SyslogTest {
 protected:
-    /// Creates the object of a line with these fields, whose monitor ends at once, and tells
-    /// whether it is of the kind.
+    /// Creates the object of a line with these fields, whose monitor ends immediately. Returns
+    /// true if it has the type.
     template <typename Kind> bool makes(const std::string& fields) {
         const FakeUname aix("AIX");
         const auto line = validLog(m_path, fields);
@@ -29,7 +29,7 @@ protected:
     }
 };
 
-TEST_F(CreateLogFile, KnowsTheKindsOfLogs) {
+TEST_F(CreateLogFile, KnowsTheTypesOfLogs) {
     for (int letter = 1; letter < 128; ++letter) {
         const char type = static_cast<char>(letter);
         const bool isKind = std::string_view("USAE").find(type) != std::string_view::npos;
@@ -37,27 +37,27 @@ TEST_F(CreateLogFile, KnowsTheKindsOfLogs) {
     }
 }
 
-TEST_F(CreateLogFile, MakesARunningObjectOfTheLinesKindOnTheChain) {
-    const Fault fault("open", EACCES); // its monitor ends at once
+TEST_F(CreateLogFile, CreatesARunningObjectOfTheLinesTypeOnTheChain) {
+    const Fault fault("open", EACCES); // its monitor ends immediately
     const std::unique_ptr<LogFile> log(createLogFile(*m_line, m_log.get()));
     EXPECT_NE(dynamic_cast<SysLogFile*>(log.get()), nullptr);
     EXPECT_EQ(m_log->next(), log.get());
     EXPECT_NE(log->monitorStatus(), MONITOR_NOT_STARTED);
 }
 
-TEST_F(CreateLogFile, MakesEachKindByItsLetter) {
+TEST_F(CreateLogFile, CreatesEachTypeByItsLetter) {
     EXPECT_TRUE(makes<SysLogFile>(" ;N ;S"));
     EXPECT_TRUE(makes<UserLogFile>(" ;N ;U ;%s DESCRIPTION"));
     EXPECT_TRUE(makes<AdminLogFile>(" ;N ;A"));
     EXPECT_TRUE(makes<ErrLogFile>(" ;N ;E ;errpt -c"));
 }
 
-TEST_F(CreateLogFile, EachKindThatTailsAFileWaitsForASecondBetweenItsLooks) {
+TEST_F(CreateLogFile, EachTypeThatTailsAFileWaitsASecondBetweenChecks) {
     for (const char* fields : {" ;N ;S", " ;N ;U ;A , \"%s\" , description", " ;N ;A"}) {
         const ShortSelect select;
         const auto line = validLog(m_path, fields);
         const std::unique_ptr<LogFile> log(createLogFile(*line, nullptr));
-        // More than one, since the call may change the time that it is given.
+        // More than one, because the call may change its argument.
         const Fault looks("select", 0, {.times = 0});
         for (int tries = 0; tries < 5000 && looks.calls() < 4; ++tries) {
             std::this_thread::sleep_for(std::chrono::milliseconds(2));
@@ -67,7 +67,7 @@ TEST_F(CreateLogFile, EachKindThatTailsAFileWaitsForASecondBetweenItsLooks) {
     }
 }
 
-TEST_F(CreateLogFile, GivesNothingWhenMemoryRunsOut) {
+TEST_F(CreateLogFile, ReturnsNullWhenMemoryRunsOut) {
     const Fault fault("new", ENOMEM);
     EXPECT_EQ(createLogFile(*m_line, m_log.get()), nullptr);
     EXPECT_EQ(m_log->next(), m_log.get());

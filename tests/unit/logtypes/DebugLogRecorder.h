@@ -12,7 +12,7 @@ namespace DebugLogRecorder {
 /// What one entry hands over.
 struct Record {
     std::string entry;
-    std::string row; ///< the row's bytes; empty when the entry was rejected
+    std::string row; ///< the row's bytes; empty if the entry was rejected
     bool operator==(const Record&) const = default;
 };
 

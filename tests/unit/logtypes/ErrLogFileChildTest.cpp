@@ -96,7 +96,7 @@ TEST_F(ErrLogFileChildTest, StoppingEndsAChildThatHasFilledItsPipe) {
     auto monitor = start(endlessEntries);
     ASSERT_EQ(EventRecorder::waitForRows(1).size(), 1U);
     const int pid = childId();
-    // A shell that waits for room in the pipe sleeps, and goes on sleeping.
+    // A shell that waits for room in the pipe sleeps and keeps sleeping.
     ASSERT_TRUE(waitUntil([&] {
         for (int i = 0; i < 20; ++i) {
             if (processState(pid) != 'S') {
@@ -115,7 +115,7 @@ TEST_F(ErrLogFileChildTest, StoppingEndsAChildThatHasFilledItsPipe) {
     EXPECT_TRUE(hasNoChild());
 }
 
-TEST_F(ErrLogFileChildTest, StoppingAlsoEndsWhatTheShellHasStarted) {
+TEST_F(ErrLogFileChildTest, StoppingAlsoEndsWhatTheShellStarted) {
     auto monitor = startAndRead("sleep 1000 & echo $!; wait");
     const int grandchild = std::atoi(firstLine().c_str());
     ASSERT_GT(grandchild, 0);
@@ -124,8 +124,8 @@ TEST_F(ErrLogFileChildTest, StoppingAlsoEndsWhatTheShellHasStarted) {
     EXPECT_TRUE(waitUntil([&] { return hasEnded(grandchild); }));
 }
 
-TEST_F(ErrLogFileChildTest, WhatOutlivesTheShellIsEndedWithItsOutput) {
-    // The shell ends at once; its pipe stays open and is read.
+TEST_F(ErrLogFileChildTest, WhatOutlivesTheShellEndsWithTheMonitor) {
+    // The shell ends immediately; its pipe stays open and is read.
     auto monitor = start("{ sleep 0.2; " + printing(entry) + "; exec sleep 1000; } & echo $!");
     ASSERT_EQ(EventRecorder::waitForRows(1).size(), 1U);
     EXPECT_EQ(monitor->monitorStatus(), MONITOR_RUNNING);
@@ -156,10 +156,10 @@ TEST_F(ErrLogFileChildTest, AChildBlocksNoSignalAndIgnoresNeitherPipeNorTerminat
     EXPECT_EQ(ignored & (1ULL << (SIGTERM - 1)), 0U);
 }
 
-TEST_F(ErrLogFileChildTest, AChildFindsTheStandardDescriptorsOnly) {
+TEST_F(ErrLogFileChildTest, AChildInheritsOnlyTheStandardDescriptors) {
     const auto other = startAndRead("echo; exec sleep 1000");
     DebugLogRecorder::clear();
-    // As if another thread had opened it and not yet said that it closes on exec.
+    // As if another thread had opened it and not yet set it to close on exec.
     const int open = dup(0);
     const auto monitor = start("ls /proc/self/fd; echo end");
     const auto records = DebugLogRecorder::waitForRecords(5);
@@ -220,7 +220,7 @@ TEST_F(ErrLogFileChildTest, AFailedExecGivesStatus255) {
         trace.waitFor("Thread for log file " + log + " terminating.");
     }
     EXPECT_THAT(errors(), Contains(terminated("echo", "normally; exit status = 255")));
-    // A number with which exec does not fail has no text.
+    // An error that exec does not have has no text.
     EXPECT_THAT(trace.childMessages(),
                 Contains("Error executing command echo for file " + log +
                          ". errno = 74; Unknown error.  Use the error number and message to "
@@ -293,7 +293,7 @@ TEST_F(ErrLogFileChildTest, TracesTheCloseOfTheDescriptor) {
     close(numberAfter("pipe; fd = "));
 }
 
-TEST_F(ErrLogFileChildTest, DescribesEveryWayInWhichAChildEnds) {
+TEST_F(ErrLogFileChildTest, DescribesEveryWayAChildCanEnd) {
     const auto monitor = start("exit");
     ASSERT_TRUE(trace.waitFor("Thread for log file " + log + " terminating."));
     const auto described = [&](int status, TRC1_Class traceClass) {

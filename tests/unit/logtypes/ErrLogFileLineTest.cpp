@@ -13,9 +13,9 @@ namespace {
 
 class ErrLogFileLineTest : public ErrLogTest {
 protected:
-    /// Formats a line; the result is what formatEntryAsRow returns.
+    /// Formats a line and returns the result of formatEntryAsRow.
     long format(const std::string& text) {
-        // A copy of its own size: a look behind the text is an error that a sanitizer sees.
+        // A copy of the exact size, so that a sanitizer detects a read past the text.
         const auto copy = std::make_unique<char[]>(text.size() + 1);
         std::memcpy(copy.get(), text.c_str(), text.size() + 1);
         return m_monitor->formatEntryAsRow(copy.get(), &row, nullptr);
@@ -103,7 +103,7 @@ TEST_F(ErrLogFileLineTest, TakesTheCenturyFromTheYear) {
     EXPECT_EQ(time("10040303-6"), "none");
 }
 
-TEST_F(ErrLogFileLineTest, GoesOnBehindTheCharacterAfterTheTime) {
+TEST_F(ErrLogFileLineTest, ContinuesAfterTheCharacterThatFollowsTheTime) {
     char stamp[16];
     const char* const line = "A924A5FC   1004030306xP S";
     EXPECT_STREQ(ErrLogFile::formatEntryTime(stamp, line), "P S");
@@ -143,7 +143,7 @@ TEST_F(ErrLogFileLineTest, FieldsAreSeparatedByAnyWhiteSpace) {
     EXPECT_EQ(columnText(row.entrydesc), "A924A5FC: more");
 }
 
-TEST_F(ErrLogFileLineTest, AFieldLosesItsCharacterBehindTheMaximumAndRunsOn) {
+TEST_F(ErrLogFileLineTest, AFieldLosesTheCharacterAfterItsMaximumAndRunsOn) {
     char space[16];
     std::memset(space, '.', sizeof space);
     const char* const text = "abcdefgh  next";
@@ -155,7 +155,7 @@ TEST_F(ErrLogFileLineTest, AFieldLosesItsCharacterBehindTheMaximumAndRunsOn) {
     std::memset(space, '.', sizeof space);
     ErrLogFile::extractNextField(space, text, 8, space + sizeof space);
     EXPECT_EQ(whole(space), "abcdefgh........");
-    // Nothing is written at the end or behind it.
+    // Nothing is written at or past the end.
     std::memset(space, '.', sizeof space);
     EXPECT_STREQ(ErrLogFile::extractNextField(space, text, 4, space + 6), "next");
     EXPECT_EQ(whole(space), "abcdfg..........");

@@ -28,7 +28,7 @@ constexpr const char* endless =
 
 class ErrLogFileReportTest : public ErrLogTest {
 protected:
-    // The monitor's own command ends at once: reports do not need it.
+    // The monitor's own command ends immediately: reports do not need it.
     ErrLogFileReportTest() {
         EXPECT_TRUE(waitUntil([&] { return trace.messages().size() == 1; }));
         m_monitor->stopThread();
@@ -38,7 +38,7 @@ protected:
     }
     ~ErrLogFileReportTest() override { setenv("PATH", m_path.c_str(), 1); }
 
-    /// Puts an "errpt" on the search path that keeps its arguments and then runs `script`.
+    /// Puts an "errpt" on the search path that stores its arguments and then runs `script`.
     void installErrpt(const std::string& script) const {
         const std::string program =
             directory.write("errpt", "#!/bin/sh\nfor word in \"$@\"; do echo \"$word\"; done > " +
@@ -85,7 +85,7 @@ private:
     const std::unique_ptr<ErrLogFile> m_monitor = start("exit");
 };
 
-TEST_F(ErrLogFileReportTest, GivesTheCommandsLinesWithoutTheHeader) {
+TEST_F(ErrLogFileReportTest, ReturnsTheCommandsLinesWithoutTheHeader) {
     installOutput(std::string(header) + entry + otherEntry);
     EXPECT_THAT(report(), ElementsAre("A924A5FC: SOFTWARE PROGRAM ABNORMALLY TERMINATED",
                                       "BFE4C025: UNDETERMINED ERROR"));
@@ -159,7 +159,7 @@ TEST_F(ErrLogFileReportTest, EndsAtALineThatIsNotAnEntry) {
                 ElementsAre(DebugLogRecorder::Record{"no entry\n", ""}));
 }
 
-TEST_F(ErrLogFileReportTest, SaysWhyItEnds) {
+TEST_F(ErrLogFileReportTest, ReportsWhyItEnds) {
     const auto endOf = [this](const std::string& output) {
         installOutput(output);
         const ReportOutcome outcome;
@@ -174,7 +174,7 @@ TEST_F(ErrLogFileReportTest, SaysWhyItEnds) {
     EXPECT_EQ(outcome.end(), ReportEnd::commandFailed);
 }
 
-TEST_F(ErrLogFileReportTest, TakesTheRestOfALongLineForALine) {
+TEST_F(ErrLogFileReportTest, TreatsTheRestOfALongLineAsALine) {
     std::string text = entry;
     text.pop_back();
     text.resize(255, 'x');
@@ -183,7 +183,7 @@ TEST_F(ErrLogFileReportTest, TakesTheRestOfALongLineForALine) {
     EXPECT_THAT(DebugLogRecorder::records(), ElementsAre(DebugLogRecorder::Record{"yyy\n", ""}));
 }
 
-TEST_F(ErrLogFileReportTest, EndedEarlyLeavesACommandThatStillWritesABrokenPipe) {
+TEST_F(ErrLogFileReportTest, WhenEndedEarlyLeavesAWritingCommandABrokenPipe) {
     installErrpt(endless);
     const auto oldPipe = std::signal(SIGPIPE, SIG_IGN);
     EXPECT_EQ(report(october(), 3).size(), 3U);
@@ -193,7 +193,7 @@ TEST_F(ErrLogFileReportTest, EndedEarlyLeavesACommandThatStillWritesABrokenPipe)
     EXPECT_TRUE(hasNoChild());
 }
 
-TEST_F(ErrLogFileReportTest, WithoutTheProgramReturnsNoRowAndSaysHowTheChildEnded) {
+TEST_F(ErrLogFileReportTest, WithoutTheProgramReturnsNoRowAndTracesHowTheChildEnded) {
     setenv("PATH", directory.path().c_str(), 1);
     trace.setLevel(TRC1_ERROR | TRC1_DETAIL);
     EXPECT_THAT(report(), IsEmpty());
@@ -216,7 +216,7 @@ TEST_F(ErrLogFileReportTest, DoesNotStartWithoutMemory) {
                                               "Cannot allocate memory"));
 }
 
-TEST_F(ErrLogFileReportTest, GoesOnWithoutMemoryForTheCommandsText) {
+TEST_F(ErrLogFileReportTest, ContinuesWithoutMemoryForTheCommandsText) {
     installOutput(std::string(header) + entry);
     trace.setLevel(TRC1_ERROR | TRC1_DETAIL);
     const Fault fault("new", ENOMEM, {.skip = 1});
@@ -253,14 +253,14 @@ TEST_F(ErrLogFileReportTest, DoesNotStartWithoutAStream) {
     EXPECT_EQ(errors().at(0), "Error converting read pipe fd N to file pointer for report on log "
                               "file " +
                                   log + ". errno = 12; Cannot allocate memory");
-    // The child, which had no text for its command yet, met a pipe that nobody reads.
+    // The child, which had no text for its command yet, wrote to a pipe that nobody reads.
     EXPECT_EQ(errors().at(1), "Report command  ( pid = N ) for file " + log +
                                   " has terminated abnormally; signal number = 13");
     EXPECT_EQ(openDescriptors(), descriptors);
     EXPECT_TRUE(hasNoChild());
 }
 
-TEST_F(ErrLogFileReportTest, TracesAFailedReadWithOneArgumentLessThanItsPlaces) {
+TEST_F(ErrLogFileReportTest, TracesAFailedReadWithOneArgumentTooFew) {
     const UnreadableStreams unreadable;
     installOutput("");
     EXPECT_THAT(report(), IsEmpty());
@@ -268,7 +268,7 @@ TEST_F(ErrLogFileReportTest, TracesAFailedReadWithOneArgumentLessThanItsPlaces) 
                                           " for report on file 21. errno = Is a directory; ");
 }
 
-TEST_F(ErrLogFileReportTest, WaitsOnWhenItsWaitIsInterrupted) {
+TEST_F(ErrLogFileReportTest, KeepsWaitingWhenItsWaitIsInterrupted) {
     installOutput(header);
     const Fault fault("waitpid", EINTR, {.times = 3});
     EXPECT_THAT(report(), IsEmpty());
@@ -296,7 +296,7 @@ TEST_F(ErrLogFileReportTest, EndingWithoutAStateDoesNothing) {
 }
 
 // A child that inherited another report's pipe would keep that report waiting for its own end.
-TEST_F(ErrLogFileReportTest, ReportsBesideEachOtherAndBesideMonitorsDoNotHoldEachOtherUp) {
+TEST_F(ErrLogFileReportTest, ConcurrentReportsAndMonitorsDoNotDelayEachOther) {
     installOutput(std::string(header) + entry);
     std::vector<std::thread> threads;
     std::atomic<int> rows{0};

@@ -73,7 +73,7 @@ TEST_F(ErrLogFileTest, TracesTheLifeOfTheChildInTheDetailClass) {
                             readFd + " & " + writeFd + "."));
 }
 
-TEST_F(ErrLogFileTest, ReportsAChildThatASignalEndedInTheErrorClass) {
+TEST_F(ErrLogFileTest, TracesAChildKilledByASignalInTheErrorClass) {
     const std::string command = "kill -9 $$";
     const auto monitor = start(command);
     ASSERT_TRUE(waitUntil([&] { return trace.messages().size() == 2; }));
@@ -82,7 +82,7 @@ TEST_F(ErrLogFileTest, ReportsAChildThatASignalEndedInTheErrorClass) {
                                           " has terminated abnormally; signal number = 9"));
 }
 
-TEST_F(ErrLogFileTest, PutsTheLocalTimeInPlaceOfTheFirstPlaceholder) {
+TEST_F(ErrLogFileTest, ReplacesTheFirstPlaceholderWithTheLocalTime) {
     FakeClock clock(1159930989); // 4 October 2006 03:03:09 UTC
     trace.setLevel(TRC1_DETAIL);
     const std::string command = "echo -smmddhhmmyy mmddhhmmyy";
@@ -97,7 +97,7 @@ TEST_F(ErrLogFileTest, PutsTheLocalTimeInPlaceOfTheFirstPlaceholder) {
                                 changed +
                                 "\"; redirecting fd N (stdout) to pipe; closing fd's N & N."));
 
-    // The agent's command keeps its placeholder: a restart takes the time afresh.
+    // The agent's command keeps its placeholder, so a restart inserts the new time.
     EXPECT_STREQ(monitor->procedure(), command.c_str());
     clock.set(1159930989 + 86400 + 60);
     static_cast<LogFile&>(*monitor) = *line(command);
@@ -187,12 +187,12 @@ TEST_F(ErrLogFileTest, AFailedWaitForDataEndsTheMonitor) {
     EXPECT_EQ(statusText(*monitor), "Error: wait for event failed");
     EXPECT_THAT(errors(), Contains("Error occurred during select() system call for command "
                                    "sleep 9 on fd N. errno = 9; Bad file descriptor"));
-    // The lock is released once more than it is taken, as far as the trace tells.
+    // According to the trace, the lock is released once more than it is taken.
     EXPECT_EQ(trace.count("Mutex unlocked for " + log + "."),
               trace.count("Mutex locked for " + log + ".") + 1);
 }
 
-TEST_F(ErrLogFileTest, AnInterruptedWaitGoesOn) {
+TEST_F(ErrLogFileTest, AnInterruptedWaitContinues) {
     const Fault fault("select", EINTR, {.times = 3});
     const auto monitor = start(printing(entry));
     EXPECT_EQ(EventRecorder::waitForRows(1).size(), 1U);

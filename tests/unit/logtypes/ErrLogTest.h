@@ -17,8 +17,8 @@
 
 using namespace zrm;
 
-/// What the tests of the error log share. The process calls itself AIX, or no configuration line
-/// would be accepted.
+/// What the tests of the error log share. The system calls itself AIX, because no other accepts
+/// the configuration line.
 class ErrLogTest : public LogTypeTest {
 protected:
     static constexpr const char* header = "IDENTIFIER TIMESTAMP  T C RESOURCE_NAME  DESCRIPTION\n";
@@ -39,7 +39,7 @@ protected:
         return "cat " + directory.write("output", text);
     }
 
-    /// The first number that follows `text` in the messages so far; -1 when there is none.
+    /// The first number that follows `text` in the messages so far, or -1.
     int numberAfter(const std::string& text) const {
         for (const std::string& message : trace.messages()) {
             const std::size_t found = message.find(text);
@@ -49,10 +49,10 @@ protected:
         }
         return -1;
     }
-    /// The process number of the child that was started last, from the detail class.
+    /// The process id of the last child started, from the detail class.
     int childId() const { return numberAfter(log + ". pid = "); }
 
-    /// The messages with every process number and descriptor shown as N.
+    /// The messages with every process id and descriptor replaced by N.
     static std::vector<std::string> masked(std::vector<std::string> messages) {
         for (std::string& message : messages) {
             for (const char* const before :
@@ -82,7 +82,7 @@ protected:
         const std::filesystem::directory_iterator all("/proc/self/fd");
         return static_cast<int>(std::distance(begin(all), end(all)));
     }
-    /// True when this process has no child, running or ended.
+    /// True if this process has no child, running or ended.
     static bool hasNoChild() { return waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD; }
 
     // Stopping a monitor whose command is silent takes as long as its wait for data.

@@ -109,7 +109,7 @@ protected:
     FormatsDoc() { m_clock.set(1795176000); } // 20 November 2026, 12:00:00
 };
 
-TEST_F(FormatsDoc, DirectivesTakeWhatTheTableSays) {
+TEST_F(FormatsDoc, DirectivesReadWhatTheTableSays) {
     const auto rows = table("| Directive | Line | Column |");
     EXPECT_EQ(rows.size(), 13U);
     for (const auto& row : rows) {
@@ -121,7 +121,7 @@ TEST_F(FormatsDoc, DirectivesTakeWhatTheTableSays) {
     }
 }
 
-TEST_F(FormatsDoc, PrintDirectivesGiveWhatTheTableSays) {
+TEST_F(FormatsDoc, PrintDirectivesWriteWhatTheTableSays) {
     const auto rows = table("| Scan and print directive | Line | Column |");
     EXPECT_EQ(rows.size(), 7U);
     for (const auto& row : rows) {
@@ -133,7 +133,7 @@ TEST_F(FormatsDoc, PrintDirectivesGiveWhatTheTableSays) {
     }
 }
 
-TEST_F(FormatsDoc, TheStepsLeadToASpecifierThatFits) {
+TEST_F(FormatsDoc, TheStepsLeadToASpecifierThatMatches) {
     const std::string text = fileText("docs/formats.md");
     const std::size_t line = text.find("    2026-11-20 07:03:09 ERROR payment: Card declined\n");
     const std::size_t specifier = text.find("       A , \"");
@@ -149,7 +149,7 @@ TEST_F(FormatsDoc, TheStepsLeadToASpecifierThatFits) {
                                                            {"ENTRYDESC", "Card declined"}}));
 }
 
-TEST_F(FormatsDoc, TheTenWorkedSpecifiersFitTheirSamples) {
+TEST_F(FormatsDoc, TheTenWorkedSpecifiersMatchTheirSamples) {
     const auto all = examples();
     EXPECT_EQ(all.size(), 10U);
     for (const Example& example : all) {
@@ -171,7 +171,7 @@ TEST_F(FormatsDoc, TheTenWorkedSpecifiersFitTheirSamples) {
             EXPECT_NE(lines[index].find(description), std::string::npos) << lines[index];
             long result = -1;
             EXPECT_EQ(columnText(format(lines[index] + "\n", result).entrydesc), description);
-            EXPECT_EQ(result, 0) << "the same while monitoring";
+            EXPECT_EQ(result, 0) << "the same result while monitoring";
         }
     }
 }

@@ -60,7 +60,7 @@ protected:
         return waitUntil([&] { return log.monitorStatus() == status; });
     }
 
-    /// What a program finds open that this process starts now.
+    /// The open descriptors of a program that this process starts now.
     static std::string openFilesOfAChild() {
         std::string listing;
         std::FILE* const stream = popen("ls -l /proc/self/fd", "re");
@@ -72,7 +72,7 @@ protected:
         return listing;
     }
 
-    /// A report's window; an empty time is not given.
+    /// A report's window. An empty text means that there is no such time.
     static _RequestThresholds window(const char* start, const char* end) {
         _RequestThresholds thresholds{};
         std::snprintf(thresholds.startTime, sizeof thresholds.startTime, "%s", start);

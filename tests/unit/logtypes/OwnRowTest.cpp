@@ -1,4 +1,4 @@
-// The row that a log keeps from line to line is, after each line, what a row made afresh is.
+// After each line, the row that a log keeps equals a row built from scratch.
 
 #include "logtypes/AdminLogFile.h"
 
@@ -49,7 +49,7 @@ public:
     std::size_t upTo(std::size_t most) {
         return std::uniform_int_distribution<std::size_t>(0, most)(m_engine);
     }
-    /// A text of up to so many characters, of which a few are not ASCII.
+    /// A text of at most this many characters, a few of them not ASCII.
     std::string text(std::size_t most) {
         std::string result(upTo(most), 'x');
         for (char& character : result) {
@@ -69,7 +69,7 @@ private:
 std::string syslogLine(Random& random) {
     static constexpr const char* stamps[] = {"Oct  5 11:59:59", "Dec 31 23:59:59",
                                              "Jan 12 00:00:00", "Foo 12 00:00:00", "Oct  5 1"};
-    // Lengths below, at and beyond the columns' widths, and beyond all columns of an entry.
+    // Shorter and longer than a column, as long as one, and longer than all columns of an entry.
     constexpr std::array<std::size_t, 5> lengths = {5, 31, 33, 90, 420};
     const auto field = [&] { return random.text(lengths[random.upTo(random.upTo(4))]); };
     std::string line = random.oneOf(stamps);
@@ -117,14 +117,14 @@ TEST_F(OwnRowOfAUserLog, HasTheSameFlowOfOperationsForEveryEntry) {
     EXPECT_EQ(second, first);
 }
 
-TEST_F(OwnRowOfASyslog, IsThatOfAFreshRow) {
+TEST_F(OwnRowOfASyslog, EqualsAFreshRow) {
     Random random(1);
     for (int i = 0; i < 4000 && !HasFailure(); ++i) {
         expectSameRow(*m_log, syslogLine(random));
     }
 }
 
-TEST_F(OwnRowOfASyslog, IsThatOfAFreshRowWhenNothingCanBeConverted) {
+TEST_F(OwnRowOfASyslog, EqualsAFreshRowWhenNothingCanBeConverted) {
     Random random(2);
     for (int i = 0; i < 400 && !HasFailure(); ++i) {
         LocaleDouble::setCodePage(random.upTo(1) == 0 ? 0 : LocaleDouble::latin1Page);
@@ -133,7 +133,7 @@ TEST_F(OwnRowOfASyslog, IsThatOfAFreshRowWhenNothingCanBeConverted) {
     LocaleDouble::reset();
 }
 
-TEST_F(OwnRowOfAUserLog, IsThatOfAFreshRow) {
+TEST_F(OwnRowOfAUserLog, EqualsAFreshRow) {
     makeLog(R"(A,"%d %s %s %400[^\n]", day type source description)");
     Random random(3);
     for (int i = 0; i < 4000 && !HasFailure(); ++i) {
@@ -143,7 +143,7 @@ TEST_F(OwnRowOfAUserLog, IsThatOfAFreshRow) {
     }
 }
 
-TEST_F(OwnRowOfASyslog, OfAccountingRecordsIsThatOfAFreshRow) {
+TEST_F(OwnRowOfASyslog, OfAccountingRecordsEqualsAFreshRow) {
     Random random(4);
     const auto line = validLog(m_directory.write("wtmp", ""), " ;N ;A");
     const Fault fault("open", EACCES);

@@ -31,11 +31,11 @@ std::string given(QuarterHour& quarterHour, std::int64_t time) {
 
 class QuarterHourInZone : public testing::TestWithParam<const char*> {};
 
-TEST_P(QuarterHourInZone, GivesTheStampsOfBrevanTime) {
+TEST_P(QuarterHourInZone, ReturnsTheStampsOfBrevanTime) {
     const TimeZone zone(GetParam());
     QuarterHour quarterHour;
     std::mt19937_64 random(900);
-    // From 1900, when zones had their own odd seconds, to 2099, in clusters of near times.
+    // From 1900, when zones had odd seconds, to 2099, in clusters of close times.
     std::uniform_int_distribution<std::int64_t> anywhere(-2208988800, 4102444799);
     std::uniform_int_distribution<std::int64_t> near(-2000, 2000);
     for (int i = 0; i < 400; ++i) {
@@ -75,7 +75,7 @@ TEST(QuarterHour, FollowsTheChangesOfDaylightSaving) {
     }
 }
 
-TEST(QuarterHour, TakesAnyNumberForATime) {
+TEST(QuarterHour, AcceptsAnyNumberAsATime) {
     const TimeZone zone("UTC0");
     QuarterHour quarterHour;
     for (const std::int64_t time :
@@ -86,7 +86,7 @@ TEST(QuarterHour, TakesAnyNumberForATime) {
     }
 }
 
-TEST(QuarterHour, AsksForTheLocalTimeOnceForNearTimes) {
+TEST(QuarterHour, LooksUpLocalTimeOnceForCloseTimes) {
     const TimeZone zone("UTC0");
     QuarterHour quarterHour;
     const Fault asked("localtime_r", EOVERFLOW, {.times = 0});
@@ -96,7 +96,7 @@ TEST(QuarterHour, AsksForTheLocalTimeOnceForNearTimes) {
     EXPECT_EQ(asked.calls(), 2);
 }
 
-TEST(QuarterHour, EachStampIsAnOperationWhereTheFlowIsTraced) {
+TEST(QuarterHour, EachStampIsAnOperationWhileTheFlowIsTraced) {
     const TimeZone zone("UTC0");
     QuarterHour quarterHour;
     EXPECT_EQ(given(quarterHour, 1000000000), expected(1000000000));
@@ -115,7 +115,8 @@ TEST(QuarterHour, EachStampIsAnOperationWhereTheFlowIsTraced) {
     const int calls = counter.calls();
     EXPECT_GT(calls, 0);
     given(quarterHour, 1000000001);
-    EXPECT_EQ(counter.calls(), calls) << "without the flow a quarter of an hour is entered once";
+    EXPECT_EQ(counter.calls(), calls)
+        << "without the flow, each quarter of an hour is looked up once";
 }
 
 } // namespace

@@ -36,7 +36,7 @@ public:
         return content;
     }
 
-    /// The lines of a file, the last one first. Empty ones, which no format fits, are left out.
+    /// The lines of a file, the last one first, without empty ones, which match no format.
     static std::vector<std::string> newestFirst(const std::string& content) {
         std::vector<std::string> lines;
         for (std::size_t begin = 0; begin < content.size();) {

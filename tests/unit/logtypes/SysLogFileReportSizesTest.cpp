@@ -15,7 +15,7 @@ namespace {
 /// Reports over files of many sizes in blocks of many sizes.
 class SyslogReportSizes : public SyslogReport {
 protected:
-    /// A line of so many bytes with its newline; what its row's description is goes to `expected`.
+    /// A line of this many bytes including its newline. Sets `expected` to its row's description.
     std::string line(std::size_t length) {
         std::string text = "Oct  5 07:00:00 h s: " + std::to_string(m_number++) + ".";
         if (text.size() + 1 < length) {
@@ -27,7 +27,7 @@ protected:
         const std::size_t before = std::strlen("Oct  5 07:00:00 h s: ");
         return line.substr(before, std::min<std::size_t>(line.size() - before - 1, 256));
     }
-    /// The descriptions of the content's lines, read forwards and turned around.
+    /// The descriptions of the content's lines, read forwards and then reversed.
     static std::vector<std::string> forwards(const std::string& content) {
         std::vector<std::string> descriptions;
         for (std::size_t begin = 0; begin < content.size();) {
@@ -39,7 +39,7 @@ protected:
         }
         return descriptions;
     }
-    /// The same by the rule for reading backwards, said literally: byte by byte, block by block.
+    /// The same by the rule for reading backwards, taken literally: byte by byte, block by block.
     static std::vector<std::string> backwards(const std::string& content, std::size_t blockSize) {
         std::vector<std::string> descriptions;
         std::size_t start = content.size(); // of the block
@@ -67,7 +67,7 @@ protected:
                 begin = isFound ? begin : 0;
                 const std::string text = content.substr(begin, end - begin);
                 if (text.size() < 15) {
-                    return descriptions; // has no time: older than any window
+                    return descriptions; // no time: older than any window
                 }
                 descriptions.push_back(text.size() < 22 ? "" : descriptionOf(text));
                 end = begin;
@@ -85,7 +85,7 @@ protected:
     int m_number = 0;
 };
 
-TEST_F(SyslogReportSizes, FilesAroundBlockBordersAreReadAsForwards) {
+TEST_F(SyslogReportSizes, FilesNearBlockBoundariesReadTheSameAsForwards) {
     constexpr std::size_t block = 1024;
     const FakeBlockSize blocks(block);
     for (const std::size_t size : {block - 1, block, block + 1, 2 * block - 1, 2 * block,
@@ -134,7 +134,7 @@ TEST_F(SyslogReportSizes, ALineOf999BytesIsWholeAndALongerOneInTheFirstBlockEnds
     EXPECT_EQ(report().size(), 0U);
 }
 
-TEST_F(SyslogReportSizes, ALongLineWithEarlierBlocksBeforeItIsGivenByItsBeginning) {
+TEST_F(SyslogReportSizes, OnlyTheBeginningOfALongLineAfterEarlierBlocksIsReturned) {
     const FakeBlockSize blocks(4096);
     std::string content;
     while (content.size() < 20000) {
@@ -157,21 +157,21 @@ TEST_F(SyslogReportSizes, CuttingALongLineEndsTheReportOnlyWhereABlockReachesThe
         ASSERT_EQ(content.size(), before);
         content += line(2000) + line(50);
         m_directory.write("messages", content);
-        // The last too long rest of the line ends 1001 bytes behind the newline before it.
+        // The last overlong rest of the line ends 1001 bytes after the newline before it.
         const bool isGiven = before + 1000 > block;
         EXPECT_EQ(report().size(), isGiven ? forwards(content).size() : 1U) << before;
         EXPECT_EQ(report(), backwards(content, block)) << before;
     }
 }
 
-TEST_F(SyslogReportSizes, ALineOf1000BytesBehindEarlierBytesLosesItsLastByteAndIsGiven) {
+TEST_F(SyslogReportSizes, ALineOf1000BytesAfterOtherBytesIsReturnedWithoutItsLastByte) {
     constexpr std::size_t block = 4096;
     const FakeBlockSize blocks(block);
     std::string content;
     for (const std::size_t length : {500UL, 500UL, 500UL, 500UL, 1000UL, 500UL, 500UL, 500UL}) {
         content += line(length);
     }
-    ASSERT_GT(content.size(), block); // the line stands in the first block that is read
+    ASSERT_GT(content.size(), block); // the line is in the first block that is read
     m_directory.write("messages", content);
     EXPECT_EQ(report(), forwards(content));
     EXPECT_EQ(report(), backwards(content, block));

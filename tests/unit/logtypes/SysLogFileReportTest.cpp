@@ -15,7 +15,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-TEST_F(SyslogReport, GivesTheNewestEntryFirst) {
+TEST_F(SyslogReport, ReturnsTheNewestEntryFirst) {
     m_directory.write("messages", "Oct  5 07:00:00 h s: one\n"
                                   "Oct  5 08:00:00 h s: two\n"
                                   "Oct  5 09:00:00 h s: three\n");
@@ -34,7 +34,7 @@ TEST_F(SyslogReport, FillsWholeRows) {
     EXPECT_EQ(columnText(m_row.timestamp), "1061005120000000");
 }
 
-TEST_F(SyslogReport, HasTheWindowsBordersInIt) {
+TEST_F(SyslogReport, IncludesTheBoundsOfTheWindow) {
     m_directory.write("messages", "Oct  5 07:00:00 h s: older\n"
                                   "Oct  5 08:00:00 h s: first\n"
                                   "Oct  5 09:00:00 h s: last\n"
@@ -62,7 +62,7 @@ TEST_F(SyslogReport, EndsAtALineWithoutAMonth) {
     EXPECT_THAT(report("1061005000000000", farFuture), IsEmpty());
 }
 
-TEST_F(SyslogReport, SaysWhyItEnds) {
+TEST_F(SyslogReport, ReportsWhyItEnds) {
     const std::string old = "Oct  5 07:00:00 h s: one\n";
     const std::string last = "Oct  5 08:00:00 h s: two\n";
     const auto endOf = [this](const std::string& content) {
@@ -80,27 +80,27 @@ TEST_F(SyslogReport, SaysWhyItEnds) {
     EXPECT_EQ(endOf(old + last), ReportEnd::readError);
 }
 
-TEST_F(SyslogReport, AWindowOpenToThePastHasTheLinesWithoutAMonth) {
+TEST_F(SyslogReport, AWindowOpenToThePastIncludesTheLinesWithoutAMonth) {
     m_directory.write("messages", "Oct  5 07:00:00 h s: one\n"
                                   "no time at all\n"
                                   "Oct  5 08:00:00 h s: two\n");
     EXPECT_THAT(report("                ", farFuture), ElementsAre("two", "", "one"));
 }
 
-TEST_F(SyslogReport, TakesALastLineWithoutANewline) {
+TEST_F(SyslogReport, AcceptsALastLineWithoutANewline) {
     m_directory.write("messages", "Oct  5 07:00:00 h s: one\nOct  5 08:00:00 h s: two");
     EXPECT_THAT(report(), ElementsAre("tw", "one"));
     m_directory.write("messages", "Oct  5 07:00:00 h s: only");
     EXPECT_THAT(report(), ElementsAre("onl"));
 }
 
-TEST_F(SyslogReport, OverAnEmptyLogCannotStart) {
+TEST_F(SyslogReport, CannotStartOnAnEmptyLog) {
     RecordingTrace trace(TRC1_DETAIL);
     EXPECT_EQ(m_log->startReportRequest(nullptr), nullptr);
     EXPECT_TRUE(trace.contains("Log " + m_path + " is empty; report request terminating."));
 }
 
-TEST_F(SyslogReport, LeavesOutWhatIsAppendedMeanwhile) {
+TEST_F(SyslogReport, OmitsWhatIsAppendedMeanwhile) {
     m_directory.write("messages", "Oct  5 07:00:00 h s: one\n");
     start();
     m_directory.append("messages", "Oct  5 08:00:00 h s: two\n");
@@ -131,7 +131,7 @@ TEST_F(SyslogReport, GoesBackOneYearAtEachCrossing) {
                             "0981231100000000", "0980301100000000"));
 }
 
-TEST_F(SyslogReport, AnEntryOfALaterDayThanTodayIsOfLastYear) {
+TEST_F(SyslogReport, AnEntryDatedAfterTodayIsFromLastYear) {
     EXPECT_THAT(times("Oct  6 00:00:00 h s: a\n"
                       "Oct  5 23:00:00 h s: later today\n"),
                 ElementsAre("1061005230000000", "1051006000000000"));
@@ -215,7 +215,7 @@ TEST_F(SyslogReport, AReadThatFailsEndsTheReportWithWhatItHas) {
     }
     EXPECT_GT(given, 20);
     EXPECT_LT(given, 100);
-    EXPECT_FALSE(next()); // it has ended for good
+    EXPECT_FALSE(next()); // it has ended permanently
     EXPECT_THAT(trace.messages(), ElementsAre("Error while reading file " + m_path +
                                               ". Bytes requested = 1024. Bytes received = -1."));
 }

@@ -17,7 +17,7 @@ using testing::SizeIs;
 
 class SyslogLine : public SyslogTest {
 protected:
-    /// The row of a line, from a record full of rubbish.
+    /// The row of a line, built in a record full of garbage.
     zrm_rmlogent_data_t rowOf(std::string line) {
         zrm_rmlogent_data_t row;
         std::memset(&row, '#', sizeof row);
@@ -61,7 +61,7 @@ TEST_F(SyslogLine, FillsEveryColumn) {
     EXPECT_EQ(std::count(bytes.begin(), bytes.end(), '#'), 0);
 }
 
-TEST_F(SyslogLine, TakesTheTimeFromItsFixedPlaces) {
+TEST_F(SyslogLine, TakesTheTimeFromItsFixedPositions) {
     EXPECT_EQ(timeOf("Oct 15 23:59:58 h s: d\n"), "1061015235958000");
     EXPECT_EQ(timeOf("Oct x5 ab cd ef h s: d\n"), "10610x5abcdef000");
     EXPECT_EQ(timeOf("Octa 5b07c03d09e h s: d\n"), "1061005070309000");
@@ -84,7 +84,7 @@ TEST_F(SyslogLine, KnowsTheTwelveMonths) {
     }
 }
 
-TEST_F(SyslogLine, WithoutAMonthGivesARowWithNothingOfTheLine) {
+TEST_F(SyslogLine, WithoutAMonthTheRowHasNothingOfTheLine) {
     for (const char* month : {"anF", "ebM", "jan", "JAN", "   ", "Xyz", "cJa"}) {
         SCOPED_TRACE(month);
         expectNothingTaken(rowOf(std::string(month) + "  5 07:03:09 host src: text\n"));
@@ -102,7 +102,7 @@ TEST_F(SyslogLine, TooShortForItsTimeIsLikeOneWithoutAMonth) {
     expectNothingTaken(rowOf(std::string("Oct  5 07:0\0:09 host src: text\n", 32)));
 }
 
-TEST_F(SyslogLine, MayEndBehindItsTime) {
+TEST_F(SyslogLine, MayEndAfterItsTime) {
     for (const char* end : {"", "\n", " ", " \n"}) {
         const auto row = rowOf(std::string("Oct  5 07:03:09") + end);
         EXPECT_EQ(columnText(row.entrytime), "1061005070309000");
@@ -138,7 +138,7 @@ TEST_F(SyslogLine, TheSourceEndsAtAColonOrAtWhiteSpace) {
     EXPECT_EQ(columnText(row.entrysys), "host");
     EXPECT_EQ(columnText(row.entrysrc), "cron");
     EXPECT_EQ(columnText(row.entrydesc), "text");
-    row = rowOf("Oct  5 07:03:09 host a::b\n"); // two behind the first colon
+    row = rowOf("Oct  5 07:03:09 host a::b\n"); // two characters after the first colon
     EXPECT_EQ(columnText(row.entrysrc), "a");
     EXPECT_EQ(columnText(row.entrydesc), "b");
     row = rowOf("Oct  5 07:03:09 host : text\n");
@@ -192,7 +192,7 @@ TEST_F(SyslogLine, ALongHostLosesOneCharacterAndRunsOn) {
     EXPECT_EQ(columnText(row.entrysrc), "s");
     row = rowOf("Oct  5 07:03:09 " + host + " s: text\n");
     EXPECT_EQ(columnText(row.entrysys), std::string(32, 'h'));
-    EXPECT_EQ(columnText(row.entrysrc), "sverrun"); // the source is laid over it
+    EXPECT_EQ(columnText(row.entrysrc), "sverrun"); // the source overwrites it
     EXPECT_EQ(columnText(row.uentrysrc), "sverrun");
     EXPECT_EQ(columnText(row.entrydesc), "text");
 }
@@ -217,7 +217,7 @@ TEST_F(SyslogLine, AFieldThatRunsOnIsOverwrittenByTheCommonColumns) {
     EXPECT_EQ(std::string(row.ulogpath, path.size() + 1), path + "h");
 }
 
-TEST_F(SyslogLine, AFieldThatReachesTheCommonColumnsLeavesThemWhole) {
+TEST_F(SyslogLine, AFieldThatReachesTheCommonColumnsLeavesThemIntact) {
     for (std::size_t length = 300; length < 400; ++length) {
         const std::string field(length, 'x');
         for (const std::string& header : {field + " ", " " + field + ": ", "h " + field + ": "}) {
@@ -288,7 +288,7 @@ TEST(SysLogFileMonitor, RunsFromConstructionToDestruction) {
         EXPECT_EQ(log.monitorStatus(), MONITOR_RUNNING);
         EXPECT_EQ(dumps(), 1);
         EXPECT_TRUE(trace.waitFor("Thread successfully started for log file " + path + "."));
-        // An appended line may be counted as present at the start until the log was opened.
+        // A line appended before the log is opened counts as already present.
         std::size_t appended = 0;
         while (EventRecorder::rows().empty() && appended < 100) {
             directory.append("messages",
@@ -313,7 +313,7 @@ TEST(SysLogFileMonitor, RunsFromConstructionToDestruction) {
 
 class SysLogFileRows : public SyslogTest {
 protected:
-    /// Appends lines until the monitor has seen one: then it follows the file.
+    /// Appends lines until the monitor reports one, which shows that it follows the file.
     void awaitMonitor() {
         for (int i = 0; i < 100 && EventRecorder::rows().empty(); ++i) {
             m_directory.append("followed", "no month\n");
@@ -342,7 +342,7 @@ protected:
     std::mt19937 m_random{m_seed};
 };
 
-TEST_F(SysLogFileRows, OfAMonitorAreAsIfEachWereMadeAlone) {
+TEST_F(SysLogFileRows, OfAMonitorEqualThoseBuiltOneByOne) {
     SCOPED_TRACE("seed " + std::to_string(m_seed));
     m_directory.write("followed", "");
     SysLogFile log(*validLog(m_directory.file("followed")), nullptr);

@@ -4,7 +4,6 @@
 #include "SyslogTest.h"
 
 #include "logs/RequestThresholds.h"
-#include "logtypes/SyslogBufferInfo.h"
 
 #include <cstring>
 #include <string>
@@ -38,7 +37,7 @@ protected:
         EXPECT_TRUE(given == nullptr || given == &m_row);
         return given != nullptr;
     }
-    /// The descriptions of a whole report over the present content of the log.
+    /// The descriptions of a complete report on the current content of the log.
     std::vector<std::string> report(const char* from = farPast, const char* to = farFuture) {
         m_window = window(from, to);
         std::vector<std::string> descriptions;
@@ -53,7 +52,7 @@ protected:
         EXPECT_EQ(m_state, nullptr);
         return descriptions;
     }
-    /// The times of a whole report.
+    /// The times of a complete report.
     std::vector<std::string> times(const std::string& content) {
         m_directory.write("messages", content);
         m_window = window(farPast, farFuture);

@@ -22,7 +22,7 @@
 using namespace zrm;
 
 /// A syslog file whose monitor could not open it and has ended, so that a test has the object to
-/// itself and waits for no poll. The time is 5 October 2006, 12:00:00 UTC.
+/// itself and need not wait for a check of the file. The time is 5 October 2006, 12:00:00 UTC.
 class SyslogTest : public testing::Test {
 protected:
     static constexpr std::time_t noon = 1160049600;

@@ -38,7 +38,7 @@ protected:
     void setBlockSize(std::int64_t size) { (*m_log).*(&UserLogMembers::OptimumBlockSize) = size; }
 };
 
-TEST_F(UserLogReport, GivesTheNewestEntryFirst) {
+TEST_F(UserLogReport, ReturnsTheNewestEntryFirst) {
     write("one\ntwo\nthree\n");
     makeLog(wholeLine);
     EXPECT_THAT(descriptions(report()), ElementsAre("three", "two", "one"));
@@ -87,7 +87,7 @@ TEST_F(UserLogReport, LinesOfExactlyOneBlock) {
     EXPECT_THAT(descriptions(report()), ElementsAre("tail", whole)) << "the file's first line";
     write("first\n" + shorter + "\n" + "tail\n");
     EXPECT_THAT(descriptions(report()), ElementsAre("tail", shorter, "first"));
-    // A line as long as a block cannot be seen whole with the newline before it.
+    // A line as long as a block does not fit into it together with the newline before it.
     RecordingTrace trace(TRC1_ERROR);
     write("first\n" + whole + "\n" + "tail\n");
     EXPECT_THAT(descriptions(report()), ElementsAre("tail"));
@@ -123,7 +123,7 @@ TEST_F(UserLogReport, EndsAtALineOfMoreThan2047Characters) {
     }
 }
 
-TEST_F(UserLogReport, HoldsItsEndAfterALongLine) {
+TEST_F(UserLogReport, StaysEndedAfterALongLine) {
     makeLog(wholeLine);
     write("first\n" + std::string(3000, 'x') + "\nlast\n");
     _RequestThresholds thresholds = window("0700101000000000", "1991231235959000");
@@ -156,7 +156,7 @@ TEST_F(UserLogReport, EndsAtTheFirstEntryOlderThanTheWindow) {
                 ElementsAre("newest"));
 }
 
-TEST_F(UserLogReport, DatesALogWithoutYearsOverNewYear) {
+TEST_F(UserLogReport, DatesALogWithoutYearsAcrossNewYear) {
     m_clock.set(1136289600); // 3 January 2006, 12:00:00
     write("1127 a\n1231 b\n1231 c\n0101 d\n0102 e\n");
     makeLog(R"(A,"%2d%2d %s",month day description)");
@@ -190,7 +190,7 @@ TEST_F(UserLogReport, BadLinesAreDroppedUpToTenInARow) {
                   m_path + ". Report request is terminating.");
 }
 
-TEST_F(UserLogReport, SaysWhyItEnds) {
+TEST_F(UserLogReport, ReportsWhyItEnds) {
     makeLog(R"(A,"%d %[^\n]",day description)");
     const auto endOf = [this](const std::string& content) {
         write(content);
@@ -303,7 +303,7 @@ TEST_F(UserLogReport, NeedsTheDate) {
                             "errno = 14; Bad address."));
 }
 
-TEST_F(UserLogReport, TellsItsBufferInDetail) {
+TEST_F(UserLogReport, TracesItsBufferInDetail) {
     makeLog(wholeLine);
     write("one\n");
     setBlockSize(512);
@@ -332,7 +332,7 @@ TEST_F(UserLogReport, AReadErrorEndsItWithWhatItHas) {
     RecordingTrace trace(TRC1_ERROR);
     const Fault fault("read", EIO, {.skip = 1, .times = 1});
     EXPECT_THAT(descriptions(report()), ElementsAre("line three"))
-        << "the cut line is not taken for the first";
+        << "the cut line is not mistaken for the first";
     EXPECT_THAT(trace.messages(), ElementsAre(HasSubstr("Error while reading file " + m_path)));
 }
 
@@ -352,7 +352,7 @@ TEST_F(UserLogReport, OfAFileThatShrinksEndsWithWhatItHas) {
 
 // One chain of directives serves the monitor and every report.
 
-TEST_F(UserLogReport, RunsBesideTheMonitorAndOtherReports) {
+TEST_F(UserLogReport, RunsConcurrentlyWithTheMonitorAndOtherReports) {
     makeLog(R"(A,"%s %d %[^\n]",month day description)");
     std::string content;
     std::vector<std::string> expected;

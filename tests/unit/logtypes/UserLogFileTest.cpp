@@ -25,7 +25,7 @@ using testing::IsEmpty;
 
 class UserLog : public UserLogTest {};
 
-TEST_F(UserLog, MakesARowOfALine) {
+TEST_F(UserLog, BuildsARowFromALine) {
     makeLog(R"(A , "%d-%d-%d %d:%d:%d %s %[^[][%[^]]] %[^:]: %[^\n]" , )"
             "year month day hour minute second system source type class description");
     long result = -1;
@@ -40,7 +40,7 @@ TEST_F(UserLog, MakesARowOfALine) {
     EXPECT_EQ(columnText(row.entrydesc), "Failed password");
 }
 
-TEST_F(UserLog, FillsTheCommonColumnsAndTheUTF8Twins) {
+TEST_F(UserLog, FillsTheCommonColumnsAndTheUTF8Columns) {
     makeLog(R"(a,"%s %[^\n]",source description)");
     long result = -1;
     const zrm_rmlogent_data_t row = format("d\xe9mon caf\xe9 ferm\xe9\n", result);
@@ -90,7 +90,7 @@ TEST_F(UserLog, TimeTextsHoldSevenCharacters) {
                 ElementsAre("Error: invalid year found in event entrytime; 'abcdefg'"));
 }
 
-TEST_F(UserLog, ALineThatDoesNotFitGivesABlankRow) {
+TEST_F(UserLog, ALineThatDoesNotMatchLeavesABlankRow) {
     makeLog(R"(A,"%d %s",day description)");
     RecordingTrace trace(TRC1_ERROR);
     long result = 0;
@@ -107,7 +107,7 @@ TEST_F(UserLog, ALineThatDoesNotFitGivesABlankRow) {
     EXPECT_EQ(trace.count("This is a blank line."), 1);
 }
 
-TEST_F(UserLog, ALineWithoutNamedFieldsGivesNoRow) {
+TEST_F(UserLog, ALineWithoutNamedFieldsHasNoRow) {
     makeLog(R"(A,"%*d %*s",)");
     ASSERT_NE((*m_log).*(&UserLogMembers::SPAnchor), nullptr);
     long result = 0;
@@ -134,7 +134,7 @@ TEST_F(UserLog, AFormatThatCannotBeLearnedStopsTheMonitor) {
     EXPECT_EQ(result, -1);
 }
 
-TEST_F(UserLog, ALogWithoutAFormatIsOneWithAnEmptyFormat) {
+TEST_F(UserLog, NoFormatIsTheSameAsAnEmptyFormat) {
     RecordingTrace trace(TRC1_ERROR);
     m_line = validLog(m_path, " ;N ;U");
     m_log = std::make_unique<UserLogFile>(*m_line, nullptr);
@@ -193,7 +193,7 @@ TEST_F(UserLog, DumpsItselfInDetailBeforeItsThreadStarts) {
     EXPECT_EQ(trace.messages().back(), expected);
 }
 
-TEST_F(UserLog, RowsOfAMonitorAreAsIfEachWereMadeAlone) {
+TEST_F(UserLog, RowsOfAMonitorEqualThoseBuiltOneByOne) {
     makeLog(R"(A,"%d %40s %300[^\n]",day source description)");
     std::vector<std::string> lines;
     std::string content;
@@ -233,7 +233,8 @@ TEST_F(UserLog, TheMonitorReportsAppendedLines) {
     const Fault waits("select", EINTR, {.times = 0});
     const auto start = std::chrono::steady_clock::now();
     m_log = std::make_unique<UserLogFile>(*m_line, nullptr);
-    // The present end is found before the first look; wait until reports can be made, then append.
+    // The current end is found before the first check. Wait until reports are possible, then
+    // append.
     _RequestThresholds thresholds = window("0", "9");
     void* state = nullptr;
     while (state == nullptr) {
@@ -252,7 +253,7 @@ TEST_F(UserLog, TheMonitorReportsAppendedLines) {
     const auto waited = std::chrono::steady_clock::now() - start;
     EXPECT_GE(waits.calls(), 1);
     EXPECT_GE(waited, std::chrono::seconds(waits.calls()) - std::chrono::milliseconds(100))
-        << "each look is followed by a second's wait";
+        << "a wait of one second follows each check";
     EXPECT_EQ(m_log->monitorStatus(), MONITOR_STOPPED);
     EXPECT_EQ(((*m_log).*(&UserLogMembers::LogFileP)).load(), nullptr) << "the log is closed";
     EXPECT_EQ(m_log->numEvents(), 3 * static_cast<std::int64_t>(EventRecorder::rows().size()));

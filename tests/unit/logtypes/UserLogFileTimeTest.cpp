@@ -27,7 +27,7 @@ protected:
         m_trace.clear();
     }
 
-    /// The stamp that a bad field leaves, and the message about it.
+    /// The stamp that results from a bad field, and the message about it.
     void expectRefused(const _EntryTimeBuffers& texts, const char* stamp, const char* field,
                        const char* text) {
         m_trace.clear();
@@ -39,14 +39,14 @@ protected:
     RecordingTrace m_trace{TRC1_ERROR};
 };
 
-TEST_F(UserLogTime, IsMadeOfItsFields) {
+TEST_F(UserLogTime, IsBuiltFromItsFields) {
     EXPECT_EQ(timeOf({"1999", "12", "31", "23", "59", "58"}), "0991231235958000");
     EXPECT_EQ(timeOf({"06", "1", "2", "3", "4", "5"}), "1060102030405000");
     EXPECT_EQ(timeOf({" 6", "+1", " 02", "\t3", "04", "005"}), "1060102030405000");
     EXPECT_THAT(m_trace.messages(), IsEmpty());
 }
 
-TEST_F(UserLogTime, IsTheClocksWithoutFields) {
+TEST_F(UserLogTime, WithoutFieldsIsTheCurrentTime) {
     EXPECT_EQ(timeOf(_EntryTimeBuffers{}), "1061005123400000") << "the second is never the clock's";
     EXPECT_EQ(timeOf({"", "", "", "", "", "9"}), "1061005123409000");
     EXPECT_EQ(timeOf({"2001", "", "", "", "", ""}), "1011005123400000");
@@ -139,7 +139,7 @@ TEST_F(UserLogTime, DaysDependOnTheMonth) {
     expectRefused({"01", "Feb", "30", "4", "5", "6"}, "1010205040506000", "day", "30");
 }
 
-TEST_F(UserLogTime, HoursMayHaveTheirHalfOfTheDay) {
+TEST_F(UserLogTime, HoursMayHaveAnAmOrPm) {
     const struct {
         const char* text;
         const char* hour;
@@ -196,7 +196,7 @@ TEST_F(UserLogTime, AReportSuppliesTheYear) {
     EXPECT_EQ(timeOf({"", "12", "2", "4", "5", "6"}, &context), "1031202040506000");
 }
 
-TEST_F(UserLogTime, AReportGoesBackOverTheCentury) {
+TEST_F(UserLogTime, AReportGoesBackAcrossTheCentury) {
     UserlogBufferInfo context{};
     context.century = 1;
     context.year = 1;
@@ -242,7 +242,7 @@ TEST_F(UserLogTime, NeedsTheLocalTime) {
     EXPECT_EQ(timeOf({"06", "2", "3", "4", "", "6"}), "1060203045106000") << "asked again";
 }
 
-TEST_F(UserLogTime, AsksForTheZoneOncePerSecond) {
+TEST_F(UserLogTime, LooksUpTheZoneOncePerSecond) {
     m_clock.set(now + 2000);
     const Fault fault("localtime_r", EOVERFLOW, {.skip = 1, .times = -1});
     for (int line = 0; line < 100; ++line) {
@@ -251,7 +251,7 @@ TEST_F(UserLogTime, AsksForTheZoneOncePerSecond) {
     EXPECT_EQ(fault.calls(), 1);
 }
 
-TEST_F(UserLogTime, AStampOfAnotherLengthIsNone) {
+TEST_F(UserLogTime, AStampOfAnotherLengthIsRefused) {
     m_clock.set(4102444800); // 1 January 2100
     EXPECT_EQ(timeOf({"", "2", "3", "4", "5", "6"}), "failed");
     EXPECT_THAT(m_trace.messages(),
@@ -264,7 +264,7 @@ TEST_F(UserLogTime, AStampOfAnotherLengthIsNone) {
                             "write 15 characters but wrote 16."));
 }
 
-TEST_F(UserLogTime, ALineWhoseTimeFailsGivesNoRow) {
+TEST_F(UserLogTime, ALineWhoseTimeFailsHasNoRow) {
     m_clock.set(4102444800);
     EXPECT_EQ(timeOf("a line\n"), "failed");
 }

@@ -5,8 +5,7 @@
 
 #include "base/ProcessValues.h"
 #include "logs/RequestThresholds.h"
-#include "logtypes/EntryTimeBuffers.h"
-#include "logtypes/UserlogBufferInfo.h"
+#include "logtypes/EntryTime.h"
 #include "support/EventRecorder.h"
 #include "support/Faults.h"
 #include "support/LocaleDouble.h"
@@ -38,8 +37,9 @@ public:
     using UserLogFile::SPAnchor;
 };
 
-/// A user log whose monitor has learned the format, could not open the file, and has ended: a test
-/// has the object to itself and waits for no poll. The time is 5 October 2006, 12:34:56 UTC.
+/// A user log whose monitor has learned the format, could not open the file, and has ended. A test
+/// has the object to itself and need not wait for a check of the file. The time is 5 October 2006,
+/// 12:34:56 UTC.
 class UserLogTest : public testing::Test {
 protected:
     static constexpr std::time_t now = 1160051696;
@@ -52,9 +52,9 @@ protected:
     }
     ~UserLogTest() override { gSystemName = nullptr; }
 
-    /// Makes the log with this format anew.
+    /// Creates the log again with this format.
     void makeLog(const std::string& format) { makeLogOfLine(" ;N ;U ;" + format); }
-    /// Makes it of a configuration line's fields behind the file's name.
+    /// Creates it from the fields of a configuration line after the file name.
     void makeLogOfLine(const std::string& fields) {
         m_log.reset();
         m_line = validLog(m_path, fields);
@@ -69,13 +69,13 @@ protected:
     }
     void write(std::string_view text) { m_directory.write("app.log", text); }
 
-    /// The row of a line; `result` is what formatting gave.
+    /// The row of a line. Sets `result` to that of the formatting.
     zrm_rmlogent_data_t format(std::string line, long& result) {
         zrm_rmlogent_data_t row{};
         result = m_log->formatEntryAsRow(line.data(), &row, nullptr);
         return row;
     }
-    /// The time stamp of a line; "failed" when it gives no row.
+    /// The time stamp of a line, or "failed" if it has no row.
     std::string timeOf(const std::string& line) {
         long result = 0;
         const zrm_rmlogent_data_t row = format(line, result);
@@ -95,7 +95,7 @@ protected:
         std::snprintf(thresholds.endTime, sizeof thresholds.endTime, "%s", end);
         return thresholds;
     }
-    /// The rows of a report over all times, or over a window.
+    /// The rows of a report on all times or on a window.
     std::vector<zrm_rmlogent_data_t> report(const char* start = "0700101000000000",
                                             const char* end = "1991231235959000") {
         std::vector<zrm_rmlogent_data_t> rows;

@@ -40,7 +40,7 @@ protected:
         return pieces;
     }
 
-    /// The same by fgets with a buffer of 2048 bytes.
+    /// The same, read by fgets with a buffer of 2048 bytes.
     Pieces piecesByFgets(const std::string& content) {
         const std::string path = m_directory.write("lines", content);
         const std::unique_ptr<std::FILE, int (*)(std::FILE*)> stream(std::fopen(path.c_str(), "r"),
@@ -57,7 +57,7 @@ protected:
     LineReader m_reader;
 };
 
-TEST_F(LineReaderTest, NothingGivesNothing) {
+TEST_F(LineReaderTest, AnEmptyFileHasNoPieces) {
     EXPECT_EQ(piecesOf(""), Pieces{});
 }
 
@@ -101,7 +101,7 @@ TEST_F(LineReaderTest, PiecesAroundTheBlockAndTheLineBufferAreThoseOfFgets) {
     }
 }
 
-TEST_F(LineReaderTest, RandomContentGivesThePiecesOfFgets) {
+TEST_F(LineReaderTest, RandomContentIsCutIntoThePiecesOfFgets) {
     const unsigned seed = std::random_device{}();
     SCOPED_TRACE("seed " + std::to_string(seed));
     std::mt19937 random(seed);
@@ -136,7 +136,7 @@ TEST_F(LineReaderTest, StartingAgainReadsWhatWasAppended) {
     close(fd);
 }
 
-TEST_F(LineReaderTest, AReadThatFailsEndsTheInputAndDropsTheUnfinishedLine) {
+TEST_F(LineReaderTest, AFailedReadEndsTheInputAndDropsTheUnfinishedLine) {
     const std::string path = m_directory.write("lines", "one\ntw");
     const int fd = open(path.c_str(), O_RDONLY);
     m_reader.start(fd);
@@ -149,7 +149,7 @@ TEST_F(LineReaderTest, AReadThatFailsEndsTheInputAndDropsTheUnfinishedLine) {
     close(fd);
 }
 
-TEST_F(LineReaderTest, MemoryThatIsMissingIsAReadThatFails) {
+TEST_F(LineReaderTest, MissingMemoryCountsAsAFailedRead) {
     const std::string path = m_directory.write("lines", "one\n");
     const int fd = open(path.c_str(), O_RDONLY);
     {

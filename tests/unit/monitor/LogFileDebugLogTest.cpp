@@ -1,6 +1,5 @@
 #include "OpenDebugLog.h"
 #include "TestLog.h"
-#include "monitor/DebugLogLoss.h"
 
 #include <gmock/gmock.h>
 
@@ -34,7 +33,7 @@ protected:
     static std::string header(long number) {
         return "\t\t>>>>>>>>> RECORD " + std::to_string(number) + " <<<<<<<<<\n";
     }
-    /// The number of the next record: writes one and looks.
+    /// The number of the next record, found by writing one.
     long nextNumber() {
         TestLog log(*m_debugged);
         log.writeToDebugLog(nullptr, 0, nullptr, 0);
@@ -43,7 +42,7 @@ protected:
         m_seen = text.size();
         return number + 1;
     }
-    /// What was written since the last look.
+    /// What was written since the last call.
     std::string news() {
         const std::string text = content().substr(m_seen);
         m_seen += text.size();
@@ -116,7 +115,7 @@ TEST_F(DebugLog, NothingIsWrittenWithoutADebugLog) {
     EXPECT_EQ(content(), "");
 }
 
-TEST_F(DebugLog, AFailedWriteIsTracedAndLeavesTheSecondPieceOut) {
+TEST_F(DebugLog, AFailedWriteIsTracedAndOmitsTheSecondPiece) {
     const long number = nextNumber();
     TestLog log(*m_debugged);
     RecordingTrace trace(TRC1_ERROR);
@@ -142,17 +141,17 @@ TEST_F(DebugLog, AFailedWriteIsTracedAndLeavesTheSecondPieceOut) {
 }
 
 TEST_F(DebugLog, RecordsThatAFullDiskCutsAreReportedOnceAndCounted) {
-    // Every write to this device fails, but the stream's buffer takes its part first.
+    // Every write to this device fails, but the stream's buffer first accepts some of it.
     m_openDebugLog.reset();
     m_openDebugLog.emplace("/dev/full");
     TestLog log(*m_debugged);
     RecordingTrace trace(TRC1_ERROR);
-    const std::uint64_t before = DebugLogLoss::records();
+    const std::uint64_t before = LogFile::incompleteDebugRecords();
     const std::string row(500, 'r');
     for (int number = 0; number < 10; ++number) {
         log.writeToDebugLog("line\n", 5, row.data(), row.size());
     }
-    EXPECT_EQ(DebugLogLoss::records() - before, 10u);
+    EXPECT_EQ(LogFile::incompleteDebugRecords() - before, 10u);
     const auto messages = trace.messages();
     EXPECT_EQ(std::count(messages.begin(), messages.end(),
                          "The debug log does not take whole records.  errno = 28; No space left on "
@@ -161,7 +160,7 @@ TEST_F(DebugLog, RecordsThatAFullDiskCutsAreReportedOnceAndCounted) {
     m_openDebugLog.reset();
     m_openDebugLog.emplace(m_debugLog);
     log.writeToDebugLog("line\n", 5, nullptr, 0);
-    EXPECT_EQ(DebugLogLoss::records() - before, 10u) << "it takes whole records again";
+    EXPECT_EQ(LogFile::incompleteDebugRecords() - before, 10u) << "it accepts whole records again";
 }
 
 TEST_F(DebugLog, EveryPieceOfALineIsCopiedWithItsRowOrWithoutOne) {
@@ -198,7 +197,7 @@ TEST_F(DebugLog, AReconfigurationTakesEffectWithTheNextEntry) {
     log.startThread();
     ASSERT_TRUE(waitUntil([&] { return log.eof() == 0; }));
     append("one\n");
-    // The row is delivered before the line would be copied; the pass ends behind both.
+    // The row is delivered before the line would be copied; the pass ends after both.
     ASSERT_TRUE(waitUntil([&] { return log.eof() == 4; }));
     log = *m_debugged;
     append("two\n");

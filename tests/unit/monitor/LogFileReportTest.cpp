@@ -20,7 +20,7 @@ using testing::IsEmpty;
 
 constexpr std::int64_t blockSize = 64;
 
-/// The bytes 0, 1, 2 ... as text: a block shows where it was read.
+/// The numbers 0, 1, 2, ... as text, so that a block shows where it was read.
 std::string countingText(std::size_t size) {
     std::string text;
     for (std::size_t i = 0; text.size() < size; ++i) {
@@ -43,7 +43,7 @@ protected:
         ASSERT_GE(m_log.openLogForReport(&m_info), 0);
         m_info.bufferCount = 0;
     }
-    /// Reads the block before and expects the content of this range of the file.
+    /// Reads the previous block and expects the content of this range of the file.
     void expectBlock(std::size_t begin, std::size_t end) {
         ASSERT_EQ(m_log.fillReportBuffer(&m_info), static_cast<long>(end - begin));
         EXPECT_EQ(m_info.bufferCount, static_cast<std::int64_t>(end - begin));
@@ -159,7 +159,7 @@ TEST_F(Report, ThreeBlocksAreThreeFills) {
                             "64 bytes read from file " + m_path + " from offset 0."));
 }
 
-TEST_F(Report, BytesThatWereNotConsumedComeAgain) {
+TEST_F(Report, UnconsumedBytesAreReadAgain) {
     open(countingText(3 * blockSize));
     expectBlock(2 * blockSize, 3 * blockSize);
     m_info.bufferCount = 10;
@@ -201,10 +201,10 @@ TEST_F(Report, WhatIsAppendedDuringAReportIsNotPartOfIt) {
     EXPECT_EQ(m_log.fillReportBuffer(&m_info), 0);
 }
 
-TEST_F(Report, ABlockOfTheReportsOwnSizeOutlastsAChangeOfTheLogs) {
+TEST_F(Report, KeepsItsBlockSizeWhenThatOfTheLogChanges) {
     m_info.blockSize = 16;
     open(countingText(100));
-    m_log.setBlockSize(4096); // another report has found another size
+    m_log.setBlockSize(4096); // another report determined another size
     expectBlock(84, 100);
     expectBlock(68, 84);
 }
@@ -299,7 +299,7 @@ TEST_F(Report, MayBeBoundToTheFileThatIsMonitored) {
     std::filesystem::create_symlink(m_path + ".1", m_path);
     {
         const ReportOutcome outcome(ReportedFile::monitored);
-        EXPECT_GE(m_log.openLogForReport(&m_info), 0) << "the same file by a link";
+        EXPECT_GE(m_log.openLogForReport(&m_info), 0) << "the same file through a link";
         EXPECT_EQ(m_info.bytesLeft, 9);
         m_log.closeLogForReport(m_info.fd);
     }
@@ -308,7 +308,7 @@ TEST_F(Report, MayBeBoundToTheFileThatIsMonitored) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(Report, FollowsNoLinkWhileNoMonitorHasAFileOpen) {
+TEST_F(Report, FollowsNoLinkUnlessTheMonitorHasAFileOpen) {
     m_directory.write("other", "another file");
     std::filesystem::remove(m_path);
     std::filesystem::create_symlink(m_directory.file("other"), m_path);

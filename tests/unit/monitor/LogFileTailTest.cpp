@@ -18,20 +18,20 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::SizeIs;
 
-/// Goes through opening and the wait loop on the test's own thread; `onLine` ends the loop by a
-/// status, or a fault does.
+/// Opens the log and runs the wait loop on the test's own thread. `onLine` ends the loop by setting
+/// a status, or a fault does.
 class Tail : public MonitoredFile {
 protected:
     void open() {
         m_log.openLogAndSeek();
-        ASSERT_NE(m_log.stream(), nullptr);
+        ASSERT_NE(m_log.reader(), nullptr);
     }
     ~Tail() override {
-        if (m_log.stream() != nullptr) {
+        if (m_log.reader() != nullptr) {
             m_log.closeLog();
         }
     }
-    /// Ends the loop after so many lines have been read.
+    /// Ends the loop once this many lines have been read.
     void stopAfter(std::size_t count) {
         m_log.onLine = [this, count](const std::string&) {
             if (m_log.lines.size() >= count) {
@@ -39,7 +39,7 @@ protected:
             }
         };
     }
-    /// Follows the log while one call fails and expects the one message and the status.
+    /// Follows the log while one call fails. Expects this message alone, and the status.
     void expectEnd(const char* call, int skip, const std::string& message, _MonitorStatus status) {
         RecordingTrace trace(TRC1_ERROR);
         const Fault fault(call, EIO, {.skip = skip});
@@ -51,14 +51,15 @@ protected:
     TestLog m_log{*m_line};
 };
 
-TEST_F(Tail, OpensAtThePresentEnd) {
+TEST_F(Tail, OpensAtTheCurrentEnd) {
     append("before\n");
     open();
     EXPECT_EQ(m_log.eof(), 7);
-    EXPECT_EQ(m_log.fd(), fileno(m_log.stream()));
-    EXPECT_EQ(fcntl(m_log.fd(), F_GETFD, 0) & FD_CLOEXEC, FD_CLOEXEC);
+    const int fd = m_log.fd();
+    EXPECT_EQ(fcntl(fd, F_GETFD, 0), FD_CLOEXEC);
     m_log.closeLog();
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(fcntl(fd, F_GETFD, 0), -1);
+    EXPECT_EQ(m_log.reader(), nullptr);
     EXPECT_EQ(m_log.fd(), -1);
     EXPECT_EQ(m_log.eof(), -1);
 }
@@ -72,10 +73,10 @@ TEST_F(Tail, ALogThatCannotBeOpenedHasItsStatus) {
     EXPECT_THAT(trace.messages(),
                 ElementsAre("Error opening file " + m_path + ".  errno = 13; Permission denied"));
     EXPECT_EQ(m_log.monitorStatus(), MONITOR_ERR_OPEN);
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(m_log.reader(), nullptr);
 }
 
-TEST_F(Tail, ALogThatCannotBeSoughtIsClosed) {
+TEST_F(Tail, ALogWithoutASeekableEndIsClosed) {
     RecordingTrace trace(TRC1_ERROR);
     {
         const Fault fault("lseek", ESPIPE);
@@ -84,7 +85,7 @@ TEST_F(Tail, ALogThatCannotBeSoughtIsClosed) {
     EXPECT_THAT(trace.messages(), ElementsAre("Error while seeking EOF for file " + m_path +
                                               ".  errno = 29; Illegal seek"));
     EXPECT_EQ(m_log.monitorStatus(), MONITOR_ERR_SEEK_EOF);
-    EXPECT_EQ(m_log.stream(), nullptr);
+    EXPECT_EQ(m_log.reader(), nullptr);
     EXPECT_EQ(m_log.fd(), -1);
     EXPECT_EQ(m_log.eof(), -1);
 }
@@ -156,7 +157,7 @@ TEST_F(Tail, WhatIsAppendedWhileReadingIsReadInTheSamePass) {
     EXPECT_EQ(passes.calls(), 1);
 }
 
-TEST_F(Tail, WhatIsAppendedBehindTheReadingIsLeftToTheNextPass) {
+TEST_F(Tail, WhatIsAppendedAfterReadingIsLeftToTheNextPass) {
     open();
     append("one\n");
     m_log.afterReading = [this] {
@@ -189,7 +190,7 @@ TEST_F(Tail, ATruncatedLogIsFollowedFromItsNewEnd) {
     EXPECT_EQ(m_log.eof(), 10);
 }
 
-// The reading is the same as that of a log that has only grown; the ledger knows better.
+// Reading continues as if the log had only grown; the ledger records the truncation.
 TEST_F(Tail, ALogThatIsTruncatedAndGrowsPastItsOldEndIsInTheLedger) {
     append("first\n");
     open();
@@ -212,7 +213,7 @@ TEST_F(Tail, ALogThatIsTruncatedAndGrowsPastItsOldEndIsInTheLedger) {
     EXPECT_EQ(ranges[0].kind, LogLedger::Truncation::regrown);
 }
 
-TEST_F(Tail, TheOldEndThatATruncationTakesAwayIsInTheLedger) {
+TEST_F(Tail, TheUnreadEndLostToATruncationIsInTheLedger) {
     append("first\n");
     open();
     m_directory.write("messages.1", "first\nnever read\n");
@@ -223,7 +224,7 @@ TEST_F(Tail, TheOldEndThatATruncationTakesAwayIsInTheLedger) {
     EXPECT_EQ(m_log.ledger().skippedBytes(), 4 + 11);
 }
 
-TEST_F(Tail, AGrowingLogIsNeverTakenForATruncatedOne) {
+TEST_F(Tail, AGrowingLogIsNeverMistakenForATruncatedOne) {
     append(std::string(5000, 'x') + "\n");
     open();
     for (std::size_t count = 1; count <= 50; ++count) {
@@ -235,7 +236,7 @@ TEST_F(Tail, AGrowingLogIsNeverTakenForATruncatedOne) {
     EXPECT_EQ(m_log.ledger().truncations(), 0);
 }
 
-TEST_F(Tail, AnIdleLogCostsOneSeekPerLook) {
+TEST_F(Tail, AnIdleLogCostsOneSeekPerCheck) {
     append("first\n");
     open();
     const Fault reads("pread", EIO, {.times = 0});
@@ -284,7 +285,7 @@ TEST_F(Tail, ALogThatIsMovedAwayIsFollowedUnderItsNewName) {
     EXPECT_THAT(m_log.lines, ElementsAre("of the old file\n"));
 }
 
-TEST_F(Tail, AnInterruptedWaitGoesOn) {
+TEST_F(Tail, AnInterruptedWaitContinues) {
     open();
     append("one\n");
     m_log.onLine = [this](const std::string& line) {
@@ -305,8 +306,8 @@ TEST_F(Tail, AnInterruptedWaitGoesOn) {
     EXPECT_EQ(m_log.monitorStatus(), MONITOR_STOPPED);
 }
 
-TEST_F(Tail, TheTimeOutIsSetAgainForEveryWait) {
-    // select may count the time-out down; a wait that used the rest would spin.
+TEST_F(Tail, TheTimeoutIsResetForEveryWait) {
+    // select may reduce the timeout; a loop that used what is left would spin.
     open();
     const Fault passes("select", EINVAL, {.skip = 20});
     const auto begin = std::chrono::steady_clock::now();
@@ -314,7 +315,7 @@ TEST_F(Tail, TheTimeOutIsSetAgainForEveryWait) {
     EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(20));
 }
 
-TEST_F(Tail, AFailedLookForTheEndEndsTheMonitor) {
+TEST_F(Tail, AFailedCheckOfTheEndEndsTheMonitor) {
     open();
     expectEnd("lseek", 0,
               "Error while seeking new EOF for file " + m_path + ". errno = 5; Input/output error",
@@ -370,7 +371,7 @@ TEST_F(Tail, AFailedWaitEndsTheMonitor) {
               MONITOR_ERR_WAIT_LOOP);
 }
 
-TEST_F(Tail, OnlyARunningMonitorLooks) {
+TEST_F(Tail, OnlyARunningMonitorChecksTheFile) {
     open();
     append("one\n");
     const Fault looks("lseek", 0, {.times = 0});

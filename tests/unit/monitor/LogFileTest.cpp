@@ -19,7 +19,7 @@ using testing::IsEmpty;
 
 class LogFileTest : public MonitoredFile {
 protected:
-    /// Two records: that of LogBase, here only by its beginning, and that of LogFile.
+    /// Expects two records: the beginning of that of LogBase, and that of LogFile.
     void expectDump(const std::vector<std::string>& messages, std::size_t at,
                     const std::string& record) {
         ASSERT_GE(messages.size(), at + 2);
@@ -33,10 +33,10 @@ using LogFileDeathTest = LogFileTest;
 const std::string useTheCode =
     "Use the return code and message to investigate the failure.  Agent is terminating.";
 
-std::string record(const std::string& stream, int fd, long eof, int status,
+std::string record(const std::string& reader, int fd, long eof, int status,
                    const std::string& changed, int events, int errors) {
     return "\n\tRefreshMode\t\t= 0\n\tLogThread\t\t= \n\tLogLock\t\t\t= \n\tLogFileP\t\t= " +
-           stream + "\n\tLogFD\t\t\t= " + std::to_string(fd) +
+           reader + "\n\tLogFD\t\t\t= " + std::to_string(fd) +
            "\n\tLogEOF\t\t\t= " + std::to_string(eof) +
            "\n\tMonitorStatus\t\t= " + std::to_string(status) +
            "\n\tMonitorStartStopTime\t= " + changed +
@@ -50,7 +50,7 @@ TEST_F(LogFileTest, StartsClosedAndNotStarted) {
     const auto line = validLog(m_path, " ;Y ;S");
     const TestLog log(*line);
     EXPECT_EQ(log.monitorStatus(), MONITOR_NOT_STARTED);
-    EXPECT_EQ(log.stream(), nullptr);
+    EXPECT_EQ(log.reader(), nullptr);
     EXPECT_EQ(log.fd(), -1);
     EXPECT_EQ(log.eof(), -1);
     EXPECT_EQ(log.numEvents(), 0);
@@ -207,10 +207,10 @@ TEST_F(LogFileTest, RunsFromStartToStop) {
     EXPECT_EQ(log.statusText(), "Stopped");
     EXPECT_EQ(log.monitorStartStopTime(), 3000);
     EXPECT_EQ(trace.count("Thread for log file " + m_path + " terminating."), 1);
-    EXPECT_EQ(log.stream(), nullptr);
+    EXPECT_EQ(log.reader(), nullptr);
     EXPECT_EQ(log.fd(), -1);
     EXPECT_EQ(log.eof(), -1);
-    log.stopThread(); // joined already
+    log.stopThread(); // already joined
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
 }
 
@@ -223,7 +223,7 @@ TEST_F(LogFileTest, StoppingANeverStartedLogLeavesItNotStarted) {
     EXPECT_EQ(counter.calls(), 0);
 }
 
-TEST_F(LogFileTest, AThreadAttributeThatCannotBeSetIsNoObstacle) {
+TEST_F(LogFileTest, AThreadAttributeThatCannotBeSetDoesNotPreventTheStart) {
     TestLog log(*m_line);
     RecordingTrace trace(TRC1_DETAIL);
     const Fault fault("pthread_attr_setdetachstate", EINVAL);
@@ -256,7 +256,7 @@ TEST_F(LogFileTest, ARestartThatFailsCanBeStoppedAndTriedAgain) {
     log.stopThread();
     {
         const Fault fault("pthread_create", EAGAIN);
-        log = *m_line; // joins nothing that was joined before
+        log = *m_line; // does not join the old thread again
     }
     EXPECT_EQ(log.monitorStatus(), MONITOR_STOPPED);
     log = *m_line;
@@ -264,7 +264,7 @@ TEST_F(LogFileTest, ARestartThatFailsCanBeStoppedAndTriedAgain) {
     EXPECT_EQ(joins.calls(), 1);
 }
 
-TEST_F(LogFileTest, AStreamLeftOpenIsDumpedAtTheThreadsEnd) {
+TEST_F(LogFileTest, ALogLeftOpenIsDumpedAtTheThreadsEnd) {
     const TimeZone zone("UTC0");
     const FakeClock clock(0);
     TestLog log(*m_line);
@@ -272,10 +272,10 @@ TEST_F(LogFileTest, AStreamLeftOpenIsDumpedAtTheThreadsEnd) {
     RecordingTrace trace(0);
     log.startThread();
     log.stopThread();
-    char stream[32];
-    std::snprintf(stream, sizeof stream, "%p", static_cast<void*>(log.stream()));
+    char reader[32];
+    std::snprintf(reader, sizeof reader, "%p", static_cast<const void*>(log.reader()));
     expectDump(trace.messages(), 0,
-               record(stream, log.fd(), 0, 1, "Thu Jan  1 00:00:00 1970", 0, 0));
+               record(reader, log.fd(), 0, 1, "Thu Jan  1 00:00:00 1970", 0, 0));
     log.closeLog();
 }
 
@@ -417,11 +417,11 @@ TEST_F(CommonColumns, AreCutAtTheirWidths) {
     EXPECT_EQ(columnText(row.ulogpath), path.substr(0, 768));
     EXPECT_EQ(columnText(row.logname), name.substr(0, 128));
     EXPECT_EQ(columnText(row.ulogname), name);
-    EXPECT_EQ(columnText(row.entrytime), ""); // behind LOGNAME
-    EXPECT_EQ(columnText(row.uentrysrc), ""); // behind ULOGNAME
+    EXPECT_EQ(columnText(row.entrytime), ""); // after LOGNAME
+    EXPECT_EQ(columnText(row.uentrysrc), ""); // after ULOGNAME
 }
 
-TEST_F(CommonColumns, HoldAFullSystemNameAndNone) {
+TEST_F(CommonColumns, HoldAFullSystemNameOrNone) {
     char full[65];
     std::memset(full, 'x', 64);
     full[64] = '\0';

@@ -60,7 +60,7 @@ TEST(LogLedger, CountsRowsWithoutATime) {
     EXPECT_EQ(ledger.withoutTime(), 2);
 }
 
-TEST(LogLedger, KeepsTheLatestLinesTheOldestFirst) {
+TEST(LogLedger, KeepsTheLatestLinesOldestFirst) {
     LogLedger ledger;
     std::vector<std::string> expected;
     for (int i = 0; i < 20; ++i) {
@@ -90,7 +90,7 @@ TEST(LogLedger, KeepsTheLatestRangesAndCountsAll) {
         ledger.noteTruncated(LogLedger::Truncation::seen, i, i == 20 ? 100 : -1);
     }
     EXPECT_EQ(ledger.truncations(), 20);
-    EXPECT_EQ(ledger.skippedBytes(), 310) << "where it is known, with the old end";
+    EXPECT_EQ(ledger.skippedBytes(), 310) << "includes the unread end where it is known";
     const auto ranges = skippedBy(ledger);
     ASSERT_THAT(ranges, SizeIs(LogLedger::mostKept));
     EXPECT_EQ(ranges.front().from, 0);
@@ -135,7 +135,7 @@ class LedgerOfALog : public MonitoredFile {
 protected:
     LedgerOfALog() { m_log.openLogAndSeek(); }
     ~LedgerOfALog() override { m_log.closeLog(); }
-    /// Follows the log until so many lines have been read.
+    /// Follows the log until this many lines have been read.
     void followTo(std::size_t lines) {
         m_log.onLine = [this, lines](const std::string&) {
             if (m_log.lines.size() >= lines) {
@@ -158,13 +158,13 @@ TEST_F(LedgerOfALog, CountsTheBytesThatWereRead) {
     EXPECT_EQ(m_ledger.bytesRead(), 13);
 }
 
-TEST_F(LedgerOfALog, KeepsTheLinesThatDoNotFit) {
+TEST_F(LedgerOfALog, KeepsTheLinesThatDoNotMatch) {
     append("one\nbad\ntwo\nbad again\n");
     followTo(4);
     EXPECT_THAT(rejectedBy(m_ledger), ElementsAre("bad", "bad again"));
 }
 
-TEST_F(LedgerOfALog, TellsTheTimeOfTheLastEntry) {
+TEST_F(LedgerOfALog, RecordsTheTimeOfTheLastEntry) {
     const std::time_t before = now().tv_sec;
     append("one\n");
     followTo(1);
@@ -172,7 +172,7 @@ TEST_F(LedgerOfALog, TellsTheTimeOfTheLastEntry) {
     EXPECT_LE(m_ledger.lastEntry() / 1'000'000'000, now().tv_sec);
 }
 
-TEST_F(LedgerOfALog, TellsWhichBytesATruncationSkips) {
+TEST_F(LedgerOfALog, RecordsTheBytesThatATruncationSkips) {
     append("one\ntwo\n");
     followTo(2);
     std::filesystem::resize_file(m_path, 4);
@@ -191,7 +191,7 @@ TEST_F(LedgerOfALog, TellsWhichBytesATruncationSkips) {
     EXPECT_EQ(m_ledger.bytesRead(), 12);
 }
 
-TEST_F(MonitoredFile, ALedgerLastsThroughARefreshThatRestartsTheMonitor) {
+TEST_F(MonitoredFile, ALedgerSurvivesARefreshThatRestartsTheMonitor) {
     TestLog log(*m_line);
     log.startThread();
     ASSERT_TRUE(waitUntil([&log] { return log.eof() == 0; }));
@@ -199,7 +199,7 @@ TEST_F(MonitoredFile, ALedgerLastsThroughARefreshThatRestartsTheMonitor) {
     ASSERT_TRUE(waitUntil([&log] { return log.ledger().bytesRead() == 8; }));
     EXPECT_EQ(log.ledger().restarts(), 0);
     log = *m_line;
-    EXPECT_EQ(log.ledger().restarts(), 0) << "a monitor that runs is not started again";
+    EXPECT_EQ(log.ledger().restarts(), 0) << "a running monitor is not restarted";
     log.setMonitorStatus(MONITOR_ERR_READ);
     log = *m_line;
     EXPECT_EQ(log.ledger().restarts(), 1);

@@ -68,7 +68,7 @@ TEST_F(ReadGuardTest, FindsTheUnreadEndInTheCopyOfARotation) {
     EXPECT_EQ(unread(), 0);
 }
 
-TEST_F(ReadGuardTest, TakesTheNewestOfSeveralCopies) {
+TEST_F(ReadGuardTest, UsesTheNewestOfSeveralCopies) {
     take(m_text.size());
     const auto old = std::filesystem::path(m_directory.write("app.log.1", m_text + "unread\n"));
     m_directory.write("app.log.2", m_text + "unread and more\n");
@@ -84,7 +84,7 @@ TEST_F(ReadGuardTest, FindsNoCopyInTheLogItselfNorBehindASymbolicLink) {
     const std::string elsewhere = m_directory.write("elsewhere", m_text);
     std::filesystem::create_symlink(elsewhere, m_directory.file("app.log.link"));
     EXPECT_EQ(unread(), -1);
-    EXPECT_EQ(m_guard.unreadInCopy(m_fd, "app.log"), -1) << "no whole path";
+    EXPECT_EQ(m_guard.unreadInCopy(m_fd, "app.log"), -1) << "not a complete path";
     EXPECT_EQ(m_guard.unreadInCopy(m_fd, "/none/app.log"), -1);
 }
 

@@ -11,12 +11,12 @@ using namespace zrm;
 
 namespace {
 
-/// What following a file comes to, said plainly.
+/// The expected result of following a file, computed in the simplest way.
 class Model {
 public:
     explicit Model(const std::string& content) : m_consumed(content.size()) {}
 
-    /// One look at the file; adds the pieces that are reported.
+    /// Checks the file once and adds the pieces to report.
     void look(const std::string& content) {
         if (content.size() < m_consumed) {
             ++warnings;
@@ -66,7 +66,7 @@ protected:
     std::mt19937 m_engine{m_seed};
 };
 
-TEST_F(TailModel, RandomChangesOfTheFileGiveWhatTheModelGives) {
+TEST_F(TailModel, RandomChangesOfTheFileAgreeWithTheModel) {
     SCOPED_TRACE("seed " + std::to_string(m_seed));
     for (int round = 0; round < 20; ++round) {
         std::string content = someText();
@@ -87,7 +87,7 @@ TEST_F(TailModel, RandomChangesOfTheFileGiveWhatTheModelGives) {
                 }
             }
             {
-                const Fault end("select", EINVAL); // one look
+                const Fault end("select", EINVAL); // one check
                 log.follow();
             }
             model.look(content);
@@ -105,7 +105,7 @@ TEST_F(TailModel, RandomChangesOfTheFileGiveWhatTheModelGives) {
     }
 }
 
-TEST_F(TailModel, EveryByteAppendedBesideTheThreadIsReportedOnceAndInOrder) {
+TEST_F(TailModel, EveryByteAppendedConcurrentlyIsReportedOnceAndInOrder) {
     SCOPED_TRACE("seed " + std::to_string(m_seed));
     append("before");
     TestLog log(*m_line);
@@ -117,7 +117,7 @@ TEST_F(TailModel, EveryByteAppendedBesideTheThreadIsReportedOnceAndInOrder) {
         append(text);
         appended += text;
         if (random() % 10 == 0) {
-            log = *m_line; // a reconfiguration leaves a running monitor
+            log = *m_line; // a reconfiguration leaves a running monitor alone
         }
     }
     ASSERT_TRUE(

@@ -19,9 +19,9 @@
 
 using namespace zrm;
 
-/// A kind of log of the tests: a line that begins with "bad" is rejected, any other becomes the
-/// description of its row. Its thread polls every millisecond. The operations that the kinds of
-/// logs use are public, so that a test may also go through them on its own thread.
+/// A log type for tests. It rejects lines that begin with "bad"; any other line becomes the
+/// description of its row. Its thread polls every millisecond. The operations for log types are
+/// public, so that a test can also call them on its own thread.
 class TestLog : public LogFile {
 public:
     explicit TestLog(const ValidLog& log, LogFile* chainHead = nullptr) : LogFile(log, chainHead) {}
@@ -46,26 +46,29 @@ public:
     using LogFile::lockLog;
     using LogFile::openLogAndSeek;
     using LogFile::openLogForReport;
+    using LogFile::ownRow;
     using LogFile::unlockDebugFile;
     using LogFile::unlockLog;
     using LogFile::waitForEventLoop;
     using LogFile::writeToDebugLog;
 
-    /// Runs the wait loop on the test's own thread until something ends it.
+    /// Runs the wait loop on the calling thread until something ends it.
     void follow();
     std::int64_t eof() const { return LogEOF; }
     int fd() const { return LogFD; }
-    std::FILE* stream() const { return LogFileP; }
+    /// What reads the log; null while it is closed.
+    const LineReader* reader() const { return LogFileP; }
     pthread_mutex_t& lock() const { return LogLock; }
     std::int64_t blockSize() const { return OptimumBlockSize; }
     void setBlockSize(std::int64_t size) { OptimumBlockSize = size; }
     void setType(char type) { LogType = type; }
     std::string statusText() const;
 
-    std::function<void(const std::string&)> onLine; ///< called with every line, on its thread
-    std::function<void()> afterReading;             ///< called with the thread's reading done
-    std::vector<std::string> lines;                 ///< of the thread that reads
-    std::atomic<bool> closes{true};                 ///< false: the log stays open at the end
+    std::function<void(const std::string&)>
+        onLine;                         ///< called with every line, on the reading thread
+    std::function<void()> afterReading; ///< called after each pass of reading
+    std::vector<std::string> lines;     ///< all lines read so far
+    std::atomic<bool> closes{true};     ///< false: the log stays open at the end
 };
 
 /// A directory with one log file, "messages", empty at first.

@@ -68,7 +68,7 @@ TEST(FieldNames, AreCutAt15Characters) {
     EXPECT_STREQ(parser.next()->fieldName(), "averylongkeywor");
 }
 
-TEST(FieldNames, StandInTheOrderOfTheDirectives) {
+TEST(FieldNames, AreInTheOrderOfTheDirectives) {
     const ParserProbe parser("A , \"%d-%*d-%d %s\" ,\tyear month = \"%02d\"  description ");
     ASSERT_TRUE(parser.isLearned());
     const char* const names[] = {"year", "*", "month", "description"};

@@ -15,7 +15,7 @@ inline constexpr _KeywordFields testKeywords[] = {
     {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2}, {"description", 2}, {nullptr, 0},
 };
 
-/// A parser whose steps and state the tests can reach.
+/// A parser whose steps and state are accessible to tests.
 class ParserProbe : public StringParser {
 public:
     explicit ParserProbe(const std::string& format, const _KeywordFields* fields = testKeywords)
@@ -44,7 +44,7 @@ public:
     using StringParser::validateScanConvcode;
 
     bool isLearned() const { return status() == OBJECT_FORMAT_LEARNED; }
-    /// The node of the directive with this number, counted from 1; null when there is none.
+    /// The node of the directive with this number, counted from 1, or null.
     const StringParser* node(int number) const {
         const StringParser* result = next();
         for (; result != nullptr && number > 1; --number) {

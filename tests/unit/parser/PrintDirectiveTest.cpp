@@ -7,10 +7,11 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstdint>
 
 using namespace zrm;
 
-// Print directives: how each is learned, and the message of each warning and refusal.
+// Print directives: how each is learned, and the message for each warning and refusal.
 
 namespace {
 
@@ -21,7 +22,7 @@ std::string formatOf(const std::string& scan, const std::string& print) {
     return "a,\"" + scan + "\",day = \"" + print + "\"";
 }
 
-/// Two refusals: the print directive's own and, behind it, the field's.
+/// Two refusals: that of the print directive and then that of the field.
 std::vector<std::string> errorsOf(const std::string& scan, const std::string& print) {
     RecordingTrace trace(TRC1_ERROR);
     const ParserProbe parser(formatOf(scan, print));
@@ -38,7 +39,7 @@ std::vector<std::string> errorsOf(const std::string& scan, const std::string& pr
     return messages;
 }
 
-/// The learned directive, "refused", and the warnings on the way.
+/// The learned directive, or "refused", and the warnings.
 std::pair<std::string, std::vector<std::string>> learned(const std::string& scan,
                                                          const std::string& print) {
     RecordingTrace trace(TRC1_ERROR);
@@ -79,6 +80,15 @@ TEST(PrintDirective, IsTheTypesDefaultWhenNoneIsGiven) {
     EXPECT_STREQ(StringParser::convertType2Char(static_cast<_DataType>(38)), "");
 }
 
+TEST(PrintDirective, TheTextOfATypeIsTheResultOfAnOperation) {
+    const RecordingTrace trace(TRC1_FLOW);
+    const char* const text = StringParser::convertType2Char(DATATYPE_LONGx);
+    EXPECT_THAT(trace.events(),
+                ElementsAre("StringParser.cpp entry",
+                            "StringParser.cpp exit " +
+                                std::to_string(reinterpret_cast<std::intptr_t>(text))));
+}
+
 TEST(PrintDirective, KeepsTextConversionAndText) {
     EXPECT_EQ(directive("%d", "%02d"), "%02d");
     EXPECT_EQ(directive("%d", "day %5d!"), "day %5d!");
@@ -104,7 +114,7 @@ TEST(PrintDirective, IsIntroducedByAnEqualsSignAndAQuote) {
 }
 
 TEST(PrintDirective, HasAnEnd) {
-    EXPECT_THAT(errorsOf("%d", "%d\\"), IsEmpty()); // the quote is escaped away
+    EXPECT_THAT(errorsOf("%d", "%d\\"), IsEmpty()); // the closing quote is escaped
     RecordingTrace trace(TRC1_ERROR);
     for (const char* text : {"\"", "\"text", "\"%d", "\"%-", "\"%-5.", "\"text\\"}) {
         trace.clear();
@@ -264,7 +274,7 @@ TEST(PrintOptions, AreDroppedWhereTheTypeRefusesThem) {
 constexpr char leftOverZero[] =
     "Warning: left justification overrides zero padding in print directive for field day.";
 
-TEST(PrintOptions, LeftJustificationMeetsZeroPadding) {
+TEST(PrintOptions, LeftJustificationOverridesZeroPadding) {
     EXPECT_EQ(learned("%d", "%-05d").first, "%-5d");
     EXPECT_THAT(learned("%d", "%-05d").second, ElementsAre(leftOverZero));
     EXPECT_EQ(learned("%d", "%0-5d").first, "%0-5d");
@@ -273,7 +283,7 @@ TEST(PrintOptions, LeftJustificationMeetsZeroPadding) {
     EXPECT_THAT(learned("%d", "%0--5d").second, ElementsAre(leftOverZero));
 }
 
-TEST(PrintOptions, SignMeetsBlank) {
+TEST(PrintOptions, SignOverridesBlank) {
     EXPECT_EQ(learned("%d", "%+ d").first, "%+d");
     EXPECT_THAT(learned("%d", "%+ d").second,
                 ElementsAre("Warning: '+' option overrides ' ' option in print directive for field "
@@ -282,12 +292,12 @@ TEST(PrintOptions, SignMeetsBlank) {
     EXPECT_THAT(learned("%d", "% +d").second,
                 ElementsAre("Warning: '+' option overrides ' 'option in print directive for field "
                             "day."));
-    EXPECT_EQ(learned("%u", "%+ u").first, "%u") << "a refused '+' was not given";
+    EXPECT_EQ(learned("%u", "%+ u").first, "%u") << "a refused '+' does not count";
     EXPECT_THAT(learned("%u", "%+ u").second,
                 ElementsAre(refusedOption('+', "%u", "+ u\""), refusedOption(' ', "%u", " u\"")));
 }
 
-TEST(PrintOptions, GivenTwiceAreDroppedInSilence) {
+TEST(PrintOptions, GivenTwiceAreDroppedSilently) {
     EXPECT_EQ(directive("%d", "%++d"), "%+d");
     EXPECT_EQ(directive("%d", "%  d"), "% d");
     EXPECT_EQ(directive("%d", "%--d"), "%-d");
@@ -296,16 +306,16 @@ TEST(PrintOptions, GivenTwiceAreDroppedInSilence) {
     EXPECT_EQ(directive("%d", "%00d"), "%0d");
 }
 
-TEST(PrintOptions, GroupingTellsTheLocalesSeparator) {
+TEST(PrintOptions, GroupingTracesTheLocalesSeparator) {
     RecordingTrace trace(TRC1_FINE);
     const ParserProbe parser(formatOf("%d", "%'d"));
-    EXPECT_EQ(trace.count("Integer \"thousands_sep\" is ' '."), 1) << "none in the \"C\" locale";
+    EXPECT_EQ(trace.count("Integer \"thousands_sep\" is ' '."), 1) << "the \"C\" locale has none";
 }
 
 // The build area.
 
 TEST(PrintDirective, FillsTheBuildAreaUpTo255Characters) {
-    // The closing quote takes a place while it is read.
+    // The closing quote occupies one character while it is read.
     const std::string text(254, 'x');
     EXPECT_EQ(directive("%d", text), text);
     EXPECT_THAT(errorsOf("%d", text + "x"), IsEmpty());

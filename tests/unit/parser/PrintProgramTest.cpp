@@ -27,7 +27,7 @@ std::string printed(const std::string& directive, _DataType type, const Value& v
     EXPECT_TRUE(program.run(value.bytes, buffer));
     EXPECT_EQ(buffer.position, text.data() + (room - buffer.room));
     const auto used = static_cast<std::size_t>(room - buffer.room);
-    EXPECT_EQ(text.find_first_not_of('#', used), text.npos) << "written behind the text";
+    EXPECT_EQ(text.find_first_not_of('#', used), text.npos) << "written past the text";
     text.resize(used);
     return text;
 }
@@ -168,7 +168,7 @@ TEST(PrintProgram, PrintsSmallNumbersAsTheCLibraryDoes) {
     }
 }
 
-TEST(PrintProgram, RefusesNumbersThatAreNoDatatypes) {
+TEST(PrintProgram, RefusesNumbersThatAreNotDataTypes) {
     PrintProgram program;
     EXPECT_FALSE(program.compile("%d", static_cast<_DataType>(10)));
     EXPECT_FALSE(program.isCompiled());

@@ -24,8 +24,8 @@ std::string CaseGenerator::literal() {
     std::string text;
     for (unsigned count = below(4); count > 0; --count) {
         const std::string piece = pick(pieces);
-        // White space in front of a byte beyond ASCII is left out: there the C library of some
-        // locales forgets to skip it.
+        // No white space before a byte beyond ASCII: in some locales the C library fails to skip
+        // it there.
         if (piece[0] == '\xe9' && !text.empty() && (text.back() <= ' ' && text.back() >= 0)) {
             continue;
         }

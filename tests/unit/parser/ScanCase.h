@@ -22,7 +22,7 @@ public:
 
     /// A scan directive as StringParser builds it: literal text, one conversion, "%n".
     std::string scanDirective();
-    /// A text that begins in about half of the cases as the directive asks for.
+    /// A text that begins as the directive requires in about half of the cases.
     std::string textFor(const std::string& directive);
 
 private:

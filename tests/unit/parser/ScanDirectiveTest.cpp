@@ -10,7 +10,7 @@
 
 using namespace zrm;
 
-// Scan directives: how each is learned, and the message of each that cannot be.
+// Scan directives: how each is learned, and the message for each that cannot be.
 
 namespace {
 
@@ -99,7 +99,7 @@ TEST(ScanDirective, SuppressedOnesNeedNoFieldNameAndHaveNoStorage) {
     for (const char* text : texts) {
         const StringParser* node = parser.node(number++);
         ASSERT_NE(node, nullptr);
-        EXPECT_STREQ(node->scanDirective(), text) << "no width is put in where nothing is stored";
+        EXPECT_STREQ(node->scanDirective(), text) << "no width is inserted if nothing is stored";
         EXPECT_TRUE(node->isSuppressed());
         EXPECT_STREQ(node->fieldName(), "*");
         EXPECT_STREQ(node->printDirective(), "");
@@ -109,7 +109,7 @@ TEST(ScanDirective, SuppressedOnesNeedNoFieldNameAndHaveNoStorage) {
     EXPECT_TRUE(ParserProbe("a,\"%*d\",").isLearned());
 }
 
-TEST(ScanDirective, ColumnsAreStoredFromZeroAndLeftOutOfTheDirective) {
+TEST(ScanDirective, ColumnsAreStoredFromZeroAndOmittedFromTheDirective) {
     const ParserProbe parser(formatOf("%(10)s %(1)5c%(999)*d%d", "source type day"));
     ASSERT_TRUE(parser.isLearned());
     EXPECT_EQ(parser.node(1)->offset(), 9U);
@@ -251,7 +251,7 @@ TEST(ScanDirective, FillsTheBuildAreaUpTo255Characters) {
     EXPECT_THAT(errorsOf(ofLength(256, "%%d")), IsEmpty());
 }
 
-TEST(ScanDirective, TheDefaultWidthIsHeldEvenWithoutRoomForItsText) {
+TEST(ScanDirective, TheDefaultWidthAppliesEvenWithoutRoomForItsText) {
     const ParserProbe roomy(formatOf(ofLength(251, "%s")));
     ASSERT_TRUE(roomy.isLearned());
     EXPECT_EQ(roomy.next()->scanDirective(), ofLength(253, "%31s") + "%n");

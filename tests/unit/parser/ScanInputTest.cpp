@@ -17,7 +17,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-/// The messages of a line that does not fit.
+/// The messages of a line that does not match.
 std::vector<std::string> errorsOf(const std::string& format, const std::string& line) {
     ParserProbe parser(format);
     EXPECT_TRUE(parser.isLearned());
@@ -27,7 +27,7 @@ std::vector<std::string> errorsOf(const std::string& format, const std::string& 
     return trace.messages();
 }
 
-/// What a line gives for one field; "unfit" when it does not fit.
+/// The text of a line's one field, or "unfit" if the line does not match.
 std::string printed(const std::string& format, const std::string& line,
                     const char* keyword = "description") {
     ParserProbe parser(format);
@@ -54,7 +54,8 @@ TEST(ScanInput, CountsTheDirectivesThatItScanned) {
     TestBuffers buffers;
     EXPECT_EQ(parser.formatFields(buffers.get()), 2);
     EXPECT_EQ(parser.scanInput("1 2 x\n"), -1);
-    EXPECT_EQ(parser.scanInput("4 5 6\n"), 3) << "a line that does not fit leaves the chain usable";
+    EXPECT_EQ(parser.scanInput("4 5 6\n"), 3)
+        << "a line that does not match leaves the chain usable";
 }
 
 TEST(ScanInput, ALineOfOneCharacterIsBlank) {
@@ -134,7 +135,7 @@ TEST(ScanInput, AFullBufferCutsAndThenSkips) {
     EXPECT_EQ(parser.formatLine("abc defg hi\n", none.get()), 0);
 }
 
-TEST(ScanInput, NothingBehindTheRoomIsWritten) {
+TEST(ScanInput, NothingPastTheRoomIsWritten) {
     ParserProbe parser("A,\"%[^\n]\",description = \"<%s>\"");
     for (const long room : {1L, 2L, 5L, 6L}) {
         std::string memory(10, '#');
@@ -220,7 +221,7 @@ TEST(ScanInput, AFieldThatCannotBePrintedFailsTheLine) {
     EXPECT_EQ(buffers.text("year"), "");
 }
 
-TEST(ScanInput, AFieldOfNoDatatypeIsPassedOver) {
+TEST(ScanInput, AFieldWithoutADataTypeIsSkipped) {
     ParserProbe parser("A,\"%d %d\",month day");
     RecordingTrace trace(TRC1_ERROR);
     StringParser* const node = parser.ScanOrder.get();
@@ -234,7 +235,7 @@ TEST(ScanInput, AFieldOfNoDatatypeIsPassedOver) {
     node->*(&ParserProbe::DataType) = DATATYPE_INT;
 }
 
-TEST(ScanInput, LinesThatFitAreNotTraced) {
+TEST(ScanInput, LinesThatMatchAreNotTraced) {
     ParserProbe parser("A,\"%(1)d %s\",day description");
     RecordingTrace trace(TRC1_ERROR | TRC1_DETAIL | TRC1_FINE);
     TestBuffers buffers;

@@ -15,7 +15,7 @@ using namespace zrm;
 
 namespace {
 
-/// A receiving variable that shows what was written behind a value.
+/// A receiving variable that shows writes past a value.
 using Storage = std::array<unsigned char, 1100>;
 
 struct Result {
@@ -23,7 +23,7 @@ struct Result {
     Storage value{};
 };
 
-/// Clears the bytes of a long double that hold no part of the number and may be anything.
+/// Clears the padding bytes of a long double, which are undefined.
 void clearPadding(const std::string& directive, Result& result) {
     constexpr bool isPadded = std::numeric_limits<long double>::digits == 64;
     if (isPadded && directive.find_first_of("efg", directive.rfind('L')) != std::string::npos) {
@@ -145,7 +145,7 @@ TEST(ScanProgram, SuppressedTextsHaveNoLimitOfTheirOwn) {
     EXPECT_EQ(scanned("%*5s%n", "abcdefgh").consumed, 5);
 }
 
-TEST(ScanProgram, TakesCharactersAsTheyAre) {
+TEST(ScanProgram, ReadsCharactersUnchanged) {
     EXPECT_EQ(text(scanned("%5c%n", " a\tb cd")), " a\tb ");
     EXPECT_EQ(text(scanned("%5c%n", "ab")), "ab");
     Storage storage;
@@ -157,10 +157,10 @@ TEST(ScanProgram, TakesCharactersAsTheyAre) {
     EXPECT_EQ(storage[1], '#') << "a single character is not terminated";
     program.compile("%4c%n", 0);
     EXPECT_EQ(program.run("xy", storage.data()), 2);
-    EXPECT_STREQ(reinterpret_cast<char*>(storage.data()), "xy") << "nothing of the line before";
+    EXPECT_STREQ(reinterpret_cast<char*>(storage.data()), "xy") << "nothing of the previous line";
 }
 
-TEST(ScanProgram, TellsTheEndOfInputFromAMismatch) {
+TEST(ScanProgram, DistinguishesTheEndOfInputFromAMismatch) {
     EXPECT_EQ(scanned("%d%n", "").consumed, ScanProgram::endOfInput);
     EXPECT_EQ(scanned("%d%n", " \t\n").consumed, ScanProgram::endOfInput);
     EXPECT_EQ(scanned("ab%d%n", "a").consumed, ScanProgram::endOfInput);

@@ -90,7 +90,7 @@ TEST(StringParser, TheChainConstructorMovesThePosition) {
 
     position = "\"%d %";
     const ParserProbe failed(&position);
-    EXPECT_EQ(failed.status(), OBJECT_FAILED) << "a node fails with the one behind it";
+    EXPECT_EQ(failed.status(), OBJECT_FAILED) << "a node fails if the next one fails";
     EXPECT_EQ(failed.next(), nullptr);
 }
 
@@ -170,7 +170,7 @@ TEST(StringParser, NodesAreDestroyedFromTheLastOne) {
                                               "day object destroyed.", "ANCHOR object destroyed."));
 }
 
-TEST(StringParser, AValueOfNoDatatypeIsReportedAtTheEnd) {
+TEST(StringParser, AValueWithoutADataTypeIsReportedAtTheEnd) {
     RecordingTrace trace(TRC1_ERROR);
     {
         const char* position = "\"%d\"";
@@ -197,7 +197,7 @@ TEST(StringParser, LearnsAsManyDirectivesAsAConfigurationLineHolds) {
     EXPECT_NE(parser.node(501), nullptr);
 }
 
-/// Runs the work on a thread with little stack, as those of requests have.
+/// Runs the work on a thread with a small stack, like the threads of requests.
 void onASmallStack(void (*work)()) {
     pthread_attr_t attributes;
     ASSERT_EQ(pthread_attr_init(&attributes), 0);

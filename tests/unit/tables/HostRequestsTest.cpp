@@ -8,8 +8,8 @@
 #include "host/framework/Sample.h"
 #include "host/framework/Tables.h"
 
-#include "AllocationCount.h"
 #include "TestLogs.h"
+#include "support/AllocationCount.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
@@ -154,7 +154,7 @@ TEST_F(HostRequests, ThresholdConditionsHoldForTheRowsTheyLetThrough) {
     }
 }
 
-TEST_F(HostRequests, ThresholdsThatAreNoneLetEveryRowThrough) {
+TEST_F(HostRequests, IncompleteThresholdsLetEveryRowThrough) {
     const std::vector<std::vector<Condition>> inert = {
         {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1), number("PERIODTHRS", INTF_EQUAL, 0)},
         {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1)},
@@ -182,7 +182,7 @@ TEST_F(HostRequests, AThresholdThatTheTableRefusesLetsEveryRowThrough) {
     EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
 }
 
-TEST_F(HostRequests, AReportReadsTheLogThatItsEqualityNames) {
+TEST_F(HostRequests, AReportReadsTheLogNamedByItsEqualConditions) {
     TestLogs logs;
     logs.add("/var/log/auth.log").entries = 3;
     logs.add("/var/log/syslog").entries = 5;
@@ -207,7 +207,7 @@ TEST_F(HostRequests, ReportsReadTheLogNamedByTheirConditions) {
                                   text("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
     ASSERT_TRUE(sample.has_value());
     EXPECT_EQ(sample->size(), 45U);
-    // A short time is taken as it is; so it still compares as a text.
+    // A short time is used unchanged, so it still compares as a text.
     EXPECT_STREQ(logs.logs[0]->seen.startTime, "1260101");
     EXPECT_STREQ(logs.logs[0]->seen.endTime, "1270101000000000");
     EXPECT_EQ(logs.logs[0]->asked, 46);
@@ -249,7 +249,7 @@ TEST_F(HostRequests, RefusedRowsCostNoAllocation) {
     EXPECT_THAT(m_receiver.received, IsEmpty());
 }
 
-TEST_F(HostRequests, ARowKeepsTheThresholdsOfTheLastRequestThoughThatIsPassedOver) {
+TEST_F(HostRequests, ARowKeepsTheLastRequestsThresholdsEvenIfItIsSkipped) {
     const Request first(logEntries(), situation({}), m_receiver);
     const auto conditions = [](std::string log, int frequency, int period) {
         return situation({text("LOGNAME", INTF_EQUAL, std::move(log)),
@@ -262,14 +262,14 @@ TEST_F(HostRequests, ARowKeepsTheThresholdsOfTheLastRequestThoughThatIsPassedOve
     EXPECT_EQ(row.freqthresh, 5);
     EXPECT_EQ(row.periodthrs, 60);
     EXPECT_THAT(m_receiver.received, ElementsAre(std::pair(1, 0)));
-    // One that takes the row leaves the number of entries that it has counted.
+    // A request that accepts the row leaves its count of entries there.
     const Request third(logEntries(), conditions("auth.log", 1, 50), m_receiver);
     EXPECT_EQ(zrm_rmlogent_manager::EventArrived(&row, 1), 0U);
     EXPECT_EQ(row.freqthresh, 1);
     EXPECT_EQ(row.periodthrs, 50);
 }
 
-TEST_F(HostRequests, NobodyIsPassedOverWhereTheTraceWouldShowIt) {
+TEST_F(HostRequests, NoRequestIsSkippedWhileTheTraceWouldShowIt) {
     const Request mine(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "auth.log")}),
                        m_receiver);
     const Request other(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "syslog")}),

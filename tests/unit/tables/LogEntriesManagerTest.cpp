@@ -94,7 +94,7 @@ TEST_F(LogEntriesManager, CreatesRequestsOfTheTable) {
     EXPECT_STREQ(request->name(), "alpha");
 }
 
-TEST_F(LogEntriesManager, GivesNoRequestWithoutMemory) {
+TEST_F(LogEntriesManager, CreatesNoRequestWithoutMemory) {
     TestRequest test(SAMPLE_SITUATION);
     const Fault fault("new", ENOMEM);
     EXPECT_EQ(m_manager.CreateCtreq(&test, nullptr), nullptr);
@@ -149,7 +149,7 @@ TEST_F(LogEntriesManager, TheLastFailedDispatchIsReportedAndStopsNothing) {
     for (const TestRequest& test : tests) {
         EXPECT_EQ(test.dispatched.size(), 1U);
     }
-    // A failed insertion is the request's own business.
+    // A failed insertion concerns the request alone.
     tests[0].dispatchStatus = tests[2].dispatchStatus = 0;
     tests[1].insertStatus = {99};
     EXPECT_EQ(m_manager.AddDataToEvent(m_rows, 1), 0U);
@@ -184,7 +184,7 @@ TEST_F(LogEntriesManager, ArraysOfSeveralThreadsAreServedOneAtATime) {
             zrm_rmlogent_data_t row;
             std::memcpy(&row, test->dispatched[i].data(), sizeof row);
             const auto log = static_cast<std::size_t>(row.sampleno);
-            ASSERT_EQ(row.rowno, next[log]++) << "a row was lost or overtaken";
+            ASSERT_EQ(row.rowno, next[log]++) << "a row was lost or out of order";
         }
     }
     // Each array went to both requests before the next one came.

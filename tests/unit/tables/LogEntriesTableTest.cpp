@@ -1,4 +1,4 @@
-// The Log Entries table as the framework learns it: its columns, their comparison, the default row
+// The Log Entries table as the framework sees it: its columns, their comparison, the default row
 // filter and the state dump.
 
 #include "tables/zrm_rmlogent_base.h"
@@ -78,7 +78,7 @@ TEST_F(LogEntriesTable, EveryColumnIsDescribed) {
     }
 }
 
-TEST_F(LogEntriesTable, IndexBehindTheLastColumnIsNoErrorAndFillsNothing) {
+TEST_F(LogEntriesTable, TheIndexAfterTheLastColumnIsNotAnErrorAndFillsNothing) {
     const char* const name = "untouched";
     for (const auto& [index, status] : {std::pair(18, 0U), {19, 0x21060007U}, {-1, 0x21060007U}}) {
         ColumnInfo info{name, 11, 12, 13};
@@ -94,7 +94,7 @@ TEST_F(LogEntriesTable, EveryColumnIsComparedByItsUpperCaseName) {
     zrm_rmlogent_data_t row = blankRow();
     int number = 0;
     for (const auto& [name, internal, type, offset, width] : logEntriesColumns) {
-        // Each column is filled to its last byte, so that a wrong place or width shows.
+        // Each column is filled to its last byte, so that a wrong offset or width is detected.
         if (type == COLUMN_INTEGER) {
             const std::int32_t value = ++number * -1000;
             std::memcpy(bytes(row) + offset, &value, sizeof value);
@@ -123,7 +123,7 @@ TEST_F(LogEntriesTable, EveryColumnIsComparedByItsUpperCaseName) {
     }
 }
 
-TEST_F(LogEntriesTable, UnknownColumnsAreNoException) {
+TEST_F(LogEntriesTable, UnknownColumnsNeverMatch) {
     zrm_rmlogent_data_t row = blankRow();
     m_test.comparison = 1;
     char value[] = "";
@@ -241,7 +241,7 @@ template <typename Operation> std::ptrdiff_t slotOf(Operation operation) {
     std::memcpy(&slot, &operation, sizeof slot);
     return slot;
 }
-TEST_F(LogEntriesTable, AddDataTakesTheSlotBehindTheFrameworksOperations) {
+TEST_F(LogEntriesTable, AddDataHasTheSlotAfterTheFrameworksOperations) {
     EXPECT_EQ(slotOf(&zrm_rmlogent_base::AddData) - slotOf(&ctreq::CommandCompleted),
               static_cast<std::ptrdiff_t>(sizeof(void*)));
 }

@@ -111,7 +111,7 @@ TEST_F(MonitoredLogs, EveryColumnIsDescribed) {
     }
 }
 
-TEST_F(MonitoredLogs, IndexBehindTheLastColumnIsNoErrorAndFillsNothing) {
+TEST_F(MonitoredLogs, TheIndexAfterTheLastColumnIsNotAnErrorAndFillsNothing) {
     open();
     const char* const name = "untouched";
     for (const auto& [index, status] : {std::pair(17, 0U), {18, 0x21060007U}, {-1, 0x21060007U}}) {
@@ -229,7 +229,7 @@ TEST_F(MonitoredLogsRegistrationDeathTest, MissingMemoryLeavesTheTableUnregister
     EXPECT_EXIT(std::_Exit(reportsMissingMemory() ? 7 : 1), testing::ExitedWithCode(7), "");
 }
 
-TEST_F(MonitoredLogs, RequestsTellTheLogManagerThatTheServerIsUp) {
+TEST_F(MonitoredLogs, RequestsNotifyTheLogManagerThatTheServerIsUp) {
     open();
     EXPECT_NE(dynamic_cast<zrm_rmmonlog_agent*>(m_request.get()), nullptr);
     EXPECT_THAT(m_logs.calls, ElementsAre("server up"));
@@ -241,7 +241,7 @@ TEST_F(MonitoredLogs, RequestsTellTheLogManagerThatTheServerIsUp) {
     EXPECT_THAT(m_logs.calls, ElementsAre("server up"));
 }
 
-TEST_F(MonitoredLogs, GivesNoRequestWithoutMemory) {
+TEST_F(MonitoredLogs, CreatesNoRequestWithoutMemory) {
     const Fault fault("new", ENOMEM);
     EXPECT_EQ(m_manager.CreateCtreq(&m_test, nullptr), nullptr);
 }
@@ -263,10 +263,10 @@ TEST_F(MonitoredLogs, WithoutLogsThereAreNoRows) {
     EXPECT_EQ(fault.calls(), 1) << "nothing is allocated";
     EXPECT_THAT(m_logs.calls, ElementsAre("server up", "begin", "end"));
     EXPECT_EQ(m_request->count, 0U);
-    EXPECT_THAT(sample(TRC1_ERROR), IsEmpty()) << "of the detail class";
+    EXPECT_THAT(sample(TRC1_ERROR), IsEmpty()) << "it is of the detail class";
 }
 
-TEST_F(MonitoredLogs, EachLogGivesOneRow) {
+TEST_F(MonitoredLogs, EachLogHasOneRow) {
     for (const char* const name : {"/a/1", "/a/2", "/a/3", "/a/4", "/a/5", "/a/6"}) {
         m_logs.add(name);
     }
@@ -278,7 +278,7 @@ TEST_F(MonitoredLogs, EachLogGivesOneRow) {
     EXPECT_THAT(m_logs.calls, ElementsAre("server up", "begin", "next 0", "next 1", "next 2",
                                           "next 3", "next 4", "next 5", "next 6", "end"));
     sample(0);
-    EXPECT_EQ(m_request->count, 6U) << "each sample starts afresh";
+    EXPECT_EQ(m_request->count, 6U) << "each sample starts over";
 }
 
 TEST_F(MonitoredLogs, RowsAreFiltered) {
@@ -301,7 +301,7 @@ TEST_F(MonitoredLogs, MoreLogsThanCountedEndTheSample) {
     EXPECT_EQ(m_logs.calls.back(), "end");
 }
 
-TEST_F(MonitoredLogs, FewerLogsThanCountedGiveTheirRows) {
+TEST_F(MonitoredLogs, FewerLogsThanCountedStillHaveTheirRows) {
     m_logs.add("/a/1");
     m_logs.missing = -3;
     sample(0);
@@ -352,7 +352,7 @@ TEST_F(MonitoredLogs, RowShowsTheLogsState) {
     EXPECT_EQ(shown.rowno, 0);
 }
 
-TEST_F(MonitoredLogs, LocalAndUTF8NamesAreShownApart) {
+TEST_F(MonitoredLogs, LocalAndUTF8NamesAreShownSeparately) {
     TestLog& log = m_logs.add("/tmp/x");
     log.setLocalName("/\xFC/gr\xFC\xDF"
                      "e");
@@ -389,7 +389,7 @@ TEST_F(MonitoredLogs, ANameOfTwoHundredBytesFillsItsColumnWithoutATerminator) {
     m_logs.add(m_directory.write(name, ""));
     EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
     EXPECT_EQ(text(row(0).logname), std::string(128, 'n'));
-    EXPECT_EQ(row(0).logtype[0], 'S') << "the next column begins right behind";
+    EXPECT_EQ(row(0).logtype[0], 'S') << "the next column follows directly";
     EXPECT_EQ(text(row(0).ulogname), padded(name, 384));
 }
 

@@ -46,7 +46,7 @@ protected:
         m_test.text("ENTRYTIME", greaterOrEqual, startStamp)
             .text("ENTRYTIME", lessOrEqual, endStamp);
     }
-    /// A report over the whole log.
+    /// A report on the whole log.
     void nameAndWindow() {
         name("/var/adm/", "messages");
         window();
@@ -85,7 +85,7 @@ protected:
 
 // The hold on the chain of logs.
 
-TEST_F(Report, HoldsTheChainOfLogsFromItsBirthToItsEnd) {
+TEST_F(Report, HoldsTheChainOfLogsFromConstructionToDestruction) {
     m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
     EXPECT_THAT(m_logs.calls, ElementsAre("begin"));
     m_request.reset();
@@ -100,7 +100,7 @@ TEST_F(Report, WithoutALogManagerReturnsNothing) {
     EXPECT_THAT(m_logs.calls, IsEmpty());
 }
 
-TEST_F(Report, BirthAndEndAreNotTraced) {
+TEST_F(Report, ConstructionAndDestructionAreNotTraced) {
     RecordingTrace trace(TRC1_DETAIL | TRC1_ERROR);
     m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
     m_request.reset();
@@ -214,7 +214,7 @@ TEST_F(Report, NeedsBothTimes) {
     EXPECT_THAT(sample(TRC1_ERROR), ElementsAre(noWindow));
     EXPECT_EQ(m_request->count, 0U);
     EXPECT_EQ(m_log.starts, 0);
-    // The batch that was left behind is replaced.
+    // The batch left from the previous sample is replaced.
     m_log.entries = 3;
     m_test.text("ENTRYTIME", lessOrEqual, endStamp);
     EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
@@ -227,7 +227,7 @@ TEST_F(Report, NeedsAnEndWithAStart) {
     EXPECT_THAT(sample(TRC1_ERROR), ElementsAre(noWindow));
 }
 
-TEST_F(Report, ABlankTimeIsNone) {
+TEST_F(Report, ABlankTimeCountsAsMissing) {
     name("/var/adm/", "messages");
     m_test.text("ENTRYTIME", lessOrEqual, endStamp)
         .text("ENTRYTIME", greaterOrEqual, std::string(16, ' '));
@@ -303,14 +303,14 @@ TEST_F(Report, ReturnsTheLogsEntries) {
     EXPECT_EQ(m_log.ends, 1);
 }
 
-TEST_F(Report, PassesItsRowsToTheFilterAsNoEvent) {
+TEST_F(Report, PassesItsRowsToTheFilterButNotAsEvents) {
     nameAndWindow();
     m_log.entries = 2;
     EXPECT_THAT(sample(TRC1_FINE),
                 ElementsAre("Passing row 0 to InsertRow().", "Passing row 1 to InsertRow()."));
 }
 
-TEST_F(Report, AnEmptyLogGivesNoRows) {
+TEST_F(Report, AnEmptyLogReturnsNoRows) {
     nameAndWindow();
     EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
     EXPECT_EQ(m_request->count, 0U);
@@ -343,7 +343,7 @@ TEST_F(Report, EndsAtTheRowLimit) {
     EXPECT_EQ(m_log.ends, 1);
 }
 
-TEST_F(Report, SaysHowFarItReachedAndWhyItEnded) {
+TEST_F(Report, ReportsHowFarItReachedAndWhyItEnded) {
     nameAndWindow();
     m_log.entries = 30;
     {
@@ -395,7 +395,7 @@ TEST_F(Report, TheLimitCountsEntriesReadNotRowsReturned) {
     EXPECT_EQ(m_log.asked, 25);
 }
 
-TEST_F(Report, ALogThatCannotStartGivesNoRows) {
+TEST_F(Report, ALogThatCannotStartReturnsNoRows) {
     nameAndWindow();
     m_log.entries = 7;
     m_log.canReport = false;
@@ -405,7 +405,7 @@ TEST_F(Report, ALogThatCannotStartGivesNoRows) {
     EXPECT_EQ(m_log.ends, 0);
 }
 
-TEST_F(Report, WithoutMemoryGivesNoRows) {
+TEST_F(Report, WithoutMemoryReturnsNoRows) {
     nameAndWindow();
     m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
     const Fault fault("new", ENOMEM, {.times = 2});

@@ -70,7 +70,7 @@ protected:
         m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
         m_manager.requests().Add(m_request.get());
     }
-    /// Lets one event arrive; returns the messages and appends accepted rows to dispatched.
+    /// Delivers one event and returns the messages. Accepted rows are appended to `dispatched`.
     std::vector<std::string> arrive(zrm_rmlogent_data_t row, unsigned traceClass = TRC1_DETAIL) {
         RecordingTrace trace(traceClass);
         m_manager.AddDataToEvent(&row, 1);
@@ -92,7 +92,7 @@ protected:
     std::unique_ptr<ctreq> m_request;
 };
 
-TEST_F(Situation, BirthAndEndAreTracedWithTheTime) {
+TEST_F(Situation, ConstructionAndDestructionAreTracedWithTheTime) {
     RecordingTrace trace(TRC1_DETAIL);
     open();
     EXPECT_THAT(trace.messages(),
@@ -150,14 +150,14 @@ TEST_F(Situation, AtLeastTwoDiscardsTheFirstAndAcceptsTheSecond) {
     m_clock.set(now + 31);
     arrive(rowAt(now + 31));
     EXPECT_THAT(frequencies(), ElementsAre(2, 3)) << "the observed frequency, not the threshold";
-    // Both earlier ones leave the period.
+    // Both earlier events are now outside the period.
     m_clock.set(now + 95);
     EXPECT_THAT(arrive(rowAt(now + 95)),
                 ElementsAre("Event frequency of 1 is < the thresholdof 2 for situation alpha. "
                             "Event discarded."));
 }
 
-TEST_F(Situation, AtMostTwoAcceptsUntilTheyBecomeMore) {
+TEST_F(Situation, AtMostTwoAcceptsUntilThereAreMore) {
     open(4, 2, 60);
     EXPECT_THAT(arrive(rowAt(now)),
                 ElementsAre("Event frequency of 1 is <= the threshold of 2 for situation alpha. "
@@ -215,12 +215,12 @@ TEST_F(Situation, AnEventOutsideThePeriodDropsTheChain) {
     arrive(rowAt(now));
     arrive(rowAt(now));
     EXPECT_THAT(frequencies(), ElementsAre(1, 2));
-    // An entry that is older than the period, as a log that is read late holds.
+    // An entry older than the period, as when a log is read late.
     EXPECT_THAT(arrive(rowAt(now - 61), TRC1_DETAIL | TRC1_ERROR), IsEmpty());
     EXPECT_THAT(frequencies(), ElementsAre(1, 2));
     arrive(rowAt(now));
-    EXPECT_THAT(frequencies(), ElementsAre(1, 2, 1)) << "the count starts afresh";
-    // Nor is the dropped event there when the clock is set back.
+    EXPECT_THAT(frequencies(), ElementsAre(1, 2, 1)) << "the count starts over";
+    // Setting the clock back does not restore the dropped event.
     arrive(rowAt(now - 61));
     m_clock.set(now - 61);
     arrive(rowAt(now - 61));
@@ -264,7 +264,7 @@ public:
     Model(bool atMost, long bound, long period)
         : m_atMost(atMost), m_bound(bound), m_period(period) {}
 
-    /// The frequency that an accepted event carries; 0 when it is discarded.
+    /// The frequency of an accepted event, or 0 if it is discarded.
     long arrive(long time, long clock) {
         m_times.insert(m_times.begin(), time);
         const long cutOff = std::max(clock - m_period, 0L);
@@ -272,7 +272,7 @@ public:
         while (count < m_times.size() && m_times[count] > cutOff) {
             ++count;
         }
-        m_times.resize(count); // a head out of the period leaves nothing to keep
+        m_times.resize(count); // nothing is kept once the head is outside the period
         const auto frequency = static_cast<long>(count);
         return frequency != 0 && (m_atMost ? frequency <= m_bound : frequency >= m_bound)
                    ? frequency
@@ -308,7 +308,7 @@ TEST_F(Situation, BehavesLikeAPlainModelOfRandomEvents) {
         for (int event = 0; event < 100; ++event) {
             clock += pick(0, 3) == 0 ? pick(0, period) % 200 : pick(0, 3);
             m_clock.set(clock);
-            // Mostly now; at times late, out of order or ahead of the clock.
+            // Mostly the current time; sometimes late, out of order or ahead of the clock.
             const long time = pick(0, 4) != 0 ? clock : clock - pick(-10, period % 200 + 10);
             zrm_rmlogent_data_t row = rowAt(time, event);
             if (pick(0, 19) == 0) {

@@ -36,7 +36,7 @@ template <typename Integer> std::string bytesOf(Integer value) {
 
 class SituationThresholds : public testing::Test {
 protected:
-    /// Opens the situation and returns the messages that this wrote.
+    /// Opens the situation and returns the messages traced.
     std::vector<std::string> open(unsigned traceClass) {
         m_trace.clear();
         m_trace.setLevel(traceClass);
@@ -54,7 +54,7 @@ protected:
         return {row.freqthresh, row.periodthrs};
     }
 
-    /// How many of one row the situation collects: a row that meets its other conditions.
+    /// How many rows the situation collects when offered one that meets its other conditions.
     unsigned passed() {
         zrm_rmlogent_data_t row;
         std::memset(&row, ' ', sizeof row);
@@ -85,7 +85,7 @@ TEST_F(SituationThresholds, NoneMeansZeroColumns) {
     EXPECT_EQ(columns(), std::pair(0, 0));
 }
 
-TEST_F(SituationThresholds, EachOperatorGivesItsInclusiveBound) {
+TEST_F(SituationThresholds, EachOperatorBecomesAnInclusiveBound) {
     using Messages = std::vector<std::string>;
     const auto three = bytesOf<std::int64_t>(3);
     EXPECT_EQ(frequency(greaterOrEqual, three),
@@ -96,7 +96,7 @@ TEST_F(SituationThresholds, EachOperatorGivesItsInclusiveBound) {
     EXPECT_EQ(frequency(less, three), std::pair(Messages{"Frequency threshold is <= 2."}, 2));
 }
 
-TEST_F(SituationThresholds, ABoundBelowOneIsNoThreshold) {
+TEST_F(SituationThresholds, ABoundBelowOneIsNotAThreshold) {
     using Messages = std::vector<std::string>;
     const std::pair none(Messages{}, 0);
     EXPECT_EQ(frequency(less, bytesOf<std::int64_t>(1)), none);
@@ -115,7 +115,7 @@ TEST_F(SituationThresholds, BoundsWrapAroundAtTheTypesEnds) {
 }
 
 TEST_F(SituationThresholds, ValuesAreReadByTheirLength) {
-    // The bytes behind the value's own tell 8-byte reading from shorter ones.
+    // The bytes after the value distinguish a read of 8 bytes from shorter ones.
     const auto value = bytesOf<std::int64_t>(0x0000000100020003);
     for (const int length : {0, 1, 3, 5, 6, 7, 8}) {
         const auto [messages, column] = frequency(greaterOrEqual, value, length);
@@ -173,7 +173,7 @@ TEST_F(SituationThresholds, FrequencyOfAnImpossibleLengthIsIgnored) {
     }
 }
 
-TEST_F(SituationThresholds, PeriodIsCheckedLikewise) {
+TEST_F(SituationThresholds, ThePeriodIsCheckedInTheSameWay) {
     m_test.number("FREQTHRESH", greaterOrEqual, 3)
         .raw("PERIODTHRS", equal, 500, "60")
         .number("PERIODTHRS", greaterOrEqual, 60)
@@ -213,7 +213,7 @@ TEST_F(SituationThresholds, TheFirstUsableOneHolds) {
     m_test.number("FREQTHRESH", equal, 9)
         .number("FREQTHRESH", greaterOrEqual, 0)
         .number("FREQTHRESH", greaterOrEqual, 2)
-        .raw("FREQTHRESH", equal, 1, "") // not even looked at
+        .raw("FREQTHRESH", equal, 1, "") // not read
         .number("FREQTHRESH", greaterOrEqual, 5)
         .number("PERIODTHRS", equal, 60);
     EXPECT_THAT(open(TRC1_ERROR), ElementsAre("Invalid FREQTHRESH threshold compare operator; "
@@ -222,7 +222,7 @@ TEST_F(SituationThresholds, TheFirstUsableOneHolds) {
     m_test.filters.clear();
     m_test.number("PERIODTHRS", equal, 60)
         .number("PERIODTHRS", equal, 90)
-        .raw("PERIODTHRS", less, 1, "") // nor is this
+        .raw("PERIODTHRS", less, 1, "") // not read either
         .number("FREQTHRESH", greaterOrEqual, 2);
     EXPECT_THAT(open(TRC1_ERROR), IsEmpty());
     EXPECT_EQ(columns(), std::pair(2, 60));

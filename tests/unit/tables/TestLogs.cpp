@@ -51,7 +51,7 @@ void LogManager::setServerUp() {
 LogFile* LogManager::getNextLogObject(LogFile* current, unsigned index) {
     theLogs->calls.push_back("next " + std::to_string(index));
     const auto& logs = theLogs->logs;
-    // The walk names the log given last and the number given, which agree.
+    // The caller passes the last log returned and the number returned; both must agree.
     if (index == 0 ? current != nullptr : current != logs.at(index - 1).get()) {
         theLogs->calls.emplace_back("wrong walk");
     }

@@ -12,7 +12,7 @@
 
 using namespace zrm;
 
-/// A monitored log without a thread, whose every property and report entry a test states.
+/// A monitored log without a thread. A test sets its properties and the entries of its reports.
 class TestLog : public LogFile {
 public:
     /// `name` is both the local and the UTF-8 name.
@@ -32,22 +32,22 @@ public:
     long formatEntryAsRow(char*, void*, void*) override { return -1; }
     void processLogData() override {}
 
-    // A report's entries, and what was asked for.
-    int entries = 0;         ///< the log's number of entries; each row's ROWNO counts them
-    bool canReport = true;   ///< else startReportRequest gives null
-    int asked = 0;           ///< calls of getNextLogEntry
-    int starts = 0;          ///< calls of startReportRequest
-    int ends = 0;            ///< calls of endReportRequest
-    _RequestThresholds seen; ///< as startReportRequest was given them
-    std::vector<std::ptrdiff_t> places; ///< bytes from the first row asked for to each further one
+    // The entries of a report, and the calls received.
+    int entries = 0;                    ///< number of entries; the rows' ROWNO counts them
+    bool canReport = true;              ///< false: startReportRequest returns null
+    int asked = 0;                      ///< calls of getNextLogEntry
+    int starts = 0;                     ///< calls of startReportRequest
+    int ends = 0;                       ///< calls of endReportRequest
+    _RequestThresholds seen;            ///< those passed to startReportRequest
+    std::vector<std::ptrdiff_t> places; ///< offsets of the requested rows from the first one
 
 private:
     int m_given = 0;
     char* m_firstRow = nullptr;
 };
 
-/// Stands in for the log manager while it lives: publishes one whose logs a test states, and
-/// records what the tables ask of it.
+/// Replaces the log manager while it lives: publishes one with the logs of a test and records the
+/// calls of the tables.
 class TestLogs {
 public:
     TestLogs();
@@ -56,11 +56,11 @@ public:
     TestLogs& operator=(const TestLogs&) = delete;
 
     TestLog& add(const std::string& name);
-    /// Takes the log manager away, as before start-up created it.
+    /// Removes the log manager, as if start-up had not created it yet.
     void withdraw();
 
     std::vector<std::unique_ptr<TestLog>> logs;
-    int missing = 0; ///< logs that the manager's own count leaves out
+    int missing = 0; ///< logs missing from the manager's count
     std::vector<std::string> calls;
 
 private:

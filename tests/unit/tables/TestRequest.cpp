@@ -46,7 +46,7 @@ TestRequest::TestRequest(SampleType type, std::string requestName) {
 
 TestRequest& TestRequest::raw(const std::string& column, int op, int dataType,
                               const std::string& bytes, int length) {
-    // A value is followed by bytes that are readable and none of its own.
+    // Readable bytes that are not part of the value follow it.
     Filter& filter = filters.emplace_back(Filter{column, bytes + std::string(16, ' '), {}});
     if (length == -32768) {
         length = static_cast<int>(bytes.size());
@@ -69,7 +69,7 @@ TestRequest& TestRequest::text(const std::string& column, int op, const std::str
 
 class ctreq::Framework {
 public:
-    // A walk over the conditions that nobody reset finds none.
+    // Until it is reset, a walk over the conditions finds none.
     explicit Framework(RequestDetail* detail)
         : test(*static_cast<TestRequest*>(detail)), nextFilter(test.filters.size()) {}
     TestRequest& test;

@@ -2,7 +2,7 @@
 #define ZRM_TESTS_TEST_REQUEST_H
 
 #include "framework/ctreq.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 
 #include <cstdint>
 #include <deque>
@@ -12,11 +12,11 @@
 
 using namespace zrm::host;
 
-// A double of the framework's request class. It honours the contract, lets a test state each
-// condition byte by byte and each status, and records what the agent asks of it. It takes the
-// place of the host's requests at link time.
+// A double of the framework's request class. It honours the contract, lets a test set every
+// condition byte by byte and every status, and records the agent's calls. It replaces the host's
+// requests at link time.
 
-/// What a test states about one request, and what it learns about it. Outlives the request.
+/// What a test sets for one request, and what is recorded about it. Outlives the request.
 class TestRequest : public RequestDetail {
 public:
     explicit TestRequest(SampleType type, std::string requestName = "alpha");
@@ -42,15 +42,15 @@ public:
     unsigned dispatchStatus = 0;
     int comparison = 0; ///< result of both IsException operations
 
-    // What was asked.
+    // What was recorded.
     std::vector<std::string> calls;      ///< in order; TestCalls holds those of all requests
     std::vector<std::string> dispatched; ///< the rows of all dispatches
     std::vector<unsigned> stopped;       ///< reasons
     int stops = 0;
-    int fetched = 0; ///< conditions that were handed out
+    int fetched = 0; ///< conditions that were fetched
 };
 
-/// What concerns all requests.
+/// What is common to all requests.
 class TestCalls {
 public:
     /// The calls to all requests, in order, as "NAME CALL".

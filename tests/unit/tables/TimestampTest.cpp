@@ -71,7 +71,7 @@ TEST_F(TimestampChain, OlderEventsArePruned) {
     EXPECT_THAT(times(), ElementsAre(now, now - 5));
 }
 
-TEST_F(TimestampChain, AnEventAtTheCutOffIsNotCountedAndPruned) {
+TEST_F(TimestampChain, AnEventAtTheCutOffIsPrunedAndNotCounted) {
     add(now - 10);
     add(now - 9);
     EXPECT_EQ(m_head->countEvents(10), 1);
@@ -89,7 +89,7 @@ TEST_F(TimestampChain, AnOldHeadIsNotCountedButKeptAlone) {
 }
 
 TEST_F(TimestampChain, TheWalkStopsAtTheFirstElementThatIsOut) {
-    // Late entries: the chain is in order of arrival, not of time.
+    // Late entries: the chain is ordered by arrival, not by time.
     for (const long time : {now - 1, now - 50, now - 2}) {
         add(time);
     }
@@ -166,7 +166,7 @@ TEST_F(TimestampChain, CountingAgreesWithAPlainModel) {
 }
 
 TEST_F(TimestampChain, CountingABusyPeriodDoesNotWalkOverIt) {
-    constexpr long events = 200000; // a walk over them at each event would take minutes
+    constexpr long events = 200000; // walking over them at each event would take minutes
     for (long number = 1; number <= events; ++number) {
         add(now - 5);
         ASSERT_EQ(m_head->countEvents(10), number);

@@ -51,7 +51,7 @@ protected:
     bool isCancelled = false;
 };
 
-TEST_F(BacktestTest, SaysWhenItWouldHaveBeenRaised) {
+TEST_F(BacktestTest, ReportsWhenItWouldHaveBeenRaised) {
     first.entries = {{-1, "hit"}, {0, "hit"},    {10, "miss"},
                      {20, "hit"}, {1000, "hit"}, {1001, "hit"}};
     const Backtest::Result result = run({"ENTRYDESC = 'hit'"});
@@ -68,7 +68,7 @@ TEST_F(BacktestTest, SaysWhenItWouldHaveBeenRaised) {
     EXPECT_EQ(first.ends, 1);
 }
 
-TEST_F(BacktestTest, TakesTheEntriesOfAllLogsInTheOrderOfTheirTimes) {
+TEST_F(BacktestTest, JudgesTheEntriesOfAllLogsInTheOrderOfTheirTimes) {
     first.entries = {{0, "a"}, {100, "a"}, {200, "a"}};
     second.entries = {{30, "b"}, {150, "b"}, {140, "late"}, {500, "b"}};
     const Backtest::Result result = run({}, ">= 2");
@@ -77,7 +77,7 @@ TEST_F(BacktestTest, TakesTheEntriesOfAllLogsInTheOrderOfTheirTimes) {
     EXPECT_EQ(result.entries, 7u);
 }
 
-TEST_F(BacktestTest, SaysWhyItWouldNotHaveBeenRaised) {
+TEST_F(BacktestTest, ReportsWhyItWouldNotHaveBeenRaised) {
     EXPECT_EQ(run({}).decision,
               "Would not have been raised: there are no entries between these times.");
     first.entries = {{0, "x"}};
@@ -90,7 +90,7 @@ TEST_F(BacktestTest, SaysWhyItWouldNotHaveBeenRaised) {
                                        "condition, but never >= 2 in 60 s.");
 }
 
-TEST_F(BacktestTest, NamesTheFirstTimesAlone) {
+TEST_F(BacktestTest, NamesOnlyTheFirstTimes) {
     for (int n = 0; n < 1001; ++n) {
         first.entries.emplace_back(n, "x");
     }
@@ -113,7 +113,7 @@ TEST_F(BacktestTest, EndsEarlyWhenItIsCancelledAndSaysSo) {
                                   directory.file("first.log") + ": the backtest was cancelled."));
 }
 
-TEST_F(BacktestTest, SaysHowFarItReached) {
+TEST_F(BacktestTest, ReportsHowFarItReached) {
     first.entries = {{0, "x"}, {100, "x"}};
     second.entries = {{50, "x"}};
     Backtest::Result result = run({});
@@ -128,7 +128,7 @@ TEST_F(BacktestTest, SaysHowFarItReached) {
                                                    result.reach.reason + "."));
 }
 
-TEST_F(BacktestTest, SaysWhyAReportEndedEarly) {
+TEST_F(BacktestTest, ReportsWhyTheReadingEndedEarly) {
     first.entries = {{0, "x"}, {100, "x"}};
     second.entries = {{50, "x"}};
     first.endsWith = ReportEnd::formatErrors;
@@ -138,7 +138,7 @@ TEST_F(BacktestTest, SaysWhyAReportEndedEarly) {
     EXPECT_EQ(result.reach.reached, stampAt(50)) << "from there on both were read";
 }
 
-TEST_F(BacktestTest, EndsEarlyAlsoBeforeTheFirstEntryBetweenTheTimes) {
+TEST_F(BacktestTest, EndsEarlyEvenBeforeTheFirstEntryOfTheWindow) {
     for (int n = 0; n < 3000; ++n) {
         first.entries.emplace_back(2000 + n, "x"); // all of them behind the last time
     }
@@ -159,7 +159,7 @@ TEST_F(BacktestTest, LetsTheErrorLogsCommandFindTheLastTime) {
     EXPECT_EQ(errors.window().endTime, to);
 }
 
-TEST_F(BacktestTest, WaitsForNoPipeInTheLogsPlace) {
+TEST_F(BacktestTest, DoesNotWaitForAPipeInTheLogsPlace) {
     TestLog piped(directory.write("pipe", ""));
     ASSERT_EQ(unlink(directory.file("pipe").c_str()), 0);
     ASSERT_EQ(mkfifo(directory.file("pipe").c_str(), 0600), 0);
@@ -169,7 +169,7 @@ TEST_F(BacktestTest, WaitsForNoPipeInTheLogsPlace) {
     EXPECT_EQ(piped.reports, 0);
 }
 
-TEST_F(BacktestTest, ALogThatCannotBeReadHasNothing) {
+TEST_F(BacktestTest, AnUnreadableLogHasNoEntries) {
     first.canReport = false;
     second.entries = {{5, "x"}};
     const Backtest::Result result = run({});

@@ -46,7 +46,7 @@ TEST_F(ConditionVerdictTest, WritesConditionsAsTheyAreRead) {
     }
 }
 
-TEST_F(ConditionVerdictTest, TellsTheValueAndWhyTheConditionDoesNotHold) {
+TEST_F(ConditionVerdictTest, ReportsTheValueAndWhyTheConditionDoesNotHold) {
     struct Case {
         const char* condition;
         const char* description;

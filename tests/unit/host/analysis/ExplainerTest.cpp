@@ -80,7 +80,7 @@ TEST_F(ExplainerTest, ReadsTheLogsLines) {
     EXPECT_EQ(problem, "the log cannot be read: No such file or directory");
 }
 
-TEST_F(ExplainerTest, SaysHowFarBackItRead) {
+TEST_F(ExplainerTest, ReportsHowFarBackItRead) {
     write("nonsense\n1 a\n2 b\n");
     Explainer whole = explainer();
     whole.last(log, 1);
@@ -98,7 +98,7 @@ TEST_F(ExplainerTest, SaysHowFarBackItRead) {
     EXPECT_EQ(gone.reach().reached, "");
 }
 
-TEST_F(ExplainerTest, SaysHowFarBackItReadALogWithoutLines) {
+TEST_F(ExplainerTest, ReportsHowFarBackItReadALogWithoutLines) {
     TestLog logins(directory.write("wtmp", ""), " ;N ;A");
     logins.entries = {{1, "a"}, {2, "b"}};
     Explainer whole = explainer();
@@ -113,7 +113,7 @@ TEST_F(ExplainerTest, SaysHowFarBackItReadALogWithoutLines) {
     EXPECT_EQ(whole.reach().reason, "the log cannot be read");
 }
 
-TEST_F(ExplainerTest, WaitsForNoPipeInTheLogsPlace) {
+TEST_F(ExplainerTest, DoesNotWaitForAPipeInTheLogsPlace) {
     TestLog binary(directory.file("app.log"), " ;N ;A");
     binary.entries = {{0, "hit"}};
     std::filesystem::remove(directory.file("app.log"));
@@ -124,7 +124,7 @@ TEST_F(ExplainerTest, WaitsForNoPipeInTheLogsPlace) {
     EXPECT_EQ(binary.reports, 0);
 }
 
-TEST_F(ExplainerTest, EndsWithALogThatGrowsAllTheTime) {
+TEST_F(ExplainerTest, EndsAlthoughTheLogKeepsGrowing) {
     write("1 a\n");
     std::ofstream more(directory.file("app.log"), std::ios::app);
     const std::string line = "1 " + std::string(2000, 'x') + "\n";
@@ -173,7 +173,7 @@ TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
     EXPECT_FALSE(two[1].window->count);
 }
 
-TEST_F(ExplainerTest, ExplainsALineWhereTheLogHoldsItOrAsTheNext) {
+TEST_F(ExplainerTest, ExplainsALineInTheLogOrAsTheNextOne) {
     write("0 hit\n10 hit\n20 hit\n30 hit\n");
     EXPECT_THAT(counts(explainer(">= 9").line(log, "20 hit")), ElementsAre(3)) << "held";
     EXPECT_THAT(counts(explainer(">= 9").line(log, "65 hit")), ElementsAre(4)) << "next";
@@ -185,7 +185,7 @@ TEST_F(ExplainerTest, ExplainsALineWhereTheLogHoldsItOrAsTheNext) {
     EXPECT_NE(nonsense[0].reason, "");
 }
 
-TEST_F(ExplainerTest, TellsThatTheSituationDoesNotRun) {
+TEST_F(ExplainerTest, ReportsThatTheSituationDoesNotRun) {
     write("0 hit\n1 miss\n");
     const std::vector<Explanation> all = explainer(nullptr, true).last(log, 2);
     EXPECT_EQ(all[0].decision,
@@ -207,7 +207,7 @@ TEST_F(ExplainerTest, FindsTheEntryOfAnEventInItsLog) {
     EXPECT_EQ(explainer(">= 2").event(&log, event).window->count, 3);
 }
 
-TEST_F(ExplainerTest, ExplainsAnEventWhoseLogHoldsItNoMore) {
+TEST_F(ExplainerTest, ExplainsAnEventThatItsLogNoLongerHolds) {
     Explainer::EventEntry event{7, true, rowAt(10, "hit")};
     event.row.freqthresh = 5;
     Explanation own = explainer(">= 5").event(&log, event);
@@ -227,7 +227,7 @@ TEST_F(ExplainerTest, ExplainsAnEventWhoseLogHoldsItNoMore) {
               "Would not be raised: ENTRYDESC 'miss' does not start with 'hit'.");
 }
 
-TEST_F(ExplainerTest, TakesTheEntriesOfOtherLogsFromTheirReports) {
+TEST_F(ExplainerTest, ReadsTheEntriesOfOtherLogsThroughReports) {
     TestLog binary(directory.write("wtmp", ""), " ;N ;A");
     EXPECT_FALSE(LogTail(binary).hasLines());
     binary.entries = {{0, "hit"}, {5, "miss"}, {10, "hit"}};
@@ -239,7 +239,7 @@ TEST_F(ExplainerTest, TakesTheEntriesOfOtherLogsFromTheirReports) {
     EXPECT_EQ(binary.ends, 1);
 }
 
-TEST_F(ExplainerTest, ReadsRowsOfEventsBack) {
+TEST_F(ExplainerTest, RebuildsRowsFromEvents) {
     Explainer asked = explainer();
     zrm_rmlogent_data_t row = rowAt(10, "it's \"hit\" \\ <b>");
     row.freqthresh = 5;

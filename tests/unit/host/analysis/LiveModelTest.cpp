@@ -8,8 +8,7 @@
 #include "host/config/ConditionParser.h"
 #include "host/config/SituationValidator.h"
 #include "host/events/EventQueue.h"
-#include "host/framework/ContextInfo.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 #include "host/situations/SituationSet.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
@@ -247,7 +246,7 @@ protected:
     EventQueue::Reader reader = queue.addReader();
 };
 
-TEST_F(LiveModel, AReplaySaysWhatMonitoringDoes) {
+TEST_F(LiveModel, AReplayAgreesWithMonitoring) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

@@ -76,13 +76,13 @@ TEST_F(ReplayTest, CountsInThePeriodThatEndsWithTheEntry) {
                 ElementsAre(-1, -2, 3, 4, 3, 4, -1, -2));
 }
 
-TEST_F(ReplayTest, KnowsUpperBoundsToo) {
+TEST_F(ReplayTest, SupportsUpperBounds) {
     Replay replay(situation({}, "< 3", "1m"), entries);
     EXPECT_EQ(replay.frequency(), -2);
     EXPECT_THAT(judged(replay, {0, 1, 2, 100}), ElementsAre(1, 2, -3, 1));
 }
 
-TEST_F(ReplayTest, CountsAlikeWhetherRowsOrTimesAreGiven) {
+TEST_F(ReplayTest, CountsRowsAndTimesAlike) {
     Replay rows(situation({}, ">= 2", "10s"), entries);
     Replay times(situation({}, ">= 2", "10s"), entries);
     for (const int at : {0, 5, 9, 20, 21, 31, 32}) {
@@ -94,7 +94,7 @@ TEST_F(ReplayTest, CountsAlikeWhetherRowsOrTimesAreGiven) {
     }
 }
 
-TEST_F(ReplayTest, WhatOnlyMatchesIsNotCounted) {
+TEST_F(ReplayTest, MatchingAloneDoesNotCount) {
     Replay replay(situation({"ENTRYDESC = 'hit'"}, ">= 2", "60s"), entries);
     for (int round = 0; round < 5; ++round) {
         zrm_rmlogent_data_t row = rowAt(round, "hit");
@@ -105,7 +105,7 @@ TEST_F(ReplayTest, WhatOnlyMatchesIsNotCounted) {
     EXPECT_THAT(judged(replay, {10, 11}), ElementsAre(-1, 2));
 }
 
-TEST_F(ReplayTest, IsNoSituationThatIsOfferedEntries) {
+TEST_F(ReplayTest, IsNotOfferedEntriesAsASituation) {
     Replay replay(situation({}), entries);
     zrm_rmlogent_data_t row = rowAt(0, "x");
     EXPECT_EQ(entries.AddDataToEvent(&row, 1), 0u);

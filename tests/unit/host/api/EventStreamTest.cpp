@@ -21,7 +21,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// A client of a stream, which takes everything at once unless it is told not to.
+/// A client of a stream, which by default takes everything at once.
 class Client {
 public:
     explicit Client(const HttpAnswer& answer, bool takesAll = true)
@@ -29,7 +29,7 @@ public:
         answer.stream.begin(m_channel);
     }
     ~Client() { leave(); }
-    /// Waits for the text that came so far to end with this one.
+    /// Waits until the text received so far ends with this one.
     bool gets(const std::string& end) {
         return m_channel->waitFor([&] { return m_channel->text.ends_with(end); });
     }
@@ -121,7 +121,7 @@ protected:
     TestRouter router{stream};
 };
 
-TEST_F(EventStreamTest, GivesWhatIsNewFromNowOn) {
+TEST_F(EventStreamTest, SendsOnlyNewEvents) {
     history.add(1);
     const HttpAnswer answer = open();
     EXPECT_EQ(answer.status, 200);
@@ -135,7 +135,7 @@ TEST_F(EventStreamTest, GivesWhatIsNewFromNowOn) {
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(3));
 }
 
-TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
+TEST_F(EventStreamTest, ContinuesAfterTheClientsLastEvent) {
     for (std::uint64_t id = 1; id <= 500; ++id) {
         history.add(id);
     }
@@ -148,14 +148,14 @@ TEST_F(EventStreamTest, GoesOnAfterTheLastEventOfTheClient) {
         EXPECT_TRUE(client.gets(message(500)));
         EXPECT_EQ(client.text(), expected);
     }
-    // Ids beyond the newest belong to a history that is no more.
+    // Ids beyond the newest belong to a history that no longer exists.
     Client beyond(open("?after=100000"));
     EXPECT_TRUE(beyond.gets("retry: 2000\n\n"));
     history.add(501);
     EXPECT_TRUE(beyond.gets(message(501)));
 }
 
-TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
+TEST_F(EventStreamTest, SendsOnlyTheRequestedKinds) {
     Client client(open("?situation=a&situation=b"));
     EXPECT_TRUE(client.gets("retry: 2000\n\n"));
     history.add(1, "c");
@@ -166,7 +166,7 @@ TEST_F(EventStreamTest, GivesTheKindsThatAreWanted) {
     EXPECT_EQ(client.text(), "retry: 2000\n\n" + message(2) + message(4));
 }
 
-TEST_F(EventStreamTest, TellsThatItIsAlive) {
+TEST_F(EventStreamTest, SendsKeepAlives) {
     EventStream often(&history, 20ms);
     const TestRouter asked(often);
     Client client(asked.ask("GET", "/api/v1/events/stream"));
@@ -179,14 +179,14 @@ TEST_F(EventStreamTest, EndsWhenTheClientHasGone) {
     EXPECT_EQ(stream.clients(), 1u);
     client.leave();
     EXPECT_TRUE(hasNoClients());
-    // Whoever comes then is served by a new thread.
+    // A later client is served by a new thread.
     Client another(open());
     EXPECT_TRUE(another.gets("retry: 2000\n\n"));
     history.add(1);
     EXPECT_TRUE(another.gets(message(1)));
 }
 
-TEST_F(EventStreamTest, AClientThatIsNotReadyGetsNothingAndHoldsNobodyUp) {
+TEST_F(EventStreamTest, AClientThatIsNotReadyGetsNothingAndDelaysNobody) {
     Client slow(open(), false);
     Client quick(open());
     for (int id = 1; id <= 3; ++id) {
@@ -220,7 +220,7 @@ TEST_F(EventStreamTest, TheEndOfTheResourceEndsEveryStream) {
     EXPECT_TRUE(tooLate.isEnded());
 }
 
-TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {
+TEST_F(EventStreamTest, LimitsTheNumberOfClients) {
     {
         std::vector<HttpAnswer> answers;
         for (std::size_t count = 0; count < EventStream::mostClients; ++count) {
@@ -236,7 +236,7 @@ TEST_F(EventStreamTest, TakesSoManyClientsAtATime) {
     EXPECT_EQ(open().status, 200);
 }
 
-TEST_F(EventStreamTest, RefusesWhatMakesNoSense) {
+TEST_F(EventStreamTest, RefusesInvalidRequests) {
     EXPECT_EQ(open("", "x").body, "Last-Event-ID: the id of an event is a whole number");
     EXPECT_EQ(open("?after=x").body, "after: write a whole number from 0 to 9223372036854775807");
     EXPECT_EQ(open("?limit=5").body.substr(0, 26), "limit: unknown parameter; ");

@@ -28,7 +28,7 @@ protected:
     TestRouter router{resource};
 };
 
-TEST_F(EventsResourceTest, GivesTheNewestFirstAndWhereToGoOn) {
+TEST_F(EventsResourceTest, ReturnsTheNewestFirstAndWhereToContinue) {
     EXPECT_EQ(get("/api/v1/events"),
               R"(200 {"events":[],"next":null,"oldest":0,"newest":0,"damaged":[]})");
     for (std::uint64_t id = 5; id <= 9; ++id) {
@@ -43,7 +43,7 @@ TEST_F(EventsResourceTest, GivesTheNewestFirstAndWhereToGoOn) {
               R"(200 {"events":[{"id":6},{"id":7}],"next":7,"oldest":5,"newest":9,"damaged":[]})");
 }
 
-TEST_F(EventsResourceTest, ASearchThatStoppedSaysWhereToGoOn) {
+TEST_F(EventsResourceTest, ASearchThatStoppedSaysWhereToContinue) {
     history.add(7);
     history.reached = 5;
     history.damaged = {6, 5};
@@ -52,12 +52,12 @@ TEST_F(EventsResourceTest, ASearchThatStoppedSaysWhereToGoOn) {
     history.add(8);
     EXPECT_EQ(get("/api/v1/events?text=x&limit=1"),
               R"(200 {"events":[{"id":8}],"next":8,"oldest":7,"newest":8,"damaged":[6,5]})")
-        << "a page that is full goes on behind its last event";
+        << "a full page continues after its last event";
     EXPECT_EQ(get("/api/v1/events?text=" + std::string(257, 'x')),
               "400 text: write at most 256 bytes");
 }
 
-TEST_F(EventsResourceTest, HandsEveryWishToTheHistory) {
+TEST_F(EventsResourceTest, PassesEveryParameterToTheHistory) {
     get("/api/v1/events?after=3&before=9&from=1970-01-01T00:00:01Z&to=1970-01-01T00:00:02.5Z&"
         "situation=a&situation=b%27%3B--&log=%2Fx&severity=info&severity=critical&text=%22+y&"
         "limit=1000");
@@ -74,7 +74,7 @@ TEST_F(EventsResourceTest, HandsEveryWishToTheHistory) {
     EXPECT_TRUE(filter.newestFirst);
 }
 
-TEST_F(EventsResourceTest, RefusesParametersThatMakeNoSense) {
+TEST_F(EventsResourceTest, RefusesInvalidParameters) {
     EXPECT_EQ(get("/api/v1/events?limit=0"), "400 limit: write a whole number from 1 to 1000");
     EXPECT_EQ(get("/api/v1/events?limit=1001"), "400 limit: write a whole number from 1 to 1000");
     EXPECT_EQ(get("/api/v1/events?after=-1"),
@@ -92,7 +92,7 @@ TEST_F(EventsResourceTest, RefusesParametersThatMakeNoSense) {
     EXPECT_EQ(get(many), "400 log: the parameter appears more than 100 times");
 }
 
-TEST_F(EventsResourceTest, GivesOneEvent) {
+TEST_F(EventsResourceTest, ReturnsOneEvent) {
     history.add(7);
     EXPECT_EQ(get("/api/v1/events/7"), R"(200 {"id":7})");
     EXPECT_EQ(get("/api/v1/events/8"), "404 id: the history does not contain this event");
@@ -102,7 +102,7 @@ TEST_F(EventsResourceTest, GivesOneEvent) {
     }
 }
 
-TEST_F(EventsResourceTest, GivesRates) {
+TEST_F(EventsResourceTest, ReturnsRates) {
     EXPECT_EQ(get("/api/v1/rates?from=1970-01-01T00:00:00Z&to=1970-01-01T00:04:00Z&step=120"),
               R"(200 {"start":"1970-01-01T00:00:00.000Z","step":120,"logs":[)"
               R"({"log":"/a","entries":[1,null],"events":[0,null]},)"
@@ -120,14 +120,14 @@ TEST_F(EventsResourceTest, GivesRates) {
               "400 step: the window has more than 2880 steps");
 }
 
-TEST_F(EventsResourceTest, SaysWhyTheHistoryCannotBeRead) {
+TEST_F(EventsResourceTest, ReportsWhyTheHistoryCannotBeRead) {
     history.fail();
     for (const char* const url : {"/api/v1/events", "/api/v1/events/1", "/api/v1/rates"}) {
         EXPECT_EQ(get(url), "503 : the history cannot be read: disk I/O error") << url;
     }
 }
 
-TEST(EventsResourceOff, SaysSo) {
+TEST(EventsResourceOff, IsReported) {
     const RecordingTrace trace(0);
     EventsResource resource(nullptr);
     const TestRouter router(resource);

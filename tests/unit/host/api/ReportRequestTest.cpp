@@ -1,4 +1,4 @@
-#include "host/api/ReportRequest.h"
+#include "host/api/ReportResource.h"
 
 #include "host/http/RequestRefused.h"
 
@@ -15,8 +15,8 @@ std::string refused(const std::string& body) {
     try {
         ReportRequest::parse(body);
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }
@@ -41,13 +41,13 @@ TEST(ReportRequest, ReadsLogWindowAndConditions) {
     EXPECT_EQ(report.conditions[5].number, 5);
 }
 
-TEST(ReportRequest, GoesUpToTheNewestEntryWithoutAnEnd) {
+TEST(ReportRequest, WithoutAnEndGoesUpToTheNewestEntry) {
     const ReportRequest report = ReportRequest::parse(R"({"log":"/a","from":"2026-11-20"})");
     EXPECT_EQ(report.to, "1991231235959999");
     EXPECT_EQ(report.conditions.size(), 4u);
 }
 
-TEST(ReportRequest, NamesWhatIsWrong) {
+TEST(ReportRequest, ReportsTheWrongField) {
     EXPECT_EQ(refused(""), "log: is missing");
     EXPECT_EQ(refused(R"({"log":"auth.log","from":"2026-11-20"})"),
               "log: 'auth.log' is not the absolute path of a file; write the log's path as in the "

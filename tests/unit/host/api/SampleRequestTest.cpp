@@ -1,21 +1,24 @@
-#include "host/api/SampleRequest.h"
+#include "host/api/SampleResource.h"
+
+#include "host/http/RequestRefused.h"
 
 #include <gtest/gtest.h>
 
 #include <string>
+#include <vector>
 
 using namespace zrm::host;
 
 namespace {
 
 std::string refused(const std::string& body, const char* table = "RMMONLOG") {
-    const auto result = SampleRequest::parse(table, body);
-    const auto* const problem = std::get_if<Problem>(&result);
-    if (problem == nullptr) {
-        return "accepted";
+    try {
+        SampleRequest::parse(table, body);
+    } catch (const RequestRefused& refusal) {
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
-    EXPECT_EQ(problem->status, 400);
-    return problem->field + ": " + problem->detail;
+    return "accepted";
 }
 
 std::string filter(const std::string& inner) {
@@ -23,13 +26,11 @@ std::string filter(const std::string& inner) {
 }
 
 TEST(SampleRequest, ReadsFilters) {
-    const auto result = SampleRequest::parse(
+    const std::vector<Condition> conditions = SampleRequest::parse(
         "RMMONLOG", R"({"filters":[{"column":"LOGNAME","op":"starts","value":"auth"},
                                    {"column":"LOGSIZE","op":">=","value":5},
                                    {"column":"LOGTYPE","op":"in","value":["S","U"]},
                                    {"column":"MONTIME","op":"<","value":"2026-11-20T07:03:09"}]})");
-    ASSERT_TRUE(std::holds_alternative<std::vector<Condition>>(result));
-    const auto& conditions = std::get<std::vector<Condition>>(result);
     ASSERT_EQ(conditions.size(), 4u);
     EXPECT_EQ(conditions[0].op, INTF_STARTS);
     EXPECT_EQ(conditions[0].text, "auth");
@@ -45,7 +46,7 @@ TEST(SampleRequest, NeedsNoFiltersForTheMonitoredLogs) {
     EXPECT_EQ(refused(R"({"filters":null})"), "accepted");
 }
 
-TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
+TEST(SampleRequest, RefusesInvalidBodies) {
     EXPECT_EQ(refused("{"), "body: the body is not JSON");
     EXPECT_EQ(refused("{\"filters\":\"\xff\"}"), "body: the body is not JSON");
     EXPECT_EQ(refused("[]"), "body: write an object");
@@ -62,7 +63,7 @@ TEST(SampleRequest, RefusesBodiesOfAnotherForm) {
     EXPECT_EQ(refused(many + "]}"), "filters: write a list of at most 100 filters");
 }
 
-TEST(SampleRequest, NamesTheFilterThatIsWrong) {
+TEST(SampleRequest, NamesTheWrongFilter) {
     EXPECT_EQ(refused(R"({"filters":["x"]})"),
               "filters[0]: write an object with column, op and value");
     EXPECT_EQ(refused(filter(R"("op":"=","value":"a")")), "filters[0].column: write a text");
@@ -101,7 +102,7 @@ TEST(SampleRequest, RefusesUnusableValues) {
               "filters[0].column: 'COLOUR' is not a column; th");
 }
 
-TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
+TEST(SampleRequest, RegularExpressionsAreLimitedTogether) {
     std::string filters;
     for (int count = 0; count < 3; ++count) {
         filters += filters.empty() ? "" : ",";
@@ -113,7 +114,7 @@ TEST(SampleRequest, RegularExpressionsHaveALimitTogether) {
         << problem;
 }
 
-TEST(SampleRequest, AReportNamesItsLogAndItsWindow) {
+TEST(SampleRequest, AReportNeedsALogAndAWindow) {
     const std::string path = R"({"column":"LOGPATH","op":"=","value":"/var/log/"})";
     const std::string name = R"({"column":"LOGNAME","op":"=","value":"auth.log"})";
     const std::string start = R"({"column":"ENTRYTIME","op":">=","value":"2026-11-20"})";

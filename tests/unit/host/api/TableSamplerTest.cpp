@@ -1,4 +1,4 @@
-#include "host/api/TableSampler.h"
+#include "host/api/SampleSource.h"
 
 #include "base/ProcessValues.h"
 #include "host/framework/Tables.h"
@@ -40,7 +40,7 @@ protected:
     TableSampler sampler;
 };
 
-TEST_F(TableSamplerTest, GivesRowsAsJson) {
+TEST_F(TableSamplerTest, ReturnsRowsAsJson) {
     const SampleSource::Rows sample = sampler.take("RMLOGENT", {});
     const std::string row =
         R"({"LOGPATH":"/var/log/","LOGNAME":"a\"b.log","TEXT":"text","NUMBER":)";
@@ -49,7 +49,7 @@ TEST_F(TableSamplerTest, GivesRowsAsJson) {
     EXPECT_FALSE(sample.truncated);
 }
 
-TEST_F(TableSamplerTest, GivesTheRowsThatMeetTheConditions) {
+TEST_F(TableSamplerTest, ReturnsTheRowsThatMeetTheConditions) {
     Condition condition;
     condition.column = "NUMBER";
     condition.isNumber = true;
@@ -70,7 +70,7 @@ TEST_F(TableSamplerTest, IsTruncatedWhenTheAgentReadAsManyRowsAsItMay) {
     EXPECT_FALSE(sampler.take("RMLOGENT", {condition}).truncated);
     rows = 3;
     const SampleSource::Rows sample = sampler.take("RMLOGENT", {condition});
-    EXPECT_TRUE(sample.truncated) << "whatever the conditions left over";
+    EXPECT_TRUE(sample.truncated) << "however many rows the conditions leave";
     EXPECT_EQ(sample.count, 1u);
 }
 

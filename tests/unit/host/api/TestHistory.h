@@ -14,7 +14,7 @@
 
 using namespace zrm::host;
 
-/// A history of a test: what was added, oldest first. It notes the last query.
+/// A history for tests: the added events, oldest first. It records the last query.
 class TestHistory : public HistoryReader {
 public:
     void add(std::uint64_t id, const std::string& situation = "s") {
@@ -92,8 +92,8 @@ public:
         return {from, step, {{"/a", {1, std::nullopt}, {0, std::nullopt}}, {"/b", {}, {}}}};
     }
 
-    std::vector<std::uint64_t> damaged;   ///< what queries give as damaged
-    std::optional<std::uint64_t> reached; ///< where queries say that they stopped
+    std::vector<std::uint64_t> damaged;   ///< what queries report as damaged
+    std::optional<std::uint64_t> reached; ///< where queries report that they stopped
     std::int64_t ratesFrom = 0;
     std::int64_t ratesTo = 0;
 

@@ -1,4 +1,4 @@
-#include "host/base/DurationText.h"
+#include "host/base/TimeText.h"
 
 #include <gtest/gtest.h>
 
@@ -16,7 +16,7 @@ TEST(DurationText, ReadsNumbersWithAUnit) {
     EXPECT_EQ(DurationText::parse("2147483647s"), seconds(2147483647));
 }
 
-TEST(DurationText, RefusesWhatIsNone) {
+TEST(DurationText, RefusesEverythingElse) {
     for (const char* const text : {"", "60", "s", "0s", "-1s", "1 m", "1.5h", "1w", "60sec", " 60s",
                                    "2147483648s", "24856d", "99999999999999999999s", "1S"}) {
         EXPECT_FALSE(DurationText::parse(text)) << text;

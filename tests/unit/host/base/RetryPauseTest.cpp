@@ -12,7 +12,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-TEST(RetryPause, GrowsToTheLongestAndBeginsAnew) {
+TEST(RetryPause, GrowsToTheLongestAndStartsOver) {
     RetryPause pause(100ms, 1s);
     for (int round = 0; round < 2; ++round) {
         for (auto whole = 100ms; whole < 8s; whole *= 2) {
@@ -25,7 +25,7 @@ TEST(RetryPause, GrowsToTheLongestAndBeginsAnew) {
     }
 }
 
-TEST(RetryPause, TwoOfThemDoNotKeepStep) {
+TEST(RetryPause, TwoPausesDiffer) {
     RetryPause one(10s, 10s);
     RetryPause other(10s, 10s);
     std::set<std::chrono::milliseconds> lengths;

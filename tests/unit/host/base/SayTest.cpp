@@ -18,13 +18,13 @@ TEST(Say, WritesOneLineToStandardError) {
     EXPECT_EQ(said("no log to monitor"), "zrmagent: no log to monitor\n");
 }
 
-TEST(Say, CutsWhatIsTooLong) {
+TEST(Say, CutsLongMessages) {
     const std::string line = said(std::string(10'000, 'x'));
     EXPECT_EQ(line.size(), 8192u);
     EXPECT_TRUE(line.ends_with("xx\n"));
 }
 
-TEST(Say, SteersNoTerminalAndStaysOneLine) {
+TEST(Say, EscapesControlCharactersAndStaysOneLine) {
     EXPECT_EQ(said("a\033[31m\xc2\x9b\xe2\x80\xae caf\xc3\xa9\nzrmagent: forged"),
               "zrmagent: a\\x1b[31m\\u009b\\u202e caf\xc3\xa9 zrmagent: forged\n");
     const std::string line = said(std::string(10'000, '\033'));

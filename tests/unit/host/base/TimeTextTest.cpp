@@ -36,7 +36,7 @@ private:
     std::string m_before;
 };
 
-TEST(TimeText, TakesLocalTimesAsTheyStand) {
+TEST(TimeText, KeepsLocalTimes) {
     EXPECT_EQ(stampOf("2026-11-20T07:03:09"), "1261120070309000");
     EXPECT_EQ(stampOf("2026-11-20 07:03:09"), "1261120070309000");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09.412"), "1261120070309000");
@@ -46,7 +46,7 @@ TEST(TimeText, TakesLocalTimesAsTheyStand) {
     EXPECT_EQ(stampOf("2024-02-29"), "1240229000000000");
 }
 
-TEST(TimeText, TurnsTimesWithAZoneIntoLocalOnes) {
+TEST(TimeText, ConvertsTimesWithAZoneToLocalTime) {
     const TimeZone zone("CET-1");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09Z"), "1261120080309000");
     EXPECT_EQ(stampOf("2026-11-20T07:03:09.5Z"), "1261120080309000");
@@ -57,7 +57,7 @@ TEST(TimeText, TurnsTimesWithAZoneIntoLocalOnes) {
     EXPECT_EQ(stampOf("2024-02-28T23:30:00Z"), "1240229003000000");
 }
 
-TEST(TimeText, TakesTimeStamps) {
+TEST(TimeText, AcceptsTimeStamps) {
     EXPECT_EQ(stampOf("1261120070309000"), "1261120070309000");
     EXPECT_EQ(stampOf("0991231235959999"), "0991231235959999");
     EXPECT_EQ(stampOf("0000000000000000"), "0000000000000000");
@@ -102,7 +102,7 @@ TEST(TimeText, RefusesEverythingElse) {
     }
 }
 
-TEST(TimeText, GivesMilliseconds) {
+TEST(TimeText, ReturnsMilliseconds) {
     const TimeZone zone("CET-1CEST");
     EXPECT_EQ(TimeText::toMilliseconds("1970-01-01T00:00:00Z"), 0);
     EXPECT_EQ(TimeText::toMilliseconds("2026-11-20T07:03:09.412Z"), 1795158189412);

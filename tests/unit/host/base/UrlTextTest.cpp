@@ -19,11 +19,25 @@ TEST(UrlText, DecodesPercentEncoding) {
     EXPECT_EQ(UrlText::decode("%C3%A4%e2%82%ac"), "\xc3\xa4\xe2\x82\xac");
 }
 
-TEST(UrlText, RefusesWhatIsNoText) {
+TEST(UrlText, RefusesWhatIsNotText) {
     for (const char* const broken :
          {"%", "a%", "%2", "%2x", "%x2", "%-1", "%+1", "% 1", "%00", "%ff", "%C3", "%ED%A0%80"}) {
         EXPECT_EQ(UrlText::decode(broken), std::nullopt) << broken;
     }
+}
+
+TEST(UrlText, EncodesWhateverHasAMeaningInAUrl) {
+    EXPECT_EQ(UrlText::encode(""), "");
+    EXPECT_EQ(UrlText::encode("ssh-brute_force.1~"), "ssh-brute_force.1~");
+    EXPECT_EQ(UrlText::encode("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
+}
+
+TEST(UrlText, DecodesWhatItEncodes) {
+    std::string text;
+    for (char c = 1; c != '\x7f'; ++c) {
+        text += c;
+    }
+    EXPECT_EQ(UrlText::decode(UrlText::encode(text)), text);
 }
 
 TEST(UrlText, ReadsQueries) {

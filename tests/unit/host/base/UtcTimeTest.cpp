@@ -1,4 +1,4 @@
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 
 #include <gtest/gtest.h>
 
@@ -12,7 +12,7 @@ TEST(UtcTime, HasMillisecondsAndTheZone) {
     EXPECT_EQ(UtcTime::text(1'709'210'096'007), "2024-02-29T12:34:56.007Z");
 }
 
-TEST(UtcTime, HasYearsThatTheFormOfOrdinaryOnesDoesNotHold) {
+TEST(UtcTime, HandlesUnusualYears) {
     EXPECT_EQ(UtcTime::text(253'402'300'799'999), "9999-12-31T23:59:59.999Z");
     EXPECT_EQ(UtcTime::text(253'402'300'800'000), "10000-01-01T00:00:00.000Z");
     EXPECT_EQ(UtcTime::text(-1), "1970-01-01T00:00:00.-01Z");

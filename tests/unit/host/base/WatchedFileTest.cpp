@@ -17,12 +17,12 @@ protected:
     WatchedFile file{path};
 };
 
-TEST_F(WatchedFileTest, AFileThatStaysHasNotChanged) {
+TEST_F(WatchedFileTest, AnUntouchedFileHasNotChanged) {
     EXPECT_FALSE(file.hasChanged());
     EXPECT_FALSE(file.hasChanged());
 }
 
-TEST_F(WatchedFileTest, AChangeIsToldOnceAndWhenTheFileHasComeToRest) {
+TEST_F(WatchedFileTest, AChangeIsReportedOnceAndWhenTheFileIsComplete) {
     directory.append("zrm.toml", "b");
     EXPECT_FALSE(file.hasChanged());
     directory.append("zrm.toml", "c");

@@ -62,7 +62,7 @@ TEST_F(AgentAccessTest, ATokenFileOfTheConfigurationIsRead) {
     EXPECT_EQ(connection.token, "secret-of-another-file");
 }
 
-TEST_F(AgentAccessTest, TheEnvironmentGoesBeforeTheConfiguration) {
+TEST_F(AgentAccessTest, TheEnvironmentOverridesTheConfiguration) {
     setenv("ZRM_URL", "http://localhost:99/", 1);
     setenv("ZRM_TOKEN", "secret-of-the-environment\n", 1);
     options.config = directory.file("absent.toml"); // not needed
@@ -72,7 +72,7 @@ TEST_F(AgentAccessTest, TheEnvironmentGoesBeforeTheConfiguration) {
     EXPECT_EQ(connection.tokenSource, "ZRM_TOKEN");
 }
 
-TEST_F(AgentAccessTest, OptionsGoBeforeTheEnvironment) {
+TEST_F(AgentAccessTest, OptionsOverrideTheEnvironment) {
     setenv("ZRM_URL", "http://localhost:99", 1);
     setenv("ZRM_TOKEN", "secret-of-the-environment", 1);
     options.url = "https://logs.example.org:7186";
@@ -82,7 +82,7 @@ TEST_F(AgentAccessTest, OptionsGoBeforeTheEnvironment) {
     EXPECT_EQ(connection.token, "secret-of-mine");
 }
 
-TEST_F(AgentAccessTest, CertificatesAreTrustedBesideThatOfTheConfiguration) {
+TEST_F(AgentAccessTest, FurtherCertificatesAreTrustedBesideTheConfiguredOne) {
     EXPECT_TRUE(AgentAccess::find(options).authorities.empty());
     options.caFile = "/of/the/option.pem";
     setenv("ZRM_CA_FILE", "/of/the/environment.pem", 1);
@@ -97,7 +97,7 @@ TEST_F(AgentAccessTest, CertificatesAreTrustedBesideThatOfTheConfiguration) {
     EXPECT_EQ(AgentAccess::find(options).authorities, Files{"/of/the/environment.pem"});
 }
 
-TEST_F(AgentAccessTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
+TEST_F(AgentAccessTest, TheTokenIsSentUnencryptedOnlyToThisMachine) {
     options.url = "http://logs.example.org:7186";
     expectError(CLI_USAGE, "--url: the token would reach logs.example.org unencrypted; use https, "
                            "or an SSH tunnel");
@@ -108,7 +108,7 @@ TEST_F(AgentAccessTest, TheTokenTravelsUnencryptedToThisMachineAlone) {
         "ZRM_URL: the token would reach 192.0.2.7 unencrypted; use https, or an SSH tunnel");
 }
 
-TEST_F(AgentAccessTest, APortMayBeLeftOut) {
+TEST_F(AgentAccessTest, ThePortIsOptional) {
     options.tokenFile = write("mine", "secret");
     for (const char* const url : {"http://[::1]", "http://localhost", "https://logs.example.org",
                                   "https://[2001:db8::1]"}) {
@@ -117,7 +117,7 @@ TEST_F(AgentAccessTest, APortMayBeLeftOut) {
     }
 }
 
-TEST_F(AgentAccessTest, WhatIsNoAddressIsRefused) {
+TEST_F(AgentAccessTest, InvalidAddressesAreRefused) {
     for (const char* const url :
          {"localhost:7186", "http://", "ftp://localhost", "http://a b:1", "https://", "https://a b",
           "https://a/path", "https://user@a", "http://localhost/path", "http://[::1"}) {
@@ -127,14 +127,14 @@ TEST_F(AgentAccessTest, WhatIsNoAddressIsRefused) {
     }
 }
 
-TEST_F(AgentAccessTest, AMissingConfigurationIsTold) {
+TEST_F(AgentAccessTest, AMissingConfigurationIsReported) {
     options.config = directory.file("absent.toml");
     expectError(CLI_USAGE, options.config +
                                " does not exist: name the agent's configuration with --config, or "
                                "its address with --url");
 }
 
-TEST_F(AgentAccessTest, WhatTheAgentAloneNeedsMayBeWrong) {
+TEST_F(AgentAccessTest, ErrorsInTheAgentsOwnKeysAreIgnored) {
     write("zrm.toml", "wrong = 1\n[[situation]]\n[history]\ndirectory = 5\n[http]\n"
                       "listen = '127.0.0.1:7000'\nlisen = ''\nkey = 'x'\n");
     write("token", "secret\n");
@@ -142,7 +142,7 @@ TEST_F(AgentAccessTest, WhatTheAgentAloneNeedsMayBeWrong) {
     EXPECT_EQ(AgentAccess::find(options).url, "http://127.0.0.1:7000");
 }
 
-TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsTold) {
+TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsReported) {
     write("zrm.toml", "state_directory = 5\n[http]\nlisten = 5\n");
     try {
         AgentAccess::find(options);
@@ -163,21 +163,21 @@ TEST_F(AgentAccessTest, AConfigurationWithoutHttpHasNoAddress) {
             " turns HTTP off: give [http] a listen address, or give the address with --url");
 }
 
-TEST_F(AgentAccessTest, AnOpenPortIsNoAddress) {
+TEST_F(AgentAccessTest, AnUnspecifiedPortIsNotAnAddress) {
     write("zrm.toml", "[http]\nlisten = \"127.0.0.1:0\"\n");
     expectError(CLI_USAGE,
                 options.config +
                     " leaves the port open: give the address that the agent reported with --url");
 }
 
-TEST_F(AgentAccessTest, AMissingTokenIsTold) {
+TEST_F(AgentAccessTest, AMissingTokenIsReported) {
     options.tokenFile = directory.file("absent");
     expectError(CLI_FORBIDDEN,
                 "cannot read the token " + options.tokenFile +
                     ": No such file or directory; the agent creates it when it starts with HTTP");
 }
 
-TEST_F(AgentAccessTest, AFileThatHoldsNoTokenIsTold) {
+TEST_F(AgentAccessTest, AFileWithoutATokenIsReported) {
     options.tokenFile = write("two-lines", "one\ntwo\n");
     expectError(CLI_FORBIDDEN,
                 options.tokenFile + " does not contain a token: one line of visible characters");

@@ -3,7 +3,7 @@
 #include "../sinks/ScriptedServer.h"
 #include "TestAgent.h"
 #include "host/cli/CliError.h"
-#include "host/cli/SseParser.h"
+#include "host/cli/EventFollower.h"
 
 #include <gtest/gtest.h>
 
@@ -65,7 +65,7 @@ TEST_F(AgentClientTest, SendsTokenQueryAndBody) {
     agent.begin();
     AgentClient client(agent.connection());
     const auto got = client.get("/events", {{"log", "/var/log/a b&c=d+e.log"}, {"log", "/x"}});
-    EXPECT_EQ(got.dump(), R"({"b":1,"a":2})") << "answered to those who carry the token alone";
+    EXPECT_EQ(got.dump(), R"({"b":1,"a":2})") << "only requests with the token are answered";
     EXPECT_EQ(seen().query.count("log"), 2u);
     EXPECT_EQ(seen().query.find("log")->second, "/var/log/a b&c=d+e.log");
     client.send("PUT", "/trace", {{"levels", "error"}});
@@ -79,7 +79,7 @@ TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
     EXPECT_TRUE(client.send("DELETE", "/x", nullptr).is_null());
 }
 
-TEST_F(AgentClientTest, AProblemIsToldWithItsField) {
+TEST_F(AgentClientTest, AProblemIsReportedWithItsField) {
     answer(400, R"({"status":400,"detail":"'is' is not an operator","field":"where[0]"})");
     expectAnswer(CLI_REFUSED, "where[0]: 'is' is not an operator");
 }
@@ -89,25 +89,25 @@ TEST_F(AgentClientTest, AProblemWithoutAField) {
     expectAnswer(CLI_REFUSED, "the history is off");
 }
 
-TEST_F(AgentClientTest, AnErrorThatIsNoProblemIsTold) {
+TEST_F(AgentClientTest, AnErrorWithoutAProblemDocumentIsReported) {
     answer(502, "<html>");
     expectAnswer(CLI_REFUSED, "the agent at " + url + " answered with status 502");
 }
 
-TEST_F(AgentClientTest, ATokenThatIsNotAcceptedIsTold) {
+TEST_F(AgentClientTest, ARejectedTokenIsReported) {
     answer(401, "{}");
     expectAnswer(CLI_FORBIDDEN, "the agent at " + url +
                                     " does not accept the token from its file: give the right one "
                                     "with --token-file or --config");
 }
 
-TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsTold) {
+TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsReported) {
     answer(200, "<html>");
     expectAnswer(CLI_UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
-TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
+TEST_F(AgentClientTest, AnAgentThatIsNotRunningIsReported) {
     agent.begin();
     url = agent.connection().url;
     agent.end();
@@ -116,7 +116,7 @@ TEST_F(AgentClientTest, AnAgentThatDoesNotRunIsTold) {
                                       "address: --url or --config)");
 }
 
-TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
+TEST_F(AgentClientTest, AnEndlessAnswerIsReportedAndTakesBoundedMemory) {
     const ScriptedServer server([](const ScriptedServer::Request&) {
         return ScriptedServer::Reply{"HTTP/1.1 400 Bad\r\nTransfer-Encoding: chunked\r\n\r\n",
                                      ScriptedServer::Reply::KEEP, "4\r\nmore\r\n"};
@@ -126,13 +126,13 @@ TEST_F(AgentClientTest, AnAnswerWithoutEndIsToldAndTakesBoundedMemory) {
                 "what answers at " + server.url() + " is not a zrmagent: its answer does not end");
 }
 
-TEST_F(AgentClientTest, AnAnswerThatIsNestedWithoutReasonIsTold) {
+TEST_F(AgentClientTest, ADeeplyNestedAnswerIsReported) {
     answer(200, R"({"a":)" + std::string(1'000'000, '[') + std::string(1'000'000, ']') + '}');
     expectAnswer(CLI_UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
-TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
+TEST_F(AgentClientTest, AnEndlessEventOfAStreamIsReported) {
     const ScriptedServer server([](const ScriptedServer::Request&) {
         return ScriptedServer::Reply{"HTTP/1.1 200 OK\r\n\r\ndata: ", ScriptedServer::Reply::KEEP,
                                      std::string(4096, 'x')};
@@ -143,11 +143,6 @@ TEST_F(AgentClientTest, AnEventOfAStreamWithoutEndIsTold) {
         [&] { client.stream("/x", {}, [&](std::string_view piece) { parser.take(piece); }); },
         CLI_UNREACHABLE,
         "what answers is not a zrmagent: an event of its stream is longer than 1 MB");
-}
-
-TEST_F(AgentClientTest, APartOfAPathKeepsNothingThatHasAMeaningThere) {
-    EXPECT_EQ(AgentClient::pathPart("ssh-brute_force.1~"), "ssh-brute_force.1~");
-    EXPECT_EQ(AgentClient::pathPart("a/b c?d%&\xC3\xA4"), "a%2Fb%20c%3Fd%25%26%C3%A4");
 }
 
 TEST_F(AgentClientTest, AStreamThatBeginsAfterStopEnds) {

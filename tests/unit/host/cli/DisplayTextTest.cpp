@@ -6,13 +6,13 @@ using namespace zrm::host;
 
 using namespace DisplayText;
 
-TEST(DisplayTextTest, PlainTextStaysAsItIs) {
+TEST(DisplayTextTest, PlainTextIsUnchanged) {
     EXPECT_EQ(visible("Failed password for root"), "Failed password for root");
     EXPECT_EQ(visible("Größe 日本 🙂"), "Größe 日本 🙂");
     EXPECT_EQ(visible(""), "");
 }
 
-TEST(DisplayTextTest, WhatSteersATerminalIsWrittenAsAnEscape) {
+TEST(DisplayTextTest, ControlCharactersAreEscaped) {
     EXPECT_EQ(visible("\033[31mred\a\r\n\tx\x7f"), "\\x1b[31mred\\x07\\r\\n\\tx\\x7f");
     EXPECT_EQ(visible(std::string("a\0b", 3)), "a\\x00b");
     EXPECT_EQ(visible("\xC2\x9B"
@@ -20,14 +20,14 @@ TEST(DisplayTextTest, WhatSteersATerminalIsWrittenAsAnEscape) {
               "\\u009b31m"); // the 8-bit form of ESC [
 }
 
-TEST(DisplayTextTest, WhatHidesOrTurnsOtherTextIsWrittenAsAnEscape) {
+TEST(DisplayTextTest, CharactersThatHideOrReorderTextAreEscaped) {
     EXPECT_EQ(visible("exe\xE2\x80\xAEtxt.cod"), "exe\\u202etxt.cod");
     EXPECT_EQ(visible("a\xE2\x80\x8B"
                       "b\xEF\xBB\xBF"),
               "a\\u200bb\\ufeff");
 }
 
-TEST(DisplayTextTest, WhatIsNoUtf8IsReplaced) {
+TEST(DisplayTextTest, InvalidUtf8IsReplaced) {
     EXPECT_EQ(visible("a\xFF"
                       "b\xC3"),
               "a\xEF\xBF\xBD"

@@ -25,8 +25,8 @@ using testing::ElementsAre;
 
 namespace {
 
-/// An agent whose stream gives what a test has scripted for each connection, and then ends it, or
-/// stays silent when that was the last. The operator presses Ctrl-C when the last event has come.
+/// An agent whose stream sends what a test has scripted for each connection and then ends it, or
+/// stays silent after the last. The operator presses Ctrl-C when the last event has arrived.
 class EventFollowerTest : public testing::Test {
 protected:
     struct Part {
@@ -34,7 +34,7 @@ protected:
         int status = 200;
     };
 
-    /// The threads of the server, too, leave the signal to the follower.
+    /// The server's threads leave the signal to the follower, too.
     void SetUp() override {
         sigset_t signals;
         sigemptyset(&signals);
@@ -96,7 +96,7 @@ protected:
         return ids;
     }
 
-    /// What the server's threads have noted.
+    /// What the server's threads have recorded.
     std::vector<std::string> copy(const std::vector<std::string>& texts) {
         const std::lock_guard guard(mutex);
         return texts;
@@ -122,7 +122,7 @@ const std::string lost = "the connection to the agent was lost; reconnecting";
 
 } // namespace
 
-TEST_F(EventFollowerTest, GivesEventsUntilCtrlC) {
+TEST_F(EventFollowerTest, DeliversEventsUntilCtrlC) {
     parts = {{event(8) + ": keep-alive\n\n" + event(9)}};
     addRoutes();
     agent.begin();
@@ -132,7 +132,7 @@ TEST_F(EventFollowerTest, GivesEventsUntilCtrlC) {
     EXPECT_THAT(notes, ElementsAre());
 }
 
-TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
+TEST_F(EventFollowerTest, AfterALostConnectionItContinuesAfterTheLastWholeEvent) {
     parts = {
         {event(8) + event(9) + "id: 10\ndata: {\"id\":1"}, {event(9) + event(10)}, {event(11)}};
     addRoutes();
@@ -142,7 +142,7 @@ TEST_F(EventFollowerTest, AfterALostConnectionItGoesOnBehindTheLastWholeEvent) {
     EXPECT_THAT(notes, ElementsAre(lost, "reconnected", lost, "reconnected"));
 }
 
-TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
+TEST_F(EventFollowerTest, ANewHistoryIsFollowedFromItsFirstEvent) {
     newest = 2;
     parts = {{event(500)}, {event(1) + event(2)}};
     addRoutes();
@@ -155,7 +155,7 @@ TEST_F(EventFollowerTest, AHistoryThatBeganAnewIsFollowedFromItsFirstEvent) {
                             "reconnected"));
 }
 
-TEST_F(EventFollowerTest, ARefusalEndsIt) {
+TEST_F(EventFollowerTest, ARefusalEndsTheFollowing) {
     parts = {{R"({"detail":"the history is off"})", 409}};
     addRoutes();
     agent.begin();
@@ -168,12 +168,12 @@ TEST_F(EventFollowerTest, ARefusalEndsIt) {
     }
 }
 
-TEST_F(EventFollowerTest, AnAgentThatIsStartedAgainIsFollowedFurther) {
+TEST_F(EventFollowerTest, FollowingContinuesAfterTheAgentRestarts) {
     parts = {{event(8)}, {event(9)}};
     addRoutes();
     agent.begin();
     std::thread restart([this] {
-        while (received == 0) { // what is on its way when the agent ends may not arrive
+        while (received == 0) { // what is being sent when the agent ends may not arrive
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
         agent.end();

@@ -32,7 +32,7 @@ TEST(JsonTextTest, MembersAsTextAndNumber) {
     EXPECT_EQ(JsonText::number(object, "c"), 17u);
     EXPECT_EQ(JsonText::number(object, "a"), 0u);
 }
-TEST(JsonTextTest, WhatChangesTheDirectionOfTextIsEscaped) {
+TEST(JsonTextTest, CharactersThatChangeTheDirectionOfTextAreEscaped) {
     EXPECT_EQ(JsonText::dump(JsonText::Json("a\xe2\x80\xae"
                                             "b"),
                              true),

@@ -45,7 +45,7 @@ protected:
     void answerWith(const std::string& body) {
         answerBy([=](const HttpRequest&) { return HttpAnswer::json(body); });
     }
-    /// What the handler has noted.
+    /// What the handler has recorded.
     std::string copy(const std::string& text) {
         const std::lock_guard guard(mutex);
         return text;
@@ -76,7 +76,7 @@ protected:
     std::string errors;
 };
 
-TEST_F(ProgramTest, AnAnswerOfAnotherFormEndsNoCommandAbruptly) {
+TEST_F(ProgramTest, AnUnexpectedAnswerCrashesNoCommand) {
     const std::vector<std::vector<std::string>> commands = {
         {"status"},
         {"logs"},
@@ -118,7 +118,7 @@ TEST_F(ProgramTest, AnAnswerOfAnotherFormEndsNoCommandAbruptly) {
                       "different form\n");
 }
 
-TEST_F(ProgramTest, AColumnThatAReportHasNotIsRefused) {
+TEST_F(ProgramTest, AnUnknownColumnOfAReportIsRefused) {
     answerWith(R"({"columns":["ENTRYTIME","ENTRYDESC"],"rows":[{"ENTRYDESC":"a, b"}]})");
     EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CLI_USAGE);
     EXPECT_EQ(output, "");
@@ -130,7 +130,7 @@ TEST_F(ProgramTest, AColumnThatAReportHasNotIsRefused) {
     EXPECT_EQ(output, "{\"columns\":[\"ENTRYDESC\"],\"rows\":[{\"ENTRYDESC\":\"a, b\"}]}\n");
 }
 
-TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
+TEST_F(ProgramTest, ReadsTheNumberOfAnEvent) {
     for (const char* const number :
          {"99999999999999999999999", "9223372036854775808", "1.5", "-1", "x", "", " 1", "1x"}) {
         EXPECT_EQ(run({"events", "-f", "--after", number}), CLI_USAGE) << number;
@@ -144,7 +144,7 @@ TEST_F(ProgramTest, TheNumberOfAnEventIsRead) {
     EXPECT_EQ(output, "{\"id\":8}\n");
 }
 
-TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
+TEST_F(ProgramTest, InvalidUtf8IsRefused) {
     std::atomic<bool> isAsked{false};
     answerBy([&](const HttpRequest&) {
         isAsked = true;
@@ -162,7 +162,7 @@ TEST_F(ProgramTest, WhatIsNoUtf8IsRefusedAndNotChanged) {
     EXPECT_FALSE(isAsked);
 }
 
-TEST_F(ProgramTest, OneThingIsExplained) {
+TEST_F(ProgramTest, ExactlyOneSubjectIsExplained) {
     std::string asked;
     answerBy([&](const HttpRequest& request) {
         asked = request.body;
@@ -185,7 +185,7 @@ TEST_F(ProgramTest, OneThingIsExplained) {
     }
 }
 
-TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
+TEST_F(ProgramTest, AnEmptyValueRemovesAMember) {
     std::string put;
     answerBy([&](const HttpRequest& request) {
         put = request.method == "PUT" ? request.body : put;
@@ -202,7 +202,7 @@ TEST_F(ProgramTest, AnEmptyValueTakesAMemberOut) {
     EXPECT_EQ(run({"situations", "set", "x"}), CLI_USAGE);
 }
 
-TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
+TEST_F(ProgramTest, AnErrorNamesTheHelpToRead) {
     EXPECT_EQ(run({"situations", "bogus"}), CLI_USAGE);
     EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists its options\n"));
     EXPECT_EQ(run({"situations", "show"}), CLI_USAGE);
@@ -216,14 +216,14 @@ TEST_F(ProgramTest, AMistakeIsToldWithTheHelpThatHelps) {
     }
 }
 
-TEST_F(ProgramTest, ADefinitionWithoutEndIsNotReadForEver) {
+TEST_F(ProgramTest, AnEndlessDefinitionIsRefused) {
     EXPECT_EQ(run({"backtest", "--file", "/dev/zero"}), CLI_USAGE);
     EXPECT_EQ(errors, "zrmctl: /dev/zero is larger than 16 MiB, the most that is read\n");
     EXPECT_EQ(run({"situations", "add", "x", "--file", directory.path().string()}), CLI_USAGE);
     EXPECT_EQ(errors, "zrmctl: cannot read " + directory.path().string() + ": Is a directory\n");
 }
 
-TEST_F(ProgramTest, AFileOfCertificatesThatHoldsNoneIsRefused) {
+TEST_F(ProgramTest, AFileWithoutCertificatesIsRefused) {
     const std::string empty = directory.write("empty.pem", "nothing\n");
     const std::string url = "https://127.0.0.1:1";
     EXPECT_EQ(run({"--url", url, "--ca-file", empty, "logs"}), CLI_USAGE);

@@ -1,4 +1,4 @@
-#include "host/cli/SseParser.h"
+#include "host/cli/EventFollower.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -20,7 +20,7 @@ protected:
 
 } // namespace
 
-TEST_F(SseParserTest, GivesTheDataOfEachEvent) {
+TEST_F(SseParserTest, ReturnsTheDataOfEachEvent) {
     parser.take("id: 1\nevent: event\ndata: {\"id\":1}\n\n: keep-alive\n\ndata: x\n\n");
     EXPECT_THAT(received, ElementsAre("{\"id\":1}", "x"));
 }
@@ -38,12 +38,12 @@ TEST_F(SseParserTest, JoinsLinesOfData) {
     EXPECT_THAT(received, ElementsAre("one\ntwo\n three"));
 }
 
-TEST_F(SseParserTest, AnEventThatHasNotEndedIsNotGiven) {
+TEST_F(SseParserTest, AnIncompleteEventIsNotReturned) {
     parser.take("data: one\n");
     EXPECT_THAT(received, ElementsAre());
 }
 
-TEST_F(SseParserTest, AnEventWithoutDataIsNone) {
+TEST_F(SseParserTest, AnEventWithoutDataIsIgnored) {
     parser.take("id: 1\nevent: event\n\n\n");
     EXPECT_THAT(received, ElementsAre());
 }

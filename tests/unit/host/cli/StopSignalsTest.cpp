@@ -12,13 +12,13 @@ using namespace zrm::host;
 
 using namespace std::chrono_literals;
 
-TEST(StopSignalsTest, AWaitEndsAfterItsTimeWithoutASignal) {
+TEST(StopSignalsTest, AWaitWithoutASignalTimesOut) {
     StopSignals signals;
     EXPECT_FALSE(signals.wait(1ms));
     EXPECT_FALSE(signals.isStopped());
 }
 
-TEST(StopSignalsTest, ASignalEndsTheWaitAndDoesTheAction) {
+TEST(StopSignalsTest, ASignalEndsTheWaitAndRunsTheAction) {
     for (const int number : {SIGINT, SIGTERM}) {
         StopSignals signals;
         std::atomic<int> stops{0};
@@ -31,7 +31,7 @@ TEST(StopSignalsTest, ASignalEndsTheWaitAndDoesTheAction) {
     }
 }
 
-TEST(StopSignalsTest, AnActionThatComesLateIsDoneAtOnce) {
+TEST(StopSignalsTest, ALateActionRunsAtOnce) {
     StopSignals signals;
     kill(getpid(), SIGINT);
     ASSERT_TRUE(signals.wait(60s));
@@ -40,7 +40,7 @@ TEST(StopSignalsTest, AnActionThatComesLateIsDoneAtOnce) {
     EXPECT_EQ(stops, 1);
 }
 
-TEST(StopSignalsTest, TheSignalsAreAsBeforeAtTheEnd) {
+TEST(StopSignalsTest, RestoresTheSignals) {
     { StopSignals signals; }
     sigset_t blocked;
     pthread_sigmask(SIG_SETMASK, nullptr, &blocked);

@@ -25,7 +25,7 @@ Terminal ofWidth(std::size_t width) {
 
 } // namespace
 
-TEST(TableTest, OutsideATerminalEverythingIsWhole) {
+TEST(TableTest, NothingIsShortenedOutsideATerminal) {
     EXPECT_EQ(logs().text({}),
               "LOG                STATUS     SIZE  ENTRY\n"
               "/var/log/auth.log  Running  4.2 kB  Failed password for root from 203.0.113.7\n"
@@ -42,7 +42,7 @@ TEST(TableTest, TheWidestColumnsShrinkToFitTheTerminal) {
                                         "/b                         1 B\n");
 }
 
-TEST(TableTest, WhatDoesNotFitAtAllIsCutAtTheEdge) {
+TEST(TableTest, WhatStillDoesNotFitIsCutAtTheEdge) {
     EXPECT_EQ(logs().text(ofWidth(16)), "LOG         STA…\n"
                                         "/var/log/…  Run…\n"
                                         "/b\n");

@@ -12,7 +12,7 @@
 
 using namespace zrm::host;
 
-/// An agent that answers as a test says: the agent's own server with other routes, which are added
+/// An agent that answers as a test wants: the agent's own server with other routes, which are added
 /// before `begin`.
 class TestAgent {
 public:
@@ -20,13 +20,13 @@ public:
 
     Router& routes() { return *m_router; }
 
-    /// Begins to serve, at the port of the time before when there was one.
+    /// Begins to serve, at the previous port if there was one.
     void begin() {
         m_server = std::make_unique<HttpServer>(*m_router);
         m_server->start({"127.0.0.1", m_port}, ApiToken("the-token"));
         m_port = m_server->port();
     }
-    /// Ends, and forgets its routes.
+    /// Stops and drops its routes.
     void end() {
         if (m_server != nullptr) {
             m_server->stop(HttpServer::Clock::now() + std::chrono::seconds(10));

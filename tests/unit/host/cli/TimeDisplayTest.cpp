@@ -6,7 +6,7 @@
 
 using namespace zrm::host;
 
-TEST(TimeDisplayTest, UtcTimesAreShownLocally) {
+TEST(TimeDisplayTest, UtcTimesAreShownInLocalTime) {
     const TimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
     EXPECT_EQ(TimeDisplay::local("2026-11-20T07:03:09.412Z"), "2026-11-20 08:03:09");
     EXPECT_EQ(TimeDisplay::local("2026-07-20T23:03:09Z"), "2026-07-21 01:03:09");
@@ -32,7 +32,7 @@ TEST(TimeDisplayTest, DurationsHaveTwoUnits) {
     EXPECT_EQ(TimeDisplay::between("", "2026-11-20T08:01:00Z"), "");
 }
 
-TEST(TimeDisplayTest, BytesHaveTwoDigitsAtLeast) {
+TEST(TimeDisplayTest, BytesHaveAtLeastTwoDigits) {
     EXPECT_EQ(TimeDisplay::bytes(0), "0 B");
     EXPECT_EQ(TimeDisplay::bytes(999), "999 B");
     EXPECT_EQ(TimeDisplay::bytes(1000), "1.0 kB");

@@ -36,14 +36,14 @@ TEST(TimeInputTest, YesterdayBeginsAtItsOwnMidnightWhenTheClocksChange) {
     EXPECT_EQ(TimeInput::toIso("today", afterTheChange), "2026-10-24T22:00:00Z");
 }
 
-TEST(TimeInputTest, WhatTheAgentReadsStaysAsItIs) {
+TEST(TimeInputTest, FormsThatTheAgentReadsAreUnchanged) {
     for (const char* const text :
          {"2026-11-20", "2026-11-20T07:03:09", "2026-11-20T07:03:09+01:00", "1261120070309000"}) {
         EXPECT_EQ(TimeInput::toIso(text, now), text);
     }
 }
 
-TEST(TimeInputTest, WhatIsNoTimeIsNone) {
+TEST(TimeInputTest, RefusesEverythingElse) {
     for (const char* const text :
          {"", "-", "-h", "-2", "-2y", "-2hh", "--2h", "2h", "tomorrow", "24:00", "07:60", "7:30",
           "07:30:", "07:30:60", "07-30", "-99999999999h", "-10000000w", "2026-13-01"}) {

@@ -66,7 +66,7 @@ protected:
 
 } // namespace
 
-TEST_F(HttpClientTest, AHeadWithoutEndIsRefused) {
+TEST_F(HttpClientTest, AnEndlessHeadIsRefused) {
     const std::string large(10'000, 'x');
     for (const auto& [begin, endless] : std::initializer_list<std::pair<const char*, std::string>>{
              {"HTTP/1.1 200 ", large},
@@ -80,28 +80,28 @@ TEST_F(HttpClientTest, AHeadWithoutEndIsRefused) {
     }
 }
 
-TEST_F(HttpClientTest, TrailersWithoutEndAreRefused) {
+TEST_F(HttpClientTest, EndlessTrailersAreRefused) {
     const HttpClientAnswer answer = askEndless(
         "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n0\r\n", "X-One: 1\r\n", patient);
     EXPECT_EQ(answer.status, 200);
     EXPECT_EQ(answer.outcome, Outcome::partial);
 }
 
-TEST_F(HttpClientTest, ASizeOfAChunkWithoutEndTakesNoMemoryAndEndsInTime) {
+TEST_F(HttpClientTest, AnEndlessChunkSizeTakesNoMemoryAndEndsInTime) {
     const HttpClientAnswer answer =
         askEndless("HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n1;", "extension", quick);
     EXPECT_EQ(answer.outcome, Outcome::partial);
     EXPECT_EQ(received, 0u);
 }
 
-TEST_F(HttpClientTest, ABodyIsTakenUntilItsReceiverHasEnough) {
+TEST_F(HttpClientTest, ABodyIsReadUntilItsReceiverHasEnough) {
     const HttpClientAnswer answer = askEndless("HTTP/1.1 200 OK\r\n\r\n", "body", patient);
     EXPECT_EQ(answer.outcome, Outcome::partial);
     EXPECT_GE(received, most);
     EXPECT_LT(received, most + 65536);
 }
 
-TEST_F(HttpClientTest, AServerThatSendsAByteNowAndThenIsLeftInTime) {
+TEST_F(HttpClientTest, AServerThatSendsAByteNowAndThenIsGivenUpInTime) {
     const Clock::time_point begin = Clock::now();
     EXPECT_EQ(ask({"HTTP/1.1 200 OK\r\nX: ", Reply::KEEP, "x", 10ms}, quick).outcome,
               Outcome::late);
@@ -110,7 +110,7 @@ TEST_F(HttpClientTest, AServerThatSendsAByteNowAndThenIsLeftInTime) {
     EXPECT_LT(Clock::now() - begin, 20s);
 }
 
-TEST_F(HttpClientTest, AStreamMayLastButNotBeSilent) {
+TEST_F(HttpClientTest, AStreamMayLastButNotStaySilent) {
     constexpr HttpLimits limits{.connect = 10s, .head = 10s, .whole = 0s, .silence = 300ms};
     most = 20; // a second's worth
     EXPECT_EQ(ask({"HTTP/1.1 200 OK\r\n\r\n", Reply::KEEP, "x", 50ms}, limits).outcome,
@@ -119,7 +119,7 @@ TEST_F(HttpClientTest, AStreamMayLastButNotBeSilent) {
     EXPECT_EQ(ask({"HTTP/1.1 200 OK\r\n\r\nx", Reply::HOLD}, limits).outcome, Outcome::partial);
 }
 
-TEST_F(HttpClientTest, ARedirectIsAnAnswerAndNotFollowed) {
+TEST_F(HttpClientTest, ARedirectIsNotFollowed) {
     const HttpClientAnswer answer =
         ask({"HTTP/1.1 302 Found\r\nLocation: http://127.0.0.1:1/\r\nContent-Length: 0\r\n\r\n"},
             patient);
@@ -135,7 +135,7 @@ TEST_F(HttpClientTest, TheProxyOfTheEnvironmentIsNotUsed) {
     unsetenv("ALL_PROXY");
 }
 
-TEST_F(HttpClientTest, WhatItsReceiverThrowsReachesTheCaller) {
+TEST_F(HttpClientTest, AnExceptionOfTheReceiverReachesTheCaller) {
     const ScriptedServer server(
         [&](const ScriptedServer::Request&) { return ScriptedServer::status(200, "body"); });
     HttpClient client(
@@ -155,7 +155,7 @@ TEST_F(HttpClientTest, ARequestAfterGivingUpIsNotSent) {
     EXPECT_EQ(ask(ScriptedServer::status(200), patient).outcome, Outcome::stopped);
 }
 
-TEST_F(HttpClientTest, NoDescriptorReachesChildren) {
+TEST_F(HttpClientTest, ChildrenInheritNoDescriptor) {
     const ScriptedServer server(
         [&](const ScriptedServer::Request&) { return ScriptedServer::status(200); });
     const auto inheritable = [] {

@@ -32,7 +32,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(NameLookupTest, DigitsAreAnAddressWithoutALookup) {
+TEST_F(NameLookupTest, NumericAddressesNeedNoLookup) {
     const FakeResolver resolver("127.0.0.1");
     NameLookup four("127.0.0.2", 514);
     EXPECT_THAT(find(four), testing::ElementsAre("127.0.0.2"));
@@ -50,14 +50,14 @@ TEST_F(NameLookupTest, FindsTheAddressesOfAName) {
     EXPECT_THAT(find(lookup), testing::Contains("127.0.0.1"));
 }
 
-TEST_F(NameLookupTest, SaysWhyThereAreNone) {
+TEST_F(NameLookupTest, ReportsWhyThereAreNone) {
     NameLookup lookup("nowhere.invalid", 514);
     EXPECT_THAT(find(lookup), IsEmpty());
     EXPECT_THAT(lookup.error(), testing::AnyOf("Name or service not known",
                                                "Temporary failure in name resolution"));
 }
 
-TEST_F(NameLookupTest, WaitsNoLongerThanToldAndForOneLookupAtATime) {
+TEST_F(NameLookupTest, WaitsNoLongerThanItsLimitAndForOneLookupAtATime) {
     FakeResolver resolver("127.0.0.3");
     NameLookup lookup("slow.example", 514);
     const auto begin = Clock::now();
@@ -74,7 +74,7 @@ TEST_F(NameLookupTest, WaitsNoLongerThanToldAndForOneLookupAtATime) {
     EXPECT_EQ(resolver.lookups(), 2) << "an answer is not kept";
 }
 
-TEST_F(NameLookupTest, GivesUpAtOnceAndLivesNoLongerThanItsOwner) {
+TEST_F(NameLookupTest, GivesUpAtOnceAndCanBeDestroyedMeanwhile) {
     const FakeResolver resolver("127.0.0.3");
     auto lookup = std::make_unique<NameLookup>("slow.example", 514);
     std::jthread stopper([this] {

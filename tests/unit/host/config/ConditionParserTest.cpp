@@ -47,13 +47,13 @@ TEST(ConditionParser, ReadsNumbers) {
     EXPECT_EQ(condition.number, -12);
 }
 
-TEST(ConditionParser, NeedsNoBlanksAndTakesMany) {
+TEST(ConditionParser, BlanksAreOptional) {
     EXPECT_EQ(parsed("ENTRYSRC='a'").text, "a");
     EXPECT_EQ(parsed(" \t ENTRYSRC \t contains'a b' \t").text, "a b");
     EXPECT_EQ(parsed("LOGSIZE<5", "RMMONLOG").number, 5);
 }
 
-TEST(ConditionParser, TwoQuotesAreOneAndABackslashIsItself) {
+TEST(ConditionParser, TwoQuotesMeanOneAndABackslashIsLiteral) {
     EXPECT_EQ(parsed("ENTRYDESC contains 'it''s'").text, "it's");
     EXPECT_EQ(parsed("ENTRYDESC = ''''").text, "'");
     EXPECT_EQ(parsed("ENTRYDESC = ''").text, "");

@@ -46,7 +46,7 @@ TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
     EXPECT_THAT(config.situations, IsEmpty());
 }
 
-TEST(ConfigFile, ReadsEverythingThatAFileMaySay) {
+TEST(ConfigFile, ReadsEveryKey) {
     const HostConfig config = accepted(R"(
 state_directory = "/srv/zrm"
 
@@ -118,7 +118,7 @@ TEST(ConfigFile, WhenMayBeASingleText) {
     EXPECT_EQ(config.situations.at(0).conditions.at(0).text, "x");
 }
 
-TEST(ConfigFile, SwitchesHttpAndSinksOff) {
+TEST(ConfigFile, HttpAndSinksCanBeOff) {
     EXPECT_EQ(accepted("[http]").http.listen, (ListenAddress{"127.0.0.1", 7186}));
     EXPECT_FALSE(accepted("http.listen = ''").http.listen);
     EXPECT_THAT(accepted("sink = []").sinks, IsEmpty());
@@ -229,7 +229,7 @@ TEST(ConfigFile, RefusesZeroBytesInListsToo) {
     }
 }
 
-TEST(ConfigFile, RefusesToListenForOtherMachines) {
+TEST(ConfigFile, RefusesToListenForOtherMachinesWithoutTls) {
     for (const std::string address : {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(
             refused("http.listen = \"" + address + "\""),
@@ -266,7 +266,7 @@ TEST(ConfigFile, RefusesHalfOfACertificate) {
                     "zrm.toml:1: http.key: 'k' is not an absolute path; begin it with '/'"));
 }
 
-TEST(ConfigFile, RefusesSituationsWithoutANameOfTheirOwn) {
+TEST(ConfigFile, RefusesSituationsWithoutAUniqueName) {
     EXPECT_THAT(
         refused(R"([[situation]]
 text = "a"
@@ -289,7 +289,7 @@ name = "a\nb"
             "control characters, and not . or .."));
 }
 
-TEST(ConfigFile, RefusesWhatIsWrongWithASituation) {
+TEST(ConfigFile, RefusesInvalidSituations) {
     EXPECT_THAT(
         refused(R"([[situation]]
 name = "a"
@@ -335,7 +335,7 @@ TEST(ConfigFile, FrequencyAndPeriodGoTogether) {
                             "PERIODTHRS as well; leave those conditions out"));
 }
 
-TEST(ConfigFile, ThresholdsMayStandAmongTheConditions) {
+TEST(ConfigFile, ThresholdsMayBeAmongTheConditions) {
     const HostConfig config =
         accepted("[[situation]]\nname = 'a'\nwhen = ['FREQTHRESH >= 5', 'PERIODTHRS = 60']\n");
     EXPECT_EQ(config.situations.at(0).conditions.size(), 2u);
@@ -349,7 +349,7 @@ std::string repeated(const std::string& text, int times) {
     return all;
 }
 
-TEST(ConfigFile, TextsOfAnyDepthAreRefused) {
+TEST(ConfigFile, DeeplyNestedTextIsRefused) {
     constexpr int deep = 200'000;
     const std::string name = repeated("a.", deep) + "a";
     for (const std::string& text :
@@ -367,7 +367,7 @@ TEST(ConfigFile, TextsOfAnyDepthAreRefused) {
     }
 }
 
-TEST(ConfigFile, WhatStandsInTextsAndCommentsIsNotNested) {
+TEST(ConfigFile, BracketsInStringsAndCommentsDoNotNest) {
     const std::string brackets = repeated("[{.", 100);
     const HostConfig config =
         accepted("# " + brackets + "\n[[situation]]\nname = \"\\\"" + repeated("[.", 50) +
@@ -376,14 +376,14 @@ TEST(ConfigFile, WhatStandsInTextsAndCommentsIsNotNested) {
     EXPECT_EQ(config.situations.at(0).text, brackets + "\n''" + brackets + "''");
 }
 
-TEST(ConfigFile, OfVeryManyProblemsTheFirstAreNamed) {
+TEST(ConfigFile, NamesOnlyTheFirstOfManyProblems) {
     const std::vector<std::string> problems = refused(repeated("[[situation]]\n", 1000));
     ASSERT_EQ(problems.size(), 101u);
     EXPECT_EQ(problems[99], "zrm.toml:100: situation.name: is missing; give the situation a name");
     EXPECT_EQ(problems[100], "zrm.toml: 900 more problems; correct those above first");
 }
 
-TEST(ConfigFile, AReloadTakesNoFileThatIsCutOff) {
+TEST(ConfigFile, AReloadRefusesATruncatedFile) {
     const TemporaryDirectory directory;
     const auto reloaded = [&](const std::string& text) {
         const std::string path = directory.write("zrm.toml", text);
@@ -414,8 +414,8 @@ TEST(ConfigFile, APipeIsNotRead) {
                                    "read, of at most 4 MiB"));
 }
 
-TEST(ConfigFile, TheRegularExpressionsOfAFileHaveALimitTogether) {
-    // Each situation takes more than two thirds of what one may take.
+TEST(ConfigFile, TheRegularExpressionsOfAFileAreLimitedTogether) {
+    // Each situation takes more than two thirds of its budget.
     const std::string pattern = "\"ENTRYDESC matches '[^,]{800}'\"";
     const auto file = [&](int situations) {
         std::string text;
@@ -434,7 +434,7 @@ TEST(ConfigFile, TheRegularExpressionsOfAFileHaveALimitTogether) {
             "the regular expressions before this one already reach the limit for all of them"));
 }
 
-TEST(ConfigFile, NamesThePlaceWhereTheSyntaxBreaks) {
+TEST(ConfigFile, NamesThePlaceOfASyntaxError) {
     const std::vector<std::string> problems = refused("[agent]\nlog_config = /etc/logs.conf\n");
     ASSERT_EQ(problems.size(), 1u);
     EXPECT_THAT(problems[0], testing::MatchesRegex("zrm.toml:2: .*; correct the TOML here"));
@@ -448,7 +448,7 @@ TEST(ConfigFile, LoadsFiles) {
     EXPECT_EQ(std::get<HostConfig>(result).stateDirectory, "/srv");
 }
 
-TEST(ConfigFile, SaysWhyAFileCannotBeRead) {
+TEST(ConfigFile, ReportsWhyAFileCannotBeRead) {
     const TemporaryDirectory directory;
     const auto problemsOf = [](const std::string& path) {
         return std::get<std::vector<std::string>>(ConfigFile::load(path));
@@ -491,7 +491,7 @@ TEST(ConfigFile, TheExamplesOfTheDocumentationAreAccepted) {
     }
 }
 
-TEST(ConfigFile, TellsWhatIsWrongWithTheHistory) {
+TEST(ConfigFile, ReportsWhatIsWrongWithTheHistory) {
     EXPECT_THAT(
         refused("[history]\n"
                 "enabled = \"yes\"\n"

@@ -1,6 +1,5 @@
-#include "host/config/ConfigSecrets.h"
-
 #include "host/config/ConfigFile.h"
+
 #include "support/TemporaryDirectory.h"
 
 #include <gtest/gtest.h>
@@ -29,7 +28,7 @@ protected:
 
 } // namespace
 
-TEST_F(ConfigSecretsTest, WarnsOfSecretsThatEveryUserCanRead) {
+TEST_F(ConfigSecretsTest, WarnsAboutSecretsThatEveryUserCanRead) {
     const std::string path = directory.file("zrm.toml");
     const std::string expected =
         path +
@@ -44,7 +43,7 @@ TEST_F(ConfigSecretsTest, WarnsOfSecretsThatEveryUserCanRead) {
     }
 }
 
-TEST_F(ConfigSecretsTest, NothingElseIsWarnedOf) {
+TEST_F(ConfigSecretsTest, WarnsAboutNothingElse) {
     for (const char* const harmless :
          {"", "secret_file = '/etc/zrm/secret'", "headers = { X-Scope-OrgID = 'a' }"}) {
         EXPECT_EQ(warning(harmless, 0644), "") << harmless;

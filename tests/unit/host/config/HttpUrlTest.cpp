@@ -16,7 +16,7 @@ TEST(HttpUrl, ReadsHostPortAndTarget) {
     EXPECT_EQ(HttpUrl::parse("http://web1?key=a:b"), (HttpUrl{false, "web1", 80, "/?key=a:b"}));
 }
 
-TEST(HttpUrl, RefusesWhatIsNone) {
+TEST(HttpUrl, RefusesEverythingElse) {
     for (const char* const text : {"",
                                    "web1",
                                    "web1:80",
@@ -44,7 +44,7 @@ TEST(HttpUrl, RefusesWhatIsNone) {
     }
 }
 
-TEST(HttpUrl, TellsTheAuthority) {
+TEST(HttpUrl, FormatsTheAuthority) {
     EXPECT_EQ(HttpUrl::parse("https://web1/x")->authority(), "web1:443");
     EXPECT_EQ(HttpUrl::parse("http://[::1]:8080/")->authority(), "[::1]:8080");
 }

@@ -30,7 +30,7 @@ std::vector<std::string> refused(const std::string& text) {
     return problems == nullptr ? std::vector<std::string>{} : *problems;
 }
 
-TEST(SinkReader, ASinkIsCalledByItsTargetOrAsTheFileSays) {
+TEST(SinkReader, ASinkIsNamedAfterItsTargetOrByTheFile) {
     const auto sinks = accepted(R"(
 [[sink]]
 type = "jsonl"
@@ -91,7 +91,7 @@ TEST(SinkReader, RefusesUnusablePathsAndNames) {
             "control characters"));
 }
 
-TEST(SinkReader, NoTwoSinksHaveTheSameTargetOrName) {
+TEST(SinkReader, RefusesSinksWithTheSameTargetOrName) {
     EXPECT_THAT(refused(R"([[sink]]
 type = "jsonl"
 path = "-"
@@ -207,7 +207,7 @@ ca_file = true
             "zrm.toml:17: sink.ca_file: is a boolean; write a text in quotes"));
 }
 
-TEST(SinkReader, TwoSinksAtOneHostNeedNames) {
+TEST(SinkReader, TwoSinksWithOneHostNeedNames) {
     const std::string two = "[[sink]]\ntype = 'webhook'\nurl = 'http://web1/a'\n"
                             "[[sink]]\ntype = 'webhook'\nurl = 'http://web1/b'\n";
     EXPECT_THAT(refused(two), ElementsAre("zrm.toml:4: sink.name: the sink at line 1 is called "

@@ -28,7 +28,7 @@ TEST(SinkTypes, FindsTypesByName) {
     EXPECT_EQ(SinkTypes::find("kafka"), nullptr);
 }
 
-TEST(SinkTypes, TheTargetIsARequiredOptionAndNoOptionStandsTwice) {
+TEST(SinkTypes, TheTargetIsARequiredOptionAndNoOptionOccursTwice) {
     for (const SinkType& type : SinkTypes::all()) {
         std::set<std::string_view> names;
         for (const SinkOption& option : SinkTypes::common()) {

@@ -30,7 +30,7 @@ std::vector<std::string> fieldsOf(const SituationText& text) {
     return fields;
 }
 
-TEST(SituationValidator, KeepsWhatWasWrittenAndMakesConditionsOfIt) {
+TEST(SituationValidator, KeepsTheTextAndBuildsConditions) {
     SituationText text = named("ssh");
     text.text = "Failed logins";
     text.severity = "major";
@@ -56,7 +56,7 @@ TEST(SituationValidator, KeepsWhatWasWrittenAndMakesConditionsOfIt) {
     EXPECT_EQ(situation.conditions.back().number, 60);
 }
 
-TEST(SituationValidator, ANameIsEnough) {
+TEST(SituationValidator, OnlyANameIsRequired) {
     SituationConfig situation;
     EXPECT_THAT(SituationValidator::check(named("a"), situation), IsEmpty());
     EXPECT_EQ(situation.severity, "warning");
@@ -64,7 +64,7 @@ TEST(SituationValidator, ANameIsEnough) {
     EXPECT_FALSE(situation.log);
 }
 
-TEST(SituationValidator, KnowsTheLimitsOfNames) {
+TEST(SituationValidator, ChecksTheLimitsOfNames) {
     EXPECT_THAT(fieldsOf(named(std::string(128, 'n'))), IsEmpty());
     EXPECT_THAT(fieldsOf(named("a/b '\"<>&%\\ \xc3\xa4")), IsEmpty());
     EXPECT_THAT(fieldsOf(named("...")), IsEmpty());
@@ -76,7 +76,7 @@ TEST(SituationValidator, KnowsTheLimitsOfNames) {
     EXPECT_THAT(fieldsOf(SituationText()), ElementsAre("name"));
 }
 
-TEST(SituationValidator, KnowsTheLimitsOfTextAndConditions) {
+TEST(SituationValidator, ChecksTheLimitsOfTextAndConditions) {
     SituationText text = named("a");
     text.text = std::string(1024, 't');
     text.when.assign(100, "ENTRYSRC = 'x'");
@@ -86,12 +86,12 @@ TEST(SituationValidator, KnowsTheLimitsOfTextAndConditions) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("text", "when"));
     text.text.reset();
     text.when.assign(16, std::string(4096, 'x'));
-    EXPECT_EQ(fieldsOf(text).size(), 16u) << "each is looked at";
+    EXPECT_EQ(fieldsOf(text).size(), 16u) << "each is checked";
     text.when.emplace_back("x");
     EXPECT_THAT(fieldsOf(text), ElementsAre("when"));
 }
 
-TEST(SituationValidator, NamesEveryProblemWithItsPlace) {
+TEST(SituationValidator, ReportsEveryProblemWithItsPlace) {
     SituationText text;
     text.severity = "fatal";
     text.log = "auth.log";
@@ -105,7 +105,7 @@ TEST(SituationValidator, NamesEveryProblemWithItsPlace) {
     EXPECT_THAT(problems[3].cure, HasSubstr("the columns are ORIGINNODE, "));
 }
 
-TEST(SituationValidator, ThresholdsStandInOnePlaceOnly) {
+TEST(SituationValidator, ThresholdsMayBeGivenOnlyOnce) {
     SituationText text = named("a");
     text.when = {"FREQTHRESH >= 5", "PERIODTHRS = 60"};
     EXPECT_THAT(fieldsOf(text), IsEmpty());
@@ -115,7 +115,7 @@ TEST(SituationValidator, ThresholdsStandInOnePlaceOnly) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("frequency"));
 }
 
-TEST(SituationValidator, RegularExpressionsHaveALimitAloneAndTogether) {
+TEST(SituationValidator, RegularExpressionsAreLimitedAloneAndTogether) {
     const auto problemsOf = [](const char* pattern, std::size_t times) {
         SituationText text = named("a");
         text.when.assign(times, std::string("ENTRYDESC matches '") + pattern + "'");

@@ -24,7 +24,7 @@ TEST(Thresholds, AFrequencyIsAConditionWithItsOperator) {
     check("< 2", 5, 2);
 }
 
-TEST(Thresholds, RefusesFrequenciesThatAreNoneOrWouldNotBeInForce) {
+TEST(Thresholds, RefusesFrequenciesThatAreInvalidOrWouldHaveNoEffect) {
     for (const char* const text :
          {"", "5", "= 5", "!= 5", ">=", ">= five", ">= 5 ", "> -1", ">= 0", "<= 0", "< 1",
           ">= 2147483647", ">= 99999999999999999999", " >= 5", ">= +5", ">= 5x"}) {
@@ -32,7 +32,7 @@ TEST(Thresholds, RefusesFrequenciesThatAreNoneOrWouldNotBeInForce) {
     }
 }
 
-TEST(Thresholds, APeriodIsItsSeconds) {
+TEST(Thresholds, APeriodIsInSeconds) {
     const auto seconds = [](const char* text) {
         const std::optional<Condition> condition = Thresholds::period(text);
         EXPECT_TRUE(!condition || (condition->column == "PERIODTHRS" &&

@@ -1,6 +1,5 @@
 #include "host/console/ConsoleResource.h"
 
-#include "host/console/ConsoleFile.h"
 #include "unit/host/http/TestRouter.h"
 
 #include <gmock/gmock.h>
@@ -25,7 +24,7 @@ protected:
     TestRouter router{resource};
 };
 
-TEST_F(ConsoleResourceTest, AnswersThePage) {
+TEST_F(ConsoleResourceTest, ServesThePage) {
     const HttpAnswer answer = router.ask("GET", "/");
     EXPECT_EQ(answer.status, 200);
     EXPECT_EQ(answer.contentType, "text/html; charset=utf-8");
@@ -33,7 +32,7 @@ TEST_F(ConsoleResourceTest, AnswersThePage) {
     EXPECT_EQ(answer.body, ConsoleFile::find("index.html")->content);
 }
 
-TEST_F(ConsoleResourceTest, SaysWhatEachFileIs) {
+TEST_F(ConsoleResourceTest, SendsTheContentTypeOfEachFile) {
     const std::vector<std::pair<std::string, std::string>> files = {
         {"index.html", "text/html; charset=utf-8"},
         {"console.css", "text/css; charset=utf-8"},
@@ -50,7 +49,7 @@ TEST_F(ConsoleResourceTest, SaysWhatEachFileIs) {
     }
 }
 
-TEST_F(ConsoleResourceTest, LetsFilesOfItsOwnAloneRun) {
+TEST_F(ConsoleResourceTest, AllowsOnlyItsOwnScripts) {
     for (const char* const path : {"/", "/console/main.js", "/console/icon.svg"}) {
         const HttpAnswer answer = router.ask("GET", path);
         EXPECT_THAT(answer.headers,
@@ -66,7 +65,7 @@ TEST_F(ConsoleResourceTest, LetsFilesOfItsOwnAloneRun) {
     }
 }
 
-TEST_F(ConsoleResourceTest, RefusesWhatItDoesNotHave) {
+TEST_F(ConsoleResourceTest, RefusesUnknownFiles) {
     for (const char* const path :
          {"/console/none.js", "/console/views", "/console/views/", "/console/../main.js",
           "/console//main.js", "/console/Main.js", "/console/main.js/"}) {

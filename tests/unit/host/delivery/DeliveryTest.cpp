@@ -74,7 +74,7 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEventWithAndWithoutAHistory) {
     }
 }
 
-TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
+TEST_F(DeliveryTest, ReportsWhatWasNotDelivered) {
     const std::string good = directory.file("good.jsonl");
     const HostConfig used = configFor({"/dev/full", good}, false);
     Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
@@ -88,7 +88,7 @@ TEST_F(DeliveryTest, SaysWhatWasNotDelivered) {
     EXPECT_EQ(lines(good), 2);
 }
 
-TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
+TEST_F(DeliveryTest, ASinkThatIsDownDelaysNeitherTheOthersNorTheQueue) {
     const std::string good = directory.file("good.jsonl");
     const HostConfig used = configFor({"/dev/full", good});
     Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
@@ -113,13 +113,13 @@ TEST_F(DeliveryTest, ASinkThatIsDownHoldsUpNeitherTheOthersNorTheQueue) {
                   "again\n");
 }
 
-TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
+TEST_F(DeliveryTest, ASinkThatHangsAtTheStopLeavesTheOthersTheirTime) {
     const std::string later = directory.file("later/events.jsonl");
     const HostConfig used = configFor({"/dev/full", later});
     Delivery delivery(used, testLayout(), sizeof(TestRow), openHistory(used));
     delivery.start();
     push(delivery, "a");
-    // Both fail, with pauses that have grown.
+    // Both fail, and their pauses have grown.
     const auto limit = Clock::now() + 20s;
     while (delivery.sinkStates()[1].retryIn.value_or(0ms) < 2s && Clock::now() < limit) {
         std::this_thread::sleep_for(1ms);
@@ -133,7 +133,7 @@ TEST_F(DeliveryTest, ASinkThatHangsAtTheEndLeavesTheOthersTheirTime) {
     EXPECT_EQ(lines(later), 1);
 }
 
-TEST_F(DeliveryTest, WithoutADirectoryForTheHistoryItGoesOnWithoutOne) {
+TEST_F(DeliveryTest, WithoutADirectoryItRunsWithoutAHistory) {
     const std::string output = directory.file("events.jsonl");
     HostConfig config = configFor({output});
     config.history.directory = directory.file("no/such");

@@ -26,14 +26,14 @@ using namespace std::chrono_literals;
 using Clock = EventQueue::Clock;
 using testing::ElementsAre;
 
-/// What a test sink does and has seen; shared with the sink, which its thread owns.
+/// What a test sink does and has seen; shared with the sink, which belongs to its thread.
 struct TestState {
     std::atomic<int> failures{0};         ///< deliveries that still fail; -1: all
     std::atomic<std::size_t> taken{1000}; ///< events that a failing delivery takes
     std::atomic<bool> throws{false};      ///< a failing delivery throws
-    std::atomic<bool> waits{false};     ///< a delivery waits until it is told to give up, and fails
-    std::atomic<bool> isWaiting{false}; ///< one does
-    std::atomic<Clock::time_point> waitsSince{}; ///< the beginning of time: it does not wait
+    std::atomic<bool> waits{false};       ///< a delivery waits until it is to give up, and fails
+    std::atomic<bool> isWaiting{false};   ///< one is waiting
+    std::atomic<Clock::time_point> waitsSince{}; ///< the epoch: it does not wait
     std::mutex mutex;
     std::vector<std::uint64_t> ids;
     std::vector<Clock::time_point> tries;
@@ -110,13 +110,13 @@ protected:
 
 TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
     thread.start();
-    push(250); // more than the queue holds
+    push(250); // more than fits into the queue
     EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
     EXPECT_EQ(state->seen(), upTo(250));
     EXPECT_THAT(trace.messages(), ElementsAre());
 }
 
-TEST_F(SinkThreadTest, AReaderThatTakesNothingForSomeSecondsIsAFailure) {
+TEST_F(SinkThreadTest, AReaderThatTakesNothingForSecondsIsAFailure) {
     thread.start();
     state->waitsSince = Clock::now();
     EXPECT_NE(thread.state().condition, SinkState::Condition::FAILING);
@@ -141,7 +141,7 @@ TEST_F(SinkThreadTest, DeliversAtOnce) {
     EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
 }
 
-TEST_F(SinkThreadTest, TriesAgainAfterGrowingPausesWhereItBrokeOff) {
+TEST_F(SinkThreadTest, RetriesAfterGrowingPausesFromWhereItStopped) {
     state->failures = 3;
     state->taken = 2;
     thread.start();
@@ -167,7 +167,7 @@ TEST_F(SinkThreadTest, ThePausesGrowWhileNothingIsDelivered) {
     EXPECT_GE(state->tries[3] - state->tries[2], 300ms);
 }
 
-TEST_F(SinkThreadTest, ADeliveryThatTheEndBreaksOffIsNotTriedAgain) {
+TEST_F(SinkThreadTest, ADeliveryInterruptedByTheStopIsNotRetried) {
     state->waits = true;
     thread.start();
     push(3);
@@ -175,11 +175,11 @@ TEST_F(SinkThreadTest, ADeliveryThatTheEndBreaksOffIsNotTriedAgain) {
         std::this_thread::sleep_for(1ms);
     }
     EXPECT_EQ(thread.finish(Clock::now()), 3u);
-    EXPECT_THAT(trace.messages(), ElementsAre()) << "there is no other try to announce";
+    EXPECT_THAT(trace.messages(), ElementsAre()) << "there is no retry to announce";
     EXPECT_EQ(thread.state().error, "no room");
 }
 
-TEST_F(SinkThreadTest, ASinkThatThrowsHasFailed) {
+TEST_F(SinkThreadTest, AnExceptionIsAFailure) {
     state->failures = 2;
     state->throws = true;
     thread.start();
@@ -204,7 +204,7 @@ TEST_F(SinkThreadTest, FinishGivesUpAtTheLimitAndCountsWhatIsLeft) {
     EXPECT_FALSE(queue.push(label, "1234567"));
 }
 
-TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
+TEST_F(SinkThreadTest, FinishRetriesSoonHoweverLongThePauseHasGrown) {
     state->failures = -1;
     state->taken = 0;
     push(2);
@@ -216,7 +216,7 @@ TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
     while (tries() < 3) {
         std::this_thread::sleep_for(1ms);
     }
-    // A pause of 400 ms runs; the end does not wait for it.
+    // A pause of 400 ms is in progress; finish does not wait for it.
     state->failures = 0;
     const auto begin = Clock::now();
     EXPECT_EQ(thread.finish(begin + 10s), 0u);
@@ -224,14 +224,14 @@ TEST_F(SinkThreadTest, FinishTriesAgainSoonWhateverThePauseHasGrownTo) {
     EXPECT_EQ(state->seen(), upTo(2));
 }
 
-TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
+TEST_F(SinkThreadTest, AFailingSinkDoesNotDelayAnother) {
     auto otherState = std::make_shared<TestState>();
     SinkThread other(source(), std::make_unique<TestSink>(otherState), "jsonl");
     state->failures = -1;
     state->taken = 0;
     thread.start();
     other.start();
-    push(100); // all that the queue holds
+    push(100); // fills the queue
     const auto limit = Clock::now() + 10s;
     while (otherState->seen().size() < 100 && Clock::now() < limit) {
         std::this_thread::sleep_for(1ms);
@@ -241,7 +241,7 @@ TEST_F(SinkThreadTest, ASinkThatFailsDoesNotHoldAnotherUp) {
     EXPECT_EQ(other.finish(Clock::now() + 10s), 0u);
 }
 
-TEST_F(SinkThreadTest, TellsHowItStands) {
+TEST_F(SinkThreadTest, ReportsItsState) {
     EXPECT_STREQ(thread.state().conditionName(), "starting");
     EXPECT_EQ(thread.state().name, "test");
     EXPECT_EQ(thread.state().type, "jsonl");
@@ -252,8 +252,8 @@ TEST_F(SinkThreadTest, TellsHowItStands) {
     state->taken = 2;
     thread.start();
     const auto limit = Clock::now() + 10s;
-    // Two of five, then two of three; the last is one of one, of which a failing delivery takes
-    // none.
+    // Two of five, then two of three; the last delivery has one event, of which a failing one
+    // takes none.
     while ((thread.state().delivered < 4 || !thread.state().retryIn) && Clock::now() < limit) {
         std::this_thread::sleep_for(1ms);
     }
@@ -274,7 +274,7 @@ TEST_F(SinkThreadTest, TellsHowItStands) {
     EXPECT_EQ(up.retryIn, std::nullopt);
 }
 
-TEST_F(SinkThreadTest, EndsWithoutHavingBeenFinished) {
+TEST_F(SinkThreadTest, EndsWithoutFinish) {
     thread.start();
     push(1);
 }

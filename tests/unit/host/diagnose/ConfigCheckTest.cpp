@@ -38,7 +38,7 @@ TEST_F(ConfigCheckTest, AnEmptyTextHasNoLines) {
     EXPECT_EQ(result.refused, 0U);
 }
 
-TEST_F(ConfigCheckTest, JudgesEveryLineUnderItsNumber) {
+TEST_F(ConfigCheckTest, GivesEachLineItsNumberAndVerdict) {
     const std::string other = m_directory.write("other.log", "");
     const ConfigCheck::Result result = ConfigCheck::check(
         "# logs\n\n   \n" + m_path + "\n  " + other + " ;Y ;S\nrelative.log\n  # no comment\n");
@@ -57,7 +57,7 @@ TEST_F(ConfigCheckTest, JudgesEveryLineUnderItsNumber) {
     EXPECT_EQ(result.lines[4].reason, "");
 }
 
-TEST_F(ConfigCheckTest, SaysWhatTheAgentSays) {
+TEST_F(ConfigCheckTest, ReportsTheAgentsOwnMessages) {
     const ConfigCheck::Line relative = judge("relative.log ;N ;S");
     EXPECT_EQ(relative.reason, "Absolute path name of log file must be specified for log . "
                                "Ignoring remainder of line.");
@@ -70,7 +70,7 @@ TEST_F(ConfigCheckTest, SaysWhatTheAgentSays) {
     EXPECT_EQ(judge(m_path + " ;N ;E").reason, "Errlogs are valid only on AIX.  Ignoring line.");
 }
 
-TEST_F(ConfigCheckTest, AMissingFileIsTheFilesFault) {
+TEST_F(ConfigCheckTest, AMissingFileIsReportedAsAFileError) {
     const ConfigCheck::Line line = judge("/none/such.log");
     EXPECT_EQ(line.verdict, Verdict::REFUSED);
     EXPECT_EQ(line.cause, Cause::FILE);
@@ -84,7 +84,7 @@ TEST_F(ConfigCheckTest, AMissingFileIsTheFilesFault) {
     EXPECT_THAT(old.reason, HasSubstr("1970"));
 }
 
-TEST_F(ConfigCheckTest, ALineHasItsLengthWithTheNameInThePlacesForIt) {
+TEST_F(ConfigCheckTest, ALinesLengthIncludesTheExpandedNames) {
     std::string format = "A , \"";
     for (int i = 0; i < 200; ++i) {
         format += "${@}";
@@ -99,7 +99,7 @@ TEST_F(ConfigCheckTest, ALineHasItsLengthWithTheNameInThePlacesForIt) {
     EXPECT_EQ(judge(m_path + R"( ;N ;U ;A , "${@} %s" , type)").verdict, Verdict::ACCEPTED);
 }
 
-TEST_F(ConfigCheckTest, ANameThatItsConversionChangesIsRefused) {
+TEST_F(ConfigCheckTest, ANameThatConversionWouldChangeIsRefused) {
     // A damaged character becomes a longer one, and the name is cut where the room ends.
     m_directory.write("caf", "");
     const ConfigCheck::Line line = judge(m_directory.write("caf\xE9", ""));
@@ -107,7 +107,7 @@ TEST_F(ConfigCheckTest, ANameThatItsConversionChangesIsRefused) {
     EXPECT_THAT(line.reason, HasSubstr("is not kept by a conversion"));
 }
 
-TEST_F(ConfigCheckTest, AFileOutsideTheDirectoriesIsNotLookedAt) {
+TEST_F(ConfigCheckTest, AFileOutsideTheDirectoriesIsNotExamined) {
     const std::string directory = m_directory.path().string() + "/";
     std::filesystem::create_directory(directory + "sub");
     m_directory.write("sub/app.log", "");
@@ -161,7 +161,7 @@ TEST_F(ConfigCheckTest, AFormatThatCannotBeLearnedIsRefused) {
     EXPECT_EQ(judge(m_path + R"( ;N ;U ;A , "%s" , type)").verdict, Verdict::ACCEPTED);
 }
 
-TEST_F(ConfigCheckTest, SaysWhichLinesTheAgentPassesOver) {
+TEST_F(ConfigCheckTest, ReportsTheLinesThatTheAgentSkips) {
     const ConfigCheck::Result last = ConfigCheck::check(m_path);
     EXPECT_EQ(last.lines[0].verdict, Verdict::REFUSED);
     EXPECT_THAT(last.lines[0].reason, HasSubstr("without a newline"));
@@ -173,7 +173,7 @@ TEST_F(ConfigCheckTest, SaysWhichLinesTheAgentPassesOver) {
     EXPECT_EQ(judge(m_path + std::string(1023 - m_path.size(), ' ')).verdict, Verdict::REFUSED);
 }
 
-TEST_F(ConfigCheckTest, TheTailOfALongCommentIsALine) {
+TEST_F(ConfigCheckTest, TheRestOfALongCommentIsALine) {
     const ConfigCheck::Result result =
         ConfigCheck::check("#" + std::string(1022, '#') + m_path + "\n" + m_path + "\n");
     EXPECT_EQ(result.lines[0].verdict, Verdict::ACCEPTED);
@@ -181,7 +181,7 @@ TEST_F(ConfigCheckTest, TheTailOfALongCommentIsALine) {
     EXPECT_EQ(result.lines[1].verdict, Verdict::REFUSED);
 }
 
-TEST_F(ConfigCheckTest, ANulCharacterTakesTheNextLineWithIt) {
+TEST_F(ConfigCheckTest, ANulCharacterJoinsTheNextLine) {
     const std::string nul(1, '\0');
     const ConfigCheck::Result result =
         ConfigCheck::check(m_path + nul + "\n" + m_path + "\n" + m_path + "\n");

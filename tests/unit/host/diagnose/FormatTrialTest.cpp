@@ -57,7 +57,7 @@ TEST(FormatTrial, DescribesTheDirectives) {
     EXPECT_EQ(trial.result().directives[2].column, "ENTRYTYPE");
 }
 
-TEST(FormatTrial, GivesTheConfigurationLine) {
+TEST(FormatTrial, ReturnsTheConfigurationLine) {
     EXPECT_EQ(FormatTrial("  A , \"%s\" , type", "/var/log/x.log").result().configurationLine,
               "/var/log/x.log ;N ;U ;A , \"%s\" , type");
     EXPECT_EQ(FormatTrial("A").result().configurationLine, "");
@@ -69,7 +69,7 @@ struct Refused {
     const char* reason; ///< a part of it
 };
 
-TEST(FormatTrial, SaysWhyAndWhereAFormatIsRefused) {
+TEST(FormatTrial, ReportsWhyAndWhereAFormatIsRefused) {
     const Refused cases[] = {
         {"", 0, "Scan for start of format specifier failed"},
         {"B , \"%s\" , type", 0, "Scan for start of format specifier failed"},
@@ -118,7 +118,7 @@ TEST(FormatTrial, TheConfigurationLineMayBeTooLong) {
     EXPECT_THAT(trial.result().reason, HasSubstr("1023 characters"));
 }
 
-TEST(FormatTrial, IsMeasuredWithTheNameInThePlacesForIt) {
+TEST(FormatTrial, ItsLengthIncludesTheExpandedNames) {
     const std::string name = "/" + std::string(399, 'x');
     EXPECT_TRUE(FormatTrial("A , \"${@}${@} %s\" , type", "/" + std::string(99, 'x')).isAccepted());
     const FormatTrial trial("A , \"${@}%s${@}%s${@}\" , type type", name);
@@ -128,7 +128,7 @@ TEST(FormatTrial, IsMeasuredWithTheNameInThePlacesForIt) {
               "characters; it may have 1022. Write the name in fewer places.");
 }
 
-TEST(FormatTrial, TakesNoMemoryForANameInManyPlaces) {
+TEST(FormatTrial, ManyNamesTakeNoMemory) {
     std::string format = "A , \"";
     for (int i = 0; i < 250'000; ++i) {
         format += "${@}";
@@ -140,7 +140,7 @@ TEST(FormatTrial, TakesNoMemoryForANameInManyPlaces) {
         HasSubstr("would have"));
 }
 
-TEST(FormatTrial, GivesFieldsAndRowOfALineThatFits) {
+TEST(FormatTrial, ReturnsFieldsAndRowOfALineThatFits) {
     const std::string text = "2026-11-20 07:03:09 ERROR payment: Card declined";
     const FormatTrial::Line line = only(payment, text);
     EXPECT_TRUE(line.matched);
@@ -164,7 +164,7 @@ TEST(FormatTrial, GivesFieldsAndRowOfALineThatFits) {
     EXPECT_EQ(row["UENTRYDESC"], "Card declined");
 }
 
-TEST(FormatTrial, ValuesAreThoseOfTheColumns) {
+TEST(FormatTrial, ValuesAreThoseInTheColumns) {
     const FormatTrial::Line line =
         only(R"(A , "%d %*s %s" , class = "pid %05d" description)", "42 skipped 17\u00e9");
     ASSERT_THAT(line.fields, SizeIs(2));
@@ -183,7 +183,7 @@ struct Unfit {
     const char* reason;
 };
 
-TEST(FormatTrial, SaysWhereALineStopsFitting) {
+TEST(FormatTrial, ReportsWhereALineStopsFitting) {
     const Unfit cases[] = {
         {"%d-%d", "12 13", 2, 1, "The text \"-\" of the format does not stand here."},
         {"%d-%d", "12-x", 3, 1, "A number for %d is expected here."},
@@ -218,14 +218,14 @@ TEST(FormatTrial, ALineThatFitsMayHaveABadTime) {
     EXPECT_EQ(line.reason, "Error: invalid month found in event entrytime; 'Foo'");
 }
 
-TEST(FormatTrial, AFormatThatPrintsNothingGivesNoRow) {
+TEST(FormatTrial, AFormatThatPrintsNothingYieldsNoRow) {
     const FormatTrial::Line line = only(R"(A , "%*s" ,)", "word");
     EXPECT_FALSE(line.matched);
     EXPECT_EQ(line.failedAt, std::nullopt);
     EXPECT_EQ(line.reason, "The format prints no field, so that no line gives a row.");
 }
 
-TEST(FormatTrial, ALongLineIsSeveral) {
+TEST(FormatTrial, ALongLineIsReadAsSeveral) {
     const FormatTrial::Result result = FormatTrial::run(
         R"(A , "%s" , description)", {std::string(2046, 'x'), std::string(5000, 'y')});
     ASSERT_THAT(result.lines, SizeIs(4));
@@ -242,7 +242,7 @@ TEST(FormatTrial, CountsCoverage) {
     EXPECT_DOUBLE_EQ(FormatTrial::percent(FormatTrial::run(R"(A , "%d" , day)", {})), 0.0);
 }
 
-TEST(FormatTrial, PlacesOfALineThatIsNoUtf8AreThoseOfWhatIsShown) {
+TEST(FormatTrial, PositionsInALineThatIsNotUtf8ReferToTheShownText) {
     const std::string json =
         FormatTrial::json(FormatTrial::run(R"(A , "%s %d" , type day)", {"\xe9\xe9 x"}));
     EXPECT_THAT(json, HasSubstr("\"line\":\"\uFFFD\uFFFD x\""));

@@ -27,20 +27,20 @@ protected:
     TemporaryDirectory m_directory;
 };
 
-TEST_F(LastLinesTest, GivesTheLastOnesInTheirOrder) {
+TEST_F(LastLinesTest, ReturnsTheLastLinesInOrder) {
     EXPECT_THAT(read("one\ntwo\nthree\n", 2), Optional(ElementsAre("two", "three")));
     EXPECT_THAT(read("one\ntwo\nthree\n", 3), Optional(ElementsAre("one", "two", "three")));
     EXPECT_THAT(read("one\ntwo\nthree\n", 9), Optional(ElementsAre("one", "two", "three")));
 }
 
-TEST_F(LastLinesTest, GivesALastLineWithoutItsEndAndEmptyLines) {
+TEST_F(LastLinesTest, ReturnsEmptyLinesAndALastLineWithoutNewline) {
     EXPECT_THAT(read("one\ntwo", 2), Optional(ElementsAre("one", "two")));
     EXPECT_THAT(read("one\n\n", 2), Optional(ElementsAre("one", "")));
     EXPECT_THAT(read("\n", 2), Optional(ElementsAre("")));
     EXPECT_THAT(read("", 2), Optional(IsEmpty()));
 }
 
-TEST_F(LastLinesTest, ReadsNoMoreThanItsLimitAndNoBrokenLine) {
+TEST_F(LastLinesTest, ReadsNoMoreThanItsLimitAndOnlyWholeLines) {
     const std::string line(1023, 'x');
     std::string text;
     for (int i = 0; i < 5000; ++i) {
@@ -48,13 +48,13 @@ TEST_F(LastLinesTest, ReadsNoMoreThanItsLimitAndNoBrokenLine) {
     }
     const auto lines = read("y" + text, 5000);
     ASSERT_TRUE(lines);
-    EXPECT_EQ(lines->size(), LastLines::defaultMostBytes / 1024 - 1);
+    EXPECT_EQ(lines->size(), LastLines::defaultByteLimit / 1024 - 1);
     for (const std::string& one : *lines) {
         ASSERT_EQ(one, line);
     }
 }
 
-TEST_F(LastLinesTest, SaysWhyAFileCannotBeRead) {
+TEST_F(LastLinesTest, ReportsWhyAFileCannotBeRead) {
     EXPECT_EQ(LastLines::read(-1, 1), std::nullopt);
     EXPECT_EQ(errno, EBADF);
 }

@@ -55,7 +55,7 @@ protected:
     std::string m_path = m_directory.write("app.log", "");
 };
 
-TEST_F(LogWarningsTest, TheNameOfAnOpenFileIsLookedAt) {
+TEST_F(LogWarningsTest, ChecksTheNameOfAnOpenFile) {
     LogLedgerView log = opened();
     EXPECT_THAT(kindsOf(log), IsEmpty());
     std::filesystem::rename(m_path, m_directory.file("app.log.1"));
@@ -67,7 +67,7 @@ TEST_F(LogWarningsTest, TheNameOfAnOpenFileIsLookedAt) {
     EXPECT_THAT(kindsOf(log), IsEmpty());
 }
 
-TEST_F(LogWarningsTest, ASyslogFileMostOfWhoseEntriesHaveNoTimeIsOfAnotherForm) {
+TEST_F(LogWarningsTest, WarnsAboutASyslogFileWithoutTimes) {
     LogLedgerView log = opened();
     log.rows = 10;
     log.withoutTime = 5;
@@ -78,7 +78,7 @@ TEST_F(LogWarningsTest, ASyslogFileMostOfWhoseEntriesHaveNoTimeIsOfAnotherForm) 
     EXPECT_THAT(kindsOf(log), IsEmpty()) << "a format may have no time";
 }
 
-TEST_F(LogWarningsTest, AccountingFilesConsistOfRecords) {
+TEST_F(LogWarningsTest, WarnsAboutAFileWithoutAccountingRecords) {
     const std::time_t now = std::time(nullptr);
     EXPECT_EQ(accounting(""), "");
     EXPECT_EQ(accounting(record(now, "root") + record(now - 100, "")), "");
@@ -101,7 +101,7 @@ TEST_F(LogWarningsTest, AccountingFilesConsistOfRecords) {
     EXPECT_THAT(accounting(linux), HasSubstr("cannot be such records"));
 }
 
-TEST_F(LogWarningsTest, SyslogFilesHaveTimes) {
+TEST_F(LogWarningsTest, WarnsAboutAFileWithoutSyslogTimes) {
     const std::string iso = "2026-11-20T07:03:09.412000+01:00 web1 cron[1]: text\n";
     EXPECT_EQ(syslog(""), "");
     EXPECT_EQ(syslog("\n\n"), "");

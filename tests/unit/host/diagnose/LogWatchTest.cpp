@@ -67,7 +67,7 @@ protected:
     }};
 };
 
-TEST_F(LogWatchTest, LooksAtMostOnceInItsInterval) {
+TEST_F(LogWatchTest, ChecksAtMostOncePerInterval) {
     for (int i = 0; i < 5; ++i) {
         m_watch.tick(m_now, [this] {
             ++m_looks;
@@ -77,7 +77,7 @@ TEST_F(LogWatchTest, LooksAtMostOnceInItsInterval) {
     EXPECT_EQ(m_looks, 1);
 }
 
-TEST_F(LogWatchTest, KeepsAWarningAsLongAsItHoldsAndSaysItOnce) {
+TEST_F(LogWatchTest, KeepsAWarningAsLongAsItAppliesAndReportsItOnce) {
     EXPECT_THAT(m_watch.all(), IsEmpty());
     std::filesystem::rename(m_path, m_directory.file("app.log.1"));
     ASSERT_TRUE(waitFor(1));

@@ -40,7 +40,7 @@ TEST_F(MonitoredLogFileTest, OpensTheFileThatTheMonitorHas) {
     EXPECT_EQ(status.st_size, 5);
 }
 
-TEST_F(MonitoredLogFileTest, OpensNoOtherFileOfTheName) {
+TEST_F(MonitoredLogFileTest, DoesNotOpenAnotherFileOfTheSameName) {
     const FileIdentity monitored = identityOf(m_log);
     const std::string another = "the log cannot be read: another file now has its name, and its "
                                 "monitor reads the one that had the name before";
@@ -56,7 +56,7 @@ TEST_F(MonitoredLogFileTest, OpensNoOtherFileOfTheName) {
     EXPECT_EQ(problem(monitored), "") << "a link to the log itself";
 }
 
-TEST_F(MonitoredLogFileTest, FollowsNoLinkOfALogThatNoMonitorHasOpen) {
+TEST_F(MonitoredLogFileTest, DoesNotFollowALinkWhenNoMonitorHasTheFileOpen) {
     EXPECT_EQ(problem(std::nullopt), "");
     std::filesystem::remove(m_log);
     std::filesystem::create_symlink(m_secret, m_log);
@@ -64,7 +64,7 @@ TEST_F(MonitoredLogFileTest, FollowsNoLinkOfALogThatNoMonitorHasOpen) {
                                      "monitor has its file open");
 }
 
-TEST_F(MonitoredLogFileTest, OpensRegularFilesAloneAndWaitsForNoPipe) {
+TEST_F(MonitoredLogFileTest, OpensOnlyRegularFilesWithoutWaitingForPipes) {
     std::filesystem::remove(m_log);
     ASSERT_EQ(mkfifo(m_log.c_str(), 0600), 0);
     EXPECT_EQ(problem(std::nullopt), "the log cannot be read: it is not a regular file");

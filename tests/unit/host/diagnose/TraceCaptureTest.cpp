@@ -39,7 +39,7 @@ protected:
     std::string m_path = m_directory.file("trace");
 };
 
-TEST_F(TraceCaptureTest, KeepsTheErrorsOfItsThreadAndWritesNone) {
+TEST_F(TraceCaptureTest, CollectsTheErrorsOfItsThreadAndWritesNone) {
     TraceCapture capture;
     speak("one");
     speak("two");
@@ -48,7 +48,7 @@ TEST_F(TraceCaptureTest, KeepsTheErrorsOfItsThreadAndWritesNone) {
     EXPECT_EQ(traced(), "");
 }
 
-TEST_F(TraceCaptureTest, KeepsErrorsAloneWhateverTheLevelsAre) {
+TEST_F(TraceCaptureTest, CollectsOnlyErrorsWhateverTheLevels) {
     for (const char* levels : {"none", "all", "TraceCaptureTest=detail"}) {
         TraceControl::configure(levels);
         TraceCapture capture;
@@ -57,7 +57,7 @@ TEST_F(TraceCaptureTest, KeepsErrorsAloneWhateverTheLevelsAre) {
     }
 }
 
-TEST_F(TraceCaptureTest, OtherThreadsTraceAsAlways) {
+TEST_F(TraceCaptureTest, OtherThreadsTraceAsUsual) {
     const TraceCapture capture;
     std::thread other([] { speak("other"); });
     other.join();
@@ -65,7 +65,7 @@ TEST_F(TraceCaptureTest, OtherThreadsTraceAsAlways) {
     EXPECT_THAT(traced(), testing::Not(testing::HasSubstr("detail")));
 }
 
-TEST_F(TraceCaptureTest, AfterItsEndTheLevelsHoldAgain) {
+TEST_F(TraceCaptureTest, TheLevelsApplyAgainAfterwards) {
     TraceControl::configure("none");
     {
         const TraceCapture capture;
@@ -99,7 +99,7 @@ TEST_F(TraceCaptureTest, OtherThreadsTraceWhileOneIsSilent) {
     EXPECT_THAT(traced(), testing::HasSubstr("error other"));
 }
 
-TEST_F(TraceCaptureTest, ACaptureKeepsTheErrorsOfASilentThread) {
+TEST_F(TraceCaptureTest, ACaptureCollectsTheErrorsOfASilentThread) {
     const TraceSilence silence;
     TraceCapture capture;
     speak("one");

@@ -31,13 +31,13 @@ protected:
     std::string m_gone = m_directory.file("gone.log");
 };
 
-TEST_F(UnmonitoredLogsTest, AConfigurationWhoseLogsAreMonitoredHasNone) {
+TEST_F(UnmonitoredLogsTest, HasNoneWhenAllLogsAreMonitored) {
     EXPECT_THAT(UnmonitoredLogs::find("", {}), IsEmpty());
     EXPECT_THAT(UnmonitoredLogs::find("# none\n\n", {}), IsEmpty());
     EXPECT_THAT(UnmonitoredLogs::find("# one\n\t" + m_there + "\t;N ;S\n", {m_there}), IsEmpty());
 }
 
-TEST_F(UnmonitoredLogsTest, SaysWhyAndKeepsTheNumbersOfTheLines) {
+TEST_F(UnmonitoredLogsTest, ReportsWhyWithTheLineNumber) {
     const std::string text = "# logs\n" + m_there + " ;N ;S\n  " + m_gone +
                              " ;N ;S\nrelative.log\n" + m_directory.path().string() + "\n";
     EXPECT_THAT(
@@ -49,18 +49,18 @@ TEST_F(UnmonitoredLogsTest, SaysWhyAndKeepsTheNumbersOfTheLines) {
                         " file: The file cannot be used: It is not a regular file."));
 }
 
-TEST_F(UnmonitoredLogsTest, ALogThatOnlyWaitsForARefreshIsOneToo) {
+TEST_F(UnmonitoredLogsTest, IncludesALogThatOnlyNeedsARefresh) {
     EXPECT_THAT(describe(UnmonitoredLogs::find(m_there + "\n", {})),
                 ElementsAre("1 " + m_there + " refresh: The agent has not read this line yet."));
 }
 
-TEST_F(UnmonitoredLogsTest, ALogThatARefreshWouldNotTakeUpSaysWhatHelps) {
+TEST_F(UnmonitoredLogsTest, SaysWhatHelpsWhenARefreshWouldNotMonitorALog) {
     const auto logs = UnmonitoredLogs::find(m_there + "\n", {}, true);
     EXPECT_THAT(describe(logs), ElementsAre(testing::StartsWith("1 " + m_there + " touch: ")));
     EXPECT_THAT(logs[0].reason, testing::EndsWith("Touch the configuration, then refresh."));
 }
 
-TEST_F(UnmonitoredLogsTest, ALogIsNamedOnce) {
+TEST_F(UnmonitoredLogsTest, NamesALogOnce) {
     const std::string line = m_gone + " ;N ;S\n";
     EXPECT_THAT(UnmonitoredLogs::find(line + line, {}), SizeIs(1));
     // Its second line is refused, but the log is read.
@@ -74,7 +74,7 @@ TEST_F(UnmonitoredLogsTest, ANameIsAlwaysUtf8) {
     EXPECT_EQ(logs[1].log, "/none/\xEF\xBF\xBD");
 }
 
-TEST_F(UnmonitoredLogsTest, AConfigurationThatCannotBeReadSaysSo) {
+TEST_F(UnmonitoredLogsTest, AnUnreadableConfigurationIsReported) {
     const std::string configuration = m_directory.file("logs.conf");
     ASSERT_EQ(setenv("ZRM_CONFIG_FILE", configuration.c_str(), 1), 0);
     UnmonitoredLogs::Result result = UnmonitoredLogs::read();

@@ -32,7 +32,7 @@ TEST(EventJson, QuotesTheSituation) {
                     R"("LOGNAME":"app.log","TEXT":"","NUMBER":7}})");
 }
 
-TEST(EventJson, NamesTheLogByItsWholePath) {
+TEST(EventJson, NamesTheLogByItsFullPath) {
     TestEvents events;
     events.add("");
     std::string text = "log ";

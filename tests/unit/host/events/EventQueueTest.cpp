@@ -38,7 +38,7 @@ bool push(EventQueue& queue, const std::string& content) {
     return queue.push(label, row(content).data());
 }
 
-TEST(EventQueue, GivesEventsInOrderWithIdsFromOneAndTheirTime) {
+TEST(EventQueue, ReturnsEventsInOrderWithIdsFromOneAndTheirTime) {
     EventQueue queue(4, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     const auto now = [] {
@@ -60,7 +60,7 @@ TEST(EventQueue, GivesEventsInOrderWithIdsFromOneAndTheirTime) {
     EXPECT_LE(events[0].raised, now());
 }
 
-TEST(EventQueue, GivesTheSameEventsUntilTheyAreReleasedAndAtMostAsManyAsAsked) {
+TEST(EventQueue, ReturnsTheSameEventsUntilTheyAreReleasedAndAtMostAsManyAsRequested) {
     EventQueue queue(4, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     for (const char* const content : {"a", "b", "c"}) {
@@ -73,7 +73,7 @@ TEST(EventQueue, GivesTheSameEventsUntilTheyAreReleasedAndAtMostAsManyAsAsked) {
     EXPECT_EQ(queue.backlog(reader), 2u);
 }
 
-TEST(EventQueue, EndsARunAtTheEndOfTheRing) {
+TEST(EventQueue, SplitsAReadAtTheEndOfTheRing) {
     EventQueue queue(3, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     for (const char* const content : {"a", "b"}) {
@@ -89,7 +89,7 @@ TEST(EventQueue, EndsARunAtTheEndOfTheRing) {
     EXPECT_EQ(queue.read(reader, 10).size(), 2u);
 }
 
-TEST(EventQueue, EveryReaderGetsEveryEventFromItsBeginningOn) {
+TEST(EventQueue, EveryReaderGetsEveryEventFromItsRegistrationOn) {
     EventQueue queue(4, rowSize);
     const EventQueue::Reader first = queue.addReader();
     push(queue, "a");
@@ -107,7 +107,7 @@ TEST(EventQueue, WithoutReadersNothingIsKept) {
     }
 }
 
-TEST(EventQueue, WhatOneRowRaisesBeyondTheRingIsKeptInOrder) {
+TEST(EventQueue, EventsOfARowBeyondTheRingAreKeptInOrder) {
     EventQueue queue(2, rowSize);
     const EventQueue::Reader fast = queue.addReader();
     const EventQueue::Reader slow = queue.addReader();
@@ -130,7 +130,7 @@ TEST(EventQueue, WhatOneRowRaisesBeyondTheRingIsKeptInOrder) {
     EXPECT_EQ(queue.backlog(slow), 0u);
 }
 
-TEST(EventQueue, TellsWhenItIsFullAndWhenAQuarterIsFreeAgain) {
+TEST(EventQueue, ReportsWhenItIsFullAndWhenAQuarterIsFreeAgain) {
     EventQueue queue(8, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     std::vector<bool> told;
@@ -141,14 +141,14 @@ TEST(EventQueue, TellsWhenItIsFullAndWhenAQuarterIsFreeAgain) {
     EXPECT_THAT(told, testing::ElementsAre());
     push(queue, "7");
     EXPECT_THAT(told, testing::ElementsAre(true));
-    push(queue, "8"); // aside
+    push(queue, "8"); // kept aside
     queue.release(reader, 2);
     EXPECT_THAT(told, testing::ElementsAre(true));
     queue.release(reader, 1);
     EXPECT_THAT(told, testing::ElementsAre(true, false));
 }
 
-TEST(EventQueue, CloseTakesNothingMoreAndKeepsWhatItHas) {
+TEST(EventQueue, CloseRefusesNewEventsAndKeepsTheOthers) {
     EventQueue queue(1, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     push(queue, "a");
@@ -173,7 +173,7 @@ TEST(EventQueue, CloseReleasesAWaitingReader) {
     EXPECT_EQ(waiting.get(), 0u);
 }
 
-TEST(EventQueue, ManyThreadsKeepTheOrderOfEach) {
+TEST(EventQueue, KeepsTheOrderOfEachThread) {
     constexpr int producers = 4;
     constexpr int each = 300;
     EventQueue queue(8, rowSize);
@@ -214,11 +214,11 @@ TEST(EventQueue, ManyThreadsKeepTheOrderOfEach) {
     }
 }
 
-TEST(EventQueue, LetsEventsGatherForAReaderThatItWakes) {
+TEST(EventQueue, GathersEventsForAWaitingReader) {
     EventQueue queue(400, rowSize);
     const EventQueue::Reader reader = queue.addReader();
-    // A hundred events, a quarter of the room, end the gathering; the first alone does not. A
-    // machine that is busy elsewhere may let the time of gathering pass, but not every time.
+    // A hundred events, a quarter of the capacity, end the wait for more; the first alone does not.
+    // On a busy machine the time for gathering may pass first, but not every time.
     bool gathered = false;
     for (int attempt = 0; attempt < 50 && !gathered; ++attempt) {
         auto woken = std::async(std::launch::async, [&] { return queue.read(reader, 400).size(); });
@@ -232,7 +232,7 @@ TEST(EventQueue, LetsEventsGatherForAReaderThatItWakes) {
     EXPECT_TRUE(gathered);
 }
 
-TEST(EventQueue, GivesASingleEventSoon) {
+TEST(EventQueue, ReturnsASingleEventSoon) {
     EventQueue queue(400, rowSize);
     const EventQueue::Reader reader = queue.addReader();
     auto woken = std::async(std::launch::async, [&] { return queue.read(reader, 400).size(); });

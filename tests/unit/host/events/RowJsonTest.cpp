@@ -56,7 +56,7 @@ TEST(RowJson, ARowWithoutColumnsIsAnEmptyObject) {
     EXPECT_EQ(out, "{}");
 }
 
-TEST(RowJson, EscapesWhatJsonDoesNotAllow) {
+TEST(RowJson, EscapesCharactersThatJsonDoesNotAllow) {
     EXPECT_EQ(jsonText(""), R"("")");
     EXPECT_EQ(jsonText("plain / text ~\x7f"), "\"plain / text ~\x7f\"");
     EXPECT_EQ(jsonText("\"\\\b\f\n\r\t"), R"("\"\\\b\f\n\r\t")");
@@ -65,8 +65,8 @@ TEST(RowJson, EscapesWhatJsonDoesNotAllow) {
     EXPECT_EQ(jsonText("a\xFF\xE2\x82z"), "\"a\uFFFD\uFFFDz\"");
 }
 
-// Each byte at each place of the eight that are examined together.
-TEST(RowJson, EscapesAtEveryPlace) {
+// Each byte at each of the eight positions that are examined together.
+TEST(RowJson, EscapesAtEveryPosition) {
     for (int byte = 0; byte < 128; ++byte) {
         for (std::size_t place = 0; place < 20; ++place) {
             std::string text(20, 'x');
@@ -97,14 +97,14 @@ TEST(RowJson, AgreesWithTheJsonLibraryOnRandomBytes) {
     }
 }
 
-TEST(RowJson, WhatSteersHowTextIsShownIsEscaped) {
+TEST(RowJson, CharactersThatControlHowTextIsShownAreEscaped) {
     std::string text;
     RowJson::appendText(text, "\xc2\x9b"
                               "31m \xe2\x80\xae \xd8\x9c \xe2\x81\xa9 \xc2\xa0 \xe2\x82\xac");
     EXPECT_EQ(text, "\"\\u009b31m \\u202e \\u061c \\u2069 \xc2\xa0 \xe2\x82\xac\"");
 }
 
-TEST(RowJson, ADocumentKeepsItsMeaningWhenItsTextsAreEscaped) {
+TEST(RowJson, EscapingKeepsADocumentsMeaning) {
     EXPECT_EQ(SteeringText::escapedInJson(
                   "{\"a\": \"x\x7f\xc2\x85y\xe2\x80\xa8\xe2\x82\xac\xc3\xa4\"}\n"),
               "{\"a\": \"x\\u007f\\u0085y\\u2028\xe2\x82\xac\xc3\xa4\"}\n");

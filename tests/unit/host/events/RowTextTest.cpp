@@ -35,7 +35,7 @@ TEST_F(RowTextTest, KeepsValidUtf8WhateverTheLocale) {
     EXPECT_EQ(textOf("Grüße €"), "Grüße €");
 }
 
-TEST_F(RowTextTest, ReplacesWhatIsNotText) {
+TEST_F(RowTextTest, ReplacesInvalidBytes) {
     EXPECT_EQ(textOf("a\xFF\xFEz"), "a\uFFFD\uFFFDz") << "in an ASCII locale";
     EXPECT_EQ(textOf("a\xFFz", COLUMN_UTF8), "a\uFFFDz");
     std::setlocale(LC_ALL, "C.UTF-8");
@@ -43,7 +43,7 @@ TEST_F(RowTextTest, ReplacesWhatIsNotText) {
     EXPECT_EQ(textOf(std::string(24, '\xFF')).size(), 72u);
 }
 
-TEST_F(RowTextTest, IsAViewIntoTheRowWhereThatIsEnough) {
+TEST_F(RowTextTest, IsAViewIntoTheRowWherePossible) {
     char row[] = "text    ";
     const RowColumn column{"TEXT", 0, 8, COLUMN_CHARACTER};
     std::string room;

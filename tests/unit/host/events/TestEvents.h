@@ -1,8 +1,8 @@
 #ifndef ZRM_TESTS_TEST_EVENTS_H
 #define ZRM_TESTS_TEST_EVENTS_H
 
+#include "host/events/Event.h"
 #include "host/events/EventJson.h"
-#include "host/events/EventRecord.h"
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "unit/host/framework/TestTable.h"
@@ -25,7 +25,7 @@ inline RowLayout testLayout() {
     return RowLayout(*request.get());
 }
 
-/// Events with rows of the test table, as a queue would give them.
+/// Events with rows of the test table, as a queue would return them.
 class TestEvents {
 public:
     /// Adds the next event; its row has this text.
@@ -53,7 +53,7 @@ public:
         return m_records;
     }
 
-    /// The line that belongs to the event with this id and text.
+    /// The line of the event with this id and text.
     static std::string line(int id, const std::string& text) {
         return R"({"id":)" + std::to_string(id) +
                R"(,"situation":"watch","severity":"minor","raised":"2026-11-20T07:03:09.412Z",)" +

@@ -1,6 +1,6 @@
 #include "framework/locale.h"
 #include "framework/values.h"
-#include "unit/host/framework/AllocationCount.h"
+#include "support/AllocationCount.h"
 #include "unit/host/framework/TestTable.h"
 
 #include <gtest/gtest.h>
@@ -13,7 +13,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// Takes rows without keeping them.
+/// Accepts rows without keeping them.
 class Sink : public RowReceiver {
 public:
     unsigned receive(const ctreq& /*request*/, const char* /*rows*/, unsigned count) override {
@@ -39,9 +39,9 @@ TEST(Allocation, NoneForARowOfASituation) {
     };
     TestRequest request(&detail, &context, &manager);
     TestRow row("/var/log/", "messages", "hello world", 7);
-    int before = 0;
+    long before = 0;
     for (int round = 0; round < 100; ++round) {
-        // The first row compiles the conditions and makes room.
+        // The first row compiles the conditions and allocates the space.
         if (round == 1) {
             before = allocationCount();
         }
@@ -65,7 +65,7 @@ TEST(Allocation, NoneForAConversion) {
                                     nullptr);
     };
     convert(819, "\xE9");
-    const int before = allocationCount();
+    const long before = allocationCount();
     for (int round = 0; round < 100; ++round) {
         ASSERT_EQ(convert(819, "caf\xE9 \xE8 \xFF"), 11);
         ASSERT_EQ(convert(LOC2_UTF8, "plain"), 5);

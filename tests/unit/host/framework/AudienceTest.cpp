@@ -1,8 +1,7 @@
 #include "host/framework/Audience.h"
 
-#include "host/framework/LockGuard.h"
+#include "base/LockGuard.h"
 #include "host/framework/Request.h"
-#include "host/framework/RequestCounts.h"
 #include "unit/host/framework/TestTable.h"
 
 #include <gmock/gmock.h>
@@ -14,6 +13,7 @@
 #include <memory>
 #include <random>
 
+using namespace zrm;
 using namespace zrm::host;
 
 namespace {
@@ -28,7 +28,7 @@ protected:
         std::unique_ptr<Request> request;
     };
 
-    /// Opens a situation; its place among `situations` tells it from the others.
+    /// Opens a situation; its index in `situations` identifies it.
     Situation& open(std::vector<Condition> conditions) {
         RequestDetail detail;
         detail.name = "test";
@@ -40,7 +40,7 @@ protected:
     }
     void close(std::size_t index) { situations[index]->request.reset(); }
 
-    /// The places of the situations that the row is offered to.
+    /// The indices of the situations that the row is offered to.
     std::vector<int> audienceOf(TestRow& row) {
         const LockGuard guard(manager.lock());
         std::vector<int> result;
@@ -72,7 +72,7 @@ TEST_F(AudienceTest, WithoutSituationsIsEmpty) {
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
 }
 
-TEST_F(AudienceTest, HasTheSituationsOfTheLogInTheirOrder) {
+TEST_F(AudienceTest, HasTheSituationsOfTheLogInOrder) {
     open({onLog("messages")});
     open({onLog("syslog")});
     open({});
@@ -104,7 +104,7 @@ TEST_F(AudienceTest, FollowsTheListOfSituations) {
     EXPECT_THAT(audienceOf(row), ElementsAre(0, 1));
     close(0);
     EXPECT_THAT(audienceOf(row), ElementsAre(1));
-    // The new request may take the place of the old one in memory.
+    // The new request may have the address of the old one.
     open({onLog("syslog")});
     EXPECT_THAT(audienceOf(row), ElementsAre(1));
     close(1);
@@ -112,8 +112,8 @@ TEST_F(AudienceTest, FollowsTheListOfSituations) {
     EXPECT_THAT(audienceOf(row), IsEmpty());
 }
 
-TEST_F(AudienceTest, LooksAtNoLogColumnThatNoConditionIsOn) {
-    // Otherwise each path would be a log of its own here, and known afresh.
+TEST_F(AudienceTest, IgnoresLogColumnsWithoutConditions) {
+    // Otherwise each path would count as a log of its own here and be learned again.
     open({onLog("messages")});
     for (int number = 0; number < 20'000; ++number) {
         const std::string path = "/" + std::to_string(number);
@@ -121,7 +121,7 @@ TEST_F(AudienceTest, LooksAtNoLogColumnThatNoConditionIsOn) {
     }
 }
 
-TEST_F(AudienceTest, KnowsAnyNumberOfLogs) {
+TEST_F(AudienceTest, HandlesAnyNumberOfLogs) {
     open({textCondition("LOGNAME", INTF_STARTS, "app1")});
     open({textCondition("LOGNAME", INTF_MATCHES, "9$")});
     for (int number = 0; number < 20'000; ++number) {
@@ -137,7 +137,7 @@ TEST_F(AudienceTest, KnowsAnyNumberOfLogs) {
     }
 }
 
-TEST_F(AudienceTest, PassesOverWhatTheTextRefuses) {
+TEST_F(AudienceTest, SkipsSituationsThatTheTextRefuses) {
     open({textCondition("TEXT", INTF_STARTS, "Failed")});
     open({textCondition("TEXT", INTF_STARTS, "Accepted")});
     open({textCondition("TEXT", INTF_STARTS, "Failed password for")});
@@ -157,23 +157,23 @@ TEST_F(AudienceTest, PassesOverWhatTheTextRefuses) {
     EXPECT_THAT(audienceOf(TestRow("/", "a", "", 0)), ElementsAre(8, 11));
 }
 
-TEST_F(AudienceTest, LeavesTheJudgementOfNumbersAndUnknownColumnsToTheTable) {
+TEST_F(AudienceTest, LeavesNumbersAndUnknownColumnsToTheTable) {
     open({numberCondition("NUMBER", INTF_EQUAL, 99)});
     open({textCondition("UNKNOWN", INTF_EQUAL, "x")});
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), ElementsAre(0, 1));
 }
 
-TEST_F(AudienceTest, PassesOverAConditionThatMakesNoSense) {
+TEST_F(AudienceTest, SkipsASituationWithANonsensicalCondition) {
     open({textCondition("NUMBER", INTF_EQUAL, "seven")});
     open({textCondition("TEXT", static_cast<_IntfOper>(77), "x")});
     EXPECT_THAT(audienceOf(TestRow(rowBytes)), IsEmpty());
-    // It is on no log's columns, so that such a row is not taken for a new log's.
+    // It is not on a column that names a log, so such a row does not count as a new log's.
     for (int number = 0; number < 20'000; ++number) {
         ASSERT_THAT(audienceOf(TestRow("/", "a", std::to_string(number), number)), IsEmpty());
     }
 }
 
-TEST_F(AudienceTest, CountsRowsThatItSparesARequestAsJudged) {
+TEST_F(AudienceTest, CountsSkippedRowsAsJudged) {
     Situation& mine = open({onLog("messages")});
     Situation& other = open({onLog("syslog"), textCondition("TEXT", INTF_CONTAINS, "x")});
     const auto offer = [&](TestRow row) {
@@ -195,12 +195,12 @@ TEST_F(AudienceTest, CountsRowsThatItSparesARequestAsJudged) {
     EXPECT_EQ(other.counts.matched(), 1U);
     EXPECT_EQ(late.counts.judged(), 2U);
     EXPECT_EQ(late.counts.matched(), 2U);
-    // Closed, a situation keeps its counts and counts no more.
+    // A closed situation keeps its counts and counts nothing more.
     mine.request.reset();
     offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 5U);
     EXPECT_EQ(other.counts.judged(), 6U);
-    // And goes on with them when it is opened again.
+    // It continues with them when it is opened again.
     mine.request = std::make_unique<Request>(manager, RequestDetail(), receiver, &mine.counts);
     offer(rowBytes);
     EXPECT_EQ(mine.counts.judged(), 6U);
@@ -230,8 +230,9 @@ Condition randomCondition(std::mt19937& random) {
     return textCondition(column, op, op == INTF_MATCHES ? "a.*b" : randomText(random, 12));
 }
 
-// Whoever is left out would have refused the row, and nobody is left out for a number.
-TEST_F(AudienceTest, LeavesOutNobodyWhoWouldTakeTheRow) {
+// A situation that is left out would have refused the row, and none is left out because of a
+// number.
+TEST_F(AudienceTest, NeverLeavesOutASituationThatWouldTakeTheRow) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

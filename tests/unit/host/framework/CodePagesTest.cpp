@@ -32,7 +32,7 @@ TEST(CodePages, KnowsCodeSetsByName) {
     EXPECT_EQ(numberOf("KOI8-R"), 878u);
 }
 
-TEST(CodePages, TakesTheNamesAsSystemsWriteThem) {
+TEST(CodePages, AcceptsTheSpellingsOfVariousSystems) {
     EXPECT_EQ(numberOf("utf8"), 1208u);
     EXPECT_EQ(numberOf("UTF_8"), 1208u);
     EXPECT_EQ(numberOf("ISO8859-1"), 819u);
@@ -40,7 +40,7 @@ TEST(CodePages, TakesTheNamesAsSystemsWriteThem) {
     EXPECT_EQ(numberOf("eucJP"), 954u);
 }
 
-TEST(CodePages, HasNoNumberForWhatItDoesNotKnow) {
+TEST(CodePages, UnknownCodeSetsHaveNoNumber) {
     EXPECT_EQ(numberOf(""), 0u);
     EXPECT_EQ(numberOf("UTF"), 0u);
     EXPECT_EQ(numberOf("UTF-88"), 0u);
@@ -61,7 +61,7 @@ TEST(CodePages, EveryNumberCanBeConvertedToUtf8AndBack) {
         EXPECT_EQ(codeSet->codePage, number);
         EXPECT_NE(IconvCache::find(utf8, *codeSet), IconvCache::none()) << codeSet->codeSet;
         EXPECT_NE(IconvCache::find(*codeSet, utf8), IconvCache::none()) << codeSet->codeSet;
-        // The fast path rests on this.
+        // The fast path relies on this.
         std::string ascii;
         for (char c = 1; c < 127; ++c) {
             ascii += c;

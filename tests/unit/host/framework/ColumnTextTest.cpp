@@ -8,7 +8,7 @@ using namespace zrm::host;
 
 namespace {
 
-TEST(ColumnText, EndsAtTheFirstNulAndWithoutTrailingBlanks) {
+TEST(ColumnText, EndsAtTheFirstNulWithoutTrailingBlanks) {
     EXPECT_EQ(ColumnText::unpadded("abc   ", 6), "abc");
     EXPECT_EQ(ColumnText::unpadded("abc  \0zz", 8), "abc");
     EXPECT_EQ(ColumnText::unpadded(" a b  ", 6), " a b");
@@ -19,7 +19,7 @@ TEST(ColumnText, EndsAtTheFirstNulAndWithoutTrailingBlanks) {
     EXPECT_EQ(ColumnText::unpadded("", 0), "");
 }
 
-TEST(ColumnText, FindsTheEndOfTheTextBehindAnyAmountOfPadding) {
+TEST(ColumnText, FindsTheEndOfTheTextBeforeAnyAmountOfPadding) {
     for (std::size_t size = 0; size <= 70; ++size) {
         for (std::size_t padding = 0; padding <= 70; ++padding) {
             const std::string text = std::string(size, 'x');

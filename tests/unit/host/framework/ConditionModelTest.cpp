@@ -12,7 +12,7 @@
 
 using namespace zrm::host;
 
-// Random conditions on random rows, held against the plainest reading of what they mean.
+// Random conditions on random rows, compared with the simplest implementation of their meaning.
 
 namespace {
 
@@ -141,7 +141,7 @@ bool model(const Condition& condition, const TestRow& row) {
     return modelText(condition, std::string(row.text, sizeof row.text));
 }
 
-TEST(ConditionModel, RandomConditionsMeanWhatTheySay) {
+TEST(ConditionModel, RandomConditionsAgreeWithTheModel) {
     const char* const given = std::getenv("ZRM_TEST_SEED");
     const unsigned seed =
         given != nullptr ? static_cast<unsigned>(std::atol(given)) : std::random_device{}();

@@ -43,7 +43,7 @@ protected:
 
 const TestRow rowBytes("/var/log/", "messages", "Failed password for root", 7);
 
-TEST_F(ConditionSetTest, WithoutConditionsEveryRowIsMeant) {
+TEST_F(ConditionSetTest, WithoutConditionsEveryRowMatches) {
     EXPECT_TRUE(holds({}, rowBytes));
 }
 
@@ -84,7 +84,7 @@ TEST_F(ConditionSetTest, ContainsStartsMatchesAndIn) {
     EXPECT_FALSE(holds({listCondition("NUMBER", {"1", "x"}, true)}, TestRow("", "", "", 7)));
 }
 
-TEST_F(ConditionSetTest, ALongerValueIsCutToWhatTheColumnHolds) {
+TEST_F(ConditionSetTest, ALongerValueIsCutToTheColumnsWidth) {
     EXPECT_TRUE(holds({textCondition("LOGNAME", INTF_EQUAL, "twelve_bytes_and_more")},
                       TestRow("", "twelve_bytes", "", 0)));
     // A UTF-8 column ends before a character that it cannot hold.
@@ -93,7 +93,7 @@ TEST_F(ConditionSetTest, ALongerValueIsCutToWhatTheColumnHolds) {
     EXPECT_FALSE(textHolds(INTF_EQUAL, full + "y and more", full));
 }
 
-TEST_F(ConditionSetTest, NumbersCompareWholly) {
+TEST_F(ConditionSetTest, NumbersAreComparedInFull) {
     const auto numberHolds = [this](_IntfOper op, std::int64_t value, std::int32_t column) {
         return holds({numberCondition("NUMBER", op, value)}, TestRow("", "", "", column));
     };
@@ -101,10 +101,10 @@ TEST_F(ConditionSetTest, NumbersCompareWholly) {
     EXPECT_FALSE(numberHolds(INTF_EQUAL, 0xffffffff, -1));
     EXPECT_TRUE(numberHolds(INTF_LESS, 0x100000000, 0x7fffffff));
     EXPECT_TRUE(holds({textCondition("NUMBER", INTF_EQUAL, "7")}, rowBytes))
-        << "digits are a number";
+        << "digits mean a number";
 }
 
-TEST_F(ConditionSetTest, WhatMakesNoSenseNeverHolds) {
+TEST_F(ConditionSetTest, NonsensicalConditionsNeverHold) {
     EXPECT_FALSE(holds({textCondition("NUMBER", INTF_EQUAL, "seven")}, rowBytes));
     EXPECT_FALSE(holds({textCondition("NUMBER", INTF_NOT_EQUAL, "7 ")}, rowBytes));
     EXPECT_FALSE(holds({textCondition("NUMBER", INTF_CONTAINS, "7")}, rowBytes));
@@ -114,7 +114,7 @@ TEST_F(ConditionSetTest, WhatMakesNoSenseNeverHolds) {
     EXPECT_FALSE(holds({textCondition("NOCOLUMN", INTF_NOT_EQUAL, "x")}, rowBytes));
 }
 
-TEST_F(ConditionSetTest, ABadPatternNeverHoldsAndIsTold) {
+TEST_F(ConditionSetTest, ABadPatternNeverHoldsAndIsReported) {
     RecordingTrace trace(TRC1_ERROR);
     EXPECT_FALSE(textHolds(INTF_MATCHES, "a(b", "a(b"));
     EXPECT_THAT(trace.messages(),
@@ -125,7 +125,7 @@ TEST_F(ConditionSetTest, ABadPatternNeverHoldsAndIsTold) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-// In a code page of single bytes, text need not be UTF-8, and a dot stands for any byte.
+// In a single-byte code page, text need not be UTF-8, and a dot matches any byte.
 TEST_F(ConditionSetTest, PatternsFollowTheCodePageOfTheColumn) {
     const TestRow latin("caf\xE9.log", "", "", 0);
     EXPECT_TRUE(holds({textCondition("LOGPATH", INTF_MATCHES, "^caf.\\.log$")}, latin));
@@ -136,7 +136,7 @@ TEST_F(ConditionSetTest, PatternsFollowTheCodePageOfTheColumn) {
     std::setlocale(LC_ALL, "C");
 }
 
-TEST_F(ConditionSetTest, AsksTheTableAboutColumnsThatItDoesNotDescribe) {
+TEST_F(ConditionSetTest, AsksTheTableAboutUndescribedColumns) {
     std::vector<std::string> asked;
     TestRow row = rowBytes;
     onForeignColumn = [&](char* bytes, std::string column, _IntfOper op, char* value) {
@@ -151,8 +151,8 @@ TEST_F(ConditionSetTest, AsksTheTableAboutColumnsThatItDoesNotDescribe) {
     EXPECT_EQ(asked[0], "YES 5 abc");
 }
 
-// What is asked last is not asked at all when something cheaper refuses the row.
-TEST_F(ConditionSetTest, TheLogIsLookedAtFirst) {
+// What is evaluated last is skipped when something cheaper refuses the row.
+TEST_F(ConditionSetTest, TheLogIsCheckedFirst) {
     int asked = 0;
     onForeignColumn = [&](char*, const std::string&, _IntfOper, char*) {
         ++asked;

@@ -23,7 +23,7 @@ struct Outcome {
     bool complete;
 };
 
-/// Converts into a target of this size and checks that nothing behind it is touched.
+/// Converts into a target of this size and checks that nothing after it is touched.
 Outcome convert(std::uint32_t to, std::uint32_t from, std::string_view source,
                 std::size_t size = 1000) {
     std::string target(size + 8, '#');
@@ -64,7 +64,7 @@ TEST(Converter, ConvertsBetweenCodeSets) {
     EXPECT_EQ(text(latin9, latin1, "a\xE9"), "a\xE9");
 }
 
-TEST(Converter, ReplacesWhatIsNotValidInTheSource) {
+TEST(Converter, ReplacesInvalidCharactersOfTheSource) {
     EXPECT_EQ(text(utf8, utf8,
                    "a\xFF"
                    "b"),
@@ -78,7 +78,7 @@ TEST(Converter, ReplacesWhatIsNotValidInTheSource) {
     EXPECT_EQ(text(utf8, shiftJis, "a\x93"), "a\uFFFD") << "the text ends within a character";
 }
 
-TEST(Converter, ReplacesWhatTheTargetDoesNotHave) {
+TEST(Converter, ReplacesCharactersThatTheTargetLacks) {
     EXPECT_EQ(text(latin1, utf8, "5 € é"), "5 \x1A \xE9") << "one for the whole character";
     EXPECT_EQ(text(asciiPage, utf8, "\U0001F600!"), "\x1A!");
     EXPECT_EQ(text(latin1, utf8, "a\xFF\xE2\x82"), "a\x1A\x1A");
@@ -119,8 +119,8 @@ TEST(Converter, AFullTargetEndsAtACharacter) {
     EXPECT_TRUE(convert(utf8, utf8, "", 0).complete);
 }
 
-// Some converters hold a letter back until they know that no accent follows.
-TEST(Converter, LosesNoLetterThatAConverterHeldBack) {
+// Some converters hold a letter back until they know that no accent follows it.
+TEST(Converter, LosesNoCharacterThatAConverterHeldBack) {
     EXPECT_EQ(text(utf8, 1258, "\xE9 a"), "é a");
     EXPECT_EQ(text(utf8, 1258, "\xF0\xE2"), "đâ");
     EXPECT_EQ(text(utf8, 1258, "\xF0\xE2\xD2z"), text(utf8, 1258, "\xF0") + "ẩz");
@@ -130,8 +130,8 @@ TEST(Converter, LosesNoLetterThatAConverterHeldBack) {
     }
 }
 
-// Cuts at every size give a beginning of the whole, and never half a character.
-TEST(Converter, EverySizeOfTargetHoldsWhatFits) {
+// A target of any size gets a prefix of the whole, and never half a character.
+TEST(Converter, FillsTargetsOfEverySize) {
     const std::string source = "a\xA4z\xE9\xE9 end";
     const std::string whole = text(utf8, latin9, source);
     for (std::size_t size = 0; size <= whole.size(); ++size) {
@@ -167,7 +167,7 @@ TEST(Converter, ThreadsConvertAtOnce) {
     }
 }
 
-TEST(Converter, SaysWhatTheSystemDoesNotConvert) {
+TEST(Converter, ReportsUnsupportedConversions) {
     const LOC2_Locale strange{"NO-SUCH-CODE-SET", 4711, true};
     char target[8] = "#######";
     const Converted converted =

@@ -30,7 +30,7 @@ protected:
     std::atomic<bool> isWanted{true};
 };
 
-TEST_F(EventRoomTest, IsFreeUnlessTheHostSaysOtherwise) {
+TEST_F(EventRoomTest, IsOpenByDefault) {
     EXPECT_TRUE(EventRoom::mayOffer());
     EXPECT_EQ(EventRoom::wait([] { return true; }), State::FREE);
     EventRoomControl::setFull(true);
@@ -44,7 +44,7 @@ TEST_F(EventRoomTest, IsFreeUnlessTheHostSaysOtherwise) {
     EXPECT_FALSE(EventRoom::mayOffer());
 }
 
-TEST_F(EventRoomTest, AWaitEndsWithRoomOrWithTheEndOfTheProcess) {
+TEST_F(EventRoomTest, AWaitEndsWithRoomOrWhenTheProcessEnds) {
     EventRoomControl::setFull(true);
     auto first = waiter(isWanted);
     EXPECT_EQ(first.wait_for(20ms), std::future_status::timeout);

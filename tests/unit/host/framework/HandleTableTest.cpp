@@ -17,7 +17,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// The table only hands the address back, so any address serves.
+/// The table only returns the address, so any address will do.
 ctreq* address(int& object) {
     return reinterpret_cast<ctreq*>(&object);
 }
@@ -60,7 +60,7 @@ TEST(HandleTable, ADropWithoutAPinChangesNothing) {
     HandleTable::close(handle);
 }
 
-TEST(HandleTable, DoesNotGiveAHandleOutAgainSoon) {
+TEST(HandleTable, DoesNotReuseAHandleSoon) {
     int object;
     std::set<unsigned> given;
     for (int round = 0; round < 100000; ++round) {
@@ -71,7 +71,7 @@ TEST(HandleTable, DoesNotGiveAHandleOutAgainSoon) {
     }
 }
 
-TEST(HandleTable, ServesManyAtOnceAndSaysWhenThereAreNoMore) {
+TEST(HandleTable, ServesManyAtOnceAndRefusesMore) {
     int object;
     std::vector<unsigned> handles;
     while (const unsigned handle = HandleTable::open(address(object))) {
@@ -100,7 +100,7 @@ TEST(HandleTable, CloseWaitsForTheLastPin) {
         HandleTable::close(handle);
         closed = true;
     });
-    // Once it is closing, no further pin is given.
+    // Once it is closing, no more pins are given.
     while (HandleTable::pin(handle) != nullptr) {
         HandleTable::unpin(handle);
         std::this_thread::yield();
@@ -112,7 +112,7 @@ TEST(HandleTable, CloseWaitsForTheLastPin) {
     EXPECT_TRUE(closed);
 }
 
-TEST(HandleTable, AnObjectIsWholeWhileItIsPinned) {
+TEST(HandleTable, AnObjectIsIntactWhileItIsPinned) {
     struct Watched {
         std::atomic<int> alive{1};
     };

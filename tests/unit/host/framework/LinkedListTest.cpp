@@ -17,7 +17,7 @@ std::vector<void*> walk(LinkedList& list) {
     while (void* const element = iterator.Next()) {
         result.push_back(element);
     }
-    EXPECT_EQ(iterator.Next(), nullptr) << "the end stays the end";
+    EXPECT_EQ(iterator.Next(), nullptr) << "it stays at the end";
     return result;
 }
 
@@ -43,7 +43,7 @@ TEST(LinkedList, RemovesTheFirstOccurrenceOnly) {
     EXPECT_THAT(walk(list), ElementsAre(&b, &a));
 }
 
-TEST(LinkedList, TellsItsLastElement) {
+TEST(LinkedList, KnowsItsLastElement) {
     int a, b;
     LinkedList list;
     EXPECT_EQ(list.Last(), nullptr);

@@ -14,7 +14,7 @@ class LocaleTest : public testing::Test {
 protected:
     ~LocaleTest() override { std::setlocale(LC_ALL, "C"); }
 
-    /// Code page of the process's locale after it was set so.
+    /// Code page of the process's locale after setting it.
     static std::uint32_t codePageOf(const char* locale) {
         EXPECT_NE(std::setlocale(LC_ALL, locale), nullptr) << locale;
         std::uint32_t status = 99;
@@ -31,7 +31,7 @@ protected:
         std::int32_t written;
         std::uint32_t length;
         std::uint32_t status;
-        std::string target; ///< the whole target and what stands behind it
+        std::string target; ///< the whole target and what follows it
     };
     static Result translate(std::uint32_t to, std::uint32_t from, std::string_view source,
                             std::uint32_t size, int flags) {
@@ -55,7 +55,7 @@ TEST_F(LocaleTest, TheProcesssLocaleHasItsCodePage) {
     EXPECT_EQ(codePageOf("C.UTF-8"), 1208u);
 }
 
-TEST_F(LocaleTest, HasNoOtherInformation) {
+TEST_F(LocaleTest, HasNoFurtherInformation) {
     LOC2_Locale* const locale = LOC2_GetLocale(0, 0, 0, nullptr);
     std::uint32_t status = 0;
     EXPECT_EQ(LOC2_GetLocaleNumInfo(locale, 8, &status), 0u);
@@ -73,7 +73,7 @@ TEST_F(LocaleTest, FlagsOfZeroTerminateWithinTheTarget) {
     EXPECT_NE(result.status, 0u) << "it was cut";
     EXPECT_EQ(result.target, terminated("abcde", 6));
     result = translate(1208, 1208, "ab€", 5, 0);
-    EXPECT_EQ(result.written, 2) << "the terminator takes the last byte's place";
+    EXPECT_EQ(result.written, 2) << "the terminator replaces the last byte";
     EXPECT_EQ(result.target, terminated("ab", 5));
     result = translate(1208, 1208, "abc", 1, 0);
     EXPECT_EQ(result.target, terminated("", 1));
@@ -102,7 +102,7 @@ TEST_F(LocaleTest, WithoutATerminatorThePaddingStays) {
     EXPECT_EQ(result.written, 0);
 }
 
-TEST_F(LocaleTest, ABytesThatIsNotValidIsReplaced) {
+TEST_F(LocaleTest, AnInvalidByteIsReplaced) {
     EXPECT_EQ(translate(1208, 1208, "a\xFFz", 10, 0).target, terminated("a\uFFFDz", 10));
     EXPECT_EQ(translate(1208, 367, "a\xE9z", 10, 0).target, terminated("a\uFFFDz", 10));
     EXPECT_EQ(translate(367, 1208, "aéz", 10, 0).target, terminated("a\x1Az", 10));
@@ -134,7 +134,7 @@ TEST_F(LocaleTest, AnUnknownCodePageConvertsNothing) {
     }
 }
 
-TEST_F(LocaleTest, NeedsNoPlaceForLengthAndStatus) {
+TEST_F(LocaleTest, LengthAndStatusAreOptional) {
     char target[8];
     EXPECT_EQ(LOC2_TranslateString(1208, target, sizeof target, 819, "abc", 3, nullptr, 0, nullptr),
               3);

@@ -1,6 +1,6 @@
 #include "framework/locks.h"
 
-#include "host/framework/LockGuard.h"
+#include "base/LockGuard.h"
 #include "support/Faults.h"
 
 #include <gtest/gtest.h>
@@ -9,11 +9,11 @@
 #include <thread>
 #include <vector>
 
-using namespace zrm::host;
+using namespace zrm;
 
 namespace {
 
-TEST(Locks, LetOneThreadInAtATime) {
+TEST(Locks, AdmitOneThreadAtATime) {
     SYS1_Lock lock;
     int inside = 0;
     int total = 0;

@@ -22,7 +22,7 @@ std::vector<std::string> working(PulseRegistry::Clock::time_point now) {
     return texts;
 }
 
-TEST(PulseRegistry, ShowsThreadsAtWorkAndForHowLongTheyStand) {
+TEST(PulseRegistry, ShowsThreadsAtWorkAndHowLongTheyHaveNotMoved) {
     const auto begin = PulseRegistry::Clock::now();
     std::atomic<std::int64_t> lines{0};
     Pulse log("/var/log/a", &lines);

@@ -1,7 +1,7 @@
 #include "host/framework/Request.h"
 
+#include "base/LockGuard.h"
 #include "framework/values.h"
-#include "host/framework/LockGuard.h"
 #include "host/framework/RequestState.h"
 #include "host/framework/Sample.h"
 #include "host/framework/Tables.h"
@@ -13,6 +13,7 @@
 #include <atomic>
 #include <thread>
 
+using namespace zrm;
 using namespace zrm::host;
 
 namespace {
@@ -92,7 +93,7 @@ TEST(Request, CountsWhatItJudgesAndWhatMatches) {
     EXPECT_EQ(other.get()->framework().counts.judged(), 0u);
 }
 
-TEST(Request, IsNotOpenWhenTheTableGivesNone) {
+TEST(Request, IsNotOpenWhenTheTableRefuses) {
     TestManager manager;
     manager.gives = false;
     TestReceiver receiver;
@@ -150,8 +151,8 @@ TEST(Request, IsDestroyedWhenTheLastPinIsDropped) {
     EXPECT_TRUE(destroyed);
 }
 
-// What a log's thread does with each row, on two threads, while situations come and go.
-TEST(Request, SituationsComeAndGoWhileRowsAreHandedOut) {
+// What a log's thread does with each row, on two threads while situations come and go.
+TEST(Request, SituationsComeAndGoDuringFanOut) {
     TestManager manager;
     TestReceiver receiver;
     std::atomic<bool> done{false};
@@ -187,7 +188,7 @@ TEST(Request, SituationsComeAndGoWhileRowsAreHandedOut) {
     EXPECT_EQ(receiver.dispatches, offered.load());
 }
 
-TEST(Tables, KnowsWhatWasRegistered) {
+TEST(Tables, FindsRegisteredTables) {
     EXPECT_EQ(Tables::find("ONE"), nullptr);
     {
         TestManager one("ONE");
@@ -204,7 +205,7 @@ TEST(Tables, KnowsWhatWasRegistered) {
         EXPECT_EQ(Tables::find("ONE"), nullptr);
         EXPECT_EQ(TableManager::RegisterWithManager(&one), 0u);
     }
-    EXPECT_EQ(Tables::find("ONE"), nullptr) << "a manager that ends is forgotten";
+    EXPECT_EQ(Tables::find("ONE"), nullptr) << "a destroyed manager is removed";
 }
 
 TEST(Tables, HasRoomForSixteen) {
@@ -236,7 +237,7 @@ protected:
     TestManager manager;
 };
 
-TEST_F(SampleTest, GivesTheRowsThatMeetTheConditions) {
+TEST_F(SampleTest, ReturnsTheRowsThatMeetTheConditions) {
     const auto sample = Sample::take("TESTTABLE", {numberCondition("NUMBER", INTF_GREATER, 6)});
     ASSERT_TRUE(sample);
     ASSERT_EQ(sample->size(), 3u);

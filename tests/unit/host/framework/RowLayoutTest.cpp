@@ -45,8 +45,8 @@ TEST_F(RowLayoutTest, ReadsARow) {
     EXPECT_EQ(layout.find("NUMBER")->integer(row.bytes()), -7);
 }
 
-// A column that the table cannot describe is left out; the table's count may promise too much.
-TEST_F(RowLayoutTest, LeavesOutWhatIsNotDescribed) {
+// A column that the table cannot describe is left out; the table's count may be too high.
+TEST_F(RowLayoutTest, LeavesOutUndescribedColumns) {
     class Partly : public TestRequest {
     public:
         using TestRequest::TestRequest;

@@ -3,8 +3,7 @@
 
 #include "framework/TableManager.h"
 #include "framework/ctreq.h"
-#include "host/framework/ContextInfo.h"
-#include "host/framework/RequestDetail.h"
+#include "host/framework/Request.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -109,7 +108,7 @@ public:
     std::function<void(TestRequest&)> onCreate;
 };
 
-/// Keeps what it is given.
+/// Keeps what it receives.
 class TestReceiver : public RowReceiver {
 public:
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override {

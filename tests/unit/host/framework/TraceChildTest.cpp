@@ -29,7 +29,7 @@ namespace {
 
 TRC1_Anchor anchor{"TraceChildTest.cpp"};
 
-/// Waits for the child; false when it hangs, and is killed then.
+/// Waits for the child; kills it and returns false when it hangs.
 bool ends(pid_t child) {
     const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(20);
     int status = 0;
@@ -54,7 +54,7 @@ int linesIn(const std::string& path, const std::regex& pattern) {
     return count;
 }
 
-// Threads that hold, again and again, each lock that a careless trace would take: those of the
+// Threads that repeatedly hold each lock that a careless trace would take: those of the
 // allocator, of the time zone, of the environment, of stdio, and of a change of the trace itself.
 class BusyLocks {
 public:
@@ -101,13 +101,13 @@ private:
     std::vector<std::thread> m_threads;
 };
 
-TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
+TEST(TraceChild, TracesWhicheverLockAnotherThreadHeldAtTheFork) {
     constexpr int children = 100;
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
     TRC1_Printf(anchor, 1, "parent %d", 0);
     {
-        // Standard error's lock is held all the time.
+        // Standard error's lock is held throughout.
         flockfile(stderr);
         const BusyLocks busy;
         for (int index = 0; index < children; ++index) {
@@ -133,7 +133,7 @@ TEST(TraceChild, TracesWhateverLockAnotherThreadHeldAtTheFork) {
         children + 1);
 }
 
-TEST(TraceChild, LeavesAMovedFileToItsParent) {
+TEST(TraceChild, LeavesAMovedFileToTheParent) {
     TemporaryDirectory directory;
     ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
     TRC1_Printf(anchor, 1, "parent");

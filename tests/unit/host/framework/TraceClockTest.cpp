@@ -40,7 +40,7 @@ protected:
     }
 };
 
-TEST_F(TraceClockTest, GivesTheLocalTimeToTheMicrosecond) {
+TEST_F(TraceClockTest, ReturnsTheLocalTimeToTheMicrosecond) {
     EXPECT_EQ(localText(1795158189, 412345999), "2026-11-20 08:03:09.412345");
     EXPECT_EQ(localText(1780000000, 999), "2026-05-28 22:26:40.000000");
 }
@@ -52,7 +52,7 @@ TEST_F(TraceClockTest, FollowsTheChangeOfTheZone) {
     EXPECT_EQ(localText(1774746000), "2026-03-29 03:00:00.000000");
 }
 
-TEST_F(TraceClockTest, AgreesWithTheCLibraryAllThroughTheYears) {
+TEST_F(TraceClockTest, AgreesWithTheCLibraryThroughoutTheYears) {
     for (std::time_t seconds = 1750000000; seconds < 1900000000; seconds += 123457) {
         std::tm parts{};
         localtime_r(&seconds, &parts);
@@ -71,7 +71,7 @@ TEST_F(TraceClockTest, AsksTheCLibraryOnceAQuarterOfAnHour) {
     EXPECT_EQ(counter.calls(), 4);
 }
 
-TEST_F(TraceClockTest, KeepsWhatItKnowsWhenTheCLibraryFails) {
+TEST_F(TraceClockTest, KeepsTheLastOffsetWhenTheCLibraryFails) {
     EXPECT_EQ(localText(1810000000), "2027-05-11 03:46:40.000000");
     Fault fault("localtime_r", EOVERFLOW, {.times = -1});
     EXPECT_EQ(localText(1810000900), "2027-05-11 04:01:40.000000");
@@ -89,7 +89,7 @@ TEST_F(TraceClockTest, AForkedChildNeverAsksTheCLibrary) {
     }
     int status = -1;
     waitpid(child, &status, 0);
-    EXPECT_EQ(status, 0) << "the offset is that of summer still";
+    EXPECT_EQ(status, 0) << "the offset is still that of summer";
     EXPECT_EQ(localText(1830000000), "2027-12-28 14:20:00.000000");
     EXPECT_EQ(counter.calls(), 1);
 }

@@ -84,13 +84,13 @@ TEST(TraceControl, LevelsMayBeReadWhileTheyChange) {
     TraceControl::configure("");
 }
 
-TEST(TraceControl, SkipsTheGenerationThatMeansNever) {
+TEST(TraceControl, SkipsTheReservedGeneration) {
     TRC1_Generation = 0xffffffff;
     ASSERT_EQ(TraceControl::configure(""), "");
     EXPECT_EQ(TRC1_Generation, 1u);
 }
 
-TEST(TraceControl, SaysWhyAFileCannotBeOpened) {
+TEST(TraceControl, ReportsWhyAFileCannotBeOpened) {
     EXPECT_EQ(TraceControl::openFile("/nonexistent/trace"),
               "cannot open /nonexistent/trace: No such file or directory");
 }

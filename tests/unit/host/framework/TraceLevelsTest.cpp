@@ -6,7 +6,7 @@ using namespace zrm::host;
 
 namespace {
 
-/// The level of one unit under a text that must be right.
+/// The level of one unit after parsing a valid text.
 unsigned level(std::string_view text, std::string_view unit = "ValidLog.cpp") {
     TraceLevels levels;
     EXPECT_EQ(levels.parse(text), "") << text;
@@ -20,7 +20,7 @@ std::string wrong(std::string_view text) {
     return error;
 }
 
-TEST(TraceLevels, IsTheErrorsWhereNothingIsSaid) {
+TEST(TraceLevels, DefaultsToErrors) {
     EXPECT_EQ(TraceLevels().levelOf("ValidLog.cpp"), 0x80u);
     EXPECT_EQ(level(""), 0x80u);
     EXPECT_EQ(level(" , ,"), 0x80u);
@@ -39,20 +39,20 @@ TEST(TraceLevels, KnowsTheClasses) {
     EXPECT_EQ(level("0"), 0u);
 }
 
-TEST(TraceLevels, AddsClassesUp) {
+TEST(TraceLevels, AddsUpClasses) {
     EXPECT_EQ(level("error,flow"), 0xC0u);
     EXPECT_EQ(level(" error , fine "), 0x81u);
     EXPECT_EQ(level("error+detail,0x01"), 0x91u);
     EXPECT_EQ(level("none,detail"), 0x10u);
 }
 
-TEST(TraceLevels, AUnitHasItsOwn) {
+TEST(TraceLevels, AUnitMayHaveItsOwnLevel) {
     EXPECT_EQ(level("ValidLog=fine"), 0x01u);
     EXPECT_EQ(level("ValidLog.cpp=fine+flow"), 0x41u);
     EXPECT_EQ(level("error,ValidLog=none"), 0u);
     EXPECT_EQ(level("flow,LogBase=fine"), 0x40u);
     EXPECT_EQ(level("LogBase=fine"), 0x80u) << "the others keep the errors";
-    EXPECT_EQ(level("ValidLog=fine,ValidLog=detail"), 0x10u) << "the last word holds";
+    EXPECT_EQ(level("ValidLog=fine,ValidLog=detail"), 0x10u) << "the last word applies";
     EXPECT_EQ(level("ValidLog=fine,ValidLog.cpp=detail"), 0x10u);
     EXPECT_EQ(level("ValidLog.cpp=fine,ValidLog=detail"), 0x10u);
     EXPECT_EQ(level(" ValidLog = fine + 0x80 "), 0x81u);
@@ -62,16 +62,16 @@ TEST(TraceLevels, AUnitHasItsOwn) {
     EXPECT_EQ(level("plain=fine", "plain"), 0x01u) << "a unit without an ending";
 }
 
-TEST(TraceLevels, AClassHasAllItsSourceFiles) {
+TEST(TraceLevels, AClassCoversAllItsSourceFiles) {
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFile.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFileReport.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile=detail", "UserLogFileTime.cpp"), 0x10u);
     EXPECT_EQ(level("zrm_rmlogent=detail", "zrm_rmlogent_report.cpp"), 0x10u);
     EXPECT_EQ(level("UserLogFile.cpp=detail", "UserLogFileReport.cpp"), 0x80u) << "a file alone";
     EXPECT_EQ(level("LogFile=detail", "UserLogFile.cpp"), 0x80u);
-    EXPECT_EQ(level("StringParse=detail", "StringParser.cpp"), 0x80u) << "no class";
+    EXPECT_EQ(level("StringParse=detail", "StringParser.cpp"), 0x80u) << "not a class";
     EXPECT_EQ(level("UTF=detail", "UTF8Conv.cpp"), 0x80u);
-    // The longer name says more of a file, wherever it stands.
+    // The longer name is more specific, wherever it is.
     for (const char* text :
          {"UserLogFile=detail,UserLogFileReport=fine", "UserLogFileReport=fine,UserLogFile=detail",
           "UserLogFileReport.cpp=fine,UserLogFile=detail"}) {
@@ -80,7 +80,7 @@ TEST(TraceLevels, AClassHasAllItsSourceFiles) {
     }
 }
 
-TEST(TraceLevels, NamesTheWordThatIsWrong) {
+TEST(TraceLevels, NamesTheWrongWord) {
     const std::string classes = " is not a trace class; the classes are error, flow, detail, fine, "
                                 "all, none, or a number from 0 to 255";
     EXPECT_EQ(wrong("detial"), "\"detial\" in \"detial\"" + classes);

@@ -48,7 +48,7 @@ TEST_F(TraceOutputTest, AppendsToTheFile) {
     EXPECT_EQ(contentOf("trace"), "before\none\ntwo\n");
 }
 
-TEST_F(TraceOutputTest, MakesAFileThatOthersCannotRead) {
+TEST_F(TraceOutputTest, CreatesAFileThatOthersCannotRead) {
     const mode_t before = umask(0);
     ASSERT_EQ(TraceOutput::open(directory.file("trace").c_str()), 0);
     umask(before);
@@ -57,7 +57,7 @@ TEST_F(TraceOutputTest, MakesAFileThatOthersCannotRead) {
     EXPECT_EQ(status.st_mode & 0777, 0640u);
 }
 
-TEST_F(TraceOutputTest, MakesTheFileAnewWhenItWasMovedAway) {
+TEST_F(TraceOutputTest, CreatesTheFileAgainWhenItWasMovedAway) {
     ASSERT_EQ(TraceOutput::open(directory.file("trace").c_str()), 0);
     write("one\n", 1);
     fs::rename(directory.file("trace"), directory.file("trace.1"));
@@ -68,7 +68,7 @@ TEST_F(TraceOutputTest, MakesTheFileAnewWhenItWasMovedAway) {
     EXPECT_EQ(contentOf("trace"), "next second\nlater\n");
 }
 
-TEST_F(TraceOutputTest, TakesAnotherFileThatStandsInItsPlace) {
+TEST_F(TraceOutputTest, UsesAnotherFileInItsPlace) {
     ASSERT_EQ(TraceOutput::open(directory.file("trace").c_str()), 0);
     write("one\n", 1);
     directory.write("new", "made by the rotation\n");
@@ -77,7 +77,7 @@ TEST_F(TraceOutputTest, TakesAnotherFileThatStandsInItsPlace) {
     EXPECT_EQ(contentOf("trace"), "made by the rotation\ntwo\n");
 }
 
-TEST_F(TraceOutputTest, GoesOnInTheOldFileWhileANewOneCannotBeMade) {
+TEST_F(TraceOutputTest, ContinuesInTheOldFileWhileANewOneCannotBeCreated) {
     ASSERT_EQ(TraceOutput::open(directory.file("trace").c_str()), 0);
     write("one\n", 1);
     fs::rename(directory.file("trace"), directory.file("trace.1"));
@@ -106,7 +106,7 @@ TEST_F(TraceOutputTest, AFileThatCannotBeOpenedChangesNothing) {
     EXPECT_EQ(contentOf("trace"), "one\n");
 }
 
-TEST_F(TraceOutputTest, ChangesToAnotherFileWithoutHoldingTheFirst) {
+TEST_F(TraceOutputTest, SwitchesToAnotherFileAndClosesTheFirst) {
     ASSERT_EQ(TraceOutput::open(directory.file("first").c_str()), 0);
     write("one\n");
     const auto descriptors = [] {
@@ -122,7 +122,7 @@ TEST_F(TraceOutputTest, ChangesToAnotherFileWithoutHoldingTheFirst) {
     EXPECT_EQ(contentOf("second"), "two\n");
 }
 
-TEST_F(TraceOutputTest, LosesNothingWhileTheFileIsMovedUnderManyThreads) {
+TEST_F(TraceOutputTest, LosesNothingWhenTheFileIsMovedWhileThreadsWrite) {
     ASSERT_EQ(TraceOutput::open(directory.file("trace").c_str()), 0);
     std::atomic<int> second{1};
     std::atomic<int> written{0};

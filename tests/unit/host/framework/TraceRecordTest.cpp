@@ -18,7 +18,7 @@ std::string shown(const std::string& text) {
     return all.substr(begin, all.size() - begin - 1);
 }
 
-TEST(TraceRecord, WhatSteersATerminalIsEscaped) {
+TEST(TraceRecord, ControlCharactersAreEscaped) {
     EXPECT_EQ(shown("\033]0;title\a\r\x7f"), "\\x1b]0;title\\x07\\x0d\\x7f");
     EXPECT_EQ(shown("\xc2\x9b"
                     "31m\xe2\x80\xae"),
@@ -29,7 +29,7 @@ TEST(TraceRecord, WhatSteersATerminalIsEscaped) {
         << "a control in another code page";
 }
 
-TEST(TraceRecord, EverythingElseIsShownAsItIs) {
+TEST(TraceRecord, EverythingElseIsUnchanged) {
     const std::string text = "tab\tline\n\tnext caf\xc3\xa9 \xe2\x82\xac \xe9 \\x1b";
     EXPECT_EQ(shown(text), text);
 }

@@ -33,7 +33,7 @@ using testing::IsEmpty;
 
 TRC1_Anchor anchor{"TraceTest.cpp"};
 
-/// Stands in for standard error. Each write becomes one message, so that the tests see what was
+/// Replaces standard error. Each write becomes one message, so that the tests see what was
 /// written in one piece.
 class ErrorSocket {
 public:
@@ -128,7 +128,7 @@ TEST(Trace, ALongRecordIsCutAndKeepsItsNewline) {
     }
 }
 
-TEST(Trace, EventsTellEntryExitAndResult) {
+TEST(Trace, EventsShowEntryExitAndResult) {
     ErrorSocket errors;
     TRC1_Event(anchor, 1, TRC1_ENTRY);
     TRC1_Event(anchor, 1, TRC1_EXIT);
@@ -155,7 +155,7 @@ TEST(Trace, LeavesErrnoAsItWas) {
     EXPECT_EQ(seen, ENOTTY);
 }
 
-TEST(Trace, AChangedLevelHoldsFromTheNextOperationOn) {
+TEST(Trace, AChangedLevelAppliesFromTheNextOperation) {
     ErrorSocket errors;
     const auto traced = [&errors] {
         {
@@ -180,7 +180,7 @@ TEST(Trace, AChangedLevelHoldsFromTheNextOperationOn) {
 
 // Threads that learn the level while it changes may do so in any order; none may leave an older
 // level behind under the latest generation.
-TEST(Trace, NoThreadLeavesAnOlderLevelBehind) {
+TEST(Trace, NoThreadRestoresAnOlderLevel) {
     static TRC1_Anchor shared{"Shared.cpp"};
     constexpr int threadCount = 3;
     constexpr int rounds = 1500;
@@ -225,7 +225,7 @@ TEST(Trace, NoThreadLeavesAnOlderLevelBehind) {
 std::atomic<bool> g_cancelled{false};
 std::atomic<bool> g_wentOn{false};
 
-/// Holds no objects of its own: a sanitizer would miss that the unwind has left their frame.
+/// Has no objects of its own: a sanitizer would not notice that the unwind has left their frame.
 void* traceOnceCancelled(void* /*unused*/) {
     while (!g_cancelled) {
         sched_yield();
@@ -238,7 +238,7 @@ void* traceOnceCancelled(void* /*unused*/) {
 
 // A thread that is cancelled while it traces ends at its next cancellation point, and its record is
 // written: an unwind through the trace would end the process.
-TEST(Trace, IsNoCancellationPoint) {
+TEST(Trace, IsNotACancellationPoint) {
     ErrorSocket errors;
     pthread_t thread{};
     ASSERT_EQ(pthread_create(&thread, nullptr, traceOnceCancelled, nullptr), 0);

@@ -6,7 +6,7 @@
 
 namespace {
 
-TEST(CopyUnpad, LeavesThePaddingAndTerminates) {
+TEST(CopyUnpad, DropsThePaddingAndTerminates) {
     char text[17];
     const auto copy = [&text](const char* source, int length) {
         std::memset(text, '#', sizeof text);
@@ -19,7 +19,7 @@ TEST(CopyUnpad, LeavesThePaddingAndTerminates) {
     EXPECT_STREQ(copy("    ", 4), "");
     EXPECT_STREQ(copy("abc", 0), "");
     EXPECT_STREQ(copy("abc", -1), "");
-    EXPECT_EQ(text[1], '#') << "nothing behind the terminator is written";
+    EXPECT_EQ(text[1], '#') << "nothing after the terminator is written";
 }
 
 } // namespace

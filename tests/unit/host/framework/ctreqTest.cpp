@@ -39,7 +39,7 @@ protected:
     std::unique_ptr<TestRequest> request;
 };
 
-TEST_F(CtreqTest, TellsWhatItWasOpenedWith) {
+TEST_F(CtreqTest, ReturnsWhatItWasOpenedWith) {
     const TestRequest& opened = open();
     EXPECT_STREQ(opened.name(), "situation");
     EXPECT_EQ(opened.sampleType(), 4u);
@@ -50,7 +50,7 @@ TEST_F(CtreqTest, TellsWhatItWasOpenedWith) {
     EXPECT_EQ(opened.allocated, 0u);
 }
 
-TEST_F(CtreqTest, HasDefaultsForWhatATableNeedNotHave) {
+TEST_F(CtreqTest, HasDefaultsForOptionalOperations) {
     class Bare : public ctreq {
     public:
         using ctreq::ctreq;
@@ -79,7 +79,7 @@ TEST_F(CtreqTest, GrowsTheDataArrayByTheTablesStep) {
                 ElementsAre(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19));
 }
 
-TEST_F(CtreqTest, UsesTheRoomAgainAfterTheCountWasSetBack) {
+TEST_F(CtreqTest, ReusesTheSpaceAfterTheCountWasReset) {
     open();
     insert(1);
     insert(2);
@@ -122,7 +122,7 @@ TEST_F(CtreqTest, PassesTheReceiversStatusOn) {
     insert(1);
     receiver.status = 99;
     EXPECT_EQ(request->Dispatch(), 99u);
-    EXPECT_EQ(request->count, 1u) << "the count is the agent's to reset";
+    EXPECT_EQ(request->count, 1u) << "only the agent resets the count";
 }
 
 TEST_F(CtreqTest, PublishesTheConditionsOneAtATime) {
@@ -172,7 +172,7 @@ TEST_F(CtreqTest, ARequestThatIsStoppedTakesNoMoreRows) {
     EXPECT_EQ(request->Stopped(1), 0u);
     EXPECT_EQ(request->Stop(), 0u);
     EXPECT_EQ(request->Stopped(2), 0u);
-    EXPECT_THAT(receiver.reasons, ElementsAre(1)) << "told once";
+    EXPECT_THAT(receiver.reasons, ElementsAre(1)) << "reported once";
     EXPECT_EQ(request->CheckForException(row.bytes()), 0u);
 }
 
@@ -200,7 +200,8 @@ TEST_F(CtreqTest, ComparesCharacterColumns) {
     EXPECT_TRUE(holds(INTF_EQUAL, "abc     ", "abc"));
     EXPECT_TRUE(holds(INTF_EQUAL, "abc\0zzzz", "abc   "));
     EXPECT_TRUE(holds(INTF_EQUAL, "abcdefgh", "abcdefgh"));
-    EXPECT_TRUE(holds(INTF_EQUAL, "abcdefgh", "abcdefgh and more")) << "the column holds no more";
+    EXPECT_TRUE(holds(INTF_EQUAL, "abcdefgh", "abcdefgh and more"))
+        << "the column cannot hold more";
     EXPECT_FALSE(holds(INTF_EQUAL, "abcd    ", "abc"));
     EXPECT_FALSE(holds(INTF_EQUAL, "abc     ", "Abc"));
     EXPECT_TRUE(holds(INTF_EQUAL, "        ", ""));

@@ -53,8 +53,7 @@ class EntryRecorderTest : public testing::Test {
 protected:
     EntryRecorderTest() {
         TableManager::RegisterWithManager(&logs);
-        auto opened = History::open({}, directory.file("state"));
-        history = std::move(std::get<std::unique_ptr<History>>(opened));
+        history = std::move(History::open({}, directory.file("state")).value());
         recorder = std::make_unique<EntryRecorder>(*history);
     }
     ~EntryRecorderTest() override { Tables::clear(); }
@@ -69,7 +68,7 @@ protected:
     std::unique_ptr<EntryRecorder> recorder;
 };
 
-TEST_F(EntryRecorderTest, RecordsWhatEachMinuteBroughtToEachLog) {
+TEST_F(EntryRecorderTest, RecordsTheEntriesOfEachMinuteAndLog) {
     recorder->tick(start + 30'000);
     logs.counts = {{"a.log", 10}};
     recorder->tick(start + 59'999);
@@ -78,7 +77,7 @@ TEST_F(EntryRecorderTest, RecordsWhatEachMinuteBroughtToEachLog) {
     logs.counts = {{"a.log", 20}, {"b.log", 3}, {"quiet.log", 0}};
     recorder->tick(start + 2 * minute); // the second had 8 and 3
     logs.counts = {{"a.log", 5}, {"b.log", 3}};
-    recorder->tick(start + 5 * minute); // a.log was begun anew; nobody looked for two minutes
+    recorder->tick(start + 5 * minute); // a.log started over; nothing was recorded for two minutes
     logs.counts = {{"a.log", 6}, {"b.log", 4}};
     recorder->finish();
     history->storeRest();

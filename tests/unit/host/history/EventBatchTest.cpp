@@ -37,7 +37,7 @@ TEST(EventBatch, KeepsCopiesOfEvents) {
     EventBatch batch;
     {
         const std::string situation = "gone soon";
-        for (std::uint64_t id = 7; id < 500; ++id) { // the memory moves while it grows
+        for (std::uint64_t id = 7; id < 500; ++id) { // the memory moves as it grows
             const std::string json = "{" + std::to_string(id) + "}";
             batch.add(EventRecord{id, 1, situation, id % 2 == 0 ? "info" : "major", "/log", json,
                                   id % 3 == 0 ? "third" : ""});
@@ -54,7 +54,7 @@ TEST(EventBatch, KeepsCopiesOfEvents) {
     }
 }
 
-TEST(EventBatch, ATextThatEventsHaveInCommonTakesRoomOnce) {
+TEST(EventBatch, ASharedTextIsStoredOnce) {
     EventBatch batch;
     const std::string log(1000, 'x');
     for (std::uint64_t id = 1; id <= 100; ++id) {

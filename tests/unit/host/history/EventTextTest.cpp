@@ -25,7 +25,7 @@ bool isFound(const std::string& text, const std::string& description = "") {
     return EventText(text).isIn("/var/log/auth.log", documentOf(description));
 }
 
-TEST(EventText, IsFoundInWhatPeopleLookFor) {
+TEST(EventText, IsFoundInThePartsThatPeopleSearch) {
     EXPECT_TRUE(isFound("disk full"));
     EXPECT_TRUE(isFound("SSHD[4"));
     EXPECT_TRUE(isFound("/log/AUTH"));
@@ -51,12 +51,12 @@ TEST(EventText, CharactersThatJsonEscapesAreFound) {
     EXPECT_FALSE(isFound("\\u", "a\x01b"));
 }
 
-TEST(EventText, OfWhatIsNoJsonTheBytesCount) {
+TEST(EventText, SearchesTheRawBytesOfInvalidJson) {
     EXPECT_TRUE(EventText("abc").isIn("", "{rubbish ABC"));
     EXPECT_FALSE(EventText("abc").isIn("", "{rubbish"));
 }
 
-TEST(EventText, FindsWhatAPlainSearchFinds) {
+TEST(EventText, AgreesWithAPlainSearch) {
     const auto seed = std::random_device{}();
     std::cout << "seed " << seed << std::endl;
     std::mt19937 random(seed);

@@ -1,6 +1,7 @@
 #include "host/history/HistoryDirectory.h"
 
 #include "support/Faults.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -28,12 +29,10 @@ constexpr const char* cure = "; make it a directory that the agent may write, or
 class HistoryDirectoryTest : public testing::Test {
 protected:
     static std::string problemOf(const std::string& path) {
-        auto opened = HistoryDirectory::open(path);
-        const auto* const problem = std::get_if<std::string>(&opened);
-        return problem == nullptr ? "" : *problem;
+        return reasonOf(HistoryDirectory::open(path));
     }
     static std::unique_ptr<HistoryDirectory> opened(const std::string& path) {
-        return std::get<std::unique_ptr<HistoryDirectory>>(HistoryDirectory::open(path));
+        return HistoryDirectory::open(path).value();
     }
 
     RecordingTrace trace{TRC1_ERROR};
@@ -41,7 +40,7 @@ protected:
     std::string path = directory.file("state");
 };
 
-TEST_F(HistoryDirectoryTest, MakesWhatIsMissingForItsOwnerAndGroupAlone) {
+TEST_F(HistoryDirectoryTest, CreatesWhatIsMissingForItsOwnerAndGroupOnly) {
     const auto place = opened(path);
     EXPECT_EQ(place->file(), path + "/history.db");
     struct stat status {};
@@ -52,10 +51,10 @@ TEST_F(HistoryDirectoryTest, MakesWhatIsMissingForItsOwnerAndGroupAlone) {
     EXPECT_EQ(place->bytes(), 0u);
 }
 
-TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
+TEST_F(HistoryDirectoryTest, ReportsWhatCannotBeCreatedAndWhatToDo) {
     EXPECT_EQ(problemOf(path + "/below"),
               "cannot create the directory " + path + "/below: No such file or directory" + cure);
-    std::ofstream(directory.file("plain")) << "no directory";
+    std::ofstream(directory.file("plain")) << "not a directory";
     EXPECT_EQ(problemOf(directory.file("plain")),
               "cannot open " + directory.file("plain") + "/history.lock: Not a directory" + cure);
     {
@@ -72,11 +71,11 @@ TEST_F(HistoryDirectoryTest, SaysWhatCannotBeMadeAndWhatToDo) {
     EXPECT_EQ(problemOf(path), "cannot open " + path + "/history.db: Permission denied" + cure);
 }
 
-TEST_F(HistoryDirectoryTest, OpensRegularFilesOfItsOwnAlone) {
+TEST_F(HistoryDirectoryTest, OpensOnlyRegularFilesOfItsOwn) {
     std::filesystem::create_directory(path);
     for (const char* const name : {"/history.lock", "/history.db"}) {
         const std::string place = path + name;
-        std::filesystem::remove(place); // of the turn before
+        std::filesystem::remove(place); // of the previous round
         std::filesystem::create_symlink(directory.file("target"), place);
         EXPECT_EQ(problemOf(path),
                   place + " is a symbolic link, which the history does not follow" + cure);
@@ -115,7 +114,7 @@ TEST_F(HistoryDirectoryTest, CountsTheBytesOfAllItsFiles) {
     EXPECT_EQ(place->bytes(), 9u);
 }
 
-TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
+TEST_F(HistoryDirectoryTest, RecordsWhichIdsMayHaveBeenUsed) {
     auto place = opened(path);
     EXPECT_EQ(place->reservedIds(), 0u);
     place->reserveIds(123'456);
@@ -131,10 +130,10 @@ TEST_F(HistoryDirectoryTest, KeepsWhichIdsMayHaveBeenGiven) {
     }
 }
 
-TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
+TEST_F(HistoryDirectoryTest, CreatesRemovedFilesAgainAndLocksThem) {
     const auto place = opened(path);
     std::filesystem::remove_all(path);
-    EXPECT_EQ(place->restore(), "");
+    EXPECT_EQ(reasonOf(place->restore()), "");
     EXPECT_TRUE(std::filesystem::exists(place->file()));
     const pid_t child = fork();
     if (child == 0) {
@@ -145,7 +144,7 @@ TEST_F(HistoryDirectoryTest, MakesAnewWhatWasRemovedAndLocksIt) {
     EXPECT_EQ(WEXITSTATUS(status), 1);
 }
 
-TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
+TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndReportsIt) {
     const auto place = opened(path);
     std::vector<std::string> told;
     for (int number = 0; number < 3; ++number) { // within the same second, or nearly
@@ -153,7 +152,7 @@ TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
         std::ofstream(place->file() + "-wal") << "more";
         std::ofstream(place->file() + "-shm") << "index";
         testing::internal::CaptureStderr();
-        EXPECT_EQ(place->moveAside("file is not a database"), "");
+        EXPECT_EQ(reasonOf(place->moveAside("file is not a database")), "");
         told.push_back(testing::internal::GetCapturedStderr());
         EXPECT_EQ(place->bytes(), 0u);
         EXPECT_TRUE(std::filesystem::exists(place->file()));
@@ -174,10 +173,10 @@ TEST_F(HistoryDirectoryTest, MovesACorruptFileAsideAndSaysSo) {
     EXPECT_EQ(logs, 3);
 }
 
-TEST_F(HistoryDirectoryTest, SaysWhyAFileCannotBeMovedAside) {
+TEST_F(HistoryDirectoryTest, ReportsWhyAFileCannotBeMovedAside) {
     const auto place = opened(path);
     std::filesystem::remove(place->file());
-    EXPECT_EQ(place->moveAside("why"),
+    EXPECT_EQ(reasonOf(place->moveAside("why")),
               "cannot move " + place->file() + " aside: No such file or directory");
 }
 

@@ -1,7 +1,7 @@
 #include "host/history/HistoryFile.h"
 
 #include "TestBatch.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "support/FaultyDisk.h"
 #include "support/TemporaryDirectory.h"
 
@@ -57,7 +57,7 @@ TEST_F(HistoryFileTest, KnowsItsOldestAndNewestEventAcrossStarts) {
     EXPECT_EQ(count(), 2000);
 }
 
-TEST_F(HistoryFileTest, AnEmptyHistoryContinuesWhereItIsTold) {
+TEST_F(HistoryFileTest, AnEmptyHistoryContinuesAfterTheGivenId) {
     file->continueAfter(500);
     EXPECT_EQ(file->newest(), 500u);
     reopen();
@@ -68,7 +68,7 @@ TEST_F(HistoryFileTest, AnEmptyHistoryContinuesWhereItIsTold) {
     EXPECT_EQ(file->oldest(), 501u);
 }
 
-TEST_F(HistoryFileTest, WritesWhatEventsHaveInCommonOnce) {
+TEST_F(HistoryFileTest, StoresSharedTextsOnce) {
     std::vector<EventRecord> events;
     for (std::uint64_t id = 1; id <= 100; ++id) {
         events.push_back(testEvent(id, testTime, id % 2 == 0 ? "a" : "b",
@@ -87,7 +87,7 @@ TEST_F(HistoryFileTest, WritesWhatEventsHaveInCommonOnce) {
               52);
 }
 
-TEST_F(HistoryFileTest, EventsKeepTheTextThatTheirSituationHad) {
+TEST_F(HistoryFileTest, EventsKeepTheTextOfTheirSituation) {
     std::vector<EventRecord> events = {testEvent(1), testEvent(2), testEvent(3)};
     events[1].text = "as it was changed";
     file->store(*batchOf(events), {});
@@ -104,7 +104,7 @@ TEST_F(HistoryFileTest, EventsKeepTheTextThatTheirSituationHad) {
               4);
 }
 
-TEST_F(HistoryFileTest, ABatchIsStoredAsAWholeOrNotAtAll) {
+TEST_F(HistoryFileTest, ABatchIsStoredCompletelyOrNotAtAll) {
     file->store(*batchOf(1, 2), {{"sink", 1}});
     disk.failWrites(SQLITE_FULL);
     const auto batch = batchOf({testEvent(3, testTime, "new situation", "/new/log")});
@@ -130,7 +130,7 @@ TEST_F(HistoryFileTest, ABatchIsStoredAsAWholeOrNotAtAll) {
               1);
 }
 
-TEST_F(HistoryFileTest, KeepsCursorsUntilTheirSinkWasNotInUseForLong) {
+TEST_F(HistoryFileTest, KeepsCursorsUntilTheirSinkHasLongBeenUnused) {
     EXPECT_EQ(file->cursor("a"), std::nullopt);
     file->keepCursors({{"a", 10}, {"b", 20}});
     file->keepCursors({{"a", 11}});
@@ -161,7 +161,7 @@ TEST_F(HistoryFileTest, KeepsTheNewestEvents) {
     EXPECT_EQ(file->newest(), 5000u);
 }
 
-TEST_F(HistoryFileTest, RemovesWhatIsTooOldButNeverTheNewest) {
+TEST_F(HistoryFileTest, RemovesOldEventsButNeverTheNewest) {
     file->store(*batchOf(1, 10, testTime - 40 * day), {});
     file->store(*batchOf(11, 20, testTime - 20 * day), {});
     expireAll({1'000'000, testTime - 30 * day, testTime});
@@ -170,11 +170,11 @@ TEST_F(HistoryFileTest, RemovesWhatIsTooOldButNeverTheNewest) {
     expireAll({1'000'000, testTime - 10 * day, testTime});
     EXPECT_EQ(file->oldest(), 20u);
     EXPECT_EQ(count(), 1);
-    EXPECT_FALSE(file->expire({1'000'000, testTime, testTime})) << "ids go on from it";
+    EXPECT_FALSE(file->expire({1'000'000, testTime, testTime})) << "ids continue from it";
 }
 
 TEST_F(HistoryFileTest, AClockThatWasAheadDoesNotKeepEventsForEver) {
-    // 3000 events of a clock that was years ahead, among others that are old by now.
+    // 3000 events from a clock that was years ahead, among others that have expired.
     file->store(*batchOf(1, 10, testTime - 50 * day), {});
     file->store(*batchOf(11, 3010, testTime + 4000 * day), {});
     file->store(*batchOf(3011, 3020, testTime - 49 * day), {});
@@ -192,7 +192,7 @@ TEST_F(HistoryFileTest, AClockThatWasAheadDoesNotKeepEventsForEver) {
     EXPECT_EQ(file->oldest(), 3021u);
 }
 
-TEST_F(HistoryFileTest, AClockThatWasBehindDoesNotRemoveWhatIsNew) {
+TEST_F(HistoryFileTest, AClockThatWasBehindDoesNotRemoveNewEvents) {
     file->store(*batchOf(1, 10, testTime - day), {});
     file->store(*batchOf(11, 20, 0), {}); // 1970
     file->store(*batchOf(21, 30, testTime), {});
@@ -204,10 +204,11 @@ TEST_F(HistoryFileTest, AClockThatIsBehindRemovesNothingByAge) {
     file->store(*batchOf(1, 3000, testTime), {});
     const std::int64_t now = testTime - 9000 * day;
     EXPECT_FALSE(file->expire({1'000'000, now - 30 * day, now}));
-    EXPECT_TRUE(file->expire({2000, now - 30 * day, now})) << "the number holds all the same";
+    EXPECT_TRUE(file->expire({2000, now - 30 * day, now}))
+        << "the limit of the number still applies";
 }
 
-TEST_F(HistoryFileTest, GivesRoomBackALittleAtATime) {
+TEST_F(HistoryFileTest, ReturnsSpaceALittleAtATime) {
     std::vector<EventRecord> events;
     const std::string json(2000, 'x');
     for (std::uint64_t id = 1; id <= 20'000; ++id) {
@@ -228,7 +229,7 @@ TEST_F(HistoryFileTest, GivesRoomBackALittleAtATime) {
               0);
 }
 
-TEST_F(HistoryFileTest, ForgetsLabelsThatNoEventHasAtTheNextStart) {
+TEST_F(HistoryFileTest, RemovesUnusedLabelsAtTheNextStart) {
     file->store(*batchOf({testEvent(1, testTime, "gone", "/log/gone")}), {});
     file->store(*batchOf(2, 3), {});
     expireAll({1, 0, testTime});

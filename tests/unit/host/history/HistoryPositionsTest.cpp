@@ -1,7 +1,7 @@
 // Positions of followed logs in the history: together with the events before them, never ahead.
 
 #include "framework/LogPositions.h"
-#include "host/base/WallClock.h"
+#include "host/base/TimeText.h"
 #include "host/events/PositionBook.h"
 #include "host/history/History.h"
 #include "host/history/Statement.h"
@@ -54,7 +54,7 @@ protected:
         testing::internal::CaptureStderr();
         auto opened = History::open(config, state);
         testing::internal::GetCapturedStderr();
-        history = std::move(std::get<std::unique_ptr<History>>(opened));
+        history = std::move(*opened);
         queue = std::make_unique<EventQueue>(capacity, sizeof(TestRow), history->newest());
         PositionBook::makeCurrent(history->positions());
         history->positions()->setQueue(queue.get());

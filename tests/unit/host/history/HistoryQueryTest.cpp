@@ -36,7 +36,7 @@ protected:
     Database database{directory.file("history.db"), Database::Use::READ};
 };
 
-TEST_F(HistoryQueryTest, GivesEventsWithAllThatBelongsToThem) {
+TEST_F(HistoryQueryTest, ReturnsCompleteEvents) {
     EventRecord event = testEvent(1, testTime, "ssh", "/var/log/auth.log", "critical");
     event.json = R"({"id":1})";
     file.store(*batchOf({event, testEvent(2)}), {});
@@ -45,7 +45,7 @@ TEST_F(HistoryQueryTest, GivesEventsWithAllThatBelongsToThem) {
                                         R"({"id":1})"}));
 }
 
-TEST_F(HistoryQueryTest, NewestFirstUnlessAskedOtherwise) {
+TEST_F(HistoryQueryTest, ReturnsTheNewestFirstByDefault) {
     file.store(*batchOf(1, 500), {});
     EXPECT_EQ(ids({}).size(), 100u);
     EXPECT_THAT(ids({.limit = 3}), ElementsAre(500, 499, 498));
@@ -64,7 +64,7 @@ TEST_F(HistoryQueryTest, AnEmptyHistoryHasNoEvents) {
     EXPECT_THAT(ids({.situations = {"a"}}), IsEmpty());
 }
 
-TEST_F(HistoryQueryTest, TakesTextsAsTheyAre) {
+TEST_F(HistoryQueryTest, TakesTextsLiterally) {
     const std::string odd = "x' OR 1=1; DROP TABLE events; -- \" \\ % _ \xc3\xa4";
     file.store(*batchOf({testEvent(1, testTime, odd, odd, odd), testEvent(2)}), {});
     EXPECT_THAT(ids({.situations = {odd}, .logs = {odd}, .severities = {odd}}), ElementsAre(1));
@@ -99,7 +99,7 @@ TEST_F(HistoryQueryTest, FindsATextInTheWholeHistory) {
     EXPECT_THAT(ids({.text = "nowhere"}), IsEmpty());
 }
 
-TEST_F(HistoryQueryTest, ASearchWhoseTimeIsOverSaysHowFarItWas) {
+TEST_F(HistoryQueryTest, ASearchThatRunsOutOfTimeSaysHowFarItGot) {
     std::vector<std::string> rooms(1000);
     std::vector<EventRecord> events;
     for (std::uint64_t id = 1; id <= rooms.size(); ++id) {
@@ -127,7 +127,7 @@ TEST_F(HistoryQueryTest, ASearchWhoseTimeIsOverSaysHowFarItWas) {
         << "only a search for a text is limited in time";
 }
 
-TEST_F(HistoryQueryTest, AnEventThatIsNotWhatWasWrittenIsReportedAndNotGiven) {
+TEST_F(HistoryQueryTest, ADamagedEventIsReportedAndNotReturned) {
     std::vector<std::string> rooms(9);
     std::vector<EventRecord> events;
     for (std::uint64_t id = 1; id <= rooms.size(); ++id) {
@@ -139,7 +139,8 @@ TEST_F(HistoryQueryTest, AnEventThatIsNotWhatWasWrittenIsReportedAndNotGiven) {
     writer.run("UPDATE events SET raised = raised + 1 WHERE id = 4");
     writer.run("UPDATE events SET label = 99 WHERE id = 6");
     writer.run("UPDATE events SET json = '{\"row', checksum = NULL WHERE id = 7");
-    writer.run("UPDATE events SET checksum = NULL WHERE id = 8"); // of an earlier version
+    writer.run(
+        "UPDATE events SET checksum = NULL WHERE id = 8"); // as written by an earlier version
     const EventPage page = HistoryQuery(database, {.newestFirst = false}).run();
     EXPECT_THAT(page.damaged, ElementsAre(2, 4, 6, 7));
     EXPECT_THAT(ids({.newestFirst = false}), ElementsAre(1, 3, 5, 8, 9));
@@ -147,7 +148,7 @@ TEST_F(HistoryQueryTest, AnEventThatIsNotWhatWasWrittenIsReportedAndNotGiven) {
                 ElementsAre(2, 4, 6));
 }
 
-TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutAWalkThroughTheOthers) {
+TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutScanningTheOthers) {
     std::vector<EventRecord> events;
     for (std::uint64_t id = 1; id <= 200'000; ++id) {
         events.push_back(testEvent(id, testTime, id == 77 ? "rare" : "often"));
@@ -158,7 +159,7 @@ TEST_F(HistoryQueryTest, ARareSituationIsFoundWithoutAWalkThroughTheOthers) {
     EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(20));
 }
 
-/// What a plain walk over all events gives.
+/// What a plain scan of all events finds.
 std::vector<std::uint64_t> expected(const std::vector<EventRecord>& events,
                                     const EventFilter& filter) {
     const auto isOneOf = [](std::string_view text, const std::vector<std::string>& texts) {
@@ -181,7 +182,7 @@ std::vector<std::uint64_t> expected(const std::vector<EventRecord>& events,
     return ids;
 }
 
-TEST_F(HistoryQueryTest, GivesWhatAPlainWalkGivesWhateverTheFilterAndTheClock) {
+TEST_F(HistoryQueryTest, AgreesWithAPlainScanWhateverTheFilterAndTheClock) {
     const unsigned seed = std::random_device{}();
     std::cout << "seed " << seed << std::endl;
     std::mt19937 random(seed);
@@ -193,7 +194,7 @@ TEST_F(HistoryQueryTest, GivesWhatAPlainWalkGivesWhateverTheFilterAndTheClock) {
     std::int64_t raised = testTime;
     const std::uint64_t first = 1 + upTo(3000);
     for (std::uint64_t id = first; id < first + 6000; ++id) {
-        // Now and then the clock is set, mostly back.
+        // Occasionally the clock is set, mostly back.
         raised += upTo(999) == 0 ? static_cast<std::int64_t>(upTo(900'000)) - 600'000
                                  : static_cast<std::int64_t>(upTo(100));
         events.push_back(testEvent(id, raised, names[upTo(3)], names[upTo(2)],

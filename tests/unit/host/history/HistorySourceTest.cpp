@@ -32,7 +32,7 @@ constexpr std::size_t plenty = 1'000'000;
 
 class HistorySourceTest : public testing::Test {
 protected:
-    /// Events on disk, and in memory where there is room for them.
+    /// Events on disk, and in memory as far as there is room.
     void commit(std::uint64_t first, std::uint64_t last) {
         const auto batch = batchOf(first, last);
         file.store(*batch, {});
@@ -64,7 +64,7 @@ protected:
     HistorySource source{"sink x", recent, readers, cursor};
 };
 
-TEST_F(HistorySourceTest, GivesWhatIsInMemoryWithoutReadingTheFile) {
+TEST_F(HistorySourceTest, ReturnsWhatIsInMemoryWithoutReadingTheFile) {
     disk.failReads(SQLITE_IOERR_READ);
     recent.publish(batchOf(1, 100));
     recent.publish(batchOf(101, 150));
@@ -80,7 +80,7 @@ TEST_F(HistorySourceTest, GivesWhatIsInMemoryWithoutReadingTheFile) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(HistorySourceTest, GivesTheTextOfTheSituationFromTheFileToo) {
+TEST_F(HistorySourceTest, ReturnsTheSituationsTextFromTheFileToo) {
     std::vector<EventRecord> events = {testEvent(1), testEvent(2)};
     events[1].text = "The door was opened";
     file.store(*batchOf(events), {});
@@ -92,7 +92,7 @@ TEST_F(HistorySourceTest, GivesTheTextOfTheSituationFromTheFileToo) {
     EXPECT_EQ(given[1].text, "The door was opened");
 }
 
-TEST_F(HistorySourceTest, CatchesUpFromTheFileAndGoesOnInMemory) {
+TEST_F(HistorySourceTest, CatchesUpFromTheFileAndContinuesInMemory) {
     file.store(*batchOf(1, 1000), {});
     RecentEvents later(plenty, 1000);
     cursor = 10;
@@ -125,7 +125,7 @@ TEST_F(HistorySourceTest, WaitsForEvents) {
     EXPECT_EQ(reading.get(), 3u);
 }
 
-TEST_F(HistorySourceTest, AfterTheEndItGivesWhatIsLeft) {
+TEST_F(HistorySourceTest, ReturnsWhatIsLeftAfterTheEnd) {
     auto waiting = std::async(std::launch::async, [&] { return takeUntil(UINT64_MAX); });
     commit(1, 5);
     source.end();
@@ -133,7 +133,7 @@ TEST_F(HistorySourceTest, AfterTheEndItGivesWhatIsLeft) {
     EXPECT_TRUE(source.read(1).empty());
 }
 
-TEST_F(HistorySourceTest, PassesOverWhatTheHistoryNoLongerHoldsAndSaysSo) {
+TEST_F(HistorySourceTest, SkipsAndReportsWhatTheHistoryNoLongerHolds) {
     file.store(*batchOf(1, 1000), {});
     while (file.expire({100, 0, testTime})) {
     }
@@ -149,7 +149,7 @@ TEST_F(HistorySourceTest, PassesOverWhatTheHistoryNoLongerHoldsAndSaysSo) {
     EXPECT_EQ(late.backlog(), 100u);
 }
 
-TEST_F(HistorySourceTest, PassesOverWhatIsDamagedAndSaysSo) {
+TEST_F(HistorySourceTest, SkipsAndReportsDamagedEvents) {
     for (std::uint64_t first = 1; first <= 1000; first += 100) {
         file.store(*batchOf(first, first + 99), {});
     }
@@ -180,8 +180,8 @@ TEST_F(HistorySourceTest, PassesOverWhatIsDamagedAndSaysSo) {
               "is not what was written");
 }
 
-TEST_F(HistorySourceTest, ReachesBackInMemoryWhereTheFileIsNew) {
-    // The file was exchanged: event 1 to 20 are gone, 21 to 30 still in memory.
+TEST_F(HistorySourceTest, FindsOlderEventsInMemoryWhenTheFileIsNew) {
+    // The file was replaced: events 1 to 20 are gone, 21 to 30 are still in memory.
     recent.publish(batchOf(21, 30));
     testing::internal::CaptureStderr();
     EXPECT_EQ(takeUntil(30), idsFrom(21, 30));
@@ -196,7 +196,7 @@ TEST_F(HistorySourceTest, ReachesBackInMemoryWhereTheFileIsNew) {
         "zrmagent: late did not get the events 31 to 40: the history no longer contains them\n");
 }
 
-TEST_F(HistorySourceTest, TriesAgainWhenTheFileCannotBeRead) {
+TEST_F(HistorySourceTest, RetriesWhenTheFileCannotBeRead) {
     file.store(*batchOf(1, 10), {});
     RecentEvents later(plenty, 10);
     HistorySource late("late", later, readers, cursor);
@@ -211,7 +211,7 @@ TEST_F(HistorySourceTest, TriesAgainWhenTheFileCannotBeRead) {
     EXPECT_FALSE(readers.takeCorruption());
 }
 
-TEST_F(HistorySourceTest, AFileThatCannotBeReadDoesNotHoldUpTheEnd) {
+TEST_F(HistorySourceTest, AnUnreadableFileDoesNotDelayTheStop) {
     file.store(*batchOf(1, 10), {});
     RecentEvents later(plenty, 10);
     HistorySource late("late", later, readers, cursor);

@@ -33,7 +33,7 @@ protected:
     std::unique_ptr<RateTable> table;
 };
 
-TEST_F(RateTableTest, KnowsNothingOfMinutesThatWereNotWatched) {
+TEST_F(RateTableTest, HasNoValueForMinutesThatWereNotWatched) {
     EXPECT_THAT(read(start, start + 3).logs, IsEmpty());
     table->watched(start);
     table->watched(start + 2);
@@ -50,7 +50,7 @@ TEST_F(RateTableTest, KnowsNothingOfMinutesThatWereNotWatched) {
                 ElementsAre(std::nullopt, Optional(0u), std::nullopt, Optional(1u), std::nullopt));
 }
 
-TEST_F(RateTableTest, AddsTheMinutesOfAStepUp) {
+TEST_F(RateTableTest, AddsUpTheMinutesOfAStep) {
     for (std::int64_t at = start; at < start + 10; ++at) {
         table->watched(at);
         table->add(at, 1, 1, 0);
@@ -68,7 +68,7 @@ TEST_F(RateTableTest, AddsTheMinutesOfAStepUp) {
                 ElementsAre(Optional(2 * inFirst), Optional(10u), Optional(2 * (5 - inFirst))));
 }
 
-TEST_F(RateTableTest, AWindowBeginsAndEndsWithWholeSteps) {
+TEST_F(RateTableTest, AWindowConsistsOfWholeSteps) {
     table->add(start, 1, 1, 0);
     const Rates rates =
         RateTable::read(database, start * minute + 59'999, start * minute + 60'001, minute);
@@ -79,7 +79,7 @@ TEST_F(RateTableTest, AWindowBeginsAndEndsWithWholeSteps) {
     EXPECT_THAT(read(start, start - 5).logs, IsEmpty());
 }
 
-TEST_F(RateTableTest, ForgetsWhatIsMoreThanADayAway) {
+TEST_F(RateTableTest, DropsWhatIsMoreThanADayAway) {
     for (const std::int64_t at : {start, start + 1, start + 1440, start + 9000}) {
         table->add(at, 1, 1, 0);
         database.run("INSERT INTO minutes VALUES (" + std::to_string(at) + ")");

@@ -17,7 +17,7 @@ using Clock = RecentEvents::Clock;
 
 constexpr std::size_t plenty = 1'000'000;
 
-TEST(RecentEvents, GivesTheBatchThatFollowsAnEvent) {
+TEST(RecentEvents, ReturnsTheBatchAfterAnEvent) {
     RecentEvents recent(plenty, 10);
     EXPECT_EQ(recent.newest(), 10u);
     EXPECT_EQ(recent.after(5), nullptr);
@@ -34,7 +34,7 @@ TEST(RecentEvents, GivesTheBatchThatFollowsAnEvent) {
     EXPECT_EQ(recent.oldest()->first(), 11u);
 }
 
-TEST(RecentEvents, ForgetsTheOldestWhenTheyTakeTooMuchMemory) {
+TEST(RecentEvents, DropsTheOldestWhenTheyTakeTooMuchMemory) {
     const std::size_t one = batchOf(1, 100)->bytes();
     RecentEvents recent(3 * one + one / 2, 0);
     for (std::uint64_t first = 1; first < 1000; first += 100) {

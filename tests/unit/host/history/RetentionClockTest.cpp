@@ -22,25 +22,26 @@ protected:
     RetentionClock::Clock::time_point steady{};
 };
 
-TEST_F(RetentionClockTest, GoesByTheTimeOfDay) {
+TEST_F(RetentionClockTest, FollowsTheWallClock) {
     EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
     EXPECT_EQ(after(60min, 1001 * hour), 1001 * hour);
-    EXPECT_EQ(after(60min, 1003 * hour), 1003 * hour) << "an hour more is nothing to mistrust";
-    EXPECT_EQ(after(60min, 900 * hour), 900 * hour) << "back is believed: nothing expires by it";
+    EXPECT_EQ(after(60min, 1003 * hour), 1003 * hour) << "one more hour is not a jump";
+    EXPECT_EQ(after(60min, 900 * hour), 900 * hour)
+        << "a step back is accepted: nothing expires because of it";
 }
 
-TEST_F(RetentionClockTest, BelievesALeapWhenItHasLasted) {
+TEST_F(RetentionClockTest, AcceptsAJumpThatHasLasted) {
     EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
     EXPECT_EQ(after(60min, 9000 * hour), 1001 * hour);
     EXPECT_EQ(after(59min, 9001 * hour), 1001 * hour + 59 * 60'000);
     EXPECT_EQ(after(1min, 9001 * hour), 9001 * hour);
 }
 
-TEST_F(RetentionClockTest, ALeapThatIsTakenBackNeverWas) {
+TEST_F(RetentionClockTest, IgnoresAJumpThatIsUndone) {
     EXPECT_EQ(after(0min, 1000 * hour), 1000 * hour);
     EXPECT_EQ(after(60min, 9000 * hour), 1001 * hour);
     EXPECT_EQ(after(60min, 1002 * hour), 1002 * hour);
-    EXPECT_EQ(after(60min, 9000 * hour), 1003 * hour) << "the hour begins anew";
+    EXPECT_EQ(after(60min, 9000 * hour), 1003 * hour) << "the hour starts over";
 }
 
 } // namespace

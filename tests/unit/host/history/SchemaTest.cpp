@@ -49,7 +49,7 @@ protected:
     Database database{directory.file("history.db"), Database::Use::WRITE};
 };
 
-TEST_F(SchemaTest, MakesTheTablesOfANewFile) {
+TEST_F(SchemaTest, CreatesTheTablesOfANewFile) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     for (const char* const table : {"events", "labels", "logs", "marks", "origin", "cursors",
@@ -60,7 +60,7 @@ TEST_F(SchemaTest, MakesTheTablesOfANewFile) {
     EXPECT_EQ(versionOf(database), Schema::version);
 }
 
-TEST_F(SchemaTest, BringsAFileOfTheFirstVersionUpToDate) {
+TEST_F(SchemaTest, UpgradesAFileOfTheFirstVersion) {
     database.run(firstVersion);
     ASSERT_FALSE(hasTable(database, "rates"));
     Schema::bringUpToDate(database);
@@ -70,7 +70,7 @@ TEST_F(SchemaTest, BringsAFileOfTheFirstVersionUpToDate) {
     EXPECT_EQ(database.number("SELECT event FROM cursors"), 40);
 }
 
-TEST_F(SchemaTest, BringsAFileOfTheSecondVersionUpToDate) {
+TEST_F(SchemaTest, UpgradesAFileOfTheSecondVersion) {
     database.run(firstVersion);
     database.run(
         "CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
@@ -99,7 +99,7 @@ TEST_F(SchemaTest, BringsAFileOfTheSecondVersionUpToDate) {
         << "events still refer to labels";
 }
 
-TEST_F(SchemaTest, BringsAFileOfTheThirdVersionUpToDate) {
+TEST_F(SchemaTest, UpgradesAFileOfTheThirdVersion) {
     database.run(firstVersion);
     database.run("CREATE TABLE minutes (minute INTEGER PRIMARY KEY);"
                  "CREATE TABLE rates (minute INTEGER NOT NULL, log INTEGER NOT NULL,"
@@ -113,7 +113,7 @@ TEST_F(SchemaTest, BringsAFileOfTheThirdVersionUpToDate) {
     ASSERT_TRUE(event.step());
     EXPECT_EQ(event.integer(0), 41);
     EXPECT_EQ(event.text(1), "{}");
-    EXPECT_TRUE(event.isNull(2)) << "what was stored before has no checksum";
+    EXPECT_TRUE(event.isNull(2)) << "an older event has no checksum";
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
@@ -126,7 +126,7 @@ TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
 }
 
-TEST_F(SchemaTest, AStepThatFailsLeavesTheOlderVersionWhole) {
+TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {
     database.run(firstVersion);
     disk.failWrites(SQLITE_FULL);
     EXPECT_THROW(Schema::bringUpToDate(database), DatabaseError);
@@ -142,7 +142,7 @@ TEST_F(SchemaTest, RefusesAFileOfALaterVersion) {
     database.run("PRAGMA user_version = " + std::to_string(Schema::version + 1));
     try {
         Schema::bringUpToDate(database);
-        FAIL() << "it was taken";
+        FAIL() << "the file was accepted";
     } catch (const SchemaTooNew& error) {
         EXPECT_STREQ(error.what(),
                      ("it has version " + std::to_string(Schema::version + 1) +

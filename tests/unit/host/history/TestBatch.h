@@ -11,10 +11,10 @@
 
 using namespace zrm::host;
 
-/// The moment at which test events are raised: 2026-11-20, UTC.
+/// When test events are raised: 2026-11-20, UTC.
 inline constexpr std::int64_t testTime = 1'795'158'189'412;
 
-/// An event for tests; its text is as good as JSON for a history.
+/// An event for tests; its text need not be JSON for a history.
 inline EventRecord testEvent(std::uint64_t id, std::int64_t raised = testTime,
                              std::string_view situation = "watch",
                              std::string_view log = "/var/log/app.log",

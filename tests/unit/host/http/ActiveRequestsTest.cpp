@@ -1,4 +1,4 @@
-#include "host/http/ActiveRequests.h"
+#include "host/http/RequestDispatcher.h"
 
 #include <gtest/gtest.h>
 
@@ -13,7 +13,7 @@ namespace {
 using namespace std::chrono_literals;
 using Clock = std::chrono::steady_clock;
 
-TEST(ActiveRequests, CloseWaitsForOthersAndLetsNoneBegin) {
+TEST(ActiveRequests, CloseWaitsForOthersAndAdmitsNoMore) {
     ActiveRequests requests;
     std::promise<void> begun;
     std::promise<void> go;

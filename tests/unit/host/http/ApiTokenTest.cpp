@@ -1,6 +1,7 @@
 #include "host/http/ApiToken.h"
 
 #include "support/Faults.h"
+#include "support/ReasonOf.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -22,11 +23,7 @@ const std::string secret = "0123456789abcdef0123456789abcdef";
 
 class ApiTokenTest : public testing::Test {
 protected:
-    static std::string problem(const std::string& path) {
-        const auto token = ApiToken::load(path);
-        const auto* const text = std::get_if<std::string>(&token);
-        return text == nullptr ? "" : *text;
-    }
+    static std::string problem(const std::string& path) { return reasonOf(ApiToken::load(path)); }
     std::string content() const {
         std::ifstream stream(path);
         return {std::istreambuf_iterator<char>(stream), {}};
@@ -46,19 +43,19 @@ protected:
     std::string path = directory.file("api-token");
 };
 
-TEST_F(ApiTokenTest, MakesTheFileForTheOwnerAlone) {
+TEST_F(ApiTokenTest, CreatesTheFileForTheOwnerOnly) {
     EXPECT_EQ(problem(path), "");
     EXPECT_EQ(mode(path), 0600u);
     EXPECT_THAT(content(), testing::MatchesRegex("[0-9a-f]+\n"));
     EXPECT_EQ(content().size(), 65u);
     const std::string first = content();
     EXPECT_EQ(problem(path), "");
-    EXPECT_EQ(content(), first) << "a token stays";
+    EXPECT_EQ(content(), first) << "the token is kept";
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(directory.path()), {}), 1)
         << "nothing else is left behind";
 }
 
-TEST_F(ApiTokenTest, EveryTokenIsAnother) {
+TEST_F(ApiTokenTest, EveryTokenIsDifferent) {
     problem(path);
     const std::string first = content();
     std::filesystem::remove(path);
@@ -66,27 +63,27 @@ TEST_F(ApiTokenTest, EveryTokenIsAnother) {
     EXPECT_NE(content(), first);
 }
 
-TEST_F(ApiTokenTest, MakesTheDirectory) {
+TEST_F(ApiTokenTest, CreatesTheDirectory) {
     const std::string inside = directory.file("state/api-token");
     EXPECT_EQ(problem(inside), "");
     EXPECT_EQ(mode(inside), 0600u);
     EXPECT_EQ(mode(directory.file("state")) & 0007u, 0u);
 }
 
-TEST_F(ApiTokenTest, TakesAnOperatorsOwnToken) {
+TEST_F(ApiTokenTest, AcceptsAnOperatorsOwnToken) {
     const auto loaded = ApiToken::load(withContent(secret + "\r\n", 0640));
-    ASSERT_TRUE(std::holds_alternative<ApiToken>(loaded));
-    EXPECT_TRUE(std::get<ApiToken>(loaded).matches(secret));
+    ASSERT_TRUE(loaded);
+    EXPECT_TRUE(loaded->matches(secret));
 }
 
-TEST_F(ApiTokenTest, RefusesAFileThatEveryoneReads) {
+TEST_F(ApiTokenTest, RefusesAFileThatEveryoneCanRead) {
     EXPECT_EQ(problem(withContent(secret, 0644)),
               path +
                   " is accessible to every user: remove the permissions of other users (chmod o= " +
                   path + ") or remove it to have a new one created");
 }
 
-TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
+TEST_F(ApiTokenTest, RefusesTextsThatAreNotTokens) {
     const std::string expected = path + " does not contain a token of 32 to 1024 visible "
                                         "characters: remove it to have a new one created";
     for (const std::string& text :
@@ -97,22 +94,22 @@ TEST_F(ApiTokenTest, RefusesTextsThatAreNoToken) {
     EXPECT_EQ(problem(withContent(std::string(1024, 'x'))), "");
 }
 
-TEST_F(ApiTokenTest, RefusesWhatIsNoFile) {
+TEST_F(ApiTokenTest, RefusesWhatIsNotAFile) {
     const std::string itself = directory.path();
     EXPECT_EQ(problem(itself), itself + " is not a file that can contain a token");
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
     EXPECT_EQ(problem(path), path + " is not a file that can contain a token")
-        << "nobody waits for it";
+        << "it does not wait for the pipe";
 }
 
-TEST_F(ApiTokenTest, NothingIsMadeWhereALinkLeads) {
+TEST_F(ApiTokenTest, CreatesNothingThroughALink) {
     const std::string target = directory.file("target");
     std::filesystem::create_symlink(target, path);
-    EXPECT_TRUE(std::holds_alternative<std::string>(ApiToken::load(path)));
+    EXPECT_FALSE(ApiToken::load(path));
     EXPECT_FALSE(std::filesystem::exists(target));
 }
 
-TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
+TEST_F(ApiTokenTest, ReportsWhyThereIsNoToken) {
     const std::string deep = directory.file("no/such/api-token");
     EXPECT_EQ(problem(deep), "cannot create the directory " + directory.file("no/such") +
                                  ": No such file or directory");
@@ -134,11 +131,11 @@ TEST_F(ApiTokenTest, SaysWhyThereIsNoToken) {
         EXPECT_THAT(problem(path), testing::MatchesRegex("cannot write " + path +
                                                          "\\.......: No space left on device"));
         std::filesystem::remove(directory.file("file"));
-        EXPECT_TRUE(std::filesystem::is_empty(directory.path())) << "no half of a token stays";
+        EXPECT_TRUE(std::filesystem::is_empty(directory.path())) << "no partial token is left";
     }
 }
 
-TEST(ApiToken, MatchesTheWholeTokenAlone) {
+TEST(ApiToken, MatchesOnlyTheWholeToken) {
     const ApiToken token(secret);
     EXPECT_TRUE(token.matches(secret));
     for (const std::string& wrong :

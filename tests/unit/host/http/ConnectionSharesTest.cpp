@@ -11,7 +11,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-TEST(ConnectionShares, NoAddressTakesAllPlaces) {
+TEST(ConnectionShares, NoAddressTakesAllConnections) {
     ConnectionShares shares;
     shares.setMost(80);
     EXPECT_EQ(shares.share(false), 10u);
@@ -20,7 +20,7 @@ TEST(ConnectionShares, NoAddressTakesAllPlaces) {
         EXPECT_TRUE(shares.take("203.0.113.1", false));
     }
     EXPECT_FALSE(shares.take("203.0.113.1", false));
-    EXPECT_TRUE(shares.take("203.0.113.2", false)) << "others have room";
+    EXPECT_TRUE(shares.take("203.0.113.2", false)) << "others are accepted";
     for (int count = 0; count < 60; ++count) {
         EXPECT_TRUE(shares.take("127.0.0.1", true));
     }
@@ -31,10 +31,10 @@ TEST(ConnectionShares, NoAddressTakesAllPlaces) {
     EXPECT_TRUE(shares.take("203.0.113.1", false)) << "there is room again";
 }
 
-TEST(ConnectionShares, AllTogetherAreBounded) {
+TEST(ConnectionShares, TheTotalIsBounded) {
     ConnectionShares shares;
     shares.setMost(4);
-    EXPECT_EQ(shares.share(false), 4u) << "a few are enough for a browser";
+    EXPECT_EQ(shares.share(false), 4u) << "enough for a browser";
     for (const char* const address : {"a", "b", "c", "d"}) {
         EXPECT_FALSE(shares.isTight());
         EXPECT_TRUE(shares.take(address, false));
@@ -45,7 +45,7 @@ TEST(ConnectionShares, AllTogetherAreBounded) {
     EXPECT_EQ(shares.refused(), 2u);
 }
 
-TEST(ConnectionShares, TheLastOneIsWaitedFor) {
+TEST(ConnectionShares, WaitsForTheLastConnection) {
     ConnectionShares shares;
     shares.setMost(4);
     EXPECT_TRUE(shares.waitForNone(ConnectionShares::Clock::now()));

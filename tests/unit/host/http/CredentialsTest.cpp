@@ -1,5 +1,6 @@
 #include "host/http/Credentials.h"
 
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -26,7 +27,7 @@ protected:
         directory.write("token", text);
         chmod(token.c_str(), 0600);
     }
-    /// Makes a certificate for this name, and its key.
+    /// Creates a certificate for this name, and its key.
     void makePair(const std::string& name) const {
         const std::string command =
             "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -subj /CN=" +
@@ -35,10 +36,10 @@ protected:
         ASSERT_EQ(std::system(command.c_str()), 0);
     }
     void take(const std::string& path) const { std::filesystem::rename(path + ".new", path); }
-    /// What comes of looking until a change is noticed, or three times.
+    /// The result of up to three checks, until one notices a change.
     static Credentials::Change look(Credentials& credentials) {
         Credentials::Change change;
-        for (int count = 0; count < 3 && !change.isNew && change.problem.empty(); ++count) {
+        for (int count = 0; count < 3 && !change.isNew && !change.problem; ++count) {
             change = credentials.refresh();
         }
         return change;
@@ -47,7 +48,7 @@ protected:
         for (int count = 0; count < 3; ++count) {
             const Credentials::Change change = credentials.refresh();
             EXPECT_FALSE(change.isNew);
-            EXPECT_EQ(change.problem, "");
+            EXPECT_FALSE(change.problem);
         }
     }
 
@@ -58,9 +59,9 @@ protected:
     std::string key = directory.file("agent.key");
 };
 
-TEST_F(CredentialsTest, TakesAChangedToken) {
+TEST_F(CredentialsTest, LoadsAChangedToken) {
     Credentials credentials(token, "", "");
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     EXPECT_TRUE(credentials.token().matches(first));
     EXPECT_EQ(credentials.tls(), nullptr);
     expectNothingNew(credentials);
@@ -73,9 +74,9 @@ TEST_F(CredentialsTest, TakesAChangedToken) {
 
 TEST_F(CredentialsTest, ATokenThatCannotBeUsedIsReportedOnce) {
     Credentials credentials(token, "", "");
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     writeToken("short");
-    EXPECT_THAT(look(credentials).problem,
+    EXPECT_THAT(look(credentials).problem.value().text(),
                 testing::StartsWith("the previous token stays in use: " + token));
     EXPECT_TRUE(credentials.token().matches(first));
     expectNothingNew(credentials);
@@ -83,33 +84,33 @@ TEST_F(CredentialsTest, ATokenThatCannotBeUsedIsReportedOnce) {
     expectNothingNew(credentials);
 }
 
-TEST_F(CredentialsTest, TakesAChangedCertificate) {
+TEST_F(CredentialsTest, LoadsAChangedCertificate) {
     makePair("one.example");
     take(certificate);
     take(key);
     Credentials credentials(token, certificate, key);
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     const auto before = credentials.tls();
     EXPECT_TRUE(before->isFor("one.example"));
     makePair("two.example");
     take(certificate);
     credentials.refresh();
-    credentials.refresh(); // between the two files nothing is said
+    credentials.refresh(); // nothing is reported between the two files
     take(key);
     EXPECT_TRUE(look(credentials).isNew);
     EXPECT_TRUE(credentials.tls()->isFor("two.example"));
-    EXPECT_TRUE(before->isFor("one.example")) << "connections that have it live on";
+    EXPECT_TRUE(before->isFor("one.example")) << "it stays valid for the connections that use it";
 }
 
-TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
+TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndThePreviousOneStays) {
     makePair("one.example");
     take(certificate);
     take(key);
     Credentials credentials(token, certificate, key);
-    EXPECT_EQ(credentials.load(), "");
+    EXPECT_EQ(reasonOf(credentials.load()), "");
     directory.write("agent.pem", "nonsense");
     EXPECT_THAT(
-        look(credentials).problem,
+        look(credentials).problem.value().text(),
         testing::StartsWith("the previous certificate stays in use: cannot use the certificate " +
                             certificate));
     EXPECT_TRUE(credentials.tls()->isFor("one.example"));
@@ -122,10 +123,10 @@ TEST_F(CredentialsTest, ABrokenCertificateIsReportedOnceAndTheOneBeforeGoesOn) {
 }
 
 TEST_F(CredentialsTest, WithoutAUsableFileThereIsAProblemAtOnce) {
-    EXPECT_THAT(Credentials(token, certificate, key).load(),
+    EXPECT_THAT(reasonOf(Credentials(token, certificate, key).load()),
                 testing::StartsWith("cannot use the certificate"));
     writeToken("short");
-    EXPECT_THAT(Credentials(token, "", "").load(),
+    EXPECT_THAT(reasonOf(Credentials(token, "", "").load()),
                 testing::StartsWith(token + " does not contain a token"));
 }
 

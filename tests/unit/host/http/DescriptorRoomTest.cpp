@@ -1,4 +1,4 @@
-#include "host/http/DescriptorRoom.h"
+#include "host/http/ConnectionShares.h"
 
 #include <gtest/gtest.h>
 
@@ -46,7 +46,7 @@ TEST(DescriptorRoom, LeavesTheLowDescriptorsToTheAgent) {
     EXPECT_GE(softLimit(), 1024u + 500u) << "the soft limit was raised";
 }
 
-/// Descriptors that the process's table has room for at present.
+/// The current size of the process's descriptor table.
 int tableSize() {
     std::ifstream status("/proc/self/status");
     std::string word;
@@ -57,7 +57,7 @@ int tableSize() {
     return size;
 }
 
-TEST(DescriptorRoom, IsThereBeforeTheFirstClientComes) {
+TEST(DescriptorRoom, IsReservedBeforeTheFirstClient) {
     const auto inAProcessOfItsOwn = [] {
         const bool wasSmall = tableSize() <= 1024;
         const DescriptorRoom room = DescriptorRoom::make(500);
@@ -67,7 +67,7 @@ TEST(DescriptorRoom, IsThereBeforeTheFirstClientComes) {
     EXPECT_EXIT(inAProcessOfItsOwn(), testing::ExitedWithCode(0), "");
 }
 
-TEST(DescriptorRoom, TakesHalfOfTheFewThatThereAre) {
+TEST(DescriptorRoom, TakesHalfOfFewDescriptors) {
     const auto inAProcessOfItsOwn = [] {
         const rlimit few{100, 100};
         setrlimit(RLIMIT_NOFILE, &few);

@@ -3,8 +3,8 @@
 
 #include <mutex>
 
-/// Orders what a test and the server's threads do: a request over a socket orders it too, but
-/// ThreadSanitizer does not know. Whoever passes sees what others did before they passed.
+/// Synchronises a test with the server's threads. A request over a socket orders them as well, but
+/// ThreadSanitizer does not know that. A thread that passes sees what others did before passing.
 class Handoff {
 public:
     void pass() { const std::lock_guard guard(m_mutex); }

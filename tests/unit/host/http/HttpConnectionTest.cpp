@@ -3,6 +3,7 @@
 #include "host/http/HttpServer.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
 #include "unit/host/http/TestClient.h"
@@ -10,7 +11,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <csignal>
@@ -43,9 +43,9 @@ protected:
             router.add(method, "/answer",
                        [this](const HttpRequest& request) { return handle(request); });
         }
-        ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     }
-    /// Gives the answer that the test has set.
+    /// Returns the answer that the test has set.
     HttpAnswer handle(const HttpRequest& request) {
         handoff.pass();
         body = request.body;
@@ -65,7 +65,7 @@ protected:
         return "GET " + path + " HTTP/1.1\r\nHost: localhost:" + std::to_string(server.port()) +
                "\r\nAuthorization: Bearer " + secret + "\r\n\r\n";
     }
-    /// Makes the answer a stream, whose channel comes to the test.
+    /// Makes the answer a stream whose channel the test gets.
     std::future<std::shared_ptr<BodyChannel>> streams() {
         auto begun = std::make_shared<std::promise<std::shared_ptr<BodyChannel>>>();
         answer.stream.begin = [begun](std::shared_ptr<BodyChannel> channel) {
@@ -86,7 +86,7 @@ protected:
     Handoff handoff;
     HttpAnswer answer = HttpAnswer::json("{}");
     std::string body;
-    std::function<void(const HttpRequest&)> work; ///< what the handler does besides
+    std::function<void(const HttpRequest&)> work; ///< what else the handler does
     std::stop_token cancelled;                    ///< of the last request
     std::mutex mutex;
     std::condition_variable changed; ///< a channel has changed
@@ -94,7 +94,7 @@ protected:
     HttpServer server{router};
 };
 
-TEST_F(HttpConnectionTest, AnswersHaveTheirOwnHeadersInPlaceOfTheUsualOnes) {
+TEST_F(HttpConnectionTest, AnswersMayReplaceTheUsualHeaders) {
     answer.headers = {{"Cache-Control", "max-age=60"}, {"X-Own", "1"}};
     const auto result = client().get("/answer");
     ASSERT_TRUE(result);
@@ -127,7 +127,7 @@ TEST_F(HttpConnectionTest, OneConnectionServesManyRequests) {
     EXPECT_EQ(server.connections(), 1u);
 }
 
-TEST_F(HttpConnectionTest, ARequestIsReadAsItWasSent) {
+TEST_F(HttpConnectionTest, PassesTheRequestToItsHandler) {
     HttpRequest seen;
     Router other;
     other.add("GET", "/a/{name}", [&](const HttpRequest& request) {
@@ -137,7 +137,7 @@ TEST_F(HttpConnectionTest, ARequestIsReadAsItWasSent) {
         return HttpAnswer::json("{}");
     });
     HttpServer another(other);
-    ASSERT_EQ(another.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+    ASSERT_EQ(reasonOf(another.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     TestClient asking("127.0.0.1", another.port(), secret);
     EXPECT_EQ(asking
                   .get("/a/x%2Fy%25?b=1%202&b=%26",
@@ -185,7 +185,7 @@ TEST_F(HttpConnectionTest, AStreamIsSentAsItIsWritten) {
     });
     const std::shared_ptr<BodyChannel> channel = begun.get();
     channel->send("first");
-    // What was written must have come before anything follows.
+    // What was written must arrive before anything follows.
     seen.get_future().wait();
     EXPECT_TRUE(waitFor([&] { return channel->isReady(); }));
     channel->send("");
@@ -201,7 +201,7 @@ TEST_F(HttpConnectionTest, AStreamIsSentAsItIsWritten) {
     channel->end();
 }
 
-TEST_F(HttpConnectionTest, AnOlderClientGetsAStreamWithoutChunks) {
+TEST_F(HttpConnectionTest, AnHttp10ClientGetsAStreamWithoutChunks) {
     auto begun = streams();
     auto asked = std::async(std::launch::async, [&, asking = client()]() mutable {
         std::string request = head("/answer");
@@ -215,14 +215,14 @@ TEST_F(HttpConnectionTest, AnOlderClientGetsAStreamWithoutChunks) {
                                             testing::EndsWith("\r\n\r\ntext")));
 }
 
-TEST_F(HttpConnectionTest, HeadBeginsNoStream) {
+TEST_F(HttpConnectionTest, HeadStartsNoStream) {
     std::atomic<bool> hasBegun{false};
     answer.stream.begin = [&](const auto&) { hasBegun = true; };
     EXPECT_EQ(client().ask("HEAD", "/answer")->status, 200);
     EXPECT_FALSE(hasBegun);
 }
 
-TEST_F(HttpConnectionTest, AStreamLearnsThatItsClientHasGone) {
+TEST_F(HttpConnectionTest, AStreamNoticesThatItsClientHasGone) {
     auto begun = streams();
     const int fd = TestClient::connected(server.port());
     const std::string request = head("/answer");
@@ -241,9 +241,9 @@ TEST_F(HttpConnectionTest, AStreamIsNotReadyWhileItsClientTakesNothing) {
     send(fd, request.data(), request.size(), MSG_NOSIGNAL);
     const std::shared_ptr<BodyChannel> channel = begun.get();
     EXPECT_TRUE(channel->isReady());
-    channel->send(std::string(32 << 20, 'x')); // more than the sockets hold
+    channel->send(std::string(32 << 20, 'x')); // more than fits into the sockets
     EXPECT_FALSE(channel->isReady());
-    // Whoever takes nothing for five seconds is disconnected.
+    // A client that takes nothing for five seconds is disconnected.
     EXPECT_TRUE(waitFor([&] { return !channel->isOpen(); }));
     EXPECT_FALSE(channel->isReady());
     close(fd);
@@ -258,7 +258,7 @@ TEST_F(HttpConnectionTest, AStopEndsStreams) {
     const auto begin = Clock::now();
     server.stop(begin + 30s);
     EXPECT_LT(Clock::now() - begin, 5s);
-    EXPECT_EQ(asked.get(), 200) << "the stream has an orderly end";
+    EXPECT_EQ(asked.get(), 200) << "the stream ends in order";
     EXPECT_FALSE(channel->isOpen());
     EXPECT_EQ(server.connections(), 0u);
 }
@@ -277,7 +277,7 @@ TEST_F(HttpConnectionTest, AStopDoesNotWaitForAClientThatTakesNothing) {
     close(fd);
 }
 
-TEST_F(HttpConnectionTest, AHandlerLearnsThatItsClientHasGone) {
+TEST_F(HttpConnectionTest, AHandlerNoticesThatItsClientHasGone) {
     std::promise<void> begun;
     std::promise<bool> asked;
     work = [&](const HttpRequest& request) {
@@ -296,7 +296,7 @@ TEST_F(HttpConnectionTest, AHandlerLearnsThatItsClientHasGone) {
     EXPECT_TRUE(asked.get_future().get());
 }
 
-TEST_F(HttpConnectionTest, AHandlerLearnsThatTheServerStops) {
+TEST_F(HttpConnectionTest, AHandlerNoticesThatTheServerStops) {
     std::promise<void> begun;
     work = [&](const HttpRequest& request) {
         begun.set_value();
@@ -309,7 +309,7 @@ TEST_F(HttpConnectionTest, AHandlerLearnsThatTheServerStops) {
     });
     begun.get_future().wait();
     server.stop(Clock::now() + 30s);
-    EXPECT_EQ(asked.get(), 200) << "what there is comes all the same";
+    EXPECT_EQ(asked.get(), 200) << "the body is complete";
 }
 
 TEST_F(HttpConnectionTest, NothingIsCancelledWhileTheClientWaits) {
@@ -321,7 +321,7 @@ TEST_F(HttpConnectionTest, NothingIsCancelledWhileTheClientWaits) {
     EXPECT_EQ(client().get("/answer")->status, 200);
 }
 
-TEST_F(HttpConnectionTest, RequestsThatComeTogetherAreAnsweredInTheirOrder) {
+TEST_F(HttpConnectionTest, PipelinedRequestsAreAnsweredInOrder) {
     std::string last = head("/nothing");
     last.insert(last.size() - 2, "Connection: close\r\n");
     const std::string answers = client().raw("\r\n" + head("/answer") + "\r\n\r\n" +
@@ -335,7 +335,7 @@ TEST_F(HttpConnectionTest, RequestsThatComeTogetherAreAnsweredInTheirOrder) {
     EXPECT_EQ(answers.find("HTTP/1.1", third + 1), std::string::npos);
 }
 
-TEST_F(HttpConnectionTest, AClientThatWaitsIsAskedForTheBody) {
+TEST_F(HttpConnectionTest, AClientThatExpectsContinueGetsIt) {
     std::string request = head("/answer");
     request.replace(0, 3, "POST");
     request.insert(request.size() - 2, "Content-Type: application/json\r\nContent-Length: 2\r\n"
@@ -353,44 +353,7 @@ TEST_F(HttpConnectionTest, AClientThatWaitsIsAskedForTheBody) {
     close(fd);
 }
 
-TEST(HttpConnection, WhoGetsNoWorkerIsToldSoAndOthersAreServedMeanwhile) {
-    RecordingTrace trace(0);
-    Router router;
-    std::promise<void> go;
-    std::shared_future<void> mayGo = go.get_future().share();
-    std::atomic<int> slow{0};
-    router.add("GET", "/slow", [&](const HttpRequest&) {
-        ++slow;
-        mayGo.wait();
-        return HttpAnswer::json("{}");
-    });
-    router.add(
-        "GET", "/quick", [](const HttpRequest&) { return HttpAnswer::json("{}"); }, Router::TOKEN,
-        Router::QUICK);
-    HttpServer server(router, {.workers = 1, .quickWorkers = 1});
-    ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
-    const auto ask = [&](const std::string& path) {
-        return TestClient("127.0.0.1", server.port(), secret).get(path);
-    };
-    auto first = std::async(std::launch::async, [&] { return ask("/slow")->status; });
-    while (slow == 0) {
-        std::this_thread::sleep_for(1ms);
-    }
-    auto second = std::async(std::launch::async, [&] { return ask("/slow"); });
-    EXPECT_EQ(ask("/quick")->status, 200);
-    const auto busy = second.get();
-    ASSERT_TRUE(busy);
-    EXPECT_EQ(busy->status, 503);
-    EXPECT_EQ(busy->header("content-type"), "application/problem+json");
-    EXPECT_EQ(busy->header("retry-after"), "5");
-    EXPECT_THAT(busy->body, testing::HasSubstr("the agent is busy with other requests"));
-    go.set_value();
-    EXPECT_EQ(first.get(), 200);
-    EXPECT_EQ(ask("/slow")->status, 200) << "there are workers again";
-    EXPECT_EQ(slow, 2) << "what was refused is not done later";
-}
-
-TEST_F(HttpConnectionTest, WhatWasAnsweredIsCounted) {
+TEST_F(HttpConnectionTest, AnsweredRequestsAreCounted) {
     client().get("/answer");
     client().ask("HEAD", "/answer");
     client().get("/nothing");

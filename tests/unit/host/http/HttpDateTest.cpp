@@ -1,4 +1,4 @@
-#include "host/http/HttpDate.h"
+#include "host/http/ResponseText.h"
 
 #include <gtest/gtest.h>
 
@@ -8,7 +8,7 @@ using namespace zrm::host;
 
 namespace {
 
-TEST(HttpDateTest, WritesTimesAsHeadersHaveThem) {
+TEST(HttpDateTest, WritesTimesInTheFormOfHeaders) {
     EXPECT_EQ(HttpDate::text(784111777), "Sun, 06 Nov 1994 08:49:37 GMT");
     EXPECT_EQ(HttpDate::text(0), "Thu, 01 Jan 1970 00:00:00 GMT");
     EXPECT_EQ(HttpDate::text(1709164800), "Thu, 29 Feb 2024 00:00:00 GMT");

@@ -1,9 +1,10 @@
 #include "host/http/HttpServer.h"
 
-#include "host/api/HealthResource.h"
+#include "host/api/AgentResource.h"
 #include "host/api/SampleResource.h"
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/http/Handoff.h"
 #include "unit/host/http/TestClient.h"
@@ -39,7 +40,7 @@ using nlohmann::json;
 const std::string secret(64, 'a');
 const std::string tables = "/api/v1/tables/";
 
-/// Samples of a test: what `onTake` gives.
+/// Samples for tests: what `onTake` returns.
 class TestSource : public SampleSource {
 public:
     Rows take(std::string_view table, const std::vector<Condition>& conditions) override {
@@ -60,7 +61,7 @@ protected:
         HealthResource().addRoutes(router);
         samples.addRoutes(router);
         std::signal(SIGPIPE, SIG_IGN); // the agent's threads block it
-        ASSERT_EQ(server.start({"127.0.0.1", 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({"127.0.0.1", 0}, ApiToken(secret))), "");
     }
 
     using Reply = std::optional<TestClient::Reply>;
@@ -105,7 +106,7 @@ TEST_F(HttpServerTest, HealthNeedsNoToken) {
     EXPECT_EQ(result->header("content-type"), "application/json");
 }
 
-TEST_F(HttpServerTest, ASampleGivesItsRowsAndTheirNumber) {
+TEST_F(HttpServerTest, ASampleReturnsItsRowsAndTheirNumber) {
     source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
         EXPECT_EQ(table, "RMMONLOG");
         EXPECT_EQ(conditions.size(), 1u);
@@ -174,7 +175,7 @@ TEST_F(HttpServerTest, RefusesOtherHostsAndOrigins) {
                   "requests from other origins are refused", "Origin");
 }
 
-TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
+TEST_F(HttpServerTest, RefusesUnknownPaths) {
     expectProblem(sample("NOTABLE", "{}"), 404,
                   "no such table; the tables are RMLOGENT and RMMONLOG", "table");
     expectProblem(client().get("/nothing"), 404, "there is nothing at this path", "");
@@ -187,7 +188,7 @@ TEST_F(HttpServerTest, RefusesWhatIsNotThere) {
                   "this path answers GET, HEAD, not this method", "");
 }
 
-TEST_F(HttpServerTest, RefusesBodiesThatAreNoRequest) {
+TEST_F(HttpServerTest, RefusesInvalidBodies) {
     expectProblem(sample("RMMONLOG", "{"), 400, "the body is not JSON", "body");
     expectProblem(sample("RMMONLOG", R"({"filters":[{}]})"), 400, "write a text",
                   "filters[0].column");
@@ -201,7 +202,7 @@ TEST_F(HttpServerTest, RefusesLongBodies) {
     expectProblem(sample("RMMONLOG", std::string(1048577, ' ')), 413, tooLong, "body");
     expectProblem(sample("RMMONLOG", std::string(1048576, ' ')), 400, "the body is not JSON",
                   "body");
-    // A body that does not tell its length is cut off too.
+    // A body without a length is cut off, too.
     std::string chunks;
     for (int count = 0; count < 500; ++count) {
         chunks += "2000\r\n" + std::string(8192, ' ') + "\r\n";
@@ -224,7 +225,7 @@ TEST_F(HttpServerTest, ASampleThatFailsIsAnInternalError) {
                 testing::ElementsAre("Request for /api/v1/tables/RMMONLOG/sample failed: secret"));
 }
 
-TEST_F(HttpServerTest, SamplesWaitSideBySide) {
+TEST_F(HttpServerTest, SamplesRunConcurrently) {
     std::mutex mutex;
     std::condition_variable changed;
     int waiting = 0;
@@ -233,7 +234,7 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
         std::unique_lock lock(mutex);
         ++waiting;
         changed.notify_all();
-        changed.wait(lock, [&] { return go; }); // as while a refresh runs
+        changed.wait(lock, [&] { return go; }); // as during a refresh
         return SampleSource::Rows{"[]", 0, false};
     };
     std::vector<std::future<int>> results;
@@ -247,7 +248,7 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
         std::unique_lock lock(mutex);
         EXPECT_TRUE(changed.wait_for(lock, 10s, [&] { return waiting == 3; }));
     }
-    EXPECT_EQ(client().get("/healthz")->status, 200) << "others are served meanwhile";
+    EXPECT_EQ(client().get("/healthz")->status, 200) << "others are served in the meantime";
     {
         const std::lock_guard guard(mutex);
         go = true;
@@ -258,17 +259,17 @@ TEST_F(HttpServerTest, SamplesWaitSideBySide) {
     }
 }
 
-TEST_F(HttpServerTest, APortThatIsInUseIsSaid) {
+TEST_F(HttpServerTest, APortInUseIsReported) {
     HttpServer second(router);
-    EXPECT_EQ(second.start({"127.0.0.1", server.port()}, ApiToken(secret)),
+    EXPECT_EQ(reasonOf(second.start({"127.0.0.1", server.port()}, ApiToken(secret))),
               "cannot listen on 127.0.0.1:" + std::to_string(server.port()) +
                   ": is another agent running?");
     HttpServer elsewhere(router);
-    EXPECT_EQ(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret)),
+    EXPECT_EQ(reasonOf(elsewhere.start({"203.0.113.1", 0}, ApiToken(secret))),
               "cannot listen on 203.0.113.1:0");
 }
 
-TEST_F(HttpServerTest, StopAnswersWhatIsUnderWayAndEndsWithIdleConnections) {
+TEST_F(HttpServerTest, StopAnswersRequestsInProgressAndClosesIdleConnections) {
     TestClient idle("127.0.0.1", server.port());
     EXPECT_EQ(idle.get("/healthz")->status, 200);
     std::promise<void> begun;
@@ -311,13 +312,13 @@ TEST_F(HttpServerTest, StopDoesNotWaitForAClientThatNeverEndsItsRequest) {
     slow.join();
 }
 
-TEST_F(HttpServerTest, LeavesTheActionOfSignalsAsItWas) {
+TEST_F(HttpServerTest, LeavesSignalActionsUnchanged) {
     std::signal(SIGPIPE, SIG_DFL);
     { HttpServer another(router); }
     EXPECT_EQ(std::signal(SIGPIPE, SIG_IGN), SIG_DFL);
 }
 
-TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
+TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndStartsNoMore) {
     std::promise<void> begun;
     std::promise<void> go;
     std::shared_future<void> mayGo = go.get_future().share();
@@ -333,11 +334,11 @@ TEST_F(HttpServerTest, AbandonWaitsForSamplesUpToTheLimitAndBeginsNoMore) {
     begun.get_future().wait();
     const auto begin = Clock::now();
     server.abandon(begin + 30ms);
-    EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is under way";
+    EXPECT_GE(Clock::now() - begin, 30ms) << "the sample is in progress";
     expectProblem(sample("RMMONLOG", "{}"), 503, "the agent is stopping", "");
     go.set_value();
     EXPECT_EQ(answer.get(), 200);
-    server.abandon(Clock::now() + 10s); // nothing is under way: returns at once
+    server.abandon(Clock::now() + 10s); // nothing is in progress: returns at once
 }
 
 TEST_F(HttpServerTest, ASampleMayEndTheProcess) {
@@ -358,7 +359,7 @@ TEST(HttpServerLife, ListensOnIpv6AndByName) {
     RecordingTrace trace(0);
     for (const char* const host : {"::1", "localhost"}) {
         HttpServer server(router);
-        ASSERT_EQ(server.start({host, 0}, ApiToken(secret)), "");
+        ASSERT_EQ(reasonOf(server.start({host, 0}, ApiToken(secret))), "");
         TestClient client(host, server.port());
         const auto result = client.get("/healthz");
         ASSERT_TRUE(result) << host;

@@ -23,15 +23,15 @@ std::string refused(const std::string& body, const std::function<void(JsonFields
         read(fields);
         fields.refuseUnknown();
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }
 
 void nothing(JsonFields& /*fields*/) {}
 
-TEST(JsonFields, GivesMembersByType) {
+TEST(JsonFields, ReturnsMembersByType) {
     JsonFields fields(
         R"({"log":"/var/log/x","last":5,"where":["a","b"],"definition":{"name":"n"}})");
     EXPECT_EQ(fields.text("log"), "/var/log/x");
@@ -62,7 +62,7 @@ TEST(JsonFields, MissingAndNullAreTheSame) {
     }
 }
 
-TEST(JsonFields, RefusesBodiesThatAreNoObject) {
+TEST(JsonFields, RefusesBodiesThatAreNotObjects) {
     for (const char* const body : {"{", "{}x", "\"\xff\"", "{\"a\":1,}", "{\"a\":NaN}", "'"}) {
         EXPECT_EQ(refused(body, nothing), "body: the body is not JSON") << body;
     }
@@ -92,7 +92,7 @@ TEST(JsonFields, RefusesOtherTypes) {
     EXPECT_EQ(refused(R"({"a":[]})", [](JsonFields& f) { f.object("a"); }), "a: write an object");
 }
 
-TEST(JsonFields, RefusesMembersThatNobodyAskedFor) {
+TEST(JsonFields, RefusesUnknownMembers) {
     const auto read = [](JsonFields& f) {
         f.optionalText("log");
         f.optionalText("logs");

@@ -29,13 +29,13 @@ std::string refused(std::multimap<std::string, std::string> query,
         read(fields);
         fields.refuseUnknown();
     } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.problem().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().detail;
+        EXPECT_EQ(refusal.refusal().status, 400);
+        return refusal.problem().field + ": " + refusal.problem().text();
     }
     return "accepted";
 }
 
-TEST(QueryFields, GivesParametersByType) {
+TEST(QueryFields, ReturnsParametersByType) {
     const HttpRequest request = requestOf({{"log", "/x"},
                                            {"severity", "info"},
                                            {"severity", "minor"},
@@ -53,7 +53,7 @@ TEST(QueryFields, GivesParametersByType) {
     fields.refuseUnknown();
 }
 
-TEST(QueryFields, RefusesWhatIsWrong) {
+TEST(QueryFields, RefusesInvalidParameters) {
     const auto number = [](QueryFields& fields) { fields.number("n", 1, 9); };
     for (const char* const value :
          {"", "0", "10", "-1", "+5", " 5", "5 ", "5.0", "0x5", "five", "99999999999999999999999"}) {

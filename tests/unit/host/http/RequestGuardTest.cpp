@@ -13,8 +13,8 @@ const std::string secret(64, 'a');
 class RequestGuardTest : public testing::Test {
 protected:
     int status(const RequestGuard::Headers& headers, bool isPublic = false) const {
-        const auto problem = guard.refuse(headers, isPublic);
-        return problem ? problem->status : 200;
+        const auto allowed = guard.check(headers, isPublic);
+        return allowed ? 200 : allowed.error().status;
     }
     int hostStatus(const std::string& host) const { return status({host, {}, bearer}); }
     int originStatus(const std::string& origin) const {
@@ -39,11 +39,11 @@ TEST_F(RequestGuardTest, TheHostIsTheListenAddressOrLocalhost) {
     EXPECT_EQ(status({"evil.example:7186", {}, {}}, true), 421) << "public paths too";
 }
 
-TEST_F(RequestGuardTest, ThePortMayBeLeftOutWhereItIsTheUsualOne) {
+TEST_F(RequestGuardTest, TheDefaultPortIsOptional) {
     const RequestGuard usual({"127.0.0.1", 80}, ApiToken(secret));
-    EXPECT_FALSE(usual.refuse({"localhost", {}, bearer}, false));
-    EXPECT_FALSE(usual.refuse({"localhost:80", {}, bearer}, false));
-    EXPECT_FALSE(usual.refuse({"[::1]", {}, bearer}, false));
+    EXPECT_TRUE(usual.check({"localhost", {}, bearer}, false));
+    EXPECT_TRUE(usual.check({"localhost:80", {}, bearer}, false));
+    EXPECT_TRUE(usual.check({"[::1]", {}, bearer}, false));
 }
 
 TEST_F(RequestGuardTest, ForeignOriginsAreRefused) {
@@ -56,7 +56,7 @@ TEST_F(RequestGuardTest, ForeignOriginsAreRefused) {
     }
 }
 
-TEST_F(RequestGuardTest, EverythingThatIsNotPublicNeedsTheToken) {
+TEST_F(RequestGuardTest, EverythingElseNeedsTheToken) {
     const auto with = [&](const std::optional<std::string>& authorization) {
         return status({"localhost:7186", {}, authorization});
     };
@@ -71,12 +71,13 @@ TEST_F(RequestGuardTest, EverythingThatIsNotPublicNeedsTheToken) {
     EXPECT_EQ(status({"localhost:7186", {}, {}}, true), 200);
 }
 
-TEST_F(RequestGuardTest, SaysWhatIsMissingAndWhere) {
-    const auto problem = guard.refuse({"localhost:7186", {}, {}}, false);
-    ASSERT_TRUE(problem);
-    EXPECT_EQ(problem->json(), R"({"type":"about:blank","title":"Unauthorized","status":401,)"
-                               R"("detail":"send the API token: Authorization: Bearer TOKEN",)"
-                               R"("field":"Authorization"})");
+TEST_F(RequestGuardTest, ReportsWhatIsMissing) {
+    const auto allowed = guard.check({"localhost:7186", {}, {}}, false);
+    ASSERT_FALSE(allowed);
+    EXPECT_EQ(allowed.error().json(),
+              R"({"type":"about:blank","title":"Unauthorized","status":401,)"
+              R"("detail":"send the API token: Authorization: Bearer TOKEN",)"
+              R"("field":"Authorization"})");
 }
 
 } // namespace

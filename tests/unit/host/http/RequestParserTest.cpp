@@ -10,7 +10,7 @@ namespace {
 
 const std::string post = "POST /a HTTP/1.1\r\nHost: h\r\n";
 
-/// The request with this head; also when it comes byte by byte, which must not matter.
+/// The request with this head; the same when it arrives byte by byte.
 IncomingRequest read(const std::string& head) {
     const std::string bytes = head + "\r\n\r\n";
     RequestParser whole;
@@ -25,7 +25,7 @@ IncomingRequest read(const std::string& head) {
     }
     EXPECT_TRUE(slow.isHeadDone()) << head;
     const IncomingRequest same = slow.takeHead();
-    EXPECT_EQ(same.problem.has_value(), incoming.problem.has_value()) << head;
+    EXPECT_EQ(same.refusal.has_value(), incoming.refusal.has_value()) << head;
     EXPECT_EQ(same.request.path, incoming.request.path);
     EXPECT_EQ(same.length, incoming.length);
     return incoming;
@@ -33,15 +33,15 @@ IncomingRequest read(const std::string& head) {
 
 int statusOf(const std::string& head) {
     const IncomingRequest incoming = read(head);
-    return incoming.problem ? incoming.problem->status : 200;
+    return incoming.refusal ? incoming.refusal->status : 200;
 }
 
-TEST(RequestParserTest, TakesARequestApart) {
+TEST(RequestParserTest, ParsesARequest) {
     const IncomingRequest incoming =
         read("GET /a/b%20c?x=1&y=%2F#end HTTP/1.1\r\nhost:h:1\r\nORIGIN: http://h:1\r\n"
              "Authorization: \t Bearer a%41+b \t\r\nAccept: text/html\r\n"
              "Last-Event-ID: 7\r\nX-Empty:\r\nX-Twice: 1\r\nX-Twice: 2");
-    EXPECT_FALSE(incoming.problem);
+    EXPECT_FALSE(incoming.refusal);
     EXPECT_EQ(incoming.request.method, "GET");
     EXPECT_EQ(incoming.request.path, "/a/b%20c");
     EXPECT_EQ(incoming.rawQuery, "x=1&y=%2F");
@@ -54,7 +54,7 @@ TEST(RequestParserTest, TakesARequestApart) {
     EXPECT_FALSE(incoming.isLast);
 }
 
-TEST(RequestParserTest, TheHostMayStandInTheTarget) {
+TEST(RequestParserTest, TheHostMayBeInTheTarget) {
     const IncomingRequest whole = read("GET HTTP://localhost:7186/a?b HTTP/1.1\r\nHost: other");
     EXPECT_EQ(whole.headers.host, "localhost:7186");
     EXPECT_EQ(whole.request.path, "/a");
@@ -65,19 +65,19 @@ TEST(RequestParserTest, TheHostMayStandInTheTarget) {
     EXPECT_EQ(bare.rawQuery, "/healthz");
 }
 
-TEST(RequestParserTest, ABodyHasALengthOrComesInChunks) {
+TEST(RequestParserTest, ABodyHasALengthOrIsChunked) {
     const IncomingRequest withLength = read(post + "Content-Length: 12");
     EXPECT_TRUE(withLength.hasBody);
     EXPECT_EQ(withLength.length, 12u);
     EXPECT_FALSE(withLength.isChunked || withLength.isLast);
     const IncomingRequest empty = read(post + "Content-Length: 0");
-    EXPECT_FALSE(empty.hasBody || empty.problem);
+    EXPECT_FALSE(empty.hasBody || empty.refusal);
     const IncomingRequest chunked = read(post + "Transfer-Encoding: chunked");
     EXPECT_TRUE(chunked.hasBody && chunked.isChunked);
-    EXPECT_TRUE(chunked.isLast) << "nothing behind chunks is taken for a request";
+    EXPECT_TRUE(chunked.isLast) << "nothing after chunks is read as a request";
 }
 
-TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
+TEST(RequestParserTest, AmbiguousRequestsAreRefused) {
     for (const char* const line : {"Content-Length : 2",
                                    "Content-Length: %32",
                                    "Content-Length:",
@@ -109,17 +109,17 @@ TEST(RequestParserTest, WhatTwoReadersCouldTakeForDifferentRequestsIsRefused) {
         EXPECT_EQ(statusOf(post + line), 400) << line;
     }
     EXPECT_EQ(statusOf(post + "X: a" + std::string(1, '\0')), 400);
-    EXPECT_EQ(statusOf(post + "X: \ta\t\xc3\xa9"), 200) << "tabs and other bytes harm nobody";
+    EXPECT_EQ(statusOf(post + "X: \ta\t\xc3\xa9"), 200) << "tabs and other bytes are harmless";
     for (const char* const name :
          {"host", "Origin", "Authorization", "Content-Type", "Last-Event-ID"}) {
         const IncomingRequest twice =
             read(std::string("GET / HTTP/1.1\r\n") + name + ": 1\r\n" + name + ": 1");
-        ASSERT_TRUE(twice.problem) << name;
-        EXPECT_EQ(twice.problem->detail, "the header appears more than once");
+        ASSERT_TRUE(twice.refusal) << name;
+        EXPECT_EQ(twice.refusal->problem.what, "the header appears more than once");
     }
 }
 
-TEST(RequestParserTest, WhatIsNoRequestLineIsRefused) {
+TEST(RequestParserTest, InvalidRequestLinesAreRefused) {
     for (const char* const line :
          {"", "GET", "GET /", "GET  / HTTP/1.1", "GET / HTTP/1.1 ", "GET / HTTP/1.2",
           "GET / http/1.1", "get / HTTP/1.1", "BREW / HTTP/1.1", " GET / HTTP/1.1",
@@ -127,7 +127,7 @@ TEST(RequestParserTest, WhatIsNoRequestLineIsRefused) {
         EXPECT_EQ(statusOf(line), 400) << line;
     }
     const IncomingRequest brewing = read("BREW / HTTP/1.1");
-    EXPECT_EQ(brewing.request.method, "") << "only methods that there are get into the statistics";
+    EXPECT_EQ(brewing.request.method, "") << "only known methods appear in the statistics";
 }
 
 TEST(RequestParserTest, LongTargetsAndHeadersAreRefused) {
@@ -139,7 +139,7 @@ TEST(RequestParserTest, LongTargetsAndHeadersAreRefused) {
     EXPECT_EQ(statusOf(post + line + "x"), 431);
 }
 
-TEST(RequestParserTest, BoundsHeads) {
+TEST(RequestParserTest, LimitsHeads) {
     const std::string begin = "GET / HTTP/1.1\r\n";
     std::string head = begin;
     while (head.size() + 7010 < RequestParser::largestHead) {
@@ -150,22 +150,22 @@ TEST(RequestParserTest, BoundsHeads) {
     EXPECT_EQ(statusOf(head + std::string(RequestParser::largestHead - head.size() + 1, 'x')), 431);
     RequestParser endless;
     endless.put(begin + "X: " + std::string(RequestParser::largestHead, 'x'));
-    ASSERT_TRUE(endless.isHeadDone()) << "its end is not waited for";
-    EXPECT_EQ(endless.takeHead().problem->status, 431);
+    ASSERT_TRUE(endless.isHeadDone()) << "it does not wait for the end";
+    EXPECT_EQ(endless.takeHead().refusal->status, 431);
     RequestParser target;
     target.put("GET /" + std::string(RequestParser::largestHead, 'x'));
-    EXPECT_EQ(target.takeHead().problem->status, 431);
-    EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing reads it";
+    EXPECT_EQ(target.takeHead().refusal->status, 431);
+    EXPECT_EQ(statusOf(post + "Range: bytes=" + std::string(9000, '1')), 200) << "nothing uses it";
 }
 
-TEST(RequestParserTest, ChunksNeedTheVersionThatHasThem) {
+TEST(RequestParserTest, ChunksNeedHttp11) {
     EXPECT_EQ(statusOf("POST / HTTP/1.0\r\nHost: h\r\nTransfer-Encoding: chunked"), 400);
 }
 
-/// What becomes of a body that comes in two parts.
+/// The result of a body that arrives in two parts.
 struct Body {
     std::string text;
-    std::string rest; ///< what is not of the request
+    std::string rest; ///< what follows the request
     int status = 200;
     bool isDone = false;
 };
@@ -184,7 +184,7 @@ Body readBody(const std::string& header, std::string bytes, std::size_t most = 1
         }
     }
     Body body;
-    body.status = parser.bodyProblem() ? parser.bodyProblem()->status : 200;
+    body.status = parser.bodyRefusal() ? parser.bodyRefusal()->status : 200;
     body.isDone = parser.isDone();
     body.rest = waiting;
     body.text = body.isDone ? parser.takeBody() : "";
@@ -202,7 +202,7 @@ TEST(RequestParserTest, ReadsBodiesToTheirEnd) {
     EXPECT_EQ(chunks.rest, "X");
 }
 
-TEST(RequestParserTest, RefusesChunksThatAreUnclearOrTooLong) {
+TEST(RequestParserTest, RefusesChunksThatAreAmbiguousOrTooLong) {
     for (const char* const chunks :
          {"zz\r\n", "0x2\r\nbo", "-1\r\n", "2\nbo\n", "2\r\nbody", " 2\r\nbo", "2 \r\nbo\r\n",
           "2;=\r\n", "2\r\nbo\r\n0\r\nX: y\nz\r\n\r\n", "0\r\nContent-Length: 7\r\n\r\n"}) {
@@ -214,7 +214,7 @@ TEST(RequestParserTest, RefusesChunksThatAreUnclearOrTooLong) {
     EXPECT_NE(readBody("Transfer-Encoding: chunked", "fffffffffffffffff\r\n").status, 200);
 }
 
-TEST(RequestParserTest, TheClientSaysWhetherItsConnectionLivesOn) {
+TEST(RequestParserTest, TheClientDecidesWhetherItsConnectionIsKept) {
     const auto isLast = [](const std::string& head) { return read(head).isLast; };
     EXPECT_FALSE(isLast(post + "Connection: keep-alive"));
     EXPECT_TRUE(isLast(post + "Connection: close"));

@@ -25,7 +25,7 @@ TEST(RequestStatistics, CountsByMethodRouteAndStatus) {
     EXPECT_EQ(counts.at(Kind{"POST", "", 404}), 1u);
 }
 
-TEST(RequestStatistics, SortsDurationsByTheirLimits) {
+TEST(RequestStatistics, CountsDurationsByTheirLimits) {
     RequestStatistics statistics;
     statistics.count("GET", "/a", 200, 1ms);
     statistics.count("GET", "/a", 200, 2ms);

@@ -58,7 +58,7 @@ TEST_F(RouterTest, NamesTheMethodsOfAPath) {
     EXPECT_EQ(match.allow, "GET, HEAD, PUT, DELETE, POST");
 }
 
-TEST_F(RouterTest, CapturesPartsAsTheyStand) {
+TEST_F(RouterTest, CapturesPartsAsTheyAre) {
     add("GET", "/s/{name}/of/{log}");
     EXPECT_THAT(router.match("GET", "/s/a%2Fb/of/c").captures, ElementsAre("a%2Fb", "c"));
     EXPECT_EQ(handler("GET", "/s//of/c"), "none") << "a name is not empty";
@@ -71,7 +71,7 @@ TEST_F(RouterTest, CapturesPartsAsTheyStand) {
     EXPECT_EQ(handler("GET", "/"), "GET /");
 }
 
-TEST_F(RouterTest, LiteralPartsWin) {
+TEST_F(RouterTest, LiteralPartsTakePrecedence) {
     add("GET", "/*");
     add("GET", "/events/{id}");
     add("GET", "/events/stream");
@@ -81,7 +81,7 @@ TEST_F(RouterTest, LiteralPartsWin) {
     EXPECT_THAT(router.match("GET", "/events/stream").captures, IsEmpty());
 }
 
-TEST_F(RouterTest, KnowsWhoMayAsk) {
+TEST_F(RouterTest, KnowsWhoMaySendARequest) {
     add("GET", "/page", Router::PUBLIC);
     add("POST", "/page");
     EXPECT_EQ(router.match("GET", "/page").access, Router::PUBLIC);

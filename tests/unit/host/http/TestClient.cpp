@@ -83,7 +83,7 @@ std::optional<TestClient::Reply> TestClient::ask(const std::string& method, cons
     request.body() = body;
     request.prepare_payload();
     Error& error = connection.error;
-    Error unsent; // a server that refuses does not read everything; it answers all the same
+    Error unsent; // a server that refuses does not read everything but still answers
     if (!error) {
         http::write(connection.socket, request, unsent);
     }

@@ -32,8 +32,8 @@ public:
     ~TestClient();
     TestClient(TestClient&&) noexcept;
 
-    /// Asks over the connection of the request before, where that lives on. None when no whole
-    /// answer comes.
+    /// Sends over the connection of the previous request if that is still open. None when no
+    /// complete answer arrives.
     std::optional<Reply> ask(const std::string& method, const std::string& path,
                              const std::string& body = "", const Headers& headers = {});
     std::optional<Reply> get(const std::string& path, const Headers& headers = {}) {
@@ -44,13 +44,13 @@ public:
         return ask("POST", path, body, {{"Content-Type", type}});
     }
 
-    /// Follows an answer as it comes; `take` is given each new part of the body, until it gives
+    /// Follows an answer as it arrives; `take` gets each new part of the body until it returns
     /// false.
     std::optional<Reply> follow(const std::string& path,
                                 const std::function<bool(std::string_view)>& take);
 
-    /// Sends bytes as they are, over a new connection, and gives everything that comes back until
-    /// the server closes.
+    /// Sends bytes unchanged over a new connection, and returns everything that arrives until the
+    /// server closes.
     std::string raw(const std::string& bytes);
 
     /// A connection of its own: a descriptor, which the caller closes.

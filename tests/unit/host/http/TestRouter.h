@@ -3,14 +3,13 @@
 
 #include "host/base/UrlText.h"
 #include "host/http/RequestRefused.h"
-#include "host/http/Resource.h"
 #include "host/http/Router.h"
 
 #include <string>
 
 using namespace zrm::host;
 
-/// Asks a resource without a server between.
+/// Sends requests to a resource without a server.
 class TestRouter {
 public:
     explicit TestRouter(Resource& resource) { resource.addRoutes(m_router); }
@@ -37,8 +36,8 @@ public:
         try {
             return (*match.handler)(request);
         } catch (const RequestRefused& refused) {
-            return {refused.problem().status, "",
-                    refused.problem().field + ": " + refused.problem().detail};
+            return {refused.refusal().status, "",
+                    refused.problem().field + ": " + refused.problem().text()};
         }
     }
 

@@ -25,7 +25,7 @@ TEST(MetricText, WritesFamilies) {
                            "zrm_b -1\n");
 }
 
-TEST(MetricText, LeavesFamiliesWithoutValuesOut) {
+TEST(MetricText, OmitsFamiliesWithoutValues) {
     MetricText text;
     text.gauge("zrm_none", "Nothing.");
     text.counter("zrm_none_total", "Nothing either.");

@@ -55,7 +55,7 @@ TEST_F(AlertmanagerSinkTest, RaisesAnAlertForEachEvent) {
          "startsAt": "2026-11-20T07:03:10.412Z", "endsAt": "2026-11-20T07:08:10.412Z"}])"));
 }
 
-TEST_F(AlertmanagerSinkTest, AddsWhatTheFileSays) {
+TEST_F(AlertmanagerSinkTest, AddsTheConfiguredLabels) {
     events.add({});
     AlertmanagerSink sink(config("resolve_after = '1d'\nlabels = { team = 'ops', _x1 = 'y' }\n"
                                  "generator_url = 'https://web1/console'\n"));
@@ -68,7 +68,7 @@ TEST_F(AlertmanagerSinkTest, AddsWhatTheFileSays) {
     EXPECT_EQ(alert.at("endsAt"), "2026-11-21T07:03:09.412Z");
 }
 
-TEST_F(AlertmanagerSinkTest, ARefusalIsAFailureOfAll) {
+TEST_F(AlertmanagerSinkTest, ARefusalFailsTheWholeDelivery) {
     events.add({});
     events.add({});
     AlertmanagerSink sink(config());
@@ -80,7 +80,7 @@ TEST_F(AlertmanagerSinkTest, ARefusalIsAFailureOfAll) {
     EXPECT_EQ(deliver(sink), 2u);
 }
 
-TEST_F(AlertmanagerSinkTest, IsCalledByItsHost) {
+TEST_F(AlertmanagerSinkTest, IsNamedAfterItsHost) {
     const AlertmanagerSink sink(config());
     EXPECT_EQ(sink.name(), "alertmanager 127.0.0.1:" + std::to_string(server.port()));
 }

@@ -25,9 +25,9 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsMadeAnew) {
+TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsOpenedAgain) {
     std::uint16_t port = 0;
-    close(localSocket(SOCK_DGRAM, port)); // nobody has the port now
+    close(localSocket(SOCK_DGRAM, port)); // nobody uses the port now
     Connection connection(ListenAddress{"127.0.0.1", port}, Connection::UDP, 1s);
     ASSERT_TRUE(connection.open(giveUp.get_token()));
     int sent = 0;
@@ -36,10 +36,11 @@ TEST_F(ConnectionTest, AfterAFailureOverUdpTheSocketIsMadeAnew) {
     }
     EXPECT_EQ(connection.error(),
               "send failed: Connection refused (127.0.0.1:" + std::to_string(port) + ")");
-    EXPECT_FALSE(connection.isOpen()) << "the address it is bound to may be this machine's no more";
+    EXPECT_FALSE(connection.isOpen())
+        << "this machine may no longer have the address it is bound to";
 }
 
-TEST_F(ConnectionTest, ANameThatIsLookedUpForLongHoldsNobodyUp) {
+TEST_F(ConnectionTest, ASlowLookupEndsInTime) {
     FakeResolver resolver("127.0.0.1");
     std::uint16_t port = 0;
     const int listener = localSocket(SOCK_STREAM, port);

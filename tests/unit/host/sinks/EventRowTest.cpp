@@ -1,7 +1,5 @@
 #include "host/sinks/EventRow.h"
 
-#include "host/sinks/SeverityCodes.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -43,7 +41,7 @@ TEST(EventRow, PrefersTheTextsInUtf8) {
     EXPECT_EQ(local.description(), "b");
 }
 
-TEST(EventRow, TheNodeIsWithoutItsType) {
+TEST(EventRow, TheNodeHasNoType) {
     EXPECT_EQ(rowOf(R"({"row":{"ORIGINNODE":"web1:ZRM"}})").node(), "web1");
     EXPECT_EQ(rowOf(R"({"row":{"ORIGINNODE":"a:b:ZRM"}})").node(), "a:b");
     EXPECT_EQ(rowOf(R"({"row":{"ORIGINNODE":"web1"}})").node(), "web1");

@@ -40,7 +40,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(HttpPostTest, SendsBodyAndHeadersAndGivesTheAnswer) {
+TEST_F(HttpPostTest, SendsBodyAndHeadersAndReturnsTheAnswer) {
     ScriptedServer receiver([](const Request&) { return ScriptedServer::status(202, "thanks"); });
     SinkConfig config = configOf(receiver.url("/base/?key=%20a"));
     config.options["headers"] = SinkConfig::Texts{{"Authorization", "Bearer abc"}};
@@ -67,8 +67,8 @@ TEST_F(HttpPostTest, KeepsTheConnection) {
     EXPECT_EQ(receiver.requests()[1].connection, 1);
 }
 
-TEST_F(HttpPostTest, AConnectionThatTheReceiverEndedIsMadeAnew) {
-    // Closed behind an answer, and closed as soon as it is used again.
+TEST_F(HttpPostTest, AConnectionThatTheReceiverClosedIsOpenedAgain) {
+    // Closed after an answer, and closed as soon as it is used again.
     ScriptedServer receiver([count = 0](const Request&) mutable {
         ++count;
         Reply reply = ScriptedServer::status(200);
@@ -113,7 +113,7 @@ TEST_F(HttpPostTest, WithoutAReceiverThereIsNoConnection) {
     EXPECT_EQ(http.error(), "no connection (" + url.substr(7) + ")");
 }
 
-TEST_F(HttpPostTest, AnAnswerThatBreaksOffOrIsNoneIsAFailure) {
+TEST_F(HttpPostTest, AnIncompleteOrInvalidAnswerIsAFailure) {
     Reply reply;
     ScriptedServer receiver([&](const Request&) { return reply; });
     HttpPost http(configOf(receiver.url(), 2s), "");
@@ -135,7 +135,7 @@ TEST_F(HttpPostTest, AnAnswerThatBreaksOffOrIsNoneIsAFailure) {
     EXPECT_TRUE(send(http));
 }
 
-TEST_F(HttpPostTest, TheStatusCountsWhateverComesOfTheBody) {
+TEST_F(HttpPostTest, OnlyTheStatusDecides) {
     ScriptedServer receiver([](const Request&) {
         return Reply{"HTTP/1.1 200 OK\r\nContent-Length: 100\r\n\r\n{\"partial", Reply::CLOSE};
     });
@@ -144,7 +144,7 @@ TEST_F(HttpPostTest, TheStatusCountsWhateverComesOfTheBody) {
     EXPECT_EQ(http.answer(), "{\"partial");
 }
 
-TEST_F(HttpPostTest, AHeadWithoutEndIsAFailureAfterWhichTheReceiverIsTriedAgain) {
+TEST_F(HttpPostTest, AnEndlessHeadIsAFailureAfterWhichTheReceiverIsRetried) {
     Reply reply;
     ScriptedServer receiver([&](const Request&) { return reply; });
     HttpPost http(configOf(receiver.url(), 10s), "");
@@ -174,7 +174,7 @@ TEST_F(HttpPostTest, KeepsOnlyTheBeginningOfALongAnswer) {
     EXPECT_TRUE(send(http));
 }
 
-TEST_F(HttpPostTest, AReceiverThatDoesNotAnswerIsLeftWhenTheTimeIsOver) {
+TEST_F(HttpPostTest, AReceiverThatDoesNotAnswerTimesOut) {
     ScriptedServer receiver([](const Request&) {
         return Reply{"HTTP/1.1 200 OK\r\n", Reply::HOLD};
     });
@@ -186,7 +186,7 @@ TEST_F(HttpPostTest, AReceiverThatDoesNotAnswerIsLeftWhenTheTimeIsOver) {
               "no answer in time (127.0.0.1:" + std::to_string(receiver.port()) + ")");
 }
 
-TEST_F(HttpPostTest, EndsAtOnceWhenItIsToldToGiveUp) {
+TEST_F(HttpPostTest, EndsAtOnceOnGiveUp) {
     ScriptedServer receiver([](const Request&) { return Reply{"", Reply::HOLD}; });
     HttpPost http(configOf(receiver.url(), 60s), "");
     std::jthread stopper([this, &receiver] {
@@ -202,7 +202,7 @@ TEST_F(HttpPostTest, EndsAtOnceWhenItIsToldToGiveUp) {
               "the agent is stopping (127.0.0.1:" + std::to_string(receiver.port()) + ")");
 }
 
-/// A port at which connections are neither taken nor refused: its queue of them is full.
+/// A port at which connections are neither accepted nor refused: its backlog is full.
 class FullPort {
 public:
     FullPort() : m_listener(localSocket(SOCK_STREAM, port)) {
@@ -227,7 +227,7 @@ private:
     std::vector<int> m_waiting;
 };
 
-TEST_F(HttpPostTest, MakingAConnectionEndsInTimeAndWhenToldToGiveUp) {
+TEST_F(HttpPostTest, ConnectingEndsInTimeAndOnGiveUp) {
     const FullPort full;
     const std::string url = "http://127.0.0.1:" + std::to_string(full.port);
     HttpPost quick(configOf(url, 200ms), "");
@@ -242,7 +242,7 @@ TEST_F(HttpPostTest, MakingAConnectionEndsInTimeAndWhenToldToGiveUp) {
     EXPECT_LT(Clock::now() - begin, 5s);
 }
 
-TEST_F(HttpPostTest, LookingANameUpEndsInTimeAndWhenToldToGiveUp) {
+TEST_F(HttpPostTest, ALookupEndsInTimeAndOnGiveUp) {
     FakeResolver resolver("127.0.0.1");
     ScriptedServer receiver([](const Request&) { return ScriptedServer::status(204); });
     const std::string place = "slow.example:" + std::to_string(receiver.port());
@@ -276,7 +276,7 @@ TEST_F(HttpPostTest, TriesEachAddressOfAName) {
     EXPECT_EQ(receiver.requests().at(1).connection, 1);
 }
 
-TEST_F(HttpPostTest, AnAddressOfVersionSixStandsInBracketsInTheRequest) {
+TEST_F(HttpPostTest, AnIpv6AddressIsInBracketsInTheRequest) {
     ScriptedServer receiver([](const Request&) { return ScriptedServer::status(204); });
     const std::string place = "[::ffff:127.0.0.1]:" + std::to_string(receiver.port());
     HttpPost http(configOf("http://" + place), "");
@@ -284,7 +284,7 @@ TEST_F(HttpPostTest, AnAddressOfVersionSixStandsInBracketsInTheRequest) {
     EXPECT_EQ(receiver.requests().at(0).header("host"), place);
 }
 
-TEST_F(HttpPostTest, LeavesABusyReceiverAloneForAsLongAsItAsks) {
+TEST_F(HttpPostTest, PausesForAsLongAsABusyReceiverAsks) {
     ScriptedServer receiver([count = 0](const Request&) mutable {
         return ++count == 1 ? ScriptedServer::status(429, "later", "Retry-After: 1\r\n")
                             : ScriptedServer::status(200);
@@ -305,7 +305,7 @@ TEST_F(HttpPostTest, LeavesABusyReceiverAloneForAsLongAsItAsks) {
     EXPECT_EQ(receiver.requests().size(), 2u);
 }
 
-TEST_F(HttpPostTest, APauseThatIsNoNumberOfSecondsIsNone) {
+TEST_F(HttpPostTest, APauseThatIsNotANumberOfSecondsIsIgnored) {
     for (const char* const value : {"Fri, 20 Nov 2026 07:03:09 GMT", "-5", "", "1x", "0"}) {
         ScriptedServer receiver([&](const Request&) {
             return ScriptedServer::status(503, "", std::string("Retry-After: ") + value + "\r\n");
@@ -317,8 +317,8 @@ TEST_F(HttpPostTest, APauseThatIsNoNumberOfSecondsIsNone) {
     }
 }
 
-TEST_F(HttpPostTest, LeavesTheActionAndTheMaskOfBrokenPipesAlone) {
-    std::signal(SIGPIPE, SIG_DFL); // a signal that came through would end this program
+TEST_F(HttpPostTest, LeavesTheActionAndTheMaskOfSigpipeUnchanged) {
+    std::signal(SIGPIPE, SIG_DFL); // a signal that got through would end this program
     sigset_t before;
     pthread_sigmask(SIG_SETMASK, nullptr, &before);
     ScriptedServer receiver([](const Request&) { return Reply{"", Reply::CLOSE}; });
@@ -334,7 +334,7 @@ TEST_F(HttpPostTest, LeavesTheActionAndTheMaskOfBrokenPipesAlone) {
     EXPECT_EQ(sigismember(&after, SIGPIPE), sigismember(&before, SIGPIPE));
 }
 
-TEST_F(HttpPostTest, AServerWithoutTlsIsNoSecureServer) {
+TEST_F(HttpPostTest, AServerWithoutTlsIsRefused) {
     ScriptedServer receiver([](const Request&) { return ScriptedServer::status(200); });
     HttpPost http(configOf("https://127.0.0.1:" + std::to_string(receiver.port()), 300ms), "");
     EXPECT_FALSE(send(http));

@@ -67,7 +67,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
+TEST_F(JsonlSinkTest, CreatesTheFileAndAppendsALinePerEvent) {
     JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.name(), path);
     EXPECT_EQ(sink.deliver(from(0).first(1), giveUp.get_token()), 1u);
@@ -75,22 +75,22 @@ TEST_F(JsonlSinkTest, MakesTheFileAndAppendsALinePerEvent) {
     EXPECT_EQ(content(path), lines);
     struct stat status {};
     stat(path.c_str(), &status);
-    EXPECT_EQ(status.st_mode & 0007, 0u) << "events are not for every user";
+    EXPECT_EQ(status.st_mode & 0007, 0u) << "not every user may read events";
 }
 
-TEST_F(JsonlSinkTest, KeepsWhatTheFileHas) {
+TEST_F(JsonlSinkTest, KeepsTheFilesContents) {
     directory.write("events.jsonl", "earlier\n");
     JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n" + lines);
 }
 
-TEST_F(JsonlSinkTest, ALineThatAKilledAgentLeftTornIsEnded) {
+TEST_F(JsonlSinkTest, ALineTornByAKilledAgentIsTerminated) {
     directory.write("events.jsonl", "earlier\n{\"id\":1,\"situ");
     JsonlSink(SinkConfig::jsonl(path)).deliver(from(0), giveUp.get_token());
     EXPECT_EQ(content(path), "earlier\n{\"id\":1,\"situ\n" + lines);
 }
 
-TEST_F(JsonlSinkTest, ATornLineThatCannotBeEndedIsAFailure) {
+TEST_F(JsonlSinkTest, ATornLineThatCannotBeTerminatedIsAFailure) {
     directory.write("events.jsonl", "{\"id\":1");
     JsonlSink sink(SinkConfig::jsonl(path));
     {
@@ -112,7 +112,7 @@ TEST_F(JsonlSinkTest, AFileThatBecomesADirectoryIsAFailureUntilItIsOneAgain) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
+TEST_F(JsonlSinkTest, ReopensAFileThatWasMovedOrRemoved) {
     const std::string removed = directory.file("removed.jsonl");
     JsonlSink movedSink(SinkConfig::jsonl(path));
     JsonlSink removedSink(SinkConfig::jsonl(removed));
@@ -120,7 +120,7 @@ TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     removedSink.deliver(from(0).first(1), giveUp.get_token());
     std::filesystem::rename(path, directory.file("events.jsonl.1"));
     std::filesystem::remove(removed);
-    // The path is looked at once a second; until then the open file is written.
+    // The path is checked once a second; until then the open file is written.
     std::string expected = TestEvents::line(1, "one");
     std::string added;
     const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
@@ -136,7 +136,7 @@ TEST_F(JsonlSinkTest, OpensAFileThatWasMovedAwayOrRemovedAgain) {
     EXPECT_THAT(content(removed), testing::StartsWith(TestEvents::line(2, "two")));
 }
 
-TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCan) {
+TEST_F(JsonlSinkTest, AFileThatCannotBeOpenedIsAFailureUntilItCanBe) {
     const std::string inside = directory.file("later/events.jsonl");
     JsonlSink sink(SinkConfig::jsonl(inside));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
@@ -163,7 +163,7 @@ TEST_F(JsonlSinkTest, AfterAFailedWriteTheRestIsWrittenOnce) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
+TEST_F(JsonlSinkTest, AnInterruptedWriteContinues) {
     JsonlSink sink(SinkConfig::jsonl(path));
     Fault fault("write", EINTR, {.times = 3});
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
@@ -171,7 +171,7 @@ TEST_F(JsonlSinkTest, AnInterruptedWriteGoesOn) {
     EXPECT_EQ(content(path), lines);
 }
 
-TEST_F(JsonlSinkTest, ATornLineIsTakenBackAndWrittenWholeLater) {
+TEST_F(JsonlSinkTest, ATornLineIsRemovedAndWrittenInFullLater) {
     const std::size_t first = TestEvents::line(1, "one").size();
     JsonlSink sink(SinkConfig::jsonl(path));
     {
@@ -258,7 +258,7 @@ TEST_F(JsonlSinkPipeTest, ADashIsStandardOutput) {
     EXPECT_EQ(readAll(), lines);
 }
 
-TEST_F(JsonlSinkPipeTest, SaysSinceWhenItsReaderTakesNothing) {
+TEST_F(JsonlSinkPipeTest, ReportsSinceWhenItsReaderTakesNothing) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     EXPECT_EQ(sink.waitsSince(), std::nullopt);
     const auto begin = std::chrono::steady_clock::now();
@@ -287,24 +287,24 @@ TEST_F(JsonlSinkTest, ALinkIsNotFollowed) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
 }
 
-TEST_F(JsonlSinkTest, AFileThatALinkReplacedIsLeft) {
+TEST_F(JsonlSinkTest, AFileReplacedByALinkIsClosed) {
     JsonlSink sink(SinkConfig::jsonl(path));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 3u);
     std::filesystem::rename(path, directory.file("moved"));
     std::filesystem::create_symlink(directory.file("moved"), path);
-    std::this_thread::sleep_for(std::chrono::milliseconds(1100)); // it looks once a second
+    std::this_thread::sleep_for(std::chrono::milliseconds(1100)); // it checks once a second
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
     EXPECT_EQ(sink.error(),
               path + " is a symbolic link, which is not followed; name the file itself");
     EXPECT_EQ(content(directory.file("moved")), lines);
 }
 
-TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) {
+TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilGiveUp) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     std::string expected;
     std::string written;
     std::jthread stopper;
-    // The pipe takes a certain number of lines before it is full.
+    // The pipe takes some lines before it is full.
     std::size_t delivered = 3;
     while (delivered == 3) {
         if (!stopper.joinable() && expected.size() > 32768) {
@@ -319,13 +319,13 @@ TEST_F(JsonlSinkPipeTest, WaitsForAReaderThatTakesNothingUntilItIsToldToGiveUp) 
     EXPECT_EQ(sink.error(), "the reader does not read");
     written = readAll();
     EXPECT_TRUE(expected.starts_with(written));
-    // Offered again, the rest follows where the stream broke off.
+    // When they are offered again, the rest follows where the stream was interrupted.
     const std::stop_source anew;
     EXPECT_EQ(sink.deliver(from(delivered), anew.get_token()), 3 - delivered);
     EXPECT_EQ(written + readAll(), expected);
 }
 
-TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithThoseWhoWriteIntoItToo) {
+TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithOtherWriters) {
     std::fflush(stdout);
     const int output = dup(STDOUT_FILENO);
     const int file = ::open(path.c_str(), O_WRONLY | O_CREAT, 0600); // not for appending
@@ -342,7 +342,7 @@ TEST_F(JsonlSinkTest, AFileAsStandardOutputIsSharedWithThoseWhoWriteIntoItToo) {
     EXPECT_EQ(content(path), "first\n" + lines + "last\n");
 }
 
-/// Standard output is a terminal of which nobody takes what is written.
+/// Standard output is a terminal that nobody reads.
 class JsonlSinkTerminalTest : public JsonlSinkTest {
 protected:
     JsonlSinkTerminalTest() {
@@ -371,7 +371,7 @@ private:
     int m_master = -1;
 };
 
-TEST_F(JsonlSinkTerminalTest, ATerminalWithLittleRoomDoesNotHoldUpTheEnd) {
+TEST_F(JsonlSinkTerminalTest, ATerminalWithLittleRoomDoesNotDelayTheStop) {
     JsonlSink sink(SinkConfig::jsonl("-"));
     auto delivering = std::async(std::launch::async, [&] {
         while (sink.deliver(from(0), giveUp.get_token()) == 3) {

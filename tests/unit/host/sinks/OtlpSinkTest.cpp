@@ -78,19 +78,19 @@ TEST_F(OtlpSinkTest, SendsLogRecords) {
     EXPECT_EQ(Json::parse(server.requests()[0].body), expected);
 }
 
-TEST_F(OtlpSinkTest, TellsOfRecordsThatTheReceiverRejected) {
+TEST_F(OtlpSinkTest, ReportsRecordsThatTheReceiverRejected) {
     OtlpSink sink(config());
     for (const char* const count : {"\"1\"", "1"}) {
         trace.clear();
         server.set(answer, std::string(R"({"partialSuccess":{"rejectedLogRecords":)") + count +
                                R"(,"errorMessage":"too old"}})");
-        EXPECT_EQ(deliver(sink), 1u) << "they are not to be sent again";
+        EXPECT_EQ(deliver(sink), 1u) << "they must not be sent again";
         EXPECT_THAT(trace.messages(),
                     ElementsAre("collector has rejected 1 of 1 events for good: too old"));
     }
 }
 
-TEST_F(OtlpSinkTest, ARemarkWithoutRejectionIsADetail) {
+TEST_F(OtlpSinkTest, AMessageWithoutRejectionIsADetail) {
     server.set(answer, R"({"partialSuccess":{"errorMessage":"be gentle"}})");
     OtlpSink sink(config());
     EXPECT_EQ(deliver(sink), 1u);
@@ -102,7 +102,7 @@ TEST_F(OtlpSinkTest, ARemarkWithoutRejectionIsADetail) {
     EXPECT_THAT(trace.messages(), ElementsAre("collector says: be gentle"));
 }
 
-TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
+TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsStillASuccess) {
     OtlpSink sink(config());
     for (const char* const body :
          {"", "ok", "[]", "null", R"({"partialSuccess":null})", R"({"partialSuccess":{}})",
@@ -113,12 +113,12 @@ TEST_F(OtlpSinkTest, AnAnswerOfAnotherFormIsASuccessAllTheSame) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(OtlpSinkTest, AnAnswerMadeToHarmDoesNot) {
+TEST_F(OtlpSinkTest, AHostileAnswerDoesNoHarm) {
     OtlpSink sink(config());
     const std::string deep = std::string(20'000, '[') + std::string(20'000, ']');
     server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":)" + deep + "}}");
     EXPECT_EQ(deliver(sink), 1u);
-    EXPECT_THAT(trace.messages(), IsEmpty()) << "that is no count";
+    EXPECT_THAT(trace.messages(), IsEmpty()) << "that is not a count";
     server.set(answer, R"({"partialSuccess":{"rejectedLogRecords":"1","errorMessage":"two\nlines)" +
                            std::string(1000, 'x') + R"("}})");
     EXPECT_EQ(deliver(sink), 1u);

@@ -11,12 +11,12 @@
 #include <utility>
 #include <vector>
 
-/// An HTTP server on a free port of this machine that says byte by byte what a test wants.
+/// An HTTP server on a free port of this machine that sends exactly the bytes a test wants.
 class ScriptedServer {
 public:
     struct Request {
         std::string line;    ///< the first line
-        std::string headers; ///< the lines behind it, in lower case
+        std::string headers; ///< the following lines, in lower case
         std::string body;
         int connection = 0; ///< counted from 1
 
@@ -25,9 +25,9 @@ public:
     };
     struct Reply {
         std::string bytes;
-        enum Then { KEEP, CLOSE, HOLD } then = KEEP; ///< HOLD: nothing more happens
-        std::string endless = {};           ///< sent again and again until the client leaves
-        std::chrono::milliseconds pause{0}; ///< before each time
+        enum Then { KEEP, CLOSE, HOLD } then = KEEP; ///< HOLD: it does nothing more
+        std::string endless = {};                    ///< sent repeatedly until the client leaves
+        std::chrono::milliseconds pause{0};          ///< before each time
     };
     /// Called for each request, one at a time.
     using Script = std::function<Reply(const Request& request)>;

@@ -11,7 +11,7 @@ using namespace zrm::host;
 
 namespace {
 
-TEST(SinkFactory, MakesEveryTypeUnderItsName) {
+TEST(SinkFactory, CreatesEveryTypeUnderItsName) {
     for (const SinkType& type : SinkTypes::all()) {
         const std::string name(type.name);
         std::string keys = "type = '" + name + "'\nname = 'the " + name + "'\n";

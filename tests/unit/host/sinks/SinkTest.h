@@ -1,9 +1,9 @@
 #ifndef ZRM_TESTS_SINK_TEST_H
 #define ZRM_TESTS_SINK_TEST_H
 
-#include "host/base/UtcTime.h"
+#include "host/base/TimeText.h"
 #include "host/config/ConfigFile.h"
-#include "host/events/EventRecord.h"
+#include "host/events/Event.h"
 
 #include <gtest/gtest.h>
 
@@ -15,7 +15,7 @@
 
 using namespace zrm::host;
 
-/// The sink that this text, behind [[sink]], configures.
+/// The sink that this text configures, placed after [[sink]].
 inline SinkConfig sinkConfig(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse("[[sink]]\n" + text, "zrm.toml");
     if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
@@ -37,7 +37,7 @@ public:
     };
     static constexpr std::int64_t raisedAt = 1'795'158'189'412; ///< of the first event
 
-    /// Adds an event; its texts are valid in JSON as they are.
+    /// Adds an event; its texts need no escaping in JSON.
     void add(const Entry& entry) {
         m_entries.push_back(entry);
         const Entry& kept = m_entries.back();

@@ -1,7 +1,7 @@
 #include "host/sinks/SyslogMessage.h"
 
 #include "SinkTest.h"
-#include "host/config/SyslogFacilities.h"
+#include "host/config/SinkTypes.h"
 
 #include <gtest/gtest.h>
 
@@ -36,7 +36,7 @@ TEST(SyslogMessage, HasHeaderDataAndText) {
     EXPECT_EQ(messageOf({}), expected(26, usualData, "Failed password for root"));
 }
 
-TEST(SyslogMessage, ThePriorityIsOfFacilityAndSeverity) {
+TEST(SyslogMessage, ThePriorityCombinesFacilityAndSeverity) {
     const auto priority = [](std::string_view facility, const std::string& severity) {
         const std::string message = messageOf({.severity = severity}, facility);
         return message.substr(0, message.find('>') + 1);
@@ -52,14 +52,14 @@ TEST(SyslogMessage, ThePriorityIsOfFacilityAndSeverity) {
     EXPECT_EQ(syslogFacilities.size(), 24u);
 }
 
-TEST(SyslogMessage, EscapesWhatWouldEndAValue) {
+TEST(SyslogMessage, EscapesCharactersThatWouldEndAValue) {
     EXPECT_EQ(messageOf({.situation = R"(a\"b]c\\d)", .log = R"(/var/[x]"\y)"}),
               expected(26,
                        R"( situation="a\\\"b\]c\\\\d" severity="critical" log="/var/[x\]\"\\y")",
                        "Failed password for root"));
 }
 
-TEST(SyslogMessage, TextThatIsNotAsciiHasTheMarkOfUtf8) {
+TEST(SyslogMessage, TextThatIsNotAsciiBeginsWithAByteOrderMark) {
     EXPECT_EQ(messageOf({.description = "caf\xc3\xa9", .log = "/var/log/\xc3\xa4"}),
               expected(26,
                        " situation=\"ssh-bruteforce\" severity=\"critical\" "
@@ -74,7 +74,7 @@ TEST(SyslogMessage, HasNoControlCharacters) {
                        "a b c d e"));
 }
 
-TEST(SyslogMessage, WhatSteersATerminalOrTheDirectionOfTextIsWrittenByNumber) {
+TEST(SyslogMessage, CharactersThatControlHowTextIsShownAreEscaped) {
     EXPECT_EQ(messageOf({.description = "a\xc2\x9b"
                                         "31m\xe2\x80\xae"
                                         "b",
@@ -90,7 +90,7 @@ TEST(SyslogMessage, IsCutAtTheEndOfACharacter) {
     const std::string whole(room, 'x');
     EXPECT_EQ(messageOf({.description = whole}), expected(26, usualData, whole));
     EXPECT_EQ(messageOf({.description = whole + "y"}), expected(26, usualData, whole));
-    // The mark takes three bytes; the character at the end has two, of which one has room.
+    // The mark takes three bytes; the last character has two, of which only one fits.
     const std::string cut(room - 4, 'x');
     EXPECT_EQ(messageOf({.description = cut + "\xc3\xa9"}),
               expected(26, usualData, "\xef\xbb\xbf" + cut));

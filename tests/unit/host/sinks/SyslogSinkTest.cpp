@@ -7,6 +7,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <memory>
@@ -75,7 +76,7 @@ public:
         EXPECT_EQ(::send(m_socket, text.data(), text.size(), MSG_NOSIGNAL),
                   static_cast<ssize_t>(text.size()));
     }
-    /// Sends what the other side takes at once; false when it is gone.
+    /// Sends what the other side accepts at once; false when it is gone.
     bool talk() const {
         static const std::string text(65536, 'x');
         pollfd descriptor = {m_socket, POLLOUT, 0};
@@ -121,7 +122,7 @@ protected:
     std::stop_source giveUp;
 };
 
-TEST_F(SyslogSinkTest, FramesTellTheirLength) {
+TEST_F(SyslogSinkTest, FramesBeginWithTheirLength) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(sink.name(), "syslog 127.0.0.1:" + std::to_string(listener.port));
@@ -146,7 +147,7 @@ TEST_F(SyslogSinkTest, WithoutAReceiverThereIsNoDelivery) {
     EXPECT_EQ(Socket(back).read(frames(0, 3).size()), frames(0, 3));
 }
 
-TEST_F(SyslogSinkTest, ANameThatIsNotKnownIsTold) {
+TEST_F(SyslogSinkTest, AnUnknownNameIsReported) {
     SinkConfig unknown = config(514);
     unknown.options["address"] = std::string("nowhere.invalid:514");
     SyslogSink sink(unknown);
@@ -177,14 +178,14 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     EXPECT_EQ(deliver(sink, 0, 3), 3u);
     const Socket first(listener);
     EXPECT_EQ(first.read(frames(0, 3).size()), frames(0, 3));
-    // The receiver takes nothing any more: the systems between hold what is sent.
+    // The receiver stops reading: what is sent stays in the systems' buffers.
     std::size_t delivered = 3;
     while (deliver(sink, delivered, 10) == 10) {
         delivered += 10;
         ASSERT_LT(delivered, 4900u);
     }
     EXPECT_EQ(sink.error(), "127.0.0.1:" + std::to_string(listener.port) + " takes nothing");
-    // What its system has acknowledged is what it can still read; the rest comes again.
+    // It can still read what its system has acknowledged; the rest is sent again.
     std::string seen;
     for (std::string some; !(some = first.readSome()).empty();) {
         seen += some;
@@ -192,7 +193,10 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     std::string again;
     std::jthread reader([&] {
         const Socket second(listener);
-        while (again.find(frame(delivered + 9)) == std::string::npos) {
+        const std::string last = frame(delivered + 9);
+        std::size_t searched = 0;
+        while (again.find(last, searched) == std::string::npos) {
+            searched = again.size() - std::min(again.size(), last.size());
             const std::string some = second.readSome();
             if (some.empty()) {
                 return;
@@ -211,7 +215,7 @@ TEST_F(SyslogSinkTest, WhatWasNotAcknowledgedIsRepeatedToo) {
     }
 }
 
-TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
+TEST_F(SyslogSinkTest, WhatTheReceiverSendsIsDiscarded) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(deliver(sink, 0, 1), 1u);
@@ -221,7 +225,7 @@ TEST_F(SyslogSinkTest, WhatTheReceiverSaysIsReadAndForgotten) {
     EXPECT_EQ(connection.read(frames(0, 2).size()), frames(0, 2));
 }
 
-TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
+TEST_F(SyslogSinkTest, AReceiverThatNeverStopsSendingIsDisconnected) {
     const Socket listener(SOCK_STREAM);
     SyslogSink sink(config(listener.port));
     EXPECT_EQ(deliver(sink, 0, 1), 1u);
@@ -232,7 +236,7 @@ TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
         }
         first.reset();
     });
-    // However much it says, each delivery ends, and at last the connection does.
+    // However much it sends, each delivery ends, and finally the connection.
     std::size_t again = 0;
     const Clock::time_point limit = Clock::now() + 20s;
     while (!listener.hasInput(0) && Clock::now() < limit) {
@@ -243,7 +247,7 @@ TEST_F(SyslogSinkTest, AReceiverThatNeverStopsTalkingIsLeft) {
     EXPECT_TRUE(listener.hasInput(0)) << "after " << again << " deliveries";
 }
 
-TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidSomething) {
+TEST_F(SyslogSinkTest, WhatWasSentArrivesAlthoughTheReceiverHasSentSomething) {
     const Socket listener(SOCK_STREAM);
     for (int count = 0; count < 300; ++count) {
         events.add({.description = std::string(1500, 'x')});
@@ -256,7 +260,7 @@ TEST_F(SyslogSinkTest, WhatWasSentArrivesThoughTheSinkEndsAndTheReceiverHasSaidS
     EXPECT_EQ(connection.read(frames(0, 303).size()), frames(0, 303));
 }
 
-TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
+TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsAbandonedOnGiveUp) {
     const Socket listener(SOCK_STREAM);
     const std::string large(1500, 'x');
     for (int count = 0; count < 5000; ++count) {
@@ -269,7 +273,7 @@ TEST_F(SyslogSinkTest, AReceiverThatTakesNothingIsLeftWhenToldToGiveUp) {
     });
     const Clock::time_point begin = Clock::now();
     EXPECT_EQ(deliver(sink, 0, events.records().size()), 0u);
-    EXPECT_LT(Clock::now() - begin, 10s);
+    EXPECT_LT(Clock::now() - begin, 50s) << "it did not wait for its own limit";
     EXPECT_EQ(sink.error(),
               "the agent is stopping (127.0.0.1:" + std::to_string(listener.port) + ")");
 }
@@ -287,14 +291,14 @@ TEST_F(SyslogSinkTest, OverUdpEachMessageIsADatagram) {
     EXPECT_FALSE(receiver.hasInput(0));
 }
 
-TEST_F(SyslogSinkTest, OverUdpAPortThatNobodyHasIsAFailureOnceItIsTold) {
+TEST_F(SyslogSinkTest, OverUdpAnUnusedPortIsAFailureOnceItIsReported) {
     std::uint16_t port = 0;
     {
         const Socket gone(SOCK_DGRAM);
         port = gone.port;
     }
     SyslogSink sink(config(port, "udp"));
-    // The first datagram goes out; the answer to it refuses the second.
+    // The first datagram is sent; the reply to it makes the second fail.
     const std::size_t delivered = deliver(sink, 0, 3);
     EXPECT_LT(delivered, 3u);
     EXPECT_EQ(sink.error(),

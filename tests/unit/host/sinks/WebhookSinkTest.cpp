@@ -2,7 +2,6 @@
 
 #include "ScriptedServer.h"
 #include "SinkTest.h"
-#include "host/sinks/HmacSha256.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -71,14 +70,14 @@ TEST_F(WebhookSinkTest, PostsEventsInBatchesAndInOrder) {
     EXPECT_EQ(requests[0].header("x-zrm-signature"), "");
 }
 
-TEST_F(WebhookSinkTest, IsCalledByItsHostOrAsTheFileSays) {
+TEST_F(WebhookSinkTest, IsNamedAfterItsHostOrByTheFile) {
     const WebhookSink host(config());
     EXPECT_EQ(host.name(), "webhook 127.0.0.1:" + std::to_string(receiver.port()));
     const WebhookSink named(config("name = 'hook'"));
     EXPECT_EQ(named.name(), "hook");
 }
 
-TEST_F(WebhookSinkTest, AFailureSaysHowFarItCame) {
+TEST_F(WebhookSinkTest, AFailureSaysHowFarItGot) {
     receiver.set(statuses, std::vector<int>{200, 404});
     WebhookSink sink(config("batch = 2"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 2u);
@@ -88,11 +87,11 @@ TEST_F(WebhookSinkTest, AFailureSaysHowFarItCame) {
     EXPECT_THAT(receiver.bodies(), ElementsAre(body(1, 2), body(3, 4), body(3, 4), body(5, 5)));
 }
 
-TEST_F(WebhookSinkTest, ARequestThatFailedIsRepeatedAsItWas) {
+TEST_F(WebhookSinkTest, AFailedRequestIsRepeatedUnchanged) {
     receiver.set(statuses, std::vector<int>{500});
     WebhookSink sink(config());
     EXPECT_EQ(sink.deliver(from(0).first(2), giveUp.get_token()), 0u);
-    // More events have come by now; the receiver may have the first request nevertheless.
+    // More events have arrived by now; the receiver may still have got the first request.
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
     EXPECT_THAT(receiver.bodies(), ElementsAre(body(1, 2), body(1, 2), body(3, 5)));
     const std::vector<Request> requests = receiver.requests();
@@ -106,7 +105,7 @@ TEST_F(WebhookSinkTest, SignsTheBodyWithASecret) {
               "sha256=" + HmacSha256::hex("key", body(1, 5)));
 }
 
-TEST_F(WebhookSinkTest, ReadsTheSecretAnewForEachRequest) {
+TEST_F(WebhookSinkTest, RereadsTheSecretForEachRequest) {
     const std::string path = directory.file("secret");
     WebhookSink sink(config("secret_file = '" + path + "'"));
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
@@ -116,7 +115,7 @@ TEST_F(WebhookSinkTest, ReadsTheSecretAnewForEachRequest) {
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 0u);
         EXPECT_EQ(sink.error(), path + " is not a file with a secret of 1 to 4096 bytes");
     }
-    EXPECT_TRUE(receiver.requests().empty()) << "nothing goes out unsigned";
+    EXPECT_TRUE(receiver.requests().empty()) << "nothing is sent unsigned";
     for (const char* const secret : {"first", "second key"}) {
         directory.write("secret", std::string(secret) + "\n");
         EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
@@ -137,7 +136,7 @@ TEST_F(WebhookSinkTest, ASecretIsARegularFileOfBoundedSize) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
 }
 
-TEST_F(WebhookSinkTest, ASecretThatIsOpenToEveryUserIsNotUsed) {
+TEST_F(WebhookSinkTest, ASecretThatEveryUserCanReadIsNotUsed) {
     const std::string path = directory.write("secret", "key\n");
     chmod(path.c_str(), 0644);
     WebhookSink sink(config("secret_file = '" + path + "'"));
@@ -150,7 +149,7 @@ TEST_F(WebhookSinkTest, ASecretThatIsOpenToEveryUserIsNotUsed) {
     EXPECT_EQ(sink.deliver(from(0), giveUp.get_token()), 5u);
 }
 
-TEST_F(WebhookSinkTest, HeadersOfAFileAreReadAnewForEachRequest) {
+TEST_F(WebhookSinkTest, RereadsTheHeadersFileForEachRequest) {
     const std::string path =
         directory.write("headers", "# for the gateway\nAuthorization: Bearer a:b\n\n X-One:1 \n");
     chmod(path.c_str(), 0600);

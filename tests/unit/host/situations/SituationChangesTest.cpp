@@ -54,7 +54,7 @@ class SituationChanges : public testing::Test {
 protected:
     SituationChanges() { begin(); }
 
-    /// As a new process begins.
+    /// As in a new process.
     void begin() {
         set.reset();
         set = std::make_unique<SituationSet>(entries, queue, directory.file("situations.json"));
@@ -89,7 +89,7 @@ protected:
     std::unique_ptr<SituationSet> set;
 };
 
-TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
+TEST_F(SituationChanges, TakeEffectBeforeTheCallReturns) {
     EXPECT_EQ(done(set->add(situation("a"))).state, SituationStatus::RUNNING);
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
     EXPECT_EQ(done(set->replace(situation("a", {"ENTRYSRC = 'y'"}))).config.when.size(), 1u);
@@ -104,7 +104,7 @@ TEST_F(SituationChanges, AreInForceWhenTheCallReturns) {
     EXPECT_FALSE(set->find("a"));
 }
 
-TEST_F(SituationChanges, HaveALimitForTheirRegularExpressionsTogether) {
+TEST_F(SituationChanges, LimitTheirRegularExpressionsTogether) {
     SituationConfig large = situation("a");
     large.patternSize = PatternBudget::ofSource / 2 + 1;
     EXPECT_EQ(done(set->add(large)).state, SituationStatus::RUNNING);
@@ -118,7 +118,7 @@ TEST_F(SituationChanges, HaveALimitForTheirRegularExpressionsTogether) {
     EXPECT_EQ(done(set->replace(large)).state, SituationStatus::RUNNING);
 }
 
-TEST_F(SituationChanges, OutliveTheProcess) {
+TEST_F(SituationChanges, SurviveTheProcess) {
     set->apply({situation("filed")});
     set->add(situation("a"));
     set->add(situation("b"));
@@ -136,7 +136,7 @@ TEST_F(SituationChanges, OutliveTheProcess) {
     EXPECT_THAT(raisedBy("x"), testing::UnorderedElementsAre("filed", "other"));
 }
 
-TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
+TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStopped) {
     set->apply({situation("filed")});
     set->stop("filed");
     set->apply({});
@@ -149,10 +149,10 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMore) {
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
     set->stop("filed");
     set->apply({situation("filed", {}, "major")});
-    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "though it has changed";
+    EXPECT_EQ(set->find("filed")->state, SituationStatus::STOPPED) << "although it has changed";
 }
 
-TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMoreAfterARestartEither) {
+TEST_F(SituationChanges, ASituationThatReturnsToTheFileIsNoLongerStoppedAfterARestart) {
     set->apply({situation("filed"), situation("other")});
     set->stop("filed");
     set->stop("other");
@@ -164,7 +164,7 @@ TEST_F(SituationChanges, AFilesSituationThatWasGoneIsStoppedNoMoreAfterARestartE
     EXPECT_EQ(set->find("other")->state, SituationStatus::STOPPED);
 }
 
-TEST_F(SituationChanges, AFileThatIsAppliedAgainWritesNothing) {
+TEST_F(SituationChanges, ApplyingAFileAgainSavesNothing) {
     set->apply({situation("filed")});
     set->stop("filed");
     const Fault fault("open", EIO);
@@ -173,7 +173,7 @@ TEST_F(SituationChanges, AFileThatIsAppliedAgainWritesNothing) {
     EXPECT_THAT(trace.messages(), IsEmpty());
 }
 
-TEST_F(SituationChanges, AFilesSituationIsForgottenAlsoWhenThatCannotBeSaved) {
+TEST_F(SituationChanges, ARemovedSituationOfTheFileIsForgottenEvenWhenThatCannotBeSaved) {
     set->apply({situation("filed")});
     set->stop("filed");
     {
@@ -183,7 +183,7 @@ TEST_F(SituationChanges, AFilesSituationIsForgottenAlsoWhenThatCannotBeSaved) {
                                                   directory.file("situations.json.new") +
                                                   ": No space left on device."));
     }
-    set->apply({situation("filed")}); // saves what could not be saved then
+    set->apply({situation("filed")}); // saves what could not be saved before
     begin();
     set->apply({situation("filed")});
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
@@ -226,7 +226,7 @@ TEST_F(SituationChanges, AreNotMadeWhenTheyCannotBeSaved) {
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
 }
 
-TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
+TEST_F(SituationChanges, TheFilesSituationHidesOneOfTheSameName) {
     set->add(situation("a", {}, "minor"));
     set->apply({situation("a", {}, "critical")});
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
@@ -238,10 +238,10 @@ TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
     EXPECT_EQ(all[1].state, SituationStatus::FAILED);
     EXPECT_THAT(all[1].problem, HasSubstr("the configuration file has a situation of this name"));
     EXPECT_EQ(set->find("a")->config.severity, "critical");
-    // Changed, it still waits.
+    // It still waits after a change.
     EXPECT_EQ(done(set->replace(situation("a", {}, "info"))).state, SituationStatus::FAILED);
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
-    // A stop is the file's.
+    // A stop applies to the file's situation.
     set->stop("a");
     EXPECT_THAT(raisedBy("x"), IsEmpty());
     set->apply({});
@@ -250,7 +250,7 @@ TEST_F(SituationChanges, TheFilesSituationHidesOneOfItsName) {
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
 }
 
-TEST_F(SituationChanges, CountsBeginAnewWithAnotherDefinitionOnly) {
+TEST_F(SituationChanges, CountsStartOverOnlyWithAnotherDefinition) {
     set->add(situation("a"));
     raisedBy("x");
     EXPECT_EQ(set->find("a")->raised, 1u);
@@ -269,7 +269,7 @@ TEST_F(SituationChanges, CountsBeginAnewWithAnotherDefinitionOnly) {
     EXPECT_EQ(set->find("a")->lastRaised, 0);
 }
 
-TEST_F(SituationChanges, ThereIsAMostNumber) {
+TEST_F(SituationChanges, TheirNumberIsLimited) {
     std::string text = R"({"version":1,"stopped":[],"situations":[)";
     for (std::size_t number = 0; number < SituationSet::mostMade; ++number) {
         text += (number == 0 ? "" : ",") + (R"({"name":"s)" + std::to_string(number)) +
@@ -286,7 +286,7 @@ TEST_F(SituationChanges, ThereIsAMostNumber) {
     EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
 }
 
-TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) {
+TEST_F(SituationChanges, WhatRunsIsWhatIsSavedHoweverReloadsAndChangesInterleave) {
     const std::vector<SituationConfig> both = {situation("a", {"ENTRYSRC = 'never'"}),
                                                situation("b", {"ENTRYSRC = 'never'"})};
     set->apply(both);
@@ -299,7 +299,7 @@ TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) 
     for (const char* const name : {"a", "b"}) {
         threads.emplace_back([&, name] {
             for (int round = 0; round < 30; ++round) {
-                set->stop(name); // or the file does not name it
+                set->stop(name); // or the file does not have it
                 if (round % 2 == 0) {
                     set->start(name);
                 }
@@ -324,7 +324,7 @@ TEST_F(SituationChanges, WhatIsInForceIsWhatIsKeptHoweverReloadsAndChangesMeet) 
     EXPECT_EQ(inForce.size(), 2u);
 }
 
-TEST_F(SituationChanges, MayBeAskedForByManyThreadsWhileEntriesArrive) {
+TEST_F(SituationChanges, MayComeFromManyThreadsWhileEntriesArrive) {
     set->apply({situation("filed", {"ENTRYSRC = 'never'"})});
     std::atomic<bool> isOver{false};
     std::thread log([&] {

@@ -1,7 +1,7 @@
 #include "host/situations/SituationRunner.h"
 
+#include "base/LockGuard.h"
 #include "host/events/EventQueue.h"
-#include "host/framework/LockGuard.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "support/RecordingTrace.h"
 #include "tables/zrm_rmlogent_manager.h"
@@ -61,7 +61,7 @@ TEST_F(SituationRunnerTest, OpensAndCloses) {
     EXPECT_EQ(runner.state("a"), State::ABSENT);
     arrive();
     EXPECT_EQ(raised(), 1u);
-    // The counts go on where they were.
+    // The counts continue where they were.
     runner.start("a", named("a"), counts);
     EXPECT_TRUE(runner.settle(10s));
     arrive();
@@ -70,13 +70,13 @@ TEST_F(SituationRunnerTest, OpensAndCloses) {
     EXPECT_EQ(counts->requests.matched(), 2u);
 }
 
-TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutWhoeverAsks) {
+TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutBlockingTheCaller) {
     SituationRunner runner(entries, queue);
     runner.start("old", named("old"), counts);
     ASSERT_TRUE(runner.settle(10s));
     auto newCounts = std::make_shared<SituationCounts>();
     {
-        // As a log thread holds it that waits for room in the queue.
+        // As a log thread does that waits for room in the queue.
         const LockGuard guard(entries.lock());
         runner.stop("old");
         runner.start("new", named("new"), newCounts);
@@ -91,7 +91,7 @@ TEST_F(SituationRunnerTest, WaitsForTheTablesLockWithoutWhoeverAsks) {
     EXPECT_EQ(newCounts->raised(), 1u);
 }
 
-TEST_F(SituationRunnerTest, TheLastWordCountsWhileItWaits) {
+TEST_F(SituationRunnerTest, TheLastRequestWinsWhileItWaits) {
     SituationRunner runner(entries, queue);
     auto later = std::make_shared<SituationCounts>();
     {
@@ -113,7 +113,7 @@ TEST_F(SituationRunnerTest, TheLastWordCountsWhileItWaits) {
     EXPECT_EQ(counts->raised(), 0u);
 }
 
-TEST_F(SituationRunnerTest, ClosesEverythingForGood) {
+TEST_F(SituationRunnerTest, CloseIsFinal) {
     SituationRunner runner(entries, queue);
     runner.start("a", named("a"), counts);
     runner.start("b", named("b"), std::make_shared<SituationCounts>());
@@ -126,7 +126,7 @@ TEST_F(SituationRunnerTest, ClosesEverythingForGood) {
     EXPECT_TRUE(runner.settle(0s));
 }
 
-TEST(SituationRunner, TellsWhatTheTableRefusedAndWhatTheAgentEnded) {
+TEST(SituationRunner, ReportsWhatTheTableRefusedAndWhatTheAgentStopped) {
     const RecordingTrace trace(TRC1_ERROR);
     TestManager table;
     EventQueue queue(1, sizeof(TestRow));

@@ -54,7 +54,7 @@ SituationConfig twoOf(const char* source) {
                       number("PERIODTHRS", INTF_EQUAL, 3600)});
 }
 
-/// The time as rows have it.
+/// The time in the form of rows.
 std::string now() {
     const std::time_t time = std::time(nullptr);
     std::tm local{};
@@ -118,7 +118,7 @@ TEST_F(SituationSetTest, ThresholdsAreInForce) {
     EXPECT_THAT(raised(), ElementsAre("two"));
 }
 
-TEST_F(SituationSetTest, ASituationThatIsGoneRaisesNothingMore) {
+TEST_F(SituationSetTest, ARemovedSituationRaisesNothingMore) {
     situations.apply({situation("a", {}), situation("b", {})});
     situations.apply({situation("b", {})});
     EXPECT_EQ(situations.size(), 1u);
@@ -129,7 +129,7 @@ TEST_F(SituationSetTest, ASituationThatIsGoneRaisesNothingMore) {
     EXPECT_THAT(raised(), ElementsAre());
 }
 
-TEST_F(SituationSetTest, ASituationThatIsAsItWasKeepsWhatItHasCounted) {
+TEST_F(SituationSetTest, AnUnchangedSituationKeepsItsCounts) {
     situations.apply({twoOf("sshd")});
     arrive("sshd");
     situations.apply({situation("another", {text("ENTRYSRC", "cron")}), twoOf("sshd")});
@@ -137,7 +137,7 @@ TEST_F(SituationSetTest, ASituationThatIsAsItWasKeepsWhatItHasCounted) {
     EXPECT_THAT(raised(), ElementsAre("two"));
 }
 
-TEST_F(SituationSetTest, ASituationThatChangedBeginsAnew) {
+TEST_F(SituationSetTest, AChangedSituationStartsOver) {
     situations.apply({twoOf("sshd")});
     arrive("sshd");
     arrive("cron");
@@ -150,17 +150,17 @@ TEST_F(SituationSetTest, ASituationThatChangedBeginsAnew) {
     severe.severity = "critical";
     situations.apply({severe});
     arrive("cron");
-    EXPECT_THAT(raised(), ElementsAre()) << "another severity is another situation";
+    EXPECT_THAT(raised(), ElementsAre()) << "a situation with another severity is a new one";
 }
 
-TEST_F(SituationSetTest, AFullQueueTakesWhatARowRaisesAndAClosedOneDoesNot) {
+TEST_F(SituationSetTest, AFullQueueTakesTheEventsOfARowAndAClosedOneDoesNot) {
     situations.apply({situation("a", {}), situation("b", {})});
-    for (int count = 0; count < 3; ++count) { // the queue has room for four
+    for (int count = 0; count < 3; ++count) { // the queue holds four
         EXPECT_EQ(arrive("sshd"), 0u);
     }
     EXPECT_EQ(queue.backlog(reader), 6u);
     queue.close();
-    EXPECT_NE(arrive("sshd"), 0u) << "the log learns that its row was not taken";
+    EXPECT_NE(arrive("sshd"), 0u) << "the log is told that its row was refused";
     EXPECT_EQ(raised().size(), 6u);
 }
 
@@ -187,7 +187,7 @@ TEST_F(SituationSetTest, SituationsComeAndGoWhileRowsArrive) {
     sink.join();
 }
 
-TEST(SituationSet, SaysThatASituationCouldNotBeOpened) {
+TEST(SituationSet, ReportsThatASituationCouldNotBeOpened) {
     const RecordingTrace trace(TRC1_ERROR);
     TestManager table;
     table.gives = false;
@@ -197,7 +197,7 @@ TEST(SituationSet, SaysThatASituationCouldNotBeOpened) {
     EXPECT_THAT(trace.messages(), ElementsAre("Situation a could not be opened."));
 }
 
-TEST(SituationSet, SaysThatTheAgentStoppedASituation) {
+TEST(SituationSet, ReportsThatTheAgentStoppedASituation) {
     const RecordingTrace trace(TRC1_ERROR);
     TestManager table;
     table.onCreate = [](TestRequest& request) { request.Stopped(1); };

@@ -64,7 +64,7 @@ protected:
     std::string message;
 };
 
-TEST_F(SituationStoreTest, GivesBackWhatWasSaved) {
+TEST_F(SituationStoreTest, LoadsWhatWasSaved) {
     EXPECT_EQ(store.save(content()), "");
     const SituationStore::Content loaded = SituationStore(file).load(message);
     EXPECT_EQ(message, "");
@@ -75,7 +75,7 @@ TEST_F(SituationStoreTest, GivesBackWhatWasSaved) {
     EXPECT_TRUE(loaded.made[1].isStopped);
     EXPECT_EQ(loaded.made[0].problem, "");
     EXPECT_THAT(loaded.stoppedFiles, ElementsAre("filed"));
-    EXPECT_THAT(names(), ElementsAre("situations.json")) << "no temporary is left";
+    EXPECT_THAT(names(), ElementsAre("situations.json")) << "no temporary file is left";
     struct stat status {};
     stat(file.c_str(), &status);
     EXPECT_EQ(status.st_mode & S_IRWXO, 0u);
@@ -94,7 +94,7 @@ TEST_F(SituationStoreTest, AFileOfAnyDepthIsMovedAside) {
     }
 }
 
-TEST_F(SituationStoreTest, APipeInItsPlaceIsNotWaitedFor) {
+TEST_F(SituationStoreTest, DoesNotWaitForAPipeInItsPlace) {
     ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
     EXPECT_THAT(store.load(message).made, IsEmpty());
     EXPECT_THAT(message, HasSubstr("cannot be used"));
@@ -120,13 +120,13 @@ TEST_F(SituationStoreTest, IsEmptyWithoutAFile) {
     EXPECT_THAT(names(), IsEmpty());
 }
 
-TEST_F(SituationStoreTest, KeepsNothingWithoutAPath) {
+TEST_F(SituationStoreTest, SavesNothingWithoutAPath) {
     SituationStore nothing("");
     EXPECT_EQ(nothing.save(content()), "");
     EXPECT_THAT(nothing.load(message).made, IsEmpty());
 }
 
-TEST_F(SituationStoreTest, MakesItsDirectory) {
+TEST_F(SituationStoreTest, CreatesItsDirectory) {
     SituationStore deeper(directory.file("state") + "/situations.json");
     EXPECT_EQ(deeper.save(content()), "");
     EXPECT_EQ(deeper.load(message).made.size(), 2u);
@@ -153,7 +153,7 @@ TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
     EXPECT_NE(text(), before);
 }
 
-TEST_F(SituationStoreTest, NeitherALinkNorAPipeInItsPlaceIsWritten) {
+TEST_F(SituationStoreTest, WritesNeitherToALinkNorToAPipeInItsPlace) {
     const std::string target = directory.write("target", "other");
     for (const std::string& place : {file, file + ".new"}) {
         std::filesystem::create_symlink(target, place);
@@ -168,7 +168,7 @@ TEST_F(SituationStoreTest, NeitherALinkNorAPipeInItsPlaceIsWritten) {
     EXPECT_TRUE(std::filesystem::is_regular_file(file));
 }
 
-TEST_F(SituationStoreTest, SaysThatTheFileCannotBeReplaced) {
+TEST_F(SituationStoreTest, ReportsThatTheFileCannotBeReplaced) {
     std::filesystem::create_directory(file);
     directory.write("situations.json/inside", "x");
     SituationStore fresh(file);
@@ -176,7 +176,7 @@ TEST_F(SituationStoreTest, SaysThatTheFileCannotBeReplaced) {
     EXPECT_THAT(names(), ElementsAre("situations.json"));
 }
 
-TEST_F(SituationStoreTest, MovesAsideWhatItCannotUse) {
+TEST_F(SituationStoreTest, MovesAnUnusableFileAside) {
     const std::pair<const char*, const char*> bad[] = {
         {"", "it is damaged"},
         {"{\"version\":1,", "it is damaged"},
@@ -203,11 +203,11 @@ TEST_F(SituationStoreTest, MovesAsideWhatItCannotUse) {
             << written;
         ASSERT_EQ(names().size(), 1u);
         EXPECT_THAT(names()[0], HasSubstr("situations.json.bad-"));
-        EXPECT_EQ(fresh.save(content()), "") << "a new one is begun";
+        EXPECT_EQ(fresh.save(content()), "") << "a new file is created";
     }
 }
 
-TEST_F(SituationStoreTest, SavesNothingOverWhatItCouldNotRead) {
+TEST_F(SituationStoreTest, DoesNotOverwriteWhatItCouldNotRead) {
     ASSERT_EQ(store.save(content()), "");
     const std::string before = text();
     SituationStore fresh(file);
@@ -230,7 +230,7 @@ TEST_F(SituationStoreTest, SavesNothingOverWhatItCouldNotRead) {
     EXPECT_EQ(text(), before);
 }
 
-TEST_F(SituationStoreTest, SaysWhatIsWrongWithASituationThatCannotRun) {
+TEST_F(SituationStoreTest, ReportsWhyASituationCannotRun) {
     directory.write("situations.json",
                     R"({"version":1,"situations":[{"name":"a","when":["GONE = 'x'"],)"
                     R"("frequency":">= 5","stopped":true}],"stopped":[]})");

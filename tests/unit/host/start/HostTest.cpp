@@ -33,7 +33,7 @@ TestManager& entries() {
 
 bool hasLogs = true;
 
-/// Two tables, and one log unless a test has none.
+/// Two tables, and one log unless a test removes it.
 int loadTables() {
     static auto* const logs = new TestManager("RMMONLOG");
     logs->onCreate = [](TestRequest& created) {
@@ -52,7 +52,7 @@ int loadNothing() {
     return 0;
 }
 
-/// Waits until there are situations, and hands each of them a row.
+/// Waits until there are situations and offers each of them a row.
 void arrive(std::size_t situations = 1) {
     while (entries().linked().size() != situations) {
         std::this_thread::sleep_for(1ms);
@@ -177,7 +177,7 @@ TEST_F(HostTest, TheConfigurationSetsWhatTheEnvironmentLeavesOpen) {
     EXPECT_STREQ(std::getenv("QFW_TRC1"), "detail");
 }
 
-TEST_F(HostTest, UnusableTraceLevelsOfTheEnvironmentAreSaid) {
+TEST_F(HostTest, UnusableTraceLevelsOfTheEnvironmentAreReported) {
     setenv("QFW_TRC1", "loud", 1);
     testing::internal::CaptureStderr();
     start({"--config", write("")});
@@ -215,7 +215,7 @@ TEST_F(HostTest, WithoutTheTableItFails) {
                 "The agent has not registered its Log Entries table.");
 }
 
-TEST_F(HostTest, AnEndOfTheProcessOnAnotherThreadDeliversWhatIsQueued) {
+TEST_F(HostTest, AnExitOnAnotherThreadDeliversWhatIsQueued) {
     EXPECT_EXIT(
         {
             std::atexit([] { AGF_Shutdown(1); });
@@ -226,13 +226,13 @@ TEST_F(HostTest, AnEndOfTheProcessOnAnotherThreadDeliversWhatIsQueued) {
                 std::exit(3);
             }).detach();
             run();
-            std::_Exit(98); // the main loop must not come back
+            std::_Exit(98); // the main loop must not return
         },
         testing::ExitedWithCode(3), "");
     EXPECT_EQ(lines(), 100);
 }
 
-TEST_F(HostTest, AnEndBeforeTheMainLoopNeedsNothing) {
+TEST_F(HostTest, AnExitBeforeTheMainLoopNeedsNothing) {
     EXPECT_EXIT(
         {
             std::atexit([] { AGF_Shutdown(1); });
@@ -269,7 +269,7 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
                               " was not loaded; the situations stay as they were\n"));
 }
 
-TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
+TEST_F(HostTest, ATruncatedFileChangesNothingAndLostSituationsAreReported) {
     const auto situations = [](const std::string& names) {
         std::string text;
         for (const char name : names) {
@@ -312,14 +312,14 @@ TEST_F(HostTest, AFileThatWasCutOffChangesNothingAndLostSituationsAreSaid) {
                   "off, write it again\n");
 }
 
-TEST_F(HostTest, SaysOnceThatThereIsNoLogToMonitor) {
+TEST_F(HostTest, ReportsOnceThatThereIsNoLogToMonitor) {
     hasLogs = false;
     EXPECT_EXIT(
         {
             errorsToFile();
             std::thread([this] {
                 waitForError("no log");
-                std::this_thread::sleep_for(1100ms); // one more look at the logs
+                std::this_thread::sleep_for(1100ms); // one more check of the logs
                 stop();
             }).detach();
             std::exit(run());
@@ -330,7 +330,7 @@ TEST_F(HostTest, SaysOnceThatThereIsNoLogToMonitor) {
                             "names one log per line; exiting in a minute\n");
 }
 
-TEST_F(HostTest, SaysWhichFileNamesNoLog) {
+TEST_F(HostTest, ReportsWhichFileNamesNoLog) {
     hasLogs = false;
     EXPECT_EXIT(
         {
@@ -347,7 +347,7 @@ TEST_F(HostTest, SaysWhichFileNamesNoLog) {
               "monitored, and 'zrmctl check /etc/zrm/logs.conf' says why; exiting in a minute\n");
 }
 
-TEST_F(HostTest, GoesOnWithoutItsExitRoutine) {
+TEST_F(HostTest, RunsWithoutItsExitRoutine) {
     EXPECT_EXIT(
         {
             Fault fault("atexit", ENOMEM);

@@ -59,7 +59,7 @@ protected:
     TemporaryDirectory m_directory;
 };
 
-TEST_F(ServiceNotifierTest, TellsOfStartAndEndAtTheSocketOfTheEnvironment) {
+TEST_F(ServiceNotifierTest, ReportsStartAndStopToTheSocketOfTheEnvironment) {
     const std::string path = m_directory.file("notify");
     ManagerSocket manager(path);
     setenv("NOTIFY_SOCKET", path.c_str(), 1);
@@ -72,20 +72,20 @@ TEST_F(ServiceNotifierTest, TellsOfStartAndEndAtTheSocketOfTheEnvironment) {
     EXPECT_EQ(manager.next(), "");
 }
 
-TEST_F(ServiceNotifierTest, LeavesTheSocketToNoChild) {
+TEST_F(ServiceNotifierTest, HidesTheSocketFromChildren) {
     setenv("NOTIFY_SOCKET", m_directory.file("notify").c_str(), 1);
     ServiceNotifier::takeFromEnvironment();
     EXPECT_EQ(getenv("NOTIFY_SOCKET"), nullptr);
 }
 
-TEST_F(ServiceNotifierTest, KnowsAbstractSockets) {
+TEST_F(ServiceNotifierTest, SupportsAbstractSockets) {
     const std::string name = "@zrm-notify-" + std::to_string(getpid());
     ManagerSocket manager(name);
     ServiceNotifier(name).ready();
     EXPECT_EQ(manager.next(), "READY=1");
 }
 
-TEST_F(ServiceNotifierTest, TellsNobodyWithoutAServiceManager) {
+TEST_F(ServiceNotifierTest, SendsNothingWithoutAServiceManager) {
     RecordingTrace trace(TRC1_ERROR);
     unsetenv("NOTIFY_SOCKET");
     ServiceNotifier::takeFromEnvironment().ready();
@@ -103,7 +103,7 @@ TEST_F(ServiceNotifierTest, AManagerThatIsGoneIsTraced) {
                                               ". errno = 2; No such file or directory."));
 }
 
-TEST_F(ServiceNotifierTest, AnAddressThatIsNoneIsTraced) {
+TEST_F(ServiceNotifierTest, AnInvalidAddressIsTraced) {
     RecordingTrace trace(TRC1_ERROR);
     const std::string longPath = "/" + std::string(sizeof sockaddr_un{}.sun_path, 'x');
     ServiceNotifier(longPath).stopping();

@@ -41,7 +41,7 @@ protected:
     }
     ~ServingTest() override { Tables::clear(); }
 
-    /// A log's thread that hands rows over until one is not taken.
+    /// A log's thread that offers rows until one is refused.
     unsigned arrive() {
         unsigned status = 0;
         SYS1_GetLock(entries.lock());
@@ -68,17 +68,17 @@ protected:
     TestManager entries{"RMLOGENT"};
     TestManager logs{"RMMONLOG"};
     int logSamples = 0;
-    Watchdog watchdog; // not started: it looks after a whole process
+    Watchdog watchdog; // not started: it watches a whole process
 };
 
-TEST_F(ServingTest, DeliversEventsFromItsBeginningToItsStop) {
+TEST_F(ServingTest, DeliversEventsFromStartToStop) {
     const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     ASSERT_NE(serving, nullptr);
     EXPECT_EQ(arrive(), 0u);
     EXPECT_EQ(arrive(), 0u);
     serving->stop(Clock::now() + 10s);
     EXPECT_EQ(lines(), 2);
-    arrive(); // nobody listens any more
+    arrive(); // nobody receives it any more
     EXPECT_EQ(lines(), 2);
 }
 
@@ -108,8 +108,8 @@ TEST_F(ServingTest, CountsTheMonitoredLogs) {
     EXPECT_EQ(Serving::countLogs(), 0u);
 }
 
-TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
-    config.history.enabled = false; // the queue is all the room there is
+TEST_F(ServingTest, AStopReleasesAWaitingLogAndEndsAtItsLimit) {
+    config.history.enabled = false; // only the queue holds events
     config.sinks = {SinkConfig::jsonl("/dev/full")};
     const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     std::atomic<int> taken{0};
@@ -120,7 +120,7 @@ TEST_F(ServingTest, AStopReleasesALogThatWaitsForASinkAndEndsAtItsLimit) {
         }
         EventRoom::notePassedOver(7);
     });
-    while (EventRoomControl::waits().count == 0) { // the queue is full, and the log stands still
+    while (EventRoomControl::waits().count == 0) { // the queue is full, and the log waits
         std::this_thread::sleep_for(1ms);
     }
     testing::internal::CaptureStderr();
@@ -146,7 +146,7 @@ TEST_F(ServingTest, AnotherThreadMayReleaseTheLogsAndDeliverTheRest) {
     EXPECT_NE(arrive(), 0u);
 }
 
-TEST_F(ServingTest, SaysWhereHttpIs) {
+TEST_F(ServingTest, ReportsTheAddressOfHttp) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
     testing::internal::CaptureStderr();
@@ -158,7 +158,7 @@ TEST_F(ServingTest, SaysWhereHttpIs) {
     serving->stop(Clock::now() + 10s);
 }
 
-TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
+TEST_F(ServingTest, WithoutATokenOnlyHttpIsOff) {
     config.http.listen = ListenAddress{"127.0.0.1", 0};
     config.http.tokenFile = directory.file("no/such/token");
     const auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
@@ -172,7 +172,7 @@ TEST_F(ServingTest, WithoutATokenHttpIsOffAndEverythingElseGoesOn) {
     EXPECT_EQ(lines(), 1);
 }
 
-TEST_F(ServingTest, WhatASinkDoesNotGetIsKeptForTheNextStart) {
+TEST_F(ServingTest, UndeliveredEventsAreKeptForTheNextStart) {
     const std::vector<SinkConfig> good = config.sinks;
     config.sinks = {SinkConfig::jsonl(directory.file("no/such/directory/events.jsonl"))};
     auto serving = Serving::begin(config, entries, watchdog, openHistory(config));
@@ -198,7 +198,7 @@ TEST_F(ServingTest, ATickRecordsTheMinuteThatIsOver) {
     serving->tick();
     EXPECT_EQ(logSamples, before) << "no minute is over yet";
     serving->stop(Clock::now() + 10s);
-    EXPECT_EQ(logSamples, before + 1) << "the end of the agent ends the minute";
+    EXPECT_EQ(logSamples, before + 1) << "the minute ends with the agent";
 }
 
 TEST_F(ServingTest, WithoutAnAddressThereIsNoHttp) {
