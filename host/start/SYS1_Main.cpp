@@ -4,6 +4,7 @@
 #include "host/config/ConfigFile.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
+#include "host/sources/CompressedGeneration.h"
 #include "host/start/CommandLine.h"
 #include "host/start/Descriptors.h"
 #include "host/start/Host.h"
@@ -92,6 +93,7 @@ void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
         setenv(setting.variable.c_str(), setting.value.c_str(), keepWhatIsSet);
     }
     setTrace(commandLine.traceFile());
+    GenerationReader::setOpen(openCompressedGeneration);
     Host::instance().configure(std::move(config), std::move(file),
                                ServiceNotifier::takeFromEnvironment());
     Host::instance().findLogs(commandLine.traceFile());

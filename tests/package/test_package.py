@@ -70,7 +70,7 @@ def test_the_operators_files_survive_an_upgrade(control):
 
 def test_it_says_what_it_needs():
     depends = {entry.split()[0] for entry in field("Depends").split(", ")}
-    assert {"adduser", "procps", "libc6", "libsqlite3-0", "libssl3", "libre2-9"} <= depends
+    assert {"adduser", "procps", "libc6", "libsqlite3-0", "libssl3", "libre2-9", "libarchive13"} <= depends
     assert field("Recommends") == "ca-certificates"
 
 
