@@ -30,8 +30,8 @@ public:
     Host(const Host&) = delete;
     Host& operator=(const Host&) = delete;
 
-    /// Takes the configuration that was read at start-up from this file, and whom to tell of start
-    /// and orderly end. Main thread, first.
+    /// Sets the configuration that was read from this file at start-up, and the notifier of start
+    /// and orderly stop. Main thread, first.
     void configure(HostConfig config, WatchedFile file, ServiceNotifier notifier = {});
     void setLoader(int (*loader)()) noexcept { m_loader = loader; }
 
