@@ -22,7 +22,7 @@ namespace zrm::host {
 
 /// Runs a situation over the contents of logs between two times, using the logs' reports without
 /// their row limit. Keeps the times of matching entries but no rows. Used by one thread, which
-/// keeps the logs from changing meanwhile (MonitoredLogs).
+/// keeps the logs from changing in the meantime (MonitoredLogs).
 class Backtest {
 public:
     static constexpr std::uint64_t mostEntries = 5'000'000; ///< read

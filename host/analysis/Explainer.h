@@ -26,7 +26,7 @@ namespace zrm::host {
 
 /// Explains how a situation evaluates entries. Earlier entries of the log count towards the
 /// thresholds, as far back as LogTail reads. Used by one thread, which keeps the logs from changing
-/// meanwhile (MonitoredLogs).
+/// in the meantime (MonitoredLogs).
 class Explainer {
 public:
     static constexpr std::size_t mostEntries = 1000;

@@ -119,8 +119,8 @@ HttpAnswer setTrace(const HttpRequest& request) {
     if (levels.size() > longestLevels) {
         fields.refuse("levels", "write at most " + std::to_string(longestLevels) + " bytes");
     }
-    if (const std::string problem = TraceControl::configure(levels); !problem.empty()) {
-        fields.refuse("levels", problem);
+    if (const Result<void> configured = TraceControl::configure(levels); !configured) {
+        fields.refuse("levels", configured.error());
     }
     const std::string inForce = TraceControl::levels();
     trace.always()("Trace levels are now \"%.*s\"%s.", tracedLevels, inForce.c_str(),

@@ -12,16 +12,16 @@ namespace zrm::host {
 
 class HistoryReader;
 
-/// `GET /api/v1/events/stream`: events as they are committed, as server-sent events. One thread,
-/// which lives while there are clients, serves them all: it gives each as much as its connection
-/// takes. A client that reads too slowly is disconnected and can go on where it was.
+/// `GET /api/v1/events/stream`: events as they are committed, as server-sent events. One thread
+/// serves all clients while there are any, and sends each as much as its connection takes. A client
+/// that reads too slowly is disconnected and can continue where it was.
 class EventStream : public Resource {
 public:
     static constexpr std::size_t mostClients = 32;
     static constexpr std::chrono::seconds keepAlive{15};
 
-    /// `history` outlives the object; null when the history is off. What tells a client that the
-    /// stream is alive comes this often where there are no events.
+    /// `history` outlives the object; null when the history is off. Without events, a keep-alive is
+    /// sent this often.
     explicit EventStream(HistoryReader* history, std::chrono::milliseconds interval = keepAlive);
     /// Ends every stream.
     ~EventStream() override;
@@ -30,7 +30,7 @@ public:
 
     void addRoutes(Router& router) override;
 
-    /// The number of clients that follow events now.
+    /// The number of connected clients.
     std::size_t clients() const noexcept;
 
 private:

@@ -17,7 +17,6 @@
 #include <optional>
 #include <string>
 #include <utility>
-#include <variant>
 #include <vector>
 
 namespace zrm::host {
@@ -37,10 +36,10 @@ std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
         return {};
     }
     auto conditions = ConditionBuilder::ofLog(*log);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
-        throw RequestRefused(400, problem->what + "; " + problem->cure, "log");
+    if (!conditions) {
+        throw RequestRefused(400, {conditions.error().what, conditions.error().cure, "log"});
     }
-    return std::get<std::vector<Condition>>(std::move(conditions));
+    return std::move(*conditions);
 }
 
 /// The log's ledger; null when a refresh has just stopped its monitoring.

@@ -14,7 +14,6 @@
 #include <optional>
 #include <string>
 #include <utility>
-#include <variant>
 
 namespace zrm::host {
 
@@ -42,10 +41,10 @@ std::string readTime(JsonFields& fields, const char* key, std::optional<std::str
 
 std::vector<Condition> readLog(JsonFields& fields, const std::string& log) {
     auto conditions = ConditionBuilder::ofLog(log);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
-        fields.refuse("log", problem->what + "; " + problem->cure);
+    if (!conditions) {
+        fields.refuse("log", conditions.error());
     }
-    return std::get<std::vector<Condition>>(std::move(conditions));
+    return std::move(*conditions);
 }
 
 Condition bound(_IntfOper op, std::string stamp) {
@@ -74,12 +73,11 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     report.conditions.push_back(bound(INTF_LESS_OR_EQUAL, report.to));
     const ConditionParser parser("RMLOGENT");
     for (std::size_t index = 0; index < where.size(); ++index) {
-        auto result = parser.parse(where[index]);
-        if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-            fields.refuse("where[" + std::to_string(index) + "]",
-                          problem->what + "; " + problem->cure);
+        Result<Condition> condition = parser.parse(where[index]);
+        if (!condition) {
+            fields.refuse("where[" + std::to_string(index) + "]", condition.error());
         }
-        report.conditions.push_back(std::get<Condition>(std::move(result)));
+        report.conditions.push_back(std::move(*condition));
     }
     return report;
 }

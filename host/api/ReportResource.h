@@ -12,12 +12,12 @@
 
 namespace zrm::host {
 
-/// What a report is asked for.
+/// The request for a report.
 struct ReportRequest {
-    std::string log;  ///< whole path
+    std::string log;  ///< full path
     std::string from; ///< 16-character time stamp, as `to`
     std::string to;
-    std::vector<Condition> conditions; ///< all of it, as the agent takes it
+    std::vector<Condition> conditions; ///< all of the above, in the form that the agent takes
 
     /// Reads {"log", "from", "to", "where": [condition, ..]}; without `to`, up to the newest
     /// entry.

@@ -57,18 +57,6 @@ ConditionValue readValue(const json& value, const std::string& field) {
     return result;
 }
 
-std::string fieldOf(ConditionProblem::Part part, const std::string& filter) {
-    switch (part) {
-    case ConditionProblem::COLUMN:
-        return filter + ".column";
-    case ConditionProblem::OPERATOR:
-        return filter + ".op";
-    case ConditionProblem::VALUE:
-        break;
-    }
-    return filter + ".value";
-}
-
 /// Refuses a filter that is not an object of exactly column, op and value.
 void checkForm(const json& filter, const std::string& field) {
     if (!filter.is_object()) {
@@ -94,12 +82,14 @@ Condition readFilter(const ConditionBuilder& builder, const json& filter, const 
                      PatternBudget& budget) {
     checkForm(filter, field);
     const ConditionValue value = readValue(filter["value"], field + ".value");
-    auto result = builder.build(filter["column"].get<std::string>(),
-                                filter["op"].get<std::string>(), value, budget);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-        throw RequestRefused(400, {problem->what, problem->cure, fieldOf(problem->part, field)});
+    Result<Condition> condition = builder.build(filter["column"].get<std::string>(),
+                                                filter["op"].get<std::string>(), value, budget);
+    if (!condition) {
+        Problem& problem = condition.error();
+        problem.field.insert(0, field + '.');
+        throw RequestRefused(400, std::move(problem));
     }
-    return std::get<Condition>(std::move(result));
+    return std::move(*condition);
 }
 
 /// Refuses a report on Log Entries that does not say on what.

@@ -28,7 +28,7 @@ SituationConfig SituationBody::situation(JsonFields& fields, const std::string& 
     const auto problems = SituationValidator::check(text(fields, name), situation);
     if (!problems.empty()) {
         const SituationProblem& first = problems.front();
-        throw RequestRefused(400, first.what + "; " + first.cure, fields.place(first.fieldText()));
+        throw RequestRefused(400, {first.what, first.cure, fields.place(first.field)});
     }
     return situation;
 }

@@ -11,7 +11,6 @@
 #include <optional>
 #include <string>
 #include <utility>
-#include <variant>
 
 #include <nlohmann/json.hpp>
 
@@ -21,34 +20,34 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-[[noreturn]] void refuse(const SituationRefusal& refusal) {
-    int status = 503;
-    const char* field = "";
-    switch (refusal.reason) {
+int statusOf(SituationRefusal::Reason reason) {
+    switch (reason) {
     case SituationRefusal::UNKNOWN:
-        status = 404;
-        field = "name";
-        break;
+        return 404;
     case SituationRefusal::EXISTS:
     case SituationRefusal::FROM_FILE:
-        status = 409;
-        field = "name";
-        break;
     case SituationRefusal::TOO_MANY:
-        status = 409;
-        break;
+        return 409;
     case SituationRefusal::NOT_SAVED:
     case SituationRefusal::BUSY:
         break;
     }
-    throw RequestRefused(status, refusal.detail, field);
+    return 503;
+}
+
+[[noreturn]] void refuse(const SituationRefusal& refusal) {
+    throw RequestRefused(statusOf(refusal.reason), refusal.problem);
+}
+
+Json jsonOf(const Problem& problem) {
+    return {{"field", problem.field}, {"detail", problem.text()}};
 }
 
 HttpAnswer answerOf(const SituationSet::Change& change) {
-    if (const auto* const refusal = std::get_if<SituationRefusal>(&change)) {
-        refuse(*refusal);
+    if (!change) {
+        refuse(change.error());
     }
-    const Json status = SituationJson::status(std::get<SituationStatus>(change));
+    const Json status = SituationJson::status(*change);
     return HttpAnswer::json(SituationJson::text(status));
 }
 
@@ -124,8 +123,8 @@ HttpAnswer SituationsResource::replace(const HttpRequest& request) {
 
 HttpAnswer SituationsResource::remove(const HttpRequest& request) {
     JsonFields(request.body).refuseUnknown();
-    if (const auto refusal = m_situations.remove(request.captures.front())) {
-        refuse(*refusal);
+    if (const auto removed = m_situations.remove(request.captures.front()); !removed) {
+        refuse(removed.error());
     }
     return {204, "", ""};
 }
@@ -137,13 +136,11 @@ HttpAnswer SituationsResource::validate(const HttpRequest& request) {
         SituationConfig situation;
         const SituationText text = SituationBody::text(fields);
         for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
-            problems.push_back(
-                {{"field", problem.fieldText()}, {"detail", problem.what + "; " + problem.cure}});
+            problems.push_back(jsonOf(problem));
         }
     } catch (const RequestRefused& refused) {
         // A member of the wrong type prevents the others from being read.
-        problems.push_back(
-            {{"field", refused.problem().field}, {"detail", refused.problem().text()}});
+        problems.push_back(jsonOf(refused.problem()));
     }
     return HttpAnswer::json(SituationJson::text({{"problems", std::move(problems)}}));
 }

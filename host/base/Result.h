@@ -7,7 +7,7 @@
 
 namespace zrm::host {
 
-/// Why something is refused. The texts begin in lower case and have no full stop.
+/// Why something is refused. The texts are clauses: they have no full stop.
 struct Problem {
     std::string what;       ///< what is wrong
     std::string cure = {};  ///< how to fix it; empty where `what` leaves nothing to add

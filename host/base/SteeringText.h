@@ -17,9 +17,8 @@ void appendEscape(std::string& text, char32_t character);
 /// between values stay.
 std::string escapedInJson(std::string document);
 
-/// Copies a text with escapes in the place of what steers a terminal, line ends and tabs excepted,
-/// as much of it as there is room for, and returns the number of bytes. Neither allocates nor
-/// throws.
+/// Copies a text, as much as fits, with terminal controls other than line ends and tabs escaped,
+/// and returns the number of bytes written. Neither allocates nor throws.
 std::size_t copyVisible(std::string_view text, char* out, std::size_t room) noexcept;
 
 } // namespace SteeringText

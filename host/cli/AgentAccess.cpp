@@ -1,6 +1,5 @@
 #include "host/cli/AgentAccess.h"
 
-#include "base/ErrorText.h"
 #include "host/cli/CliError.h"
 #include "host/config/ConfigFile.h"
 
@@ -10,7 +9,6 @@
 #include <memory>
 #include <optional>
 #include <utility>
-#include <variant>
 #include <vector>
 
 #include <unistd.h>
@@ -57,15 +55,15 @@ private:
             throw CliError(CLI_FORBIDDEN, "no permission to read " + m_path +
                                               ": use sudo, or join the file's group");
         }
-        ConfigFile::Result result = ConfigFile::loadAccess(m_path);
-        if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
+        ConfigFile::Result config = ConfigFile::loadAccess(m_path);
+        if (!config) {
             std::string text;
-            for (const std::string& problem : *problems) {
+            for (const std::string& problem : config.error()) {
                 text += (text.empty() ? "" : "\n") + problem;
             }
             throw CliError(CLI_USAGE, text);
         }
-        return std::get<HostConfig>(std::move(result));
+        return std::move(*config);
     }
 
     std::string m_path;
@@ -128,12 +126,11 @@ std::string readToken(const std::string& path) {
                                                                  &std::fclose);
     if (stream == nullptr) {
         const int number = errno;
-        const ErrorText error(number);
         if (number == EACCES) {
             throw CliError(CLI_FORBIDDEN, "no permission to read the token " + path +
                                               ": use sudo, or give the token in ZRM_TOKEN");
         }
-        throw CliError(CLI_FORBIDDEN, "cannot read the token " + path + ": " + error.text() +
+        throw CliError(CLI_FORBIDDEN, because("cannot read the token " + path, number) +
                                           "; the agent creates it when it starts with HTTP");
     }
     char text[4096];

@@ -14,7 +14,7 @@
 namespace zrm::host {
 
 /// Requests to the agent's HTTP API. One thread, except stop. Failures are thrown as CliError:
-/// no answer, a token that the agent does not accept, or what a problem document says.
+/// no answer, a rejected token, or the text of a problem document.
 class AgentClient {
 public:
     using Json = nlohmann::ordered_json;
@@ -29,11 +29,11 @@ public:
     /// Sends a body (null: none) with a method; null when the answer has none.
     Json send(const std::string& method, const std::string& path, const Json& body);
 
-    /// Reads an answer without end and hands its pieces over. Returns when it breaks off, or
-    /// after stop; throws CliError when it does not begin.
+    /// Reads an endless answer and passes its pieces on. Returns when it is interrupted or after
+    /// stop; throws CliError when it does not begin.
     void stream(const std::string& path, const Query& query,
                 const std::function<void(std::string_view)>& receiver);
-    /// Ends a request under way, and every later one before it begins. Any thread.
+    /// Ends the request in progress, and every later one before it begins. Any thread.
     void stop();
 
 private:

@@ -105,16 +105,13 @@ int CheckCommand::checkLogs(Context& context) const {
 int CheckCommand::checkHost(Context& context) const {
     const std::string content = InputFile(m_host).text();
     const ConfigFile::Result result = ConfigFile::parse(content, m_host);
-    const auto* const found = std::get_if<std::vector<std::string>>(&result);
-    const std::vector<std::string> problems =
-        found == nullptr ? std::vector<std::string>() : *found;
+    const std::vector<std::string> problems = result ? std::vector<std::string>() : result.error();
     if (context.options().json) {
         context.printJson({{"accepted", problems.empty()}, {"problems", problems}});
     } else if (problems.empty()) {
         context.print(DisplayText::visible(m_host) + " can be used\n");
         noteUnfinished(content, m_host);
-        if (const std::string warning = warningOfSecrets(std::get<HostConfig>(result), m_host);
-            !warning.empty()) {
+        if (const std::string warning = warningOfSecrets(*result, m_host); !warning.empty()) {
             Context::note(warning);
         }
     } else {

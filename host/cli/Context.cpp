@@ -1,6 +1,6 @@
 #include "host/cli/Context.h"
 
-#include "base/ErrorText.h"
+#include "host/base/Result.h"
 #include "host/cli/CliError.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/JsonText.h"
@@ -39,8 +39,7 @@ AgentClient& Context::client() {
 void Context::print(std::string_view text) const {
     if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() ||
         std::fflush(stdout) != 0) {
-        const ErrorText error(errno);
-        throw CliError(CLI_REFUSED, std::string("cannot write: ") + error.text());
+        throw CliError(CLI_REFUSED, because("cannot write", errno));
     }
 }
 

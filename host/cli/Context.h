@@ -20,21 +20,22 @@ public:
     const CommonOptions& options() const noexcept { return m_options; }
     const Terminal& terminal() const noexcept { return m_terminal; }
 
-    /// The agent; its address and token are found at the first call. Throws CliError.
+    /// The agent; its address and token are determined by the first call. Throws CliError.
     AgentClient& client();
     const AgentAccess& access();
 
     /// Writes to standard output at once. Throws CliError when it cannot be written.
     void print(std::string_view text) const;
-    /// Writes JSON: over several lines to a terminal, else on one.
+    /// Writes JSON, indented on a terminal, otherwise on one line.
     void printJson(const nlohmann::ordered_json& value) const;
-    /// Tells the operator something beside the output: "zrmctl: TEXT" on standard error.
+    /// Writes a message for the operator to standard error: "zrmctl: TEXT".
     static void note(const std::string& text);
-    /// Notes how far the logs of an answer with `complete`, `reached` and `reason` were read;
-    /// nothing where they were read whole.
+    /// Writes how far the logs of an answer with `complete`, `reached` and `reason` were read;
+    /// nothing when they were read completely.
     static void noteReach(const nlohmann::ordered_json& answer);
 
-    /// A time that an operator wrote, as the agent reads it. Throws CliError, naming the option.
+    /// Converts a time typed by an operator to a form that the agent reads. Throws a CliError that
+    /// names the option.
     static std::string time(const std::string& option, const std::string& text);
 
 private:

@@ -7,11 +7,10 @@
 
 namespace zrm::host {
 
-/// Comma-separated values as RFC 4180 has them. Stateless.
+/// Comma-separated values in the form of RFC 4180. Stateless.
 class CsvText {
 public:
-    /// One record with its line end (CR LF): fields with a comma, a quote or a line end stand in
-    /// quotes.
+    /// One record with its line end (CR LF). Fields with a comma, a quote or a line end are quoted.
     static std::string record(const std::vector<std::string>& fields);
 };
 

@@ -1,6 +1,6 @@
 #include "host/cli/InputFile.h"
 
-#include "base/ErrorText.h"
+#include "host/base/Result.h"
 #include "host/cli/CliError.h"
 
 #include <cerrno>
@@ -14,9 +14,8 @@ int leaveOpen(std::FILE*) {
 }
 
 [[noreturn]] void fail(const std::string& path, int number) {
-    const ErrorText error(number);
     throw CliError(number == EACCES ? CLI_FORBIDDEN : CLI_USAGE,
-                   "cannot read " + path + ": " + error.text());
+                   because("cannot read " + path, number));
 }
 
 } // namespace

@@ -15,8 +15,8 @@ public:
     /// Throws CliError when the file cannot be opened.
     explicit InputFile(const std::string& path);
 
-    /// The next line without its newline, or none behind the last one. Of a line of more than
-    /// mostLine bytes each such part is a line. Throws CliError when the file cannot be read.
+    /// The next line without its newline, or none after the last. A line of more than mostLine
+    /// bytes is returned in parts of that size. Throws CliError when the file cannot be read.
     std::optional<std::string> line();
 
     /// The rest of the file. Throws CliError when it exceeds mostText bytes or cannot be read.

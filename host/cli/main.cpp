@@ -13,9 +13,10 @@ int main(int argc, char** argv) {
     std::setlocale(LC_CTYPE, ""); // determines whether the terminal accepts UTF-8
     // The agent's code used here also traces; show that to the operator only on demand.
     const char* const levels = std::getenv("QFW_TRC1");
-    if (const std::string problem = TraceControl::configure(levels == nullptr ? "none" : levels);
-        !problem.empty()) {
-        Context::note("QFW_TRC1: " + problem);
+    if (const Result<void> configured =
+            TraceControl::configure(levels == nullptr ? "none" : levels);
+        !configured) {
+        Context::note("QFW_TRC1: " + configured.error().text());
         return CLI_USAGE;
     }
     return Program().run(argc, argv);

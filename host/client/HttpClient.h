@@ -13,30 +13,29 @@
 
 namespace zrm::host {
 
-/// How long the parts of one request may take. None of them begins anew while a server sends a
-/// byte now and then, except `silence`.
+/// How long the parts of one request may take. A byte now and then restarts only `silence`.
 struct HttpLimits {
     using Duration = std::chrono::milliseconds;
 
-    Duration connect{0}; ///< to look the name up, and then until there is a connection
-    Duration head{0};    ///< until the whole head of the answer is there
+    Duration connect{0}; ///< for the lookup, and again for the connection
+    Duration head{0};    ///< until the answer's head is complete
     Duration whole{0};   ///< until the end of the answer; 0: no limit
-    Duration silence{0}; ///< in which nothing comes; 0: no limit
+    Duration silence{0}; ///< without any bytes; 0: no limit
 };
 
 struct HttpClientRequest {
-    /// Takes a piece of the answer's body, which is not kept; false: the rest is not wanted.
+    /// Gets a piece of the answer's body, which is not kept; false: the rest is not wanted.
     using Receiver = std::function<bool(int status, std::string_view piece)>;
 
     std::string method;
-    std::string target;                    ///< sent as it is written: "/path?query"
+    std::string target;                    ///< sent unchanged: "/path?query"
     std::vector<std::string> headers = {}; ///< "Name: value", without line ends
     const std::string* body = nullptr;
     HttpLimits limits = {};
     Receiver receive = {};
 };
 
-/// What became of a request.
+/// The outcome of a request.
 struct HttpClientAnswer {
     enum class Outcome {
         whole,         ///< the answer is there to its end
@@ -44,7 +43,7 @@ struct HttpClientAnswer {
         stopped,       ///< giving up was requested
         late,          ///< a limit of time is over
         unknownName,   ///< the host has no address, or none is known yet
-        unreachable,   ///< nobody takes the connection
+        unreachable,   ///< nothing accepts the connection
         untrusted,     ///< the server's certificate is not trusted for this host
         noTls,         ///< the server and this client do not agree on TLS
         noAuthorities, ///< the file of authorities cannot be used
@@ -69,7 +68,7 @@ public:
     struct Options {
         HttpUrl server;          ///< its target is not used
         std::string caFile;      ///< trusted instead of the system's authorities; empty: those
-        std::string authorities; ///< PEM, trusted beside the system's when there is no caFile
+        std::string authorities; ///< PEM, trusted in addition to the system's if there is no caFile
         std::string userAgent;
     };
 

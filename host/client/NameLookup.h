@@ -19,14 +19,14 @@ struct SocketAddress {
 
     int family() const noexcept { return address.ss_family; }
     const sockaddr* pointer() const noexcept { return reinterpret_cast<const sockaddr*>(&address); }
-    /// The address in digits, without the port.
+    /// The numeric address, without the port.
     std::string text() const;
 };
 
-/// Finds the addresses of a host. The system may take minutes to look a name up and cannot be told
-/// to stop: it does so on a thread of its own, for which nobody waits longer than he wants. One
-/// that still runs is waited for by the next call, so that there is never more than one. Used by
-/// one thread, whose blocked signals the other one inherits.
+/// Finds the addresses of a host. The system may take minutes to look up a name and cannot be
+/// interrupted, so a lookup runs on its own thread, which is abandoned after the caller's limit.
+/// The next call waits for one that is still running, so there is never more than one. Used by one
+/// thread, whose blocked signals the lookup's thread inherits.
 class NameLookup {
 public:
     using Clock = std::chrono::steady_clock;
@@ -36,9 +36,8 @@ public:
     NameLookup(const NameLookup&) = delete;
     NameLookup& operator=(const NameLookup&) = delete;
 
-    /// The addresses, best first; none when there are none, which error() explains, when the time
-    /// is over, or when giving up is requested. Throws std::system_error when there can be no
-    /// thread.
+    /// The addresses, best first; empty when there are none, as error() explains, when the time is
+    /// up, or when giving up is requested. Throws std::system_error when no thread can be started.
     std::vector<SocketAddress> find(Clock::time_point limit, const std::stop_token& giveUp);
 
     /// Why nothing was found.

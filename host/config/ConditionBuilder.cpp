@@ -31,12 +31,12 @@ std::string upperCase(std::string_view text) {
     return upper;
 }
 
-ConditionProblem badValue(std::string what, std::string cure) {
-    return {ConditionProblem::VALUE, std::move(what), std::move(cure)};
+tl::unexpected<Problem> badValue(std::string what, std::string cure) {
+    return refused(std::move(what), std::move(cure), "value");
 }
 
 /// Checks a value of a character column that is compared as a whole.
-std::optional<ConditionProblem> checkWhole(const Column& column, std::string& value) {
+Result<void> checkWhole(const Column& column, std::string& value) {
     if (column.isTime && !value.empty()) {
         std::optional<std::string> stamp = TimeText::toStamp(value);
         if (!stamp) {
@@ -52,21 +52,21 @@ std::optional<ConditionProblem> checkWhole(const Column& column, std::string& va
                             std::string(column.name) + " holds " + std::to_string(width),
                         "shorten the value, or use starts");
     }
-    return std::nullopt;
+    return {};
 }
 
-std::optional<ConditionProblem> checkNumber(std::int64_t number) {
+Result<void> checkNumber(std::int64_t number) {
     if (number < std::numeric_limits<std::int32_t>::min() ||
         number > std::numeric_limits<std::int32_t>::max()) {
         return badValue("the number does not fit the column",
                         "write a number from -2147483648 to 2147483647");
     }
-    return std::nullopt;
+    return {};
 }
 
-/// What is wrong with a regular expression. Compilation stops not far above the largest size: its
+/// Checks a regular expression. Compilation stops not far above the largest size: its
 /// memory limit allows a few times as much.
-std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudget& budget) {
+Result<void> checkRegex(const std::string& value, PatternBudget& budget) {
     constexpr std::int64_t memory = 512 * 1024;
     constexpr const char* cure =
         "repeat less, and write [A-Za-z] or \\w instead of a class of Unicode such as \\pL";
@@ -92,25 +92,24 @@ std::optional<ConditionProblem> checkRegex(const std::string& value, PatternBudg
     if (budget.isExceeded()) {
         return badValue("together with this one the regular expressions are too large", cure);
     }
-    return std::nullopt;
+    return {};
 }
 
 /// Checks a value of contains, starts or matches.
-std::optional<ConditionProblem> checkPattern(_IntfOper op, const std::string& value,
-                                             PatternBudget& budget) {
+Result<void> checkPattern(_IntfOper op, const std::string& value, PatternBudget& budget) {
     if (value.empty() || value.size() > longestPattern) {
         return badValue("the value has " + std::to_string(value.size()) + " bytes",
                         "write 1 to " + std::to_string(longestPattern) + " bytes");
     }
-    return op == INTF_MATCHES ? checkRegex(value, budget) : std::nullopt;
+    return op == INTF_MATCHES ? checkRegex(value, budget) : Result<void>();
 }
 
-ConditionProblem notANumber(const Column& column) {
+tl::unexpected<Problem> notANumber(const Column& column) {
     return badValue(std::string(column.name) + " holds numbers",
                     "write the value as a whole number without quotes");
 }
 
-ConditionProblem notAText(const Column& column) {
+tl::unexpected<Problem> notAText(const Column& column) {
     return badValue(std::string(column.name) + " holds text", "write the value in quotes");
 }
 
@@ -160,42 +159,41 @@ std::vector<std::string_view> ConditionBuilder::operatorNames() {
 
 ConditionBuilder::ConditionBuilder(std::string_view table) : m_columns(columnsOf(table)) {}
 
-std::variant<const Column*, ConditionProblem>
-ConditionBuilder::column(std::string_view name) const {
+Result<const Column*> ConditionBuilder::column(std::string_view name) const {
     if (const Column* const column = findColumn(m_columns, name)) {
         return column;
     }
-    ConditionProblem problem{ConditionProblem::COLUMN, quoted(name) + " is not a column", ""};
+    const auto unknown = [&](std::string cure) {
+        return refused(quoted(name) + " is not a column", std::move(cure), "column");
+    };
     if (findColumn(m_columns, upperCase(name)) != nullptr) {
-        problem.cure = "write it in upper case: " + upperCase(name);
-        return problem;
+        return unknown("write it in upper case: " + upperCase(name));
     }
-    problem.cure = "the columns are ";
+    std::string names;
     for (const Column& column : m_columns) {
-        problem.cure += std::string(column.name) + (&column == &m_columns.back() ? "" : ", ");
+        names += std::string(column.name) + (&column == &m_columns.back() ? "" : ", ");
     }
-    return problem;
+    return unknown("the columns are " + names);
 }
 
-ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, std::string_view op,
-                                                 const ConditionValue& value,
-                                                 PatternBudget& budget) const {
-    const auto found = column(columnName);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&found)) {
-        return *problem;
+Result<Condition> ConditionBuilder::build(std::string_view columnName, std::string_view op,
+                                          const ConditionValue& value,
+                                          PatternBudget& budget) const {
+    const Result<const Column*> found = column(columnName);
+    if (!found) {
+        return tl::unexpected(found.error());
     }
-    const Column& column = *std::get<const Column*>(found);
+    const Column& column = **found;
     const Operator* const known = findOperator(op);
     if (known == nullptr) {
-        return ConditionProblem{
-            ConditionProblem::OPERATOR, quoted(op) + " is not an operator",
-            "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in"};
+        return refused(quoted(op) + " is not an operator",
+                       "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in",
+                       "op");
     }
     if (column.isNumber && !known->forNumbers) {
-        return ConditionProblem{ConditionProblem::OPERATOR,
-                                std::string(column.name) + " holds numbers and '" +
-                                    std::string(op) + "' compares text",
-                                "use =, !=, >=, <=, <, > or in"};
+        return refused(std::string(column.name) + " holds numbers and '" + std::string(op) +
+                           "' compares text",
+                       "use =, !=, >=, <=, <, > or in", "op");
     }
     if (value.isList != (known->code == INTF_IN)) {
         return value.isList ? badValue(quoted(op) + " takes one value", "use in for a list")
@@ -204,37 +202,35 @@ ConditionBuilder::Result ConditionBuilder::build(std::string_view columnName, st
     return known->code == INTF_IN ? several(column, value) : single(column, *known, value, budget);
 }
 
-ConditionBuilder::Result ConditionBuilder::single(const Column& column, const Operator& op,
-                                                  const ConditionValue& value,
-                                                  PatternBudget& budget) {
+Result<Condition> ConditionBuilder::single(const Column& column, const Operator& op,
+                                           const ConditionValue& value, PatternBudget& budget) {
     Condition condition;
     condition.column = column.name;
     condition.op = op.code;
     condition.isNumber = column.isNumber;
     const ConditionValue::Item& item = value.items.front();
-    std::optional<ConditionProblem> problem;
+    Result<void> checked;
     if (column.isNumber) {
         if (!std::holds_alternative<std::int64_t>(item)) {
             return notANumber(column);
         }
         condition.number = std::get<std::int64_t>(item);
-        problem = checkNumber(condition.number);
+        checked = checkNumber(condition.number);
     } else {
         if (!std::holds_alternative<std::string>(item)) {
             return notAText(column);
         }
         condition.text = std::get<std::string>(item);
-        problem = op.forNumbers ? checkWhole(column, condition.text)
+        checked = op.forNumbers ? checkWhole(column, condition.text)
                                 : checkPattern(op.code, condition.text, budget);
     }
-    if (problem) {
-        return std::move(*problem);
+    if (!checked) {
+        return tl::unexpected(checked.error());
     }
     return condition;
 }
 
-ConditionBuilder::Result ConditionBuilder::several(const Column& column,
-                                                   const ConditionValue& value) {
+Result<Condition> ConditionBuilder::several(const Column& column, const ConditionValue& value) {
     if (value.items.empty() || value.items.size() > mostValues) {
         return badValue("the list has " + std::to_string(value.items.size()) + " values",
                         "write 1 to " + std::to_string(mostValues) + " values");
@@ -247,13 +243,12 @@ ConditionBuilder::Result ConditionBuilder::several(const Column& column,
     PatternBudget noPatterns;
     std::size_t bytes = 0;
     for (const ConditionValue::Item& item : value.items) {
-        Result one = single(column, equal, {{item}, false}, noPatterns);
-        if (std::holds_alternative<ConditionProblem>(one)) {
+        Result<Condition> one = single(column, equal, {{item}, false}, noPatterns);
+        if (!one) {
             return one;
         }
-        Condition& checked = std::get<Condition>(one);
-        condition.values.push_back(column.isNumber ? std::to_string(checked.number)
-                                                   : std::move(checked.text));
+        condition.values.push_back(column.isNumber ? std::to_string(one->number)
+                                                   : std::move(one->text));
         bytes += condition.values.back().size() + 1;
         if (condition.values.back().find('\n') != std::string::npos) {
             return badValue("a value of the list has a line end",
@@ -267,8 +262,7 @@ ConditionBuilder::Result ConditionBuilder::several(const Column& column,
     return condition;
 }
 
-std::variant<std::vector<Condition>, ConditionProblem>
-ConditionBuilder::ofLog(std::string_view path) {
+Result<std::vector<Condition>> ConditionBuilder::ofLog(std::string_view path) {
     const std::size_t slash = path.rfind('/');
     if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
         return badValue(quoted(path) + " is not the absolute path of a file",

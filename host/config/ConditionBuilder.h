@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_CONDITION_BUILDER_H
 #define ZRM_HOST_CONDITION_BUILDER_H
 
+#include "host/base/Result.h"
 #include "host/config/Columns.h"
 #include "host/framework/Condition.h"
 
@@ -44,15 +45,6 @@ private:
     std::size_t m_used = 0;
 };
 
-/// What is wrong with a condition, and where.
-struct ConditionProblem {
-    enum class Part { COLUMN, OPERATOR, VALUE };
-    using enum Part;
-    Part part;
-    std::string what;
-    std::string cure;
-};
-
 /// A value as written by the operator: one text or number, or a list of them.
 struct ConditionValue {
     using Item = std::variant<std::string, std::int64_t>;
@@ -64,19 +56,17 @@ struct ConditionValue {
 /// values a column accepts. Immutable.
 class ConditionBuilder {
 public:
-    using Result = std::variant<Condition, ConditionProblem>;
-
     explicit ConditionBuilder(std::string_view table);
 
-    /// The condition COLUMN OP VALUE, or what is wrong with it. Values of time columns may be ISO
-    /// 8601 times; the condition stores them as 16-character time stamps. Conditions of one
-    /// situation share a budget for their regular expressions.
-    Result build(std::string_view column, std::string_view op, const ConditionValue& value,
-                 PatternBudget& budget) const;
+    /// The condition COLUMN OP VALUE. Values of time columns may be ISO 8601 times; the condition
+    /// stores them as 16-character time stamps. Conditions of one situation share a budget for
+    /// their regular expressions. The field of a problem is "column", "op" or "value".
+    Result<Condition> build(std::string_view column, std::string_view op,
+                            const ConditionValue& value, PatternBudget& budget) const;
 
-    /// The conditions that only entries of this log meet, or what is wrong with the path:
-    /// conditions on its directory and its name, in the columns that can hold them.
-    static std::variant<std::vector<Condition>, ConditionProblem> ofLog(std::string_view path);
+    /// The conditions that only entries of the log with this path meet: conditions on its directory
+    /// and its name, in the columns that can hold them.
+    static Result<std::vector<Condition>> ofLog(std::string_view path);
 
     /// The operator as written in conditions; empty for an unknown code.
     static std::string_view nameOf(_IntfOper op) noexcept;
@@ -88,10 +78,10 @@ private:
     struct Operator;
     static const std::array<Operator, 10>& operators() noexcept;
     static const Operator* findOperator(std::string_view op) noexcept;
-    std::variant<const Column*, ConditionProblem> column(std::string_view name) const;
-    static Result single(const Column& column, const Operator& op, const ConditionValue& value,
-                         PatternBudget& budget);
-    static Result several(const Column& column, const ConditionValue& value);
+    Result<const Column*> column(std::string_view name) const;
+    static Result<Condition> single(const Column& column, const Operator& op,
+                                    const ConditionValue& value, PatternBudget& budget);
+    static Result<Condition> several(const Column& column, const ConditionValue& value);
 
     std::span<const Column> m_columns;
 };

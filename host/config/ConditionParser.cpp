@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <charconv>
-#include <optional>
 #include <string>
 #include <utility>
 
@@ -49,11 +48,11 @@ bool isSign(char c) {
     return c == '=' || c == '!' || c == '<' || c == '>' || c == '~';
 }
 
-ConditionProblem badValue(std::string what, std::string cure) {
-    return {ConditionProblem::VALUE, std::move(what), std::move(cure)};
+tl::unexpected<Problem> badValue(std::string what, std::string cure) {
+    return refused(std::move(what), std::move(cure), "value");
 }
 
-std::variant<ConditionValue::Item, ConditionProblem> quotedText(Scanner& scanner) {
+Result<ConditionValue::Item> quotedText(Scanner& scanner) {
     std::string text;
     while (!scanner.atEnd()) {
         text += scanner.takeWhile([](char c) { return c != '\''; });
@@ -61,14 +60,14 @@ std::variant<ConditionValue::Item, ConditionProblem> quotedText(Scanner& scanner
             break;
         }
         if (!scanner.take('\'')) {
-            return ConditionValue::Item(std::move(text));
+            return text;
         }
         text += '\'';
     }
     return badValue("the text has no closing quote", "end it with '");
 }
 
-std::variant<ConditionValue::Item, ConditionProblem> item(Scanner& scanner) {
+Result<ConditionValue::Item> item(Scanner& scanner) {
     scanner.skipBlanks();
     if (scanner.take('\'')) {
         return quotedText(scanner);
@@ -84,38 +83,56 @@ std::variant<ConditionValue::Item, ConditionProblem> item(Scanner& scanner) {
         return badValue("'" + std::string(word) + "' is not a value",
                         "write text in single quotes and numbers without");
     }
-    return ConditionValue::Item(number);
+    return number;
 }
 
-std::optional<ConditionProblem> list(Scanner& scanner, ConditionValue& value) {
+/// Reads the rest of a list, behind its bracket.
+Result<ConditionValue> list(Scanner& scanner) {
+    ConditionValue value;
     value.isList = true;
     scanner.skipBlanks();
     if (scanner.take(']')) {
-        return std::nullopt;
+        return value;
     }
     do {
-        auto one = item(scanner);
-        if (auto* const problem = std::get_if<ConditionProblem>(&one)) {
-            return std::move(*problem);
+        Result<ConditionValue::Item> one = item(scanner);
+        if (!one) {
+            return tl::unexpected(one.error());
         }
-        value.items.push_back(std::move(std::get<ConditionValue::Item>(one)));
+        value.items.push_back(std::move(*one));
         scanner.skipBlanks();
     } while (scanner.take(','));
     if (!scanner.take(']')) {
         return badValue("the list has no end", "end it with ]");
     }
-    return std::nullopt;
+    return value;
+}
+
+Result<ConditionValue> single(Scanner& scanner) {
+    return item(scanner).map([](ConditionValue::Item&& one) {
+        return ConditionValue{{std::move(one)}, false};
+    });
+}
+
+/// Reads a value, behind which nothing may follow.
+Result<ConditionValue> lastValue(Scanner& scanner) {
+    Result<ConditionValue> value = scanner.take('[') ? list(scanner) : single(scanner);
+    scanner.skipBlanks();
+    if (value && !scanner.atEnd()) {
+        return badValue("'" + std::string(scanner.rest()) + "' follows the value",
+                        "write one condition per text");
+    }
+    return value;
 }
 
 } // namespace
 
-ConditionBuilder::Result ConditionParser::parse(std::string_view text,
-                                                PatternBudget& budget) const {
+Result<Condition> ConditionParser::parse(std::string_view text, PatternBudget& budget) const {
     Scanner scanner(text);
     scanner.skipBlanks();
     const std::string_view column = scanner.takeWhile(isWordCharacter);
     if (column.empty()) {
-        return ConditionProblem{ConditionProblem::COLUMN, "the column is missing", form};
+        return refused("the column is missing", form, "column");
     }
     scanner.skipBlanks();
     std::string_view op = scanner.takeWhile(isSign);
@@ -123,37 +140,19 @@ ConditionBuilder::Result ConditionParser::parse(std::string_view text,
         op = scanner.takeWhile(isWordCharacter);
     }
     if (op.empty()) {
-        return ConditionProblem{ConditionProblem::OPERATOR, "the operator is missing", form};
+        return refused("the operator is missing", form, "op");
     }
     scanner.skipBlanks();
-    ConditionValue value;
-    std::optional<ConditionProblem> problem;
-    if (scanner.take('[')) {
-        problem = list(scanner, value);
-    } else {
-        auto one = item(scanner);
-        if (auto* const bad = std::get_if<ConditionProblem>(&one)) {
-            problem = std::move(*bad);
-        } else {
-            value.items.push_back(std::move(std::get<ConditionValue::Item>(one)));
-        }
-    }
-    scanner.skipBlanks();
-    if (!problem && !scanner.atEnd()) {
-        problem = badValue("'" + std::string(scanner.rest()) + "' follows the value",
-                           "write one condition per text");
-    }
-    if (!problem) {
-        return m_builder.build(column, op, value, budget);
+    const Result<ConditionValue> value = lastValue(scanner);
+    if (value) {
+        return m_builder.build(column, op, *value, budget);
     }
     // A wrong column or operator is a better message than a value that is unreadable because of it.
-    ConditionBuilder::Result probe =
-        m_builder.build(column, op, {{std::string("x")}, false}, budget);
-    if (const auto* const earlier = std::get_if<ConditionProblem>(&probe);
-        earlier != nullptr && earlier->part != ConditionProblem::VALUE) {
-        return *earlier;
+    Result<Condition> probe = m_builder.build(column, op, {{std::string("x")}, false}, budget);
+    if (!probe && probe.error().field != "value") {
+        return probe;
     }
-    return std::move(*problem);
+    return tl::unexpected(value.error());
 }
 
 } // namespace zrm::host

@@ -14,11 +14,11 @@ class ConditionParser {
 public:
     explicit ConditionParser(std::string_view table) : m_builder(table) {}
 
-    /// The condition, or the first thing that is wrong with it. Conditions that belong together
+    /// The condition; refused for the first thing that is wrong. Conditions that belong together
     /// share a budget.
-    ConditionBuilder::Result parse(std::string_view text, PatternBudget& budget) const;
+    Result<Condition> parse(std::string_view text, PatternBudget& budget) const;
     /// The same for a condition that stands alone.
-    ConditionBuilder::Result parse(std::string_view text) const {
+    Result<Condition> parse(std::string_view text) const {
         PatternBudget budget;
         return parse(text, budget);
     }

@@ -1,6 +1,6 @@
 #include "host/config/ConfigFile.h"
 
-#include "base/ErrorText.h"
+#include "host/base/WholeFile.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
 #include "host/config/LogReader.h"
@@ -59,8 +59,8 @@ void readAgent(const toml::table& table, ConfigProblems& problems, HostConfig& c
         config.environment.push_back({"ZRM_MAX_ROWS", std::to_string(*rows)});
     }
     if (const std::optional<std::string> trace = section.text("trace")) {
-        if (const std::string problem = TraceLevels().parse(*trace); !problem.empty()) {
-            section.problem("trace", problem,
+        if (const Result<void> levels = TraceLevels().parse(*trace); !levels) {
+            section.problem("trace", levels.error().what,
                             "write classes of error, flow, detail, fine, all and none, for example "
                             "\"error,LogManager=error+detail\"");
         }
@@ -180,55 +180,48 @@ void readAccess(const toml::table& file, ConfigProblems& problems, HostConfig& c
     }
 }
 
-/// Why the contents of a file cannot be read.
-std::string unreadable(int number) {
-    const ErrorText error(number);
-    return std::string("cannot be read: ") + error.text();
+Problem unreadable(int number) {
+    return {because("cannot be read", number)};
 }
 
-/// Reads an open file into the text. It must be a regular file: a pipe could block the reader
-/// forever. Returns an error message, empty on success.
-std::string readContent(int fd, std::string& text) {
+/// The contents of an open file. It must be a regular file: a pipe could block the reader forever.
+Result<std::string> contentOf(int fd) {
     struct stat status {};
-    std::string problem;
     if (fstat(fd, &status) != 0) {
-        problem = unreadable(errno);
-    } else if (!S_ISREG(status.st_mode)) {
-        problem = S_ISDIR(status.st_mode) ? unreadable(EISDIR) : "is not a regular file";
+        return tl::unexpected(unreadable(errno));
     }
-    char buffer[65536];
-    ssize_t count = 0;
-    while (problem.empty() && (count = read(fd, buffer, sizeof buffer)) > 0) {
-        text.append(buffer, static_cast<std::size_t>(count));
-        if (text.size() > largestFile) {
-            problem = unreadable(EFBIG);
-        }
+    if (S_ISDIR(status.st_mode)) {
+        return tl::unexpected(unreadable(EISDIR));
     }
-    return count == -1 ? unreadable(errno) : problem;
+    if (!S_ISREG(status.st_mode)) {
+        return refused("is not a regular file");
+    }
+    return WholeFile::read(fd, largestFile).map_error(unreadable);
 }
 
-/// The contents of a file; meaningless when a problem was recorded.
-std::string readContent(const std::string& path, ConfigProblems& problems) {
-    std::string text;
+/// The contents of a file, or its problem as the only text.
+Result<std::string, std::vector<std::string>> contentOf(const std::string& path) {
     const int fd = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    const std::string problem = fd == -1 ? unreadable(errno) : readContent(fd, text);
+    Result<std::string> content = fd == -1 ? tl::unexpected(unreadable(errno)) : contentOf(fd);
     if (fd != -1) {
         close(fd);
     }
-    if (!problem.empty()) {
-        problems.add(0, "", problem, "make it a file that the agent may read, of at most 4 MiB");
-    }
-    return text;
+    return std::move(content).map_error([&](Problem&& problem) {
+        problem.cure = "make it a file that the agent may read, of at most 4 MiB";
+        ConfigProblems problems(path);
+        problems.add(0, problem);
+        return problems.texts();
+    });
 }
 
 /// Records why a text read while the file is in use cannot be the complete file.
 void checkWhole(std::string_view text, ConfigProblems& problems) {
     if (text.find_first_not_of(" \t\r\n") == std::string_view::npos) {
-        problems.add(0, "", "is empty", "write the configuration into it again");
+        problems.add(0, {"is empty", "write the configuration into it again"});
     } else if (text.back() != '\n') {
         const auto lines = std::count(text.begin(), text.end(), '\n');
-        problems.add(static_cast<unsigned>(lines) + 1, "", "the file ends within this line",
-                     "write the rest of it, or end the line");
+        problems.add(static_cast<unsigned>(lines) + 1,
+                     {"the file ends within this line", "write the rest of it, or end the line"});
     }
 }
 
@@ -238,9 +231,9 @@ ConfigFile::Result parsed(std::string_view text, const std::string& path, Readin
     ConfigProblems problems(path);
     if (const std::optional<unsigned> line = TomlNesting::tooDeepAt(text)) {
         const std::string most = std::to_string(TomlNesting::deepest);
-        problems.add(*line, "", "names or brackets are nested deeper than " + most,
-                     "write at most " + most + " levels");
-        return problems.texts();
+        problems.add(*line, {"names or brackets are nested deeper than " + most,
+                             "write at most " + most + " levels"});
+        return tl::unexpected(problems.texts());
     }
     try {
         const toml::table file = toml::parse(text);
@@ -250,10 +243,10 @@ ConfigFile::Result parsed(std::string_view text, const std::string& path, Readin
             return config;
         }
     } catch (const toml::parse_error& error) {
-        problems.add(static_cast<unsigned>(error.source().begin.line), "",
-                     std::string(error.description()), "correct the TOML here");
+        problems.add(static_cast<unsigned>(error.source().begin.line),
+                     {std::string(error.description()), "correct the TOML here"});
     }
-    return problems.texts();
+    return tl::unexpected(problems.texts());
 }
 
 } // namespace
@@ -263,29 +256,21 @@ ConfigFile::Result ConfigFile::parse(std::string_view text, const std::string& p
 }
 
 ConfigFile::Result ConfigFile::load(const std::string& path) {
-    ConfigProblems problems(path);
-    const std::string text = readContent(path, problems);
-    return problems.none() ? parse(text, path) : problems.texts();
+    return contentOf(path).and_then([&](const std::string& text) { return parse(text, path); });
 }
 
 ConfigFile::Result ConfigFile::loadAccess(const std::string& path) {
-    ConfigProblems problems(path);
-    const std::string text = readContent(path, problems);
-    return problems.none() ? parsed(text, path, readAccess) : problems.texts();
+    return contentOf(path).and_then(
+        [&](const std::string& text) { return parsed(text, path, readAccess); });
 }
 
 ConfigFile::Result ConfigFile::reload(const std::string& path) {
-    ConfigProblems problems(path);
-    const std::string text = readContent(path, problems);
-    if (!problems.none()) {
-        return problems.texts();
-    }
-    Result result = parse(text, path);
-    checkWhole(text, problems);
-    if (std::holds_alternative<HostConfig>(result) && !problems.none()) {
-        return problems.texts();
-    }
-    return result;
+    return contentOf(path).and_then([&](const std::string& text) -> Result {
+        ConfigProblems problems(path);
+        checkWhole(text, problems);
+        Result result = parse(text, path);
+        return result && !problems.none() ? tl::unexpected(problems.texts()) : result;
+    });
 }
 
 namespace {

@@ -1,11 +1,11 @@
 #ifndef ZRM_HOST_CONFIG_FILE_H
 #define ZRM_HOST_CONFIG_FILE_H
 
+#include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 
 #include <string>
 #include <string_view>
-#include <variant>
 #include <vector>
 
 namespace zrm::host {
@@ -14,7 +14,7 @@ namespace zrm::host {
 class ConfigFile {
 public:
     /// A configuration, or all problems of its file.
-    using Result = std::variant<HostConfig, std::vector<std::string>>;
+    using Result = zrm::host::Result<HostConfig, std::vector<std::string>>;
 
     /// Reads a file.
     static Result load(const std::string& path);

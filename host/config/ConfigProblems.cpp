@@ -7,8 +7,7 @@ namespace zrm::host {
 
 ConfigProblems::ConfigProblems(std::string file) : m_file(std::move(file)) {}
 
-void ConfigProblems::add(unsigned line, const std::string& key, const std::string& what,
-                         const std::string& cure) {
+void ConfigProblems::add(unsigned line, const Problem& problem) {
     if (m_problems.size() == mostTexts) {
         ++m_more;
         return;
@@ -18,20 +17,20 @@ void ConfigProblems::add(unsigned line, const std::string& key, const std::strin
         text += std::to_string(line) + ':';
     }
     text += ' ';
-    if (!key.empty()) {
-        text += key + ": ";
+    if (!problem.field.empty()) {
+        text += problem.field + ": ";
     }
-    m_problems.push_back({line, text + what + "; " + cure});
+    m_problems.push_back({line, text + problem.text()});
 }
 
 std::vector<std::string> ConfigProblems::texts() const {
-    std::vector<Problem> sorted = m_problems;
+    std::vector<Entry> sorted = m_problems;
     std::stable_sort(sorted.begin(), sorted.end(),
-                     [](const Problem& a, const Problem& b) { return a.line < b.line; });
+                     [](const Entry& a, const Entry& b) { return a.line < b.line; });
     std::vector<std::string> texts;
     texts.reserve(sorted.size());
-    for (const Problem& problem : sorted) {
-        texts.push_back(problem.text);
+    for (const Entry& entry : sorted) {
+        texts.push_back(entry.text);
     }
     if (m_more > 0) {
         texts.push_back(m_file + ": " + std::to_string(m_more) +

@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_CONFIG_PROBLEMS_H
 #define ZRM_HOST_CONFIG_PROBLEMS_H
 
+#include "host/base/Result.h"
+
 #include <string>
 #include <vector>
 
@@ -12,10 +14,8 @@ class ConfigProblems {
 public:
     explicit ConfigProblems(std::string file);
 
-    /// Adds a problem of a key. `what` says what is wrong and `cure` what to do about it; both
-    /// begin in lower case and have no full stop. Line 0: the file as a whole.
-    void add(unsigned line, const std::string& key, const std::string& what,
-             const std::string& cure);
+    /// Adds a problem, whose field is a key. Line 0: the file as a whole.
+    void add(unsigned line, const Problem& problem);
 
     bool none() const noexcept { return m_problems.empty(); }
     /// "FILE:LINE: KEY: WHAT; CURE" for each of the first problems that were added, in the order of
@@ -23,7 +23,7 @@ public:
     std::vector<std::string> texts() const;
 
 private:
-    struct Problem {
+    struct Entry {
         unsigned line;
         std::string text;
     };
@@ -31,7 +31,7 @@ private:
     static constexpr std::size_t mostTexts = 100;
 
     const std::string m_file;
-    std::vector<Problem> m_problems;
+    std::vector<Entry> m_problems;
     std::size_t m_more = 0; ///< that are only counted
 };
 

@@ -49,7 +49,7 @@ unsigned ConfigSection::line(std::string_view key) const {
 
 void ConfigSection::problem(unsigned line, std::string_view key, const std::string& what,
                             const std::string& cure) {
-    m_problems.add(line, (m_name.empty() ? "" : m_name + '.') + std::string(key), what, cure);
+    m_problems.add(line, {what, cure, (m_name.empty() ? "" : m_name + '.') + std::string(key)});
 }
 
 void ConfigSection::problem(std::string_view key, const std::string& what,

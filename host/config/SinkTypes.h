@@ -25,7 +25,7 @@ bool isSecretHeader(std::string_view name);
 struct SinkOption {
     /// What its value is, and so how it is read and checked.
     enum class Kind {
-        TEXT,       ///< of at most so many bytes as the bound says
+        TEXT,       ///< of at most `bound` bytes
         NUMBER,     ///< within the bounds
         DURATION,   ///< "10s"; within the bounds, which are seconds
         CHOICE,     ///< one of the choices
@@ -49,7 +49,7 @@ struct SinkOption {
     std::int64_t least = 0;
     std::int64_t most = 0;
     std::span<const std::string_view> choices = {};
-    std::string_view instead = {}; ///< the option that must not stand beside it
+    std::string_view instead = {}; ///< the option that excludes this one
 };
 
 /// One type of sinks.

@@ -59,7 +59,7 @@ SituationConfig SituationReader::read(const toml::table& table) {
          SituationValidator::check(text, situation, m_patterns.ofNext())) {
         isNamed = isNamed && problem.field != "name";
         if (problem.condition) {
-            section.problem(conditions[*problem.condition].second, problem.field, problem.what,
+            section.problem(conditions[*problem.condition].second, "when", problem.what,
                             problem.cure);
         } else if (!fields.isNoted(problem.field)) {
             section.problem(problem.field, problem.what, problem.cure);

@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <array>
 #include <utility>
-#include <variant>
 
 namespace zrm::host {
 
@@ -18,6 +17,10 @@ constexpr std::array<std::string_view, 5> severities = {"info", "minor", "warnin
                                                         "critical"};
 constexpr const char* defaultSeverity = "warning";
 
+SituationProblem inCondition(std::size_t index, std::string what, std::string cure) {
+    return {{std::move(what), std::move(cure), "when[" + std::to_string(index) + ']'}, index};
+}
+
 bool isControl(char c) {
     return static_cast<unsigned char>(c) < 0x20 || c == 0x7f;
 }
@@ -28,45 +31,40 @@ std::string inBytes(std::size_t bytes) {
 
 void checkName(const std::optional<std::string>& name, Problems& problems) {
     if (!name) {
-        problems.push_back({"name", {}, "is missing", "give the situation a name"});
+        problems.push_back({{"is missing", "give the situation a name", "name"}});
         return;
     }
     // Clients treat "." and ".." as directories, so no request could name such a situation.
     if (name->empty() || name->size() > SituationValidator::longestName || *name == "." ||
         *name == ".." || std::any_of(name->begin(), name->end(), isControl)) {
-        problems.push_back({"name",
-                            {},
-                            "is not a usable name",
-                            "write 1 to " + inBytes(SituationValidator::longestName) +
-                                " without control characters, and not . or .."});
+        problems.push_back({{"is not a usable name",
+                             "write 1 to " + inBytes(SituationValidator::longestName) +
+                                 " without control characters, and not . or ..",
+                             "name"}});
     }
 }
 
 void checkText(const std::string& text, Problems& problems) {
     if (text.size() > SituationValidator::longestText) {
-        problems.push_back({"text",
-                            {},
-                            "has " + inBytes(text.size()),
-                            "write at most " + inBytes(SituationValidator::longestText)});
+        problems.push_back({{"has " + inBytes(text.size()),
+                             "write at most " + inBytes(SituationValidator::longestText), "text"}});
     }
 }
 
 void checkSeverity(const std::string& severity, Problems& problems) {
     if (std::find(severities.begin(), severities.end(), severity) == severities.end()) {
-        problems.push_back({"severity",
-                            {},
-                            "'" + severity + "' is not a severity",
-                            "write info, minor, warning, major or critical"});
+        problems.push_back({{"'" + severity + "' is not a severity",
+                             "write info, minor, warning, major or critical", "severity"}});
     }
 }
 
 void addLog(const std::string& log, SituationConfig& situation, Problems& problems) {
-    auto conditions = ConditionBuilder::ofLog(log);
-    if (auto* const problem = std::get_if<ConditionProblem>(&conditions)) {
-        problems.push_back({"log", {}, std::move(problem->what), std::move(problem->cure)});
+    Result<std::vector<Condition>> conditions = ConditionBuilder::ofLog(log);
+    if (!conditions) {
+        problems.push_back({{conditions.error().what, conditions.error().cure, "log"}});
         return;
     }
-    situation.conditions = std::move(std::get<std::vector<Condition>>(conditions));
+    situation.conditions = std::move(*conditions);
 }
 
 /// The thresholds stated as conditions. Conditions that put no threshold in force are refused: the
@@ -79,14 +77,14 @@ public:
     void add(std::size_t index, const Condition& condition) {
         Threshold& threshold = condition.column == "FREQTHRESH" ? m_frequency : m_period;
         if (threshold.index) {
-            m_problems.push_back({"when", index,
-                                  "a second condition on " + condition.column + " has no effect",
-                                  "leave it out"});
+            m_problems.push_back(
+                inCondition(index, "a second condition on " + condition.column + " has no effect",
+                            "leave it out"));
             return;
         }
         threshold.index = index;
         if (!threshold.isInForce(condition)) {
-            m_problems.push_back({"when", index, threshold.what, threshold.cure});
+            m_problems.push_back(inCondition(index, threshold.what, threshold.cure));
         }
     }
 
@@ -109,9 +107,9 @@ private:
 
     void requireOther(const Threshold& one, const Threshold& other, const char* cure) {
         if (one.index && !other.index) {
-            m_problems.push_back(
-                {"when", one.index,
-                 std::string(one.column) + " has no effect without " + other.column, cure});
+            m_problems.push_back(inCondition(
+                *one.index, std::string(one.column) + " has no effect without " + other.column,
+                cure));
         }
     }
 
@@ -131,10 +129,9 @@ void addConditions(const SituationText& text, SituationConfig& situation, Patter
     const std::vector<std::string>& texts = text.when;
     const bool hasThresholdKeys = text.frequency || text.period;
     if (texts.size() > SituationValidator::mostConditions) {
-        problems.push_back({"when",
-                            {},
-                            "has " + std::to_string(texts.size()) + " conditions",
-                            "write at most " + std::to_string(SituationValidator::mostConditions)});
+        problems.push_back(
+            {{"has " + std::to_string(texts.size()) + " conditions",
+              "write at most " + std::to_string(SituationValidator::mostConditions), "when"}});
         return;
     }
     std::size_t bytes = 0;
@@ -142,43 +139,40 @@ void addConditions(const SituationText& text, SituationConfig& situation, Patter
         bytes += text.size();
     }
     if (bytes > SituationValidator::longestConditions) {
-        problems.push_back({"when",
-                            {},
-                            "has conditions of " + inBytes(bytes) + " together",
-                            "write at most " + inBytes(SituationValidator::longestConditions)});
+        problems.push_back(
+            {{"has conditions of " + inBytes(bytes) + " together",
+              "write at most " + inBytes(SituationValidator::longestConditions), "when"}});
         return;
     }
     const ConditionParser parser("RMLOGENT");
     WrittenThresholds thresholds(problems);
     for (std::size_t index = 0; index < texts.size(); ++index) {
-        ConditionBuilder::Result result = parser.parse(texts[index], budget);
-        if (auto* const problem = std::get_if<ConditionProblem>(&result)) {
-            problems.push_back({"when", index, "in \"" + texts[index] + "\": " + problem->what,
-                                std::move(problem->cure)});
+        Result<Condition> condition = parser.parse(texts[index], budget);
+        if (!condition) {
+            const Problem& problem = condition.error();
+            problems.push_back(
+                inCondition(index, "in \"" + texts[index] + "\": " + problem.what, problem.cure));
             continue;
         }
-        Condition& condition = std::get<Condition>(result);
-        if (isThresholdColumn(condition.column)) {
-            thresholds.add(index, condition);
+        if (isThresholdColumn(condition->column)) {
+            thresholds.add(index, *condition);
         }
-        situation.conditions.push_back(std::move(condition));
+        situation.conditions.push_back(std::move(*condition));
     }
     if (!hasThresholdKeys) {
         thresholds.finish();
     } else if (thresholds.any()) {
-        problems.push_back({"frequency",
-                            {},
-                            "the conditions name FREQTHRESH or PERIODTHRS as well",
-                            "leave those conditions out"});
+        problems.push_back({{"the conditions name FREQTHRESH or PERIODTHRS as well",
+                             "leave those conditions out", "frequency"}});
     }
 }
 
 void addThresholds(const SituationText& text, SituationConfig& situation, Problems& problems) {
     if (text.frequency && !text.period) {
-        problems.push_back({"frequency", {}, "has no period", "add period = \"60s\""});
+        problems.push_back({{"has no period", "add period = \"60s\"", "frequency"}});
     }
     if (text.period && !text.frequency) {
-        problems.push_back({"period", {}, "has no frequency", "add frequency = \">= 5\""});
+        problems.push_back({{"has no frequency", "add frequency = \">= 5\"", "period"}});
     }
     const auto add = [&](std::string_view field, const std::optional<std::string>& value,
                          const std::optional<Condition>& condition, const char* what,
@@ -186,7 +180,7 @@ void addThresholds(const SituationText& text, SituationConfig& situation, Proble
         if (condition) {
             situation.conditions.push_back(*condition);
         } else if (value) {
-            problems.push_back({field, {}, "'" + *value + "' is " + what, cure});
+            problems.push_back({{"'" + *value + "' is " + what, cure, std::string(field)}});
         }
     };
     add("frequency", text.frequency,
@@ -198,14 +192,6 @@ void addThresholds(const SituationText& text, SituationConfig& situation, Proble
 }
 
 } // namespace
-
-std::string SituationProblem::fieldText() const {
-    std::string text(field);
-    if (condition) {
-        text += '[' + std::to_string(*condition) + ']';
-    }
-    return text;
-}
 
 std::vector<SituationProblem> SituationValidator::check(const SituationText& text,
                                                         SituationConfig& situation,

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_SITUATION_VALIDATOR_H
 #define ZRM_HOST_SITUATION_VALIDATOR_H
 
+#include "host/base/Result.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/config/HostConfig.h"
 
@@ -23,15 +24,9 @@ struct SituationText {
     std::optional<std::string> period;
 };
 
-/// What is wrong with a situation. Both texts begin in lower case and have no full stop.
-struct SituationProblem {
-    std::string_view field;               ///< static text
-    std::optional<std::size_t> condition; ///< index, in the field "when"
-    std::string what;
-    std::string cure;
-
-    /// "when[0]"
-    std::string fieldText() const;
+/// What is wrong with a situation, in a field such as "name" or "when[0]".
+struct SituationProblem : Problem {
+    std::optional<std::size_t> condition = std::nullopt; ///< index, in the field "when"
 };
 
 /// The only place that knows what makes a valid situation, wherever it comes from. Stateless.

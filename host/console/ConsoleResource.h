@@ -7,12 +7,12 @@
 
 namespace zrm::host {
 
-/// A file of the console, as it is in the program. What it refers to lives as long as the process.
+/// A file of the console, embedded in the program. What it refers to lives as long as the process.
 struct ConsoleFile {
     std::string_view name; ///< below /console/, for example views/logs.js
     std::string_view content;
 
-    /// The file of a name; null when the console has none.
+    /// The file with this name; null when there is none.
     static const ConsoleFile* find(std::string_view name);
 };
 

@@ -20,21 +20,21 @@
 
 namespace zrm::host {
 
-/// How the delivery to one sink stands.
+/// The state of the delivery to one sink.
 struct SinkState {
     enum class Condition {
-        STARTING, ///< nothing was offered yet
-        UP,       ///< the last delivery was whole
-        FAILING,  ///< the last delivery was not, and will be tried again, or this one makes no way
+        STARTING, ///< nothing has been offered yet
+        UP,       ///< the last delivery was complete
+        FAILING,  ///< the last delivery was not and will be retried, or the current one is stuck
     };
 
     std::string name;
     std::string type; ///< as the configuration has it: "jsonl"
     Condition condition = Condition::STARTING;
-    std::uint64_t lag = 0;       ///< events that it has still to get
+    std::uint64_t lag = 0;       ///< events that it has not got yet
     std::uint64_t delivered = 0; ///< events that it got since the agent's start
-    std::uint64_t failures = 0;  ///< deliveries that were not whole
-    std::string error;           ///< why the last delivery failed; empty when it did not
+    std::uint64_t failures = 0;  ///< deliveries that were not complete
+    std::string error;           ///< why the last delivery failed; empty if it did not
     std::optional<std::chrono::milliseconds> retryIn; ///< until the next try, while it waits
 
     /// The condition's name: "starting", "up" or "failing".

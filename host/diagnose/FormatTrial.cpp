@@ -24,7 +24,8 @@ TRC1_Anchor anchor{"FormatTrial.cpp"};
 
 } // namespace
 
-/// A user log that nobody monitors: lines become rows as those of a monitored one do. One thread.
+/// A user log that is not monitored: its lines become rows as those of a monitored log do. One
+/// thread.
 class TrialLog : public UserLogFile {
 public:
     /// Takes a learned format.
@@ -158,7 +159,7 @@ std::string mismatch(const StringParser& directive, const StringParser::Place& p
     const std::string where = isAtEnd ? "The line ends here; " : "";
     if (!place.isLiteralMatched) {
         return where + "the text \"" + std::string(parts.literal) +
-               "\" of the format does not stand here.";
+               "\" of the format is expected here.";
     }
     const char code = parts.conversion.empty() ? '\0' : parts.conversion.back();
     std::string wanted = "a text for " + std::string(parts.conversion);
@@ -288,7 +289,7 @@ FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
 void FormatTrial::explain(const char* text, Line& line) const {
     if (text[0] != '\0' && text[1] == '\0') {
         line.failedAt = 0;
-        line.reason = "A line without text is passed over.";
+        line.reason = "A line without text is skipped.";
         return;
     }
     std::size_t position = 0;

@@ -15,8 +15,8 @@ namespace zrm::host {
 /// removed, a tab after its first word is a blank, and "${@}" is the log's name. Remembers the
 /// original position of each character.
 ///
-/// A specifier that is too long for a line is not expanded: since every "${@}" may stand for a long
-/// name, its author would decide how much memory that takes.
+/// A specifier that is too long for a line is not expanded: every "${@}" may mean a long name, so
+/// its author would decide how much memory the expansion takes.
 class ConfiguredFormat {
 public:
     /// `log` is the log's path.
@@ -73,7 +73,7 @@ public:
         std::size_t to;
         std::string name;
         std::string column;
-        std::string value;     ///< as it is printed into the column
+        std::string value;     ///< as printed into the column
         std::size_t directive; ///< index of its directive
     };
     struct Line {
@@ -81,7 +81,7 @@ public:
         bool matched = false;
         std::vector<Field> fields; ///< those in front of the failure, too
         std::vector<std::pair<std::string, std::string>> row; ///< column and text, when matched
-        /// Byte at which it stops fitting; none where the directives fit and there is no row yet.
+        /// Byte at which it stops fitting; none when all directives fit but there is no row.
         std::optional<std::size_t> failedAt;
         std::optional<std::size_t> directive; ///< index of the one that fails
         std::string reason; ///< why it does not fit; of a line that fits: what its time lacks

@@ -8,14 +8,13 @@
 
 namespace zrm::host {
 
-/// The file of a monitored log, opened to look at. What has the log's name at present may be
-/// another file: its successor after a rotation, or whatever somebody has made a link to. Only the
-/// file that the monitor has open is opened; while it has none, the file of this name, unless the
-/// name is a link.
+/// The file of a monitored log, opened for examination. The log's name may by now lead to another
+/// file: its successor after a rotation, or anything if the name has become a link. Opens only the
+/// file that the monitor has open; while it has none, the file of this name unless that is a link.
 class MonitoredLogFile {
 public:
-    /// `path` is the log's local name, `monitored` the file that its monitor has open. Does not
-    /// wait, whatever is in the file's place.
+    /// `path` is the log's local name, `monitored` the file that its monitor has open. Never waits,
+    /// whatever is in the file's place.
     MonitoredLogFile(const std::string& path, const std::optional<FileIdentity>& monitored);
     ~MonitoredLogFile();
     MonitoredLogFile(const MonitoredLogFile&) = delete;

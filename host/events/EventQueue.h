@@ -50,22 +50,23 @@ public:
     /// Adds a reader, which gets every event from here on.
     Reader addReader();
 
-    /// Is told whenever the ring becomes full, or has room again; quick, and calls nothing here.
+    /// Sets what to call whenever the ring becomes full or has room again; it must be quick and
+    /// must not call the queue.
     void onFull(std::function<void(bool isFull)> listener) { m_listener = std::move(listener); }
 
-    /// Copies one row in. False when the row was not taken because the queue is closed. Where the
-    /// calling thread collects the events of an entry, the row is collected.
+    /// Copies one row. False when the queue is closed, so that the row was not taken. Where the calling
+    /// thread collects the events of an entry, the row is collected.
     bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
 
-    /// Copies all events of an entry in, which stay together. The last one carries the position
-    /// behind the entry. Returns its id; 0 if nothing was taken because the queue is closed.
+    /// Copies all events of an entry, which stay together. The last one carries the position behind
+    /// the entry. Returns its id; 0 if nothing was taken because the queue is closed.
     std::uint64_t pushEntry(const EntryEvents& events, const std::shared_ptr<FollowedLog>& log,
                             const LogPosition& behind);
 
-    /// Waits for events, until the limit, and a few milliseconds for more once the first has come.
-    /// Gives the oldest ones that the reader has not released, at most `most`; they stay as they
-    /// are until released. Empty only when there was none in time, or when the queue is closed and
-    /// the reader has released everything.
+    /// Waits for events until the limit, and a few milliseconds for more once the first has
+    /// arrived. Returns the oldest ones that the reader has not released, at most `most`; they stay
+    /// unchanged until released. Empty only when none arrived in time, or when the queue is closed
+    /// and the reader has released everything.
     std::span<const Event> read(Reader reader, std::size_t most,
                                 Clock::time_point limit = Clock::time_point::max());
 
@@ -78,10 +79,10 @@ public:
     /// Number of events that the reader has not released.
     std::size_t backlog(Reader reader) const;
 
-    /// How the queue stands. Any thread.
+    /// The state of the queue. Any thread.
     QueueState state() const;
 
-    /// Takes no more events; readers get what is left. Any number of times.
+    /// Refuses further events; readers get what is left. Any number of times.
     void close();
 
 private:
@@ -108,13 +109,13 @@ private:
     std::unique_ptr<char[]> m_rows; ///< the rows of the slots
 
     mutable std::mutex m_mutex;
-    std::condition_variable m_changed;    ///< events came, or the queue was closed
+    std::condition_variable m_changed;    ///< events arrived, or the queue was closed
     std::vector<std::uint64_t> m_cursor;  ///< per reader: the next event it will release
-    std::vector<std::uint64_t> m_awaited; ///< per reader: when m_next is so far, it is woken
+    std::vector<std::uint64_t> m_awaited; ///< per reader: m_next at which it is woken
     std::uint64_t m_next = 0;             ///< the next event to be pushed
-    std::deque<Aside> m_aside;            ///< events behind those of the ring, in order
+    std::deque<Aside> m_aside;            ///< events after those of the ring, in order
     std::function<void(bool)> m_listener;
-    bool m_isFull = false; ///< what the listener was told last
+    bool m_isFull = false; ///< as last reported to the listener
     bool m_closed = false;
 };
 

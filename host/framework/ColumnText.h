@@ -6,7 +6,7 @@
 
 namespace zrm::host {
 
-/// The text of a fixed-width character field: what stands before its first NUL, or before the
+/// The text of a fixed-width character field: what is before its first NUL, or before the
 /// field's end, without trailing blanks. The one rule by which the host reads, compares and shows
 /// character columns. Any thread.
 namespace ColumnText {
@@ -17,7 +17,7 @@ std::string_view unpadded(const char* field, std::size_t width) noexcept;
 /// A text without its trailing blanks.
 std::string_view withoutTrailingBlanks(std::string_view text) noexcept;
 
-/// True when nothing but padding stands in the rest of a field: blanks up to a NUL or the end.
+/// True when the rest of a field is only padding: blanks up to a NUL or the end.
 bool isPadding(const char* rest, std::size_t width) noexcept;
 
 /// Compares a field with a value as if the shorter of the two were padded with blanks. Negative,

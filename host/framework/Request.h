@@ -98,7 +98,7 @@ private:
 };
 
 /// What a request asks for: its name, kind and conditions. Built by the opener of a request and
-/// kept alive until the request is destroyed; immutable meanwhile.
+/// kept alive until the request is destroyed; does not change in between.
 class RequestDetail {
 public:
     std::string name; ///< the situation's name, or the report's label
@@ -119,9 +119,9 @@ namespace zrm::host {
 /// RowReceiver, which runs under that lock.
 class Request {
 public:
-    /// Opens the request; isOpen() tells whether the table gave one. The receiver outlives the
-    /// request; a situation's may be called before the constructor returns. So do the counts, into
-    /// which the request counts where there are any.
+    /// Opens the request; isOpen() says whether the table provided one. The receiver, and the
+    /// counts if there are any, must outlive it. A situation's receiver may be called before the
+    /// constructor returns.
     Request(TableManager& manager, RequestDetail detail, RowReceiver& receiver,
             RequestCounts* counts = nullptr);
     /// Closes the request: no row reaches the receiver any more. Waits until no other thread works

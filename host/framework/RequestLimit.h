@@ -6,31 +6,31 @@
 
 namespace zrm::host {
 
-/// While it lives, what the constructing thread has the agent read ends early when the time is over
-/// or the work is no longer wanted (CTX1_IsCancelled). Of several on a thread the latest counts.
+/// While it exists, reading by the agent on the constructing thread ends early when the time is up
+/// or the work is no longer wanted (CTX1_IsCancelled). If a thread has several, the latest applies.
 class RequestLimit {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// `isUnwanted` is asked often, on this thread, until it has been true once; may be empty.
+    /// `isUnwanted` is called often, on this thread, until it has returned true; may be empty.
     RequestLimit(Clock::time_point deadline, std::function<bool()> isUnwanted);
     ~RequestLimit();
     RequestLimit(const RequestLimit&) = delete;
     RequestLimit& operator=(const RequestLimit&) = delete;
 
-    /// Whether the work is to end now. Once it is, it stays so.
+    /// Whether the work must end now; once true, always true.
     bool isReached() noexcept;
-    /// Whether isReached has been true: something was ended early.
+    /// Whether isReached has returned true: something was ended early.
     bool wasReached() const noexcept { return m_isReached; }
 
-    /// That of the calling thread, or null.
+    /// The calling thread's, or null.
     static RequestLimit* current() noexcept;
 
 private:
     const Clock::time_point m_deadline;
     const std::function<bool()> m_isUnwanted;
     bool m_isReached = false;
-    RequestLimit* const m_outer; ///< counts again when this one ends
+    RequestLimit* const m_outer; ///< applies again when this one ends
 };
 
 } // namespace zrm::host

@@ -21,8 +21,8 @@ public:
         : filters(detail.conditions), receiver(context.receiver()),
           counts(context.counts() != nullptr ? *context.counts() : m_ownCounts) {}
 
-    /// The conditions of the request, ready for evaluation. The table's columns must be known by
-    /// now: they are asked for at the first call.
+    /// The conditions of the request, ready for evaluation. The first call queries the table's
+    /// columns, which must be known by then.
     const zrm::host::ConditionSet& conditionsOf(ctreq& request) {
         if (!m_conditions) {
             m_conditions.emplace(filters, request);

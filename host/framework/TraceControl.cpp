@@ -1,6 +1,5 @@
 #include "host/framework/TraceControl.h"
 
-#include "base/ErrorText.h"
 #include "framework/trace.h"
 #include "host/framework/TraceLevels.h"
 #include "host/framework/TraceOutput.h"
@@ -64,10 +63,10 @@ void bumpGeneration() {
 
 } // namespace
 
-std::string TraceControl::configure(const std::string& text) {
+Result<void> TraceControl::configure(const std::string& text) {
     auto setting = std::make_unique<Setting>();
-    if (std::string error = setting->levels.parse(text); !error.empty()) {
-        return error;
+    if (const Result<void> parsed = setting->levels.parse(text); !parsed) {
+        return parsed;
     }
     setting->text = text.empty() ? defaultLevels : text;
     const std::lock_guard guard(g_mutex);
@@ -85,9 +84,9 @@ std::string TraceControl::levels() {
     return setting != nullptr ? setting->text : defaultLevels;
 }
 
-std::string TraceControl::openFile(const std::string& path) {
-    const ErrorText error(TraceOutput::open(path.c_str()));
-    return error.number() == 0 ? "" : "cannot open " + path + ": " + error.text();
+Result<void> TraceControl::openFile(const std::string& path) {
+    const int error = TraceOutput::open(path.c_str());
+    return error == 0 ? Result<void>() : refused(because("cannot open " + path, error));
 }
 
 unsigned TraceControl::levelOf(const char* unit) noexcept {

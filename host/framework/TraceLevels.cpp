@@ -76,33 +76,32 @@ bool isUnitOf(std::string_view className, std::string_view stem) {
 
 } // namespace
 
-std::string TraceLevels::parse(std::string_view text) {
+Result<void> TraceLevels::parse(std::string_view text) {
     TraceLevels parsed;
     while (!text.empty()) {
         const std::string_view word = takePart(text, ',');
         if (word.empty()) {
             continue;
         }
-        std::string error = parsed.parseWord(word);
-        if (!error.empty()) {
-            return error;
+        if (const Result<void> added = parsed.parseWord(word); !added) {
+            return added;
         }
     }
     *this = std::move(parsed);
     return {};
 }
 
-std::string TraceLevels::parseWord(std::string_view word) {
+Result<void> TraceLevels::parseWord(std::string_view word) {
     std::string_view classes = word;
     std::optional<std::string_view> unit;
     if (word.find('=') != std::string_view::npos) {
         unit = takePart(classes, '=');
         if (unit->empty()) {
-            return "no unit is named before '=' in \"" + std::string(word) + "\"";
+            return refused("no unit is named before '=' in \"" + std::string(word) + "\"");
         }
         if (!std::all_of(unit->begin(), unit->end(),
                          [](char c) { return c > ' ' && c < '\x7f'; })) {
-            return "\"" + std::string(*unit) + "\" is not the name of a source file";
+            return refused("\"" + std::string(*unit) + "\" is not the name of a source file");
         }
     }
     unsigned level = 0;
@@ -112,10 +111,11 @@ std::string TraceLevels::parseWord(std::string_view word) {
         const std::string_view name = takePart(classes, '+');
         const std::optional<unsigned> known = classOf(name);
         if (!known) {
-            return "\"" + std::string(name) + "\" in \"" + std::string(word) +
-                   "\" is not a trace class; the classes are error, flow, detail, fine, all, none, "
-                   "or "
-                   "a number from 0 to 255";
+            return refused(
+                "\"" + std::string(name) + "\" in \"" + std::string(word) +
+                "\" is not a trace class; the classes are error, flow, detail, fine, all, none, "
+                "or "
+                "a number from 0 to 255");
         }
         level |= *known;
     }

@@ -2,6 +2,7 @@
 #define ZRM_HOST_TRACE_LEVELS_H
 
 #include "framework/trace.h"
+#include "host/base/Result.h"
 
 #include <string>
 #include <string_view>
@@ -18,9 +19,8 @@ namespace zrm::host {
 /// that fits a source file holds, of several equal ones the last. Immutable once parsed.
 class TraceLevels {
 public:
-    /// Reads the text; returns an empty text, or what is wrong with it, and leaves the levels as
-    /// they were then.
-    std::string parse(std::string_view text);
+    /// Reads the text. Leaves the levels as they were when it is refused.
+    Result<void> parse(std::string_view text);
 
     /// The set of TRC1_Class bits of a unit. Neither locks nor allocates.
     unsigned levelOf(std::string_view unit) const noexcept;
@@ -31,7 +31,7 @@ private:
         unsigned level;
     };
 
-    std::string parseWord(std::string_view word);
+    Result<void> parseWord(std::string_view word);
 
     bool m_hasGeneral = false;
     unsigned m_general = TRC1_ERROR;

@@ -19,7 +19,16 @@ std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t la
 
 namespace {
 
-enum Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, LABEL, CHECKSUM };
+/// The columns of StoredEventRow::select.
+enum class Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, LABEL, CHECKSUM };
+
+std::int64_t integer(const Statement& row, Column column) {
+    return row.integer(static_cast<int>(column));
+}
+
+std::string_view text(const Statement& row, Column column) {
+    return row.text(static_cast<int>(column));
+}
 
 } // namespace
 
@@ -28,20 +37,21 @@ const char* const StoredEventRow::select =
     " LEFT JOIN labels ON labels.id = label LEFT JOIN logs ON logs.id = log WHERE ";
 
 EventRecord StoredEventRow::record() const {
-    return {static_cast<std::uint64_t>(m_row.integer(ID)),
-            m_row.integer(RAISED),
-            m_row.text(SITUATION),
-            m_row.text(SEVERITY),
-            m_row.text(LOG),
-            m_row.text(JSON),
-            m_row.text(TEXT)};
+    return {static_cast<std::uint64_t>(integer(m_row, Column::ID)),
+            integer(m_row, Column::RAISED),
+            text(m_row, Column::SITUATION),
+            text(m_row, Column::SEVERITY),
+            text(m_row, Column::LOG),
+            text(m_row, Column::JSON),
+            text(m_row, Column::TEXT)};
 }
 
 bool StoredEventRow::isIntact() const {
-    return m_row.isNull(CHECKSUM)
-               ? nlohmann::json::accept(m_row.text(JSON))
-               : m_row.integer(CHECKSUM) == eventChecksum(m_row.integer(ID), m_row.integer(RAISED),
-                                                          m_row.integer(LABEL), m_row.text(JSON));
+    return m_row.isNull(static_cast<int>(Column::CHECKSUM))
+               ? nlohmann::json::accept(text(m_row, Column::JSON))
+               : integer(m_row, Column::CHECKSUM) ==
+                     eventChecksum(integer(m_row, Column::ID), integer(m_row, Column::RAISED),
+                                   integer(m_row, Column::LABEL), text(m_row, Column::JSON));
 }
 
 EventTable::EventTable(Database& database)

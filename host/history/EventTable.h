@@ -38,11 +38,11 @@ private:
     const Statement& m_row;
 };
 
-/// The events of a history, as the writer sees them: appended at one end and removed at the other.
+/// The events of a history as the writer sees them: appended at one end and removed at the other.
 /// Used by the writer's thread. Throws DatabaseError.
 class EventTable {
 public:
-    /// Events are marked in parts of so many ids: the part of an event is its id divided by this.
+    /// Marks exist per part of this many ids: the part of an event is its id divided by this.
     static constexpr std::uint64_t partSize = 1024;
 
     /// When an event was raised.
@@ -53,7 +53,7 @@ public:
 
     explicit EventTable(Database& database);
 
-    /// Adds events; `labels` has the label of each.
+    /// Adds events; `labels` contains the label of each.
     void append(std::span<const EventRecord> events, std::span<const std::int64_t> labels);
 
     /// Id of the oldest event; 0 when there is none.
@@ -61,7 +61,7 @@ public:
     /// Id of the newest event; 0 when there is none.
     std::uint64_t newest();
 
-    /// The oldest events, at most so many, by ascending id.
+    /// The oldest events, at most `most`, by ascending id.
     std::vector<Moment> oldestMoments(std::size_t most);
 
     /// When an event of the part of `id`, or of a later one, was raised, not later than `time`: the

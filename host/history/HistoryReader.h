@@ -33,7 +33,7 @@ struct StoredEvent {
     std::int64_t raised = 0; ///< milliseconds since 1970-01-01, UTC
     std::string situation;   ///< its name
     std::string severity;    ///< info, minor, warning, major or critical
-    std::string log;         ///< the monitored log's whole path
+    std::string log;         ///< the monitored log's full path
     std::string json;        ///< the event as one JSON object, on one line, without a newline
     bool operator==(const StoredEvent&) const = default;
 };
@@ -62,7 +62,7 @@ struct HistoryState {
 struct LogRates {
     using Counts = std::vector<std::optional<std::uint64_t>>;
 
-    std::string log; ///< the monitored log's whole path
+    std::string log; ///< the monitored log's full path
     Counts entries;  ///< entries read
     Counts events;   ///< events raised
 };

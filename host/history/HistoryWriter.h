@@ -25,13 +25,13 @@
 
 namespace zrm::host {
 
-/// The one writer of the history, on a thread of its own: takes events from the queue, stores them
-/// in batches and makes them known; keeps the sinks' cursors, the logs' positions and the rates;
-/// lets events expire, a few at a time. The events of an entry are stored in one transaction with
-/// the position behind it, and a position without events is stored after the events before it. A
-/// failure is told once and tried again after growing pauses, with the events held in the queue:
-/// nothing is lost, and the logs wait. A corrupt file is exchanged for a new one, and files that
-/// were removed are made anew.
+/// The only writer of the history, on its own thread: takes events from the queue, stores them in
+/// batches and publishes them; stores the sinks' cursors, the logs' positions and the rates; removes
+/// expired events, a few at a time. The events of an entry are stored in one transaction with the
+/// position behind it, and a position without events is stored after the events before it. A failure
+/// is reported once and retried after growing pauses while the events stay in the queue: nothing is
+/// lost, and the logs wait. A corrupt file is replaced by a new one, and removed files are created
+/// again.
 class HistoryWriter {
 public:
     using Clock = EventQueue::Clock;
@@ -47,22 +47,22 @@ public:
     /// Starts the thread on the queue's events, which `format` renders. Once.
     void start(EventQueue& queue, EventJson format);
 
-    /// Ends the thread when everything in the queue, which is closed, is stored; at the latest at
-    /// the limit, or a second later when it does not give up at once. One that the system does not
-    /// let give up is left alone until the object is destroyed. Returns the number of events that
-    /// were not stored. Any number of times.
+    /// Ends the thread once everything in the closed queue is stored, at the limit at the latest,
+    /// or a second later if it does not give up at once. A thread blocked in the system is left
+    /// alone until the object is destroyed. Returns the number of events that were not stored. Any
+    /// number of times.
     std::uint64_t finish(Clock::time_point limit);
 
-    /// Stores the cursors and the entries once more; after finish. Says so when that fails.
+    /// Stores the cursors and the entries once more, after finish. Reports a failure.
     void storeRest();
 
-    /// Takes the entries that a minute brought. Any thread.
+    /// Adds the entries of a minute. Any thread.
     void addEntries(MinuteCounts counts);
 
     /// Id of the oldest event held; 0 when there is none. Any thread.
     std::uint64_t oldest() const noexcept { return m_oldest.load(); }
 
-    /// What keeps the history from taking events now; empty: nothing. Any thread.
+    /// Why the history cannot store events now; empty: it can. Any thread.
     std::string problem() const;
 
 private:

@@ -22,16 +22,16 @@ public:
 
     explicit LabelTable(Database& database);
 
-    /// The label of an event; made when there is none yet.
+    /// The label of an event, created if necessary.
     Label of(const EventRecord& event);
 
-    /// The number of a log's path; made when there is none yet.
+    /// The number of a log's path, created if necessary.
     std::int64_t log(std::string_view path);
 
-    /// After a transaction was taken back: numbers made in it are nobody's.
+    /// After a rollback: forgets the numbers that the transaction has assigned.
     void forget();
 
-    /// Removes the labels that no event has any more.
+    /// Removes the labels that no event uses any more.
     void removeUnused();
 
 private:

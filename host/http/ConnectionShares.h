@@ -11,30 +11,30 @@
 
 namespace zrm::host {
 
-/// Counts the open connections, in all and for each client's address, and bounds both: no address
-/// takes all places. Any thread.
+/// Counts the open connections, in total and per client address, and limits both: no address takes
+/// all of them. Any thread.
 class ConnectionShares {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// Before the first connection: how many there may be in all.
+    /// Sets how many there may be in total. Called before the first connection.
     void setMost(std::size_t most) noexcept { m_most = most; }
 
-    /// The part of all places that one address may take. Clients of this machine, of which most
-    /// have one address, get three quarters; others an eighth, and at least four.
+    /// How many of them one address may have. Clients on this machine, most of which share one
+    /// address, get three quarters; others get an eighth, and at least four.
     std::size_t share(bool isLoopback) const noexcept;
 
-    /// Takes a place for a connection of this address. False, and counted as refused, when there is
-    /// none, or when the address has its share.
+    /// Counts a connection from this address. False, and counted as refused, when the total or the
+    /// address's share is used up.
     bool take(const std::string& address, bool isLoopback);
     void release(const std::string& address);
 
-    /// For a connection that found no place for another reason.
+    /// For a connection that was refused for another reason.
     void countRefused();
 
     std::size_t count() const;
     std::uint64_t refused() const;
-    /// True when few places are left: idle connections should leave early.
+    /// True when few are left: idle connections should be closed early.
     bool isTight() const;
 
     /// Waits until there are no connections, at most until the limit. True when there are none.

@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// The API token and the certificate with its key, read from their files again when these change.
-/// What was read last serves on while a changed file cannot be used. One thread.
+/// The API token and the certificate with its key, reread when their files change. While a changed
+/// file cannot be used, what was read last stays in use. One thread.
 class Credentials {
 public:
     /// Paths; certificate and key are empty without TLS.
@@ -22,13 +22,13 @@ public:
     /// Reads everything for the first time.
     Result<void> load();
 
-    /// What came of a look at the files.
+    /// The result of checking the files.
     struct Change {
-        bool isNew = false; ///< token() or tls() is another one
+        bool isNew = false; ///< token() or tls() has changed
         /// Why a changed file is not used, once for each change.
         std::optional<Problem> problem = std::nullopt;
     };
-    /// Looks whether the files have changed, and reads those that have. Called about once a second.
+    /// Rereads the files that have changed. Called about once a second.
     Change refresh();
 
     /// After load.
@@ -46,7 +46,7 @@ private:
     WatchedFile m_keyFile;
     std::optional<ApiToken> m_token;
     std::shared_ptr<const TlsContext> m_tls;
-    bool m_isTriedAgain = false; ///< certificate and key, of which one may come after the other
+    bool m_isTriedAgain = false; ///< certificate and key may be replaced one after the other
 };
 
 } // namespace zrm::host

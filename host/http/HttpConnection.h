@@ -58,7 +58,7 @@ public:
 
 private:
     friend class StreamChannel;
-    enum Phase {
+    enum class Phase {
         OPENING,
         IDLE,
         READING_HEAD,
@@ -71,6 +71,7 @@ private:
         LEAVING,
         CLOSED
     };
+    using enum Phase;
     struct Job;
     using Error = ClientStream::Error;
     using Clock = std::chrono::steady_clock;

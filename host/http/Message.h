@@ -27,30 +27,29 @@ struct HttpRequest {
     std::stop_token cancelled;
 };
 
-/// The way of a body to its client while the body comes into being. Any thread; nothing here waits.
+/// Sends a body to its client as it is produced. Any thread; nothing here waits.
 class BodyChannel {
 public:
     virtual ~BodyChannel() = default;
 
-    /// Hands over the next part. It is kept in memory until the client has taken it, so a writer
-    /// that may have much hands over more only while isReady(). Does nothing once the channel is
-    /// closed.
+    /// Sends the next part. It is kept in memory until the client has taken it, so a writer with a
+    /// lot to send continues only while isReady(). Does nothing once the channel is closed.
     virtual void send(std::string text) = 0;
 
-    /// True when the client has taken everything that was handed over.
+    /// True when the client has taken everything that was sent.
     virtual bool isReady() const = 0;
 
-    /// False when the client has gone, reads too slowly, or the server stops.
+    /// False when the client has left or reads too slowly, or the server stops.
     virtual bool isOpen() const = 0;
 
-    /// The body is over.
+    /// Ends the body.
     virtual void end() = 0;
 };
 
 /// The answer to a request.
 struct HttpAnswer {
-    /// Begins a body that is sent as it comes into being. `changed` may be called whenever the
-    /// channel has become ready or was closed, on a thread that must not be kept waiting.
+    /// Begins a body that is sent as it is produced. `changed` may be called whenever the channel
+    /// has become ready or was closed, on a thread that must not be kept waiting.
     struct Stream {
         std::function<void(std::shared_ptr<BodyChannel>)> begin;
         std::function<void()> changed;
@@ -63,7 +62,7 @@ struct HttpAnswer {
     std::vector<std::pair<std::string, std::string>> headers = {}; ///< further ones
     Stream stream = {};                                            ///< in place of `body`
 
-    /// An answer of status 200 with a JSON text, in which nothing steers how it is shown.
+    /// An answer of status 200 with a JSON text in which control characters are escaped.
     static HttpAnswer json(std::string text) {
         return {200, "application/json", SteeringText::escapedInJson(std::move(text))};
     }

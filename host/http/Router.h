@@ -25,10 +25,11 @@ public:
     using enum Access;
 
     /// Where a handler runs.
-    enum Lane {
+    enum class Lane {
         USUAL, ///< with all others; may be slow
         QUICK, ///< separate, so that slow answers cannot delay it; never waits itself
     };
+    using enum Lane;
 
     /// The route of a request.
     struct Match {

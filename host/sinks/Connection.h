@@ -12,8 +12,8 @@
 
 namespace zrm::host {
 
-/// A connection to a receiver that answers nothing, over TCP or UDP. Every wait ends when its time
-/// is over or when giving up is requested. Used by one thread.
+/// A connection over TCP or UDP to a receiver that does not answer. Every wait ends when its time
+/// is up or giving up is requested. Used by one thread.
 class Connection {
 public:
     enum class Transport { TCP, UDP };
@@ -29,15 +29,14 @@ public:
     bool open(const std::stop_token& giveUp);
     bool isOpen() const noexcept { return m_socket != -1; }
 
-    /// Closes the connection when the other side has closed it, it has failed meanwhile, or the
-    /// other side does not stop talking.
+    /// Closes the connection when the other side has closed it, it has failed, or the other side
+    /// keeps sending.
     void closeIfBroken();
 
-    /// Sends all bytes, over UDP as one message. After a failure it is closed.
+    /// Sends all bytes, over UDP as one message. A failure closes the connection.
     bool send(std::string_view bytes, const std::stop_token& giveUp);
 
-    /// How many of the bytes that were sent the receiver's system has not acknowledged; 0 where
-    /// that is unknown.
+    /// How many of the sent bytes the receiver's system has not acknowledged; 0 if unknown.
     std::size_t unacknowledged() const;
 
     /// Why the last operation failed.

@@ -16,14 +16,14 @@ public:
     static std::optional<std::string> read(const std::string& path, std::string& problem);
 };
 
-/// Headers that are kept in a file of their own, because they are secrets: "Name: value", one per
-/// line. Stateless.
+/// Headers kept in a separate file because they are secrets: "Name: value", one per line.
+/// Stateless.
 class HeadersFile {
 public:
     using Headers = std::map<std::string, std::string>;
 
-    /// The headers of a file, which holds what a SecretFile may hold; none when it cannot be used:
-    /// then `problem` says why, and never what the file holds.
+    /// The headers of a file, for which the rules of SecretFile apply. None when it cannot be used;
+    /// `problem` then says why, without quoting the file.
     static std::optional<Headers> read(const std::string& path, std::string& problem);
 };
 

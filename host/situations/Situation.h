@@ -14,11 +14,12 @@ class TableManager;
 
 namespace zrm::host {
 
-/// What a situation has done so far; outlives its requests, so that it goes on when the situation
-/// is stopped and started. Log threads count, one at a time; any thread reads, without a lock.
+/// What a situation has done so far. Outlives the situation's requests, so that counting continues
+/// when it is stopped and started. Log threads count, one at a time; any thread reads, without a
+/// lock.
 class SituationCounts {
 public:
-    /// Of its requests: entries handed to it and those that met its conditions.
+    /// Entries offered to its requests, and those that met its conditions.
     RequestCounts requests;
 
     std::uint64_t raised() const noexcept { return m_raised.load(std::memory_order_relaxed); }

@@ -20,17 +20,17 @@ namespace zrm::host {
 
 class EventQueue;
 
-/// Opens and closes situations on a thread of its own. Both wait for the table manager's lock, and
-/// so for a log thread that has it and waits for room in a full queue of events: whoever asks for
-/// a change must not have to wait as long. Any thread, destruction excepted.
+/// Opens and closes situations on its own thread. Both wait for the table manager's lock, and so
+/// for fan-out; a caller that requests a change must not have to wait that long. Any thread, except
+/// for destruction.
 class SituationRunner {
 public:
     enum class State {
-        ABSENT,  ///< not to run
-        OPENING, ///< waits to be opened
+        ABSENT,  ///< should not run
+        OPENING, ///< waiting to be opened
         OPEN,
         REFUSED, ///< the table opened no request
-        ENDED,   ///< the agent has stopped it
+        ENDED,   ///< stopped by the agent
     };
 
     /// The table's manager and the queue outlive the object.
@@ -40,25 +40,25 @@ public:
     SituationRunner(const SituationRunner&) = delete;
     SituationRunner& operator=(const SituationRunner&) = delete;
 
-    /// Lets a situation run under this key, in place of the one that runs under it.
+    /// Runs a situation under this key, in place of the one that may already run under it.
     void start(const std::string& key, SituationConfig config,
                std::shared_ptr<SituationCounts> counts);
 
-    /// Lets it run no more: it raises nothing from now on, and is closed.
+    /// Stops it: it raises nothing from now on and is closed.
     void stop(const std::string& key);
 
-    /// Waits until everything is as it was asked for, at most so long; false when the time is up.
+    /// Waits until all requested changes are made, at most this long; false when the time is up.
     bool settle(std::chrono::milliseconds limit);
 
     State state(const std::string& key) const;
 
-    /// Stops and closes every situation; nothing is started any more. Any number of times.
+    /// Stops and closes every situation; nothing can be started afterwards. Any number of times.
     void close();
 
 private:
     struct Slot {
         SituationConfig config;
-        std::shared_ptr<SituationCounts> counts; ///< null: not to run
+        std::shared_ptr<SituationCounts> counts; ///< null: should not run
         std::uint64_t asked = 0;                 ///< number of the last start
         std::unique_ptr<Situation> situation;
         std::uint64_t running = 0; ///< number of the start that opened it
@@ -75,7 +75,7 @@ private:
     std::condition_variable m_changed;
     std::condition_variable m_settled;
     std::map<std::string, Slot> m_slots;
-    std::deque<std::string> m_pending; ///< keys to bring to their state, in the order of asking
+    std::deque<std::string> m_pending; ///< keys with a pending change, in the order of the requests
     std::uint64_t m_starts = 0;
     bool m_isWorking = false;
     bool m_ends = false;

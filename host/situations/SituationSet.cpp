@@ -14,18 +14,24 @@ TRC1_Anchor anchor{"SituationSet.cpp"};
 constexpr auto fileSource = SituationStatus::FILE;
 constexpr auto apiSource = SituationStatus::API;
 
-SituationRefusal unknown(const std::string& name) {
-    return {SituationRefusal::UNKNOWN, "there is no situation '" + name + "'"};
+tl::unexpected<SituationRefusal> refuse(SituationRefusal::Reason reason, std::string what,
+                                        std::string field = "") {
+    return tl::unexpected(SituationRefusal{reason, {std::move(what), "", std::move(field)}});
 }
 
-SituationRefusal fromFile(const std::string& name) {
-    return {SituationRefusal::FROM_FILE,
-            "the situation '" + name +
-                "' belongs to the configuration file: change it there, which takes effect at once, "
-                "or stop it"};
+tl::unexpected<SituationRefusal> unknown(const std::string& name) {
+    return refuse(SituationRefusal::UNKNOWN, "there is no situation '" + name + "'", "name");
 }
 
-SituationRefusal missing(bool isInFile, const std::string& name) {
+tl::unexpected<SituationRefusal> fromFile(const std::string& name) {
+    return refuse(SituationRefusal::FROM_FILE,
+                  "the situation '" + name +
+                      "' belongs to the configuration file: change it there, which takes effect at "
+                      "once, or stop it",
+                  "name");
+}
+
+tl::unexpected<SituationRefusal> missing(bool isInFile, const std::string& name) {
     return isInFile ? fromFile(name) : unknown(name);
 }
 
@@ -66,8 +72,7 @@ SituationSet::SituationSet(TableManager& entries, EventQueue& queue, std::string
 
 std::string SituationSet::load() {
     TraceScope trace(anchor);
-    std::string message;
-    SituationStore::Content content = m_store.load(message);
+    SituationStore::Content content = m_store.load();
     const std::lock_guard guard(m_mutex);
     for (SituationStore::Made& made : content.made) {
         const Key key{apiSource, made.config.name};
@@ -78,7 +83,7 @@ std::string SituationSet::load() {
     }
     m_stoppedFiles.insert(content.stoppedFiles.begin(), content.stoppedFiles.end());
     m_keptStopped = m_stoppedFiles;
-    return message;
+    return content.message;
 }
 
 void SituationSet::apply(const std::vector<SituationConfig>& configs) {
@@ -165,25 +170,26 @@ SituationSet::Changed SituationSet::orTooLarge(const Records& records, const Key
     if (!budget.isExceeded()) {
         return key;
     }
-    return SituationRefusal{SituationRefusal::TOO_MANY,
-                            "the regular expressions of the situations created through the API are "
-                            "too large together: remove a situation, or write smaller ones"};
+    return refuse(SituationRefusal::TOO_MANY,
+                  "the regular expressions of the situations created through the API are too large "
+                  "together: remove a situation, or write smaller ones");
 }
 
 SituationSet::Change SituationSet::add(const SituationConfig& config) {
     return statusAfter(change([&](Draft& draft) -> Changed {
         if (named(draft.records, config.name) != nullptr) {
-            return SituationRefusal{SituationRefusal::EXISTS,
-                                    "there is a situation '" + config.name +
-                                        "' already: choose another name, or change that one"};
+            return refuse(SituationRefusal::EXISTS,
+                          "there is a situation '" + config.name +
+                              "' already: choose another name, or change that one",
+                          "name");
         }
         const auto made =
             std::count_if(draft.records.begin(), draft.records.end(),
                           [](const auto& one) { return one.first.first == apiSource; });
         if (static_cast<std::size_t>(made) >= mostMade) {
-            return SituationRefusal{SituationRefusal::TOO_MANY,
-                                    "there are " + std::to_string(mostMade) +
-                                        " situations created through the API: remove one first"};
+            return refuse(SituationRefusal::TOO_MANY,
+                          "there are " + std::to_string(mostMade) +
+                              " situations created through the API: remove one first");
         }
         const Key key{apiSource, config.name};
         draft.records.emplace(key, Record{config});
@@ -208,16 +214,15 @@ SituationSet::Change SituationSet::replace(const SituationConfig& config) {
     }));
 }
 
-std::optional<SituationRefusal> SituationSet::remove(const std::string& name) {
-    Changed changed = change([&](Draft& draft) -> Changed {
+Result<void, SituationRefusal> SituationSet::remove(const std::string& name) {
+    const Changed changed = change([&](Draft& draft) -> Changed {
         const Key key{apiSource, name};
         if (draft.records.erase(key) == 0) {
             return missing(named(draft.records, name) != nullptr, name);
         }
         return key;
     });
-    auto* const refusal = std::get_if<SituationRefusal>(&changed);
-    return refusal == nullptr ? std::nullopt : std::optional(std::move(*refusal));
+    return changed.map([](const Key&) {});
 }
 
 SituationSet::Change SituationSet::start(const std::string& name) {
@@ -249,7 +254,7 @@ SituationSet::Change SituationSet::setStopped(const std::string& name, bool isSt
 SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>& plan) {
     TraceScope trace(anchor);
     Changed changed = changeInTurn(plan);
-    if (std::holds_alternative<Key>(changed)) {
+    if (changed) {
         m_runner.settle(patience);
     }
     return changed;
@@ -259,8 +264,8 @@ SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Dra
     TraceScope trace(anchor);
     const Turn turn(*this);
     if (!turn.hasCome()) {
-        return SituationRefusal{SituationRefusal::BUSY,
-                                "other changes of the situations are in progress: try again"};
+        return refuse(SituationRefusal::BUSY,
+                      "other changes of the situations are in progress: try again");
     }
     Draft draft;
     {
@@ -268,14 +273,14 @@ SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Dra
         draft = {m_records, m_stoppedFiles};
     }
     Changed changed = plan(draft);
-    if (std::holds_alternative<SituationRefusal>(changed)) {
+    if (!changed) {
         return changed;
     }
-    if (auto refusal = save(draft)) {
-        return std::move(*refusal);
+    if (const auto saved = save(draft); !saved) {
+        return tl::unexpected(saved.error());
     }
     const std::lock_guard guard(m_mutex);
-    publish(std::get<Key>(changed), draft);
+    publish(*changed, draft);
     return changed;
 }
 
@@ -311,13 +316,13 @@ void SituationSet::publish(const Key& key, const Draft& draft) {
 }
 
 SituationSet::Change SituationSet::statusAfter(const Changed& changed) const {
-    if (const auto* const refusal = std::get_if<SituationRefusal>(&changed)) {
-        return *refusal;
+    if (!changed) {
+        return tl::unexpected(changed.error());
     }
     const std::lock_guard guard(m_mutex);
-    const auto found = m_records.find(std::get<Key>(changed));
+    const auto found = m_records.find(*changed);
     if (found == m_records.end()) {
-        return unknown(std::get<Key>(changed).second); // gone again, or the file has lost it
+        return unknown(changed->second); // gone again, or the file has lost it
     }
     return statusOf(found->first, found->second);
 }
@@ -359,7 +364,7 @@ void SituationSet::runAgain(const Key& key, const Record& record) {
     }
 }
 
-std::optional<SituationRefusal> SituationSet::save(const Draft& draft) {
+Result<void, SituationRefusal> SituationSet::save(const Draft& draft) {
     SituationStore::Content content;
     for (const auto& [key, record] : draft.records) {
         if (key.first == apiSource) {
@@ -367,13 +372,12 @@ std::optional<SituationRefusal> SituationSet::save(const Draft& draft) {
         }
     }
     content.stoppedFiles.assign(draft.stoppedFiles.begin(), draft.stoppedFiles.end());
-    const std::string problem = m_store.save(content);
-    if (problem.empty()) {
-        m_keptStopped = draft.stoppedFiles;
-        return std::nullopt;
+    if (const Result<void> saved = m_store.save(content); !saved) {
+        return refuse(SituationRefusal::NOT_SAVED,
+                      "the change cannot be saved and was not made: " + saved.error().text());
     }
-    return SituationRefusal{SituationRefusal::NOT_SAVED,
-                            "the change cannot be saved and was not made: " + problem};
+    m_keptStopped = draft.stoppedFiles;
+    return {};
 }
 
 SituationStatus SituationSet::statusOf(const Key& key, const Record& record) const {

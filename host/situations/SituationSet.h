@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_SITUATION_SET_H
 #define ZRM_HOST_SITUATION_SET_H
 
+#include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 #include "host/situations/Situation.h"
 #include "host/situations/SituationRunner.h"
@@ -18,7 +19,6 @@
 #include <set>
 #include <string>
 #include <utility>
-#include <variant>
 #include <vector>
 
 namespace zrm::host {
@@ -52,7 +52,7 @@ struct SituationRefusal {
     };
     using enum Reason;
     Reason reason;
-    std::string detail; ///< what is wrong and what to do about it
+    Problem problem;
 };
 
 /// The situations by name: those of the configuration file and those made through the API. A name
@@ -68,7 +68,7 @@ public:
     static constexpr std::size_t mostMade = 1000; ///< situations made through the API
     static constexpr std::chrono::seconds patience{3};
 
-    using Change = std::variant<SituationStatus, SituationRefusal>;
+    using Change = Result<SituationStatus, SituationRefusal>;
 
     /// The table's manager and the queue outlive the object. An empty path: nothing is kept.
     SituationSet(TableManager& entries, EventQueue& queue, std::string storePath = "");
@@ -97,7 +97,7 @@ public:
     Change add(const SituationConfig& config);
     /// Exchanges the one of this name, which begins anew when it is not as it was.
     Change replace(const SituationConfig& config);
-    std::optional<SituationRefusal> remove(const std::string& name);
+    Result<void, SituationRefusal> remove(const std::string& name);
     /// Of either source. Starting one that has failed tries again.
     Change start(const std::string& name);
     Change stop(const std::string& name);
@@ -121,13 +121,13 @@ private:
         Records records;
         std::set<std::string> stoppedFiles;
     };
-    using Changed = std::variant<Key, SituationRefusal>;
+    using Changed = Result<Key, SituationRefusal>;
 
     class Turn;
     Changed change(const std::function<Changed(Draft&)>& plan);
     static Changed orTooLarge(const Records& records, const Key& key);
     Changed changeInTurn(const std::function<Changed(Draft&)>& plan);
-    std::optional<SituationRefusal> save(const Draft& draft);
+    Result<void, SituationRefusal> save(const Draft& draft);
     void keepStoppedFiles();
     Change statusAfter(const Changed& changed) const;
     Change setStopped(const std::string& name, bool isStopped);

@@ -1,7 +1,7 @@
 #include "host/situations/SituationStore.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/WholeFile.h"
 #include "host/config/SituationValidator.h"
 #include "host/situations/SituationJson.h"
 
@@ -32,39 +32,18 @@ constexpr int version = 1;
 constexpr int deepest = 8;                             ///< the deepest nesting of the file
 constexpr std::size_t largestFile = 128 * 1024 * 1024; ///< bytes
 constexpr mode_t fileMode = 0640;
+constexpr const char* untilNextStart =
+    "; situations cannot be changed through the API until the next start";
 
-std::string because(const std::string& what, int number) {
-    const ErrorText error(number);
-    return what + ": " + error.text();
-}
-
-/// Writes and syncs the whole text; false with errno set.
-bool writeAll(int fd, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = write(fd, text.data(), text.size());
-        if (written == -1 && errno != EINTR) {
-            return false;
-        }
-        text.remove_prefix(static_cast<std::size_t>(std::max<ssize_t>(written, 0)));
-    }
-    return fsync(fd) == 0;
-}
-
-/// Reads the whole file; returns 0 or errno. A pipe in place of the file does not block.
-int readAll(const std::string& path, std::string& text) {
+/// The contents of the file. A pipe in its place does not block.
+Result<std::string, int> contentOf(const std::string& path) {
     const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
     if (fd == -1) {
-        return errno;
+        return tl::unexpected(errno);
     }
-    char buffer[65536];
-    ssize_t count = 0;
-    while (text.size() <= largestFile &&
-           ((count = read(fd, buffer, sizeof buffer)) > 0 || (count == -1 && errno == EINTR))) {
-        text.append(buffer, static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
-    }
-    const int number = count == -1 ? errno : text.size() > largestFile ? EFBIG : 0;
+    Result<std::string, int> text = WholeFile::read(fd, largestFile);
     close(fd);
-    return number;
+    return text;
 }
 
 struct TooDeep {};
@@ -107,21 +86,19 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     made.isStopped = object.at("stopped").get<bool>();
     for (const SituationProblem& problem :
          SituationValidator::check(text, made.config, patterns.ofNext())) {
-        made.problem += (made.problem.empty() ? "" : "; ") + problem.fieldText() + ": " +
-                        problem.what + "; " + problem.cure;
+        made.problem += (made.problem.empty() ? "" : "; ") + problem.field + ": " + problem.text();
     }
     patterns.spend(made.config.patternSize);
     return made;
 }
 
-/// The content in a file's text; `reason` says why there is none.
-std::optional<Content> contentOf(const std::string& text, std::string& reason) {
+/// Reads the text of a file.
+Result<Content> parse(const std::string& text) {
     try {
         const json document = documentOf(text);
         if (const json& number = document.at("version"); number != version) {
-            reason =
-                "its version is " + number.dump() + ", this agent's is " + std::to_string(version);
-            return std::nullopt;
+            return refused("its version is " + number.dump() + ", this agent's is " +
+                           std::to_string(version));
         }
         Content content;
         std::set<std::string> names;
@@ -129,18 +106,16 @@ std::optional<Content> contentOf(const std::string& text, std::string& reason) {
         for (const json& object : document.at("situations")) {
             content.made.push_back(madeFrom(object, patterns));
             if (!names.insert(content.made.back().config.name).second) {
-                reason = "a name appears twice";
-                return std::nullopt;
+                return refused("a name appears twice");
             }
         }
         content.stoppedFiles = document.at("stopped").get<std::vector<std::string>>();
         return content;
     } catch (const TooDeep&) {
-        reason = "it is nested too deeply";
+        return refused("it is nested too deeply");
     } catch (const json::exception&) {
-        reason = "it is damaged";
+        return refused("it is damaged");
     }
-    return std::nullopt;
 }
 
 nlohmann::ordered_json jsonOf(const Content& content) {
@@ -157,25 +132,24 @@ nlohmann::ordered_json jsonOf(const Content& content) {
 
 } // namespace
 
-Content SituationStore::load(std::string& message) {
+Content SituationStore::load() {
     TraceScope trace(anchor);
     if (m_path.empty()) {
         return {};
     }
-    std::string text;
-    if (const int number = readAll(m_path, text); number == ENOENT) {
-        return {};
-    } else if (number != 0) {
-        m_blocked = because("cannot read " + m_path, number);
-        message = m_blocked + "; situations cannot be changed through the API until the next start";
-        return {};
+    Content content;
+    const Result<std::string, int> text = contentOf(m_path);
+    if (text) {
+        Result<Content> read = parse(*text);
+        if (read) {
+            return std::move(*read);
+        }
+        content.message = moveAside(read.error().text());
+    } else if (text.error() != ENOENT) {
+        m_blocked = Problem{because("cannot read " + m_path, text.error())};
+        content.message = m_blocked->text() + untilNextStart;
     }
-    std::string reason;
-    if (std::optional<Content> content = contentOf(text, reason)) {
-        return std::move(*content);
-    }
-    message = moveAside(reason);
-    return {};
+    return content;
 }
 
 std::string SituationStore::moveAside(const std::string& reason) {
@@ -187,61 +161,60 @@ std::string SituationStore::moveAside(const std::string& reason) {
     std::strftime(stamp, sizeof stamp, ".bad-%Y%m%d-%H%M%S", &local);
     const std::string aside = m_path + stamp;
     if (std::rename(m_path.c_str(), aside.c_str()) != 0) {
-        m_blocked = because("cannot move " + m_path + " aside", errno);
-        return m_path + " cannot be used (" + reason + "); " + m_blocked +
-               "; situations cannot be changed through the API until the next start";
+        m_blocked = Problem{because("cannot move " + m_path + " aside", errno)};
+        return m_path + " cannot be used (" + reason + "); " + m_blocked->text() + untilNextStart;
     }
     return m_path + " cannot be used (" + reason + ") and was moved to " + aside +
            "; the agent continues without the situations that were created through the API";
 }
 
-std::string SituationStore::save(const Content& content) {
+Result<void> SituationStore::save(const Content& content) {
     TraceScope trace(anchor);
     if (m_path.empty()) {
-        return "";
+        return {};
     }
-    if (!m_blocked.empty()) {
-        return m_blocked;
+    if (m_blocked) {
+        return tl::unexpected(*m_blocked);
     }
     const std::string text = SituationJson::text(jsonOf(content)) + '\n';
-    std::string problem = text.size() <= largestFile
-                              ? replace(text)
-                              : "they have " + std::to_string(text.size()) +
-                                    " bytes, and at most " + std::to_string(largestFile) +
-                                    " can be read again";
-    if (!problem.empty()) {
-        trace.error()("The situations cannot be saved: %s.", problem.c_str());
+    const Result<void> saved =
+        text.size() <= largestFile
+            ? replace(text)
+            : refused("they have " + std::to_string(text.size()) + " bytes, and at most " +
+                      std::to_string(largestFile) + " can be read again");
+    if (!saved) {
+        trace.error()("The situations cannot be saved: %s.", saved.error().text().c_str());
     }
-    return problem;
+    return saved;
 }
 
-std::string SituationStore::replace(std::string_view text) const {
+Result<void> SituationStore::replace(std::string_view text) const {
     const std::string directory = m_path.substr(0, m_path.rfind('/'));
     if (mkdir(directory.c_str(), 0750) == -1 && errno != EEXIST) {
-        return because("cannot create the directory " + directory, errno);
+        return refused(because("cannot create the directory " + directory, errno));
     }
     const std::string temporary = m_path + ".new";
     unlink(temporary.c_str()); // left by an agent that was killed, or anything else
     const int fd = open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, fileMode);
     if (fd == -1) {
-        return because("cannot create " + temporary, errno);
+        return refused(because("cannot create " + temporary, errno));
     }
-    std::string problem;
-    if (!writeAll(fd, text)) {
-        problem = because("cannot write " + temporary, errno);
+    Result<void, int> written = WholeFile::write(fd, text);
+    if (close(fd) == -1 && written) {
+        written = tl::unexpected(errno);
     }
-    if (close(fd) == -1 && problem.empty()) {
-        problem = because("cannot write " + temporary, errno);
+    Result<void> replaced;
+    if (!written) {
+        replaced = refused(because("cannot write " + temporary, written.error()));
+    } else if (std::rename(temporary.c_str(), m_path.c_str()) != 0) {
+        replaced = refused(because("cannot replace " + m_path, errno));
     }
-    if (problem.empty() && std::rename(temporary.c_str(), m_path.c_str()) != 0) {
-        problem = because("cannot replace " + m_path, errno);
-    }
-    if (!problem.empty()) {
+    if (replaced) {
+        syncDirectory(directory);
+    } else {
         unlink(temporary.c_str());
-        return problem;
     }
-    syncDirectory(directory);
-    return "";
+    return replaced;
 }
 
 } // namespace zrm::host

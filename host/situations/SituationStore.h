@@ -1,8 +1,10 @@
 #ifndef ZRM_HOST_SITUATION_STORE_H
 #define ZRM_HOST_SITUATION_STORE_H
 
+#include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -24,6 +26,7 @@ public:
     struct Content {
         std::vector<Made> made;                ///< through the API
         std::vector<std::string> stoppedFiles; ///< names of situations of the file
+        std::string message = {}; ///< found by load: what is to be said about it, if anything
     };
 
     /// An empty path: nothing is kept.
@@ -31,19 +34,18 @@ public:
 
     /// Reads the file; nothing when there is none. One that is not what it should be is moved
     /// aside. Where that, or reading, fails, nothing is saved until the next start, so that nothing
-    /// is lost. `message` then says what happened.
-    Content load(std::string& message);
+    /// is lost; the content's message then says what happened.
+    Content load();
 
-    /// Replaces the file. Returns what is wrong, and then the file is as it was; empty when nothing
-    /// is.
-    std::string save(const Content& content);
+    /// Replaces the file, which stays as it was when that fails.
+    Result<void> save(const Content& content);
 
 private:
     std::string moveAside(const std::string& reason);
-    std::string replace(std::string_view text) const;
+    Result<void> replace(std::string_view text) const;
 
     const std::string m_path;
-    std::string m_blocked; ///< why nothing may be saved; empty: it may
+    std::optional<Problem> m_blocked; ///< why nothing may be saved
 };
 
 } // namespace zrm::host

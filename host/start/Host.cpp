@@ -12,7 +12,6 @@
 #include <set>
 #include <string_view>
 #include <utility>
-#include <variant>
 
 #include <signal.h>
 #include <unistd.h>
@@ -182,16 +181,16 @@ void Host::sayNoLogs() const {
 
 void Host::reload() {
     TraceScope trace(anchor);
-    ConfigFile::Result result = ConfigFile::reload(m_file.path());
-    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
-        for (const std::string& problem : *problems) {
+    ConfigFile::Result reloaded = ConfigFile::reload(m_file.path());
+    if (!reloaded) {
+        for (const std::string& problem : reloaded.error()) {
             say("%s", problem.c_str());
         }
         say("%s was not loaded; the situations stay as they were", m_file.path().c_str());
         m_serving->noteUnusableConfig();
         return;
     }
-    HostConfig& config = std::get<HostConfig>(result);
+    HostConfig& config = *reloaded;
     trace.detail()("%s taken over.", m_file.path().c_str());
     const std::size_t removed = removedSituations(m_config, config);
     const bool removesMost = removed > m_config.situations.size() / 2;

@@ -15,8 +15,6 @@
 #include <cstdlib>
 #include <string>
 #include <utility>
-#include <variant>
-#include <vector>
 
 #include <unistd.h>
 
@@ -48,30 +46,29 @@ HostConfig readConfig(const std::string& path) {
     if (path.empty()) {
         return {};
     }
-    ConfigFile::Result result = ConfigFile::load(path);
-    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
-        for (const std::string& problem : *problems) {
+    ConfigFile::Result config = ConfigFile::load(path);
+    if (!config) {
+        for (const std::string& problem : config.error()) {
             say("%s", problem.c_str());
         }
         std::exit(unusableStatus);
     }
-    HostConfig& config = std::get<HostConfig>(result);
-    if (const std::string warning = warningOfSecrets(config, path); !warning.empty()) {
+    if (const std::string warning = warningOfSecrets(*config, path); !warning.empty()) {
         say("%s", warning.c_str());
     }
-    return std::move(config);
+    return std::move(*config);
 }
 
 /// The trace goes where the command line says, at the level set in the environment.
 void setTrace(const std::string& file) {
-    if (const std::string problem = TraceControl::openFile(file); !problem.empty()) {
-        say("%s", problem.c_str());
+    if (const Result<void> opened = TraceControl::openFile(file); !opened) {
+        say("%s", opened.error().text().c_str());
         std::exit(unusableStatus);
     }
     const char* const levels = std::getenv("QFW_TRC1");
-    if (const std::string problem = TraceControl::configure(levels == nullptr ? "" : levels);
-        !problem.empty()) {
-        say("QFW_TRC1: %s; only errors are traced", problem.c_str());
+    if (const Result<void> configured = TraceControl::configure(levels == nullptr ? "" : levels);
+        !configured) {
+        say("QFW_TRC1: %s; only errors are traced", configured.error().text().c_str());
     }
 }
 

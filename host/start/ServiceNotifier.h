@@ -11,10 +11,10 @@ namespace zrm::host {
 /// Immutable; any thread.
 class ServiceNotifier {
 public:
-    /// Notifies nobody.
+    /// Sends nothing.
     ServiceNotifier() = default;
 
-    /// @param address the path of a socket, or '@' and an abstract name; empty for nobody
+    /// @param address the path of a socket, or '@' and an abstract name; empty: send nothing
     explicit ServiceNotifier(std::string address) : m_address(std::move(address)) {}
 
     /// The service manager named in the environment. Removes NOTIFY_SOCKET, so that no command run

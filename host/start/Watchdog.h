@@ -19,26 +19,26 @@ class Watchdog {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// From the beginning of an end to the end of the process, whatever does not end by itself.
+    /// From the beginning of a stop to the end of the process, even if something does not end.
     static constexpr std::chrono::milliseconds endLimit{8500};
-    /// How long a thread may stand still before it is called stuck.
+    /// How long a thread may not move before it is reported as stuck.
     static constexpr std::chrono::seconds stillLimit{10};
 
     Watchdog() = default;
     Watchdog(const Watchdog&) = delete;
     Watchdog& operator=(const Watchdog&) = delete;
 
-    /// Begins to look. `requestStop` is called at most once, on the watchdog's thread, for a signal
-    /// that nobody takes. Every signal is blocked by then. False when there is no thread for it.
+    /// Starts the thread; false if that fails. `requestStop` is called at most once, on that
+    /// thread, for a signal that nothing else handles. Every signal must be blocked by then.
     bool start(std::function<void()> requestStop);
 
-    /// The end has begun: within endLimit the process is gone. The first call counts. Any thread.
+    /// A stop has begun: the process ends within endLimit. Only the first call counts. Any thread.
     void noteStopping() noexcept;
 
-    /// What the main thread does now, for the message of a forced end; a static text. Any thread.
+    /// What the main thread is doing, for the message of a forced end; a static text. Any thread.
     void noteStage(const char* stage) noexcept { m_stage.store(stage); }
 
-    /// Who stands still, for people: without names, which not everybody may see; empty: nobody.
+    /// Which threads are stuck, as text without names, since anyone may see it; empty: none.
     std::string problem() const;
 
 private:

@@ -4,7 +4,6 @@
 #include <cstdlib>
 #include <string>
 #include <string_view>
-#include <variant>
 
 using namespace zrm::host;
 
@@ -44,16 +43,16 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string_view text(reinterpret_cast<const char*>(data), size);
     for (const char* const table : {"RMLOGENT", "RMMONLOG"}) {
         const ConditionParser parser(table);
-        const ConditionBuilder::Result result = parser.parse(text);
-        if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-            if (problem->what.empty() || problem->cure.empty()) {
+        const Result<Condition> condition = parser.parse(text);
+        if (!condition) {
+            const Problem& problem = condition.error();
+            if (problem.what.empty() || problem.cure.empty() || problem.field.empty()) {
                 std::abort();
             }
             continue;
         }
-        const Condition& condition = std::get<Condition>(result);
-        const ConditionBuilder::Result again = parser.parse(written(condition));
-        if (!std::holds_alternative<Condition>(again) || std::get<Condition>(again) != condition) {
+        const Result<Condition> again = parser.parse(written(*condition));
+        if (!again || *again != *condition) {
             std::abort();
         }
     }

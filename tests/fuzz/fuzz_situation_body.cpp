@@ -10,7 +10,6 @@
 #include <optional>
 #include <string>
 #include <string_view>
-#include <variant>
 #include <vector>
 
 #include <nlohmann/json.hpp>
@@ -82,8 +81,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         std::abort();
     }
     const ConfigFile::Result file = ConfigFile::parse(tomlOf(*situation), "zrm.toml");
-    if (!std::holds_alternative<HostConfig>(file) ||
-        std::get<HostConfig>(file).situations != std::vector{*situation}) {
+    if (!file || file->situations != std::vector{*situation}) {
         std::abort();
     }
     return 0;

@@ -181,7 +181,7 @@ def check_deliveries(path, events):
             continue
         assert event["row"]["ENTRYDESC"] == events[event["id"]]
         if event["id"] != newest + 1:
-            assert event["id"] <= newest, "an event was passed over"
+            assert event["id"] <= newest, "an event was skipped"
             times_back += 1
         newest = event["id"]
     assert newest == max(events)

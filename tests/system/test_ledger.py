@@ -52,7 +52,7 @@ def test_it_counts_what_is_read_and_says_why_lines_do_not_fit(serving):
     assert (ledger["lines"], ledger["rows"], ledger["format_errors"]) == (4, 2, 2)
     assert [(each["line"], each["reason"]) for each in ledger["rejected"]] == [
         ("none", "A number for %d is expected here."),
-        ("", "A line without text is passed over."),
+        ("", "A line without text is skipped."),
     ]
     assert ledger["rejected"][0]["time"].endswith("Z")
     assert ledger["last_entry"] >= ledger["rejected"][0]["time"][:19]

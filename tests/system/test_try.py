@@ -47,7 +47,7 @@ def test_a_line_that_does_not_fit(serving):
     (line,) = attempt(serving, format=FORMAT, lines=["2026-11-20 07:03 ERROR"])["lines"]
     assert not line["matched"] and line["row"] is None
     assert (line["failed_at"], line["directive"]) == (16, 5)
-    assert line["reason"] == 'The text ":" of the format does not stand here.'
+    assert line["reason"] == 'The text ":" of the format is expected here.'
     assert len(line["fields"]) == 5
 
 

@@ -170,7 +170,7 @@ def test_columns_or_the_place_where_a_line_stops_fitting(log):
         "       ENTRYDESC   Card declined\n"
         "    2  2026-11-20 07:03 x\n"
         "                       ^\n"
-        '       The text ":" of the format does not stand here.\n'
+        '       The text ":" of the format is expected here.\n'
         "    3  no time here\n"
         "       ^\n"
         "       A number for %d is expected here.\n"

@@ -18,8 +18,8 @@ namespace {
 
 Condition parsed(const std::string& text) {
     auto result = ConditionParser("RMLOGENT").parse(text);
-    EXPECT_TRUE(std::holds_alternative<Condition>(result)) << text;
-    return std::get<Condition>(result);
+    EXPECT_TRUE(result) << text;
+    return result.value();
 }
 
 class ConditionVerdictTest : public testing::Test {

@@ -93,7 +93,7 @@ std::string randomCondition(Random& random) {
     const ConditionParser parser("RMLOGENT");
     for (;;) {
         std::string condition = anyCondition(random);
-        if (std::holds_alternative<Condition>(parser.parse(condition))) {
+        if (parser.parse(condition)) {
             return condition;
         }
     }
@@ -137,7 +137,7 @@ SituationConfig randomSituation(Random& random, std::size_t number) {
     }
     SituationConfig config;
     for (const SituationProblem& problem : SituationValidator::check(text, config)) {
-        ADD_FAILURE() << problem.fieldText() << ": " << problem.what << "; " << problem.cure;
+        ADD_FAILURE() << problem.field << ": " << problem.text();
     }
     if (kind == 3) { // refused when somebody writes it; the agent takes it for no threshold
         config.conditions.push_back(pick(random, inertThresholds));

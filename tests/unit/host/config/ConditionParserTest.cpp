@@ -5,6 +5,8 @@
 
 #include <string>
 
+#include "support/ReasonOf.h"
+
 using namespace zrm::host;
 
 namespace {
@@ -13,17 +15,16 @@ using testing::ElementsAre;
 
 Condition parsed(const std::string& text, const char* table = "RMLOGENT") {
     const auto result = ConditionParser(table).parse(text);
-    if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-        ADD_FAILURE() << text << ": " << problem->what;
+    if (!result) {
+        ADD_FAILURE() << text << ": " << reasonOf(result);
         return {};
     }
-    return std::get<Condition>(result);
+    return *result;
 }
 
 std::string refused(const std::string& text, const char* table = "RMLOGENT") {
     const auto result = ConditionParser(table).parse(text);
-    const auto* const problem = std::get_if<ConditionProblem>(&result);
-    return problem == nullptr ? "accepted" : problem->what + "; " + problem->cure;
+    return result ? "accepted" : reasonOf(result);
 }
 
 TEST(ConditionParser, ReadsEveryOperatorOnText) {
@@ -166,10 +167,10 @@ TEST(ConditionParser, ALogBecomesItsDirectoryAndItsName) {
     const auto of = [](const std::string& path) {
         std::string text;
         const auto result = ConditionBuilder::ofLog(path);
-        if (const auto* const problem = std::get_if<ConditionProblem>(&result)) {
-            return problem->what + "; " + problem->cure;
+        if (!result) {
+            return reasonOf(result);
         }
-        for (const Condition& condition : std::get<std::vector<Condition>>(result)) {
+        for (const Condition& condition : *result) {
             EXPECT_EQ(condition.op, INTF_EQUAL);
             text += condition.column + "=" + condition.text + " ";
         }

@@ -20,17 +20,16 @@ using testing::IsEmpty;
 
 HostConfig accepted(const std::string& text) {
     ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
-        ADD_FAILURE() << problems->front();
+    if (!result) {
+        ADD_FAILURE() << result.error().front();
         return {};
     }
-    return std::get<HostConfig>(std::move(result));
+    return std::move(*result);
 }
 
 std::vector<std::string> refused(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    const auto* const problems = std::get_if<std::vector<std::string>>(&result);
-    return problems == nullptr ? std::vector<std::string>{} : *problems;
+    return result ? std::vector<std::string>{} : result.error();
 }
 
 TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
@@ -244,8 +243,8 @@ TEST(ConfigFile, ListensForOtherMachinesUnderTls) {
                                           "certificate = \"/etc/zrm/cert.pem\"\n"
                                           "key = \"/etc/zrm/key.pem\"\n",
                                           "zrm.toml");
-    ASSERT_TRUE(std::holds_alternative<HostConfig>(result));
-    const HttpConfig& http = std::get<HostConfig>(result).http;
+    ASSERT_TRUE(result);
+    const HttpConfig& http = result->http;
     EXPECT_EQ(http.listen->text(), "0.0.0.0:7186");
     EXPECT_EQ(http.certificate, "/etc/zrm/cert.pem");
     EXPECT_EQ(http.key, "/etc/zrm/key.pem");
@@ -388,8 +387,7 @@ TEST(ConfigFile, AReloadRefusesATruncatedFile) {
     const auto reloaded = [&](const std::string& text) {
         const std::string path = directory.write("zrm.toml", text);
         const ConfigFile::Result result = ConfigFile::reload(path);
-        const auto* const problems = std::get_if<std::vector<std::string>>(&result);
-        return problems == nullptr ? "" : problems->front().substr(path.size());
+        return result ? "" : result.error().front().substr(path.size());
     };
     const std::string whole = "[[situation]]\nname = 'a'\n";
     EXPECT_EQ(reloaded(whole), "");
@@ -408,8 +406,8 @@ TEST(ConfigFile, APipeIsNotRead) {
     const std::string path = directory.file("zrm.toml");
     ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
     const ConfigFile::Result result = ConfigFile::load(path);
-    ASSERT_TRUE(std::holds_alternative<std::vector<std::string>>(result));
-    EXPECT_THAT(std::get<std::vector<std::string>>(result),
+    ASSERT_FALSE(result);
+    EXPECT_THAT(result.error(),
                 ElementsAre(path + ": is not a regular file; make it a file that the agent may "
                                    "read, of at most 4 MiB"));
 }
@@ -444,15 +442,13 @@ TEST(ConfigFile, LoadsFiles) {
     const TemporaryDirectory directory;
     const std::string path = directory.write("zrm.toml", "state_directory = \"/srv\"\n");
     const ConfigFile::Result result = ConfigFile::load(path);
-    ASSERT_TRUE(std::holds_alternative<HostConfig>(result));
-    EXPECT_EQ(std::get<HostConfig>(result).stateDirectory, "/srv");
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->stateDirectory, "/srv");
 }
 
 TEST(ConfigFile, ReportsWhyAFileCannotBeRead) {
     const TemporaryDirectory directory;
-    const auto problemsOf = [](const std::string& path) {
-        return std::get<std::vector<std::string>>(ConfigFile::load(path));
-    };
+    const auto problemsOf = [](const std::string& path) { return ConfigFile::load(path).error(); };
     const std::string cure = "; make it a file that the agent may read, of at most 4 MiB";
     const std::string missing = directory.file("missing.toml");
     EXPECT_THAT(problemsOf(missing),

@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <string>
-#include <variant>
 
 #include <sys/stat.h>
 
@@ -20,7 +19,7 @@ protected:
             "zrm.toml", "[[sink]]\ntype = 'webhook'\nurl = 'http://127.0.0.1'\n" + option + '\n');
         chmod(path.c_str(), mode);
         const ConfigFile::Result result = ConfigFile::load(path);
-        return warningOfSecrets(std::get<HostConfig>(result), path);
+        return warningOfSecrets(result.value(), path);
     }
 
     TemporaryDirectory directory;

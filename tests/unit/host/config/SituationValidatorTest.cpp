@@ -25,7 +25,7 @@ std::vector<std::string> fieldsOf(const SituationText& text) {
     SituationConfig situation;
     std::vector<std::string> fields;
     for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
-        fields.push_back(problem.fieldText());
+        fields.push_back(problem.field);
     }
     return fields;
 }
@@ -122,7 +122,7 @@ TEST(SituationValidator, RegularExpressionsAreLimitedAloneAndTogether) {
         SituationConfig situation;
         std::vector<std::string> texts;
         for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
-            texts.push_back(problem.fieldText() + ": " + problem.what);
+            texts.push_back(problem.field + ": " + problem.what);
         }
         if (texts.empty()) {
             EXPECT_GT(situation.patternSize, 0u);
@@ -155,7 +155,7 @@ TEST(SituationValidator, RefusesThresholdsThatHaveNoEffect) {
         SituationConfig situation;
         std::vector<std::string> texts;
         for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
-            texts.push_back(problem.fieldText() + ": " + problem.what + "; " + problem.cure);
+            texts.push_back(problem.field + ": " + problem.text());
         }
         return texts;
     };

@@ -185,13 +185,13 @@ struct Unfit {
 
 TEST(FormatTrial, ReportsWhereALineStopsFitting) {
     const Unfit cases[] = {
-        {"%d-%d", "12 13", 2, 1, "The text \"-\" of the format does not stand here."},
+        {"%d-%d", "12 13", 2, 1, "The text \"-\" of the format is expected here."},
         {"%d-%d", "12-x", 3, 1, "A number for %d is expected here."},
         {"%d x", "word", 0, 0, "A number for %d is expected here."},
         {"%s %s", "one", 3, 1, "The line ends here; a text for %31s is expected here."},
-        {"<%d", "", 0, 0, "A line without text is passed over."},
+        {"<%d", "", 0, 0, "A line without text is skipped."},
         {"%s:%s", "one", 3, 1,
-         "The line ends here; the text \":\" of the format does not stand here."},
+         "The line ends here; the text \":\" of the format is expected here."},
         {"%[0-9]%s", "x", 0, 0, "A character of the set in %31[0-9] is expected here."},
         {"%s %(30)s", "one two", 7, 1, "The line ends before column 30, where this field begins."},
     };

@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/framework/TraceControl.h"
+#include "support/ReasonOf.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gtest/gtest.h>
@@ -104,7 +105,7 @@ private:
 TEST(TraceChild, TracesWhicheverLockAnotherThreadHeldAtTheFork) {
     constexpr int children = 100;
     TemporaryDirectory directory;
-    ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile(directory.file("trace"))), "");
     TRC1_Printf(anchor, 1, "parent %d", 0);
     {
         // Standard error's lock is held throughout.
@@ -126,7 +127,7 @@ TEST(TraceChild, TracesWhicheverLockAnotherThreadHeldAtTheFork) {
         }
         funlockfile(stderr);
     }
-    ASSERT_EQ(TraceControl::openFile(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile("")), "");
     EXPECT_EQ(
         linesIn(directory.file("trace"), std::regex("\\S+ \\S+ \\d+ TraceChildTest.cpp:\\d+ "
                                                     "(parent 0|child \\d+ of the parent: text 7)")),
@@ -135,7 +136,7 @@ TEST(TraceChild, TracesWhicheverLockAnotherThreadHeldAtTheFork) {
 
 TEST(TraceChild, LeavesAMovedFileToTheParent) {
     TemporaryDirectory directory;
-    ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile(directory.file("trace"))), "");
     TRC1_Printf(anchor, 1, "parent");
     ASSERT_EQ(std::rename(directory.file("trace").c_str(), directory.file("trace.1").c_str()), 0);
     const pid_t child = fork();
@@ -147,7 +148,7 @@ TEST(TraceChild, LeavesAMovedFileToTheParent) {
         _exit(0);
     }
     ASSERT_TRUE(ends(child));
-    ASSERT_EQ(TraceControl::openFile(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile("")), "");
     EXPECT_FALSE(std::filesystem::exists(directory.file("trace")));
     EXPECT_EQ(linesIn(directory.file("trace.1"), std::regex(".*:1 (parent|child)")), 2);
 }

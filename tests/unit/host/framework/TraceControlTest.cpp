@@ -11,23 +11,25 @@
 
 #include <malloc.h>
 
+#include "support/ReasonOf.h"
+
 using namespace zrm::host;
 
 namespace {
 
 TEST(TraceControl, ChangesTheGenerationWithTheLevels) {
     const unsigned before = TRC1_Generation;
-    ASSERT_EQ(TraceControl::configure("fine"), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("fine")), "");
     EXPECT_NE(TRC1_Generation, before);
     EXPECT_EQ(TraceControl::levelOf("Any.cpp"), 0x01u);
     TraceControl::configure("");
 }
 
 TEST(TraceControl, ABadTextChangesNothing) {
-    ASSERT_EQ(TraceControl::configure("fine"), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("fine")), "");
     const unsigned before = TRC1_Generation;
     EXPECT_EQ(
-        TraceControl::configure("fine,loud"),
+        reasonOf(TraceControl::configure("fine,loud")),
         "\"loud\" in \"loud\" is not a trace class; the classes are error, flow, detail, fine, "
         "all, none, or a number from 0 to 255");
     EXPECT_EQ(TRC1_Generation, before);
@@ -46,7 +48,7 @@ TEST(TraceControl, KeepsNoEarlierLevels) {
         for (int unit = 0; unit < 300; ++unit) {
             levels += ",unit" + std::to_string(number) + "of" + std::to_string(unit) + "=all";
         }
-        ASSERT_EQ(TraceControl::configure(levels), "");
+        ASSERT_EQ(reasonOf(TraceControl::configure(levels)), "");
         EXPECT_EQ(TraceControl::levels(), levels);
     };
     change(1000);
@@ -86,12 +88,12 @@ TEST(TraceControl, LevelsMayBeReadWhileTheyChange) {
 
 TEST(TraceControl, SkipsTheReservedGeneration) {
     TRC1_Generation = 0xffffffff;
-    ASSERT_EQ(TraceControl::configure(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("")), "");
     EXPECT_EQ(TRC1_Generation, 1u);
 }
 
 TEST(TraceControl, ReportsWhyAFileCannotBeOpened) {
-    EXPECT_EQ(TraceControl::openFile("/nonexistent/trace"),
+    EXPECT_EQ(reasonOf(TraceControl::openFile("/nonexistent/trace")),
               "cannot open /nonexistent/trace: No such file or directory");
 }
 

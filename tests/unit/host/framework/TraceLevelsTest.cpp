@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "support/ReasonOf.h"
+
 using namespace zrm::host;
 
 namespace {
@@ -9,13 +11,13 @@ namespace {
 /// The level of one unit after parsing a valid text.
 unsigned level(std::string_view text, std::string_view unit = "ValidLog.cpp") {
     TraceLevels levels;
-    EXPECT_EQ(levels.parse(text), "") << text;
+    EXPECT_EQ(reasonOf(levels.parse(text)), "") << text;
     return levels.levelOf(unit);
 }
 
 std::string wrong(std::string_view text) {
     TraceLevels levels;
-    std::string error = levels.parse(text);
+    std::string error = reasonOf(levels.parse(text));
     EXPECT_EQ(levels.levelOf("ValidLog.cpp"), 0x80u) << "the level is as before: " << text;
     return error;
 }

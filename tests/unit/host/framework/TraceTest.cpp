@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/framework/TraceControl.h"
+#include "support/ReasonOf.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -166,15 +167,15 @@ TEST(Trace, AChangedLevelAppliesFromTheNextOperation) {
         }
         return errors.takeTexts();
     };
-    ASSERT_EQ(TraceControl::configure(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("")), "");
     EXPECT_THAT(traced(), ElementsAre("error"));
-    ASSERT_EQ(TraceControl::configure("detail+fine"), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("detail+fine")), "");
     EXPECT_THAT(traced(), ElementsAre("detail", "fine"));
-    ASSERT_EQ(TraceControl::configure("none,TraceTest=flow"), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("none,TraceTest=flow")), "");
     EXPECT_THAT(traced(), ElementsAre("Entry", "Exit"));
-    ASSERT_EQ(TraceControl::configure("all,TraceTest.cpp=none"), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("all,TraceTest.cpp=none")), "");
     EXPECT_THAT(traced(), IsEmpty());
-    ASSERT_EQ(TraceControl::configure(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("")), "");
     EXPECT_THAT(traced(), ElementsAre("error"));
 }
 
@@ -203,7 +204,7 @@ TEST(Trace, NoThreadRestoresAnOlderLevel) {
     for (int next = 1; next <= rounds; ++next) {
         const unsigned level = static_cast<unsigned>(next) % 256;
         round = next;
-        ASSERT_EQ(TraceControl::configure(std::to_string(level)), "");
+        ASSERT_EQ(reasonOf(TraceControl::configure(std::to_string(level))), "");
         while (finished < next * threadCount) {
             std::this_thread::yield();
         }
@@ -216,7 +217,7 @@ TEST(Trace, NoThreadRestoresAnOlderLevel) {
         thread.join();
     }
     EXPECT_GT(latest, 0);
-    ASSERT_EQ(TraceControl::configure(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::configure("")), "");
     EXPECT_EQ(TRC1_Sync(shared), 0x80u);
     EXPECT_EQ(shared.level, 0x80u);
     EXPECT_EQ(shared.generation, TRC1_Generation.load());
@@ -253,7 +254,7 @@ TEST(Trace, IsNotACancellationPoint) {
 
 TEST(Trace, RecordsOfManyThreadsStayWhole) {
     TemporaryDirectory directory;
-    ASSERT_EQ(TraceControl::openFile(directory.file("trace")), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile(directory.file("trace"))), "");
     constexpr int threadCount = 16;
     constexpr int recordCount = 200;
     std::vector<std::thread> threads;
@@ -269,7 +270,7 @@ TEST(Trace, RecordsOfManyThreadsStayWhole) {
     for (std::thread& thread : threads) {
         thread.join();
     }
-    ASSERT_EQ(TraceControl::openFile(""), "");
+    ASSERT_EQ(reasonOf(TraceControl::openFile("")), "");
     std::ifstream file(directory.file("trace"));
     std::vector<int> next(threadCount, 0);
     int lines = 0;

@@ -10,7 +10,6 @@
 #include <deque>
 #include <string>
 #include <utility>
-#include <variant>
 #include <vector>
 
 using namespace zrm::host;
@@ -18,11 +17,11 @@ using namespace zrm::host;
 /// The sink that this text configures, placed after [[sink]].
 inline SinkConfig sinkConfig(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse("[[sink]]\n" + text, "zrm.toml");
-    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
-        ADD_FAILURE() << problems->front();
+    if (!result) {
+        ADD_FAILURE() << result.error().front();
         return {};
     }
-    return std::get<HostConfig>(result).sinks.front();
+    return result->sinks.front();
 }
 
 /// Events of the Log Entries table as records, one second after the other.

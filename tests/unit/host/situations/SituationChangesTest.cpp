@@ -43,11 +43,11 @@ SituationConfig situation(const std::string& name, std::vector<std::string> when
 }
 
 const SituationStatus& done(const SituationSet::Change& change) {
-    return std::get<SituationStatus>(change);
+    return change.value();
 }
 
 SituationRefusal::Reason refused(const SituationSet::Change& change) {
-    return std::get<SituationRefusal>(change).reason;
+    return change.error().reason;
 }
 
 class SituationChanges : public testing::Test {
@@ -99,7 +99,7 @@ TEST_F(SituationChanges, TakeEffectBeforeTheCallReturns) {
     EXPECT_THAT(raisedBy("y"), IsEmpty());
     EXPECT_EQ(done(set->start("a")).state, SituationStatus::RUNNING);
     EXPECT_THAT(raisedBy("y"), ElementsAre("a"));
-    EXPECT_FALSE(set->remove("a"));
+    EXPECT_TRUE(set->remove("a"));
     EXPECT_THAT(raisedBy("y"), IsEmpty());
     EXPECT_FALSE(set->find("a"));
 }
@@ -114,7 +114,7 @@ TEST_F(SituationChanges, LimitTheirRegularExpressionsTogether) {
     EXPECT_EQ(done(set->add(situation("b"))).state, SituationStatus::RUNNING);
     EXPECT_EQ(refused(set->replace(large)), SituationRefusal::TOO_MANY);
     EXPECT_EQ(set->find("b")->config.patternSize, 0u);
-    EXPECT_FALSE(set->remove("a"));
+    EXPECT_TRUE(set->remove("a"));
     EXPECT_EQ(done(set->replace(large)).state, SituationStatus::RUNNING);
 }
 
@@ -196,8 +196,8 @@ TEST_F(SituationChanges, AreRefusedWithTheReason) {
     EXPECT_EQ(refused(set->add(situation("filed"))), SituationRefusal::EXISTS);
     EXPECT_EQ(refused(set->replace(situation("filed"))), SituationRefusal::FROM_FILE);
     EXPECT_EQ(refused(set->replace(situation("none"))), SituationRefusal::UNKNOWN);
-    EXPECT_EQ(set->remove("filed")->reason, SituationRefusal::FROM_FILE);
-    EXPECT_EQ(set->remove("none")->reason, SituationRefusal::UNKNOWN);
+    EXPECT_EQ(set->remove("filed").error().reason, SituationRefusal::FROM_FILE);
+    EXPECT_EQ(set->remove("none").error().reason, SituationRefusal::UNKNOWN);
     EXPECT_EQ(refused(set->start("none")), SituationRefusal::UNKNOWN);
     EXPECT_EQ(refused(set->stop("none")), SituationRefusal::UNKNOWN);
     EXPECT_THAT(names(), ElementsAre("filed", "a"));
@@ -208,16 +208,18 @@ TEST_F(SituationChanges, AreNotMadeWhenTheyCannotBeSaved) {
     const auto refusedForDisk = [&](auto change) {
         const Fault fault("write", ENOSPC);
         const SituationSet::Change result = change();
-        return std::get<SituationRefusal>(result);
+        return result.error();
     };
     for (const SituationRefusal& refusal :
          {refusedForDisk([&] { return set->add(situation("b")); }),
           refusedForDisk([&] { return set->replace(situation("a", {"ENTRYSRC = 'y'"})); }),
           refusedForDisk([&] { return set->stop("a"); }),
-          refusedForDisk([&]() -> SituationSet::Change { return *set->remove("a"); })}) {
+          refusedForDisk([&]() -> SituationSet::Change {
+              return tl::unexpected(set->remove("a").error());
+          })}) {
         EXPECT_EQ(refusal.reason, SituationRefusal::NOT_SAVED);
-        EXPECT_THAT(refusal.detail, HasSubstr("was not made: cannot write "));
-        EXPECT_THAT(refusal.detail, HasSubstr("No space left on device"));
+        EXPECT_THAT(refusal.problem.what, HasSubstr("was not made: cannot write "));
+        EXPECT_THAT(refusal.problem.what, HasSubstr("No space left on device"));
     }
     EXPECT_THAT(names(), ElementsAre("a"));
     EXPECT_THAT(raisedBy("x"), ElementsAre("a"));
@@ -280,10 +282,10 @@ TEST_F(SituationChanges, TheirNumberIsLimited) {
     set->apply({situation("filed")});
     const SituationSet::Change change = set->add(situation("a"));
     EXPECT_EQ(refused(change), SituationRefusal::TOO_MANY);
-    EXPECT_EQ(std::get<SituationRefusal>(change).detail,
+    EXPECT_EQ(change.error().problem.what,
               "there are 1000 situations created through the API: remove one first");
-    EXPECT_FALSE(set->remove("s0"));
-    EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(situation("a"))));
+    EXPECT_TRUE(set->remove("s0"));
+    EXPECT_TRUE(set->add(situation("a")));
 }
 
 TEST_F(SituationChanges, WhatRunsIsWhatIsSavedHoweverReloadsAndChangesInterleave) {
@@ -352,10 +354,10 @@ TEST_F(SituationChanges, MayComeFromManyThreadsWhileEntriesArrive) {
         changers.emplace_back([&, name = "s" + std::to_string(number)] {
             for (int round = 0; round < 10; ++round) {
                 const SituationConfig config = situation(name, {"ENTRYSRC = 'never'"});
-                EXPECT_TRUE(std::holds_alternative<SituationStatus>(set->add(config)));
+                EXPECT_TRUE(set->add(config));
                 EXPECT_EQ(done(set->stop(name)).state, SituationStatus::STOPPED);
                 EXPECT_EQ(done(set->start(name)).state, SituationStatus::RUNNING);
-                EXPECT_FALSE(set->remove(name));
+                EXPECT_TRUE(set->remove(name));
             }
         });
     }

@@ -2,6 +2,7 @@
 
 #include "host/config/SituationValidator.h"
 #include "support/Faults.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
@@ -57,6 +58,14 @@ protected:
         return names;
     }
 
+    /// Reads the file; what is said about it is in `message`.
+    SituationStore::Content load(SituationStore&& store) { return load(store); }
+    SituationStore::Content load(SituationStore& store) {
+        SituationStore::Content content = store.load();
+        message = content.message;
+        return content;
+    }
+
     RecordingTrace trace{TRC1_ERROR};
     TemporaryDirectory directory;
     const std::string file = directory.file("situations.json");
@@ -65,8 +74,8 @@ protected:
 };
 
 TEST_F(SituationStoreTest, LoadsWhatWasSaved) {
-    EXPECT_EQ(store.save(content()), "");
-    const SituationStore::Content loaded = SituationStore(file).load(message);
+    EXPECT_EQ(reasonOf(store.save(content())), "");
+    const SituationStore::Content loaded = load(SituationStore(file));
     EXPECT_EQ(message, "");
     ASSERT_EQ(loaded.made.size(), 2u);
     EXPECT_EQ(loaded.made[0].config, situation("a"));
@@ -89,59 +98,59 @@ TEST_F(SituationStoreTest, AFileOfAnyDepthIsMovedAside) {
           "{\"version\": 1, \"situations\": " + nested + ", \"stopped\": []}", nested}) {
         std::ofstream(file) << content;
         message.clear();
-        EXPECT_THAT(SituationStore(file).load(message).made, IsEmpty());
+        EXPECT_THAT(load(SituationStore(file)).made, IsEmpty());
         EXPECT_THAT(message, HasSubstr(file + " cannot be used (it is nested too deeply)"));
     }
 }
 
 TEST_F(SituationStoreTest, DoesNotWaitForAPipeInItsPlace) {
     ASSERT_EQ(mkfifo(file.c_str(), 0600), 0);
-    EXPECT_THAT(store.load(message).made, IsEmpty());
+    EXPECT_THAT(load(store).made, IsEmpty());
     EXPECT_THAT(message, HasSubstr("cannot be used"));
 }
 
 TEST_F(SituationStoreTest, TooLargeRegularExpressionsAreKeptAndDoNotRun) {
-    ASSERT_EQ(store.save(content()), "");
+    ASSERT_EQ(reasonOf(store.save(content())), "");
     std::string stored = text();
     const std::string small = R"([\"\\\\])";
     for (std::size_t at = 0; (at = stored.find(small, at)) != std::string::npos;) {
         stored.replace(at, small.size(), R"(\\pL{400})");
     }
     std::ofstream(file) << stored;
-    const SituationStore::Content loaded = SituationStore(file).load(message);
+    const SituationStore::Content loaded = load(SituationStore(file));
     ASSERT_EQ(loaded.made.size(), 2u);
     EXPECT_THAT(loaded.made[0].problem, HasSubstr("'\\pL{400}' is too large a regular expression"));
     EXPECT_EQ(loaded.made[0].config.when.at(1), "ENTRYDESC matches '\\pL{400}'");
 }
 
 TEST_F(SituationStoreTest, IsEmptyWithoutAFile) {
-    EXPECT_THAT(store.load(message).made, IsEmpty());
+    EXPECT_THAT(load(store).made, IsEmpty());
     EXPECT_EQ(message, "");
     EXPECT_THAT(names(), IsEmpty());
 }
 
 TEST_F(SituationStoreTest, SavesNothingWithoutAPath) {
     SituationStore nothing("");
-    EXPECT_EQ(nothing.save(content()), "");
-    EXPECT_THAT(nothing.load(message).made, IsEmpty());
+    EXPECT_EQ(reasonOf(nothing.save(content())), "");
+    EXPECT_THAT(load(nothing).made, IsEmpty());
 }
 
 TEST_F(SituationStoreTest, CreatesItsDirectory) {
     SituationStore deeper(directory.file("state") + "/situations.json");
-    EXPECT_EQ(deeper.save(content()), "");
-    EXPECT_EQ(deeper.load(message).made.size(), 2u);
+    EXPECT_EQ(reasonOf(deeper.save(content())), "");
+    EXPECT_EQ(load(deeper).made.size(), 2u);
     SituationStore tooDeep(directory.file("no") + "/such/situations.json");
-    EXPECT_THAT(tooDeep.save(content()),
+    EXPECT_THAT(reasonOf(tooDeep.save(content())),
                 HasSubstr("cannot create the directory " + directory.file("no") + "/such: "));
 }
 
 TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
-    ASSERT_EQ(store.save(content()), "");
+    ASSERT_EQ(reasonOf(store.save(content())), "");
     const std::string before = text();
     for (const char* const call : {"open", "write", "close"}) {
         trace.clear();
         const Fault fault(call, ENOSPC);
-        const std::string problem = store.save({});
+        const std::string problem = reasonOf(store.save({}));
         EXPECT_EQ(fault.failed(), 1) << call;
         EXPECT_THAT(problem, EndsWith(": No space left on device")) << call;
         EXPECT_THAT(trace.messages(),
@@ -149,7 +158,7 @@ TEST_F(SituationStoreTest, AFailedSaveLeavesTheFileAsItWas) {
         EXPECT_EQ(text(), before) << call;
         EXPECT_THAT(names(), ElementsAre("situations.json")) << call;
     }
-    EXPECT_EQ(store.save({}), "");
+    EXPECT_EQ(reasonOf(store.save({})), "");
     EXPECT_NE(text(), before);
 }
 
@@ -157,14 +166,14 @@ TEST_F(SituationStoreTest, WritesNeitherToALinkNorToAPipeInItsPlace) {
     const std::string target = directory.write("target", "other");
     for (const std::string& place : {file, file + ".new"}) {
         std::filesystem::create_symlink(target, place);
-        EXPECT_EQ(store.save(content()), "") << place;
+        EXPECT_EQ(reasonOf(store.save(content())), "") << place;
         EXPECT_THAT(names(), testing::UnorderedElementsAre("situations.json", "target")) << place;
         EXPECT_FALSE(std::filesystem::is_symlink(file));
         std::filesystem::remove(file);
     }
     EXPECT_EQ(std::filesystem::file_size(target), 5u);
     ASSERT_EQ(mkfifo((file + ".new").c_str(), 0600), 0); // opening it would wait for a reader
-    EXPECT_EQ(store.save(content()), "");
+    EXPECT_EQ(reasonOf(store.save(content())), "");
     EXPECT_TRUE(std::filesystem::is_regular_file(file));
 }
 
@@ -172,7 +181,7 @@ TEST_F(SituationStoreTest, ReportsThatTheFileCannotBeReplaced) {
     std::filesystem::create_directory(file);
     directory.write("situations.json/inside", "x");
     SituationStore fresh(file);
-    EXPECT_THAT(fresh.save(content()), HasSubstr("cannot replace " + file + ": "));
+    EXPECT_THAT(reasonOf(fresh.save(content())), HasSubstr("cannot replace " + file + ": "));
     EXPECT_THAT(names(), ElementsAre("situations.json"));
 }
 
@@ -197,36 +206,36 @@ TEST_F(SituationStoreTest, MovesAnUnusableFileAside) {
         }
         directory.write("situations.json", written);
         SituationStore fresh(file);
-        EXPECT_THAT(fresh.load(message).made, IsEmpty()) << written;
+        EXPECT_THAT(load(fresh).made, IsEmpty()) << written;
         EXPECT_THAT(message, HasSubstr(file + " cannot be used (" + reason + ") and was moved to " +
                                        file + ".bad-"))
             << written;
         ASSERT_EQ(names().size(), 1u);
         EXPECT_THAT(names()[0], HasSubstr("situations.json.bad-"));
-        EXPECT_EQ(fresh.save(content()), "") << "a new file is created";
+        EXPECT_EQ(reasonOf(fresh.save(content())), "") << "a new file is created";
     }
 }
 
 TEST_F(SituationStoreTest, DoesNotOverwriteWhatItCouldNotRead) {
-    ASSERT_EQ(store.save(content()), "");
+    ASSERT_EQ(reasonOf(store.save(content())), "");
     const std::string before = text();
     SituationStore fresh(file);
     {
         const Fault fault("open", EACCES);
-        fresh.load(message);
+        load(fresh);
     }
     EXPECT_EQ(message, "cannot read " + file +
                            ": Permission denied; situations cannot be changed through the API "
                            "until the next start");
-    EXPECT_EQ(fresh.save({}), "cannot read " + file + ": Permission denied");
+    EXPECT_EQ(reasonOf(fresh.save({})), "cannot read " + file + ": Permission denied");
     EXPECT_EQ(text(), before);
     SituationStore torn(file);
     {
         const Fault fault("read", EIO);
-        torn.load(message);
+        load(torn);
     }
     EXPECT_THAT(message, HasSubstr("cannot read " + file));
-    EXPECT_NE(torn.save({}), "");
+    EXPECT_NE(reasonOf(torn.save({})), "");
     EXPECT_EQ(text(), before);
 }
 
@@ -234,7 +243,7 @@ TEST_F(SituationStoreTest, ReportsWhyASituationCannotRun) {
     directory.write("situations.json",
                     R"({"version":1,"situations":[{"name":"a","when":["GONE = 'x'"],)"
                     R"("frequency":">= 5","stopped":true}],"stopped":[]})");
-    const auto loaded = store.load(message);
+    const auto loaded = load(store);
     EXPECT_EQ(message, "");
     ASSERT_EQ(loaded.made.size(), 1u);
     EXPECT_EQ(loaded.made[0].config.name, "a");
