@@ -17,17 +17,16 @@ using testing::IsEmpty;
 
 std::vector<LogConfig> accepted(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    if (const auto* const problems = std::get_if<std::vector<std::string>>(&result)) {
-        ADD_FAILURE() << problems->front();
+    if (!result) {
+        ADD_FAILURE() << result.error().front();
         return {};
     }
-    return std::get<HostConfig>(result).logs;
+    return result->logs;
 }
 
 std::vector<std::string> refused(const std::string& text) {
     const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    const auto* const problems = std::get_if<std::vector<std::string>>(&result);
-    return problems == nullptr ? std::vector<std::string>{} : *problems;
+    return result ? std::vector<std::string>{} : result.error();
 }
 
 TEST(LogReader, APathAloneIsASyslogFileFollowedByName) {
