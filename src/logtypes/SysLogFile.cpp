@@ -171,6 +171,9 @@ void SysLogFile::processLogData() {
 long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     TraceScope trace(anchor);
     auto& entry = *static_cast<zrm_rmlogent_data_t*>(row);
+    if (followSettings() != nullptr) {
+        return trace.result(formatFollowedEntry(line, entry, reportState));
+    }
     char* const columns = static_cast<char*>(row); // host and source may overrun their columns
     const char* const limit = columns + sizeof entry;
     prepareRow(&entry);
@@ -201,6 +204,9 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
 
 char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     TraceScope trace(anchor);
+    if (followSettings() != nullptr) {
+        return trace.result(formatFollowedTime(out, line, reportState));
+    }
     char now[stampLength];
     BrevanTime::generateCurrentTimestamp(now); // monitoring uses its year
     // A time cut off by the end of the line is not a time. The newline is not its last digit.

@@ -6,9 +6,11 @@
 namespace zrm {
 
 struct SyslogBufferInfo;
+struct SyslogTime;
 
 /// A file written by the system logger: lines with month, day, time, host, source and message, in
-/// this order and without a year. Monitoring starts on construction. Threads as in LogFile.
+/// this order and without a year. A log that is followed may have other forms of lines
+/// (SyslogForms) as well. Monitoring starts on construction. Threads as in LogFile.
 class SysLogFile : public LogFile {
 public:
     SysLogFile(const ValidLog& log, LogFile* chainHead);
@@ -42,6 +44,11 @@ protected:
     void deallocateReportBuffers(SyslogBufferInfo** reportState);
 
 private:
+    // For a log that is followed.
+    char* formatFollowedTime(char* out, char* line, void* reportState) const;
+    void writeFollowedTime(char* out, const SyslogTime& time, void* reportState) const;
+    long formatFollowedEntry(char* line, zrm_rmlogent_data_t& entry, void* reportState);
+
     char* previousLine(SyslogBufferInfo& state);
     bool cutLongLine(SyslogBufferInfo& state);
     bool refill(SyslogBufferInfo& state);
