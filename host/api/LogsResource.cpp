@@ -12,6 +12,8 @@
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
+#include "host/sources/FoundLogsJson.h"
+#include "host/sources/LogList.h"
 
 #include <chrono>
 #include <optional>
@@ -19,6 +21,8 @@
 #include <utility>
 #include <variant>
 #include <vector>
+
+#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
@@ -52,6 +56,12 @@ std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::strin
         }
     }
     return "null";
+}
+
+/// What the [[log]] tables match.
+std::string tables() {
+    using Json = nlohmann::ordered_json;
+    return foundLogsJson(*LogList::found()).dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
 /// The configured but unmonitored logs: all, or the one with this path.
@@ -96,7 +106,7 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
     }
     return HttpAnswer::json(
         text + "],\"configuration\":" + UnmonitoredLogs::configurationJson(configured) +
-        ",\"time\":\"" + now() + "\"}");
+        ",\"tables\":" + (log ? "[]" : tables()) + ",\"time\":\"" + now() + "\"}");
 }
 
 void LogsResource::addRoutes(Router& router) {
