@@ -12,12 +12,16 @@
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
+#include "host/sources/FoundLogsJson.h"
+#include "host/sources/LogList.h"
 
 #include <chrono>
 #include <optional>
 #include <string>
 #include <utility>
 #include <vector>
+
+#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
@@ -51,6 +55,12 @@ std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::strin
         }
     }
     return "null";
+}
+
+/// What the [[log]] tables match.
+std::string tables() {
+    using Json = nlohmann::ordered_json;
+    return foundLogsJson(*LogList::found()).dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
 /// The configured but unmonitored logs: all, or the one with this path.
@@ -95,7 +105,7 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
     }
     return HttpAnswer::json(
         text + "],\"configuration\":" + UnmonitoredLogs::configurationJson(configured) +
-        ",\"time\":\"" + now() + "\"}");
+        ",\"tables\":" + (log ? "[]" : tables()) + ",\"time\":\"" + now() + "\"}");
 }
 
 void LogsResource::addRoutes(Router& router) {

@@ -5,7 +5,9 @@
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/OwnFiles.h"
 #include "host/diagnose/ConfigCheck.h"
+#include "host/sources/FoundLogsJson.h"
 
 #include <algorithm>
 #include <variant>
@@ -13,6 +15,7 @@
 
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
+#include <unistd.h>
 
 namespace zrm::host {
 
@@ -56,6 +59,36 @@ void noteUnfinished(const std::string& content, const std::string& path) {
         Context::note(path + " has no newline after its last line: a running agent does not load "
                              "it; add the newline");
     }
+}
+
+/// What the [[log]] tables match on this machine now.
+FoundLogs find(const HostConfig& config) {
+    return LogFinder().look(config.logs, ownFilesOf(config), LogFinder::Clock::now());
+}
+
+/// A table of the configuration: its files and what is passed over.
+std::string textOf(const FoundLogs::Source& source, const Terminal& terminal) {
+    std::string text = "[[log]] at line " + std::to_string(source.line) + ": " +
+                       std::to_string(source.files.size()) +
+                       (source.files.size() == 1 ? " file\n" : " files\n");
+    for (const std::string& file : source.files) {
+        const bool isThere = ::access(file.c_str(), F_OK) == 0;
+        text += "  " + DisplayText::visible(file) +
+                (isThere ? "" : terminal.coloured("  (does not exist yet)", Colour::NOTICE)) + '\n';
+    }
+    for (const FoundLogs::PassedOver& one : source.passedOver) {
+        text += "  " + terminal.coloured("passed over", Colour::NOTICE) + "  " +
+                DisplayText::visible(one.file) + ": " + DisplayText::visible(one.reason) + ".\n";
+    }
+    if (source.passedOverCount > source.passedOver.size()) {
+        text += "  and " + std::to_string(source.passedOverCount - source.passedOver.size()) +
+                " more are passed over\n";
+    }
+    if (!source.problem.empty()) {
+        text += "  " + terminal.coloured(DisplayText::visible(source.problem) + '.', Colour::BAD) +
+                '\n';
+    }
+    return text;
 }
 
 } // namespace
@@ -107,9 +140,17 @@ int CheckCommand::checkHost(Context& context) const {
     const ConfigFile::Result result = ConfigFile::parse(content, m_host);
     const std::vector<std::string> problems = result ? std::vector<std::string>() : result.error();
     if (context.options().json) {
-        context.printJson({{"accepted", problems.empty()}, {"problems", problems}});
+        Json answer{{"accepted", problems.empty()}, {"problems", problems}};
+        if (result && !result->logs.empty()) {
+            answer["logs"] = foundLogsJson(find(*result));
+        }
+        context.printJson(answer);
     } else if (problems.empty()) {
-        context.print(DisplayText::visible(m_host) + " can be used\n");
+        std::string text = DisplayText::visible(m_host) + " can be used\n";
+        for (const FoundLogs::Source& source : find(*result).sources) {
+            text += textOf(source, context.terminal());
+        }
+        context.print(text);
         noteUnfinished(content, m_host);
         if (const std::string warning = warningOfSecrets(*result, m_host); !warning.empty()) {
             Context::note(warning);

@@ -123,6 +123,23 @@ void noteConfiguration(const Json& answer) {
     }
 }
 
+/// Says which [[log]] tables match nothing, or not everything that they could.
+void noteTables(const Json& answer) {
+    for (const Json& table : JsonText::member(answer, "tables")) {
+        const std::string name = "[[log]] at line " + JsonText::text(table, "line");
+        if (const std::string problem = JsonText::text(table, "problem"); !problem.empty()) {
+            Context::note(name + ": " + problem);
+        }
+        if (JsonText::member(table, "files").empty()) {
+            Context::note(name + " matches no file that can be followed");
+        }
+        for (const Json& one : JsonText::member(table, "passed_over")) {
+            Context::note(name + " passes over " + JsonText::text(one, "file") + ": " +
+                          JsonText::text(one, "reason"));
+        }
+    }
+}
+
 /// Whether the agent reads the log, and the log has a file and no warnings.
 bool isMonitored(const Json& log) {
     const Json& ledger = JsonText::member(log, "ledger");
@@ -206,6 +223,7 @@ int LogsCommand::list(Context& context) {
                    TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE"))});
     }
     noteConfiguration(answer);
+    noteTables(answer);
     noteWarnings(answer);
     const std::string unmonitored = unmonitoredText(answer, context.terminal());
     if (table.empty()) {

@@ -231,7 +231,7 @@ void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
         return;
     }
     TraceCapture errors;
-    const StringParser parser(log.format.c_str(), UserLogFile::fields());
+    const StringParser parser(log.format.c_str(), UserLogFile::followedFields());
     if (parser.status() != OBJECT_FORMAT_LEARNED) {
         std::string why = errors.take();
         why.erase(why.find_last_not_of(" .") + 1);

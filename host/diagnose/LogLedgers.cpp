@@ -44,6 +44,7 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.file = log.fileNameLocal();
     view.type = log.type();
     view.procedure = log.procedure();
+    view.isFollowed = log.followSettings() != nullptr;
     view.openFile = ledger.file();
     view.bytesRead = ledger.bytesRead();
     // A line is counted before it is found not to fit: in this order there are never more of these.

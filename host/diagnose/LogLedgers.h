@@ -13,7 +13,7 @@ namespace zrm::host {
 
 /// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
-    std::string kind;   ///< missing, replaced, without_time or not_records
+    std::string kind;   ///< missing, replaced, named_twice, without_time or not_records
     std::int64_t since; ///< when it was first seen
     std::string text;   ///< what is wrong and how to fix it, in sentences
 };
@@ -41,7 +41,8 @@ struct LogLedgerView {
     std::string file;                     ///< the same in the process's code page
     std::optional<FileIdentity> openFile; ///< the file that the monitor currently reads
     char type = 'S';
-    std::string procedure; ///< a user log's format
+    std::string procedure;   ///< a user log's format
+    bool isFollowed = false; ///< of a [[log]] table
     std::int64_t bytesRead = 0;
     std::int64_t lines = 0;
     std::int64_t rows = 0;

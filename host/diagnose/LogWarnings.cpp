@@ -5,6 +5,7 @@
 #include "host/diagnose/LastLines.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "host/framework/TraceCapture.h"
+#include "logs/FurtherLogs.h"
 #include "logs/ValidLog.h"
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/SysLogFile.h"
@@ -71,6 +72,14 @@ std::optional<LogWarning> ofName(const LogLedgerView& log) {
                           std::string(cure)};
 }
 
+/// Whether a log of the log configuration is also in the list of logs to follow.
+bool isNamedTwice(const LogLedgerView& log) {
+    const std::shared_ptr<const FurtherLogs::List> further = FurtherLogs::published();
+    return !log.isFollowed && further != nullptr &&
+           std::any_of(further->begin(), further->end(),
+                       [&log](const FurtherLog& one) { return one.name == log.log; });
+}
+
 bool isText(const char* text, std::size_t size) {
     return std::all_of(text, text + strnlen(text, size), [](char character) {
         const auto code = static_cast<unsigned char>(character);
@@ -92,15 +101,24 @@ bool isPlausible(const AdminLogFile::utmp& record, std::time_t now) {
 std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
     TraceScope trace(anchor);
     std::vector<LogWarning> warnings;
-    if (std::optional<LogWarning> warning = ofName(log)) {
+    if (isNamedTwice(log)) {
+        warnings.push_back({"named_twice", 0,
+                            "The log configuration and a [[log]] table both name this file; the "
+                            "line of the log configuration applies. Remove one of them."});
+    }
+    if (std::optional<LogWarning> warning = log.isFollowed ? std::nullopt : ofName(log)) {
         warnings.push_back(std::move(*warning));
     }
     if (log.type == 'S' && log.withoutTime > 0 && log.withoutTime * 2 > log.rows) {
-        warnings.push_back({"without_time", 0,
-                            std::to_string(log.withoutTime) + " of " + std::to_string(log.rows) +
-                                " entries have no time: their lines do not begin like \"Oct  5 "
-                                "07:03:09\". " +
-                                syslogCure});
+        warnings.push_back(
+            {"without_time", 0,
+             std::to_string(log.withoutTime) + " of " + std::to_string(log.rows) +
+                 (log.isFollowed ? std::string(" entries have no time: their lines are in no "
+                                               "form that system loggers write. Describe the "
+                                               "file as a text log with a format.")
+                                 : " entries have no time: their lines do not begin like \"Oct "
+                                   " 5 07:03:09\". " +
+                                       std::string(syslogCure))});
     }
     if (log.type == 'A') {
         if (std::string text = ofAccountingFile(log.file, log.openFile); !text.empty()) {

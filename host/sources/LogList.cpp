@@ -18,6 +18,22 @@ bool isSame(const FurtherLog& a, const FurtherLog& b) {
            a.procedure == b.procedure && *a.settings == *b.settings;
 }
 
+struct Latest {
+    std::mutex mutex; ///< guards what was found
+    std::shared_ptr<const FoundLogs> found = std::make_shared<const FoundLogs>();
+};
+
+/// Never destroyed: threads that outlive main may use it.
+Latest& latest() {
+    static auto* const theLatest = new Latest;
+    return *theLatest;
+}
+
+std::shared_ptr<const FoundLogs> exchange(std::shared_ptr<const FoundLogs> found) {
+    const std::lock_guard guard(latest().mutex);
+    return std::exchange(latest().found, std::move(found));
+}
+
 void publish(const FoundLogs& found) {
     FurtherLogs::publish(std::make_shared<const FurtherLogs::List>(found.logs));
 }
@@ -32,7 +48,6 @@ struct LogList::Shared {
     bool isUsed = false;  ///< there are tables, or were since the start
     std::vector<LogConfig> logs;
     OwnFiles ownFiles;
-    std::shared_ptr<const FoundLogs> found = std::make_shared<const FoundLogs>();
 
     LogFinder finder; ///< used by the thread, and before it starts
     std::function<void()> announce;
@@ -57,7 +72,7 @@ void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
     m_shared->isAsked = false;
     auto found = std::make_shared<const FoundLogs>(
         m_shared->finder.look(m_shared->logs, m_shared->ownFiles, LogFinder::Clock::now()));
-    m_shared->found = found;
+    exchange(found);
     publish(*found);
 }
 
@@ -79,9 +94,9 @@ void LogList::apply(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
     m_shared->changed.notify_all();
 }
 
-std::shared_ptr<const FoundLogs> LogList::found() const {
-    const std::lock_guard guard(m_shared->mutex);
-    return m_shared->found;
+std::shared_ptr<const FoundLogs> LogList::found() {
+    const std::lock_guard guard(latest().mutex);
+    return latest().found;
 }
 
 void LogList::run(const std::shared_ptr<Shared>& shared) {
@@ -105,7 +120,7 @@ void LogList::run(const std::shared_ptr<Shared>& shared) {
         if (shared->isEnded) {
             return;
         }
-        const auto before = std::exchange(shared->found, found);
+        const auto before = exchange(found);
         const bool isPublished = FurtherLogs::published() != nullptr;
         lock.unlock();
         if (!isPublished || !std::equal(before->logs.begin(), before->logs.end(),

@@ -37,8 +37,8 @@ public:
     /// Takes the tables of a changed configuration. The thread looks soon.
     void apply(const std::vector<LogConfig>& logs, OwnFiles ownFiles);
 
-    /// What the last look found. Never null. Any thread.
-    std::shared_ptr<const FoundLogs> found() const;
+    /// What this process's list found when it last looked. Never null. Any thread.
+    static std::shared_ptr<const FoundLogs> found();
 
 private:
     struct Shared;

@@ -5,7 +5,8 @@ namespace zrm {
 
 /// The texts of one entry's time fields, terminated. A field missing from the entry is empty.
 struct _EntryTimeBuffers {
-    static constexpr int room = 7; ///< characters per field
+    static constexpr int room = 7;      ///< characters per field
+    static constexpr int zoneRoom = 31; ///< of the zone, which may follow a fraction of a second
 
     char year[room + 1];
     char month[room + 1];
@@ -13,6 +14,7 @@ struct _EntryTimeBuffers {
     char hour[room + 1];
     char minute[room + 1];
     char second[room + 1];
+    char zone[zoneRoom + 1] = {}; ///< only of a log that is followed
 };
 
 /// The known parts of a user log entry's time.

@@ -171,6 +171,9 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
     TraceScope trace(anchor);
     EntryRow entryRow(*this, row);
     auto& entry = entryRow.columns();
+    if (followSettings() != nullptr) {
+        return trace.result(formatFollowedEntry(line, entryRow, reportState));
+    }
     char* const columns = static_cast<char*>(row); // host and source may overrun their columns
     const char* const limit = columns + sizeof entry;
     char* text = formatEntryTime(entry.entrytime, line, reportState);
@@ -200,6 +203,9 @@ long SysLogFile::formatEntryAsRow(char* line, void* row, void* reportState) {
 
 char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     TraceScope trace(anchor);
+    if (followSettings() != nullptr) {
+        return trace.result(formatFollowedTime(out, line, reportState));
+    }
     char now[stampLength];
     BrevanTime::generateCurrentTimestamp(now); // monitoring uses its year
     // A time cut off by the end of the line is not a time. The newline is not its last digit.

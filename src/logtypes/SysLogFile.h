@@ -7,6 +7,8 @@
 
 namespace zrm {
 
+struct SyslogTime;
+
 /// The state of one report on a syslog file.
 struct SyslogBufferInfo : _LogBufferInfo {
     /// ENTRYTIME of the last formatted entry, initially the time at which the report started.
@@ -16,7 +18,8 @@ struct SyslogBufferInfo : _LogBufferInfo {
 };
 
 /// A file written by the system logger: lines with month, day, time, host, source and message, in
-/// this order and without a year. Monitoring starts on construction. Threads as in LogFile.
+/// this order and without a year. A log that is followed may have other forms of lines
+/// (SyslogForms) as well. Monitoring starts on construction. Threads as in LogFile.
 class SysLogFile : public LogFile {
 public:
     SysLogFile(const ValidLog& log, LogFile* chainHead);
@@ -50,6 +53,11 @@ protected:
     void deallocateReportBuffers(SyslogBufferInfo** reportState);
 
 private:
+    // For a log that is followed.
+    char* formatFollowedTime(char* out, char* line, void* reportState) const;
+    void writeFollowedTime(char* out, const SyslogTime& time, void* reportState) const;
+    long formatFollowedEntry(char* line, EntryRow& row, void* reportState);
+
     char* previousLine(SyslogBufferInfo& state);
     bool cutLongLine(SyslogBufferInfo& state);
     bool refill(SyslogBufferInfo& state);

@@ -87,6 +87,9 @@ void* SysLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds
         char time[stampLength];
         std::memset(time, ' ', stampLength);
         formatEntryTime(time, line, reportState);
+        if (followSettings() != nullptr && time[0] == ' ') {
+            continue; // such a line does not end the report of a log that is followed
+        }
         if (std::memcmp(time, window.endTime, stampLength) > 0) {
             continue;
         }

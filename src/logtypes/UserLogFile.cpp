@@ -27,6 +27,12 @@ constexpr _KeywordFields validFields[] = {
     {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2}, {"description", 2}, {nullptr, 0},
 };
 
+constexpr _KeywordFields validFollowedFields[] = {
+    {"year", 2},        {"month", 2},  {"day", 2},    {"hour", 2}, {"minute", 2},
+    {"second", 2},      {"system", 2}, {"source", 2}, {"type", 2}, {"class", 2},
+    {"description", 2}, {"zone", 2},   {nullptr, 0},
+};
+
 } // namespace
 
 UserLogFile::UserLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
@@ -73,6 +79,10 @@ const _KeywordFields* UserLogFile::fields() noexcept {
     return validFields;
 }
 
+const _KeywordFields* UserLogFile::followedFields() noexcept {
+    return validFollowedFields;
+}
+
 bool UserLogFile::hasFormat() const {
     const LockGuard guard(&m_chainLock);
     return SPAnchor != nullptr;
@@ -80,7 +90,8 @@ bool UserLogFile::hasFormat() const {
 
 void UserLogFile::learnFormat() {
     TraceScope trace(anchor);
-    std::unique_ptr<StringParser> format(new (std::nothrow) StringParser(procedure(), validFields));
+    std::unique_ptr<StringParser> format(new (std::nothrow) StringParser(
+        procedure(), followSettings() != nullptr ? validFollowedFields : validFields));
     if (!format) {
         const ErrorText error(errno);
         trace.error()("Error: memory allocation failed for %d bytes; monitoring not started for "
@@ -118,8 +129,9 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
         {columns->entrytype, sizeof columns->entrytype},
         {columns->entryclass, sizeof columns->entryclass},
         {columns->entrydesc, sizeof columns->entrydesc},
+        {times.zone, _EntryTimeBuffers::zoneRoom},
     };
-    static_assert(std::size(buffers) == std::size(validFields) - 1);
+    static_assert(std::size(buffers) == std::size(validFollowedFields) - 1);
     {
         const LockGuard guard(&m_chainLock);
         if (!SPAnchor || SPAnchor->formatLine(line, buffers) < 1 ||
@@ -133,7 +145,7 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
     const std::int32_t lengthInUTF8 =
         UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
                                  columns->entrydesc, sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
-    const _FormatBuffer& description = *(std::end(buffers) - 1);
+    const _FormatBuffer& description = *(std::end(buffers) - 2);
     columns.setDescriptionLengths(
         static_cast<std::size_t>(description.position - columns->entrydesc), lengthInUTF8);
     return trace.result(0L);

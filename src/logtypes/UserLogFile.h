@@ -49,6 +49,8 @@ public:
 
     /// The field names that a format may use.
     static const _KeywordFields* fields() noexcept;
+    /// The same for a log that is followed: these and "zone".
+    static const _KeywordFields* followedFields() noexcept;
 
 protected:
     /// Creates a log that is not monitored and starts no thread. Used to try out lines.
@@ -72,6 +74,7 @@ private:
     void readHour(const char* text, EntryTime& time) const;
     void readMinute(const char* text, EntryTime& time) const;
     void readSecond(const char* text, EntryTime& time) const;
+    void convertToLocalTime(const char* zone, EntryTime& time) const;
     bool hasFormat() const;
     void learnFormat();
     bool allocateReportBuffers(UserlogBufferInfo** bufferInfo);

@@ -2,11 +2,16 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "logs/FollowSettings.h"
 #include "logtypes/EntryTime.h"
+#include "logtypes/ZoneTime.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <iterator>
+#include <optional>
+#include <string_view>
 
 namespace zrm {
 
@@ -108,6 +113,9 @@ long UserLogFile::formatEntryTime(char* entryTime, _EntryTimeBuffers* texts, voi
                       "= %d; %s.",
                       error.number(), error.text());
         return trace.result(-1L);
+    }
+    if (followSettings() != nullptr) {
+        convertToLocalTime(texts->zone, time);
     }
     const int length = time.write(entryTime);
     if (length != EntryTime::textLength) {
@@ -236,6 +244,40 @@ void UserLogFile::readSecond(const char* text, EntryTime& time) const {
         return;
     }
     time.second = number.value;
+}
+
+/// Converts a time that has a zone, by the entry's text or by the log's settings. A text that is
+/// not a zone counts as missing. Before it there may be the fraction of the second.
+void UserLogFile::convertToLocalTime(const char* zone, EntryTime& time) const {
+    const std::vector<ZoneOffset>& offsets = followSettings()->zone;
+    if (*zone == '\0' && offsets.empty()) {
+        return;
+    }
+    CivilTime civil{static_cast<int>(1900 + time.century * 100 + time.year),
+                    static_cast<unsigned>(time.month),
+                    static_cast<unsigned>(time.day),
+                    static_cast<unsigned>(time.hour),
+                    static_cast<unsigned>(time.minute),
+                    static_cast<unsigned>(time.second)};
+    if (!civil.isValid()) {
+        return;
+    }
+    std::string_view text = zone;
+    text.remove_prefix(std::min(text.find_first_not_of(" .,0123456789"), text.size()));
+    std::int64_t seconds = civil.seconds();
+    if (const std::optional<std::int32_t> offset = ZoneTime::takeOffset(text)) {
+        seconds = ZoneTime::toLocal(seconds - *offset);
+    } else if (!offsets.empty()) {
+        seconds = ZoneTime::toLocal(ZoneTime::toUtc(seconds, offsets));
+    }
+    civil = CivilTime::of(seconds);
+    time.century = civil.year / 100 - 19;
+    time.year = civil.year % 100;
+    time.month = civil.month;
+    time.day = civil.day;
+    time.hour = civil.hour;
+    time.minute = civil.minute;
+    time.second = civil.second;
 }
 
 } // namespace zrm

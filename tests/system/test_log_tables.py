@@ -1,6 +1,7 @@
 """Logs of [[log]] tables: paths and globs in the host configuration."""
 
 import pytest
+from api import Api
 from conftest import Log, descriptions, syslog_line
 
 
@@ -84,3 +85,48 @@ def test_a_file_of_both_lists_belongs_to_the_log_configuration(agent):
     assert descriptions(agent.wait_events(1)) == ["once"]
     assert agent.stop() == 0
     assert len(agent.events()) == 1
+
+
+def test_the_api_and_the_client_show_the_tables(agent):
+    log = file(agent, "app.log")
+    file(agent, "app.log.1")
+    agent.follow(agent.directory / "app.*")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    answer = Api(agent).request("GET", "/api/v1/logs")[2]
+    assert [one["log"] for one in answer["logs"]] == [str(log)]
+    (table,) = answer["tables"]
+    assert table["files"] == [str(log)]
+    assert table["passed_over"] == [
+        {"file": f"{log}.1", "reason": f"It is an older generation of {log}."}
+    ]
+
+
+@pytest.mark.slow
+def test_a_log_that_is_named_twice_has_a_warning(agent):
+    log = agent.log("app.log")
+    agent.follow(log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_trace("and a [[log]] table both name this file")
+    (only,) = Api(agent).request("GET", "/api/v1/logs")[2]["logs"]
+    assert [warning["kind"] for warning in only["ledger"]["warnings"]] == ["named_twice"]
+
+
+def test_every_form_of_syslog_lines_is_read(agent):
+    log = file(agent, "syslog")
+    agent.environment["TZ"] = "Europe/Berlin"
+    agent.follow(log, timezone="UTC")
+    agent.situation(log=log)
+    agent.start()
+    agent.wait_open(log)
+    log.append(
+        "Nov 20 06:03:09 web1 sshd[412]: traditional\n"
+        "2026-11-20T07:03:09.123456+01:00 web1 sshd[412]: iso\n"
+        "<34>1 2026-11-20T06:03:09Z web1 sshd 412 - - rfc5424\n"
+    )
+    rows = [event["row"] for event in agent.wait_events(3)]
+    assert [row["ENTRYDESC"] for row in rows] == ["traditional", "iso", "rfc5424"]
+    assert {row["ENTRYTIME"][1:] for row in rows} == {"261120070309000"}
+    assert {row["ENTRYSRC"] for row in rows} == {"sshd[412]"}

@@ -260,3 +260,31 @@ def test_nothing_is_traced_unless_it_is_asked_for(log):
     assert "FormatTrial.cpp" in run("try", FORMAT, path, QFW_TRC1="FormatTrial=flow")[1]
     out, err = run("try", FORMAT, path, QFW_TRC1="loud", status=2)
     assert out == "" and err.startswith("zrmctl: QFW_TRC1: ") and "loud" in err
+
+
+def test_check_shows_what_each_log_table_matches(tmp_path):
+    for name in ("a.log", "b.log", "b.log.1", "old.log.gz"):
+        (tmp_path / name).write_text("x\n")
+    path = tmp_path / "zrm.toml"
+    path.write_text(
+        f'[[log]]\npath = "{tmp_path}/*.lo*"\nexclude = "a*"\n'
+        f'[[log]]\npath = ["{tmp_path}/later", "{tmp_path}/none/*"]\n'
+    )
+    assert run("check", "--host", path) == (
+        f"{path} can be used\n"
+        "[[log]] at line 1: 1 file\n"
+        f"  {tmp_path}/b.log\n"
+        f"  passed over  {tmp_path}/old.log.gz: It is compressed.\n"
+        f"  passed over  {tmp_path}/b.log.1: It is an older generation of {tmp_path}/b.log.\n"
+        "[[log]] at line 4: 1 file\n"
+        f"  {tmp_path}/later  (does not exist yet)\n",
+        "",
+    )
+    answer = json.loads(run("check", "--host", path, "--json")[0])
+    assert answer["accepted"]
+    assert [table["files"] for table in answer["logs"]] == [[f"{tmp_path}/b.log"], [f"{tmp_path}/later"]]
+    assert answer["logs"][0]["passed_over_count"] == 2
+    path.write_text("[[log]]\npath = 'app.log'\n")
+    assert run("check", "--host", path, status=1)[1] == (
+        f"zrmctl: {path}:2: log.path: 'app.log' is not an absolute path; begin it with '/'\n"
+    )

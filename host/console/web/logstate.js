@@ -22,6 +22,7 @@ const WHY = [
 const WARNED = {
   missing: "No file",
   replaced: "Replaced",
+  named_twice: "Named twice",
   without_time: "No times",
   not_records: "Wrong type",
 };

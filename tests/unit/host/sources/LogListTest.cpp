@@ -41,7 +41,7 @@ protected:
 TEST_F(LogListTest, WithoutTablesNothingIsPublished) {
     list.begin({}, {});
     EXPECT_EQ(FurtherLogs::published(), nullptr);
-    EXPECT_TRUE(list.found()->sources.empty());
+    EXPECT_TRUE(LogList::found()->sources.empty());
 }
 
 TEST_F(LogListTest, PublishesWhatTheTablesNameAtTheStart) {
@@ -50,7 +50,7 @@ TEST_F(LogListTest, PublishesWhatTheTablesNameAtTheStart) {
     ASSERT_NE(FurtherLogs::published(), nullptr);
     ASSERT_EQ(FurtherLogs::published()->size(), 1U);
     EXPECT_EQ(FurtherLogs::published()->front().name, a);
-    EXPECT_EQ(list.found()->sources.size(), 1U);
+    EXPECT_EQ(LogList::found()->sources.size(), 1U);
     EXPECT_EQ(changes, 0); // the log manager, which does not exist yet, takes it by itself
 }
 

@@ -1,0 +1,251 @@
+#include "logtypes/SyslogForms.h"
+
+#include <algorithm>
+
+namespace zrm {
+
+namespace {
+
+constexpr std::string_view monthNames = "JanFebMarAprMayJunJulAugSepOctNovDec";
+constexpr std::string_view repeatNotice = "last message repeated ";
+constexpr std::string_view byteOrderMark = "\xEF\xBB\xBF";
+constexpr std::string_view blanks = " \t\v\f\r";
+
+bool isDigit(char character) {
+    return character >= '0' && character <= '9';
+}
+
+/// Reads fixed fields from the beginning of a text. After a mismatch nothing matches any more.
+class Reader {
+public:
+    explicit Reader(std::string_view text) : m_rest(text) {}
+
+    /// A number of exactly this many digits.
+    unsigned number(std::size_t digits) {
+        unsigned value = 0;
+        if (m_rest.size() < digits) {
+            return fail();
+        }
+        for (std::size_t at = 0; at < digits; ++at) {
+            if (!isDigit(m_rest[at])) {
+                return fail();
+            }
+            value = value * 10 + static_cast<unsigned>(m_rest[at] - '0');
+        }
+        m_rest.remove_prefix(digits);
+        return value;
+    }
+    bool literal(char character) {
+        if (!m_rest.starts_with(character)) {
+            fail();
+            return false;
+        }
+        m_rest.remove_prefix(1);
+        return true;
+    }
+    void timeOfDay(CivilTime& time) {
+        time.hour = number(2);
+        literal(':');
+        time.minute = number(2);
+        literal(':');
+        time.second = number(2);
+    }
+    unsigned fail() {
+        m_isGood = false;
+        m_rest = {};
+        return 0;
+    }
+    bool isGood() const { return m_isGood; }
+    std::string_view& rest() { return m_rest; }
+
+private:
+    std::string_view m_rest;
+    bool m_isGood = true;
+};
+
+/// Removes the text up to the next blank, and the blank.
+std::string_view takeWord(std::string_view& text) {
+    const std::size_t end = std::min(text.find(' '), text.size());
+    const std::string_view word = text.substr(0, end);
+    text.remove_prefix(std::min(end + 1, text.size()));
+    return word;
+}
+
+/// The same for a field of RFC 5424, where "-" means none.
+std::string_view takeField(std::string_view& text) {
+    const std::string_view word = takeWord(text);
+    return word == "-" ? std::string_view() : word;
+}
+
+bool readTraditional(std::string_view text, SyslogTime& time) {
+    // Mmm dd hh:mm:ss
+    const std::size_t month =
+        text.size() < 4 ? std::string_view::npos : monthNames.find(text.substr(0, 3));
+    if (month == std::string_view::npos || month % 3 != 0 || text[3] != ' ') {
+        return false;
+    }
+    time.time.month = static_cast<unsigned>(month / 3) + 1;
+    Reader reader(text.substr(4));
+    if (reader.rest().starts_with(' ')) {
+        reader.literal(' ');
+        time.time.day = reader.number(1);
+    } else {
+        time.time.day = reader.number(2);
+    }
+    reader.literal(' ');
+    reader.timeOfDay(time.time);
+    constexpr int leapYear = 2000; // the year is not known yet
+    time.time.year = leapYear;
+    if (!reader.isGood() || !time.time.isValid()) {
+        return false;
+    }
+    if (!reader.rest().empty() && !reader.literal(' ')) {
+        return false;
+    }
+    time.form = SyslogTime::Form::traditional;
+    time.hasTime = true;
+    time.end = text.size() - reader.rest().size();
+    return true;
+}
+
+bool readIso(std::string_view text, SyslogTime& time) {
+    Reader reader(text);
+    time.time.year = static_cast<int>(reader.number(4));
+    reader.literal('-');
+    time.time.month = reader.number(2);
+    reader.literal('-');
+    time.time.day = reader.number(2);
+    reader.literal('T');
+    reader.timeOfDay(time.time);
+    if (!reader.isGood() || !time.time.isValid()) {
+        return false;
+    }
+    std::string_view& rest = reader.rest();
+    if (rest.starts_with('.') || rest.starts_with(',')) {
+        const auto end = std::find_if_not(rest.begin() + 1, rest.end(), isDigit);
+        rest.remove_prefix(static_cast<std::size_t>(end - rest.begin()));
+    }
+    time.offset = ZoneTime::takeOffset(rest);
+    if (!rest.empty() && !reader.literal(' ')) {
+        return false;
+    }
+    time.form = SyslogTime::Form::iso;
+    time.hasTime = true;
+    time.hasYear = true;
+    time.end = text.size() - rest.size();
+    return true;
+}
+
+/// The length of "<PRI>"; 0 if the text does not begin with one.
+std::size_t priorityLength(std::string_view text) {
+    if (!text.starts_with('<')) {
+        return 0;
+    }
+    const std::size_t end = text.find('>');
+    const bool isNumber = end != std::string_view::npos && end >= 2 && end <= 4 &&
+                          std::all_of(text.begin() + 1, text.begin() + end, isDigit);
+    return isNumber ? end + 1 : 0;
+}
+
+/// Removes the structured data of RFC 5424 and the blank behind it. All of it, if it has no end.
+std::string_view takeStructuredData(std::string_view& text) {
+    const std::string_view whole = text;
+    if (!text.starts_with('[')) {
+        return takeField(text);
+    }
+    bool isQuoted = false;
+    std::size_t at = 0;
+    for (; at < text.size(); ++at) {
+        const char character = text[at];
+        if (isQuoted && character == '\\') {
+            ++at;
+        } else if (character == '"') {
+            isQuoted = !isQuoted;
+        } else if (!isQuoted && character == ']' &&
+                   (at + 1 == text.size() || text[at + 1] != '[')) {
+            ++at;
+            break;
+        }
+    }
+    at = std::min(at, text.size());
+    text.remove_prefix(at < text.size() && text[at] == ' ' ? at + 1 : at);
+    return whole.substr(0, at);
+}
+
+SyslogParts splitRfc5424(std::string_view text) {
+    SyslogParts parts;
+    parts.host = takeField(text);
+    parts.source = takeField(text);
+    parts.processId = takeField(text);
+    takeField(text); // MSGID
+    const std::string_view data = takeStructuredData(text);
+    if (text.starts_with(byteOrderMark)) {
+        text.remove_prefix(byteOrderMark.size());
+    }
+    parts.description = text.empty() ? data : text;
+    return parts;
+}
+
+} // namespace
+
+SyslogTime SyslogForms::recognise(std::string_view line) noexcept {
+    SyslogTime time;
+    const std::size_t priority = priorityLength(line);
+    std::string_view text = line.substr(priority);
+    if (priority > 0 && text.starts_with("1 ")) {
+        text.remove_prefix(2);
+        if (text.starts_with("- ")) {
+            time.end = 2;
+        } else if (!readIso(text, time)) {
+            return {};
+        }
+        time.form = SyslogTime::Form::rfc5424;
+        time.end += priority + 2;
+        return time;
+    }
+    if (readTraditional(text, time) || readIso(text, time = {})) {
+        time.end += priority;
+        return time;
+    }
+    return {};
+}
+
+SyslogParts SyslogForms::split(std::string_view line, const SyslogTime& time) noexcept {
+    std::string_view text = line.substr(time.end);
+    if (time.form == SyslogTime::Form::rfc5424) {
+        return splitRfc5424(text);
+    }
+    SyslogParts parts;
+    if (time.form != SyslogTime::Form::none && !text.starts_with(repeatNotice)) {
+        parts.host = takeWord(text);
+        if (!text.starts_with(repeatNotice)) {
+            const std::size_t end = std::min(text.find_first_of(": \t\v\f\r"), text.size());
+            parts.source = text.substr(0, end);
+            text.remove_prefix(end);
+            if (text.starts_with(':')) {
+                text.remove_prefix(1);
+            }
+            if (!text.empty() && blanks.find(text[0]) != std::string_view::npos) {
+                text.remove_prefix(1);
+            }
+        }
+    }
+    parts.description = text;
+    return parts;
+}
+
+int SyslogForms::yearOf(const CivilTime& time, const CivilTime& reference) noexcept {
+    constexpr std::int64_t tolerance = 86'400;
+    constexpr int mostYears = 8; // 29 February may be that far away
+    const std::int64_t latest = reference.seconds() + tolerance;
+    CivilTime candidate = time;
+    for (candidate.year = reference.year + 1; candidate.year > reference.year - mostYears;
+         --candidate.year) {
+        if (candidate.isValid() && candidate.seconds() <= latest) {
+            return candidate.year;
+        }
+    }
+    return reference.year;
+}
+
+} // namespace zrm

@@ -1,0 +1,56 @@
+#ifndef ZRM_SYSLOG_FORMS_H
+#define ZRM_SYSLOG_FORMS_H
+
+#include "logtypes/ZoneTime.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string_view>
+
+namespace zrm {
+
+/// The beginning of a syslog line, up to its time.
+struct SyslogTime {
+    enum class Form : unsigned char {
+        none,        ///< not recognised
+        traditional, ///< "Oct  5 07:03:09 host source: message"
+        iso,         ///< "2026-10-05T07:03:09.123456+02:00 host source: message"
+        rfc5424,     ///< "<34>1 2026-10-05T07:03:09Z host app procid msgid - message"
+    };
+
+    Form form = Form::none;
+    bool hasTime = false; ///< false also for "-" in place of the time
+    bool hasYear = false;
+    CivilTime time;
+    std::optional<std::int32_t> offset; ///< of its zone from UTC in seconds, if it says
+    std::size_t end = 0;                ///< where the rest of the line begins
+};
+
+/// The rest of a syslog line. Parts that it does not have are empty.
+struct SyslogParts {
+    std::string_view host;
+    std::string_view source;    ///< of RFC 5424: APP-NAME[PROCID]
+    std::string_view processId; ///< of RFC 5424; the source is then APP-NAME alone
+    std::string_view description;
+};
+
+/// The forms of lines that system loggers write, recognised line by line. A line may begin with a
+/// priority. Stateless; any thread.
+namespace SyslogForms {
+
+/// `line` is without its newline.
+SyslogTime recognise(std::string_view line) noexcept;
+
+/// The rest of a line whose beginning was recognised. A line that was not is all description.
+SyslogParts split(std::string_view line, const SyslogTime& time) noexcept;
+
+/// The year of a time without one: the one that brings it nearest to, but at most a day behind,
+/// the reference.
+int yearOf(const CivilTime& time, const CivilTime& reference) noexcept;
+
+} // namespace SyslogForms
+
+} // namespace zrm
+
+#endif
