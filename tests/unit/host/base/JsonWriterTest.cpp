@@ -284,7 +284,7 @@ TEST(JsonWriter, NestingIsBounded) {
     EXPECT_THROW(nested(most + 1, true), std::logic_error);
 }
 
-TEST(JsonWriter, EscapesWhatJsonDoesNotAllow) {
+TEST(JsonWriter, EscapesCharactersThatJsonDoesNotAllow) {
     EXPECT_EQ(jsonText(""), R"("")");
     EXPECT_EQ(jsonText("plain / text ~\x7f"), "\"plain / text ~\x7f\"");
     EXPECT_EQ(jsonText("\"\\\b\f\n\r\t"), R"("\"\\\b\f\n\r\t")");
@@ -300,8 +300,8 @@ TEST(JsonWriter, WritesTextsOfAnySize) {
     EXPECT_EQ(jsonText(std::string(5000, '"')), nlohmann::json(std::string(5000, '"')).dump());
 }
 
-// Each byte at each place of the eight that are examined together.
-TEST(JsonWriter, EscapesAtEveryPlace) {
+// Each byte at each of the eight positions that are examined together.
+TEST(JsonWriter, EscapesAtEveryPosition) {
     for (int byte = 0; byte < 128; ++byte) {
         for (std::size_t place = 0; place < 20; ++place) {
             std::string text(20, 'x');
@@ -333,13 +333,13 @@ TEST(JsonWriter, AgreesWithTheJsonLibraryOnRandomBytes) {
     }
 }
 
-TEST(JsonWriter, WhatSteersHowTextIsShownIsEscaped) {
+TEST(JsonWriter, CharactersThatControlHowTextIsShownAreEscaped) {
     EXPECT_EQ(jsonText("\xc2\x9b"
                        "31m \xe2\x80\xae \xd8\x9c \xe2\x81\xa9 \xc2\xa0 \xe2\x82\xac"),
               "\"\\u009b31m \\u202e \\u061c \\u2069 \xc2\xa0 \xe2\x82\xac\"");
 }
 
-TEST(SteeringText, ADocumentKeepsItsMeaningWhenItsTextsAreEscaped) {
+TEST(SteeringText, EscapingKeepsADocumentsMeaning) {
     EXPECT_EQ(SteeringText::escapedInJson(
                   "{\"a\": \"x\x7f\xc2\x85y\xe2\x80\xa8\xe2\x82\xac\xc3\xa4\"}\n"),
               "{\"a\": \"x\\u007f\\u0085y\\u2028\xe2\x82\xac\xc3\xa4\"}\n");
