@@ -186,7 +186,8 @@ Explanation Explainer::describe(Seen& seen) {
             "the line does not match the log's format, or its time cannot be determined";
     } else {
         char* const row = reinterpret_cast<char*>(&seen.row);
-        RowJson::append(explanation.row, layout(), row);
+        explanation.row =
+            JsonWriter::text([&](JsonWriter& json) { RowJson(layout()).write(json, row); });
         m_replay.matches(seen.row); // writes the situation's thresholds into the row
         explanation.conditions = m_judge->judge(row);
     }

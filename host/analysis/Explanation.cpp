@@ -1,45 +1,37 @@
 #include "host/analysis/Explanation.h"
 
-#include <nlohmann/json.hpp>
+#include "host/base/JsonWriter.h"
+
+#include <variant>
 
 namespace zrm::host {
 
 namespace {
 
-using Json = nlohmann::ordered_json;
-
-template <typename Value> Json orNull(const std::optional<Value>& value) {
-    return value ? Json(*value) : Json();
+void write(JsonWriter& json, const ConditionVerdict& verdict) {
+    json.beginObject().member("condition", verdict.condition).key("value");
+    std::visit([&](const auto& held) { json.value(held); }, verdict.value);
+    json.member("holds", verdict.holds).endObject();
 }
 
-Json of(const ConditionVerdict& verdict) {
-    Json value;
-    std::visit([&](const auto& held) { value = held; }, verdict.value);
-    return {{"condition", verdict.condition}, {"value", value}, {"holds", verdict.holds}};
+void write(JsonWriter& json, const Explanation::Window& window) {
+    json.beginObject().member("frequency", window.frequency).member("period", window.period);
+    json.member("count", window.count).endObject();
 }
 
 } // namespace
 
-Json ExplanationJson::of(const Explanation& explanation) {
-    Json conditions = Json::array();
-    for (const ConditionVerdict& verdict : explanation.conditions) {
-        conditions.push_back(zrm::host::of(verdict));
+void Explanation::write(JsonWriter& json) const {
+    json.beginObject().member("line", line).member("event", event).key("row");
+    row.empty() ? json.null() : json.raw(row);
+    json.textOrNull("reason", reason);
+    json.key("conditions").beginArray();
+    for (const ConditionVerdict& verdict : conditions) {
+        host::write(json, verdict);
     }
-    Json window;
-    if (explanation.window) {
-        window = {{"frequency", explanation.window->frequency},
-                  {"period", explanation.window->period},
-                  {"count", orNull(explanation.window->count)}};
-    }
-    return {{"line", orNull(explanation.line)},
-            {"event", orNull(explanation.event)},
-            {"row", explanation.row.empty() ? Json() : Json::parse(explanation.row)},
-            {"reason", explanation.reason.empty() ? Json() : Json(explanation.reason)},
-            {"conditions", conditions},
-            {"matches", explanation.matches},
-            {"window", window},
-            {"raised", explanation.isRaised},
-            {"decision", explanation.decision}};
+    json.endArray().member("matches", matches).key("window");
+    window ? host::write(json, *window) : void(json.null());
+    json.member("raised", isRaised).member("decision", decision).endObject();
 }
 
 } // namespace zrm::host

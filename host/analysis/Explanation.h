@@ -8,9 +8,9 @@
 #include <string>
 #include <vector>
 
-#include <nlohmann/json_fwd.hpp>
-
 namespace zrm::host {
+
+class JsonWriter;
 
 /// Why an entry does or does not raise a situation.
 struct Explanation {
@@ -29,12 +29,9 @@ struct Explanation {
     std::optional<Window> window;
     bool isRaised = false;
     std::string decision; ///< one sentence
-};
 
-/// Explanations as JSON objects. Stateless.
-class ExplanationJson {
-public:
-    static nlohmann::ordered_json of(const Explanation& explanation);
+    /// Writes it as an object.
+    void write(JsonWriter& json) const;
 };
 
 } // namespace zrm::host

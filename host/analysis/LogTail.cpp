@@ -2,6 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "logs/RequestThresholds.h"
 #include "monitor/LineReader.h"
@@ -16,8 +17,6 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include <nlohmann/json.hpp>
-
 namespace zrm::host {
 
 namespace {
@@ -26,13 +25,9 @@ TRC1_Anchor anchor{"LogTail.cpp"};
 
 } // namespace
 
-void Reach::addTo(nlohmann::ordered_json& object) const {
-    const auto orNull = [](const std::string& text) {
-        return text.empty() ? nlohmann::ordered_json() : nlohmann::ordered_json(text);
-    };
-    object["complete"] = isComplete();
-    object["reached"] = orNull(reached);
-    object["reason"] = orNull(reason);
+void Reach::write(JsonWriter& json) const {
+    json.member("complete", isComplete());
+    json.textOrNull("reached", reached).textOrNull("reason", reason);
 }
 
 namespace {

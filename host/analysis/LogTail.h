@@ -9,13 +9,13 @@
 #include <string>
 #include <string_view>
 
-#include <nlohmann/json_fwd.hpp>
-
 namespace zrm {
 class LogFile;
 } // namespace zrm
 
 namespace zrm::host {
+
+class JsonWriter;
 
 /// How far back logs were read and why reading stopped.
 struct Reach {
@@ -23,8 +23,8 @@ struct Reach {
     std::string reason;  ///< why reading stopped early, as a clause; empty: everything was read
 
     bool isComplete() const noexcept { return reason.empty(); }
-    /// Adds `complete`, `reached` and `reason` to a JSON object.
-    void addTo(nlohmann::ordered_json& object) const;
+    /// Writes `complete`, `reached` and `reason`, members of an object.
+    void write(JsonWriter& json) const;
 };
 
 /// Reads what a log holds last, and lines that it might hold, as its monitor would: in the same

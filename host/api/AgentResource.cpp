@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "framework/agent_calls.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
@@ -21,24 +22,14 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <nlohmann/json.hpp>
-
 namespace zrm::host {
 
 namespace {
 
 TRC1_Anchor anchor{"AgentResource.cpp"};
 
-using nlohmann::ordered_json;
-
 constexpr std::size_t longestLevels = 4096; ///< bytes
 constexpr int tracedLevels = 200;           ///< bytes of the levels shown in the trace
-
-std::int64_t now() {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(
-               std::chrono::system_clock::now().time_since_epoch())
-        .count();
-}
 
 std::string node() {
     char name[128] = "";
@@ -46,16 +37,7 @@ std::string node() {
     return name;
 }
 
-ordered_json textOrNull(const std::string& text) {
-    return text.empty() ? ordered_json() : ordered_json(text);
-}
-
-/// Texts may quote the system or a log: bytes that are not UTF-8 are replaced.
-HttpAnswer answerWith(const ordered_json& document) {
-    return HttpAnswer::json(document.dump(-1, ' ', false, ordered_json::error_handler_t::replace));
-}
-
-ordered_json historyOf(Delivery& delivery) {
+void writeHistory(JsonWriter& json, Delivery& delivery) {
     HistoryReader* const reader = delivery.history();
     HistoryState state;
     if (reader != nullptr) {
@@ -63,52 +45,45 @@ ordered_json historyOf(Delivery& delivery) {
     } else {
         state.problem = delivery.historyProblem();
     }
-    return {{"enabled", reader != nullptr},
-            {"events", state.events},
-            {"oldest", state.oldest},
-            {"newest", state.newest},
-            {"bytes", state.bytes},
-            {"damaged", state.damaged},
-            {"problem", textOrNull(state.problem)}};
+    json.beginObject().member("enabled", reader != nullptr).member("events", state.events);
+    json.member("oldest", state.oldest).member("newest", state.newest);
+    json.member("bytes", state.bytes).member("damaged", state.damaged);
+    json.textOrNull("problem", state.problem).endObject();
 }
 
-ordered_json queueOf(const Delivery& delivery) {
+void writeQueue(JsonWriter& json, const Delivery& delivery) {
     const QueueState state = delivery.queueState();
-    return {{"size", state.size},
-            {"capacity", state.capacity},
-            {"waits", state.waits},
-            {"waited_seconds", std::chrono::duration<double>(state.waited).count()}};
+    json.beginObject().member("size", state.size).member("capacity", state.capacity);
+    json.member("waits", state.waits);
+    json.member("waited_seconds", std::chrono::duration<double>(state.waited).count());
+    json.endObject();
 }
 
-ordered_json sinksOf(const Delivery& delivery) {
-    ordered_json sinks = ordered_json::array();
+void writeSinks(JsonWriter& json, const Delivery& delivery) {
+    json.beginArray();
     for (const SinkState& state : delivery.sinkStates()) {
-        ordered_json sink = {{"name", state.name},
-                             {"type", state.type},
-                             {"state", state.conditionName()},
-                             {"lag", state.lag},
-                             {"delivered", state.delivered},
-                             {"error", textOrNull(state.error)}};
-        sink["retry_in_seconds"] = nullptr;
-        if (state.retryIn) {
-            sink["retry_in_seconds"] = std::chrono::duration<double>(*state.retryIn).count();
-        }
-        sinks.push_back(std::move(sink));
+        json.beginObject().member("name", state.name).member("type", state.type);
+        json.member("state", state.conditionName()).member("lag", state.lag);
+        json.member("delivered", state.delivered).textOrNull("error", state.error);
+        json.key("retry_in_seconds");
+        state.retryIn ? json.value(std::chrono::duration<double>(*state.retryIn).count())
+                      : json.null();
+        json.endObject();
     }
-    return sinks;
+    json.endArray();
 }
 
 /// Warnings about logs that are monitored without an error.
-ordered_json warningsOf(const LogWatch& watch) {
-    ordered_json list = ordered_json::array();
+void writeWarnings(JsonWriter& json, const LogWatch& watch) {
+    json.beginArray();
     for (const auto& [log, warnings] : watch.all()) {
         for (const LogWarning& warning : warnings) {
-            ordered_json one{{"log", log}};
-            one.update(LogWarnings::json(warning));
-            list.push_back(std::move(one));
+            json.beginObject().member("log", log);
+            warning.write(json);
+            json.endObject();
         }
     }
-    return list;
+    json.endArray();
 }
 
 HttpAnswer setTrace(const HttpRequest& request) {
@@ -125,18 +100,21 @@ HttpAnswer setTrace(const HttpRequest& request) {
     const std::string inForce = TraceControl::levels();
     trace.always()("Trace levels are now \"%.*s\"%s.", tracedLevels, inForce.c_str(),
                    inForce.size() > tracedLevels ? " and more" : "");
-    return answerWith({{"levels", inForce}});
+    return HttpAnswer::json(JsonWriter::text(
+        [&](JsonWriter& json) { json.beginObject().member("levels", inForce).endObject(); }));
 }
 
 HttpAnswer columns(const HttpRequest& request) {
     QueryFields(request).refuseUnknown();
-    ordered_json list = ordered_json::array();
-    for (const Column& column : columnsOf("RMLOGENT")) {
-        const char* const type = column.isNumber ? "number" : column.isTime ? "time" : "text";
-        list.push_back({{"name", column.name}, {"type", type}, {"width", column.width}});
-    }
-    return answerWith(
-        {{"columns", std::move(list)}, {"operators", ConditionBuilder::operatorNames()}});
+    return HttpAnswer::json(JsonWriter::text([](JsonWriter& json) {
+        json.beginObject().key("columns").beginArray();
+        for (const Column& column : columnsOf("RMLOGENT")) {
+            const char* const type = column.isNumber ? "number" : column.isTime ? "time" : "text";
+            json.beginObject().member("name", column.name).member("type", type);
+            json.member("width", column.width).endObject();
+        }
+        json.endArray().member("operators", ConditionBuilder::operatorNames()).endObject();
+    }));
 }
 
 /// The agent's log manager waits for this signal, which every thread blocks.
@@ -146,7 +124,7 @@ HttpAnswer refresh(const HttpRequest& request) {
     if (kill(getpid(), SIGHUP) != 0) {
         throw RequestRefused(500, "the agent cannot be notified", "");
     }
-    HttpAnswer answer = answerWith({{"status", "asked"}});
+    HttpAnswer answer = HttpAnswer::json(R"({"status":"asked"})");
     answer.status = 202;
     return answer;
 }
@@ -154,7 +132,7 @@ HttpAnswer refresh(const HttpRequest& request) {
 } // namespace
 
 AgentResource::AgentResource(Delivery& delivery, const LogWatch& watch)
-    : m_delivery(delivery), m_watch(watch), m_started(now()) {}
+    : m_delivery(delivery), m_watch(watch), m_started(WallClock::now()) {}
 
 void AgentResource::addRoutes(Router& router) {
     router.add("GET", "/api/v1/status",
@@ -166,15 +144,19 @@ void AgentResource::addRoutes(Router& router) {
 
 HttpAnswer AgentResource::status(const HttpRequest& request) {
     QueryFields(request).refuseUnknown();
-    return answerWith({{"version", ZRM_VERSION},
-                       {"node", node()},
-                       {"started", UtcTime::text(m_started)},
-                       {"time", UtcTime::text(now())},
-                       {"history", historyOf(m_delivery)},
-                       {"queue", queueOf(m_delivery)},
-                       {"sinks", sinksOf(m_delivery)},
-                       {"warnings", warningsOf(m_watch)},
-                       {"trace", TraceControl::levels()}});
+    return HttpAnswer::json(JsonWriter::text([this](JsonWriter& json) {
+        json.beginObject().member("version", ZRM_VERSION).member("node", node());
+        json.key("started").time(m_started).key("time").time(WallClock::now());
+        json.key("history");
+        writeHistory(json, m_delivery);
+        json.key("queue");
+        writeQueue(json, m_delivery);
+        json.key("sinks");
+        writeSinks(json, m_delivery);
+        json.key("warnings");
+        writeWarnings(json, m_watch);
+        json.member("trace", TraceControl::levels()).endObject();
+    }));
 }
 
 void HealthResource::addRoutes(Router& router) {

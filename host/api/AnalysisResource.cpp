@@ -8,6 +8,7 @@
 #include "host/analysis/StoredRow.h"
 #include "host/api/EventQuery.h"
 #include "host/api/SituationBody.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
 #include "host/diagnose/LogWarnings.h"
 #include "host/diagnose/LogWatch.h"
@@ -16,20 +17,15 @@
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
-#include "host/situations/SituationJson.h"
 #include "monitor/LogFile.h"
 
 #include <limits>
 #include <optional>
 #include <utility>
 
-#include <nlohmann/json.hpp>
-
 namespace zrm::host {
 
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 /// The log named in a body, or else the situation's.
 LogFile& logOf(const MonitoredLogs& logs, JsonFields& fields, const SituationConfig& situation) {
@@ -102,17 +98,21 @@ HttpAnswer AnalysisResource::explain(const HttpRequest& request) {
     const Explained explained = fields.has("line")    ? explainLine(fields)
                                 : fields.has("event") ? explainEvent(fields)
                                                       : explainLast(fields);
-    Json explanations = Json::array();
-    for (const Explanation& explanation : explained.explanations) {
-        explanations.push_back(ExplanationJson::of(explanation));
-    }
-    Json answer{{"explanations", std::move(explanations)}};
-    explained.reach.addTo(answer);
-    answer["warnings"] = Json::array();
-    for (const LogWarning& warning : m_watch.of(explained.log)) {
-        answer["warnings"].push_back(LogWarnings::json(warning));
-    }
-    return HttpAnswer::json(SituationJson::text(answer));
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("explanations").beginArray();
+        for (const Explanation& explanation : explained.explanations) {
+            explanation.write(json);
+        }
+        json.endArray();
+        explained.reach.write(json);
+        json.key("warnings").beginArray();
+        for (const LogWarning& warning : m_watch.of(explained.log)) {
+            json.beginObject();
+            warning.write(json);
+            json.endObject();
+        }
+        json.endArray().endObject();
+    }));
 }
 
 AnalysisResource::Explained AnalysisResource::explainLine(JsonFields& fields) {
@@ -217,11 +217,13 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     if (result.isTruncated && logs.areWanted()) {
         throw RequestRefused(503, "the agent is re-reading its log configuration: try again", "");
     }
-    Json answer{{"entries", result.entries},    {"matched", result.matched},
-                {"raised", result.raised},      {"truncated", result.isTruncated},
-                {"raised_at", result.raisedAt}, {"decision", result.decision}};
-    result.reach.addTo(answer);
-    return HttpAnswer::json(SituationJson::text(answer));
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("entries", result.entries).member("matched", result.matched);
+        json.member("raised", result.raised).member("truncated", result.isTruncated);
+        json.member("raised_at", result.raisedAt).member("decision", result.decision);
+        result.reach.write(json);
+        json.endObject();
+    }));
 }
 
 } // namespace zrm::host

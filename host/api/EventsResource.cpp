@@ -2,8 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/api/EventQuery.h"
-#include "host/base/TimeText.h"
-#include "host/events/RowJson.h"
+#include "host/base/JsonWriter.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
@@ -15,7 +14,6 @@
 #include <limits>
 #include <optional>
 #include <string>
-#include <utility>
 #include <vector>
 
 namespace zrm::host {
@@ -52,15 +50,6 @@ EventFilter filterOf(const HttpRequest& request) {
     filter.newestFirst = isNewestFirst(query);
     query.refuseUnknown();
     return filter;
-}
-
-void append(std::string& text, const LogRates::Counts& counts) {
-    text += '[';
-    for (std::size_t at = 0; at < counts.size(); ++at) {
-        text += at == 0 ? "" : ",";
-        text += counts[at] ? std::to_string(*counts[at]) : "null";
-    }
-    text += ']';
 }
 
 /// The window of rates and its steps: milliseconds.
@@ -113,20 +102,17 @@ HttpAnswer EventsResource::events(const HttpRequest& request) {
     const EventPage page = EventQuery::reading([&] { return history.query(filter); });
     const HistoryState state = EventQuery::reading([&] { return history.state(); });
     const std::size_t count = std::min(limit, page.events.size());
-    std::string text = "{\"events\":[";
-    for (std::size_t at = 0; at < count; ++at) {
-        text += at == 0 ? "" : ",";
-        text += page.events[at].json;
-    }
     const std::optional<std::uint64_t> next =
         page.events.size() > limit ? std::optional(page.events[count - 1].id) : page.reached;
-    text += "],\"next\":" + (next ? std::to_string(*next) : "null") +
-            ",\"oldest\":" + std::to_string(state.oldest) +
-            ",\"newest\":" + std::to_string(state.newest) + ",\"damaged\":[";
-    for (std::size_t at = 0; at < page.damaged.size(); ++at) {
-        text += (at == 0 ? "" : ",") + std::to_string(page.damaged[at]);
-    }
-    return HttpAnswer::json(text + "]}");
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("events").beginArray();
+        for (std::size_t at = 0; at < count; ++at) {
+            json.raw(page.events[at].json);
+        }
+        json.endArray().member("next", next);
+        json.member("oldest", state.oldest).member("newest", state.newest);
+        json.member("damaged", page.damaged).endObject();
+    }));
 }
 
 HttpAnswer EventsResource::event(const HttpRequest& request) {
@@ -153,22 +139,17 @@ HttpAnswer EventsResource::rates(const HttpRequest& request) {
     const Window window = windowOf(request);
     const Rates rates =
         EventQuery::reading([&] { return history.rates(window.from, window.to, window.step); });
-    std::string text = "{\"start\":\"" + UtcTime::text(rates.start) +
-                       "\",\"step\":" + std::to_string(rates.step / 1000) + ",\"logs\":[";
-    bool isFirst = true;
-    for (const LogRates& log : rates.logs) {
-        if (window.log && log.log != *window.log) {
-            continue;
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("start").time(rates.start).member("step", rates.step / 1000);
+        json.key("logs").beginArray();
+        for (const LogRates& log : rates.logs) {
+            if (!window.log || log.log == *window.log) {
+                json.beginObject().member("log", log.log);
+                json.member("entries", log.entries).member("events", log.events).endObject();
+            }
         }
-        text += std::exchange(isFirst, false) ? "{\"log\":" : ",{\"log\":";
-        RowJson::appendText(text, log.log);
-        text += ",\"entries\":";
-        append(text, log.entries);
-        text += ",\"events\":";
-        append(text, log.events);
-        text += '}';
-    }
-    return HttpAnswer::json(text + "]}");
+        json.endArray().endObject();
+    }));
 }
 
 } // namespace zrm::host

@@ -1,6 +1,7 @@
 #include "host/api/LogsResource.h"
 
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/diagnose/LogLedgers.h"
@@ -15,9 +16,10 @@
 #include "host/sources/FoundLogsJson.h"
 #include "host/sources/LogList.h"
 
-#include <chrono>
+#include <algorithm>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -28,12 +30,6 @@ namespace zrm::host {
 namespace {
 
 TRC1_Anchor anchor{"LogsResource.cpp"};
-
-std::string now() {
-    return UtcTime::text(std::chrono::duration_cast<std::chrono::milliseconds>(
-                             std::chrono::system_clock::now().time_since_epoch())
-                             .count());
-}
 
 std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
     if (!log) {
@@ -47,14 +43,30 @@ std::vector<Condition> conditionsOf(const std::optional<std::string>& log) {
 }
 
 /// The log's ledger; null when a refresh has just stopped its monitoring.
-std::string ledgerOf(const std::vector<LogLedgerView>& ledgers, const std::string& log,
-                     bool withSamples) {
-    for (const LogLedgerView& ledger : ledgers) {
-        if (ledger.log == log) {
-            return LogLedgers::json(ledger, withSamples);
-        }
+void writeLedger(JsonWriter& json, const std::vector<LogLedgerView>& ledgers, std::string_view log,
+                 bool withSamples) {
+    const auto ledger =
+        std::find_if(ledgers.begin(), ledgers.end(),
+                     [log](const LogLedgerView& candidate) { return candidate.log == log; });
+    if (ledger == ledgers.end()) {
+        json.null();
+    } else {
+        LogLedgers::write(json, *ledger, withSamples);
     }
-    return "null";
+}
+
+void writeLogs(JsonWriter& json, const Sample& sample, const std::vector<LogLedgerView>& ledgers,
+               bool withSamples) {
+    const RowJson format(sample.layout());
+    for (std::size_t index = 0; index < sample.size(); ++index) {
+        const char* const row = sample.row(index);
+        const std::string log = LogPath::of(sample.layout(), row);
+        json.beginObject().member("log", log).key("row");
+        format.write(json, row);
+        json.key("ledger");
+        writeLedger(json, ledgers, log, withSamples);
+        json.endObject();
+    }
 }
 
 /// What the [[log]] tables match.
@@ -88,24 +100,20 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
     for (LogLedgerView& ledger : ledgers) {
         ledger.warnings = m_watch.of(ledger.log);
     }
-    std::string text = "{\"logs\":[";
-    for (std::size_t index = 0; index < count; ++index) {
-        text += index == 0 ? "{\"log\":" : ",{\"log\":";
-        RowJson::appendText(text, LogPath::of(sample->layout(), sample->row(index)));
-        text += ",\"row\":";
-        RowJson::append(text, sample->layout(), sample->row(index));
-        text +=
-            ",\"ledger\":" +
-            ledgerOf(ledgers, LogPath::of(sample->layout(), sample->row(index)), log.has_value());
-        text += '}';
-    }
-    text += "],\"unmonitored\":[";
-    for (std::size_t index = 0; index < unmonitored.size(); ++index) {
-        text += (index == 0 ? "" : ",") + UnmonitoredLogs::json(unmonitored[index]);
-    }
-    return HttpAnswer::json(
-        text + "],\"configuration\":" + UnmonitoredLogs::configurationJson(configured) +
-        ",\"tables\":" + (log ? "[]" : tables()) + ",\"time\":\"" + now() + "\"}");
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("logs").beginArray();
+        if (sample) {
+            writeLogs(json, *sample, ledgers, log.has_value());
+        }
+        json.endArray().key("unmonitored").beginArray();
+        for (const UnmonitoredLogs::Log& one : unmonitored) {
+            one.write(json);
+        }
+        json.endArray().key("configuration");
+        configured.writeConfiguration(json);
+        json.key("tables").raw(log ? "[]" : tables());
+        json.key("time").time(WallClock::now()).endObject();
+    }));
 }
 
 void LogsResource::addRoutes(Router& router) {

@@ -2,11 +2,11 @@
 
 #include "base/ProcessValues.h"
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/config/ConditionParser.h"
-#include "host/events/RowJson.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
@@ -82,20 +82,6 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     return report;
 }
 
-namespace {
-
-std::string columnNames() {
-    std::string list = "[";
-    for (const Column& column : columnsOf("RMLOGENT")) {
-        list += list.size() == 1 ? "\"" : ",\"";
-        list += column.name;
-        list += '"';
-    }
-    return list + "]";
-}
-
-} // namespace
-
 void ReportResource::addRoutes(Router& router) {
     router.add("POST", "/api/v1/reports",
                [this](const HttpRequest& request) { return report(request); });
@@ -109,14 +95,17 @@ HttpAnswer ReportResource::report(const HttpRequest& request) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
     const SampleSource::Rows rows = m_source.take("RMLOGENT", wanted.conditions);
-    std::string text = "{\"log\":";
-    RowJson::appendText(text, wanted.log);
-    text += ",\"from\":\"" + wanted.from + "\",\"to\":\"" + wanted.to +
-            "\",\"columns\":" + columnNames() + ",\"rows\":" + rows.json +
-            ",\"count\":" + std::to_string(rows.count) +
-            ",\"truncated\":" + (rows.truncated ? "true," : "false,") + rows.reachJson() +
-            ",\"max_rows\":" + std::to_string(gMaxRows) + "}";
-    return HttpAnswer::json(std::move(text));
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("log", wanted.log);
+        json.member("from", wanted.from).member("to", wanted.to);
+        json.key("columns").beginArray();
+        for (const Column& column : columnsOf("RMLOGENT")) {
+            json.value(column.name);
+        }
+        json.endArray();
+        rows.write(json);
+        json.member("max_rows", gMaxRows).endObject();
+    }));
 }
 
 } // namespace zrm::host

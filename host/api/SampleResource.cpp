@@ -1,5 +1,6 @@
 #include "host/api/SampleResource.h"
 
+#include "host/base/JsonWriter.h"
 #include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/http/JsonFields.h"
@@ -148,9 +149,11 @@ HttpAnswer SampleResource::sample(const HttpRequest& request) {
         throw RequestRefused(404, "the agent does not monitor this log", "filters");
     }
     const SampleSource::Rows rows = m_source.take(table, wanted);
-    return HttpAnswer::json("{\"table\":\"" + table + "\",\"rows\":" + rows.json +
-                            ",\"count\":" + std::to_string(rows.count) + ",\"truncated\":" +
-                            (rows.truncated ? "true," : "false,") + rows.reachJson() + "}");
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("table", table);
+        rows.write(json);
+        json.endObject();
+    }));
 }
 
 } // namespace zrm::host

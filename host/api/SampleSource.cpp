@@ -13,6 +13,7 @@
 #include <iterator>
 #include <optional>
 #include <semaphore>
+#include <utility>
 
 namespace zrm::host {
 
@@ -28,19 +29,10 @@ bool namesLog(const Condition& condition) {
 
 } // namespace
 
-std::string SampleSource::Rows::reachJson() const {
-    std::string text = reason.empty() ? "\"complete\":true" : "\"complete\":false";
-    text += ",\"reached\":";
-    reached.empty() ? void(text += "null") : RowJson::appendText(text, reached);
-    text += ",\"reason\":";
-    reason.empty() ? void(text += "null") : RowJson::appendText(text, reason);
-    return text;
-}
-
-bool SampleSource::isMonitored(const std::vector<Condition>& report) {
-    std::vector<Condition> log;
-    std::copy_if(report.begin(), report.end(), std::back_inserter(log), namesLog);
-    return take("RMMONLOG", log).count > 0;
+void SampleSource::Rows::write(JsonWriter& json) const {
+    json.key("rows").raw(this->json);
+    json.member("count", count).member("truncated", truncated);
+    reach.write(json);
 }
 
 namespace {
@@ -68,6 +60,17 @@ private:
     const bool m_isReport;
 };
 
+std::string rowsOf(const Sample& sample) {
+    const RowJson format(sample.layout());
+    return JsonWriter::text([&](JsonWriter& json) {
+        json.beginArray();
+        for (std::size_t index = 0; index < sample.size(); ++index) {
+            format.write(json, sample.row(index));
+        }
+        json.endArray();
+    });
+}
+
 } // namespace
 
 SampleSource::Rows TableSampler::take(std::string_view table,
@@ -77,24 +80,26 @@ SampleSource::Rows TableSampler::take(std::string_view table,
     const ReportOutcome outcome;
     const std::optional<Sample> sample = Sample::take(table, conditions, "HTTP");
     Rows rows;
-    rows.json = "[";
-    if (sample) {
-        for (; rows.count < sample->size(); ++rows.count) {
-            rows.json += rows.count == 0 ? "" : ",";
-            RowJson::append(rows.json, sample->layout(), sample->row(rows.count));
-        }
-    }
-    rows.json += ']';
+    rows.count = sample ? sample->size() : 0;
+    rows.json = sample ? rowsOf(*sample) : "[]";
     // The agent counts the rows that it reads, before the conditions.
     rows.truncated =
         sample && table == "RMLOGENT" && sample->offered() >= static_cast<std::uint64_t>(gMaxRows);
     if (!sample) {
-        rows.reason = "the agent cannot take any more requests";
+        rows.reach.reason = "the agent cannot take any more requests";
     } else if (!outcome.isComplete()) {
-        rows.reason = outcome.reason();
+        rows.reach.reason = outcome.reason();
     }
-    rows.reached = outcome.reached();
+    rows.reach.reached = outcome.reached();
     return rows;
+}
+
+bool TableSampler::isMonitored(const std::vector<Condition>& report) {
+    TraceScope trace(anchor);
+    std::vector<Condition> log;
+    std::copy_if(report.begin(), report.end(), std::back_inserter(log), namesLog);
+    const std::optional<Sample> monitored = Sample::take("RMMONLOG", std::move(log), "HTTP");
+    return monitored && monitored->size() > 0;
 }
 
 } // namespace zrm::host

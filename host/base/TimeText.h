@@ -2,6 +2,7 @@
 #define ZRM_HOST_TIME_TEXT_H
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -24,8 +25,14 @@ inline std::int64_t now() {
 /// The host's times in the form that other systems read. Stateless.
 class UtcTime {
 public:
-    /// Appends a time in milliseconds since 1970-01-01 UTC, formatted as
-    /// "2026-11-20T07:03:09.412Z".
+    /// The room that the longest text needs: bytes.
+    static constexpr std::size_t mostBytes = 96;
+
+    /// Writes a time in milliseconds since 1970-01-01 UTC, formatted as "2026-11-20T07:03:09.412Z",
+    /// to room for `mostBytes`, and returns its length. Does not terminate it.
+    static std::size_t write(char* out, std::int64_t milliseconds);
+
+    /// The same at the end of a text.
     static void append(std::string& text, std::int64_t milliseconds);
 
     /// The same as a new text.

@@ -1,7 +1,7 @@
 #include "host/diagnose/LogLedgers.h"
 
 #include "base/TraceScope.h"
-#include "host/base/TimeText.h"
+#include "host/base/JsonWriter.h"
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
 #include "logmgr/LogManager.h"
@@ -10,8 +10,6 @@
 #include <algorithm>
 #include <array>
 #include <memory>
-
-#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
@@ -96,6 +94,21 @@ void addReasons(LogLedgerView& view) {
     }
 }
 
+void writeSamples(JsonWriter& json, const LogLedgerView& ledger) {
+    json.key("rejected").beginArray();
+    for (const LogLedgerView::Rejected& rejected : ledger.rejected) {
+        json.beginObject().key("time").time(rejected.time);
+        json.member("line", rejected.line).member("reason", rejected.reason).endObject();
+    }
+    json.endArray().key("skipped").beginArray();
+    for (const LogLedgerView::Skipped& skipped : ledger.skipped) {
+        json.beginObject().key("time").time(skipped.time);
+        json.member("from", skipped.from).member("to", skipped.to);
+        json.member("unread", skipped.unread).member("regrown", skipped.isRegrown).endObject();
+    }
+    json.endArray();
+}
+
 } // namespace
 
 std::vector<LogLedgerView> LogLedgers::read(std::string_view log) {
@@ -125,47 +138,28 @@ std::vector<LogLedgerView> LogLedgers::read(std::string_view log) {
     return views;
 }
 
-std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
-    nlohmann::ordered_json object{
-        {"bytes_read", ledger.bytesRead},
-        {"lines", ledger.lines},
-        {"rows", ledger.rows},
-        {"format_errors", ledger.formatErrors},
-        {"without_time", ledger.withoutTime},
-        {"truncations", ledger.truncations},
-        {"skipped_bytes", ledger.skippedBytes},
-        {"restarts", ledger.restarts},
-        {"last_entry", nullptr},
-    };
-    if (ledger.lastEntry) {
-        object["last_entry"] = UtcTime::text(*ledger.lastEntry);
-    }
-    object["warnings"] = nlohmann::ordered_json::array();
+void LogWarning::write(JsonWriter& json) const {
+    json.member("kind", kind).key("since").time(since).member("text", text);
+}
+
+void LogLedgers::write(JsonWriter& json, const LogLedgerView& ledger, bool withSamples) {
+    json.beginObject().member("bytes_read", ledger.bytesRead);
+    json.member("lines", ledger.lines).member("rows", ledger.rows);
+    json.member("format_errors", ledger.formatErrors).member("without_time", ledger.withoutTime);
+    json.member("truncations", ledger.truncations).member("skipped_bytes", ledger.skippedBytes);
+    json.member("restarts", ledger.restarts).key("last_entry");
+    ledger.lastEntry ? json.time(*ledger.lastEntry) : json.null();
+    json.key("warnings").beginArray();
     for (const LogWarning& warning : ledger.warnings) {
-        object["warnings"].push_back(LogWarnings::json(warning));
+        json.beginObject();
+        warning.write(json);
+        json.endObject();
     }
+    json.endArray();
     if (withSamples) {
-        object["rejected"] = nlohmann::ordered_json::array();
-        for (const LogLedgerView::Rejected& rejected : ledger.rejected) {
-            object["rejected"].push_back({{"time", UtcTime::text(rejected.time)},
-                                          {"line", rejected.line},
-                                          {"reason", rejected.reason}});
-        }
-        object["skipped"] = nlohmann::ordered_json::array();
-        for (const LogLedgerView::Skipped& skipped : ledger.skipped) {
-            nlohmann::ordered_json unread;
-            if (skipped.unread) {
-                unread = *skipped.unread;
-            }
-            object["skipped"].push_back({{"time", UtcTime::text(skipped.time)},
-                                         {"from", skipped.from},
-                                         {"to", skipped.to},
-                                         {"unread", unread},
-                                         {"regrown", skipped.isRegrown}});
-        }
+        writeSamples(json, ledger);
     }
-    // A line may hold any bytes.
-    return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
+    json.endObject();
 }
 
 } // namespace zrm::host

@@ -11,11 +11,16 @@
 
 namespace zrm::host {
 
+class JsonWriter;
+
 /// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
     std::string kind;   ///< missing, replaced, named_twice, without_time or not_records
     std::int64_t since; ///< when it was first seen
     std::string text;   ///< what is wrong and how to fix it, in sentences
+
+    /// Writes `kind`, `since` and `text`, members of an object.
+    void write(JsonWriter& json) const;
 };
 
 /// A snapshot of what the monitor of one log has read and skipped since monitoring began. A refresh
@@ -68,8 +73,8 @@ public:
     /// not monitored. May wait for a refresh to end. Any thread, while the agent runs.
     static std::vector<LogLedgerView> read(std::string_view log = {});
 
-    /// A ledger as a JSON object; `withSamples` adds "rejected" and "skipped".
-    static std::string json(const LogLedgerView& ledger, bool withSamples);
+    /// Writes a ledger as an object; `withSamples` adds "rejected" and "skipped".
+    static void write(JsonWriter& json, const LogLedgerView& ledger, bool withSamples);
 };
 
 } // namespace zrm::host

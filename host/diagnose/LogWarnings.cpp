@@ -19,7 +19,6 @@
 #include <optional>
 #include <string_view>
 
-#include <nlohmann/json.hpp>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -189,11 +188,6 @@ std::string LogWarnings::ofSyslogFile(const std::string& path) {
                       : std::string("None of the file's last lines begins with a time like \"Oct  "
                                     "5 07:03:09\", so its entries would have none. ") +
                             syslogCure;
-}
-
-nlohmann::ordered_json LogWarnings::json(const LogWarning& warning) {
-    return {
-        {"kind", warning.kind}, {"since", UtcTime::text(warning.since)}, {"text", warning.text}};
 }
 
 } // namespace zrm::host

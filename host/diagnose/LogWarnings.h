@@ -7,8 +7,6 @@
 #include <string>
 #include <vector>
 
-#include <nlohmann/json_fwd.hpp>
-
 namespace zrm::host {
 
 /// What an operator should know about a log that is monitored without an error. Stateless; any
@@ -27,9 +25,6 @@ public:
                                         const std::optional<FileIdentity>& opened = std::nullopt);
     /// Why a file is not a syslog file: none of its last lines has a time.
     static std::string ofSyslogFile(const std::string& path);
-
-    /// A warning as a JSON object.
-    static nlohmann::ordered_json json(const LogWarning& warning);
 };
 
 } // namespace zrm::host

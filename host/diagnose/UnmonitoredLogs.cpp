@@ -2,6 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/Utf8.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/LogLedgers.h"
@@ -15,7 +16,6 @@
 #include <fstream>
 #include <iterator>
 
-#include <nlohmann/json.hpp>
 #include <sys/stat.h>
 
 namespace zrm::host {
@@ -139,21 +139,17 @@ std::vector<UnmonitoredLogs::Log> UnmonitoredLogs::find(std::string_view text,
     return logs;
 }
 
-std::string UnmonitoredLogs::json(const Log& log) {
-    const nlohmann::ordered_json object{
-        {"log", log.log}, {"line", log.line}, {"reason", log.reason}, {"cause", log.cause}};
-    return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
+void UnmonitoredLogs::Log::write(JsonWriter& json) const {
+    json.beginObject().member("log", log).member("line", line);
+    json.member("reason", reason).member("cause", cause).endObject();
 }
 
-std::string UnmonitoredLogs::configurationJson(const Result& result) {
-    if (result.file.empty()) {
-        return "null";
+void UnmonitoredLogs::Result::writeConfiguration(JsonWriter& json) const {
+    if (file.empty()) {
+        json.null();
+    } else {
+        json.beginObject().member("file", file).textOrNull("problem", problem).endObject();
     }
-    nlohmann::ordered_json object{{"file", result.file}, {"problem", nullptr}};
-    if (!result.problem.empty()) {
-        object["problem"] = result.problem;
-    }
-    return object.dump(-1, ' ', false, nlohmann::ordered_json::error_handler_t::replace);
 }
 
 } // namespace zrm::host

@@ -9,6 +9,8 @@
 
 namespace zrm::host {
 
+class JsonWriter;
+
 /// Finds the logs that the log configuration names and the agent does not monitor. The agent
 /// passes over a line that it cannot use, and its tables have no row for it; who runs the agent
 /// wants to see it all the same. Stateless.
@@ -20,12 +22,18 @@ public:
         std::string reason;
         const char* cause; ///< "file", "text", or "refresh" when only that is missing; "touch":
                            ///< and a refresh would take the configuration for unchanged
+
+        /// Writes the object that the API answers.
+        void write(JsonWriter& json) const;
     };
 
     struct Result {
         std::string file;      ///< the log configuration; empty when none is set
         std::string problem;   ///< why it cannot be read; empty when it can
         std::vector<Log> logs; ///< in the order of its lines, each once
+
+        /// Writes the file and its problem as the API answers them; null where nothing is set.
+        void writeConfiguration(JsonWriter& json) const;
     };
 
     /// The configuration of this process as it is now, against the logs that its agent monitors.
@@ -37,11 +45,6 @@ public:
     /// `isTakenOver`: a refresh would take the configuration for unchanged.
     static std::vector<Log> find(std::string_view text, const std::set<std::string>& monitored,
                                  bool isTakenOver = false);
-
-    /// A log as the JSON object that the API answers.
-    static std::string json(const Log& log);
-    /// The file and its problem, as the API answers them; null where nothing is set.
-    static std::string configurationJson(const Result& result);
 };
 
 } // namespace zrm::host

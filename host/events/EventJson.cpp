@@ -1,38 +1,24 @@
 #include "host/events/EventJson.h"
 
-#include "host/base/TimeText.h"
-#include "host/events/RowJson.h"
 #include "host/events/RowText.h"
 
-#include <charconv>
 #include <utility>
 
 namespace zrm::host {
 
-namespace {
-
-void appendNumber(std::string& text, std::uint64_t number) {
-    char buffer[24];
-    const auto [end, error] = std::to_chars(buffer, buffer + sizeof buffer, number);
-    text.append(buffer, end);
-}
-
-} // namespace
-
-EventJson::EventJson(RowLayout layout) : m_layout(std::move(layout)) {}
+EventJson::EventJson(RowLayout layout) : m_layout(std::move(layout)), m_row(m_layout) {}
 
 void EventJson::append(std::string& text, const Event& event) const {
-    text += "{\"id\":";
-    appendNumber(text, event.id);
-    text += ",\"situation\":";
-    RowJson::appendText(text, event.situation->name);
-    text += ",\"severity\":";
-    RowJson::appendText(text, event.situation->severity);
-    text += ",\"raised\":\"";
-    UtcTime::append(text, event.raised);
-    text += "\",\"row\":";
-    RowJson::append(text, m_layout, event.row);
-    text += '}';
+    JsonWriter::append(text, [&](JsonWriter& json) {
+        json.beginObject();
+        json.member("id", event.id);
+        json.key(m_situationKey).value(event.situation->name);
+        json.key(m_severityKey).value(event.situation->severity);
+        json.key(m_raisedKey).time(event.raised);
+        json.key(m_rowKey);
+        m_row.write(json, event.row);
+        json.endObject();
+    });
 }
 
 void EventJson::appendLog(std::string& text, const Event& event) const {

@@ -2,6 +2,7 @@
 #define ZRM_HOST_EVENT_JSON_H
 
 #include "host/events/Event.h"
+#include "host/events/RowJson.h"
 #include "host/framework/RowLayout.h"
 
 #include <string>
@@ -23,6 +24,11 @@ public:
 
 private:
     RowLayout m_layout;
+    RowJson m_row;
+    JsonKey m_situationKey{"situation"};
+    JsonKey m_severityKey{"severity"};
+    JsonKey m_raisedKey{"raised"};
+    JsonKey m_rowKey{"row"};
 };
 
 } // namespace zrm::host

@@ -1,22 +1,28 @@
 #ifndef ZRM_HOST_ROW_JSON_H
 #define ZRM_HOST_ROW_JSON_H
 
+#include "host/base/JsonWriter.h"
 #include "host/framework/RowLayout.h"
 
-#include <string>
-#include <string_view>
+#include <vector>
 
 namespace zrm::host {
 
-/// Writes rows as JSON, fast enough for every event. Any thread.
+/// Writes the rows of a table as JSON, fast enough for every event. Immutable, so any thread.
 class RowJson {
 public:
-    /// Appends one row as an object: the columns under their upper-case names in table order,
-    /// character columns as returned by RowText, integers as numbers.
-    static void append(std::string& out, const RowLayout& layout, const char* row);
+    explicit RowJson(const RowLayout& layout);
 
-    /// Appends a text as a JSON string; bytes that are not UTF-8 become U+FFFD.
-    static void appendText(std::string& out, std::string_view text);
+    /// Writes one row as an object: the columns under their upper-case names in table order,
+    /// character columns as returned by RowText, integers as numbers.
+    void write(JsonWriter& json, const char* row) const;
+
+private:
+    struct Column {
+        JsonKey key;
+        RowColumn column;
+    };
+    std::vector<Column> m_columns;
 };
 
 } // namespace zrm::host

@@ -1,6 +1,7 @@
 #include "host/framework/ColumnText.h"
 
 #include <algorithm>
+#include <bit>
 #include <cstdint>
 #include <cstring>
 
@@ -28,6 +29,14 @@ bool isBlankBlock(const char* bytes) noexcept {
             (words[3] ^ blanks)) == 0;
 }
 
+/// The number of blanks with which eight bytes end that are not all blank; `others` has zeros where
+/// there is a blank.
+std::size_t blanksAtEnd(std::uint64_t others) noexcept {
+    const int bits = std::endian::native == std::endian::little ? std::countl_zero(others)
+                                                                : std::countr_zero(others);
+    return static_cast<std::size_t>(bits) / 8;
+}
+
 /// Difference of the text's first byte that is not a blank from a blank; 0 when there is none.
 int compareWithBlanks(std::string_view text) noexcept {
     const std::size_t position = text.find_first_not_of(' ');
@@ -42,7 +51,11 @@ std::string_view ColumnText::withoutTrailingBlanks(std::string_view text) noexce
     while (size >= block && isBlankBlock(text.data() + size - block)) {
         size -= block;
     }
-    while (size >= sizeof blanks && wordAt(text.data() + size - sizeof blanks) == blanks) {
+    while (size >= sizeof blanks) {
+        const std::uint64_t others = wordAt(text.data() + size - sizeof blanks) ^ blanks;
+        if (others != 0) {
+            return text.substr(0, size - blanksAtEnd(others));
+        }
         size -= sizeof blanks;
     }
     while (size > 0 && text[size - 1] == ' ') {

@@ -1,7 +1,7 @@
 #include "host/history/EntryRecorder.h"
 
 #include "base/TraceScope.h"
-#include "host/events/EventJson.h"
+#include "host/events/RowText.h"
 #include "host/framework/Sample.h"
 
 #include <utility>
@@ -45,13 +45,9 @@ void EntryRecorder::record() {
     MinuteCounts minute;
     minute.minute = *m_minute;
     std::map<std::string, std::int32_t> counts;
-    const EventJson format(logs->layout());
     for (std::size_t index = 0; index < logs->size(); ++index) {
-        Event row;
-        row.row = logs->row(index);
-        std::string log;
-        format.appendLog(log, row);
-        const std::int32_t now = count->integer(row.row);
+        const std::string log = LogPath::of(logs->layout(), logs->row(index));
+        const std::int32_t now = count->integer(logs->row(index));
         const auto before = m_counts.find(log);
         if (const std::uint64_t entries =
                 difference(before == m_counts.end() ? 0 : before->second, now);

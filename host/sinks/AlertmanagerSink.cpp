@@ -1,26 +1,22 @@
 #include "host/sinks/AlertmanagerSink.h"
 
+#include "host/base/JsonWriter.h"
 #include "host/base/SteeringText.h"
 #include "host/base/TimeText.h"
 #include "host/sinks/EventRow.h"
 
 #include <string_view>
-#include <utility>
-
-#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
 namespace {
 
-using Json = nlohmann::ordered_json;
-
-Json annotationsOf(const EventRecord& event, const EventRow& row) {
+void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow& row) {
     const std::string_view what = event.text.empty() ? event.situation : event.text;
-    return {{"summary", std::string(what) + " in " + std::string(event.log)},
-            {"description", row.description()},
-            {"source", row.source()},
-            {"event", std::to_string(event.id)}};
+    json.beginObject().member("summary", std::string(what) + " in " + std::string(event.log));
+    json.member("description", row.description());
+    json.member("source", row.source());
+    json.member("event", std::to_string(event.id)).endObject();
 }
 
 } // namespace
@@ -30,24 +26,38 @@ AlertmanagerSink::AlertmanagerSink(const SinkConfig& config)
       m_labels(config.texts("labels")), m_generatorUrl(config.text("generator_url")) {}
 
 std::string AlertmanagerSink::bodyOf(std::span<const EventRecord> events) const {
-    Json alerts = Json::array();
-    for (const EventRecord& event : events) {
-        const EventRow row(event);
-        Json labels = {{"alertname", event.situation},
-                       {"severity", event.severity},
-                       {"log", event.log},
-                       {"node", row.node()}};
-        labels.update(m_labels);
-        Json alert = {{"labels", std::move(labels)},
-                      {"annotations", annotationsOf(event, row)},
-                      {"startsAt", UtcTime::text(event.raised)},
-                      {"endsAt", UtcTime::text(event.raised + m_resolveAfter.count())}};
-        if (!m_generatorUrl.empty()) {
-            alert["generatorURL"] = m_generatorUrl;
+    return SteeringText::escapedInJson(JsonWriter::text([&](JsonWriter& json) {
+        json.beginArray();
+        for (const EventRecord& event : events) {
+            writeAlert(json, event);
         }
-        alerts.push_back(std::move(alert));
+        json.endArray();
+    }));
+}
+
+void AlertmanagerSink::writeAlert(JsonWriter& json, const EventRecord& event) const {
+    const EventRow row(event);
+    json.beginObject().key("labels");
+    writeLabels(json, event, row);
+    json.key("annotations");
+    writeAnnotations(json, event, row);
+    json.key("startsAt").time(event.raised);
+    json.key("endsAt").time(event.raised + m_resolveAfter.count());
+    if (!m_generatorUrl.empty()) {
+        json.member("generatorURL", m_generatorUrl);
     }
-    return SteeringText::escapedInJson(alerts.dump(-1, ' ', false, Json::error_handler_t::replace));
+    json.endObject();
+}
+
+/// The event's labels, then the configured ones, which have other names.
+void AlertmanagerSink::writeLabels(JsonWriter& json, const EventRecord& event,
+                                   const EventRow& row) const {
+    json.beginObject().member("alertname", event.situation).member("severity", event.severity);
+    json.member("log", event.log).member("node", row.node());
+    for (const auto& [name, value] : m_labels) {
+        json.member(name, value);
+    }
+    json.endObject();
 }
 
 } // namespace zrm::host

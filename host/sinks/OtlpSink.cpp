@@ -1,6 +1,7 @@
 #include "host/sinks/OtlpSink.h"
 
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/SteeringText.h"
 #include "host/sinks/EventRow.h"
 
@@ -19,41 +20,45 @@ namespace {
 
 TRC1_Anchor anchor{"OtlpSink.cpp"};
 
-using Json = nlohmann::ordered_json;
+using Json = nlohmann::json;
 
 /// In the JSON encoding, 64-bit integers are strings.
-Json attribute(std::string_view key, std::int64_t value) {
-    return {{"key", key}, {"value", {{"intValue", std::to_string(value)}}}};
+void writeAttribute(JsonWriter& json, std::string_view key, std::int64_t value) {
+    json.beginObject().member("key", key).key("value");
+    json.beginObject().member("intValue", std::to_string(value)).endObject().endObject();
 }
 
-Json attribute(std::string_view key, std::string_view value) {
-    return {{"key", key}, {"value", {{"stringValue", value}}}};
+void writeAttribute(JsonWriter& json, std::string_view key, std::string_view value) {
+    json.beginObject().member("key", key).key("value");
+    json.beginObject().member("stringValue", value).endObject().endObject();
 }
 
-Json attributesOf(const EventRecord& event, const EventRow& row) {
-    Json attributes = Json::array();
-    attributes.push_back(attribute("zrm.id", static_cast<std::int64_t>(event.id)));
-    attributes.push_back(attribute("zrm.situation", event.situation));
-    attributes.push_back(attribute("log.file.path", event.log));
+void writeAttributes(JsonWriter& json, const EventRecord& event, const EventRow& row) {
+    json.beginArray();
+    writeAttribute(json, "zrm.id", static_cast<std::int64_t>(event.id));
+    writeAttribute(json, "zrm.situation", event.situation);
+    writeAttribute(json, "log.file.path", event.log);
     for (const EventRow::Column& column : row.columns()) {
         const std::string key = "zrm.column." + column.name;
         if (const auto* const number = std::get_if<std::int64_t>(&column.value)) {
-            attributes.push_back(attribute(key, *number));
+            writeAttribute(json, key, *number);
         } else if (const auto& text = std::get<std::string>(column.value); !text.empty()) {
-            attributes.push_back(attribute(key, text));
+            writeAttribute(json, key, text);
         }
     }
-    return attributes;
+    json.endArray();
 }
 
-Json recordOf(const EventRecord& event, const EventRow& row) {
+void writeRecord(JsonWriter& json, const EventRecord& event, const EventRow& row) {
     const std::string nanoseconds = std::to_string(event.raised) + "000000";
-    return {{"timeUnixNano", nanoseconds},
-            {"observedTimeUnixNano", nanoseconds},
-            {"severityNumber", SeverityCodes::of(event.severity).otel},
-            {"severityText", event.severity},
-            {"body", {{"stringValue", row.description()}}},
-            {"attributes", attributesOf(event, row)}};
+    json.beginObject().member("timeUnixNano", nanoseconds);
+    json.member("observedTimeUnixNano", nanoseconds);
+    json.member("severityNumber", SeverityCodes::of(event.severity).otel);
+    json.member("severityText", event.severity);
+    json.key("body").beginObject().member("stringValue", row.description()).endObject();
+    json.key("attributes");
+    writeAttributes(json, event, row);
+    json.endObject();
 }
 
 constexpr std::size_t longestRemark = 200; ///< bytes of a receiver's remark shown in a message
@@ -87,24 +92,32 @@ OtlpSink::OtlpSink(const SinkConfig& config)
       m_attributes(config.texts("attributes")) {}
 
 std::string OtlpSink::bodyOf(std::span<const EventRecord> events) const {
-    Json resource = Json::array({attribute("service.name", m_serviceName)});
-    Json records = Json::array();
-    for (const EventRecord& event : events) {
-        const EventRow row(event);
-        if (records.empty()) {
-            resource.push_back(attribute("host.name", row.node()));
+    return SteeringText::escapedInJson(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("resourceLogs").beginArray().beginObject();
+        json.key("resource").beginObject().key("attributes");
+        writeResource(json, events);
+        json.endObject();
+        json.key("scopeLogs").beginArray().beginObject();
+        json.key("scope").beginObject().member("name", "zrmagent").endObject();
+        json.key("logRecords").beginArray();
+        for (const EventRecord& event : events) {
+            writeRecord(json, event, EventRow(event));
         }
-        records.push_back(recordOf(event, row));
+        json.endArray().endObject().endArray().endObject().endArray().endObject();
+    }));
+}
+
+/// What the records of a request have in common.
+void OtlpSink::writeResource(JsonWriter& json, std::span<const EventRecord> events) const {
+    json.beginArray();
+    writeAttribute(json, "service.name", m_serviceName);
+    if (!events.empty()) {
+        writeAttribute(json, "host.name", EventRow(events.front()).node());
     }
     for (const auto& [key, value] : m_attributes) {
-        resource.push_back(attribute(key, std::string_view(value)));
+        writeAttribute(json, key, value);
     }
-    const Json body = {
-        {"resourceLogs",
-         Json::array({{{"resource", {{"attributes", std::move(resource)}}},
-                       {"scopeLogs", Json::array({{{"scope", {{"name", "zrmagent"}}},
-                                                   {"logRecords", std::move(records)}}})}}})}};
-    return SteeringText::escapedInJson(body.dump(-1, ' ', false, Json::error_handler_t::replace));
+    json.endArray();
 }
 
 void OtlpSink::taken(std::size_t events, const std::string& text) const {

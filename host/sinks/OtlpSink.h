@@ -5,6 +5,8 @@
 
 namespace zrm::host {
 
+class JsonWriter;
+
 /// Sends events as OpenTelemetry log records: OTLP over HTTP in its JSON encoding. Records that the
 /// receiver rejects from an accepted request are traced and not sent again, as the protocol
 /// requires.
@@ -17,6 +19,8 @@ protected:
     void taken(std::size_t events, const std::string& answer) const override;
 
 private:
+    void writeResource(JsonWriter& json, std::span<const EventRecord> events) const;
+
     const std::string m_serviceName;
     const SinkConfig::Texts m_attributes;
 };

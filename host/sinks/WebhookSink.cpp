@@ -1,6 +1,7 @@
 #include "host/sinks/WebhookSink.h"
 
 #include "base/TraceScope.h"
+#include "host/base/JsonWriter.h"
 #include "host/sinks/SecretFile.h"
 
 #include <algorithm>
@@ -36,12 +37,13 @@ std::string HmacSha256::hex(std::string_view secret, std::string_view text) {
 namespace {
 
 std::string bodyOf(std::span<const EventRecord> events) {
-    std::string body;
-    for (const EventRecord& event : events) {
-        body += body.empty() ? "{\"events\":[" : ",";
-        body += event.json;
-    }
-    return body + "]}";
+    return JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().key("events").beginArray();
+        for (const EventRecord& event : events) {
+            json.raw(event.json);
+        }
+        json.endArray().endObject();
+    });
 }
 
 /// Distinguishes a request from all others of this agent. Event ids alone would not: without a

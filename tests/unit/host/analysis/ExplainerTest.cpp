@@ -243,10 +243,13 @@ TEST_F(ExplainerTest, RebuildsRowsFromEvents) {
     Explainer asked = explainer();
     zrm_rmlogent_data_t row = rowAt(10, "it's \"hit\" \\ <b>");
     row.freqthresh = 5;
-    std::string json = "{\"id\":1,\"row\":";
-    RowJson::append(json, asked.layout(), reinterpret_cast<const char*>(&row));
+    const std::string event = JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("id", 1).key("row");
+        RowJson(asked.layout()).write(json, reinterpret_cast<const char*>(&row));
+        json.endObject();
+    });
     zrm_rmlogent_data_t read;
-    ASSERT_TRUE(StoredRow::fill(read, asked.layout(), json + "}"));
+    ASSERT_TRUE(StoredRow::fill(read, asked.layout(), event));
     EXPECT_TRUE(StoredRow::isSameEntry(asked.layout(), row, read));
     EXPECT_EQ(read.freqthresh, 5);
     read.entrysrc[0] = 'x';

@@ -74,6 +74,28 @@ TEST_F(TableSamplerTest, IsTruncatedWhenTheAgentReadAsManyRowsAsItMay) {
     EXPECT_EQ(sample.count, 1u);
 }
 
+TEST_F(TableSamplerTest, ALogIsMonitoredWhenItsNameIsInTheTable) {
+    TestManager logs{"RMMONLOG"};
+    TableManager::RegisterWithManager(&logs);
+    logs.onCreate = entries.onCreate;
+    Condition name;
+    name.column = "LOGNAME";
+    name.text = "a\"b.log";
+    Condition other; // the conditions of a report that do not name its log are not for this table
+    other.column = "NUMBER";
+    other.isNumber = true;
+    other.number = 5;
+    EXPECT_TRUE(sampler.isMonitored({name, other}));
+    name.text = "b.log";
+    EXPECT_FALSE(sampler.isMonitored({name, other}));
+    rows = 0;
+    EXPECT_FALSE(sampler.isMonitored({}));
+}
+
+TEST_F(TableSamplerTest, ALogIsNotMonitoredWhereNoTableIsRegistered) {
+    EXPECT_FALSE(sampler.isMonitored({}));
+}
+
 TEST_F(TableSamplerTest, ATableThatIsNotRegisteredHasNoRows) {
     const SampleSource::Rows sample = sampler.take("RMMONLOG", {});
     EXPECT_EQ(sample.json, "[]");

@@ -1,5 +1,7 @@
 #include "host/diagnose/UnmonitoredLogs.h"
 
+#include "host/base/JsonWriter.h"
+
 #include "support/TemporaryDirectory.h"
 
 #include <cstdlib>
@@ -14,6 +16,10 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::SizeIs;
+
+std::string configurationOf(const UnmonitoredLogs::Result& result) {
+    return JsonWriter::text([&](JsonWriter& json) { result.writeConfiguration(json); });
+}
 
 class UnmonitoredLogsTest : public testing::Test {
 protected:
@@ -78,20 +84,19 @@ TEST_F(UnmonitoredLogsTest, AnUnreadableConfigurationIsReported) {
     const std::string configuration = m_directory.file("logs.conf");
     ASSERT_EQ(setenv("ZRM_CONFIG_FILE", configuration.c_str(), 1), 0);
     UnmonitoredLogs::Result result = UnmonitoredLogs::read();
-    EXPECT_EQ(UnmonitoredLogs::configurationJson(result),
+    EXPECT_EQ(configurationOf(result),
               "{\"file\":\"" + configuration + "\",\"problem\":\"No such file or directory\"}");
     m_directory.write("logs.conf", m_gone + " ;N\n");
     result = UnmonitoredLogs::read();
-    EXPECT_EQ(UnmonitoredLogs::configurationJson(result),
-              "{\"file\":\"" + configuration + "\",\"problem\":null}");
+    EXPECT_EQ(configurationOf(result), "{\"file\":\"" + configuration + "\",\"problem\":null}");
     ASSERT_THAT(result.logs, SizeIs(1));
     EXPECT_THAT(
-        UnmonitoredLogs::json(result.logs[0]),
+        JsonWriter::text([&](JsonWriter& json) { result.logs[0].write(json); }),
         HasSubstr("{\"log\":\"" + m_gone + "\",\"line\":1,\"reason\":\"The file cannot be used"));
     ASSERT_EQ(setenv("ZRM_CONFIG_FILE", m_directory.path().c_str(), 1), 0);
     EXPECT_EQ(UnmonitoredLogs::read().problem, "It is not a regular file");
     unsetenv("ZRM_CONFIG_FILE");
-    EXPECT_EQ(UnmonitoredLogs::configurationJson(UnmonitoredLogs::read()), "null");
+    EXPECT_EQ(configurationOf(UnmonitoredLogs::read()), "null");
 }
 
 } // namespace

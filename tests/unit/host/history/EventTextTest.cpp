@@ -1,6 +1,6 @@
 #include "host/history/EventText.h"
 
-#include "host/events/RowJson.h"
+#include "host/base/JsonWriter.h"
 
 #include <gtest/gtest.h>
 
@@ -14,11 +14,10 @@ using namespace zrm::host;
 namespace {
 
 std::string documentOf(const std::string& description) {
-    std::string json = R"({"id":17,"situation":"Disk Full","severity":"major","row":{)"
-                       R"("ORIGINNODE":"web1:ZRM","ENTRYTIME":"1261120070309000",)"
-                       R"("ENTRYSRC":"sshd[412]","FREQTHRESH":5,"UENTRYDESC":)";
-    RowJson::appendText(json, description);
-    return json + "}}";
+    return R"({"id":17,"situation":"Disk Full","severity":"major","row":{)"
+           R"("ORIGINNODE":"web1:ZRM","ENTRYTIME":"1261120070309000",)"
+           R"("ENTRYSRC":"sshd[412]","FREQTHRESH":5,"UENTRYDESC":)" +
+           JsonWriter::text([&](JsonWriter& json) { json.value(description); }) + "}}";
 }
 
 bool isFound(const std::string& text, const std::string& description = "") {

@@ -49,7 +49,14 @@ public:
         handoff.pass();
         return rows;
     }
+    bool isMonitored(const std::vector<Condition>& report) override {
+        handoff.pass();
+        const bool answer = onIsMonitored(report);
+        handoff.pass();
+        return answer;
+    }
     Handoff handoff;
+    std::function<bool(std::vector<Condition>)> onIsMonitored = [](auto) { return true; };
     std::function<Rows(std::string, std::vector<Condition>)> onTake = [](auto, auto) {
         return Rows{R"([{"LOGNAME":"auth.log"}])", 1, false};
     };
@@ -127,8 +134,9 @@ TEST_F(HttpServerTest, ASampleReturnsItsRowsAndTheirNumber) {
 
 TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
     source.onTake = [](const std::string& table, const std::vector<Condition>& conditions) {
-        EXPECT_EQ(conditions.size(), table == "RMLOGENT" ? 4u : 2u);
-        return SampleSource::Rows{"[{}]", 1, true, "1261120070309000", "it read enough"};
+        EXPECT_EQ(table, "RMLOGENT");
+        EXPECT_EQ(conditions.size(), 4u);
+        return SampleSource::Rows{"[{}]", 1, true, {"1261120070309000", "it read enough"}};
     };
     const auto result = sample("RMLOGENT", report());
     ASSERT_TRUE(result);
@@ -139,15 +147,19 @@ TEST_F(HttpServerTest, AReportSaysThatItWasTruncated) {
 
 TEST_F(HttpServerTest, AReportOnALogThatIsNotMonitoredIsAProblem) {
     std::vector<std::string> asked;
-    std::size_t monitored = 0;
+    bool isMonitored = false;
+    source.onIsMonitored = [&](const std::vector<Condition>& report) {
+        asked.push_back("monitored " + std::to_string(report.size()));
+        return isMonitored;
+    };
     source.onTake = [&](const std::string& table, const std::vector<Condition>& conditions) {
         asked.push_back(table + " " + std::to_string(conditions.size()));
-        return SampleSource::Rows{"[]", table == "RMMONLOG" ? monitored : 0, false};
+        return SampleSource::Rows{"[]", 0, false};
     };
     expectProblem(sample("RMLOGENT", report()), 404, "the agent does not monitor this log",
                   "filters");
-    EXPECT_THAT(asked, testing::ElementsAre("RMMONLOG 2")) << "the agent is not asked for it";
-    monitored = 1;
+    EXPECT_THAT(asked, testing::ElementsAre("monitored 4")) << "the agent is not asked for it";
+    isMonitored = true;
     const auto result = sample("RMLOGENT", report());
     ASSERT_TRUE(result);
     EXPECT_EQ(result->body, R"({"table":"RMLOGENT","rows":[],"count":0,"truncated":false,)"

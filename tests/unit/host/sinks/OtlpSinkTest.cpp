@@ -13,9 +13,10 @@ using namespace zrm::host;
 
 namespace {
 
-using Json = nlohmann::json;
+using Json = nlohmann::ordered_json;
 using Request = ScriptedServer::Request;
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::IsEmpty;
 
 class OtlpSinkTest : public testing::Test {
@@ -75,7 +76,17 @@ TEST_F(OtlpSinkTest, SendsLogRecords) {
     records.push_back(
         record("1", "1795158189412000000", 21, "critical", "Failed password for root"));
     records.push_back(record("2", "1795158190412000000", 10, "minor", "caf\xc3\xa9"));
-    EXPECT_EQ(Json::parse(server.requests()[0].body), expected);
+    EXPECT_EQ(server.requests()[0].body, expected.dump());
+}
+
+TEST_F(OtlpSinkTest, NeitherBreaksTheBodyNorSteersATerminalWithATextOfALog) {
+    events.add({.description = R"(\"\u001b[31m\u009b\u202e\u007f)", .log = "/x\"\xff\x7f"});
+    OtlpSink sink(config());
+    EXPECT_EQ(deliver(sink), 2u);
+    const std::string body = server.requests()[0].body;
+    EXPECT_THAT(body, HasSubstr(R"("stringValue":"\"\u001b[31m\u009b\u202e\u007f")"));
+    EXPECT_THAT(body, HasSubstr("\"/x\\\"\xef\xbf\xbd\\u007f\""));
+    EXPECT_TRUE(Json::accept(body));
 }
 
 TEST_F(OtlpSinkTest, ReportsRecordsThatTheReceiverRejected) {
