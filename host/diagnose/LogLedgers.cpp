@@ -44,7 +44,9 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.file = log.fileNameLocal();
     view.type = log.type();
     view.procedure = log.procedure();
-    view.isFollowed = log.followSettings() != nullptr;
+    if (const FollowLedger* const follow = log.followLedger()) {
+        view.follow = FollowView::of(*follow);
+    }
     view.openFile = ledger.file();
     view.bytesRead = ledger.bytesRead();
     // A line is counted before it is found not to fit: in this order there are never more of these.
@@ -140,6 +142,7 @@ std::string LogLedgers::json(const LogLedgerView& ledger, bool withSamples) {
     if (ledger.lastEntry) {
         object["last_entry"] = UtcTime::text(*ledger.lastEntry);
     }
+    object["follow"] = ledger.follow ? ledger.follow->json(withSamples) : nullptr;
     object["warnings"] = nlohmann::ordered_json::array();
     for (const LogWarning& warning : ledger.warnings) {
         object["warnings"].push_back(LogWarnings::json(warning));
