@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <array>
+#include <utility>
 
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
@@ -87,6 +88,43 @@ void addLedger(FactList& facts, const Json& ledger) {
     for (const Json& warning : JsonText::member(ledger, "warnings")) {
         facts.add("warning", JsonText::text(warning, "text"), Colour::NOTICE);
     }
+}
+
+void addFollowing(FactList& facts, const Json& follow) {
+    if (!follow.is_object()) {
+        return;
+    }
+    facts.add("following", JsonText::text(follow, "state"));
+    facts.add("problem", JsonText::text(follow, "problem"), Colour::BAD);
+    facts.add("generation", JsonText::text(follow, "generation"));
+    facts.add("generations", JsonText::text(follow, "generations"));
+    facts.add("position", JsonText::text(follow, "position"));
+    for (const auto& [key, name] :
+         {std::pair("behind", "behind"), std::pair("recovered_bytes", "recovered"),
+          std::pair("lost_bytes", "lost")}) {
+        facts.add(name, TimeDisplay::bytes(JsonText::number(follow, key)));
+    }
+    facts.add("cut entries", JsonText::text(follow, "cut_entries"));
+}
+
+/// The latest bytes that were recovered or lost.
+std::string rangesText(const Json& follow, const Terminal& terminal) {
+    if (!follow.is_object()) {
+        return "";
+    }
+    Table table({{"TIME", Table::FIXED},
+                 {"WHAT", Table::FIXED},
+                 {"FROM BYTE", Table::NUMBER},
+                 {"TO BYTE", Table::NUMBER},
+                 {"READ FROM", Table::PATH}});
+    for (const char* const what : {"recovered", "lost"}) {
+        for (const Json& range : JsonText::member(follow, what)) {
+            table.add({TimeDisplay::local(JsonText::text(range, "time")), std::string(what),
+                       JsonText::text(range, "from"), JsonText::text(range, "to"),
+                       JsonText::text(range, "source")});
+        }
+    }
+    return table.empty() ? "" : '\n' + table.text(terminal);
 }
 
 std::string rejectedText(const Json& ledger, const Terminal& terminal) {
@@ -267,8 +305,10 @@ int LogsCommand::show(Context& context) {
     facts.add("entries", JsonText::text(row, "NUMEVENTS"));
     facts.add("errors", JsonText::text(row, "NUMERRORS"));
     addLedger(facts, ledger);
+    const Json& follow = JsonText::member(ledger, "follow");
+    addFollowing(facts, follow);
     context.print(facts.text(context.terminal()) + rejectedText(ledger, context.terminal()) +
-                  skippedText(ledger, context.terminal()));
+                  skippedText(ledger, context.terminal()) + rangesText(follow, context.terminal()));
     return exitStatus;
 }
 

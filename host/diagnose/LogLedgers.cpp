@@ -42,7 +42,9 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.file = log.fileNameLocal();
     view.type = log.type();
     view.procedure = log.procedure();
-    view.isFollowed = log.followSettings() != nullptr;
+    if (const FollowLedger* const follow = log.followLedger()) {
+        view.follow = FollowView::of(*follow);
+    }
     view.openFile = ledger.file();
     view.bytesRead = ledger.bytesRead();
     // A line is counted before it is found not to fit: in this order there are never more of these.
@@ -149,6 +151,8 @@ void LogLedgers::write(JsonWriter& json, const LogLedgerView& ledger, bool withS
     json.member("truncations", ledger.truncations).member("skipped_bytes", ledger.skippedBytes);
     json.member("restarts", ledger.restarts).key("last_entry");
     ledger.lastEntry ? json.time(*ledger.lastEntry) : json.null();
+    json.key("follow");
+    ledger.follow ? ledger.follow->write(json, withSamples) : static_cast<void>(json.null());
     json.key("warnings").beginArray();
     for (const LogWarning& warning : ledger.warnings) {
         json.beginObject();

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_LOG_LEDGERS_H
 #define ZRM_HOST_LOG_LEDGERS_H
 
+#include "host/diagnose/FollowView.h"
 #include "monitor/FileIdentity.h"
 
 #include <cstdint>
@@ -15,7 +16,7 @@ class JsonWriter;
 
 /// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
-    std::string kind;   ///< missing, replaced, named_twice, without_time or not_records
+    std::string kind;   ///< missing, replaced, named_twice, failing, without_time or not_records
     std::int64_t since; ///< when it was first seen
     std::string text;   ///< what is wrong and how to fix it, in sentences
 
@@ -46,8 +47,8 @@ struct LogLedgerView {
     std::string file;                     ///< the same in the process's code page
     std::optional<FileIdentity> openFile; ///< the file that the monitor currently reads
     char type = 'S';
-    std::string procedure;   ///< a user log's format
-    bool isFollowed = false; ///< of a [[log]] table
+    std::string procedure;            ///< a user log's format
+    std::optional<FollowView> follow; ///< none: a log of the log configuration
     std::int64_t bytesRead = 0;
     std::int64_t lines = 0;
     std::int64_t rows = 0;

@@ -71,10 +71,25 @@ std::optional<LogWarning> ofName(const LogLedgerView& log) {
                           std::string(cure)};
 }
 
+/// What keeps a log of a [[log]] table from being read.
+std::optional<LogWarning> ofFollowing(const FollowView& follow) {
+    if (follow.state == "not a file") {
+        return LogWarning{"failing", 0,
+                          "What has this log's name is not a regular file. The agent waits for "
+                          "one."};
+    }
+    if (follow.problem.empty()) {
+        return std::nullopt;
+    }
+    return LogWarning{"failing", 0,
+                      "The log cannot be read at present: " + follow.problem +
+                          ". Check the file's permissions and the disk."};
+}
+
 /// Whether a log of the log configuration is also in the list of logs to follow.
 bool isNamedTwice(const LogLedgerView& log) {
     const std::shared_ptr<const FurtherLogs::List> further = FurtherLogs::published();
-    return !log.isFollowed && further != nullptr &&
+    return !log.follow && further != nullptr &&
            std::any_of(further->begin(), further->end(),
                        [&log](const FurtherLog& one) { return one.name == log.log; });
 }
@@ -105,19 +120,19 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
                             "The log configuration and a [[log]] table both name this file; the "
                             "line of the log configuration applies. Remove one of them."});
     }
-    if (std::optional<LogWarning> warning = log.isFollowed ? std::nullopt : ofName(log)) {
+    if (std::optional<LogWarning> warning = log.follow ? ofFollowing(*log.follow) : ofName(log)) {
         warnings.push_back(std::move(*warning));
     }
     if (log.type == 'S' && log.withoutTime > 0 && log.withoutTime * 2 > log.rows) {
         warnings.push_back(
             {"without_time", 0,
              std::to_string(log.withoutTime) + " of " + std::to_string(log.rows) +
-                 (log.isFollowed ? std::string(" entries have no time: their lines are in no "
-                                               "form that system loggers write. Describe the "
-                                               "file as a text log with a format.")
-                                 : " entries have no time: their lines do not begin like \"Oct "
-                                   " 5 07:03:09\". " +
-                                       std::string(syslogCure))});
+                 (log.follow ? std::string(" entries have no time: their lines are in no "
+                                           "form that system loggers write. Describe the "
+                                           "file as a text log with a format.")
+                             : " entries have no time: their lines do not begin like \"Oct "
+                               " 5 07:03:09\". " +
+                                   std::string(syslogCure))});
     }
     if (log.type == 'A') {
         if (std::string text = ofAccountingFile(log.file, log.openFile); !text.empty()) {

@@ -49,6 +49,27 @@ constexpr Count counts[] = {
      &LogLedgerView::restarts},
 };
 
+/// The same of a log that is followed.
+struct FollowNumber {
+    const char* name;
+    const char* help;
+    std::int64_t FollowView::*value;
+    bool isCounter;
+};
+
+constexpr FollowNumber followNumbers[] = {
+    {"zrm_log_position_bytes", "Where the next entry of the log begins in its file.",
+     &FollowView::position, false},
+    {"zrm_log_behind_bytes", "Bytes of the log that are not read yet.", &FollowView::behind, false},
+    {"zrm_log_generations_total", "Files of the log that were read.", &FollowView::generations,
+     true},
+    {"zrm_log_recovered_bytes_total",
+     "Bytes that were read from a copy because a truncation removed them before.",
+     &FollowView::recoveredBytes, true},
+    {"zrm_log_lost_bytes_total", "Bytes that a truncation removed and that no copy holds.",
+     &FollowView::lostBytes, true},
+};
+
 Logs takeLogs() {
     Logs logs;
     const std::optional<Sample> sample = Sample::take("RMMONLOG", {}, "metrics");
@@ -103,6 +124,21 @@ void collectCounts(MetricText& text, const Logs& logs) {
     }
 }
 
+void collectFollowing(MetricText& text, const Logs& logs) {
+    for (const FollowNumber& number : followNumbers) {
+        if (number.isCounter) {
+            text.counter(number.name, number.help);
+        } else {
+            text.gauge(number.name, number.help);
+        }
+        for (const auto& [path, log] : logs) {
+            if (log.ledger && log.ledger->follow) {
+                text.add(static_cast<double>((*log.ledger->follow).*number.value), {{"log", path}});
+            }
+        }
+    }
+}
+
 void collectTimes(MetricText& text, const Logs& logs) {
     constexpr double milliseconds = 1000.0;
     text.gauge("zrm_log_last_entry_timestamp_seconds",
@@ -139,6 +175,7 @@ void LogMetrics::collect(MetricText& text) {
     const Logs logs = takeLogs();
     collectStates(text, logs);
     collectCounts(text, logs);
+    collectFollowing(text, logs);
     collectTimes(text, logs);
     collectSizes(text, logs);
     text.counter("zrm_debug_log_incomplete_records_total",

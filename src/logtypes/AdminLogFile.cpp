@@ -94,6 +94,10 @@ AdminLogFile::~AdminLogFile() {
 
 void AdminLogFile::processLogData() {
     TraceScope trace(anchor);
+    if (isFollowed()) {
+        followLog(recordLength);
+        return;
+    }
     openAdminLog();
     if (LogFD >= 0) {
         waitForEventLoop({1, 0});
@@ -146,7 +150,7 @@ long AdminLogFile::readLog() {
         if (isReadingOver()) {
             return trace.result(0L);
         }
-        if (!deliverRecord(record)) {
+        if (!deliverEntry(record)) {
             notePassedOver(monitorStatus() == MONITOR_RUNNING ? countRest(reader) : 0);
             return trace.result(0L);
         }
@@ -166,8 +170,7 @@ long AdminLogFile::readLog() {
     return trace.result(-1L);
 }
 
-/// False if the log has to end or the process is ending before the row could be offered.
-bool AdminLogFile::deliverRecord(char* record) {
+bool AdminLogFile::deliverEntry(char* record) {
     count(NumEvents);
     zrm_rmlogent_data_t* const row = ownRow();
     if (formatEntryAsRow(record, row, nullptr) == 0) {

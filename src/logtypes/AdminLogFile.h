@@ -43,6 +43,7 @@ public:
     /// Reads the records between LogEOF and the end of the file. Returns -1 on a read error or if
     /// the file ends within a record; the bytes of that record are lost.
     long readLog() override;
+    bool deliverEntry(char* record) override;
 
     /// Copies the text for a record type, at most `room` bytes, without a terminator.
     static void fillEntryType(char* dest, unsigned long room, int type);
@@ -53,7 +54,6 @@ public:
 private:
     void openAdminLog();
     void closeAdminLog();
-    bool deliverRecord(char* record);
     bool allocateReportBuffers(_LogBufferInfo** reportState);
     static void deallocateReportBuffers(_LogBufferInfo** reportState);
 

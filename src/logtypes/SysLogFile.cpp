@@ -160,6 +160,10 @@ SysLogFile::~SysLogFile() {
 
 void SysLogFile::processLogData() {
     TraceScope trace(anchor);
+    if (isFollowed()) {
+        followLog(0);
+        return;
+    }
     openLogAndSeek();
     if (LogFileP != nullptr) {
         waitForEventLoop(timeval{1, 0});

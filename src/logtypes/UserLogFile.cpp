@@ -68,6 +68,10 @@ void UserLogFile::processLogData() {
     if (!hasFormat()) {
         return;
     }
+    if (isFollowed()) {
+        followLog(0);
+        return;
+    }
     openLogAndSeek();
     if (LogFileP != nullptr) {
         waitForEventLoop({1, 0});

@@ -6,6 +6,7 @@
 #include "base/TraceScope.h"
 #include "logs/LogManagerUtil.h"
 #include "logs/ValidLog.h"
+#include "monitor/FollowLedger.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -26,7 +27,8 @@ template <std::size_t width> void fillColumn(char (&column)[width], std::string_
 } // namespace
 
 LogFile::LogFile(const ValidLog& log, LogFile* chainHead)
-    : LogBase(log), MonitorStartStopTime(std::time(nullptr)) {
+    : LogBase(log), MonitorStartStopTime(std::time(nullptr)),
+      m_followLedger(isFollowed() ? std::make_unique<FollowLedger>() : nullptr) {
     TraceScope trace(anchor);
     addToChain(chainHead);
     initializeLock();

@@ -21,6 +21,9 @@
 
 namespace zrm {
 
+class FileFollower;
+class FollowLedger;
+class LogPositions;
 class ValidLog;
 
 /// The state of one report that reads a log backwards, block by block. Owned by the log type's
@@ -82,6 +85,10 @@ public:
     /// Reads everything between LogEOF and the end of the file. Returns 0, or -1 on a read error.
     virtual long readLog();
 
+    /// Judges one entry as the log's thread does: counts it and offers its row. False if the log
+    /// has to end or the process is ending before the row could be offered.
+    virtual bool deliverEntry(char* entry);
+
     void startThread();
     /// Asks a running monitor to end, so that stopThread waits less: each thread checks its status
     /// once a second, and many may have to end at once.
@@ -99,6 +106,8 @@ public:
     std::int64_t numFormatErrors() const noexcept { return NumFormatErrors.load(); }
     std::time_t monitorStartStopTime() const noexcept { return MonitorStartStopTime.load(); }
     const LogLedger& ledger() const noexcept { return m_ledger; }
+    /// Null for a log of the log configuration.
+    const FollowLedger* followLedger() const noexcept { return m_followLedger.get(); }
 
     // The log manager marks logs that a new configuration no longer contains.
     bool isMarked() const noexcept { return RefreshMode; }
@@ -115,6 +124,11 @@ protected:
     /// Remembers the bytes before LogEOF. Log's thread only.
     void guardEnd() noexcept;
     void waitForEventLoop(timeval interval);
+    /// True if the log is followed through rotations and restarts.
+    bool isFollowed() const noexcept { return followSettings() != nullptr; }
+    /// The body of the monitoring thread of such a log: returns when the log has to end. Bytes of a
+    /// record; 0: its entries are lines.
+    void followLog(std::size_t recordLength);
     /// Waits for room and offers a row to the situations. Returns false if the log has to end or
     /// the process is ending before there is room. Then nothing was offered, and the entry counts
     /// as skipped.
@@ -161,6 +175,7 @@ protected:
     Pulse m_pulse{fileNameUTF8(), &NumEvents};
     static std::atomic<std::FILE*> m_debugLog;
     LogLedger m_ledger; ///< lives as long as the object, across every refresh that keeps it
+    const std::unique_ptr<FollowLedger> m_followLedger; ///< of a followed log
 
 private:
     friend void* logThread(void* logFile);
@@ -170,6 +185,9 @@ private:
     static void fillChangingColumns(zrm_rmlogent_data_t* row);
     bool checkForChange();
     bool readGrowth();
+    bool readEntries(FileFollower& follower, LogPositions& positions);
+    void noteFollowed(FileFollower& follower, LogPositions& positions);
+    void noteFollowFailure();
     void noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind);
     void pushBack(_LogBufferInfo* info);
     std::FILE* debugLogStream() const;
@@ -185,6 +203,7 @@ private:
     bool m_hasThread = false; ///< LogThread must be joined; used only when starting and stopping
     // Used by the log's thread only.
     std::chrono::steady_clock::time_point m_end{}; ///< when a log that has to end stops reading
+    bool m_isFailureTraced = false;
     LineReader m_lineReader;
     ReadGuard m_guard;
     OwnRow m_ownRow;

@@ -188,7 +188,9 @@ bool LogFile::offer(zrm_rmlogent_data_t* row) {
         EventRoom::wait([this] { return monitorStatus() == MONITOR_RUNNING; });
         if (!EventRoom::mayOffer() &&
             (monitorStatus() != MONITOR_RUNNING || EventRoom::now() == EventRoom::State::CLOSED)) {
-            notePassedOver(1);
+            if (!isFollowed()) {
+                notePassedOver(1); // a followed log continues here when it is monitored again
+            }
             return false;
         }
         m_pulse.work("reads the log");
@@ -223,31 +225,38 @@ void LogFile::passOverRest() {
     notePassedOver(entries);
 }
 
+bool LogFile::deliverEntry(char* line) {
+    zrm_rmlogent_data_t* const row = ownRow();
+    count(NumEvents);
+    const bool isRow = formatEntryAsRow(line, row, nullptr) == 0;
+    if (isRow) {
+        m_ledger.noteTime(row->entrytime[0]);
+        if (!offer(row)) {
+            return false;
+        }
+    } else {
+        count(NumFormatErrors);
+        m_ledger.noteRejected(line);
+    }
+    if (std::FILE* const debugLog = debugLogStream()) {
+        writeRecord(debugLog, line, std::strlen(line), isRow ? row : nullptr,
+                    isRow ? sizeof *row : 0);
+    } else {
+        traceEntry();
+    }
+    return true;
+}
+
 long LogFile::readLog() {
     TraceScope trace(anchor);
-    zrm_rmlogent_data_t* const row = ownRow();
     m_lineReader.start(LogFD);
     while (char* const line = m_lineReader.next()) {
         if (isReadingOver()) {
             return trace.result(0L);
         }
-        count(NumEvents);
-        const bool isRow = formatEntryAsRow(line, row, nullptr) == 0;
-        if (isRow) {
-            m_ledger.noteTime(row->entrytime[0]);
-            if (!offer(row)) {
-                passOverRest();
-                return trace.result(0L);
-            }
-        } else {
-            count(NumFormatErrors);
-            m_ledger.noteRejected(line);
-        }
-        if (std::FILE* const debugLog = debugLogStream()) {
-            writeRecord(debugLog, line, std::strlen(line), isRow ? row : nullptr,
-                        isRow ? sizeof *row : 0);
-        } else {
-            traceEntry();
+        if (!LogFile::deliverEntry(line)) {
+            passOverRest();
+            return trace.result(0L);
         }
     }
     if (m_lineReader.error() != 0) {

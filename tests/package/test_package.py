@@ -13,7 +13,6 @@ import pytest
 from conftest import PACKAGE, quoted, run, wait_until
 
 FILES = {
-    "etc/zrm/logs.conf",
     "etc/zrm/zrm.toml",
     "lib/systemd/system/zrmagent.service",
     "usr/bin/zrmctl",
@@ -62,10 +61,7 @@ def test_every_file_is_roots_and_only_programs_run():
 
 
 def test_the_operators_files_survive_an_upgrade(control):
-    assert (control / "conffiles").read_text().split() == [
-        "/etc/zrm/logs.conf",
-        "/etc/zrm/zrm.toml",
-    ]
+    assert (control / "conffiles").read_text().split() == ["/etc/zrm/zrm.toml"]
 
 
 def test_it_says_what_it_needs():
@@ -133,12 +129,8 @@ ISO = "%Y-%m-%dT%H:%M:%S.000000+00:00"
 
 def adapted(root, directory):
     """The packaged configuration with its directories moved, and the example situation in use."""
-    logs = (root / "etc/zrm/logs.conf").read_text().replace("/var/log", str(directory))
-    (directory / "logs.conf").write_text(logs)
-    for line in logs.splitlines():
-        if line.startswith("/"):
-            with open(line.split()[0], "w", encoding="utf-8") as log:
-                log.write("the line before\n")
+    for name in ("syslog", "auth.log", "dpkg.log"):
+        (directory / name).write_text("the line before\n")
     text = (root / "etc/zrm/zrm.toml").read_text()
     assert "# [[situation]]\n" in text
     head, _, example = text.partition("# [[situation]]\n")
@@ -146,7 +138,6 @@ def adapted(root, directory):
     text = head + example
     for old, new in (
         ('"/var/lib/zrm"', quoted(directory / "state")),
-        ('"/etc/zrm/logs.conf"', quoted(directory / "logs.conf")),
         ("127.0.0.1:7186", "127.0.0.1:0"),
         ("/var/log/", f"{directory}/"),
     ):

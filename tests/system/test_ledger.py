@@ -38,6 +38,7 @@ def test_a_new_ledger_is_empty(serving):
         "skipped_bytes": 0,
         "restarts": 0,
         "last_entry": None,
+        "follow": None,
         "warnings": [],
         "rejected": [],
         "skipped": [],

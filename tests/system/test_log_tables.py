@@ -2,7 +2,8 @@
 
 import pytest
 from api import Api
-from conftest import Log, descriptions, syslog_line
+from conftest import Log, descriptions, syslog_line, wait_until
+from test_metrics import metrics
 
 
 def file(agent, name, content="Jan  1 00:00:00 web1 old: before the start\n"):
@@ -130,3 +131,32 @@ def test_every_form_of_syslog_lines_is_read(agent):
     assert [row["ENTRYDESC"] for row in rows] == ["traditional", "iso", "rfc5424"]
     assert {row["ENTRYTIME"][1:] for row in rows} == {"261120070309000"}
     assert {row["ENTRYSRC"] for row in rows} == {"sshd[412]"}
+
+
+@pytest.mark.slow
+def test_a_rotation_is_followed_and_shown(agent):
+    log = file(agent, "app.log")
+    agent.follow(log, rotate_wait="1s")
+    agent.situation(log=log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+
+    def following(state="reading"):
+        _, _, answer = api.request("GET", f"/api/v1/logs?log={log}")
+        follow = answer["logs"][0]["ledger"]["follow"] if answer.get("logs") else None
+        return follow if follow and follow["state"] == state else None
+
+    wait_until(following, "the log to be read")
+    log.append(syslog_line("before"))
+    agent.wait_events(1)
+    log.path.rename(agent.directory / "app.log.1")
+    log.append(syslog_line("after"))
+    assert descriptions(agent.wait_events(2)) == ["before", "after"]
+    size = log.path.stat().st_size
+    follow = wait_until(lambda: (now := following()) and now["position"] == size and now, "the position")
+    assert (follow["generation"], follow["generations"], follow["behind"]) == (str(log), 2, 0)
+    assert (follow["lost_bytes"], follow["lost"], follow["recovered"]) == (0, [], [])
+    text = metrics(api)
+    assert f'zrm_log_generations_total{{log="{log}"}} 2' in text
+    assert f'zrm_log_position_bytes{{log="{log}"}} {size}' in text

@@ -119,6 +119,6 @@ def test_every_key_of_the_configuration():
         assert items(part) >= keys, heading
         seen.add(name)
     assert seen == {
-        "Top level", "[agent]", "[http]", "[history]", "[[sink]]", "[[situation]]",
+        "Top level", "[agent]", "[[log]]", "[http]", "[history]", "[[sink]]", "[[situation]]",
         "jsonl", "webhook", "alertmanager", "syslog", "otlp",
     }  # fmt: skip

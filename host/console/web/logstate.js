@@ -23,6 +23,7 @@ const WARNED = {
   missing: "No file",
   replaced: "Replaced",
   named_twice: "Named twice",
+  failing: "Failing",
   without_time: "No times",
   not_records: "Wrong type",
 };

@@ -134,6 +134,20 @@ export async function show(element, path) {
   };
 }
 
+/** How a log of a [[log]] table is followed; nothing for another log. */
+function followPairs(follow) {
+  if (!follow) return [];
+  return [
+    ["Following", follow.problem ? `${follow.state}; ${follow.problem}` : follow.state],
+    ["Generation", follow.generation ?? "none"],
+    ["Generations read", number(follow.generations)],
+    ["Position", bytes(follow.position)],
+    ["Behind", bytes(follow.behind)],
+    ["Recovered from copies", bytes(follow.recovered_bytes)],
+    ["Lost in rotations", bytes(follow.lost_bytes)],
+  ];
+}
+
 function drawState(element, log, configuration) {
   const { level, state, why } = judge(log);
   const { row } = log;
@@ -151,6 +165,7 @@ function drawState(element, log, configuration) {
     ["Truncations", number(ledger.truncations)],
     ["Skipped", bytes(ledger.skipped_bytes)],
     ["Restarts of the monitor", number(ledger.restarts)],
+    ...followPairs(ledger.follow),
     ["Last entry", time(ledger.last_entry)],
     ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
   ];

@@ -71,7 +71,11 @@ TEST(EventJson, WritesWhatPlainMeansGive) {
         TestRow row(text(16), text(12), text(32), static_cast<std::int32_t>(random()));
         const auto label =
             std::make_shared<const SituationLabel>(SituationLabel{text(80), text(10)});
-        const Event event{random(), static_cast<std::int64_t>(random()), label, row.bytes()};
+        Event event;
+        event.id = random();
+        event.raised = static_cast<std::int64_t>(random());
+        event.situation = label;
+        event.row = row.bytes();
         std::string written;
         EventJson(testLayout()).append(written, event);
         ASSERT_EQ(written, model(event));

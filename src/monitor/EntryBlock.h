@@ -1,0 +1,79 @@
+#ifndef ZRM_ENTRY_BLOCK_H
+#define ZRM_ENTRY_BLOCK_H
+
+#include "monitor/Generation.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+
+namespace zrm {
+
+/// The part of a followed file that is in memory, cut into entries. Only whole entries are given: a
+/// line with its newline, or a record. Lines of any length are one entry, of which the first 2046
+/// bytes are given; NUL bytes that a line begins with are not part of it, since a writer that does
+/// not append leaves them after a truncation. Each read begins with the bytes before it and finds
+/// out whether the file still has them. An entry needs neither a copy nor memory. One thread.
+class EntryBlock {
+public:
+    enum class Fill : unsigned char {
+        more,    ///< bytes were read
+        end,     ///< there are no more
+        changed, ///< the file no longer has what was read: it was truncated or written anew
+        failed,  ///< errno says why
+    };
+
+    /// `recordLength`: bytes of a record; 0: the entries are lines.
+    explicit EntryBlock(std::size_t recordLength) noexcept : m_recordLength(recordLength) {}
+    EntryBlock(const EntryBlock&) = delete;
+    EntryBlock& operator=(const EntryBlock&) = delete;
+
+    /// Begins at an offset of a file, which has the bytes of `tail` before it.
+    void start(std::int64_t offset, const Tail& tail) noexcept;
+    /// Reads more.
+    Fill fill(Generation& file) noexcept;
+    /// The next whole entry, or null if more must be read. A line ends with newline and NUL and has
+    /// at most 2047 bytes. It is valid until the next call.
+    char* next() noexcept;
+    /// The unfinished line at the end of a file to which nothing is added any more, as an entry.
+    /// Null if there is none; an unfinished record is dropped.
+    char* rest() noexcept;
+    /// Frees the memory and forgets an unfinished line, which is read again. Keeps it in the middle
+    /// of a line that is too long to be read again.
+    void release() noexcept;
+
+    /// Where the next entry begins.
+    std::int64_t offset() const noexcept;
+    /// The bytes before that.
+    Tail tail() const noexcept;
+    /// How far the file was read.
+    std::int64_t readTo() const noexcept { return m_readTo; }
+    /// True if the last entry is only the beginning of a line.
+    bool isCut() const noexcept { return m_isCut; }
+
+private:
+    bool allocate() noexcept;
+    void compact() noexcept;
+    void restore() noexcept;
+    char* nextRecord() noexcept;
+    char* restOfLongLine() noexcept;
+    char* endLong(std::size_t length, bool isCut) noexcept;
+    char* longLine() const noexcept;
+
+    const std::size_t m_recordLength;
+    std::unique_ptr<char[]> m_block;
+    std::size_t m_begin = 0; ///< the first byte not given yet
+    std::size_t m_end = 0;   ///< one past the last byte read
+    std::int64_t m_readTo = 0;
+    Tail m_tail;
+    bool m_isTailAside = true; ///< m_tail has the bytes before the next entry; the block need not
+    bool m_isInLongLine = false;
+    std::int64_t m_longLineBegin = 0;
+    bool m_isTerminated = false; ///< m_behind is to be put back at m_begin
+    char m_behind = '\0';
+    bool m_isCut = false;
+};
+
+} // namespace zrm
+
+#endif

@@ -1,0 +1,331 @@
+#include "monitor/FileFollower.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <ctime>
+#include <iterator>
+#include <utility>
+
+#include <sys/stat.h>
+
+namespace zrm {
+
+namespace {
+
+constexpr std::chrono::seconds firstPause{1};
+constexpr std::chrono::seconds longestPause{60};
+constexpr int mostReadFailures = 5; ///< of a file that others follow
+
+} // namespace
+
+FileFollower::Moment FileFollower::Moment::now() noexcept {
+    timespec wall{};
+    clock_gettime(CLOCK_REALTIME, &wall);
+    return {std::chrono::steady_clock::now(),
+            static_cast<std::int64_t>(wall.tv_sec) * 1'000'000'000 + wall.tv_nsec};
+}
+
+FileFollower::FileFollower(std::string path, const Options& options, FollowLedger& ledger)
+    : m_path(std::move(path)), m_options(options), m_ledger(ledger), m_block(options.recordLength) {
+}
+
+void FileFollower::fail(Retry& retry, const char* call, int number) {
+    ++retry.failures;
+    retry.pause = retry.pause.count() == 0 ? firstPause : std::min(2 * retry.pause, longestPause);
+    retry.at = m_now.steady + retry.pause;
+    m_ledger.noteFailure(call, number);
+}
+
+void FileFollower::succeed(Retry& retry) {
+    if (retry.failures > 0) {
+        retry = Retry{};
+        if (m_nameRetry.failures == 0 && m_readRetry.failures == 0) {
+            m_ledger.clearFailure();
+        }
+    }
+}
+
+std::optional<FileIdentity> FileFollower::file() const noexcept {
+    return m_chain.empty() ? std::nullopt : std::optional(m_chain.front().file->identity());
+}
+
+std::optional<LogPosition> FileFollower::position() const noexcept {
+    if (m_isInBlock) {
+        return positionOf(m_chain.front().file->identity(), m_block.offset(), m_block.tail());
+    }
+    return m_hasPosition ? std::optional(m_position) : std::nullopt;
+}
+
+bool FileFollower::look(const Moment& now) {
+    m_now = now;
+    if (m_chain.empty()) {
+        return mayTry(m_nameRetry) && begin();
+    }
+    if (m_options.byName && mayTry(m_nameRetry)) {
+        checkName();
+    }
+    return mayTry(m_readRetry) && checkFile();
+}
+
+/// Finds the first file to read. False while there is none.
+bool FileFollower::begin() {
+    std::unique_ptr<Generation> named = openNamed();
+    if (!named && m_nameRetry.failures > 0) {
+        return false;
+    }
+    if (m_stored) {
+        takeUp(*m_stored, std::move(named));
+    } else if (named) {
+        beginFirst(std::move(named));
+    }
+    if (m_chain.empty()) {
+        return false;
+    }
+    enter();
+    return true;
+}
+
+/// A log without a position.
+void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
+    Member member;
+    Generation::Status status;
+    const bool isFromEnd = !m_options.fromBeginning && !m_wasAbsent;
+    if (!named->status(status) || (isFromEnd && !named->readTail(status.size, member.tail))) {
+        fail(m_nameRetry, "read", errno);
+        return;
+    }
+    member.from = isFromEnd ? status.size : 0;
+    m_modified = status.modified;
+    m_position = positionOf(named->identity(), member.from, member.tail);
+    m_hasPosition = true;
+    member.file = std::move(named);
+    member.hadName = true;
+    m_chain.push_back(std::move(member));
+}
+
+/// Continues at a position of an earlier run.
+void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
+    m_position = stored;
+    m_hasPosition = true;
+    m_modified = INT64_MAX;
+    Found found = find(stored, Search::byContents, named.get());
+    const bool isHeld = found.holder.has_value();
+    Member present;
+    if (found.holder && !found.holder->file) {
+        present = std::move(*found.holder);
+        found.holder.reset();
+    } else if (!isHeld && named) {
+        m_ledger.noteLost(stored.offset, stored.offset);
+    }
+    const Generation* const first = found.holder ? found.holder->file.get() : named.get();
+    Generation::Status status;
+    if (first != nullptr && first->status(status)) {
+        m_modified = status.modified;
+    }
+    prepend(found);
+    m_isTakenUp = !m_chain.empty();
+    if (named && found.isAll) {
+        present.file = std::move(named);
+        present.hadName = true;
+        m_chain.push_back(std::move(present));
+    }
+}
+
+/// Begins with the first file of the chain.
+void FileFollower::enter() {
+    const Member& member = m_chain.front();
+    m_block.start(member.from, member.tail);
+    m_isInBlock = false;
+    m_isAtEnd = false;
+    m_hasSeen = false;
+    m_active = m_now.steady;
+    m_readRetry = Retry{};
+    m_ledger.noteGeneration(member.file->identity(), member.file->path());
+    notePresent();
+}
+
+void FileFollower::notePresent() {
+    m_ledger.setState(m_chain.size() > 1 ? FollowLedger::State::finishing
+                                         : FollowLedger::State::reading);
+}
+
+/// Looks whether another file has the log's name.
+void FileFollower::checkName() {
+    struct stat status;
+    const bool isThere = stat(m_path.c_str(), &status) == 0;
+    if (isThere && S_ISREG(status.st_mode) &&
+        FileIdentity{status.st_dev, status.st_ino} == m_chain.back().file->identity()) {
+        succeed(m_nameRetry);
+        notePresent();
+        return;
+    }
+    std::unique_ptr<Generation> named = openNamed();
+    if (named && !(named->identity() == m_chain.back().file->identity())) {
+        extend(std::move(named));
+        notePresent();
+    }
+}
+
+/// Looks whether the file that is read has changed. True if there may be something to read.
+bool FileFollower::checkFile() {
+    Generation::Status now;
+    if (!m_chain.front().file->status(now)) {
+        fail(m_readRetry, "fstat", errno);
+        return false;
+    }
+    const bool isSame = m_hasSeen && now.size == m_seen.size && now.modified == m_seen.modified;
+    if (!isSame) {
+        m_isAtEnd = false;
+        if (m_hasSeen) {
+            m_active = m_now.steady;
+        }
+        if (m_hasSeen && m_isInBlock) {
+            m_modified = m_seen.modified; // before what is found now was done
+        }
+        if (m_chain.front().hadName && m_block.readTo() == 0) {
+            insertMissed();
+        }
+    }
+    m_seen = now;
+    m_hasSeen = true;
+    if (isSame && m_isAtEnd && m_chain.size() == 1) {
+        m_block.release();
+        return false;
+    }
+    return true;
+}
+
+bool FileFollower::isFinished() const noexcept {
+    if (m_chain.size() < 2) {
+        return false;
+    }
+    const Member& member = m_chain.front();
+    if (member.isComplete || member.file->isCompressed() ||
+        m_now.steady - m_active >= m_options.rotateWait) {
+        return true;
+    }
+    // What was rotated before the start need not be waited for again.
+    Generation::Status now;
+    return m_isTakenUp && member.file->status(now) &&
+           m_now.wall - now.changed >= std::chrono::nanoseconds(m_options.rotateWait).count();
+}
+
+void FileFollower::switchToNext() {
+    Member finished = std::move(m_chain.front());
+    m_chain.pop_front();
+    Generation::Status status{};
+    const bool hasStatus = finished.file->status(status);
+    if (m_block.readTo() > 0) {
+        m_position = positionOf(finished.file->identity(), m_block.offset(), m_block.tail());
+        m_hasPosition = true;
+        m_modified = hasStatus ? status.modified : INT64_MAX;
+    }
+    if (finished.isRecovery && m_block.offset() > finished.from) {
+        m_ledger.noteRecovered(finished.file->path(), finished.from, m_block.offset());
+    }
+    Member& next = m_chain.front();
+    if (hasStatus && !status.hasName && !finished.file->isCompressed() &&
+        identityOf(m_position) == finished.file->identity()) {
+        continueIn(next);
+    }
+    m_isTakenUp = m_isTakenUp && m_chain.size() > 1;
+    enter();
+    if (m_chain.front().hadName && m_block.readTo() == 0) {
+        insertMissed();
+    }
+}
+
+/// A read has failed. True if reading goes on at once.
+bool FileFollower::handleFailedRead() {
+    const int number = errno;
+    if (number == EINTR) {
+        return true;
+    }
+    Member& member = m_chain.front();
+    const bool isHopeless = member.file->isCompressed() ||
+                            (m_chain.size() > 1 && m_readRetry.failures >= mostReadFailures);
+    fail(m_readRetry, "read", number);
+    if (!isHopeless || m_chain.size() == 1) {
+        // Descriptors of network file systems go stale.
+        std::unique_ptr<Generation> again = Generation::open(member.file->path());
+        if (again && again->identity() == member.file->identity()) {
+            member.file = std::move(again);
+        }
+        return false;
+    }
+    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), m_seen.size));
+    succeed(m_readRetry);
+    switchToNext();
+    return true;
+}
+
+/// What a file that is finished has behind its last whole entry: a line, or the lost beginning of a
+/// record.
+char* FileFollower::finish() {
+    const std::int64_t from = m_block.offset();
+    char* const entry = m_block.rest();
+    m_isInBlock = m_isInBlock || entry != nullptr;
+    if (entry == nullptr && m_block.offset() > from) {
+        m_ledger.noteLost(from, m_block.offset());
+    }
+    return entry;
+}
+
+char* FileFollower::next() {
+    if (m_chain.empty() || !mayTry(m_readRetry)) {
+        return nullptr;
+    }
+    for (;;) {
+        if (char* const entry = m_block.next()) {
+            m_isInBlock = true;
+            if (m_block.isCut()) [[unlikely]] {
+                m_ledger.noteCut();
+            }
+            return entry;
+        }
+        m_isAtEnd = false;
+        const std::int64_t from = m_block.readTo();
+        switch (m_block.fill(*m_chain.front().file)) {
+        case EntryBlock::Fill::more:
+            m_bytesRead += m_block.readTo() - from;
+            succeed(m_readRetry);
+            break;
+        case EntryBlock::Fill::changed:
+            recover();
+            break;
+        case EntryBlock::Fill::failed:
+            if (!handleFailedRead()) {
+                return nullptr;
+            }
+            break;
+        case EntryBlock::Fill::end:
+            succeed(m_readRetry);
+            m_isAtEnd = true;
+            if (!isFinished()) {
+                return nullptr;
+            }
+            if (char* const entry = finish()) {
+                return entry;
+            }
+            switchToNext();
+            break;
+        }
+    }
+}
+
+void FileFollower::noteProgress() {
+    if (m_chain.empty()) {
+        return;
+    }
+    std::int64_t behind = 0;
+    for (const Member& member : m_chain) {
+        Generation::Status status;
+        if (!member.file->isCompressed() && member.file->status(status)) {
+            const bool isFirst = &member == &m_chain.front();
+            behind += std::max<std::int64_t>(status.size - (isFirst ? m_block.offset() : 0), 0);
+        }
+    }
+    m_ledger.notePosition(m_block.offset(), behind);
+}
+
+} // namespace zrm

@@ -1,0 +1,146 @@
+#ifndef ZRM_FILE_FOLLOWER_H
+#define ZRM_FILE_FOLLOWER_H
+
+#include "framework/LogPositions.h"
+#include "monitor/EntryBlock.h"
+#include "monitor/FollowLedger.h"
+#include "monitor/Generation.h"
+#include "monitor/GenerationNames.h"
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <memory>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace zrm {
+
+/// Reads the entries of a log in order, each once, through rotations and restarts: which file is
+/// read, from where, and when the next one takes over.
+///
+/// A file that has lost the log's name is read to its end and until it has been quiet for a while;
+/// then the generations between it and the present file are read, then that. After a truncation the
+/// rest of the old contents is looked for in the copies beside the log. A position is found again
+/// by the file's identity and the bytes before it, or by the bytes alone. A call that fails is
+/// tried again after growing pauses, without end. Has no thread and traces nothing. One thread.
+class FileFollower {
+public:
+    struct Options {
+        bool byName = true;         ///< false: the file that was opened, whatever its name
+        bool fromBeginning = false; ///< for a log without a position whose file is there already
+        std::chrono::milliseconds rotateWait{2000};
+        std::size_t recordLength = 0; ///< 0: the entries are lines
+    };
+    struct Moment {
+        std::chrono::steady_clock::time_point steady;
+        std::int64_t wall; ///< ns since the epoch
+
+        static Moment now() noexcept;
+    };
+
+    /// The ledger outlives the follower.
+    FileFollower(std::string path, const Options& options, FollowLedger& ledger);
+
+    /// Continues at the position. Call it before the first look.
+    void resumeAt(const LogPosition& stored) noexcept { m_stored = stored; }
+    /// Looks at the file and at the name, about once a second. True if there may be entries. Costs
+    /// two system calls if nothing has changed.
+    bool look(const Moment& now);
+    /// The next entry as EntryBlock gives it, or null if there is none until the next look.
+    char* next();
+    /// Behind the last entry. None before a file has been opened.
+    std::optional<LogPosition> position() const noexcept;
+    /// How many bytes were read since the last call.
+    std::int64_t takeBytesRead() noexcept { return std::exchange(m_bytesRead, 0); }
+    /// Updates the position in the ledger.
+    void noteProgress();
+    /// The file that is read, if any.
+    std::optional<FileIdentity> file() const noexcept;
+
+private:
+    /// A file that is read or will be.
+    struct Member {
+        std::unique_ptr<Generation> file;
+        std::int64_t from = 0;
+        Tail tail{};             ///< the bytes before that
+        bool hadName = false;    ///< it is or was the present file
+        bool isComplete = false; ///< nothing is added to it any more
+        bool isRecovery = false; ///< read instead of what a truncation removed
+    };
+    struct Found {
+        std::optional<Member> holder; ///< the file that has the position
+        std::vector<Member> younger;  ///< the generations after it, without the present file
+        bool isAll = true;            ///< false: there are more of them
+    };
+    /// Counts how long to leave alone what has failed.
+    struct Retry {
+        std::chrono::steady_clock::time_point at{};
+        std::chrono::seconds pause{0};
+        int failures = 0;
+    };
+    enum class Search : unsigned char { byIdentity, byContents };
+
+    // Which files there are (FileFollowerSearch.cpp).
+    std::unique_ptr<Generation> openNamed();
+    Found find(const LogPosition& position, Search search, Generation* named);
+    Found findYounger(const GenerationReference& reference, Generation* named);
+    bool tryFind(const LogPosition& position, Search search, Generation* named, Found& found);
+    std::optional<Member> findHolder(const LogPosition& position, Search search, Generation* named,
+                                     const std::vector<GenerationFile>& files, bool& vanished);
+    bool openYounger(const GenerationReference& reference, const std::vector<GenerationFile>& files,
+                     Generation* named, Found& found);
+    bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
+    std::string siblingPath();
+
+    // What is read, and in which order (FileFollowerChain.cpp).
+    void extend(std::unique_ptr<Generation> named);
+    void insertMissed();
+    void recover();
+    void prepend(Found& found);
+    void continueIn(Member& next);
+
+    bool begin();
+    void beginFirst(std::unique_ptr<Generation> named);
+    void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
+    void checkName();
+    bool checkFile();
+    bool isFinished() const noexcept;
+    void switchToNext();
+    bool handleFailedRead();
+    char* finish();
+    void enter();
+    void notePresent();
+    bool mayTry(const Retry& retry) const noexcept { return m_now.steady >= retry.at; }
+    void fail(Retry& retry, const char* call, int number);
+    void succeed(Retry& retry);
+
+    const std::string m_path;
+    const Options m_options;
+    FollowLedger& m_ledger;
+    std::optional<LogPosition> m_stored;
+    Moment m_now{};
+    bool m_wasAbsent = false;   ///< nothing had the name at an earlier look
+    bool m_isTakenUp = false;   ///< files rotated before the start are read
+    std::deque<Member> m_chain; ///< the first is read; the last has the name, unless it lost it
+    EntryBlock m_block;
+    LogPosition m_position; ///< if it is not in the block
+    bool m_hasPosition = false;
+    bool m_isInBlock = false;    ///< the position is the block's, in the file that is read
+    bool m_isAtEnd = false;      ///< the last read found the end of the file
+    Generation::Status m_seen{}; ///< of the file that is read, at the last look
+    bool m_hasSeen = false;
+    std::int64_t m_modified = INT64_MAX; ///< when the file of the position was, as last seen
+    std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
+    std::int64_t m_bytesRead = 0;
+    Retry m_nameRetry;
+    Retry m_readRetry;
+    std::string m_siblings; ///< the log's path without symbolic links, as last known
+};
+
+} // namespace zrm
+
+#endif

@@ -1,0 +1,115 @@
+#include "monitor/FileFollower.h"
+
+#include <algorithm>
+#include <iterator>
+#include <utility>
+
+namespace zrm {
+
+// Which files are read besides the present one of a followed log: those between two looks, and the
+// copies that have what a truncation removed.
+
+namespace {
+
+constexpr std::size_t mostFiles = 64; ///< waiting to be read
+
+} // namespace
+
+/// Another file has the name: it is read after those that were there before it.
+void FileFollower::extend(std::unique_ptr<Generation> named) {
+    if (m_chain.size() >= mostFiles) {
+        return; // found again when these have been read
+    }
+    if (m_chain.size() == 1) {
+        m_active = m_now.steady;
+    }
+    Generation::Status status;
+    Generation& last = *m_chain.back().file;
+    const GenerationReference reference{last.identity(),
+                                        last.status(status) ? status.modified : INT64_MAX};
+    Found found = findYounger(reference, named.get());
+    std::move(found.younger.begin(), found.younger.end(), std::back_inserter(m_chain));
+    if (found.isAll) {
+        Member present;
+        present.file = std::move(named);
+        present.hadName = true;
+        m_chain.push_back(std::move(present));
+    }
+}
+
+/// The present file has nothing that was read, so that a truncation is not seen in it. What was in
+/// it before may be in a copy.
+void FileFollower::insertMissed() {
+    Found found = find(m_position, Search::byIdentity, nullptr);
+    const bool isHeld = found.holder.has_value();
+    found.holder.reset();
+    if (m_chain.size() > 1) {
+        // What was copied after this file had lost its name belongs behind it.
+        Generation::Status mine{};
+        m_chain.front().file->status(mine);
+        std::erase_if(found.younger, [&mine](const Member& member) {
+            Generation::Status other;
+            return !member.file->status(other) || other.modified > mine.modified;
+        });
+    }
+    if (found.younger.empty()) {
+        return;
+    }
+    if (!isHeld) {
+        continueIn(found.younger.front());
+    }
+    for (Member& member : found.younger) {
+        member.isRecovery = true;
+    }
+    prepend(found);
+    enter();
+}
+
+/// The file no longer has what was read of it: it was truncated. The rest of the old contents is
+/// read from a copy, as far as there is one; then the file is read from its beginning.
+void FileFollower::recover() {
+    const LogPosition at = *position();
+    const std::int64_t known = std::max(m_seen.size, m_block.readTo());
+    m_position = at;
+    m_hasPosition = true;
+    m_isInBlock = false;
+    Member& truncated = m_chain.front();
+    truncated.from = 0;
+    truncated.tail = Tail{};
+    const bool isOwn = identityOf(at) == truncated.file->identity();
+    Found found = find(at, Search::byContents, nullptr);
+    if (isOwn ? !found.holder : found.younger.empty()) {
+        const std::int64_t from = isOwn ? at.offset : 0;
+        m_ledger.noteLost(from, std::max(from, known));
+    }
+    for (Member& member : found.younger) {
+        member.isRecovery = true;
+    }
+    if (found.holder) {
+        found.holder->isComplete = true;
+        found.holder->isRecovery = true;
+    }
+    prepend(found);
+    enter();
+}
+
+/// The file of the position is gone. If it was replaced by one that begins with all of it, as
+/// editors do, reading goes on in that.
+void FileFollower::continueIn(Member& next) {
+    Tail tail;
+    if (next.from == 0 && m_position.guardLength > 0 && next.file->holds(m_position, tail)) {
+        next.from = m_position.offset;
+        next.tail = tail;
+    }
+}
+
+void FileFollower::prepend(Found& found) {
+    for (auto member = found.younger.rbegin(); member != found.younger.rend(); ++member) {
+        m_chain.push_front(std::move(*member));
+    }
+    if (found.holder) {
+        m_chain.push_front(std::move(*found.holder));
+    }
+}
+
+} // namespace zrm

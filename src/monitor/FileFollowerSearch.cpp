@@ -1,0 +1,219 @@
+#include "monitor/FileFollower.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <utility>
+
+#include <sys/stat.h>
+
+namespace zrm {
+
+// Finds the files of a followed log: the one that has the name, the one that has a position, and
+// the generations between the two.
+
+namespace {
+
+/// A rotation may go on while the directory is read.
+constexpr int mostAttempts = 5;
+/// Files opened at a time; the others follow when these have been read.
+constexpr std::size_t mostOpen = 32;
+
+/// Which of two holders of a position to read: the plain one, then the one with more to read.
+bool isBetterHolder(const GenerationFile& a, const GenerationFile& b) noexcept {
+    return a.isCompressed != b.isCompressed ? !a.isCompressed : a.size > b.size;
+}
+
+/// True if the file is not there any more, just after it could not be opened or was.
+bool hasVanished(const Generation* opened, const GenerationFile& file) noexcept {
+    const int number = errno;
+    return opened != nullptr ? !(opened->identity() == file.identity)
+                             : number == ENOENT && !file.isCompressed;
+}
+
+} // namespace
+
+/// The file that has the log's name. Null if there is none or it cannot be read; the ledger says
+/// so.
+std::unique_ptr<Generation> FileFollower::openNamed() {
+    struct stat status;
+    int number = stat(m_path.c_str(), &status) == 0 ? 0 : errno;
+    const char* call = "stat";
+    std::unique_ptr<Generation> named;
+    if (number == 0 && !S_ISREG(status.st_mode)) {
+        m_ledger.setState(FollowLedger::State::notAFile);
+        m_wasAbsent = true;
+        succeed(m_nameRetry);
+        return named;
+    }
+    if (number == 0) {
+        named = Generation::open(m_path);
+        number = named ? 0 : errno;
+        call = "open";
+    }
+    if (number == 0) {
+        succeed(m_nameRetry);
+    } else if (number == ENOENT || number == ENOTDIR) {
+        m_wasAbsent = true;
+        m_ledger.setState(m_chain.empty() ? FollowLedger::State::waiting
+                                          : FollowLedger::State::missing);
+        succeed(m_nameRetry);
+    } else {
+        fail(m_nameRetry, call, number);
+    }
+    return named;
+}
+
+/// The path beside which the generations lie: a symbolic link's target.
+std::string FileFollower::siblingPath() {
+    const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
+    if (real) {
+        m_siblings = real.get();
+    }
+    return m_siblings.empty() ? m_path : m_siblings;
+}
+
+bool FileFollower::isKnown(const FileIdentity& file, const Generation* named) const noexcept {
+    return (named != nullptr && named->identity() == file) ||
+           std::any_of(m_chain.begin(), m_chain.end(),
+                       [&file](const Member& member) { return member.file->identity() == file; });
+}
+
+FileFollower::Found FileFollower::find(const LogPosition& position, Search search,
+                                       Generation* named) {
+    Found found;
+    for (int attempt = 0; attempt < mostAttempts; ++attempt) {
+        found = Found{};
+        if (tryFind(position, search, named, found)) {
+            break;
+        }
+    }
+    return found;
+}
+
+FileFollower::Found FileFollower::findYounger(const GenerationReference& reference,
+                                              Generation* named) {
+    Found found;
+    for (int attempt = 0; attempt < mostAttempts; ++attempt) {
+        found = Found{};
+        if (openYounger(reference, findGenerations(siblingPath()), named, found)) {
+            break;
+        }
+    }
+    return found;
+}
+
+/// False if a file of the directory's list was gone when it was to be opened.
+bool FileFollower::tryFind(const LogPosition& position, Search search, Generation* named,
+                           Found& found) {
+    const std::vector<GenerationFile> files =
+        findGenerations(siblingPath(), static_cast<ino_t>(position.inode));
+    bool vanished = false;
+    found.holder = findHolder(position, search, named, files, vanished);
+    if (vanished) {
+        return false;
+    }
+    if (found.holder && named != nullptr && found.holder->file == nullptr) {
+        return true; // the present file has it
+    }
+    // Without a file that has the guard, an identity says nothing: inodes are used again.
+    GenerationReference reference{std::nullopt, m_modified};
+    if (found.holder) {
+        reference.identity = found.holder->file->identity();
+        Generation::Status status;
+        reference.modified = found.holder->file->status(status) ? status.modified : 0;
+    }
+    return openYounger(reference, files, named, found);
+}
+
+/// The file that has the position: the one with its identity, else one with the same contents. A
+/// member without a file stands for `named`.
+std::optional<FileFollower::Member>
+FileFollower::findHolder(const LogPosition& position, Search search, Generation* named,
+                         const std::vector<GenerationFile>& files, bool& vanished) {
+    const FileIdentity wanted = identityOf(position);
+    Member member;
+    member.from = position.offset;
+    if (named != nullptr && named->identity() == wanted && named->holds(position, member.tail)) {
+        return member;
+    }
+    const auto opens = [&](const GenerationFile& file) {
+        member.file = Generation::open(file.path);
+        if (hasVanished(member.file.get(), file)) {
+            vanished = true;
+            return false;
+        }
+        return member.file && member.file->holds(position, member.tail);
+    };
+    for (const GenerationFile& file : files) {
+        if (file.identity == wanted && !isKnown(file.identity, named) && opens(file)) {
+            return member;
+        }
+    }
+    if (search == Search::byIdentity || position.guardLength == 0) {
+        return std::nullopt;
+    }
+    member.file.reset();
+    if (named != nullptr && named->holds(position, member.tail)) {
+        return member;
+    }
+    std::vector<GenerationFile> others = files;
+    std::sort(others.begin(), others.end(), isBetterHolder);
+    for (const GenerationFile& file : others) {
+        if (!isKnown(file.identity, named) && opens(file)) {
+            return member;
+        }
+    }
+    return std::nullopt;
+}
+
+/// Opens the generations after the reference that are not copies of other files. False if one has
+/// vanished.
+bool FileFollower::openYounger(const GenerationReference& reference,
+                               const std::vector<GenerationFile>& files, Generation* named,
+                               Found& found) {
+    std::vector<Member> candidates;
+    for (const GenerationFile& file : youngerThan(files, reference)) {
+        if (isKnown(file.identity, named)) {
+            continue;
+        }
+        if (candidates.size() == mostOpen) {
+            found.isAll = false;
+            break;
+        }
+        Member member;
+        member.file = Generation::open(file.path);
+        if (hasVanished(member.file.get(), file)) {
+            return false;
+        }
+        // The file of the position may have been written to after it was read.
+        Tail tail;
+        const bool isRead = member.file && m_hasPosition && !m_isInBlock &&
+                            file.identity == identityOf(m_position) &&
+                            member.file->holds(m_position, tail);
+        if (member.file && !isRead) {
+            candidates.push_back(std::move(member));
+        }
+    }
+    // A copy that was made without a truncation, or a compressed file beside the original.
+    const auto isCopy = [&](Member& member) {
+        const auto isOf = [&member](Generation* other) {
+            return other != nullptr && member.file->isCopyOf(*other);
+        };
+        return isOf(named) || (found.holder && isOf(found.holder->file.get())) ||
+               std::any_of(m_chain.begin(), m_chain.end(),
+                           [&](const Member& known) { return isOf(known.file.get()); }) ||
+               std::any_of(candidates.begin(), candidates.end(), [&](const Member& other) {
+                   return &other != &member && isOf(other.file.get());
+               });
+    };
+    for (auto member = candidates.begin(); member != candidates.end();) {
+        char first;
+        const bool isEmpty = member->file->readAt(&first, 1, 0) <= 0;
+        member = isEmpty || isCopy(*member) ? candidates.erase(member) : member + 1;
+    }
+    found.younger = std::move(candidates);
+    return true;
+}
+
+} // namespace zrm

@@ -1,0 +1,115 @@
+#include "monitor/LogFile.h"
+
+#include "base/ErrorText.h"
+#include "base/TraceScope.h"
+#include "framework/LogPositions.h"
+#include "logs/FollowSettings.h"
+#include "monitor/FileFollower.h"
+
+#include <sys/select.h>
+
+namespace zrm {
+
+// Follows a log through rotations and restarts on the log's own thread.
+
+namespace {
+
+TRC1_Anchor anchor{"LogFileFollow.cpp"};
+
+constexpr timeval lookInterval{1, 0};
+constexpr std::chrono::seconds noteInterval{1};
+constexpr unsigned entriesPerClock = 1024; ///< entries between two looks at the clock
+
+FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t recordLength) {
+    FileFollower::Options options;
+    options.byName = settings.follow == FollowSettings::Follow::name;
+    options.fromBeginning =
+        settings.isNewcomer || settings.start == FollowSettings::Start::beginning;
+    options.rotateWait = settings.rotateWait;
+    options.recordLength = recordLength;
+    return options;
+}
+
+} // namespace
+
+void LogFile::followLog(std::size_t recordLength) {
+    TraceScope trace(anchor);
+    const FollowSettings& settings = *followSettings();
+    FileFollower follower(fileNameLocal(), optionsFor(settings, recordLength), *m_followLedger);
+    LogPositions positions(fileNameUTF8());
+    const auto stored = settings.resume ? positions.stored() : std::nullopt;
+    if (stored) {
+        follower.resumeAt(*stored);
+    }
+    for (bool isLast = false; !isLast;) {
+        // What is there when the log is to end is still read.
+        isLast = monitorStatus() != MONITOR_RUNNING;
+        m_pulse.work("looks at the log");
+        if (follower.look(FileFollower::Moment::now())) {
+            if (!readEntries(follower, positions)) {
+                break;
+            }
+            noteFollowed(follower, positions);
+        }
+        noteFollowFailure();
+        m_pulse.rest();
+        if (!isLast) {
+            timeval interval = lookInterval;
+            select(0, nullptr, nullptr, nullptr, &interval);
+        }
+    }
+    m_ledger.noteFile(std::nullopt);
+}
+
+/// Judges what there is to read. False if the log has to end before an entry was judged, which then
+/// is not behind the position.
+bool LogFile::readEntries(FileFollower& follower, LogPositions& positions) {
+    TraceScope trace(anchor);
+    m_pulse.work("reads the log");
+    const std::int64_t entriesBefore = numEvents();
+    auto noted = std::chrono::steady_clock::now();
+    bool isJudged = true;
+    for (unsigned entries = 1; char* const entry = follower.next(); ++entries) {
+        positions.beginEntry();
+        isJudged = !isReadingOver() && deliverEntry(entry);
+        if (!isJudged) {
+            break;
+        }
+        if (positions.hasEvents()) {
+            positions.endEntry(*follower.position());
+        }
+        if (entries % entriesPerClock == 0 &&
+            std::chrono::steady_clock::now() - noted >= noteInterval) {
+            noted = std::chrono::steady_clock::now();
+            noteFollowed(follower, positions);
+        }
+    }
+    if (numEvents() != entriesBefore) {
+        m_ledger.noteEntries();
+    }
+    return trace.result(isJudged);
+}
+
+/// Records how far the log was read.
+void LogFile::noteFollowed(FileFollower& follower, LogPositions& positions) {
+    if (const auto position = follower.position()) {
+        positions.reached(*position);
+    }
+    m_ledger.noteFile(follower.file());
+    m_ledger.addBytes(follower.takeBytesRead());
+    follower.noteProgress();
+}
+
+/// Traces a failure once, however often the call is tried again.
+void LogFile::noteFollowFailure() {
+    TraceScope trace(anchor);
+    const auto failure = m_followLedger->failure();
+    if (failure && !m_isFailureTraced) {
+        const ErrorText error(failure->number);
+        trace.error()("Error while following file %s: %s failed and is tried again. errno = %d; %s",
+                      fileNameLocal(), failure->call, error.number(), error.text());
+    }
+    m_isFailureTraced = failure.has_value();
+}
+
+} // namespace zrm

@@ -1,0 +1,88 @@
+#ifndef ZRM_TESTS_FOLLOWED_WORLD_H
+#define ZRM_TESTS_FOLLOWED_WORLD_H
+
+#include "support/TemporaryDirectory.h"
+
+#include <map>
+#include <memory>
+#include <random>
+#include <set>
+#include <string>
+#include <vector>
+
+/// A log that one program writes and others rotate, with a plain account of which entries were
+/// written where. Every entry's text begins with its number. Times of modification are set, so that
+/// everything that is done has a time of its own.
+class FollowedWorld {
+public:
+    enum class Style { NUMBERED, DATED, SYMLINK };
+    struct Entry {
+        std::string text;     ///< without the newline
+        bool mayMiss = false; ///< it was gone before anyone could read it
+    };
+    /// A file, whatever its name.
+    struct File {
+        std::vector<int> entries;
+        bool isOpenEnded = false; ///< the last entry has no newline yet
+    };
+
+    FollowedWorld(Style style, std::mt19937& random);
+    ~FollowedWorld();
+
+    const std::string& path() const { return m_path; }
+    const std::vector<Entry>& entries() const { return m_entries; }
+
+    void write(int lines);
+    void writeLongLine();
+    void writeHalf();
+    void rotateByName(bool creates);
+    void reopen();
+    void copyAndTruncate(bool losesLines);
+    void truncate();
+    void compress();
+    void removeGeneration();
+    void removeAndCreate();
+    void replace();
+
+    /// Which file has which entries, on standard error.
+    void print() const;
+
+    bool isReopenDue() const { return m_isReopenDue; }
+    /// The follower has the file that has the name now.
+    void noteLook();
+    /// The follower has ended; `last` is the last entry before its position, -1 if there is none.
+    void noteEnd(int last);
+    /// A follower begins at the position of the one that ended.
+    void noteStart();
+    /// What was delivered last.
+    void noteDelivered(int last) { m_delivered = last; }
+
+private:
+    std::string random(std::size_t most);
+    void append(const std::string& text);
+    void touch(const std::string& path);
+    void shift();
+    std::string rotatedName();
+    void create();
+    bool has(const File& file, int entry) const;
+    void findMissing();
+
+    const Style m_style;
+    std::mt19937& m_random;
+    TemporaryDirectory m_directory;
+    std::string m_path;
+    std::vector<Entry> m_entries;
+    std::map<std::string, std::shared_ptr<File>> m_files; ///< by path; a link's target
+    std::set<std::shared_ptr<File>> m_held;               ///< by the follower
+    std::shared_ptr<File> m_written;
+    std::string m_target; ///< of the symbolic link
+    int m_descriptor = -1;
+    bool m_isReopenDue = false;
+    int m_delivered = -1;
+    int m_last = -1; ///< before the position of an ended follower; -2: none has ended
+    bool m_isFollowed = false;
+    int m_names = 0;
+    long m_tick = 0;
+};
+
+#endif

@@ -1,0 +1,268 @@
+#include "FakeCompression.h"
+#include "FollowedWorld.h"
+#include "monitor/FileFollower.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string_view>
+
+using namespace zrm;
+
+namespace {
+
+constexpr std::chrono::seconds rotateWait{2};
+
+/// A follower of a world that is started, stopped and killed, and what it delivers.
+class FollowedRun {
+public:
+    FollowedRun(FollowedWorld& world, std::mt19937& random) : m_world(world), m_random(random) {
+        start();
+    }
+
+    bool isRunning() const { return m_follower != nullptr; }
+
+    void start() {
+        FileFollower::Options options;
+        options.fromBeginning = true;
+        options.rotateWait = rotateWait;
+        m_follower = std::make_unique<FileFollower>(m_world.path(), options, m_ledger);
+        if (m_stored.position) {
+            m_follower->resumeAt(*m_stored.position);
+        }
+        m_world.noteStart();
+        look(std::chrono::milliseconds(0));
+    }
+
+    void look(std::chrono::milliseconds passed) {
+        m_now += passed;
+        m_world.noteLook();
+        if (m_follower->look({m_now, 0})) {
+            while (const char* const entry = m_follower->next()) {
+                take(entry);
+                m_world.noteDelivered(m_delivered);
+                if (m_random() % 8 == 0) {
+                    remember();
+                }
+            }
+        }
+        m_follower->noteProgress();
+        m_world.noteDelivered(m_delivered);
+        remember();
+    }
+
+    void stop() {
+        look(std::chrono::milliseconds(0));
+        end(m_places.back());
+    }
+
+    /// The history has only what was stored with an older position.
+    void kill() {
+        const std::size_t back = std::min<std::size_t>(m_random() % 12, m_places.size() - 1);
+        end(Place(m_places[m_places.size() - 1 - back]));
+    }
+
+    /// Everything that was there to be read was.
+    void expectAll() {
+        const auto& entries = m_world.entries();
+        for (std::size_t i = static_cast<std::size_t>(m_delivered + 1); i < entries.size(); ++i) {
+            if (!entries[i].mayMiss) {
+                const auto failure = m_ledger.failure();
+                ADD_FAILURE() << "not delivered: " << entries[i].text.substr(0, 40) << "; "
+                              << followStateText(m_ledger.state()) << " "
+                              << (m_ledger.generation() ? m_ledger.generation()->path : "nothing")
+                              << " at " << m_ledger.position() << ", "
+                              << (failure ? failure->call : "no failure");
+                return;
+            }
+        }
+    }
+
+    std::size_t delivered = 0;
+
+private:
+    struct Place {
+        int last = -1; ///< the last entry before it
+        std::optional<LogPosition> position;
+    };
+
+    void remember() {
+        m_places.push_back({m_delivered, m_follower->position()});
+        if (m_places.size() > 50) {
+            m_places.erase(m_places.begin(), m_places.begin() + 25);
+        }
+    }
+
+    void end(const Place& place) {
+        m_follower.reset();
+        m_stored = place;
+        m_delivered = place.last;
+        m_places = {place};
+        m_world.noteDelivered(m_delivered);
+        m_world.noteEnd(m_delivered);
+    }
+
+    void take(std::string_view entry) {
+        ++delivered;
+        const auto& entries = m_world.entries();
+        ASSERT_TRUE(entry.ends_with('\n'));
+        entry.remove_suffix(1);
+        const int number = std::atoi(std::string(entry.substr(0, 10)).c_str());
+        ASSERT_LT(static_cast<std::size_t>(number), entries.size());
+        ASSERT_EQ(entry, entries[static_cast<std::size_t>(number)].text);
+        ASSERT_GT(number, m_delivered) << "twice: " << entry.substr(0, 40);
+        for (int i = m_delivered + 1; i < number; ++i) {
+            ASSERT_TRUE(entries[static_cast<std::size_t>(i)].mayMiss)
+                << "passed over: " << entries[static_cast<std::size_t>(i)].text.substr(0, 40)
+                << " before " << number;
+        }
+        m_delivered = number;
+    }
+
+    FollowedWorld& m_world;
+    std::mt19937& m_random;
+    FollowLedger m_ledger;
+    std::unique_ptr<FileFollower> m_follower;
+    std::chrono::steady_clock::time_point m_now{std::chrono::hours(1)};
+    int m_delivered = -1;
+    Place m_stored;
+    std::vector<Place> m_places{Place{}};
+};
+
+class FollowerModel : public testing::Test {
+protected:
+    /// One thing that happens. Returns its name.
+    const char* act(FollowedWorld& world, FollowedRun& run) {
+        const auto die = m_random() % 100;
+        if (die < 34) {
+            world.write(static_cast<int>(1 + m_random() % 4));
+            return "write";
+        }
+        if (die < 39) {
+            world.writeHalf();
+            return "half";
+        }
+        if (die < 44) {
+            world.rotateByName(true);
+            return "rename and create";
+        }
+        if (die < 47) {
+            world.rotateByName(false);
+            return "rename";
+        }
+        if (die < 51) {
+            world.copyAndTruncate(false);
+            return "copytruncate";
+        }
+        if (die < 52) {
+            world.copyAndTruncate(true);
+            return "copytruncate that loses lines";
+        }
+        if (die < 53) {
+            world.truncate();
+            return "truncate";
+        }
+        if (die < 57) {
+            world.compress();
+            return "compress";
+        }
+        if (die < 58) {
+            world.removeGeneration();
+            return "remove a generation";
+        }
+        if (die < 59) {
+            world.removeAndCreate();
+            return "remove and create";
+        }
+        if (die < 61) {
+            world.replace();
+            return "replace";
+        }
+        if (die < 66) {
+            world.reopen();
+            return "reopen";
+        }
+        if (die < 67 && m_random() % 10 == 0) {
+            world.writeLongLine();
+            return "long line";
+        }
+        if (die < 70) {
+            return toggle(run);
+        }
+        if (run.isRunning()) {
+            const std::chrono::milliseconds passed(m_random() % 3000);
+            if (world.isReopenDue()) {
+                world.reopen();
+            }
+            run.look(passed);
+            return "look";
+        }
+        return "nothing";
+    }
+
+    const char* toggle(FollowedRun& run) {
+        if (!run.isRunning()) {
+            run.start();
+            return "start";
+        }
+        if (m_random() % 2 == 0) {
+            run.stop();
+            return "stop";
+        }
+        run.kill();
+        return "kill";
+    }
+
+    /// Some hundred actions on one log.
+    std::size_t live(FollowedWorld::Style style, int actions) {
+        FollowedWorld world(style, m_random);
+        FollowedRun run(world, m_random);
+        std::vector<std::string> done;
+        for (int i = 0; i < actions && !HasFailure(); ++i) {
+            done.emplace_back(act(world, run));
+        }
+        if (HasFailure()) {
+            world.print();
+        }
+        if (!run.isRunning()) {
+            run.start();
+        }
+        world.reopen();
+        world.write(1);
+        for (int i = 0; i < 40 && !HasFailure(); ++i) {
+            run.look(rotateWait);
+        }
+        run.expectAll();
+        if (HasFailure()) {
+            const std::size_t first = done.size() > 60 ? done.size() - 60 : 0;
+            for (std::size_t i = first; i < done.size(); ++i) {
+                std::fprintf(stderr, "%s; ", done[i].c_str());
+            }
+            std::fputc('\n', stderr);
+        }
+        return run.delivered;
+    }
+
+    std::mt19937 m_random;
+};
+
+TEST_F(FollowerModel, DeliversEachEntryOnceAndInOrder) {
+    const FakeCompression compression;
+    const char* const wanted = std::getenv("ZRM_FOLLOWER_ACTIONS");
+    const char* const seeds = std::getenv("ZRM_FOLLOWER_SEED");
+    const int actions = wanted != nullptr ? std::atoi(wanted) : 100'000;
+    const unsigned first = seeds != nullptr ? static_cast<unsigned>(std::atoi(seeds)) : 1;
+    constexpr int perLog = 250;
+    std::size_t delivered = 0;
+    unsigned seed = first;
+    for (int done = 0; done < actions && !HasFailure(); done += perLog, ++seed) {
+        SCOPED_TRACE("ZRM_FOLLOWER_SEED=" + std::to_string(seed));
+        m_random.seed(seed);
+        const auto style = static_cast<FollowedWorld::Style>(m_random() % 3);
+        delivered += live(style, perLog);
+    }
+    std::printf("seeds %u to %u, %zu entries\n", first, seed - 1, delivered);
+    EXPECT_GT(delivered, static_cast<std::size_t>(actions) / 4);
+}
+
+} // namespace
