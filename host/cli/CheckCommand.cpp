@@ -111,8 +111,8 @@ int CheckCommand::checkHost(Context& context) const {
     } else if (problems.empty()) {
         context.print(DisplayText::visible(m_host) + " can be used\n");
         noteUnfinished(content, m_host);
-        if (const std::string warning = warningOfSecrets(*result, m_host); !warning.empty()) {
-            Context::note(warning);
+        if (const auto warning = warningOfSecrets(*result, m_host)) {
+            Context::note(*warning);
         }
     } else {
         for (const std::string& problem : problems) {

@@ -1,5 +1,6 @@
 #include "host/events/EventQueue.h"
 
+#include "host/base/TimeText.h"
 #include "host/framework/EventRoomControl.h"
 
 #include <algorithm>
@@ -36,7 +37,6 @@ std::uint64_t EventQueue::slowest() const {
 }
 
 bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row) {
-    using std::chrono::system_clock;
     bool isReaderAwaiting = false;
     {
         const std::lock_guard guard(m_mutex);
@@ -45,9 +45,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
         }
         Event event;
         event.id = m_last + m_next + m_aside.size() + 1;
-        event.raised = std::chrono::duration_cast<std::chrono::milliseconds>(
-                           system_clock::now().time_since_epoch())
-                           .count();
+        event.raised = WallClock::now();
         event.situation = situation;
         if (m_aside.empty() && hasSlot()) {
             put(event, row);
