@@ -64,24 +64,27 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
     return seen;
 }
 
-std::string Explainer::read(LogFile& log,
-                            const std::function<void(std::optional<std::string_view> line,
-                                                     zrm_rmlogent_data_t* row)>& entry) {
+Result<void> Explainer::read(LogFile& log,
+                             const std::function<void(std::optional<std::string_view> line,
+                                                      zrm_rmlogent_data_t* row)>& entry) {
     LogTail tail(log);
-    std::string problem = tail.read(entry);
+    Result<void> result = tail.read(entry);
     m_reach = tail.reach();
-    return problem;
+    return result;
 }
 
-std::vector<Explanation> Explainer::last(LogFile& log, std::size_t number) {
+Result<std::vector<Explanation>> Explainer::last(LogFile& log, std::size_t number) {
     TraceScope trace(anchor);
     std::deque<Seen> seen;
-    m_problem = read(log, [&](auto line, zrm_rmlogent_data_t* row) {
+    const Result<void> whole = read(log, [&](auto line, zrm_rmlogent_data_t* row) {
         seen.push_back(judge(m_replay, line, row));
         if (seen.size() > number) {
             seen.pop_front();
         }
     });
+    if (!whole) {
+        return tl::unexpected(whole.error());
+    }
     std::vector<Explanation> explanations;
     explanations.reserve(seen.size());
     for (Seen& entry : seen) {
@@ -90,7 +93,7 @@ std::vector<Explanation> Explainer::last(LogFile& log, std::size_t number) {
     return explanations;
 }
 
-std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
+Result<std::vector<Explanation>> Explainer::line(LogFile& log, std::string_view line) {
     TraceScope trace(anchor);
     std::optional<Seen> found;
     Stamps matched;
@@ -105,33 +108,36 @@ std::vector<Explanation> Explainer::line(LogFile& log, std::string_view line) {
         }
     });
     if (found) {
-        return {describe(*found)};
+        return std::vector{describe(*found)};
     }
     return nextLine(log, line, matched);
 }
 
 /// The line as if it came after all entries up to its time.
-std::vector<Explanation> Explainer::nextLine(LogFile& log, std::string_view line,
-                                             const Stamps& before) {
+Result<std::vector<Explanation>> Explainer::nextLine(LogFile& log, std::string_view line,
+                                                     const Stamps& before) {
     TraceScope trace(anchor);
     Replay replay(m_situation, m_entries);
     bool isFirst = true;
     std::vector<Explanation> explanations;
     if (!replay.isOpen()) {
-        m_problem = "there are too many requests";
-        return explanations;
+        return refused("there are too many requests");
     }
-    m_problem = LogTail(log).readLine(line, [&](auto text, zrm_rmlogent_data_t* row) {
-        if (row != nullptr && std::exchange(isFirst, false)) {
-            for (const std::string& stamp : before) {
-                if (stamp <= stampOf(*row)) {
-                    replay.count(stamp.data());
+    const Result<void> whole =
+        LogTail(log).readLine(line, [&](auto text, zrm_rmlogent_data_t* row) {
+            if (row != nullptr && std::exchange(isFirst, false)) {
+                for (const std::string& stamp : before) {
+                    if (stamp <= stampOf(*row)) {
+                        replay.count(stamp.data());
+                    }
                 }
             }
-        }
-        Seen seen = judge(replay, text, row);
-        explanations.push_back(describe(seen));
-    });
+            Seen seen = judge(replay, text, row);
+            explanations.push_back(describe(seen));
+        });
+    if (!whole) {
+        return tl::unexpected(whole.error());
+    }
     return explanations;
 }
 

@@ -4,6 +4,7 @@
 #include "host/analysis/Explanation.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/Replay.h"
+#include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 #include "logs/zrm_rmlogent_data.h"
 
@@ -47,16 +48,14 @@ public:
 
     /// Explains a line of a line-based log: its last occurrence in the log, or else as if it came
     /// next. A line longer than a monitor reads in one piece yields several explanations.
-    std::vector<Explanation> line(LogFile& log, std::string_view line);
+    Result<std::vector<Explanation>> line(LogFile& log, std::string_view line);
 
     /// The log's last entries, at most `mostEntries`, oldest first.
-    std::vector<Explanation> last(LogFile& log, std::size_t number);
+    Result<std::vector<Explanation>> last(LogFile& log, std::size_t number);
 
     /// The entry of an event; the log is null when it is no longer monitored.
     Explanation event(LogFile* log, const EventEntry& entry);
 
-    /// Why the log could not be read; empty when it could.
-    const std::string& problem() const noexcept { return m_problem; }
     /// How far back the log was read for the latest explanation.
     const Reach& reach() const noexcept { return m_reach; }
 
@@ -65,19 +64,19 @@ private:
     struct Seen;
     using Stamps = std::vector<std::string>;
 
-    std::string read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
-                                                            zrm_rmlogent_data_t* row)>& entry);
+    Result<void> read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
+                                                             zrm_rmlogent_data_t* row)>& entry);
     Seen judge(Replay& replay, std::optional<std::string_view> line, zrm_rmlogent_data_t* row);
     Explanation describe(Seen& seen);
     void decide(Explanation& explanation, const Seen& seen) const;
-    std::vector<Explanation> nextLine(LogFile& log, std::string_view line, const Stamps& before);
+    Result<std::vector<Explanation>> nextLine(LogFile& log, std::string_view line,
+                                              const Stamps& before);
 
     const SituationConfig m_situation;
     const bool m_isStopped;
     TableManager& m_entries;
     Replay m_replay;
     std::optional<ConditionJudge> m_judge; ///< for every condition except the thresholds
-    std::string m_problem;
     Reach m_reach;
 };
 

@@ -1,6 +1,5 @@
 #include "host/analysis/LogTail.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "host/base/JsonWriter.h"
 #include "host/diagnose/MonitoredLogFile.h"
@@ -53,11 +52,6 @@ private:
     int m_fd;
 };
 
-std::string because(const std::string& what, int number) {
-    const ErrorText error(number);
-    return what + ": " + error.text();
-}
-
 /// Seeks to the first complete line among the file's last bytes; false with errno set.
 bool seekTail(int fd) {
     const off_t end = lseek(fd, 0, SEEK_END);
@@ -87,54 +81,54 @@ bool LogTail::hasLines() const noexcept {
     return m_log.type() == 'U' || m_log.type() == 'S';
 }
 
-std::string LogTail::read(const Entry& entry) {
+Result<void> LogTail::read(const Entry& entry) {
     TraceScope trace(anchor);
     m_reach = {};
     if (m_log.type() == errorLog) {
         entries(entry);
-        return "";
+        return {};
     }
-    const MonitoredLogFile file(m_log.fileNameLocal(), m_log.ledger().file());
-    m_reach.reason = file.problem();
-    if (m_reach.isComplete() && hasLines()) {
-        m_reach.reason = readLines(file.descriptor(), entry);
-    } else if (m_reach.isComplete()) {
+    const auto file = MonitoredLogFile::open(m_log.fileNameLocal(), m_log.ledger().file());
+    if (file && !hasLines()) {
         entries(entry);
-        return "";
+        return {};
     }
-    std::string problem = m_reach.reason;
-    if (problem.empty() && m_isCut) {
+    const Result<void> lines =
+        file ? readLines(file->descriptor(), entry) : tl::unexpected(file.error());
+    if (!lines) {
+        m_reach.reason = lines.error().text();
+    } else if (m_isCut) {
         m_reach.reason = "only the end of the log is read, 4 MiB";
     }
-    return problem;
+    return lines;
 }
 
-/// Reads the lines at the end of a file. Returns an error message, empty on success.
-std::string LogTail::readLines(int fd, const Entry& entry) {
+/// Reads the lines at the end of a file.
+Result<void> LogTail::readLines(int fd, const Entry& entry) {
     if (!seekTail(fd)) {
-        return because("the log cannot be read", errno);
+        return refused(because("the log cannot be read", errno));
     }
     m_isCut = lseek(fd, 0, SEEK_CUR) > 0;
     pieces(fd, entry);
-    return "";
+    return {};
 }
 
-std::string LogTail::readLine(std::string_view line, const Entry& entry) {
+Result<void> LogTail::readLine(std::string_view line, const Entry& entry) {
     TraceScope trace(anchor);
     int ends[2];
     if (pipe2(ends, O_CLOEXEC | O_NONBLOCK) == -1) {
-        return because("no pipe", errno);
+        return refused(because("no pipe", errno));
     }
     const Descriptor readEnd(ends[0]);
     Descriptor writeEnd(ends[1]);
     const std::string text = std::string(line) + '\n';
     // An empty pipe takes this much at once.
     if (write(writeEnd.get(), text.data(), text.size()) != static_cast<ssize_t>(text.size())) {
-        return because("the line cannot be read", errno);
+        return refused(because("the line cannot be read", errno));
     }
     writeEnd.close();
     pieces(readEnd.get(), entry);
-    return "";
+    return {};
 }
 
 void LogTail::pieces(int fd, const Entry& entry) {

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_LOG_TAIL_H
 #define ZRM_HOST_LOG_TAIL_H
 
+#include "host/base/Result.h"
 #include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
@@ -48,17 +49,17 @@ public:
     /// line can be given.
     bool hasLines() const noexcept;
 
-    /// Reads the log's end. Returns what is wrong, empty when nothing is.
-    std::string read(const Entry& entry);
+    /// Reads the log's end.
+    Result<void> read(const Entry& entry);
 
     /// Reads one line, of at most `longestLine` bytes without a newline, in its pieces.
-    std::string readLine(std::string_view line, const Entry& entry);
+    Result<void> readLine(std::string_view line, const Entry& entry);
 
     /// How far `read` has reached back.
     const Reach& reach() const noexcept { return m_reach; }
 
 private:
-    std::string readLines(int fd, const Entry& entry);
+    Result<void> readLines(int fd, const Entry& entry);
     void pieces(int fd, const Entry& entry);
     void entries(const Entry& entry);
 

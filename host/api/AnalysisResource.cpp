@@ -131,11 +131,11 @@ AnalysisResource::Explained AnalysisResource::explainLine(JsonFields& fields) {
     }
     Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
     requireOpen(explainer.isOpen());
-    std::vector<Explanation> explanations = explainer.line(log, line);
-    if (!explainer.problem().empty()) {
-        throw RequestRefused(503, explainer.problem(), "line");
+    auto explanations = explainer.line(log, line);
+    if (!explanations) {
+        throw RequestRefused(503, {explanations.error().what, explanations.error().cure, "line"});
     }
-    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
+    return {std::move(*explanations), explainer.reach(), log.fileNameUTF8()};
 }
 
 AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
@@ -148,11 +148,11 @@ AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
     fields.refuseUnknown();
     Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
     requireOpen(explainer.isOpen());
-    std::vector<Explanation> explanations = explainer.last(log, number);
-    if (!explainer.problem().empty()) {
-        throw RequestRefused(409, explainer.problem(), "log");
+    auto explanations = explainer.last(log, number);
+    if (!explanations) {
+        throw RequestRefused(409, {explanations.error().what, explanations.error().cure, "log"});
     }
-    return {std::move(explanations), explainer.reach(), log.fileNameUTF8()};
+    return {std::move(*explanations), explainer.reach(), log.fileNameUTF8()};
 }
 
 AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
@@ -161,8 +161,7 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     if (m_history == nullptr) {
         throw RequestRefused(409, "the history is off", "event");
     }
-    const std::optional<StoredEvent> event =
-        EventQuery::reading([&] { return m_history->event(id); });
+    const std::optional<StoredEvent> event = EventQuery::valueOf(m_history->event(id));
     if (!event) {
         throw RequestRefused(404, "the history does not contain this event", "event");
     }

@@ -1,6 +1,5 @@
 #include "host/api/DiagnoseResource.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/FormatTrial.h"
@@ -50,15 +49,13 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
     if (monitored[0].type != 'U' && monitored[0].type != 'S') {
         fields.refuse("log", "this log is not a text file");
     }
-    const MonitoredLogFile file(monitored[0].file, monitored[0].openFile);
-    if (!file.problem().empty()) {
-        throw RequestRefused(409, file.problem(), fields.place("log"));
+    const auto file = MonitoredLogFile::open(monitored[0].file, monitored[0].openFile);
+    if (!file) {
+        throw RequestRefused(409, {file.error().what, file.error().cure, fields.place("log")});
     }
-    std::optional<std::vector<std::string>> lines = LastLines::read(file.descriptor(), count);
+    std::optional<std::vector<std::string>> lines = LastLines::read(file->descriptor(), count);
     if (!lines) {
-        const ErrorText error(errno);
-        throw RequestRefused(409, std::string("the log cannot be read: ") + error.text(),
-                             fields.place("log"));
+        throw RequestRefused(409, because("the log cannot be read", errno), fields.place("log"));
     }
     return std::move(*lines);
 }

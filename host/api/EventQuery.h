@@ -1,11 +1,12 @@
 #ifndef ZRM_HOST_EVENT_QUERY_H
 #define ZRM_HOST_EVENT_QUERY_H
 
+#include "host/base/Result.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 
-#include <string>
+#include <utility>
 
 namespace zrm::host {
 
@@ -15,15 +16,12 @@ public:
     /// The history, which must be on. Throws RequestRefused.
     static HistoryReader& history(HistoryReader* reader);
 
-    /// Does what reads the history. What this says when it cannot be read is thrown as
-    /// RequestRefused.
-    template <typename Read> static auto reading(const Read& read) {
-        try {
-            return read();
-        } catch (const HistoryError& error) {
-            throw RequestRefused(503, std::string("the history cannot be read: ") + error.what(),
-                                 "");
+    /// What was read of the history. Throws RequestRefused where it could not be read.
+    template <class T> static T valueOf(Result<T> read) {
+        if (!read) {
+            throw RequestRefused(503, "the history cannot be read: " + read.error().text(), "");
         }
+        return std::move(*read);
     }
 
     /// Reads which events are wanted: situation, log and severity, each any number of times, of

@@ -95,7 +95,7 @@ private:
 
     void run();
     bool serve(Follower& follower) const;
-    std::string next(Follower& follower) const;
+    Result<std::string> next(Follower& follower) const;
     void waitForChange(const std::vector<Follower>& followers, const std::stop_token& wake) const;
 
     HistoryReader* const m_history;
@@ -190,8 +190,12 @@ bool EventStream::Followers::serve(Follower& follower) const {
         return true;
     }
     try {
-        follower.channel->send(next(follower));
-        return true;
+        const Result<std::string> text = next(follower);
+        if (text) {
+            follower.channel->send(*text);
+            return true;
+        }
+        trace.error()("A stream broke off: %s", text.error().text().c_str());
     } catch (const std::exception& exception) {
         trace.error()("A stream broke off: %s", exception.what());
     }
@@ -199,14 +203,17 @@ bool EventStream::Followers::serve(Follower& follower) const {
     return false;
 }
 
-std::string EventStream::Followers::next(Follower& follower) const {
+Result<std::string> EventStream::Followers::next(Follower& follower) const {
     EventFilter& filter = follower.filter;
     const std::uint64_t newest = m_history->newest();
     std::string text;
     if (newest > filter.after) {
-        const EventPage page = m_history->query(filter);
-        text = messages(page.events);
-        filter.after = lastLookedAt(page, filter, newest);
+        const Result<EventPage> page = m_history->query(filter);
+        if (!page) {
+            return tl::unexpected(page.error());
+        }
+        text = messages(page->events);
+        filter.after = lastLookedAt(*page, filter, newest);
     }
     if (text.empty() && Clock::now() >= follower.silent) {
         text = ": keep-alive\n\n";

@@ -3,6 +3,7 @@
 #include "base/TraceScope.h"
 #include "host/api/EventQuery.h"
 #include "host/base/JsonWriter.h"
+#include "host/base/TimeText.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
@@ -61,12 +62,9 @@ struct Window {
 };
 
 Window windowOf(const HttpRequest& request) {
-    const auto now = std::chrono::duration_cast<std::chrono::milliseconds>(
-                         std::chrono::system_clock::now().time_since_epoch())
-                         .count();
     QueryFields query(request);
     Window window{};
-    window.to = query.time("to").value_or(now);
+    window.to = query.time("to").value_or(WallClock::now());
     window.from = query.time("from").value_or(window.to - day);
     window.step = static_cast<std::int64_t>(query.number("step", 60, 86'400).value_or(60)) * 1000;
     window.log = query.text("log");
@@ -99,8 +97,8 @@ HttpAnswer EventsResource::events(const HttpRequest& request) {
     HistoryReader& history = EventQuery::history(m_history);
     EventFilter filter = filterOf(request);
     const std::size_t limit = filter.limit++; // one extra, to see whether there are more
-    const EventPage page = EventQuery::reading([&] { return history.query(filter); });
-    const HistoryState state = EventQuery::reading([&] { return history.state(); });
+    const EventPage page = EventQuery::valueOf(history.query(filter));
+    const HistoryState state = history.state();
     const std::size_t count = std::min(limit, page.events.size());
     const std::optional<std::uint64_t> next =
         page.events.size() > limit ? std::optional(page.events[count - 1].id) : page.reached;
@@ -126,7 +124,7 @@ HttpAnswer EventsResource::event(const HttpRequest& request) {
     if (error != std::errc() || stop != end || id > mostId) {
         throw RequestRefused(404, "an event's id is a whole number", "id");
     }
-    const std::optional<StoredEvent> event = EventQuery::reading([&] { return history.event(id); });
+    const std::optional<StoredEvent> event = EventQuery::valueOf(history.event(id));
     if (!event) {
         throw RequestRefused(404, "the history does not contain this event", "id");
     }
@@ -137,8 +135,7 @@ HttpAnswer EventsResource::rates(const HttpRequest& request) {
     TraceScope trace(anchor);
     HistoryReader& history = EventQuery::history(m_history);
     const Window window = windowOf(request);
-    const Rates rates =
-        EventQuery::reading([&] { return history.rates(window.from, window.to, window.step); });
+    const Rates rates = EventQuery::valueOf(history.rates(window.from, window.to, window.step));
     return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
         json.beginObject().key("start").time(rates.start).member("step", rates.step / 1000);
         json.key("logs").beginArray();

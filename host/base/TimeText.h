@@ -4,13 +4,14 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <ctime>
 #include <optional>
 #include <string>
 #include <string_view>
 
 namespace zrm::host {
 
-/// The wall-clock time in the form in which the host stores it.
+/// The wall-clock time. The host reads it nowhere else, but for the times of trace records.
 namespace WallClock {
 
 /// Milliseconds since 1970-01-01, UTC.
@@ -18,6 +19,11 @@ inline std::int64_t now() {
     return std::chrono::duration_cast<std::chrono::milliseconds>(
                std::chrono::system_clock::now().time_since_epoch())
         .count();
+}
+
+/// Seconds since 1970-01-01, UTC.
+inline std::time_t seconds() {
+    return std::time(nullptr);
 }
 
 } // namespace WallClock

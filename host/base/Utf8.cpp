@@ -31,6 +31,13 @@ std::uint64_t wordAt(const char* bytes) {
     return word;
 }
 
+/// Four words as one, for bits that any of them may have. Separate words stay in registers.
+std::uint64_t fourWordsAt(const char* bytes) {
+    constexpr std::size_t size = sizeof(std::uint64_t);
+    return wordAt(bytes) | wordAt(bytes + size) | wordAt(bytes + 2 * size) |
+           wordAt(bytes + 3 * size);
+}
+
 bool isContinuation(unsigned char byte) {
     return (byte & 0xC0) == 0x80;
 }
@@ -43,9 +50,7 @@ bool Utf8::isAscii(std::string_view text) noexcept {
     const char* const end = position + text.size();
     std::uint64_t seen = 0;
     for (; static_cast<std::size_t>(end - position) >= block; position += block) {
-        std::uint64_t words[4];
-        std::memcpy(words, position, sizeof words);
-        seen |= words[0] | words[1] | words[2] | words[3];
+        seen |= fourWordsAt(position);
     }
     for (; static_cast<std::size_t>(end - position) >= sizeof seen; position += sizeof seen) {
         seen |= wordAt(position);
@@ -64,9 +69,7 @@ std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
     std::size_t position = 0;
     constexpr std::size_t block = 4 * sizeof highBits;
     for (; position + block <= text.size(); position += block) {
-        std::uint64_t words[4];
-        std::memcpy(words, text.data() + position, sizeof words);
-        if (((words[0] | words[1] | words[2] | words[3]) & highBits) != 0) {
+        if ((fourWordsAt(text.data() + position) & highBits) != 0) {
             break;
         }
     }

@@ -152,8 +152,8 @@ int CheckCommand::checkHost(Context& context) const {
         }
         context.print(text);
         noteUnfinished(content, m_host);
-        if (const std::string warning = warningOfSecrets(*result, m_host); !warning.empty()) {
-            Context::note(warning);
+        if (const auto warning = warningOfSecrets(*result, m_host)) {
+            Context::note(*warning);
         }
     } else {
         for (const std::string& problem : problems) {

@@ -1,6 +1,7 @@
 #include "host/cli/Context.h"
 
 #include "host/base/Result.h"
+#include "host/base/TimeText.h"
 #include "host/cli/CliError.h"
 #include "host/cli/DisplayText.h"
 #include "host/cli/JsonText.h"
@@ -67,7 +68,7 @@ void Context::noteReach(const nlohmann::ordered_json& answer) {
 }
 
 std::string Context::time(const std::string& option, const std::string& text) {
-    const std::optional<std::string> time = TimeInput::toIso(text, std::time(nullptr));
+    const std::optional<std::string> time = TimeInput::toIso(text, WallClock::seconds());
     if (!time) {
         throw CliError(CLI_USAGE,
                        option + ": '" + text + "' is not a time; write " + TimeInput::forms);

@@ -120,32 +120,40 @@ std::string_view DisplayText::beginning(std::string_view visible, std::size_t co
     return visible.substr(0, end);
 }
 
-std::string DisplayText::shortened(std::string_view visible, std::size_t columns,
-                                   std::string_view ellipsis) {
-    if (width(visible) <= columns) {
+namespace {
+
+/// The text if it fits the columns; otherwise what `cut` leaves of it beside the ellipsis.
+template <class Cut>
+std::string fitted(std::string_view visible, std::size_t columns, std::string_view ellipsis,
+                   Cut cut) {
+    if (DisplayText::width(visible) <= columns) {
         return std::string(visible);
     }
-    const std::size_t mark = width(ellipsis);
+    const std::size_t mark = DisplayText::width(ellipsis);
     if (mark >= columns) {
-        return std::string(beginning(ellipsis, columns));
+        return std::string(DisplayText::beginning(ellipsis, columns));
     }
-    return std::string(beginning(visible, columns - mark)) + std::string(ellipsis);
+    return cut(columns - mark);
+}
+
+} // namespace
+
+std::string DisplayText::shortened(std::string_view visible, std::size_t columns,
+                                   std::string_view ellipsis) {
+    return fitted(visible, columns, ellipsis, [&](std::size_t room) {
+        return std::string(beginning(visible, room)) + std::string(ellipsis);
+    });
 }
 
 std::string DisplayText::shortenedPath(std::string_view visible, std::size_t columns,
                                        std::string_view ellipsis) {
-    if (width(visible) <= columns) {
-        return std::string(visible);
-    }
-    const std::size_t mark = width(ellipsis);
-    if (mark >= columns) {
-        return std::string(beginning(ellipsis, columns));
-    }
-    const Utf8Locale locale;
-    while (width(visible) > columns - mark) {
-        visible.remove_prefix(Utf8::firstSequence(visible).length);
-    }
-    return std::string(ellipsis) + std::string(visible);
+    return fitted(visible, columns, ellipsis, [&](std::size_t room) {
+        const Utf8Locale locale;
+        while (width(visible) > room) {
+            visible.remove_prefix(Utf8::firstSequence(visible).length);
+        }
+        return std::string(ellipsis) + std::string(visible);
+    });
 }
 
 } // namespace zrm::host

@@ -284,11 +284,11 @@ bool holdsSecret(const SinkConfig& sink) {
 
 } // namespace
 
-std::string warningOfSecrets(const HostConfig& config, const std::string& path) {
+std::optional<std::string> warningOfSecrets(const HostConfig& config, const std::string& path) {
     struct stat status {};
     if (stat(path.c_str(), &status) != 0 || (status.st_mode & S_IROTH) == 0 ||
         std::none_of(config.sinks.begin(), config.sinks.end(), holdsSecret)) {
-        return "";
+        return std::nullopt;
     }
     return path +
            " contains secrets and every user can read it: move them into separate files "

@@ -4,6 +4,7 @@
 #include "host/base/Result.h"
 #include "host/config/HostConfig.h"
 
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -32,8 +33,8 @@ public:
 };
 
 /// A warning when the configuration read from this file contains a secret of a sink and every user
-/// can read the file; otherwise empty.
-std::string warningOfSecrets(const HostConfig& config, const std::string& path);
+/// can read the file.
+std::optional<std::string> warningOfSecrets(const HostConfig& config, const std::string& path);
 
 } // namespace zrm::host
 

@@ -16,6 +16,7 @@
 #include <cstdio>
 #include <cstring>
 #include <memory>
+#include <optional>
 #include <utility>
 
 #include <nlohmann/json.hpp>
@@ -100,10 +101,11 @@ public:
             learnFormat(*valid, errors, line);
         }
         warnOfContents(*valid, line);
-        const std::string problem = log[0] == '/' ? ConfigCheck::problemOfFile(log) : "";
-        if (line.verdict == Verdict::REFUSED && !problem.empty()) {
+        const zrm::host::Result<void> file =
+            log[0] == '/' ? ConfigCheck::checkFile(log) : zrm::host::Result<void>();
+        if (line.verdict == Verdict::REFUSED && !file) {
             line.cause = Cause::FILE;
-            line.reason = "The file cannot be used: " + problem + ".";
+            line.reason = "The file cannot be used: " + file.error().text() + ".";
         } else if (line.verdict == Verdict::REFUSED) {
             line.cause = Cause::TEXT;
         }
@@ -134,14 +136,15 @@ private:
     }
     /// An accepted log whose file does not look like one of its type gets a warning.
     static void warnOfContents(const ValidLog& log, Line& line) {
-        std::string warning;
+        std::optional<std::string> warning;
         if (log.isValid() && log.type() == 'S') {
             warning = LogWarnings::ofSyslogFile(log.fileNameLocal());
         } else if (log.isValid() && log.type() == 'A') {
             warning = LogWarnings::ofAccountingFile(log.fileNameLocal());
         }
-        line.reason += line.reason.empty() || warning.empty() ? "" : " ";
-        line.reason += warning;
+        if (warning) {
+            line.reason += (line.reason.empty() ? "" : " ") + *warning;
+        }
     }
 
     const ConfigCheck::Directories* m_directories;
@@ -186,18 +189,19 @@ ConfigCheck::Result ConfigCheck::check(std::string_view text, const Directories&
     return judge(text, &directories);
 }
 
-std::string ConfigCheck::problemOfFile(const std::string& path) {
+zrm::host::Result<void> ConfigCheck::checkFile(const std::string& path) {
     struct stat status;
     if (::stat(path.c_str(), &status) != 0) {
-        const ErrorText error(errno);
-        return error.text();
+        return refused(ErrorText(errno).text());
     }
     if (!S_ISREG(status.st_mode)) {
-        return "It is not a regular file";
+        return refused("It is not a regular file");
     }
-    return status.st_mtime != 0 ? ""
-                                : "It was changed last at the beginning of 1970, which is how "
-                                  "the agent recognises a missing file";
+    if (status.st_mtime == 0) {
+        return refused("It was changed last at the beginning of 1970, which is how the agent "
+                       "recognises a missing file");
+    }
+    return {};
 }
 
 const char* ConfigCheck::name(Verdict verdict) noexcept {

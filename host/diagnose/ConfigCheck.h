@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_CONFIG_CHECK_H
 #define ZRM_HOST_CONFIG_CHECK_H
 
+#include "host/base/Result.h"
+
 #include <cstddef>
 #include <functional>
 #include <set>
@@ -53,9 +55,9 @@ public:
     /// is in none of the directories is not checked at all.
     static Result check(std::string_view text, const Directories& directories);
 
-    /// Why a log cannot be read from this path, as a sentence without its full stop; empty when it
-    /// can. Names no system call, since it is meant for authors of configurations.
-    static std::string problemOfFile(const std::string& path);
+    /// Whether a log can be read from this path. A problem is a sentence without its full stop and
+    /// names no system call, since it is meant for authors of configurations.
+    static zrm::host::Result<void> checkFile(const std::string& path);
 
     /// "accepted", "refused", "ignored" or "outside".
     static const char* name(Verdict verdict) noexcept;

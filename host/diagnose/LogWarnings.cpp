@@ -135,53 +135,54 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
                                    std::string(syslogCure))});
     }
     if (log.type == 'A') {
-        if (std::string text = ofAccountingFile(log.file, log.openFile); !text.empty()) {
-            warnings.push_back({"not_records", 0, std::move(text)});
+        if (std::optional<std::string> text = ofAccountingFile(log.file, log.openFile)) {
+            warnings.push_back({"not_records", 0, std::move(*text)});
         }
     }
     return warnings;
 }
 
-std::string LogWarnings::ofAccountingFile(const std::string& path,
-                                          const std::optional<FileIdentity>& opened) {
+std::optional<std::string>
+LogWarnings::ofAccountingFile(const std::string& path, const std::optional<FileIdentity>& opened) {
     TraceScope trace(anchor);
     constexpr std::size_t length = AdminLogFile::recordLength;
     struct stat status {};
     std::array<AdminLogFile::utmp, recordsTried> records;
     ssize_t count = 0;
-    const MonitoredLogFile file(path, opened);
-    if (file.problem().empty() && ::fstat(file.descriptor(), &status) == 0) {
+    const Result<MonitoredLogFile> file = MonitoredLogFile::open(path, opened);
+    if (file && ::fstat(file->descriptor(), &status) == 0) {
         const off_t from = std::max<off_t>(0, status.st_size - static_cast<off_t>(sizeof records));
-        count =
-            ::pread(file.descriptor(), records.data(), sizeof records, from - from % off_t{length});
+        count = ::pread(file->descriptor(), records.data(), sizeof records,
+                        from - from % off_t{length});
     }
     if (count <= 0) {
-        return "";
+        return std::nullopt;
     }
     if (status.st_size % off_t{length} != 0) {
         return "The file does not consist of login records of 40 bytes: its size, " +
                std::to_string(status.st_size) + " bytes, is not a multiple of 40. " +
                accountingCure;
     }
-    const std::time_t now = std::time(nullptr);
+    const std::time_t now = WallClock::seconds();
     const AdminLogFile::utmp* const first = records.data();
     const AdminLogFile::utmp* const end = first + static_cast<std::size_t>(count) / length;
     const bool isRight = std::all_of(
         first, end, [now](const AdminLogFile::utmp& record) { return isPlausible(record, now); });
-    return isRight ? ""
-                   : std::string("The file does not consist of login records of 40 bytes: what it "
-                                 "holds cannot be such records. ") +
-                         accountingCure;
+    if (isRight) {
+        return std::nullopt;
+    }
+    return std::string("The file does not consist of login records of 40 bytes: what it "
+                       "holds cannot be such records. ") +
+           accountingCure;
 }
 
-std::string LogWarnings::ofSyslogFile(const std::string& path) {
+std::optional<std::string> LogWarnings::ofSyslogFile(const std::string& path) {
     TraceScope trace(anchor);
-    const MonitoredLogFile file(path, std::nullopt);
-    const auto lines = file.problem().empty()
-                           ? LastLines::read(file.descriptor(), linesTried, byteLimit)
-                           : std::nullopt;
+    const Result<MonitoredLogFile> file = MonitoredLogFile::open(path, std::nullopt);
+    const auto lines =
+        file ? LastLines::read(file->descriptor(), linesTried, byteLimit) : std::nullopt;
     if (!lines) {
-        return "";
+        return std::nullopt;
     }
     const TraceCapture quiet;
     char noLine[] = "";
@@ -195,14 +196,16 @@ std::string LogWarnings::ofSyslogFile(const std::string& path) {
             continue;
         }
         if (row->entrytime[0] != ' ') {
-            return "";
+            return std::nullopt;
         }
         ++tried;
     }
-    return tried == 0 ? ""
-                      : std::string("None of the file's last lines begins with a time like \"Oct  "
-                                    "5 07:03:09\", so its entries would have none. ") +
-                            syslogCure;
+    if (tried == 0) {
+        return std::nullopt;
+    }
+    return std::string("None of the file's last lines begins with a time like \"Oct  "
+                       "5 07:03:09\", so its entries would have none. ") +
+           syslogCure;
 }
 
 } // namespace zrm::host

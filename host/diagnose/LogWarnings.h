@@ -17,14 +17,15 @@ public:
     /// system.
     static std::vector<LogWarning> of(const LogLedgerView& log);
 
-    // For a file that is to be monitored. Empty when nothing is wrong or the file cannot be read.
+    // For a file that is to be monitored. None when nothing is wrong or the file cannot be read.
 
     /// Why a file is not one of login accounting records of 40 bytes; `opened` is the file that a
     /// monitor reads.
-    static std::string ofAccountingFile(const std::string& path,
-                                        const std::optional<FileIdentity>& opened = std::nullopt);
+    static std::optional<std::string>
+    ofAccountingFile(const std::string& path,
+                     const std::optional<FileIdentity>& opened = std::nullopt);
     /// Why a file is not a syslog file: none of its last lines has a time.
-    static std::string ofSyslogFile(const std::string& path);
+    static std::optional<std::string> ofSyslogFile(const std::string& path);
 };
 
 } // namespace zrm::host

@@ -1,7 +1,5 @@
 #include "host/diagnose/MonitoredLogFile.h"
 
-#include "base/ErrorText.h"
-
 #include <cerrno>
 
 #include <fcntl.h>
@@ -10,35 +8,34 @@
 
 namespace zrm::host {
 
-namespace {
-
-std::string problemOf(int descriptor, const std::optional<FileIdentity>& monitored) {
-    struct stat status;
+Result<MonitoredLogFile> MonitoredLogFile::open(const std::string& path,
+                                                const std::optional<FileIdentity>& monitored) {
+    constexpr const char* what = "the log cannot be read";
+    const auto refusedSince = [](const char* why) {
+        return refused(std::string(what) + ": " + why);
+    };
+    const int descriptor =
+        ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (monitored ? 0 : O_NOFOLLOW));
     if (descriptor == -1 && errno == ELOOP && !monitored) {
-        return "the log cannot be read: its name is a symbolic link, and no monitor has its file "
-               "open";
+        return refusedSince("its name is a symbolic link, and no monitor has its file open");
     }
-    if (descriptor == -1 || ::fstat(descriptor, &status) != 0) {
-        const ErrorText error(errno);
-        return std::string("the log cannot be read: ") + error.text();
+    if (descriptor == -1) {
+        return refused(because(what, errno));
+    }
+    MonitoredLogFile file(descriptor);
+    struct stat status;
+    if (::fstat(descriptor, &status) != 0) {
+        return refused(because(what, errno));
     }
     if (!S_ISREG(status.st_mode)) {
-        return "the log cannot be read: it is not a regular file";
+        return refusedSince("it is not a regular file");
     }
     if (monitored && *monitored != FileIdentity{status.st_dev, status.st_ino}) {
-        return "the log cannot be read: another file now has its name, and its monitor reads the "
-               "one that had the name before";
+        return refusedSince("another file now has its name, and its monitor reads the one that had "
+                            "the name before");
     }
-    return "";
+    return file;
 }
-
-} // namespace
-
-MonitoredLogFile::MonitoredLogFile(const std::string& path,
-                                   const std::optional<FileIdentity>& monitored)
-    : m_descriptor(
-          ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | (monitored ? 0 : O_NOFOLLOW))),
-      m_problem(problemOf(m_descriptor, monitored)) {}
 
 MonitoredLogFile::~MonitoredLogFile() {
     if (m_descriptor != -1) {

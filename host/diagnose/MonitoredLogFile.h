@@ -1,10 +1,12 @@
 #ifndef ZRM_HOST_MONITORED_LOG_FILE_H
 #define ZRM_HOST_MONITORED_LOG_FILE_H
 
+#include "host/base/Result.h"
 #include "monitor/FileIdentity.h"
 
 #include <optional>
 #include <string>
+#include <utility>
 
 namespace zrm::host {
 
@@ -15,19 +17,21 @@ class MonitoredLogFile {
 public:
     /// `path` is the log's local name, `monitored` the file that its monitor has open. Never waits,
     /// whatever is in the file's place.
-    MonitoredLogFile(const std::string& path, const std::optional<FileIdentity>& monitored);
+    static Result<MonitoredLogFile> open(const std::string& path,
+                                         const std::optional<FileIdentity>& monitored);
     ~MonitoredLogFile();
+    MonitoredLogFile(MonitoredLogFile&& other) noexcept
+        : m_descriptor(std::exchange(other.m_descriptor, -1)) {}
     MonitoredLogFile(const MonitoredLogFile&) = delete;
     MonitoredLogFile& operator=(const MonitoredLogFile&) = delete;
 
-    /// Why the file cannot be read, as a clause; empty when it is open.
-    const std::string& problem() const noexcept { return m_problem; }
     /// The open file, at its beginning; this object closes it.
     int descriptor() const noexcept { return m_descriptor; }
 
 private:
-    int m_descriptor;
-    std::string m_problem;
+    explicit MonitoredLogFile(int descriptor) : m_descriptor(descriptor) {}
+
+    int m_descriptor; ///< -1 when it was moved from
 };
 
 } // namespace zrm::host

@@ -101,14 +101,14 @@ UnmonitoredLogs::Result UnmonitoredLogs::read() {
     if (path == nullptr || *path == '\0') {
         return {};
     }
-    Result result{path, ConfigCheck::problemOfFile(path), {}};
-    if (!result.problem.empty()) { // opening a pipe would block
+    Result result{path, {}, {}};
+    if (const auto file = ConfigCheck::checkFile(path); !file) { // opening a pipe would block
+        result.problem = file.error();
         return result;
     }
     std::ifstream stream(path, std::ios::binary);
     if (!stream) {
-        const ErrorText error(errno);
-        result.problem = error.text();
+        result.problem = Problem{ErrorText(errno).text()};
         return result;
     }
     const std::string text{std::istreambuf_iterator<char>(stream), {}};
@@ -148,7 +148,10 @@ void UnmonitoredLogs::Result::writeConfiguration(JsonWriter& json) const {
     if (file.empty()) {
         json.null();
     } else {
-        json.beginObject().member("file", file).textOrNull("problem", problem).endObject();
+        json.beginObject()
+            .member("file", file)
+            .textOrNull("problem", problem ? problem->text() : "")
+            .endObject();
     }
 }
 

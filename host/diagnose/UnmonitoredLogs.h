@@ -1,7 +1,10 @@
 #ifndef ZRM_HOST_UNMONITORED_LOGS_H
 #define ZRM_HOST_UNMONITORED_LOGS_H
 
+#include "host/base/Result.h"
+
 #include <cstddef>
+#include <optional>
 #include <set>
 #include <string>
 #include <string_view>
@@ -28,9 +31,9 @@ public:
     };
 
     struct Result {
-        std::string file;      ///< the log configuration; empty when none is set
-        std::string problem;   ///< why it cannot be read; empty when it can
-        std::vector<Log> logs; ///< in the order of its lines, each once
+        std::string file;               ///< the log configuration; empty when none is set
+        std::optional<Problem> problem; ///< why it cannot be read
+        std::vector<Log> logs;          ///< in the order of its lines, each once
 
         /// Writes the file and its problem as the API answers them; null where nothing is set.
         void writeConfiguration(JsonWriter& json) const;

@@ -1,5 +1,6 @@
 #include "host/events/EventQueue.h"
 
+#include "host/base/TimeText.h"
 #include "host/framework/EventRoomControl.h"
 
 #include <algorithm>
@@ -51,7 +52,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
         return false;
     }
     Event event;
-    event.raised = now();
+    event.raised = WallClock::now();
     event.situation = situation;
     add(std::move(event), row);
     announce(lock);
@@ -65,7 +66,7 @@ std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
     if (m_closed || events.empty()) {
         return 0;
     }
-    const std::int64_t raised = now();
+    const std::int64_t raised = WallClock::now();
     for (std::size_t index = 0; index < events.size(); ++index) {
         Event event;
         event.raised = raised;

@@ -142,7 +142,8 @@ void History::finish(HistoryWriter::Clock::time_point limit) {
     }
 }
 
-template <class Work> auto History::reading(Work&& work) {
+template <class Work>
+auto History::reading(Work&& work) -> Result<std::invoke_result_t<Work, Database&>> {
     try {
         ReaderPool::Lease lease = m_readers.take();
         return work(*lease);
@@ -150,14 +151,16 @@ template <class Work> auto History::reading(Work&& work) {
         if (error.isCorruption()) {
             m_readers.noteCorruption();
         }
-        throw HistoryError(error.what());
+        return refused(error.what());
     }
 }
 
-EventPage History::query(const EventFilter& filter) {
-    EventPage page =
+Result<EventPage> History::query(const EventFilter& filter) {
+    Result<EventPage> page =
         reading([&](Database& database) { return HistoryQuery(database, filter).run(); });
-    noteDamage(page.damaged);
+    if (page) {
+        noteDamage(page->damaged);
+    }
     return page;
 }
 
@@ -174,7 +177,7 @@ void History::noteDamage(const std::vector<std::uint64_t>& events) {
     }
 }
 
-std::optional<StoredEvent> History::event(std::uint64_t id) {
+Result<std::optional<StoredEvent>> History::event(std::uint64_t id) {
     if (id == 0 || id > newest()) {
         return std::nullopt;
     }
@@ -182,12 +185,15 @@ std::optional<StoredEvent> History::event(std::uint64_t id) {
     filter.after = id - 1;
     filter.before = id + 1;
     filter.limit = 1;
-    EventPage page = query(filter);
-    if (!page.damaged.empty()) {
-        throw HistoryError("event " + std::to_string(id) +
-                           " is damaged: its content is not what was written");
+    Result<EventPage> page = query(filter);
+    if (!page) {
+        return tl::unexpected(page.error());
     }
-    return page.events.empty() ? std::nullopt : std::optional(std::move(page.events.front()));
+    if (!page->damaged.empty()) {
+        return refused("event " + std::to_string(id) +
+                       " is damaged: its content is not what was written");
+    }
+    return page->events.empty() ? std::nullopt : std::optional(std::move(page->events.front()));
 }
 
 std::uint64_t History::waitBeyond(std::uint64_t id, Clock::time_point limit,
@@ -207,7 +213,7 @@ HistoryState History::state() {
     return state;
 }
 
-Rates History::rates(std::int64_t from, std::int64_t to, std::int64_t step) {
+Result<Rates> History::rates(std::int64_t from, std::int64_t to, std::int64_t step) {
     return reading([&](Database& database) { return RateTable::read(database, from, to, step); });
 }
 

@@ -17,6 +17,7 @@
 #include <mutex>
 #include <set>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 namespace zrm::host {
@@ -53,18 +54,19 @@ public:
     /// Takes the entries that a minute brought. Any thread.
     void addEntries(MinuteCounts counts) { m_writer.addEntries(std::move(counts)); }
 
-    EventPage query(const EventFilter& filter) override;
-    std::optional<StoredEvent> event(std::uint64_t id) override;
+    Result<EventPage> query(const EventFilter& filter) override;
+    Result<std::optional<StoredEvent>> event(std::uint64_t id) override;
     std::uint64_t newest() const override { return m_recent.newest(); }
     std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
                              const std::stop_token& stop) override;
     HistoryState state() override;
-    Rates rates(std::int64_t from, std::int64_t to, std::int64_t step) override;
+    Result<Rates> rates(std::int64_t from, std::int64_t to, std::int64_t step) override;
 
 private:
     History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
             std::unique_ptr<HistoryFile> file);
-    template <class Work> auto reading(Work&& work);
+    template <class Work>
+    auto reading(Work&& work) -> Result<std::invoke_result_t<Work, Database&>>;
     void noteDamage(const std::vector<std::uint64_t>& events);
 
     const std::unique_ptr<HistoryDirectory> m_directory;

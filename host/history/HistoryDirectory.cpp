@@ -3,6 +3,7 @@
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
+#include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <array>
@@ -71,7 +72,7 @@ bool lockWhole(int fd) {
 constexpr int digitsOfId = 20;
 
 std::string timeNow() {
-    const std::time_t now = std::time(nullptr);
+    const std::time_t now = WallClock::seconds();
     std::tm utc{};
     gmtime_r(&now, &utc);
     std::array<char, 32> text{};

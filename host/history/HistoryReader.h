@@ -1,11 +1,12 @@
 #ifndef ZRM_HOST_HISTORY_READER_H
 #define ZRM_HOST_HISTORY_READER_H
 
+#include "host/base/Result.h"
+
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
-#include <stdexcept>
 #include <stop_token>
 #include <string>
 #include <vector>
@@ -74,13 +75,7 @@ struct Rates {
     std::vector<LogRates> logs; ///< by path; each has as many counts as the window has steps
 };
 
-/// The history could not be read; what() says why.
-class HistoryError : public std::runtime_error {
-    using std::runtime_error::runtime_error;
-};
-
-/// The history of events as seen by readers. Any thread. Functions that read the file may throw
-/// HistoryError. Readers never delay the writing of events.
+/// The history of events as seen by readers. Any thread. Readers never delay the writing of events.
 class HistoryReader {
 public:
     using Clock = std::chrono::steady_clock;
@@ -88,11 +83,11 @@ public:
     virtual ~HistoryReader() = default;
 
     /// The events that pass the filter, in its order. A text search may stop early.
-    virtual EventPage query(const EventFilter& filter) = 0;
+    virtual Result<EventPage> query(const EventFilter& filter) = 0;
 
-    /// The event with this id; none when the history does not (or no longer) contain it. Throws for
-    /// a damaged event.
-    virtual std::optional<StoredEvent> event(std::uint64_t id) = 0;
+    /// The event with this id; none when the history does not (or no longer) contain it. A
+    /// damaged one is refused.
+    virtual Result<std::optional<StoredEvent>> event(std::uint64_t id) = 0;
 
     /// The id of the newest committed event; 0 when there was none. Very cheap.
     virtual std::uint64_t newest() const = 0;
@@ -108,7 +103,7 @@ public:
     /// Entries and events per log from the step in which `from` lies to the one before `to`
     /// (milliseconds since 1970, UTC). `step` is a multiple of 60,000 milliseconds. Counts older
     /// than a day are dropped.
-    virtual Rates rates(std::int64_t from, std::int64_t to, std::int64_t step) = 0;
+    virtual Result<Rates> rates(std::int64_t from, std::int64_t to, std::int64_t step) = 0;
 };
 
 } // namespace zrm::host

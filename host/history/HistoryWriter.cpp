@@ -3,10 +3,10 @@
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
 #include "host/base/TimeText.h"
+#include "host/history/Schema.h"
 
 #include <algorithm>
 #include <cinttypes>
-#include <stdexcept>
 #include <utility>
 
 namespace zrm::host {
@@ -122,8 +122,9 @@ bool HistoryWriter::store(EntryBatch& batch) {
 /// failed.
 template <class Work> bool HistoryWriter::attempt(Work&& work) {
     try {
-        if (m_file == nullptr) {
-            openFile();
+        if (const Result<void> opened = openFile(); !opened) {
+            failed(opened.error().text());
+            return false;
         }
         work();
         succeeded();
@@ -134,23 +135,28 @@ template <class Work> bool HistoryWriter::attempt(Work&& work) {
         } else {
             failed(error.what());
         }
-    } catch (const std::runtime_error& error) { // of openFile
+    } catch (const SchemaTooNew& error) {
         failed(error.what());
     }
     return false;
 }
 
-void HistoryWriter::openFile() {
-    if (const Result<void> restored = m_directory.restore(); !restored) {
-        throw std::runtime_error(restored.error().text());
+/// Opens the file unless it is open.
+Result<void> HistoryWriter::openFile() {
+    if (m_file != nullptr) {
+        return {};
+    }
+    if (Result<void> restored = m_directory.restore(); !restored) {
+        return restored;
     }
     m_file = std::make_unique<HistoryFile>(m_directory.file());
     if (m_file->newest() > m_recent.newest()) {
         replaceFile("it is another history, put into its place while the agent ran");
-        throw std::runtime_error("the history's file was replaced");
+        return refused("the history's file was replaced");
     }
     m_file->continueAfter(m_recent.newest());
     reserveIds(std::max(m_reserved, m_recent.newest()));
+    return {};
 }
 
 /// Keeps that ids up to this one may have been given.

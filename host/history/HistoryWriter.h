@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_HISTORY_WRITER_H
 #define ZRM_HOST_HISTORY_WRITER_H
 
+#include "host/base/Result.h"
 #include "host/base/RetryPause.h"
 #include "host/config/HostConfig.h"
 #include "host/events/EventJson.h"
@@ -72,7 +73,7 @@ private:
     void succeeded();
     void failed(const std::string& why);
     bool pause();
-    void openFile();
+    Result<void> openFile();
     void replaceFile(const std::string& why);
     void leaveRemovedFiles();
     void reserveIds(std::uint64_t last);

@@ -1,5 +1,7 @@
 #include "host/http/ResponseText.h"
 
+#include "host/base/TimeText.h"
+
 #include <cstddef>
 #include <cstdio>
 #include <ctime>
@@ -34,7 +36,7 @@ std::string HttpDate::text(std::int64_t seconds) {
 }
 
 std::string HttpDate::now() {
-    return text(std::time(nullptr));
+    return text(WallClock::seconds());
 }
 
 namespace {

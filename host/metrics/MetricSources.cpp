@@ -1,6 +1,7 @@
 #include "host/metrics/MetricSources.h"
 
 #include "host/api/EventStream.h"
+#include "host/base/TimeText.h"
 #include "host/delivery/Delivery.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/HttpServer.h"
@@ -67,9 +68,7 @@ void collectDescriptors(MetricText& text) {
 
 } // namespace
 
-ProcessMetrics::ProcessMetrics()
-    : m_started(std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch())
-                    .count()) {}
+ProcessMetrics::ProcessMetrics() : m_started(static_cast<double>(WallClock::now()) / 1000) {}
 
 void ProcessMetrics::collect(MetricText& text) {
     text.gauge("zrm_build_info", "The version of the agent, as a label.");

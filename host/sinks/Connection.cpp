@@ -1,7 +1,7 @@
 #include "host/sinks/Connection.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/Result.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -47,8 +47,7 @@ void Connection::close() {
 }
 
 bool Connection::fail(const char* call, int number) {
-    const ErrorText error(number);
-    m_error = std::string(call) + " failed: " + error.text() + " (" + m_receiver.text() + ')';
+    m_error = because(std::string(call) + " failed", number) + " (" + m_receiver.text() + ')';
     return false;
 }
 

@@ -131,10 +131,9 @@ bool HttpPost::Implementation::addHeadersOfFile(HttpClientRequest& request) {
     if (m_headersFile.empty()) {
         return true;
     }
-    std::string problem;
-    const std::optional<Headers> headers = HeadersFile::read(m_headersFile, problem);
+    const Result<Headers> headers = HeadersFile::read(m_headersFile);
     if (!headers) {
-        m_error = problem;
+        m_error = headers.error().text();
         return false;
     }
     for (const auto& [name, value] : *headers) {

@@ -1,7 +1,7 @@
 #include "host/sinks/JsonlSink.h"
 
-#include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "host/base/Result.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -46,8 +46,7 @@ JsonlSink::~JsonlSink() {
 }
 
 void JsonlSink::fail(const char* call, int number) {
-    const ErrorText error(number);
-    m_error = std::string(call) + " failed: " + error.text();
+    m_error = because(std::string(call) + " failed", number);
 }
 
 bool JsonlSink::open() {

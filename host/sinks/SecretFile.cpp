@@ -1,12 +1,13 @@
 #include "host/sinks/SecretFile.h"
 
-#include "base/ErrorText.h"
+#include "host/base/WholeFile.h"
 #include "host/config/SinkTypes.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <sstream>
 #include <string_view>
+#include <utility>
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -18,46 +19,48 @@ namespace {
 
 constexpr std::size_t longestSecret = 4096; ///< bytes
 
-/// The contents of an open file, or enough of it to show that it is too long.
-std::optional<std::string> content(int fd) {
-    std::string text;
-    char buffer[1024];
-    ssize_t count = 0;
-    while (text.size() <= longestSecret && (count = ::read(fd, buffer, sizeof buffer)) > 0) {
-        text.append(buffer, static_cast<std::size_t>(count));
-    }
-    return count == -1 ? std::nullopt : std::optional(std::move(text));
-}
-
-} // namespace
-
-std::optional<std::string> SecretFile::read(const std::string& path, std::string& problem) {
-    // Non-blocking: a named pipe can be distinguished from a file only after opening it.
-    const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+Result<std::string> contentOf(int fd, const std::string& path) {
+    const auto notASecret = [&] {
+        return refused(path + " is not a file with a secret of 1 to " +
+                       std::to_string(longestSecret) + " bytes");
+    };
     struct stat status {};
-    std::optional<std::string> text;
-    if (fd == -1 || fstat(fd, &status) != 0 || (S_ISREG(status.st_mode) && !(text = content(fd)))) {
-        problem = "cannot read " + path + ": " + ErrorText(errno).text();
+    if (fstat(fd, &status) != 0) {
+        return refused(because("cannot read " + path, errno));
     }
-    if (fd == -1) {
-        return std::nullopt;
+    if (!S_ISREG(status.st_mode)) {
+        return notASecret();
     }
-    ::close(fd);
-    if (problem.empty() && text && (status.st_mode & S_IRWXO) != 0) {
-        problem = path +
-                  " is accessible to every user: remove the permissions of other users (chmod o= " +
-                  path + ')';
-        return std::nullopt;
+    Result<std::string, int> text = WholeFile::read(fd, longestSecret + 1);
+    if (!text && text.error() != EFBIG) {
+        return refused(because("cannot read " + path, text.error()));
+    }
+    if ((status.st_mode & S_IRWXO) != 0) {
+        return refused(path +
+                       " is accessible to every user: remove the permissions of other users "
+                       "(chmod o= " +
+                       path + ')');
     }
     if (text && text->ends_with('\n')) {
         text->pop_back();
     }
-    if (problem.empty() && (!text || text->empty() || text->size() > longestSecret)) {
-        problem = path + " is not a file with a secret of 1 to " + std::to_string(longestSecret) +
-                  " bytes";
-        return std::nullopt;
+    if (!text || text->empty() || text->size() > longestSecret) {
+        return notASecret();
     }
-    return text;
+    return std::move(*text);
+}
+
+} // namespace
+
+Result<std::string> SecretFile::read(const std::string& path) {
+    // Non-blocking: a named pipe can be distinguished from a file only after opening it.
+    const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+    if (fd == -1) {
+        return refused(because("cannot read " + path, errno));
+    }
+    Result<std::string> content = contentOf(fd, path);
+    ::close(fd);
+    return content;
 }
 
 namespace {
@@ -77,11 +80,10 @@ bool isControl(char c) {
 
 } // namespace
 
-std::optional<HeadersFile::Headers> HeadersFile::read(const std::string& path,
-                                                      std::string& problem) {
-    const std::optional<std::string> text = SecretFile::read(path, problem);
+Result<HeadersFile::Headers> HeadersFile::read(const std::string& path) {
+    const Result<std::string> text = SecretFile::read(path);
     if (!text) {
-        return std::nullopt;
+        return tl::unexpected(text.error());
     }
     Headers headers;
     std::istringstream lines(*text);
@@ -96,9 +98,8 @@ std::optional<HeadersFile::Headers> HeadersFile::read(const std::string& path,
         if (colon == content.size() ||
             !isAddableHeader(std::string_view(content).substr(0, colon)) ||
             std::any_of(value.begin(), value.end(), isControl)) {
-            problem = path + ':' + std::to_string(number) +
-                      ": not a header that can be added; write 'Name: value', a line each";
-            return std::nullopt;
+            return refused(path + ':' + std::to_string(number) + ": not a header that can be added",
+                           "write 'Name: value', a line each");
         }
         headers[content.substr(0, colon)] = value;
     }

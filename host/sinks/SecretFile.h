@@ -1,8 +1,9 @@
 #ifndef ZRM_HOST_SECRET_FILE_H
 #define ZRM_HOST_SECRET_FILE_H
 
+#include "host/base/Result.h"
+
 #include <map>
-#include <optional>
 #include <string>
 
 namespace zrm::host {
@@ -10,10 +11,9 @@ namespace zrm::host {
 /// Secrets kept in separate files. Stateless.
 class SecretFile {
 public:
-    /// The contents of a file without the final line end. None when it is not a regular file, is
-    /// empty or longer than 4 kB, is accessible to every user, or cannot be read; `problem` then
-    /// says why.
-    static std::optional<std::string> read(const std::string& path, std::string& problem);
+    /// The contents of a file without the final line end. Refused when it is not a regular file, is
+    /// empty or longer than 4 kB, is accessible to every user, or cannot be read.
+    static Result<std::string> read(const std::string& path);
 };
 
 /// Headers kept in a separate file because they are secrets: "Name: value", one per line.
@@ -22,9 +22,9 @@ class HeadersFile {
 public:
     using Headers = std::map<std::string, std::string>;
 
-    /// The headers of a file, for which the rules of SecretFile apply. None when it cannot be used;
-    /// `problem` then says why, without quoting the file.
-    static std::optional<Headers> read(const std::string& path, std::string& problem);
+    /// The headers of a file, for which the rules of SecretFile apply. A problem does not quote the
+    /// file.
+    static Result<Headers> read(const std::string& path);
 };
 
 } // namespace zrm::host

@@ -64,10 +64,9 @@ bool WebhookSink::sign(const std::string& body, HttpPost::Headers& headers) {
     std::string secret = m_secret;
     if (!m_secretFile.empty()) {
         // Reread each time, so that a secret can be changed while the agent runs.
-        std::string problem;
-        std::optional<std::string> text = SecretFile::read(m_secretFile, problem);
+        Result<std::string> text = SecretFile::read(m_secretFile);
         if (!text) {
-            m_error = std::move(problem);
+            m_error = text.error().text();
             return false;
         }
         secret = std::move(*text);

@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "framework/ctreq.h"
+#include "host/base/TimeText.h"
 #include "host/framework/Status.h"
 
 #include <chrono>
@@ -19,12 +20,6 @@ RequestDetail detailOf(const SituationConfig& config) {
     detail.sampleType = SAMPLE_SITUATION;
     detail.conditions = config.conditions;
     return detail;
-}
-
-std::int64_t now() {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(
-               std::chrono::system_clock::now().time_since_epoch())
-        .count();
 }
 
 } // namespace
@@ -51,7 +46,7 @@ void Situation::silence() {
 unsigned Situation::receive(const ctreq& request, const char* rows, unsigned count) {
     TraceScope trace(anchor);
     // Before waiting for room: the events count as raised, whenever they are delivered.
-    m_counts->countRaised(count, now());
+    m_counts->countRaised(count, WallClock::now());
     for (unsigned index = 0; index < count; ++index) {
         if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {
             return trace.result(static_cast<unsigned>(STATUS_END));

@@ -1,6 +1,7 @@
 #include "host/situations/SituationStore.h"
 
 #include "base/TraceScope.h"
+#include "host/base/TimeText.h"
 #include "host/base/WholeFile.h"
 #include "host/config/SituationValidator.h"
 #include "host/situations/SituationJson.h"
@@ -154,7 +155,7 @@ Content SituationStore::load() {
 
 std::string SituationStore::moveAside(const std::string& reason) {
     TraceScope trace(anchor);
-    const std::time_t now = std::time(nullptr);
+    const std::time_t now = WallClock::seconds();
     std::tm local{};
     localtime_r(&now, &local);
     char stamp[32];

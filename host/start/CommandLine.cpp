@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <optional>
 #include <string_view>
 #include <vector>
 
@@ -41,8 +42,8 @@ void addOptions(CLI::App& app, Values& values) {
         ->take_last();
 }
 
-/// The name of an option that has no value, or an empty one; empty when all have theirs.
-std::string withoutValue(const CLI::App& app) {
+/// The name of an option that has no value, or an empty one.
+std::optional<std::string> withoutValue(const CLI::App& app) {
     for (const CLI::Option* const option : app.get_options()) {
         const bool takesFile = option->get_expected_max() > 0;
         const std::vector<std::string>& values = option->results();
@@ -50,7 +51,7 @@ std::string withoutValue(const CLI::App& app) {
             return option->get_name();
         }
     }
-    return "";
+    return std::nullopt;
 }
 
 /// The name of a flag that was given a value.
@@ -69,25 +70,28 @@ std::string flagWithValue(const CLI::App& app, std::span<const char* const> argu
 
 } // namespace
 
-CommandLine::CommandLine(std::span<const char* const> arguments) {
+Result<CommandLine> CommandLine::parse(std::span<const char* const> arguments) {
     CLI::App app;
     Values values;
     addOptions(app, values);
     try {
         app.parse(std::vector<std::string>(arguments.rbegin(), arguments.rend())); // last one first
-        const std::string name = withoutValue(app);
-        m_error = name.empty() ? "" : name + " needs a file name";
     } catch (const CLI::ExtrasError&) {
-        m_error = "unknown argument '" + app.remaining().front() + "'";
+        return refused("unknown argument '" + app.remaining().front() + "'");
     } catch (const CLI::ArgumentMismatch&) {
-        m_error = flagWithValue(app, arguments) + " takes no value";
+        return refused(flagWithValue(app, arguments) + " takes no value");
     } catch (const CLI::ParseError& error) {
-        m_error = error.what();
+        return refused(error.what());
     }
-    m_config = values.config;
-    m_traceFile = values.traceFile;
-    m_version = values.version;
-    m_help = values.help;
+    if (const std::optional<std::string> name = withoutValue(app)) {
+        return refused(*name + " needs a file name");
+    }
+    CommandLine commandLine;
+    commandLine.m_config = values.config;
+    commandLine.m_traceFile = values.traceFile;
+    commandLine.m_version = values.version;
+    commandLine.m_help = values.help;
+    return commandLine;
 }
 
 std::string CommandLine::help() {

@@ -28,18 +28,18 @@ constexpr int unusableStatus = 2;
 
 CommandLine readCommandLine(int argc, char** argv) {
     const auto count = static_cast<std::size_t>(argc > 0 ? argc - 1 : 0);
-    CommandLine commandLine({argv + (argc > 0 ? 1 : 0), count});
-    if (!commandLine.error().empty()) {
-        say("%s; zrmagent --help lists the arguments", commandLine.error().c_str());
+    Result<CommandLine> commandLine = CommandLine::parse({argv + (argc > 0 ? 1 : 0), count});
+    if (!commandLine) {
+        say("%s; zrmagent --help lists the arguments", commandLine.error().text().c_str());
         std::exit(unusableStatus);
     }
-    if (commandLine.wantsHelp() || commandLine.wantsVersion()) {
-        std::fputs(commandLine.wantsHelp() ? CommandLine::help().c_str()
-                                           : "zrmagent " ZRM_VERSION "\n",
+    if (commandLine->wantsHelp() || commandLine->wantsVersion()) {
+        std::fputs(commandLine->wantsHelp() ? CommandLine::help().c_str()
+                                            : "zrmagent " ZRM_VERSION "\n",
                    stdout);
         std::exit(0);
     }
-    return commandLine;
+    return std::move(*commandLine);
 }
 
 HostConfig readConfig(const std::string& path) {
@@ -53,8 +53,8 @@ HostConfig readConfig(const std::string& path) {
         }
         std::exit(unusableStatus);
     }
-    if (const std::string warning = warningOfSecrets(*config, path); !warning.empty()) {
-        say("%s", warning.c_str());
+    if (const auto warning = warningOfSecrets(*config, path)) {
+        say("%s", warning->c_str());
     }
     return std::move(*config);
 }

@@ -25,6 +25,14 @@ struct CurrentStamp {
 
 constinit thread_local CurrentStamp currentStamp;
 
+/// Makes the current stamp that of the second. Apart from its caller, whose path per line then
+/// needs no room for the text of a time.
+[[gnu::noinline]] void makeCurrentStamp(std::time_t second, unsigned generation) {
+    BrevanTime::generateTimestamp(second, currentStamp.text);
+    currentStamp.second = second;
+    currentStamp.generation = BrevanTime::isFlowTraced() ? 0 : generation;
+}
+
 } // namespace
 
 void BrevanTime::generateTimestamp(long time, char* out) {
@@ -47,9 +55,7 @@ void BrevanTime::generateCurrentTimestamp(char* out) {
     const std::time_t now = std::time(nullptr);
     const unsigned generation = TRC1_Generation.load(std::memory_order_relaxed);
     if (now != currentStamp.second || generation != currentStamp.generation) {
-        generateTimestamp(now, currentStamp.text);
-        currentStamp.second = now;
-        currentStamp.generation = isFlowTraced() ? 0 : generation;
+        makeCurrentStamp(now, generation);
     }
     std::memcpy(out, currentStamp.text, stampLength);
 }

@@ -16,13 +16,16 @@ struct LocaleCache {
     std::atomic<LOC2_Locale*> locale{nullptr};
     std::atomic<bool> isKnown{false};
 
-    LOC2_Locale* get() {
-        if (!isKnown.load(std::memory_order_acquire)) {
-            std::uint32_t status = 0;
-            locale.store(LOC2_GetLocale(0, 0, 0, &status), std::memory_order_relaxed);
-            isKnown.store(true, std::memory_order_release);
+    [[gnu::always_inline]] LOC2_Locale* get() {
+        if (!isKnown.load(std::memory_order_acquire)) [[unlikely]] {
+            lookUp();
         }
         return locale.load(std::memory_order_relaxed);
+    }
+    [[gnu::noinline]] void lookUp() {
+        std::uint32_t status = 0;
+        locale.store(LOC2_GetLocale(0, 0, 0, &status), std::memory_order_relaxed);
+        isKnown.store(true, std::memory_order_release);
     }
 };
 
@@ -30,9 +33,10 @@ struct LocaleCache {
 LocaleCache toUTF8Locale;
 LocaleCache fromUTF8Locale;
 
-/// The locale's code page, or 0 if there is none, which is traced whatever the trace level.
-inline std::uint32_t localCodePage(const TraceScope& trace, LocaleCache& cache,
-                                   const char* noCodePage) {
+/// The locale's code page, or 0 if there is none, which is traced whatever the trace level. Called
+/// twice per line of a log.
+[[gnu::always_inline]] inline std::uint32_t
+localCodePage(const TraceScope& trace, LocaleCache& cache, const char* noCodePage) {
     LOC2_Locale* const locale = cache.get();
     if (locale == nullptr) {
         trace.always()("Locale returned null; no locale found.");

@@ -60,11 +60,14 @@ public:
 
 private:
     /// Copies the whole field but counts only its first `length` characters.
-    template <std::size_t size> void append(const char (&field)[size], std::size_t length) {
+    template <std::size_t size>
+    [[gnu::always_inline]] void append(const char (&field)[size], std::size_t length) {
         std::memcpy(m_text + m_length, field, size);
         m_length += length;
     }
-    template <std::size_t size> void append(const char (&words)[size]) { append(words, size - 1); }
+    template <std::size_t size> [[gnu::always_inline]] void append(const char (&words)[size]) {
+        append(words, size - 1);
+    }
     void append(std::int16_t number) {
         char* const place = m_text + m_length;
         m_length += static_cast<std::size_t>(std::to_chars(place, place + 6, number).ptr - place);

@@ -24,6 +24,19 @@ TRC1_Anchor anchor{"LogFileTail.cpp"};
 /// How long to count the lines that the end of the process leaves unread.
 constexpr std::chrono::milliseconds countingTime{500};
 
+/// Waits until rows may be offered. Returns false if the log has to end or the process is ending
+/// before that. Apart from LogFile::offer, which runs for each line and rarely waits.
+[[gnu::noinline]] bool waitForRoom(const LogFile& log, Pulse& pulse) {
+    const auto isRunning = [&log] { return log.monitorStatus() == MONITOR_RUNNING; };
+    pulse.work("waits for room in the queue of events");
+    EventRoom::wait(isRunning);
+    if (!EventRoom::mayOffer() && (!isRunning() || EventRoom::now() == EventRoom::State::CLOSED)) {
+        return false;
+    }
+    pulse.work("reads the log");
+    return true;
+}
+
 } // namespace
 
 /// Counts without an atomic read-modify-write: only the log's thread writes the counter.
@@ -179,22 +192,17 @@ bool LogFile::readGrowth() {
 }
 
 bool LogFile::offer(zrm_rmlogent_data_t* row) {
-    for (;;) {
-        if (EventRoom::mayOffer() &&
-            (m_rowReceiver == nullptr || m_rowReceiver(row, 1) != tableNoRoom)) [[likely]] {
-            return true;
-        }
-        m_pulse.work("waits for room in the queue of events");
-        EventRoom::wait([this] { return monitorStatus() == MONITOR_RUNNING; });
-        if (!EventRoom::mayOffer() &&
-            (monitorStatus() != MONITOR_RUNNING || EventRoom::now() == EventRoom::State::CLOSED)) {
-            if (!isFollowed()) {
-                notePassedOver(1); // a followed log continues here when it is monitored again
+    while (!EventRoom::mayOffer() ||
+           (m_rowReceiver != nullptr && m_rowReceiver(row, 1) == tableNoRoom))
+        [[unlikely]] {
+            if (!waitForRoom(*this, m_pulse)) {
+                if (!isFollowed()) {
+                    notePassedOver(1); // a followed log continues here when it is monitored again
+                }
+                return false;
             }
-            return false;
         }
-        m_pulse.work("reads the log");
-    }
+    return true;
 }
 
 bool LogFile::isReadingOver() noexcept {

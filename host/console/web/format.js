@@ -3,6 +3,16 @@
 const whole = new Intl.NumberFormat("en", { maximumFractionDigits: 0 });
 const short = new Intl.NumberFormat("en", { notation: "compact", maximumFractionDigits: 1 });
 
+// What of an entry is shown first, in this order.
+export const ENTRY_COLUMNS = [
+  ["ENTRYTIME", "Time"],
+  ["ENTRYSYS", "System"],
+  ["ENTRYSRC", "Source"],
+  ["ENTRYTYPE", "Type"],
+  ["ENTRYCLASS", "Class"],
+  ["ENTRYDESC", "Description"],
+];
+
 export const number = (value) =>
   value === null || value === undefined ? "–" : whole.format(value);
 export const compact = (value) =>

@@ -3,7 +3,7 @@
 import { get, post } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { button, empty, failure, field, fill, h, select, visible } from "../dom.js";
-import { offsetOf, plural, reachText, stamp } from "../format.js";
+import { ENTRY_COLUMNS, offsetOf, plural, reachText, stamp } from "../format.js";
 
 const HOUR = 3600 * 1000;
 const PRESETS = [
@@ -14,14 +14,6 @@ const PRESETS = [
   ["night", "Last night, 22 to 6"],
   ["week", "Last 7 days"],
   ["own", "Other times"],
-];
-const MAIN = [
-  ["ENTRYTIME", "Time"],
-  ["ENTRYSYS", "System"],
-  ["ENTRYSRC", "Source"],
-  ["ENTRYTYPE", "Type"],
-  ["ENTRYCLASS", "Class"],
-  ["ENTRYDESC", "Description"],
 ];
 
 function window(preset, now = new Date()) {
@@ -310,7 +302,7 @@ class ReportPage {
     const { rows } = this.answer;
     const shown = isWhole
       ? Object.keys(rows[0]).map((name) => [name, name])
-      : MAIN.filter(([name]) => rows.some((row) => row[name] !== ""));
+      : ENTRY_COLUMNS.filter(([name]) => rows.some((row) => row[name] !== ""));
     const sorted = this.sort ? [...rows].sort((a, b) => this.#compare(a, b)) : rows;
     const head = shown.map(([name, label]) => {
       const isSorted = this.sort?.name === name;

@@ -2,7 +2,7 @@
 
 import { get, post } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, select, table } from "../dom.js";
-import { plural, stamp } from "../format.js";
+import { ENTRY_COLUMNS, plural, stamp } from "../format.js";
 
 const START =
   'A , "%d-%d-%d %d:%d:%d %s %64[^:]: %256[^\\n]" , ' +
@@ -10,14 +10,6 @@ const START =
 const SAMPLE =
   "2026-11-20 07:03:09 ERROR payment: Card declined for order 4711\n" +
   "2026-11-20 07:03:10 INFO web: Request served";
-const COLUMNS = [
-  ["ENTRYTIME", "Time"],
-  ["ENTRYSYS", "System"],
-  ["ENTRYSRC", "Source"],
-  ["ENTRYTYPE", "Type"],
-  ["ENTRYCLASS", "Class"],
-  ["ENTRYDESC", "Description"],
-];
 // The parts of the time share a colour; the other fields have one each.
 const COLOURS = { system: "f1", source: "f2", type: "f3", class: "f4", description: "f5" };
 const MOST_LINES = 200;
@@ -319,7 +311,7 @@ function columnsPanel(answer) {
     .slice(0, 20)
     .map((one) => one.row);
   if (rows.length === 0) return null;
-  const columns = COLUMNS.map(([, label]) => ({
+  const columns = ENTRY_COLUMNS.map(([, label]) => ({
     label,
     className: label === "Description" ? "wide break" : label === "Time" ? "fit whole" : "fit",
   }));
@@ -337,7 +329,7 @@ function columnsPanel(answer) {
       "Resulting columns",
       columns,
       rows.map((row) =>
-        COLUMNS.map(([name]) => (name === "ENTRYTIME" ? stamp(row[name]) : row[name] || "–")),
+        ENTRY_COLUMNS.map(([name]) => (name === "ENTRYTIME" ? stamp(row[name]) : row[name] || "–")),
       ),
       { className: "cards" },
     ),

@@ -4,6 +4,7 @@
 #include "host/analysis/StoredRow.h"
 #include "host/config/SituationValidator.h"
 #include "host/events/RowJson.h"
+#include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "tables/zrm_rmlogent_manager.h"
@@ -45,9 +46,9 @@ class ExplainerTest : public testing::Test {
 protected:
     std::vector<std::string> linesOf(TestLog& log) {
         std::vector<std::string> lines;
-        problem = LogTail(log).read([&](auto line, zrm_rmlogent_data_t* row) {
+        problem = reasonOf(LogTail(log).read([&](auto line, zrm_rmlogent_data_t* row) {
             lines.push_back(std::string(line.value_or("-")) + (row != nullptr ? "" : " (no row)"));
-        });
+        }));
         return lines;
     }
     static std::vector<long> counts(const std::vector<Explanation>& explanations) {
@@ -120,7 +121,7 @@ TEST_F(ExplainerTest, DoesNotWaitForAPipeInTheLogsPlace) {
     ASSERT_EQ(mkfifo(directory.file("app.log").c_str(), 0600), 0);
     EXPECT_THAT(linesOf(log), IsEmpty());
     EXPECT_EQ(problem, "the log cannot be read: it is not a regular file");
-    EXPECT_THAT(explainer().last(binary, 2), IsEmpty());
+    EXPECT_EQ(reasonOf(explainer().last(binary, 2)), problem);
     EXPECT_EQ(binary.reports, 0);
 }
 
@@ -129,11 +130,11 @@ TEST_F(ExplainerTest, EndsAlthoughTheLogKeepsGrowing) {
     std::ofstream more(directory.file("app.log"), std::ios::app);
     const std::string line = "1 " + std::string(2000, 'x') + "\n";
     std::size_t lines = 0;
-    EXPECT_EQ(LogTail(log).read([&](auto, auto*) {
-        ++lines;
-        // The reading is always behind.
-        more << line << line << std::flush;
-    }),
+    EXPECT_EQ(reasonOf(LogTail(log).read([&](auto, auto*) {
+                  ++lines;
+                  // The reading is always behind.
+                  more << line << line << std::flush;
+              })),
               "");
     EXPECT_GT(lines, LogTail::longest / line.size());
     EXPECT_LT(lines, 3 * LogTail::longest / line.size());
@@ -158,7 +159,7 @@ TEST_F(ExplainerTest, ReadsTheLastWholeLinesOfALargeLog) {
 TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
     write("0 hit\n1 miss\n2 hit\nnonsense\n3 hit\n");
     Explainer asked = explainer(">= 2");
-    const std::vector<Explanation> all = asked.last(log, 3);
+    const std::vector<Explanation> all = asked.last(log, 3).value();
     ASSERT_EQ(all.size(), 3u);
     EXPECT_EQ(all[0].line, "2 hit");
     EXPECT_EQ(all[0].decision, "Would be raised: 2 entries in 60 s, the threshold is >= 2.");
@@ -166,8 +167,7 @@ TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
     EXPECT_EQ(all[1].row, "");
     EXPECT_EQ(all[1].decision, "Would not be raised: the line yields no entry.");
     EXPECT_EQ(all[2].window->count, 3);
-    EXPECT_EQ(asked.problem(), "");
-    const std::vector<Explanation> two = explainer(">= 2").last(log, 5);
+    const std::vector<Explanation> two = explainer(">= 2").last(log, 5).value();
     EXPECT_EQ(two[0].decision, "Would not be raised: 1 entry in 60 s, the threshold is >= 2.");
     EXPECT_EQ(two[1].decision, "Would not be raised: ENTRYDESC 'miss' does not start with 'hit'.");
     EXPECT_FALSE(two[1].window->count);
@@ -175,11 +175,11 @@ TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
 
 TEST_F(ExplainerTest, ExplainsALineInTheLogOrAsTheNextOne) {
     write("0 hit\n10 hit\n20 hit\n30 hit\n");
-    EXPECT_THAT(counts(explainer(">= 9").line(log, "20 hit")), ElementsAre(3)) << "held";
-    EXPECT_THAT(counts(explainer(">= 9").line(log, "65 hit")), ElementsAre(4)) << "next";
-    EXPECT_THAT(counts(explainer(">= 9").line(log, "15 hit")), ElementsAre(3)) << "between";
-    EXPECT_THAT(counts(explainer(">= 9").line(log, "500 hit")), ElementsAre(1));
-    const std::vector<Explanation> nonsense = explainer().line(log, "nonsense");
+    EXPECT_THAT(counts(explainer(">= 9").line(log, "20 hit").value()), ElementsAre(3)) << "held";
+    EXPECT_THAT(counts(explainer(">= 9").line(log, "65 hit").value()), ElementsAre(4)) << "next";
+    EXPECT_THAT(counts(explainer(">= 9").line(log, "15 hit").value()), ElementsAre(3)) << "between";
+    EXPECT_THAT(counts(explainer(">= 9").line(log, "500 hit").value()), ElementsAre(1));
+    const std::vector<Explanation> nonsense = explainer().line(log, "nonsense").value();
     ASSERT_EQ(nonsense.size(), 1u);
     EXPECT_FALSE(nonsense[0].isRaised);
     EXPECT_NE(nonsense[0].reason, "");
@@ -187,7 +187,7 @@ TEST_F(ExplainerTest, ExplainsALineInTheLogOrAsTheNextOne) {
 
 TEST_F(ExplainerTest, ReportsThatTheSituationDoesNotRun) {
     write("0 hit\n1 miss\n");
-    const std::vector<Explanation> all = explainer(nullptr, true).last(log, 2);
+    const std::vector<Explanation> all = explainer(nullptr, true).last(log, 2).value();
     EXPECT_EQ(all[0].decision,
               "Would be raised if the situation were started: every condition holds.");
     EXPECT_EQ(all[1].decision, "Would not be raised: ENTRYDESC 'miss' does not start with 'hit'.");
@@ -231,7 +231,7 @@ TEST_F(ExplainerTest, ReadsTheEntriesOfOtherLogsThroughReports) {
     TestLog binary(directory.write("wtmp", ""), " ;N ;A");
     EXPECT_FALSE(LogTail(binary).hasLines());
     binary.entries = {{0, "hit"}, {5, "miss"}, {10, "hit"}};
-    const std::vector<Explanation> all = explainer(">= 1").last(binary, 2);
+    const std::vector<Explanation> all = explainer(">= 1").last(binary, 2).value();
     ASSERT_EQ(all.size(), 2u);
     EXPECT_FALSE(all[0].line);
     EXPECT_FALSE(all[0].matches);

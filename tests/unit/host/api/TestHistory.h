@@ -35,9 +35,11 @@ public:
         return m_filter;
     }
 
-    EventPage query(const EventFilter& filter) override {
+    Result<EventPage> query(const EventFilter& filter) override {
         const std::lock_guard guard(m_mutex);
-        check();
+        if (m_fails) {
+            return refused("disk I/O error");
+        }
         m_filter = filter;
         std::vector<StoredEvent> found;
         for (const StoredEvent& event : m_events) {
@@ -53,11 +55,13 @@ public:
             std::reverse(found.begin(), found.end());
         }
         found.resize(std::min(found.size(), filter.limit));
-        return {std::move(found), damaged, reached};
+        return EventPage{std::move(found), damaged, reached};
     }
-    std::optional<StoredEvent> event(std::uint64_t id) override {
+    Result<std::optional<StoredEvent>> event(std::uint64_t id) override {
         const std::lock_guard guard(m_mutex);
-        check();
+        if (m_fails) {
+            return refused("disk I/O error");
+        }
         for (const StoredEvent& event : m_events) {
             if (event.id == id) {
                 return event;
@@ -78,18 +82,19 @@ public:
     }
     HistoryState state() override {
         const std::lock_guard guard(m_mutex);
-        check();
         HistoryState state;
         state.oldest = m_events.empty() ? 0 : m_events.front().id;
         state.newest = m_events.empty() ? 0 : m_events.back().id;
         return state;
     }
-    Rates rates(std::int64_t from, std::int64_t to, std::int64_t step) override {
+    Result<Rates> rates(std::int64_t from, std::int64_t to, std::int64_t step) override {
         const std::lock_guard guard(m_mutex);
-        check();
+        if (m_fails) {
+            return refused("disk I/O error");
+        }
         ratesFrom = from;
         ratesTo = to;
-        return {from, step, {{"/a", {1, std::nullopt}, {0, std::nullopt}}, {"/b", {}, {}}}};
+        return Rates{from, step, {{"/a", {1, std::nullopt}, {0, std::nullopt}}, {"/b", {}, {}}}};
     }
 
     std::vector<std::uint64_t> damaged;   ///< what queries report as damaged
@@ -98,12 +103,6 @@ public:
     std::int64_t ratesTo = 0;
 
 private:
-    void check() const {
-        if (m_fails) {
-            throw HistoryError("disk I/O error");
-        }
-    }
-
     mutable std::mutex m_mutex;
     std::condition_variable_any m_changed;
     std::vector<StoredEvent> m_events;

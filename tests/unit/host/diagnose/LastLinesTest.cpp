@@ -20,9 +20,8 @@ using testing::Optional;
 class LastLinesTest : public testing::Test {
 protected:
     auto read(const std::string& text, std::size_t count) {
-        const MonitoredLogFile file(m_directory.write("log", text), std::nullopt);
-        EXPECT_EQ(file.problem(), "");
-        return LastLines::read(file.descriptor(), count);
+        const auto file = MonitoredLogFile::open(m_directory.write("log", text), std::nullopt);
+        return LastLines::read(file.value().descriptor(), count);
     }
     TemporaryDirectory m_directory;
 };

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <ctime>
 #include <filesystem>
+#include <optional>
 #include <string>
 
 #include <gmock/gmock.h>
@@ -44,10 +45,10 @@ protected:
         std::memcpy(bytes.data() + 32, &seconds, sizeof seconds);
         return bytes;
     }
-    std::string accounting(const std::string& content) const {
+    std::optional<std::string> accounting(const std::string& content) const {
         return LogWarnings::ofAccountingFile(m_directory.write("wtmp", content));
     }
-    std::string syslog(const std::string& content) const {
+    std::optional<std::string> syslog(const std::string& content) const {
         return LogWarnings::ofSyslogFile(m_directory.write("messages", content));
     }
 
@@ -80,13 +81,16 @@ TEST_F(LogWarningsTest, WarnsAboutASyslogFileWithoutTimes) {
 
 TEST_F(LogWarningsTest, WarnsAboutAFileWithoutAccountingRecords) {
     const std::time_t now = std::time(nullptr);
-    EXPECT_EQ(accounting(""), "");
-    EXPECT_EQ(accounting(record(now, "root") + record(now - 100, "")), "");
-    EXPECT_THAT(accounting(record(now, "root") + "x"), HasSubstr("its size, 41 bytes"));
-    EXPECT_THAT(accounting(record(now, "r\1ot")), HasSubstr("cannot be such records"));
-    EXPECT_THAT(accounting(record(now + 1000000, "root")), HasSubstr("cannot be such records"));
-    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.file("none")), "");
-    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.path()), "");
+    EXPECT_EQ(accounting(""), std::nullopt);
+    EXPECT_EQ(accounting(record(now, "root") + record(now - 100, "")), std::nullopt);
+    EXPECT_THAT(accounting(record(now, "root") + "x"),
+                testing::Optional(HasSubstr("its size, 41 bytes")));
+    EXPECT_THAT(accounting(record(now, "r\1ot")),
+                testing::Optional(HasSubstr("cannot be such records")));
+    EXPECT_THAT(accounting(record(now + 1000000, "root")),
+                testing::Optional(HasSubstr("cannot be such records")));
+    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.file("none")), std::nullopt);
+    EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.path()), std::nullopt);
     // Five records of Linux have the size of 48 of these.
     std::string linux;
     for (int i = 0; i < 5; ++i) {
@@ -98,17 +102,17 @@ TEST_F(LogWarningsTest, WarnsAboutAFileWithoutAccountingRecords) {
         std::memcpy(one.data() + 44, "root", 4);
         linux += one;
     }
-    EXPECT_THAT(accounting(linux), HasSubstr("cannot be such records"));
+    EXPECT_THAT(accounting(linux), testing::Optional(HasSubstr("cannot be such records")));
 }
 
 TEST_F(LogWarningsTest, WarnsAboutAFileWithoutSyslogTimes) {
     const std::string iso = "2026-11-20T07:03:09.412000+01:00 web1 cron[1]: text\n";
-    EXPECT_EQ(syslog(""), "");
-    EXPECT_EQ(syslog("\n\n"), "");
-    EXPECT_EQ(syslog("Oct  5 07:03:09 web1 cron: text\n"), "");
-    EXPECT_EQ(syslog(iso + "Oct  5 07:03:09 web1 cron: text\n" + iso), "") << "some have";
-    EXPECT_THAT(syslog(iso + iso), HasSubstr("RSYSLOG_TraditionalFileFormat"));
-    EXPECT_EQ(LogWarnings::ofSyslogFile(m_directory.file("none")), "");
+    EXPECT_EQ(syslog(""), std::nullopt);
+    EXPECT_EQ(syslog("\n\n"), std::nullopt);
+    EXPECT_EQ(syslog("Oct  5 07:03:09 web1 cron: text\n"), std::nullopt);
+    EXPECT_EQ(syslog(iso + "Oct  5 07:03:09 web1 cron: text\n" + iso), std::nullopt) << "some have";
+    EXPECT_THAT(syslog(iso + iso), testing::Optional(HasSubstr("RSYSLOG_TraditionalFileFormat")));
+    EXPECT_EQ(LogWarnings::ofSyslogFile(m_directory.file("none")), std::nullopt);
 }
 
 } // namespace

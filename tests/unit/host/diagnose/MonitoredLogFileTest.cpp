@@ -1,5 +1,6 @@
 #include "host/diagnose/MonitoredLogFile.h"
 
+#include "support/ReasonOf.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gtest/gtest.h>
@@ -24,7 +25,7 @@ protected:
     }
     /// Why the log cannot be read while its monitor has this file open.
     std::string problem(const std::optional<FileIdentity>& monitored) const {
-        return MonitoredLogFile(m_log, monitored).problem();
+        return reasonOf(MonitoredLogFile::open(m_log, monitored));
     }
 
     TemporaryDirectory m_directory;
@@ -33,10 +34,10 @@ protected:
 };
 
 TEST_F(MonitoredLogFileTest, OpensTheFileThatTheMonitorHas) {
-    const MonitoredLogFile file(m_log, identityOf(m_log));
-    EXPECT_EQ(file.problem(), "");
+    const Result<MonitoredLogFile> file = MonitoredLogFile::open(m_log, identityOf(m_log));
+    ASSERT_EQ(reasonOf(file), "");
     struct stat status {};
-    ASSERT_EQ(fstat(file.descriptor(), &status), 0);
+    ASSERT_EQ(fstat(file->descriptor(), &status), 0);
     EXPECT_EQ(status.st_size, 5);
 }
 

@@ -94,7 +94,7 @@ TEST_F(UnmonitoredLogsTest, AnUnreadableConfigurationIsReported) {
         JsonWriter::text([&](JsonWriter& json) { result.logs[0].write(json); }),
         HasSubstr("{\"log\":\"" + m_gone + "\",\"line\":1,\"reason\":\"The file cannot be used"));
     ASSERT_EQ(setenv("ZRM_CONFIG_FILE", m_directory.path().c_str(), 1), 0);
-    EXPECT_EQ(UnmonitoredLogs::read().problem, "It is not a regular file");
+    EXPECT_EQ(UnmonitoredLogs::read().problem, Problem{"It is not a regular file"});
     unsetenv("ZRM_CONFIG_FILE");
     EXPECT_EQ(configurationOf(UnmonitoredLogs::read()), "null");
 }

@@ -81,7 +81,7 @@ TEST_F(EntryRecorderTest, RecordsTheEntriesOfEachMinuteAndLog) {
     logs.counts = {{"a.log", 6}, {"b.log", 4}};
     recorder->finish();
     history->storeRest();
-    const Rates rates = history->rates(start, start + 6 * minute, minute);
+    const Rates rates = history->rates(start, start + 6 * minute, minute).value();
     ASSERT_EQ(rates.logs.size(), 2u);
     EXPECT_EQ(rates.logs[0].log, "/var/log/a.log");
     EXPECT_THAT(rates.logs[0].entries, ElementsAre(Optional(12u), Optional(8u), Optional(5u),
@@ -95,7 +95,7 @@ TEST_F(EntryRecorderTest, WithoutATickThereIsNothingToRecord) {
     logs.counts = {{"a.log", 10}};
     recorder->finish();
     history->storeRest();
-    EXPECT_TRUE(history->rates(0, start, 24 * 60 * minute).logs.empty());
+    EXPECT_TRUE(history->rates(0, start, 24 * 60 * minute)->logs.empty());
 }
 
 } // namespace

@@ -78,7 +78,7 @@ protected:
     }
     std::vector<std::uint64_t> ids() {
         std::vector<std::uint64_t> ids;
-        const EventPage page = history->query({.limit = 100'000, .newestFirst = false});
+        const EventPage page = history->query({.limit = 100'000, .newestFirst = false}).value();
         for (const StoredEvent& event : page.events) {
             ids.push_back(event.id);
         }

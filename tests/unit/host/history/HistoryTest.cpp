@@ -28,15 +28,15 @@ TEST_F(HistoryTest, StoresAndReturnsEvents) {
     EXPECT_EQ(history->state().events, 0u);
     pushAndWait(300);
     EXPECT_EQ(ids(), idsFrom(1, 300));
-    const std::optional<StoredEvent> event = history->event(17);
+    const std::optional<StoredEvent> event = history->event(17).value();
     ASSERT_TRUE(event);
     EXPECT_EQ(event->situation, "watch");
     EXPECT_EQ(event->severity, "minor");
     EXPECT_EQ(event->log, "/var/log/app.log");
     EXPECT_THAT(event->json, testing::StartsWith(R"({"id":17,"situation":"watch",)"));
-    EXPECT_EQ(history->event(0), std::nullopt);
-    EXPECT_EQ(history->event(301), std::nullopt);
-    EXPECT_EQ(history->event(UINT64_MAX), std::nullopt);
+    EXPECT_EQ(history->event(0).value(), std::nullopt);
+    EXPECT_EQ(history->event(301).value(), std::nullopt);
+    EXPECT_EQ(history->event(UINT64_MAX).value(), std::nullopt);
     const HistoryState now = history->state();
     EXPECT_EQ(now.events, 300u);
     EXPECT_EQ(now.oldest, 1u);
@@ -143,15 +143,15 @@ TEST_F(HistoryTest, KeepsEventsForTheConfiguredTime) {
 TEST_F(HistoryTest, ReturnsTheRatesOfEventsAndEntries) {
     open();
     pushAndWait(20);
-    const std::int64_t raised = history->event(1)->raised;
+    const std::int64_t raised = history->event(1).value()->raised;
     const std::int64_t minute = raised / 60'000;
     history->addEntries({minute, {{"/var/log/app.log", 500}}});
     const auto entries = [&]() -> std::optional<std::uint64_t> {
-        const Rates rates = history->rates(raised, raised + 1, 60'000);
+        const Rates rates = history->rates(raised, raised + 1, 60'000).value();
         return rates.logs.size() == 1 ? rates.logs[0].entries.at(0) : std::nullopt;
     };
     EXPECT_TRUE(eventually([&] { return entries() == 500u; }));
-    EXPECT_EQ(history->rates(raised, raised + 1, 60'000).start, minute * 60'000);
+    EXPECT_EQ(history->rates(raised, raised + 1, 60'000)->start, minute * 60'000);
     history->addEntries({minute, {{"/var/log/app.log", 1}}});
     close();
     open();
@@ -178,7 +178,7 @@ TEST_F(HistoryTest, ManyReadersDoNotDisturbTheWriter) {
         readers.emplace_back([&] {
             while (!done) {
                 const auto newest = history->newest();
-                const auto events = history->query({.situations = {"watch"}, .limit = 50}).events;
+                const auto events = history->query({.situations = {"watch"}, .limit = 50})->events;
                 ++read;
                 if (newest > 0) {
                     EXPECT_GE(events.front().id, newest);
