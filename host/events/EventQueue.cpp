@@ -13,12 +13,6 @@ namespace {
 /// How long a woken reader waits for more events, unless many have already arrived.
 constexpr std::chrono::milliseconds gatherTime{5};
 
-std::int64_t now() {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(
-               std::chrono::system_clock::now().time_since_epoch())
-        .count();
-}
-
 } // namespace
 
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
