@@ -98,6 +98,12 @@ bool Generation::status(Status& status) const noexcept {
     return true;
 }
 
+void Generation::showPosition(std::int64_t offset) noexcept {
+    if (!m_isCompressed) {
+        lseek(m_descriptor, static_cast<off_t>(offset), SEEK_SET);
+    }
+}
+
 std::ptrdiff_t Generation::readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept {
     return m_isCompressed ? readCompressed(buffer, room, offset)
                           : pread(m_descriptor, buffer, room, static_cast<off_t>(offset));
