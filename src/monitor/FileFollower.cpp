@@ -140,6 +140,7 @@ void FileFollower::enter() {
     m_hasSeen = false;
     m_active = m_now.steady;
     m_readRetry = Retry{};
+    member.file->showPosition(member.from);
     m_ledger.noteGeneration(member.file->identity(), member.file->path());
     notePresent();
 }
@@ -166,6 +167,12 @@ void FileFollower::checkName() {
     }
 }
 
+/// A file that was read was modified then. An older one may have been written to after a younger
+/// one was made.
+void FileFollower::noteModified(std::int64_t time) noexcept {
+    m_modified = m_modified == INT64_MAX ? time : std::max(m_modified, time);
+}
+
 /// Looks whether the file that is read has changed. True if there may be something to read.
 bool FileFollower::checkFile() {
     Generation::Status now;
@@ -180,7 +187,7 @@ bool FileFollower::checkFile() {
             m_active = m_now.steady;
         }
         if (m_hasSeen && m_isInBlock) {
-            m_modified = m_seen.modified; // before what is found now was done
+            noteModified(m_seen.modified); // before what is found now was done
         }
         if (m_chain.front().hadName && m_block.readTo() == 0) {
             insertMissed();
@@ -218,7 +225,7 @@ void FileFollower::switchToNext() {
     if (m_block.readTo() > 0) {
         m_position = positionOf(finished.file->identity(), m_block.offset(), m_block.tail());
         m_hasPosition = true;
-        m_modified = hasStatus ? status.modified : INT64_MAX;
+        noteModified(hasStatus ? status.modified : m_seen.modified);
     }
     if (finished.isRecovery && m_block.offset() > finished.from) {
         m_ledger.noteRecovered(finished.file->path(), finished.from, m_block.offset());
@@ -325,6 +332,7 @@ void FileFollower::noteProgress() {
             behind += std::max<std::int64_t>(status.size - (isFirst ? m_block.offset() : 0), 0);
         }
     }
+    m_chain.front().file->showPosition(m_block.readTo());
     m_ledger.notePosition(m_block.offset(), behind);
 }
 

@@ -109,6 +109,7 @@ private:
     void checkName();
     bool checkFile();
     bool isFinished() const noexcept;
+    void noteModified(std::int64_t time) noexcept;
     void switchToNext();
     bool handleFailedRead();
     char* finish();
@@ -133,7 +134,7 @@ private:
     bool m_isAtEnd = false;      ///< the last read found the end of the file
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
     bool m_hasSeen = false;
-    std::int64_t m_modified = INT64_MAX; ///< when the file of the position was, as last seen
+    std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
     std::int64_t m_bytesRead = 0;
     Retry m_nameRetry;

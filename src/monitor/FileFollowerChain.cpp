@@ -25,8 +25,12 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
     }
     Generation::Status status;
     Generation& last = *m_chain.back().file;
-    const GenerationReference reference{last.identity(),
-                                        last.status(status) ? status.modified : INT64_MAX};
+    GenerationReference reference{last.identity(),
+                                  last.status(status) ? status.modified : INT64_MAX};
+    // What was read before it may have been written to later.
+    if (m_modified != INT64_MAX) {
+        reference.modified = std::max(reference.modified, m_modified);
+    }
     Found found = findYounger(reference, named.get());
     std::move(found.younger.begin(), found.younger.end(), std::back_inserter(m_chain));
     if (found.isAll) {

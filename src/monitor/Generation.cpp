@@ -98,6 +98,12 @@ bool Generation::status(Status& status) const noexcept {
     return true;
 }
 
+void Generation::showPosition(std::int64_t offset) noexcept {
+    if (!m_isCompressed) {
+        lseek(m_descriptor, static_cast<off_t>(offset), SEEK_SET);
+    }
+}
+
 std::ptrdiff_t Generation::readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept {
     return m_isCompressed ? readCompressed(buffer, room, offset)
                           : pread(m_descriptor, buffer, room, static_cast<off_t>(offset));
@@ -196,18 +202,13 @@ bool Generation::isCopyOf(Generation& other) {
     std::vector<char> theirs(comparedBytes);
     const std::ptrdiff_t length = readWhole(mine.data(), comparedBytes, 0);
     const std::ptrdiff_t otherLength = other.readWhole(theirs.data(), comparedBytes, 0);
-    if (length <= 0 || otherLength <= 0) {
+    if (length <= 0 || length > otherLength ||
+        std::memcmp(mine.data(), theirs.data(), static_cast<std::size_t>(length)) != 0) {
         return false;
-    }
-    if (m_isCompressed || other.m_isCompressed) {
-        const auto both = static_cast<std::size_t>(std::min(length, otherLength));
-        return std::memcmp(mine.data(), theirs.data(), both) == 0;
     }
     Status now;
-    if (length > otherLength ||
-        std::memcmp(mine.data(), theirs.data(), static_cast<std::size_t>(length)) != 0 ||
-        !status(now)) {
-        return false;
+    if (m_isCompressed || other.m_isCompressed || !status(now)) {
+        return m_isCompressed || other.m_isCompressed;
     }
     const std::int64_t end =
         std::max<std::int64_t>(now.size - static_cast<std::int64_t>(comparedBytes), 0);

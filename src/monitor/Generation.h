@@ -65,6 +65,9 @@ public:
     /// The bytes before the offset. False and errno if they cannot be read.
     bool readTail(std::int64_t offset, Tail& tail) noexcept;
 
+    /// Moves the descriptor's own position, which nothing here reads, so that the system's tools
+    /// show how far a plain file was read.
+    void showPosition(std::int64_t offset) noexcept;
     /// False and errno if it cannot be found out.
     bool status(Status& status) const noexcept;
     const FileIdentity& identity() const noexcept { return m_identity; }

@@ -159,8 +159,9 @@ std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files
     const auto age = [isByName](const GenerationFile& file) {
         return isByName ? rank(file.name) : file.modified;
     };
-    const std::int64_t limit =
-        !isByName ? (self ? self->modified : reference.modified) : rank(self->name);
+    const std::int64_t limit = isByName ? rank(self->name)
+                               : self   ? std::max(self->modified, reference.modified)
+                                        : reference.modified;
     std::erase_if(generations, [&](const GenerationFile& file) { return age(file) <= limit; });
     std::sort(generations.begin(), generations.end(),
               [&](const GenerationFile& a, const GenerationFile& b) {

@@ -6,20 +6,24 @@ from conftest import Log, descriptions, syslog_line, wait_until
 from test_metrics import metrics
 
 
-def file(agent, name, content="Jan  1 00:00:00 web1 old: before the start\n"):
+def file(agent, name, content=""):
     log = Log(agent.directory / name)
     log.path.parent.mkdir(exist_ok=True)
     log.path.write_text(content)
     return log
 
 
+def follow(agent, path, **keys):
+    """Follows from the beginning, so that no test waits for the agent to have opened a file."""
+    agent.follow(path, start="beginning", **keys)
+
+
 def test_one_file_configures_everything(agent):
     log = file(agent, "app.log")
     agent.agent_keys["log_config"] = None
-    agent.follow(log)
+    follow(agent, log)
     agent.situation(log=log)
     agent.start()
-    agent.wait_open(log)
     log.append(syslog_line("followed"))
     assert descriptions(agent.wait_events(1)) == ["followed"]
     assert agent.stop() == 0
@@ -27,30 +31,25 @@ def test_one_file_configures_everything(agent):
 
 @pytest.mark.slow
 def test_a_file_that_appears_under_a_glob_is_followed(agent):
-    old = file(agent, "logs/old.log")
+    file(agent, "logs/old.log", syslog_line("old"))
     agent.follow(agent.directory / "logs" / "*.log", exclude="secret*")
     agent.situation()
     agent.start()
-    agent.wait_open(old)
-    file(agent, "logs/secret.log")
-    new = file(agent, "logs/new.log", "")
-    agent.wait_open(new)
-    new.append(syslog_line("in the new file"))
-    old.append(syslog_line("in the old file"))
-    assert sorted(descriptions(agent.wait_events(2))) == ["in the new file", "in the old file"]
-    assert not agent.is_open(agent.directory / "logs" / "secret.log")
+    file(agent, "logs/secret.log", syslog_line("secret"))
+    file(agent, "logs/new.log", syslog_line("in the new file"))
+    assert descriptions(agent.wait_events(1)) == ["in the new file"]
+    assert agent.stop() == 0
+    assert len(agent.events()) == 1
 
 
 @pytest.mark.slow
 def test_without_any_file_the_agent_waits_for_one(agent):
     agent.agent_keys["log_config"] = None
-    agent.follow(agent.directory / "later" / "*.log")
+    follow(agent, agent.directory / "later" / "*.log")
     agent.situation()
     agent.start()
     agent.wait_trace("no log to monitor yet")
-    log = file(agent, "later/app.log", "")
-    agent.wait_open(log)
-    log.append(syslog_line("at last"))
+    file(agent, "later/app.log", syslog_line("at last"))
     assert descriptions(agent.wait_events(1)) == ["at last"]
     assert agent.stop() == 0
 
@@ -60,14 +59,12 @@ def test_tables_come_and_go_while_the_agent_runs(agent):
     kept = agent.log("kept.log")
     first = file(agent, "first.log")
     second = file(agent, "second.log")
-    agent.follow(first)
+    follow(agent, first)
     agent.situation()
     agent.start()
-    agent.wait_open(first)
     agent.tables.clear()
-    agent.follow(second)
+    follow(agent, second)
     agent.reload()
-    agent.wait_open(second)
     agent.wait_trace(f"Deleting log object for file {first}.")
     second.append(syslog_line("second"))
     kept.append(syslog_line("kept"))
@@ -78,7 +75,7 @@ def test_tables_come_and_go_while_the_agent_runs(agent):
 
 def test_a_file_of_both_lists_belongs_to_the_log_configuration(agent):
     log = agent.log("app.log")
-    agent.follow(agent.directory / "*.log")
+    follow(agent, agent.directory / "*.log")
     agent.situation()
     agent.start()
     agent.wait_trace(f"The log configuration names {log}, too; its line applies.")
@@ -91,10 +88,9 @@ def test_a_file_of_both_lists_belongs_to_the_log_configuration(agent):
 def test_the_api_and_the_client_show_the_tables(agent):
     log = file(agent, "app.log")
     file(agent, "app.log.1")
-    agent.follow(agent.directory / "app.*")
+    follow(agent, agent.directory / "app.*")
     agent.listen = "127.0.0.1:0"
     agent.start()
-    agent.wait_open(log)
     answer = Api(agent).request("GET", "/api/v1/logs")[2]
     assert [one["log"] for one in answer["logs"]] == [str(log)]
     (table,) = answer["tables"]
@@ -107,7 +103,7 @@ def test_the_api_and_the_client_show_the_tables(agent):
 @pytest.mark.slow
 def test_a_log_that_is_named_twice_has_a_warning(agent):
     log = agent.log("app.log")
-    agent.follow(log)
+    follow(agent, log)
     agent.listen = "127.0.0.1:0"
     agent.start()
     agent.wait_trace("and a [[log]] table both name this file")
@@ -118,10 +114,9 @@ def test_a_log_that_is_named_twice_has_a_warning(agent):
 def test_every_form_of_syslog_lines_is_read(agent):
     log = file(agent, "syslog")
     agent.environment["TZ"] = "Europe/Berlin"
-    agent.follow(log, timezone="UTC")
+    follow(agent, log, timezone="UTC")
     agent.situation(log=log)
     agent.start()
-    agent.wait_open(log)
     log.append(
         "Nov 20 06:03:09 web1 sshd[412]: traditional\n"
         "2026-11-20T07:03:09.123456+01:00 web1 sshd[412]: iso\n"
@@ -136,7 +131,7 @@ def test_every_form_of_syslog_lines_is_read(agent):
 @pytest.mark.slow
 def test_a_rotation_is_followed_and_shown(agent):
     log = file(agent, "app.log")
-    agent.follow(log, rotate_wait="1s")
+    follow(agent, log, rotate_wait="1s")
     agent.situation(log=log)
     agent.listen = "127.0.0.1:0"
     agent.start()
@@ -144,8 +139,8 @@ def test_a_rotation_is_followed_and_shown(agent):
 
     def following(state="reading"):
         _, _, answer = api.request("GET", f"/api/v1/logs?log={log}")
-        follow = answer["logs"][0]["ledger"]["follow"] if answer.get("logs") else None
-        return follow if follow and follow["state"] == state else None
+        now = answer["logs"][0]["ledger"]["follow"] if answer.get("logs") else None
+        return now if now and now["state"] == state else None
 
     wait_until(following, "the log to be read")
     log.append(syslog_line("before"))
@@ -154,9 +149,9 @@ def test_a_rotation_is_followed_and_shown(agent):
     log.append(syslog_line("after"))
     assert descriptions(agent.wait_events(2)) == ["before", "after"]
     size = log.path.stat().st_size
-    follow = wait_until(lambda: (now := following()) and now["position"] == size and now, "the position")
-    assert (follow["generation"], follow["generations"], follow["behind"]) == (str(log), 2, 0)
-    assert (follow["lost_bytes"], follow["lost"], follow["recovered"]) == (0, [], [])
+    shown = wait_until(lambda: (now := following()) and now["position"] == size and now, "the position")
+    assert (shown["generation"], shown["generations"], shown["behind"]) == (str(log), 2, 0)
+    assert (shown["lost_bytes"], shown["lost"], shown["recovered"]) == (0, [], [])
     text = metrics(api)
     assert f'zrm_log_generations_total{{log="{log}"}} 2' in text
     assert f'zrm_log_position_bytes{{log="{log}"}} {size}' in text
