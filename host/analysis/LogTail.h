@@ -28,25 +28,25 @@ struct Reach {
     void write(JsonWriter& json) const;
 };
 
-/// Reads what a log holds last, and lines that it might hold, as its monitor would: in the same
-/// pieces and by the log's own operation that makes rows. The monitor goes on undisturbed: rows
-/// are made as reports make them, beside it, and its counters count nothing of this.
+/// Reads the end of a log, and lines that it might contain, as its monitor would: in the same
+/// pieces and with the log's own operation that makes rows. The monitor is not affected: rows are
+/// made in the way of reports, and its counters do not count them.
 class LogTail {
 public:
     static constexpr std::size_t longest = 4 * 1024 * 1024; ///< bytes of a text log
     static constexpr std::size_t mostEntries = 10000;       ///< of another log
-    static constexpr std::size_t longestLine = 16 * 1024;   ///< bytes of a line that is given
+    static constexpr std::size_t longestLine = 16 * 1024;   ///< bytes of a line passed to read
 
-    /// One entry, oldest first. `line` is none where the log has no lines, `row` null where the
-    /// line gives none; both may be changed and last until the function returns.
+    /// One entry, oldest first. `line` is none if the log has no lines, `row` null if the line
+    /// yields none; both may be changed and are valid until the function returns.
     using Entry =
         std::function<void(std::optional<std::string_view> line, zrm_rmlogent_data_t* row)>;
 
     /// The log outlives the object.
     explicit LogTail(LogFile& log) : m_log(log) {}
 
-    /// Whether the log is a file of lines; otherwise its entries come from its reports, and no
-    /// line can be given.
+    /// Whether the log is a file of lines; otherwise its entries come from its reports, and no line
+    /// can be passed.
     bool hasLines() const noexcept;
 
     /// Reads the log's end.

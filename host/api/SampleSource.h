@@ -11,7 +11,7 @@
 
 namespace zrm::host {
 
-/// The one entry through which a sample of a table is asked.
+/// The only way in which resources take samples of tables.
 class SampleSource {
 public:
     /// The rows of one sample.

@@ -13,7 +13,7 @@ struct Problem {
     std::string cure = {};  ///< how to fix it; empty where `what` leaves nothing to add
     std::string field = {}; ///< the part of the input that is wrong, as in filters[0].op, if any
 
-    /// "WHAT; CURE", as people read it.
+    /// "WHAT; CURE", for people.
     std::string text() const;
 
     bool operator==(const Problem&) const = default;

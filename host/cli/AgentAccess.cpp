@@ -48,12 +48,13 @@ public:
 private:
     HostConfig load() const {
         if (!isThere()) {
-            throw CliError(CLI_USAGE, m_path + " does not exist: name the agent's configuration "
-                                               "with --config, or its address with --url");
+            throw CliError(CliStatus::USAGE, m_path +
+                                                 " does not exist: name the agent's configuration "
+                                                 "with --config, or its address with --url");
         }
         if (access(m_path.c_str(), R_OK) != 0) {
-            throw CliError(CLI_FORBIDDEN, "no permission to read " + m_path +
-                                              ": use sudo, or join the file's group");
+            throw CliError(CliStatus::FORBIDDEN, "no permission to read " + m_path +
+                                                     ": use sudo, or join the file's group");
         }
         ConfigFile::Result config = ConfigFile::loadAccess(m_path);
         if (!config) {
@@ -61,7 +62,7 @@ private:
             for (const std::string& problem : config.error()) {
                 text += (text.empty() ? "" : "\n") + problem;
             }
-            throw CliError(CLI_USAGE, text);
+            throw CliError(CliStatus::USAGE, text);
         }
         return std::move(*config);
     }
@@ -75,13 +76,13 @@ std::string urlOf(AgentConfig& config) {
     const std::optional<ListenAddress>& listen = config.get().http.listen;
     if (!listen) {
         throw CliError(
-            CLI_USAGE,
+            CliStatus::USAGE,
             config.path() +
                 " turns HTTP off: give [http] a listen address, or give the address with --url");
     }
     if (listen->port == 0) {
         throw CliError(
-            CLI_USAGE,
+            CliStatus::USAGE,
             config.path() +
                 " leaves the port open: give the address that the agent reported with --url");
     }
@@ -110,13 +111,13 @@ std::string checkedUrl(const std::string& written, const std::string& source) {
     const std::optional<ListenAddress> host =
         ListenAddress::parse(hasPort ? address : address + ":80");
     if (!host) {
-        throw CliError(CLI_USAGE, source + ": '" + written +
-                                      "' is not an address; write it as "
-                                      "http://127.0.0.1:7186");
+        throw CliError(CliStatus::USAGE, source + ": '" + written +
+                                             "' is not an address; write it as "
+                                             "http://127.0.0.1:7186");
     }
     if (!host->isLoopback()) {
-        throw CliError(CLI_USAGE, source + ": the token would reach " + host->host +
-                                      " unencrypted; use https, or an SSH tunnel");
+        throw CliError(CliStatus::USAGE, source + ": the token would reach " + host->host +
+                                             " unencrypted; use https, or an SSH tunnel");
     }
     return url;
 }
@@ -127,16 +128,16 @@ std::string readToken(const std::string& path) {
     if (stream == nullptr) {
         const int number = errno;
         if (number == EACCES) {
-            throw CliError(CLI_FORBIDDEN, "no permission to read the token " + path +
-                                              ": use sudo, or give the token in ZRM_TOKEN");
+            throw CliError(CliStatus::FORBIDDEN, "no permission to read the token " + path +
+                                                     ": use sudo, or give the token in ZRM_TOKEN");
         }
-        throw CliError(CLI_FORBIDDEN, because("cannot read the token " + path, number) +
-                                          "; the agent creates it when it starts with HTTP");
+        throw CliError(CliStatus::FORBIDDEN, because("cannot read the token " + path, number) +
+                                                 "; the agent creates it when it starts with HTTP");
     }
     char text[4096];
     std::string token = trimmed({text, std::fread(text, 1, sizeof text, stream.get())});
     if (token.empty() || token.find_first_of("\r\n") != std::string::npos) {
-        throw CliError(CLI_FORBIDDEN,
+        throw CliError(CliStatus::FORBIDDEN,
                        path + " does not contain a token: one line of visible characters");
     }
     return token;

@@ -46,9 +46,9 @@ std::string withQuery(const std::string& path, const AgentClient::Query& query) 
 HttpUrl serverOf(const AgentAccess& access) {
     const std::optional<HttpUrl> url = HttpUrl::parse(access.url);
     if (!url) {
-        throw CliError(CLI_USAGE, "'" + access.url +
-                                      "' is not the address of an agent; write it "
-                                      "as https://HOST:PORT");
+        throw CliError(CliStatus::USAGE, "'" + access.url +
+                                             "' is not the address of an agent; write it "
+                                             "as https://HOST:PORT");
     }
     return *url;
 }
@@ -59,7 +59,8 @@ std::string authoritiesOf(const AgentAccess& access) {
     for (const std::string& file : access.authorities) {
         const std::string text = InputFile(file).text();
         if (text.find("CERTIFICATE-----") == std::string::npos) {
-            throw CliError(CLI_USAGE, file + " does not contain a certificate in PEM format");
+            throw CliError(CliStatus::USAGE,
+                           file + " does not contain a certificate in PEM format");
         }
         all += text + '\n';
     }
@@ -156,31 +157,32 @@ CliError AgentClient::Implementation::unreachable(const HttpClientAnswer& answer
     switch (answer.outcome) {
     case Outcome::unreachable:
     case Outcome::unknownName:
-        return {CLI_UNREACHABLE, "cannot reach " + agent +
-                                     ": is zrmagent running? (systemctl status zrmagent; "
-                                     "another address: --url or --config)"};
+        return {CliStatus::UNREACHABLE, "cannot reach " + agent +
+                                            ": is zrmagent running? (systemctl status zrmagent; "
+                                            "another address: --url or --config)"};
     case Outcome::untrusted:
     case Outcome::noTls:
     case Outcome::noAuthorities:
         return {
-            CLI_UNREACHABLE,
+            CliStatus::UNREACHABLE,
             agent +
                 " has no certificate that this machine trusts for this address: name the file with "
                 "its authority's certificate, or with the certificate itself, with --ca-file"};
     case Outcome::notHttp:
         return foreign("its answer is not HTTP");
     case Outcome::failed:
-        return {CLI_UNREACHABLE, "the connection to " + agent + " failed: " + answer.detail};
+        return {CliStatus::UNREACHABLE, "the connection to " + agent + " failed: " + answer.detail};
     default:
-        return {CLI_UNREACHABLE, agent + " did not answer: it has stopped, or it is too busy"};
+        return {CliStatus::UNREACHABLE,
+                agent + " did not answer: it has stopped, or it is too busy"};
     }
 }
 
 CliError AgentClient::Implementation::refused(int status, const std::string& body) const {
     if (status == 401) {
-        return {CLI_FORBIDDEN, "the agent at " + m_access.url + " does not accept the token from " +
-                                   m_access.tokenSource +
-                                   ": give the right one with --token-file or --config"};
+        return {CliStatus::FORBIDDEN,
+                "the agent at " + m_access.url + " does not accept the token from " +
+                    m_access.tokenSource + ": give the right one with --token-file or --config"};
     }
     const Json problem = JsonText::parse(body);
     std::string text = problem.is_discarded() ? "" : JsonText::text(problem, "detail");
@@ -189,12 +191,13 @@ CliError AgentClient::Implementation::refused(int status, const std::string& bod
     }
     const std::string field = problem.is_discarded() ? "" : JsonText::text(problem, "field");
     constexpr int unavailable = 503;
-    return {status == unavailable ? CLI_UNREACHABLE : CLI_REFUSED,
+    return {status == unavailable ? CliStatus::UNREACHABLE : CliStatus::REFUSED,
             field.empty() ? text : field + ": " + text};
 }
 
 CliError AgentClient::Implementation::foreign(const std::string& why) const {
-    return {CLI_UNREACHABLE, "what answers at " + m_access.url + " is not a zrmagent: " + why};
+    return {CliStatus::UNREACHABLE,
+            "what answers at " + m_access.url + " is not a zrmagent: " + why};
 }
 
 AgentClient::AgentClient(AgentAccess access)
@@ -212,8 +215,9 @@ Json AgentClient::send(const std::string& method, const std::string& path, const
         try {
             text = body.dump();
         } catch (const Json::type_error&) {
-            throw CliError(CLI_USAGE, "the command line, or the file that it names, is not valid "
-                                      "UTF-8, which the agent's API requires");
+            throw CliError(CliStatus::USAGE,
+                           "the command line, or the file that it names, is not valid "
+                           "UTF-8, which the agent's API requires");
         }
     }
     const bool hasBody = method != "DELETE" || !text.empty();

@@ -26,14 +26,14 @@ bool BacktestCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int BacktestCommand::run(Context& context) {
+CliStatus BacktestCommand::run(Context& context) {
     JsonText::Json body = SituationOptions::subject(m_situation, m_file);
     body["from"] = Context::time("--from", m_from);
     body["to"] = Context::time("--to", m_to);
     const JsonText::Json answer = context.client().send("POST", "/api/v1/backtest", body);
     if (context.options().json) {
         context.printJson(answer);
-        return CLI_DONE;
+        return CliStatus::DONE;
     }
     std::string text = DisplayText::visible(JsonText::text(answer, "decision")) + '\n';
     for (const JsonText::Json& time : JsonText::member(answer, "raised_at")) {
@@ -44,7 +44,7 @@ int BacktestCommand::run(Context& context) {
     if (JsonText::text(answer, "truncated") == "true") {
         Context::note("start later or end earlier to read less");
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
 } // namespace zrm::host

@@ -106,16 +106,16 @@ bool CheckCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int CheckCommand::run(Context& context) {
+CliStatus CheckCommand::run(Context& context) {
     if (m_config.empty() == m_host.empty()) {
-        throw CliError(CLI_USAGE, "check: name either a log configuration or --host FILE");
+        throw CliError(CliStatus::USAGE, "check: name either a log configuration or --host FILE");
     }
     return m_config.empty() ? checkHost(context) : checkLogs(context);
 }
 
-int CheckCommand::checkLogs(Context& context) const {
+CliStatus CheckCommand::checkLogs(Context& context) const {
     const ConfigCheck::Result result = ConfigCheck::check(InputFile(m_config).text());
-    const CliStatus status = result.refused == 0 ? CLI_DONE : CLI_REFUSED;
+    const CliStatus status = result.refused == 0 ? CliStatus::DONE : CliStatus::REFUSED;
     if (context.options().json) {
         context.printJson(Json::parse(ConfigCheck::json(result)));
         return status;
@@ -135,7 +135,7 @@ int CheckCommand::checkLogs(Context& context) const {
     return status;
 }
 
-int CheckCommand::checkHost(Context& context) const {
+CliStatus CheckCommand::checkHost(Context& context) const {
     const std::string content = InputFile(m_host).text();
     const ConfigFile::Result result = ConfigFile::parse(content, m_host);
     const std::vector<std::string> problems = result ? std::vector<std::string>() : result.error();
@@ -160,7 +160,7 @@ int CheckCommand::checkHost(Context& context) const {
             Context::note(problem);
         }
     }
-    return problems.empty() ? CLI_DONE : CLI_REFUSED;
+    return problems.empty() ? CliStatus::DONE : CliStatus::REFUSED;
 }
 
 } // namespace zrm::host

@@ -7,12 +7,12 @@
 namespace zrm::host {
 
 /// The exit statuses of zrmctl.
-enum CliStatus {
-    CLI_DONE = 0,
-    CLI_REFUSED = 1, ///< refused by the agent or by a check, nothing found, or a problem reported
-    CLI_USAGE = 2,   ///< the command line or the configuration is invalid
-    CLI_UNREACHABLE = 3, ///< the agent does not answer
-    CLI_FORBIDDEN = 4,   ///< the token cannot be read, or the agent does not accept it
+enum class CliStatus {
+    DONE = 0,
+    REFUSED = 1,     ///< refused by the agent or by a check, nothing found, or a problem reported
+    USAGE = 2,       ///< the command line or the configuration is invalid
+    UNREACHABLE = 3, ///< the agent does not answer
+    FORBIDDEN = 4,   ///< the token cannot be read, or the agent does not accept it
 };
 
 /// Why a command failed, as a message for the operator, and its exit status.

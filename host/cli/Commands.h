@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_COMMANDS_H
 #define ZRM_HOST_COMMANDS_H
 
+#include "host/cli/CliError.h"
 #include "host/cli/SituationOptions.h"
 
 #include <cstddef>
@@ -25,8 +26,8 @@ public:
     /// Whether the parsed command line names this command.
     virtual bool isChosen() const = 0;
 
-    /// Runs the command. Returns a CliStatus, or throws CliError.
-    virtual int run(Context& context) = 0;
+    /// Runs the command. May throw CliError.
+    virtual CliStatus run(Context& context) = 0;
 };
 
 /// `zrmctl status`: the state of the agent itself.
@@ -35,7 +36,7 @@ public:
     explicit StatusCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;
@@ -48,12 +49,12 @@ public:
     explicit LogsCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
-    int list(Context& context);
-    int show(Context& context);
-    int outcome(bool isWrong) const;
+    CliStatus list(Context& context);
+    CliStatus show(Context& context);
+    CliStatus outcome(bool isWrong) const;
 
     CLI::App* m_command;
     std::string m_log;
@@ -66,12 +67,12 @@ public:
     explicit EventsCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     std::multimap<std::string, std::string> filters() const;
-    int list(Context& context);
-    int follow(Context& context);
+    CliStatus list(Context& context);
+    CliStatus follow(Context& context);
 
     CLI::App* m_command;
     bool m_follow = false;
@@ -92,7 +93,7 @@ public:
     explicit ReportCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;
@@ -110,11 +111,11 @@ public:
     explicit SituationsCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     using Json = SituationOptions::Json;
-    using Action = int (SituationsCommand::*)(Context&);
+    using Action = CliStatus (SituationsCommand::*)(Context&);
     struct Choice {
         CLI::App* command;
         Action action;
@@ -123,16 +124,16 @@ private:
     CLI::App* declare(const char* name, const char* help, Action action);
     CLI::App* declareNamed(const char* name, const char* help, Action action);
     std::string path(const char* below = "") const;
-    int done(Context& context, const Json& answer, const char* what) const;
+    CliStatus done(Context& context, const Json& answer, const char* what) const;
 
-    int list(Context& context);
-    int show(Context& context);
-    int add(Context& context);
-    int set(Context& context);
-    int remove(Context& context);
-    int start(Context& context);
-    int stop(Context& context);
-    int validate(Context& context);
+    CliStatus list(Context& context);
+    CliStatus show(Context& context);
+    CliStatus add(Context& context);
+    CliStatus set(Context& context);
+    CliStatus remove(Context& context);
+    CliStatus start(Context& context);
+    CliStatus stop(Context& context);
+    CliStatus validate(Context& context);
 
     CLI::App* m_command;
     std::vector<Choice> m_choices;
@@ -146,7 +147,7 @@ public:
     explicit ExplainCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     SituationOptions::Json request() const;
@@ -166,7 +167,7 @@ public:
     explicit BacktestCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;
@@ -182,7 +183,7 @@ public:
     explicit RefreshCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;
@@ -194,7 +195,7 @@ public:
     explicit TraceCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;
@@ -208,11 +209,11 @@ public:
     explicit CheckCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
-    int checkLogs(Context& context) const;
-    int checkHost(Context& context) const;
+    CliStatus checkLogs(Context& context) const;
+    CliStatus checkHost(Context& context) const;
 
     CLI::App* m_command;
     std::string m_config;
@@ -226,7 +227,7 @@ public:
     explicit TryCommand(CLI::App& program);
 
     bool isChosen() const override;
-    int run(Context& context) override;
+    CliStatus run(Context& context) override;
 
 private:
     CLI::App* m_command;

@@ -40,7 +40,7 @@ AgentClient& Context::client() {
 void Context::print(std::string_view text) const {
     if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() ||
         std::fflush(stdout) != 0) {
-        throw CliError(CLI_REFUSED, because("cannot write", errno));
+        throw CliError(CliStatus::REFUSED, because("cannot write", errno));
     }
 }
 
@@ -70,7 +70,7 @@ void Context::noteReach(const nlohmann::ordered_json& answer) {
 std::string Context::time(const std::string& option, const std::string& text) {
     const std::optional<std::string> time = TimeInput::toIso(text, WallClock::seconds());
     if (!time) {
-        throw CliError(CLI_USAGE,
+        throw CliError(CliStatus::USAGE,
                        option + ": '" + text + "' is not a time; write " + TimeInput::forms);
     }
     return *time;

@@ -20,8 +20,9 @@ SseParser::SseParser(Receiver receiver) : m_receiver(std::move(receiver)) {}
 
 void SseParser::take(std::string_view piece) {
     if (m_line.size() + m_data.size() + piece.size() > longestEvent) {
-        throw CliError(CLI_UNREACHABLE, "what answers is not a zrmagent: an event of its stream is "
-                                        "longer than 1 MB");
+        throw CliError(CliStatus::UNREACHABLE,
+                       "what answers is not a zrmagent: an event of its stream is "
+                       "longer than 1 MB");
     }
     for (std::size_t end = piece.find('\n'); end != std::string_view::npos;
          end = piece.find('\n')) {
@@ -110,7 +111,7 @@ bool EventFollower::connect(const Receiver& receiver) {
             parser.take(piece);
         });
     } catch (const CliError& error) {
-        if (error.status() != CLI_UNREACHABLE || !(m_isLost || m_signals.isStopped())) {
+        if (error.status() != CliStatus::UNREACHABLE || !(m_isLost || m_signals.isStopped())) {
             throw;
         }
     }

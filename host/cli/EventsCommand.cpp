@@ -184,7 +184,7 @@ std::multimap<std::string, std::string> EventsCommand::filters() const {
     return query;
 }
 
-int EventsCommand::list(Context& context) {
+CliStatus EventsCommand::list(Context& context) {
     std::multimap<std::string, std::string> query = filters();
     const auto add = [&](const char* name, const std::string& value) {
         if (!value.empty()) {
@@ -199,7 +199,7 @@ int EventsCommand::list(Context& context) {
     std::reverse(events.begin(), events.end()); // the newest stands where the eye is
     if (events.empty()) {
         Context::note("no such event");
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
     if (context.options().json) {
         for (const Json& event : events) {
@@ -208,12 +208,13 @@ int EventsCommand::list(Context& context) {
     } else {
         context.print(tableText(events, context.terminal()));
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
-int EventsCommand::follow(Context& context) {
+CliStatus EventsCommand::follow(Context& context) {
     if (!m_before.empty() || !m_to.empty()) {
-        throw CliError(CLI_USAGE, "--before and --to cannot be combined with -f, which has no end");
+        throw CliError(CliStatus::USAGE,
+                       "--before and --to cannot be combined with -f, which has no end");
     }
     StopSignals signals;
     AgentClient& client = context.client();
@@ -235,10 +236,10 @@ int EventsCommand::follow(Context& context) {
     }
     EventFollower follower(client, filters(), signals, &Context::note);
     follower.follow(after, show);
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
-int EventsCommand::run(Context& context) {
+CliStatus EventsCommand::run(Context& context) {
     return m_follow ? follow(context) : list(context);
 }
 

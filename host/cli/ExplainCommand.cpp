@@ -79,8 +79,9 @@ Json ExplainCommand::request() const {
     const bool isEvent = m_event > 0;
     const int ways = (isEvent ? 1 : 0) + (m_line.empty() ? 0 : 1) + (m_last > 0 ? 1 : 0);
     if (ways > 1 || (isEvent && !m_log.empty())) {
-        throw CliError(CLI_USAGE, "explain one thing: --event ID, or --line TEXT or --last COUNT "
-                                  "of a log");
+        throw CliError(CliStatus::USAGE,
+                       "explain one thing: --event ID, or --line TEXT or --last COUNT "
+                       "of a log");
     }
     if (isEvent) {
         body["event"] = m_event;
@@ -97,7 +98,7 @@ Json ExplainCommand::request() const {
     return body;
 }
 
-int ExplainCommand::run(Context& context) {
+CliStatus ExplainCommand::run(Context& context) {
     const Json answer = context.client().send("POST", "/api/v1/explain", request());
     const Json& explanations = JsonText::member(answer, "explanations");
     if (context.options().json) {
@@ -115,9 +116,9 @@ int ExplainCommand::run(Context& context) {
     }
     if (explanations.empty()) {
         Context::note("there is no entry to explain");
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
 } // namespace zrm::host

@@ -14,7 +14,7 @@ int leaveOpen(std::FILE*) {
 }
 
 [[noreturn]] void fail(const std::string& path, int number) {
-    throw CliError(number == EACCES ? CLI_FORBIDDEN : CLI_USAGE,
+    throw CliError(number == EACCES ? CliStatus::FORBIDDEN : CliStatus::USAGE,
                    because("cannot read " + path, number));
 }
 
@@ -54,7 +54,8 @@ std::string InputFile::text() {
     int character = EOF;
     while ((character = std::getc(m_stream.get())) != EOF) {
         if (text.size() == mostText) {
-            throw CliError(CLI_USAGE, m_path + " is larger than 16 MiB, the most that is read");
+            throw CliError(CliStatus::USAGE,
+                           m_path + " is larger than 16 MiB, the most that is read");
         }
         text += static_cast<char>(character);
     }

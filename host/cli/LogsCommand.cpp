@@ -231,17 +231,17 @@ bool LogsCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int LogsCommand::run(Context& context) {
+CliStatus LogsCommand::run(Context& context) {
     return m_log.empty() ? list(context) : show(context);
 }
 
-int LogsCommand::outcome(bool isWrong) const {
-    return m_check && isWrong ? CLI_REFUSED : CLI_DONE;
+CliStatus LogsCommand::outcome(bool isWrong) const {
+    return m_check && isWrong ? CliStatus::REFUSED : CliStatus::DONE;
 }
 
-int LogsCommand::list(Context& context) {
+CliStatus LogsCommand::list(Context& context) {
     const Json answer = context.client().get("/api/v1/logs");
-    const int status = outcome(isSomethingWrong(answer));
+    const CliStatus status = outcome(isSomethingWrong(answer));
     if (context.options().json) {
         context.printJson(answer);
         return status;
@@ -267,26 +267,26 @@ int LogsCommand::list(Context& context) {
     if (table.empty()) {
         Context::note("the agent does not monitor any log");
         context.print(unmonitored);
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
     context.print(table.text(context.terminal()) + (unmonitored.empty() ? "" : "\n") + unmonitored);
     return status;
 }
 
-int LogsCommand::show(Context& context) {
+CliStatus LogsCommand::show(Context& context) {
     const Json answer = context.client().get("/api/v1/logs", {{"log", m_log}});
     const Json& logs = JsonText::member(answer, "logs");
     if (const Json& unmonitored = JsonText::member(answer, "unmonitored"); !unmonitored.empty()) {
-        throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log + " (line " +
-                                        JsonText::text(unmonitored.front(), "line") +
-                                        " of its configuration): " +
-                                        JsonText::text(unmonitored.front(), "reason"));
+        throw CliError(CliStatus::REFUSED, "the agent does not monitor " + m_log + " (line " +
+                                               JsonText::text(unmonitored.front(), "line") +
+                                               " of its configuration): " +
+                                               JsonText::text(unmonitored.front(), "reason"));
     }
     if (logs.empty()) {
-        throw CliError(CLI_REFUSED, "the agent does not monitor " + m_log +
-                                        "; 'zrmctl logs' lists what it monitors");
+        throw CliError(CliStatus::REFUSED, "the agent does not monitor " + m_log +
+                                               "; 'zrmctl logs' lists what it monitors");
     }
-    const int exitStatus = outcome(!isMonitored(logs.front()));
+    const CliStatus exitStatus = outcome(!isMonitored(logs.front()));
     if (context.options().json) {
         context.printJson(logs.front());
         return exitStatus;

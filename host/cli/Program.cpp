@@ -74,14 +74,15 @@ Program::Program()
 
 Program::~Program() = default;
 
-int Program::run(int argc, const char* const* argv) {
+CliStatus Program::run(int argc, const char* const* argv) {
     try {
         m_app->parse(argc, argv);
     } catch (const CLI::Success& wish) { // --help, --version
-        return m_app->exit(wish);
+        m_app->exit(wish);               // prints the text
+        return CliStatus::DONE;
     } catch (const CLI::ParseError& error) {
         Context::note(problemOf(*m_app, error) + hintOf(*m_app));
-        return CLI_USAGE;
+        return CliStatus::USAGE;
     }
     try {
         return runCommand();
@@ -91,21 +92,21 @@ int Program::run(int argc, const char* const* argv) {
     } catch (const nlohmann::json::exception&) {
         Context::note(
             "what answers is not a zrmagent of this version: its answer has a different form");
-        return CLI_UNREACHABLE;
+        return CliStatus::UNREACHABLE;
     } catch (const std::bad_alloc&) {
         Context::note("not enough memory for the answer");
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
 }
 
-int Program::runCommand() {
+CliStatus Program::runCommand() {
     Context context(m_options, Terminal::ofStandardOutput());
     for (const std::unique_ptr<Command>& command : m_commands) {
         if (command->isChosen()) {
             return command->run(context);
         }
     }
-    return CLI_USAGE;
+    return CliStatus::USAGE;
 }
 
 } // namespace zrm::host

@@ -18,10 +18,10 @@ public:
     Program& operator=(const Program&) = delete;
 
     /// Parses the command line and runs the command. Returns the exit status.
-    int run(int argc, const char* const* argv);
+    CliStatus run(int argc, const char* const* argv);
 
 private:
-    int runCommand();
+    CliStatus runCommand();
 
     CommonOptions m_options;
     std::unique_ptr<CLI::App> m_app;

@@ -16,12 +16,12 @@ bool RefreshCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int RefreshCommand::run(Context& context) {
+CliStatus RefreshCommand::run(Context& context) {
     const auto answer = context.client().send("POST", "/api/v1/refresh", nullptr);
     if (context.options().json) {
         context.printJson(answer);
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
 } // namespace zrm::host

@@ -40,7 +40,7 @@ std::vector<std::string> chosen(std::vector<std::string> asked, const Json& know
             for (const Json& name : known) {
                 names += (names.empty() ? "" : ", ") + JsonText::text(name);
             }
-            throw CliError(CLI_USAGE,
+            throw CliError(CliStatus::USAGE,
                            "--columns: '" + column + "' is not a column; the columns are " + names);
         }
     }
@@ -138,7 +138,7 @@ bool ReportCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int ReportCommand::run(Context& context) {
+CliStatus ReportCommand::run(Context& context) {
     const Json body = {{"log", m_log},
                        {"from", Context::time("--from", m_from)},
                        {"to", Context::time("--to", m_to)},
@@ -170,9 +170,9 @@ int ReportCommand::run(Context& context) {
     }
     if (rows.empty()) {
         Context::note("no entry of " + m_log + " between these times meets the conditions");
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
 } // namespace zrm::host

@@ -20,7 +20,7 @@ using Json = SituationOptions::Json;
 Json fileContent(const std::string& path) {
     Json value = JsonText::parse(InputFile(path).text());
     if (!value.is_object()) {
-        throw CliError(CLI_USAGE,
+        throw CliError(CliStatus::USAGE,
                        "--file: " + path +
                            " does not contain a JSON object; 'zrmctl situations show NAME "
                            "--json' prints one");
@@ -43,7 +43,7 @@ Json withoutState(Json definition) {
 
 Json SituationOptions::subject(const std::string& name, const std::string& file) {
     if (name.empty() == file.empty()) {
-        throw CliError(CLI_USAGE, "name either a situation or --file");
+        throw CliError(CliStatus::USAGE, "name either a situation or --file");
     }
     if (file.empty()) {
         return {{"situation", name}};

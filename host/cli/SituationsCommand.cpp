@@ -90,7 +90,7 @@ bool SituationsCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int SituationsCommand::run(Context& context) {
+CliStatus SituationsCommand::run(Context& context) {
     for (const Choice& choice : m_choices) {
         if (choice.command->parsed()) {
             return (this->*choice.action)(context);
@@ -103,20 +103,20 @@ std::string SituationsCommand::path(const char* below) const {
     return route + '/' + UrlText::encode(m_name) + below;
 }
 
-int SituationsCommand::done(Context& context, const Json& answer, const char* what) const {
+CliStatus SituationsCommand::done(Context& context, const Json& answer, const char* what) const {
     if (context.options().json) {
         context.printJson(answer);
     } else {
         context.print(DisplayText::visible(m_name) + ' ' + what + '\n');
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
-int SituationsCommand::list(Context& context) {
+CliStatus SituationsCommand::list(Context& context) {
     const Json answer = context.client().get(route);
     if (context.options().json) {
         context.printJson(answer);
-        return CLI_DONE;
+        return CliStatus::DONE;
     }
     Table table({{"SITUATION"},
                  {"STATE", Table::FIXED},
@@ -133,31 +133,31 @@ int SituationsCommand::list(Context& context) {
     }
     if (table.empty()) {
         Context::note("there are no situations");
-        return CLI_REFUSED;
+        return CliStatus::REFUSED;
     }
     context.print(table.text(context.terminal()));
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
-int SituationsCommand::show(Context& context) {
+CliStatus SituationsCommand::show(Context& context) {
     const Json situation = context.client().get(path());
     if (context.options().json) {
         context.printJson(situation);
     } else {
         context.print(factsOf(situation, context.terminal()));
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
-int SituationsCommand::add(Context& context) {
+CliStatus SituationsCommand::add(Context& context) {
     Json body = m_options.definition(Json::object());
     body["name"] = m_name;
     return done(context, context.client().send("POST", route, body), "added");
 }
 
-int SituationsCommand::set(Context& context) {
+CliStatus SituationsCommand::set(Context& context) {
     if (!m_options.areGiven()) {
-        throw CliError(CLI_USAGE,
+        throw CliError(CliStatus::USAGE,
                        "nothing to change: give --file, or options for what is to change");
     }
     Json body = m_options.definition(context.client().get(path()));
@@ -165,19 +165,19 @@ int SituationsCommand::set(Context& context) {
     return done(context, context.client().send("PUT", path(), body), "changed");
 }
 
-int SituationsCommand::remove(Context& context) {
+CliStatus SituationsCommand::remove(Context& context) {
     return done(context, context.client().send("DELETE", path(), nullptr), "removed");
 }
 
-int SituationsCommand::start(Context& context) {
+CliStatus SituationsCommand::start(Context& context) {
     return done(context, context.client().send("POST", path("/start"), nullptr), "started");
 }
 
-int SituationsCommand::stop(Context& context) {
+CliStatus SituationsCommand::stop(Context& context) {
     return done(context, context.client().send("POST", path("/stop"), nullptr), "stopped");
 }
 
-int SituationsCommand::validate(Context& context) {
+CliStatus SituationsCommand::validate(Context& context) {
     Json body = m_options.definition(Json::object());
     body["name"] = m_name;
     const Json answer = context.client().send("POST", route + "/validate", body);
@@ -193,7 +193,7 @@ int SituationsCommand::validate(Context& context) {
                           JsonText::text(problem, "detail"));
         }
     }
-    return problems.empty() ? CLI_DONE : CLI_REFUSED;
+    return problems.empty() ? CliStatus::DONE : CliStatus::REFUSED;
 }
 
 } // namespace zrm::host

@@ -78,9 +78,10 @@ bool StatusCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int StatusCommand::run(Context& context) {
+CliStatus StatusCommand::run(Context& context) {
     const Json status = context.client().get("/api/v1/status");
-    const CliStatus outcome = m_check && isSomethingWrong(status) ? CLI_REFUSED : CLI_DONE;
+    const CliStatus outcome =
+        m_check && isSomethingWrong(status) ? CliStatus::REFUSED : CliStatus::DONE;
     if (context.options().json) {
         context.printJson(status);
         return outcome;

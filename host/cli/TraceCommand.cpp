@@ -21,7 +21,7 @@ bool TraceCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int TraceCommand::run(Context& context) {
+CliStatus TraceCommand::run(Context& context) {
     const auto answer = m_levels.empty()
                             ? context.client().get("/api/v1/status")
                             : context.client().send("PUT", "/api/v1/trace", {{"levels", m_levels}});
@@ -31,7 +31,7 @@ int TraceCommand::run(Context& context) {
     } else {
         context.print(DisplayText::visible(levels) + '\n');
     }
-    return CLI_DONE;
+    return CliStatus::DONE;
 }
 
 } // namespace zrm::host

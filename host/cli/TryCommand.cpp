@@ -156,7 +156,7 @@ bool TryCommand::isChosen() const {
     return m_command->parsed();
 }
 
-int TryCommand::run(Context& context) {
+CliStatus TryCommand::run(Context& context) {
     InputFile file(m_file);
     std::vector<std::string> lines;
     std::optional<std::string> next;
@@ -164,7 +164,8 @@ int TryCommand::run(Context& context) {
         lines.push_back(std::move(*next));
     }
     const FormatTrial::Result result = FormatTrial::run(m_format, lines, logOf(m_file));
-    const CliStatus status = result.accepted && result.matched > 0 ? CLI_DONE : CLI_REFUSED;
+    const CliStatus status =
+        result.accepted && result.matched > 0 ? CliStatus::DONE : CliStatus::REFUSED;
     if (context.options().json) {
         context.printJson(Json::parse(FormatTrial::json(result)));
         return status;

@@ -17,7 +17,7 @@ int main(int argc, char** argv) {
             TraceControl::configure(levels == nullptr ? "none" : levels);
         !configured) {
         Context::note("QFW_TRC1: " + configured.error().text());
-        return CLI_USAGE;
+        return static_cast<int>(CliStatus::USAGE);
     }
-    return Program().run(argc, argv);
+    return static_cast<int>(Program().run(argc, argv));
 }

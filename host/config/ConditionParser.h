@@ -7,17 +7,15 @@
 
 namespace zrm::host {
 
-/// Reads one condition of the condition language: COLUMN OP VALUE. Text stands in single quotes,
-/// in which two quotes in a row are one; numbers stand bare; `in` takes a list in brackets.
-/// Immutable.
+/// Parses one condition of the condition language: COLUMN OP VALUE. Text is in single quotes, where
+/// two quotes in a row mean one; numbers have no quotes; `in` takes a list in brackets. Immutable.
 class ConditionParser {
 public:
     explicit ConditionParser(std::string_view table) : m_builder(table) {}
 
-    /// The condition; refused for the first thing that is wrong. Conditions that belong together
-    /// share a budget.
+    /// The condition, or the first problem. Conditions that belong together share a budget.
     Result<Condition> parse(std::string_view text, PatternBudget& budget) const;
-    /// The same for a condition that stands alone.
+    /// The same for a single condition.
     Result<Condition> parse(std::string_view text) const {
         PatternBudget budget;
         return parse(text, budget);

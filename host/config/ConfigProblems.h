@@ -8,8 +8,8 @@
 
 namespace zrm::host {
 
-/// What is wrong with a host configuration file: all of it, so that one look at the messages is
-/// enough to put the file right.
+/// All problems of a host configuration file, so that one look at the messages is enough to fix the
+/// file.
 class ConfigProblems {
 public:
     explicit ConfigProblems(std::string file);
@@ -18,8 +18,8 @@ public:
     void add(unsigned line, const Problem& problem);
 
     bool none() const noexcept { return m_problems.empty(); }
-    /// "FILE:LINE: KEY: WHAT; CURE" for each of the first problems that were added, in the order of
-    /// the lines, and how many more there are.
+    /// "FILE:LINE: KEY: WHAT; CURE" for each of the first problems added, in the order of the
+    /// lines, and how many more there are.
     std::vector<std::string> texts() const;
 
 private:

@@ -14,13 +14,13 @@ namespace zrm::host {
 
 class JsonWriter;
 
-/// Finds the logs that the log configuration names and the agent does not monitor. The agent
-/// passes over a line that it cannot use, and its tables have no row for it; who runs the agent
-/// wants to see it all the same. Stateless.
+/// Finds the logs that the log configuration names and the agent does not monitor. The agent skips
+/// a line that it cannot use, and its tables have no row for it; the operator wants to see it all
+/// the same. Stateless.
 class UnmonitoredLogs {
 public:
     struct Log {
-        std::string log; ///< as the configuration names it, so not always a whole path
+        std::string log; ///< as named in the configuration, so not always a full path
         std::size_t line;
         std::string reason;
         const char* cause; ///< "file", "text", or "refresh" when only that is missing; "touch":

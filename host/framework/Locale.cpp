@@ -22,23 +22,23 @@ void report(std::uint32_t* status, std::uint32_t value) noexcept {
 
 std::uint32_t statusOf(const Converted& converted) noexcept {
     if (!converted.supported) {
-        return STATUS_NO_CONVERSION;
+        return Status::noConversion;
     }
-    return converted.complete ? STATUS_OK : STATUS_TRUNCATED;
+    return converted.complete ? Status::ok : Status::truncated;
 }
 
 } // namespace
 
 LOC2_Locale* LOC2_GetLocale(int /*category*/, int /*territory*/, int /*flags*/,
                             std::uint32_t* status) {
-    report(status, STATUS_OK);
+    report(status, Status::ok);
     // The agent's handle is not const, but nothing writes through it.
     return const_cast<LOC2_Locale*>(CodePages::byName(nl_langinfo(CODESET)));
 }
 
 std::uint32_t LOC2_GetLocaleNumInfo(LOC2_Locale* locale, int item, std::uint32_t* status) {
     const bool known = locale != nullptr && item == LOC2_CODEPAGE;
-    report(status, known ? STATUS_OK : STATUS_INVALID_ARGUMENT);
+    report(status, known ? Status::ok : Status::invalidArgument);
     return known ? locale->codePage : 0;
 }
 
@@ -79,7 +79,7 @@ std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
         Utf8::isAscii({source, sourceLength})) {
         std::memcpy(target, source, sourceLength);
         report(resultLength, sourceLength);
-        report(status, STATUS_OK);
+        report(status, Status::ok);
         return static_cast<std::int32_t>(sourceLength);
     }
     return translate(targetCodePage, target, targetSize, sourceCodePage, source, sourceLength,

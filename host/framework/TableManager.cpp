@@ -21,7 +21,7 @@ TableManager::~TableManager() {
 }
 
 unsigned TableManager::Shutdown(unsigned /*reason*/) {
-    return STATUS_OK;
+    return Status::ok;
 }
 
 LinkedList& TableManager::requestsFor(char* row, unsigned rowSize) {

@@ -18,18 +18,18 @@ std::atomic<TableManager*> g_tables[maxTables];
 
 unsigned Tables::add(TableManager* manager) noexcept {
     if (manager == nullptr) {
-        return STATUS_INVALID_ARGUMENT;
+        return Status::invalidArgument;
     }
     if (find(manager->table()) != nullptr) {
-        return STATUS_DUPLICATE;
+        return Status::duplicate;
     }
     for (std::atomic<TableManager*>& table : g_tables) {
         TableManager* expected = nullptr;
         if (table.compare_exchange_strong(expected, manager)) {
-            return STATUS_OK;
+            return Status::ok;
         }
     }
-    return STATUS_NO_MEMORY;
+    return Status::noMemory;
 }
 
 void Tables::remove(const TableManager* manager) noexcept {

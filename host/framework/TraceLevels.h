@@ -10,16 +10,16 @@
 
 namespace zrm::host {
 
-/// Which classes of records are written, as text tells it: words separated by commas, each one
-/// `class` for every unit or `unit=class`, where the unit is a source file with its ending, or the
-/// name of a C++ class, which stands for all source files whose names begin with it: those of
-/// UserLogFile are UserLogFile.cpp, UserLogFileReport.cpp and UserLogFileTime.cpp. Several classes
-/// are joined with a plus. Classes are error, flow, detail, fine, all, none, or a number (decimal
-/// or 0x..). Classes for every unit add up; without any, the errors are written. The longest name
-/// that fits a source file holds, of several equal ones the last. Immutable once parsed.
+/// Which classes of records are written, as given by a text: words separated by commas, each either
+/// `class` for every unit or `unit=class`. A unit is a source file with its extension, or the name
+/// of a C++ class, which covers all its source files: those of UserLogFile are UserLogFile.cpp,
+/// UserLogFileReport.cpp and UserLogFileTime.cpp. Several classes are joined with a plus. Classes
+/// are error, flow, detail, fine, all, none, or a number (decimal or 0x..). Classes for every unit
+/// add up; without any, errors are written. For a source file, the longest matching name applies;
+/// of several equal names the last. Immutable once parsed.
 class TraceLevels {
 public:
-    /// Reads the text. Leaves the levels as they were when it is refused.
+    /// Parses the text. Leaves the levels unchanged when it is refused.
     Result<void> parse(std::string_view text);
 
     /// The set of TRC1_Class bits of a unit. Neither locks nor allocates.

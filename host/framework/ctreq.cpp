@@ -46,16 +46,16 @@ int ctreq::NumColumns() {
 }
 
 unsigned ctreq::GetColumnInfo(ColumnInfo* /*info*/, int /*index*/) {
-    return STATUS_INVALID_ARGUMENT;
+    return Status::invalidArgument;
 }
 
 unsigned ctreq::ExecuteCommand(char* /*command*/, int /*length*/, char* /*result*/) {
-    return STATUS_NOT_SUPPORTED;
+    return Status::notSupported;
 }
 
 unsigned ctreq::InsertRow(char* row) {
     if (rowSize == 0) {
-        return STATUS_INVALID_ARGUMENT;
+        return Status::invalidArgument;
     }
     if (count >= allocated) {
         // Room is counted in steps of allocSize, but the memory doubles, so that a large report is
@@ -65,7 +65,7 @@ unsigned ctreq::InsertRow(char* row) {
             const std::size_t capacity = std::max(room, m_framework->capacity * 2);
             std::unique_ptr<char[]> grown(new (std::nothrow) char[capacity * rowSize]);
             if (grown == nullptr) {
-                return STATUS_NO_MEMORY;
+                return Status::noMemory;
             }
             std::copy_n(m_rows.get(), std::size_t{count} * rowSize, grown.get());
             m_rows = std::move(grown);
@@ -75,7 +75,7 @@ unsigned ctreq::InsertRow(char* row) {
     }
     std::memcpy(m_rows.get() + std::size_t{count} * rowSize, row, rowSize);
     ++count;
-    return STATUS_OK;
+    return Status::ok;
 }
 
 unsigned ctreq::CheckForException(char* row) {
@@ -100,10 +100,10 @@ void ctreq::CommandCompleted(CtreqAutomationCapsule* /*capsule*/) {}
 unsigned ctreq::GetFilterInfo(SEL1_FILTERINFO** filter) {
     SEL1_FILTERINFO* const next = m_framework->filters.next();
     if (next == nullptr) {
-        return STATUS_END;
+        return Status::end;
     }
     *filter = next;
-    return STATUS_OK;
+    return Status::ok;
 }
 
 void ctreq::ResetFilterIndex() {
@@ -141,19 +141,19 @@ void ctreq::DumpThresholds() {
 }
 
 unsigned ctreq::Dispatch() {
-    return count == 0 ? STATUS_OK : m_framework->receiver.receive(*this, m_rows.get(), count);
+    return count == 0 ? Status::ok : m_framework->receiver.receive(*this, m_rows.get(), count);
 }
 
 unsigned ctreq::Stop() {
     m_framework->stopped = true;
-    return STATUS_OK;
+    return Status::ok;
 }
 
 unsigned ctreq::Stopped(unsigned reason) {
     if (!m_framework->stopped.exchange(true)) {
         m_framework->receiver.stopped(*this, reason);
     }
-    return STATUS_OK;
+    return Status::ok;
 }
 
 ctreq* ctreq::UseHandle(unsigned handle) {

@@ -49,7 +49,7 @@ unsigned Situation::receive(const ctreq& request, const char* rows, unsigned cou
     m_counts->countRaised(count, WallClock::now());
     for (unsigned index = 0; index < count; ++index) {
         if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {
-            return trace.result(static_cast<unsigned>(STATUS_END));
+            return trace.result(static_cast<unsigned>(Status::end));
         }
     }
     return trace.result(0u);

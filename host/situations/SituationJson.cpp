@@ -3,6 +3,8 @@
 #include "host/base/TimeText.h"
 #include "host/situations/SituationSet.h"
 
+#include <cstddef>
+
 #include <nlohmann/json.hpp>
 
 namespace zrm::host {
@@ -32,8 +34,8 @@ Json SituationJson::definition(const SituationConfig& situation) {
 
 Json SituationJson::status(const SituationStatus& status) {
     Json object = definition(status.config);
-    object["source"] = sources[status.source];
-    object["state"] = states[status.state];
+    object["source"] = sources[static_cast<std::size_t>(status.source)];
+    object["state"] = states[static_cast<std::size_t>(status.state)];
     object["problem"] = status.problem.empty() ? Json() : Json(status.problem);
     object["counts"] = {{"offered", status.offered},
                         {"matched", status.matched},

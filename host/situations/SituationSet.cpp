@@ -11,64 +11,15 @@ namespace {
 
 TRC1_Anchor anchor{"SituationSet.cpp"};
 
-constexpr auto fileSource = SituationStatus::FILE;
-constexpr auto apiSource = SituationStatus::API;
-
-tl::unexpected<SituationRefusal> refuse(SituationRefusal::Reason reason, std::string what,
-                                        std::string field = "") {
-    return tl::unexpected(SituationRefusal{reason, {std::move(what), "", std::move(field)}});
-}
-
-tl::unexpected<SituationRefusal> unknown(const std::string& name) {
-    return refuse(SituationRefusal::UNKNOWN, "there is no situation '" + name + "'", "name");
-}
-
-tl::unexpected<SituationRefusal> fromFile(const std::string& name) {
-    return refuse(SituationRefusal::FROM_FILE,
-                  "the situation '" + name +
-                      "' belongs to the configuration file: change it there, which takes effect at "
-                      "once, or stop it",
-                  "name");
-}
-
-tl::unexpected<SituationRefusal> missing(bool isInFile, const std::string& name) {
-    return isInFile ? fromFile(name) : unknown(name);
-}
-
-/// The key under which the runner has a situation.
-std::string runnerKey(SituationStatus::Source source, const std::string& name) {
-    return (source == fileSource ? "file " : "API ") + name;
-}
-
 } // namespace
-
-/// The time in which one change of the API keeps the others waiting.
-class SituationSet::Turn {
-public:
-    explicit Turn(SituationSet& set) : m_set(set) {
-        std::unique_lock lock(m_set.m_mutex);
-        m_hasCome =
-            m_set.m_turnEnded.wait_for(lock, patience, [this] { return !m_set.m_isChanging; });
-        m_set.m_isChanging = true;
-    }
-    ~Turn() {
-        if (m_hasCome) {
-            const std::lock_guard guard(m_set.m_mutex);
-            m_set.m_isChanging = false;
-            m_set.m_turnEnded.notify_one();
-        }
-    }
-    Turn(const Turn&) = delete;
-    Turn& operator=(const Turn&) = delete;
-    bool hasCome() const noexcept { return m_hasCome; }
-
-private:
-    SituationSet& m_set;
-    bool m_hasCome = false;
-};
 
 SituationSet::SituationSet(TableManager& entries, EventQueue& queue, std::string storePath)
     : m_store(std::move(storePath)), m_runner(entries, queue) {}
+
+/// The key under which the runner has a situation.
+std::string SituationSet::runnerKey(const Key& key) {
+    return (key.first == fileSource ? "file " : "API ") + key.second;
+}
 
 std::string SituationSet::load() {
     TraceScope trace(anchor);
@@ -97,7 +48,7 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
         for (auto record = m_records.begin(); record != m_records.end();) {
             const auto& [source, name] = record->first;
             if (source == fileSource && !names.contains(name)) {
-                m_runner.stop(runnerKey(source, name));
+                m_runner.stop(runnerKey(record->first));
                 record = m_records.erase(record);
             } else {
                 ++record;
@@ -115,7 +66,7 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
                 run(key, record);
             }
         }
-        // What the file has come to name, or names no more, shadows others or does not.
+        // Names that were added to or removed from the file decide what is shadowed.
         for (const auto& [key, record] : m_records) {
             if (key.first == apiSource) {
                 runAgain(key, record);
@@ -124,23 +75,6 @@ void SituationSet::apply(const std::vector<SituationConfig>& configs) {
     }
     m_runner.settle(patience);
     keepStoppedFiles();
-}
-
-/// What the file names no more is forgotten for good: not only until the next start.
-void SituationSet::keepStoppedFiles() {
-    TraceScope trace(anchor);
-    const Turn turn(*this);
-    if (!turn.hasCome()) {
-        return; // the change after those that are under way saves it
-    }
-    Draft draft;
-    {
-        const std::lock_guard guard(m_mutex);
-        draft = {m_records, m_stoppedFiles};
-    }
-    if (draft.stoppedFiles != m_keptStopped) {
-        save(draft);
-    }
 }
 
 std::vector<SituationStatus> SituationSet::list() const {
@@ -159,175 +93,7 @@ std::optional<SituationStatus> SituationSet::find(const std::string& name) const
     return found == nullptr ? std::nullopt : std::optional(statusOf(found->first, found->second));
 }
 
-/// The key, unless the regular expressions of what was made through the API have become too large.
-SituationSet::Changed SituationSet::orTooLarge(const Records& records, const Key& key) {
-    PatternBudget budget(PatternBudget::ofSource);
-    for (const auto& [one, record] : records) {
-        if (one.first == apiSource) {
-            budget.spend(record.config.patternSize);
-        }
-    }
-    if (!budget.isExceeded()) {
-        return key;
-    }
-    return refuse(SituationRefusal::TOO_MANY,
-                  "the regular expressions of the situations created through the API are too large "
-                  "together: remove a situation, or write smaller ones");
-}
-
-SituationSet::Change SituationSet::add(const SituationConfig& config) {
-    return statusAfter(change([&](Draft& draft) -> Changed {
-        if (named(draft.records, config.name) != nullptr) {
-            return refuse(SituationRefusal::EXISTS,
-                          "there is a situation '" + config.name +
-                              "' already: choose another name, or change that one",
-                          "name");
-        }
-        const auto made =
-            std::count_if(draft.records.begin(), draft.records.end(),
-                          [](const auto& one) { return one.first.first == apiSource; });
-        if (static_cast<std::size_t>(made) >= mostMade) {
-            return refuse(SituationRefusal::TOO_MANY,
-                          "there are " + std::to_string(mostMade) +
-                              " situations created through the API: remove one first");
-        }
-        const Key key{apiSource, config.name};
-        draft.records.emplace(key, Record{config});
-        return orTooLarge(draft.records, key);
-    }));
-}
-
-SituationSet::Change SituationSet::replace(const SituationConfig& config) {
-    return statusAfter(change([&](Draft& draft) -> Changed {
-        const Key key{apiSource, config.name};
-        const auto found = draft.records.find(key);
-        if (found == draft.records.end()) {
-            return missing(named(draft.records, config.name) != nullptr, config.name);
-        }
-        Record& record = found->second;
-        if (record.config != config || !record.problem.empty()) {
-            Record exchanged{config};
-            exchanged.isStopped = record.isStopped;
-            record = std::move(exchanged);
-        }
-        return orTooLarge(draft.records, key);
-    }));
-}
-
-Result<void, SituationRefusal> SituationSet::remove(const std::string& name) {
-    const Changed changed = change([&](Draft& draft) -> Changed {
-        const Key key{apiSource, name};
-        if (draft.records.erase(key) == 0) {
-            return missing(named(draft.records, name) != nullptr, name);
-        }
-        return key;
-    });
-    return changed.map([](const Key&) {});
-}
-
-SituationSet::Change SituationSet::start(const std::string& name) {
-    return setStopped(name, false);
-}
-
-SituationSet::Change SituationSet::stop(const std::string& name) {
-    return setStopped(name, true);
-}
-
-SituationSet::Change SituationSet::setStopped(const std::string& name, bool isStopped) {
-    return statusAfter(change([&](Draft& draft) -> Changed {
-        const auto* const found = named(draft.records, name);
-        if (found == nullptr) {
-            return unknown(name);
-        }
-        const Key key = found->first;
-        draft.records[key].isStopped = isStopped;
-        if (key.first == fileSource && isStopped) {
-            draft.stoppedFiles.insert(name);
-        } else if (key.first == fileSource) {
-            draft.stoppedFiles.erase(name);
-        }
-        return key;
-    }));
-}
-
-/// Makes the change that `plan` makes to the draft, of the record whose key it returns.
-SituationSet::Changed SituationSet::change(const std::function<Changed(Draft&)>& plan) {
-    TraceScope trace(anchor);
-    Changed changed = changeInTurn(plan);
-    if (changed) {
-        m_runner.settle(patience);
-    }
-    return changed;
-}
-
-SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Draft&)>& plan) {
-    TraceScope trace(anchor);
-    const Turn turn(*this);
-    if (!turn.hasCome()) {
-        return refuse(SituationRefusal::BUSY,
-                      "other changes of the situations are in progress: try again");
-    }
-    Draft draft;
-    {
-        const std::lock_guard guard(m_mutex);
-        draft = {m_records, m_stoppedFiles};
-    }
-    Changed changed = plan(draft);
-    if (!changed) {
-        return changed;
-    }
-    if (const auto saved = save(draft); !saved) {
-        return tl::unexpected(saved.error());
-    }
-    const std::lock_guard guard(m_mutex);
-    publish(*changed, draft);
-    return changed;
-}
-
-/// Takes one record over from the draft. The file's may have changed since it was made.
-void SituationSet::publish(const Key& key, const Draft& draft) {
-    const auto drafted = draft.records.find(key);
-    const auto found = m_records.find(key);
-    if (drafted == draft.records.end()) {
-        m_records.erase(key);
-        m_runner.stop(runnerKey(key.first, key.second));
-        return;
-    }
-    if (key.first == fileSource) {
-        if (found != m_records.end()) {
-            if (drafted->second.isStopped) {
-                m_stoppedFiles.insert(key.second);
-            } else {
-                m_stoppedFiles.erase(key.second);
-            }
-            found->second.isStopped = drafted->second.isStopped;
-            runAgain(key, found->second);
-        }
-        return;
-    }
-    const bool isAsItWas =
-        found != m_records.end() && found->second.counts == drafted->second.counts;
-    const Record& record = m_records.insert_or_assign(key, drafted->second).first->second;
-    if (isAsItWas) {
-        runAgain(key, record);
-    } else {
-        run(key, record);
-    }
-}
-
-SituationSet::Change SituationSet::statusAfter(const Changed& changed) const {
-    if (!changed) {
-        return tl::unexpected(changed.error());
-    }
-    const std::lock_guard guard(m_mutex);
-    const auto found = m_records.find(*changed);
-    if (found == m_records.end()) {
-        return unknown(changed->second); // gone again, or the file has lost it
-    }
-    return statusOf(found->first, found->second);
-}
-
-/// The one that a name stands for in the API: the file's situation hides one made through it.
+/// The one that a name means in the API: the file's situation hides one created through it.
 const SituationSet::Records::value_type* SituationSet::named(const Records& records,
                                                              const std::string& name) {
     for (const auto source : {fileSource, apiSource}) {
@@ -343,9 +109,9 @@ bool SituationSet::isShadowed(const Key& key) const {
     return key.first == apiSource && m_records.contains({fileSource, key.second});
 }
 
-/// Lets a record that is new or has changed run, or not.
+/// Starts or stops a record that is new or has changed.
 void SituationSet::run(const Key& key, const Record& record) {
-    const std::string name = runnerKey(key.first, key.second);
+    const std::string name = runnerKey(key);
     if (record.isStopped || !record.problem.empty() || isShadowed(key)) {
         m_runner.stop(name);
     } else {
@@ -353,9 +119,9 @@ void SituationSet::run(const Key& key, const Record& record) {
     }
 }
 
-/// The same for one that may run already, and then goes on undisturbed.
+/// The same for one that may be running, which it then continues to do.
 void SituationSet::runAgain(const Key& key, const Record& record) {
-    const SituationRunner::State state = m_runner.state(runnerKey(key.first, key.second));
+    const SituationRunner::State state = m_runner.state(runnerKey(key));
     const bool isUp =
         state == SituationRunner::State::OPEN || state == SituationRunner::State::OPENING;
     const bool isToRun = !record.isStopped && record.problem.empty() && !isShadowed(key);
@@ -364,27 +130,11 @@ void SituationSet::runAgain(const Key& key, const Record& record) {
     }
 }
 
-Result<void, SituationRefusal> SituationSet::save(const Draft& draft) {
-    SituationStore::Content content;
-    for (const auto& [key, record] : draft.records) {
-        if (key.first == apiSource) {
-            content.made.push_back({record.config, record.isStopped});
-        }
-    }
-    content.stoppedFiles.assign(draft.stoppedFiles.begin(), draft.stoppedFiles.end());
-    if (const Result<void> saved = m_store.save(content); !saved) {
-        return refuse(SituationRefusal::NOT_SAVED,
-                      "the change cannot be saved and was not made: " + saved.error().text());
-    }
-    m_keptStopped = draft.stoppedFiles;
-    return {};
-}
-
 SituationStatus SituationSet::statusOf(const Key& key, const Record& record) const {
     SituationStatus status;
     status.config = record.config;
     status.source = key.first;
-    // In this order the counts agree although log threads go on counting.
+    // Read in this order, the counts agree although log threads keep counting.
     status.lastRaised = record.counts->lastRaised();
     status.raised = record.counts->raised();
     status.matched = std::max(record.counts->requests.matched(), status.raised);
@@ -402,7 +152,7 @@ SituationStatus SituationSet::statusOf(const Key& key, const Record& record) con
     } else if (record.isStopped) {
         status.state = SituationStatus::STOPPED;
     } else {
-        switch (m_runner.state(runnerKey(key.first, key.second))) {
+        switch (m_runner.state(runnerKey(key))) {
         case SituationRunner::State::REFUSED:
             fail("the agent's Log Entries table opened no request: start it again");
             break;

@@ -25,8 +25,10 @@ namespace zrm::host {
 
 /// A snapshot of a situation's state.
 struct SituationStatus {
-    enum Source { FILE, API };
-    enum State { RUNNING, STOPPED, FAILED };
+    enum class Source { FILE, API };
+    enum class State { RUNNING, STOPPED, FAILED };
+    using enum Source;
+    using enum State;
 
     SituationConfig config;
     Source source = FILE;
@@ -47,7 +49,7 @@ struct SituationRefusal {
         EXISTS,    ///< the name is taken
         FROM_FILE, ///< the situation belongs to the configuration file
         TOO_MANY,
-        NOT_SAVED, ///< the change could not be made to last
+        NOT_SAVED, ///< the change could not be saved
         BUSY,      ///< other changes take too long
     };
     using enum Reason;
@@ -55,14 +57,14 @@ struct SituationRefusal {
     Problem problem;
 };
 
-/// The situations by name: those of the configuration file and those made through the API. A name
-/// may be in both when the file came to have it later; then the file's runs, and the other one
-/// waits, as failed. Any thread.
+/// The situations by name: those of the configuration file and those created through the API. A
+/// name may occur in both when it was added to the file later; then the file's runs, and the other
+/// one counts as failed until the name is free. Any thread.
 ///
-/// A change is saved before it is made. It is in force when the call returns, except that opening
-/// and closing wait for log threads which wait for room in the queue of events: a call waits for
-/// them for `patience` at most. A situation that is stopped or removed raises nothing more either
-/// way.
+/// A change is saved before it is made, and takes effect before the call returns, with one
+/// exception: opening and closing wait for log threads that wait for room in the event queue, and a
+/// call waits at most `patience` for that. A stopped or removed situation raises nothing more
+/// either way.
 class SituationSet {
 public:
     static constexpr std::size_t mostMade = 1000; ///< situations made through the API
@@ -75,40 +77,43 @@ public:
     SituationSet(const SituationSet&) = delete;
     SituationSet& operator=(const SituationSet&) = delete;
 
-    /// Takes over what was kept: the situations made through the API, and which are stopped.
-    /// Returns what is to be said about it, if anything. Once, before the first apply.
+    /// Loads what was saved: the situations created through the API, and which ones are stopped.
+    /// Returns a message for the operator, if there is one. Once, before the first apply.
     std::string load();
 
-    /// Makes these the situations of the file. One that is as it was goes on undisturbed, with the
-    /// entry times that it has counted; one that has changed begins anew.
+    /// Makes these the situations of the file. An unchanged one continues with the entry times that
+    /// it has counted; a changed one starts over.
     void apply(const std::vector<SituationConfig>& configs);
 
-    /// Waits until every situation that is to run is open, at most so long; false when the time is
-    /// up.
+    /// Waits until every situation that should run is open, at most until the limit; false when the
+    /// time is up.
     bool waitUntilOpen(std::chrono::milliseconds limit) { return m_runner.settle(limit); }
 
-    /// Those of the file first, each by name.
+    /// Those of the file first, then the others, each sorted by name.
     std::vector<SituationStatus> list() const;
-    /// The one of this name that can run.
+    /// The one with this name that may run.
     std::optional<SituationStatus> find(const std::string& name) const;
 
     // Changes through the API.
 
     Change add(const SituationConfig& config);
-    /// Exchanges the one of this name, which begins anew when it is not as it was.
+    /// Replaces the one with this name, which starts over if the definition differs.
     Change replace(const SituationConfig& config);
     Result<void, SituationRefusal> remove(const std::string& name);
-    /// Of either source. Starting one that has failed tries again.
+    /// For situations of either source. Starting a failed one tries again.
     Change start(const std::string& name);
     Change stop(const std::string& name);
 
-    /// Closes all of them for good; waits for log threads as long as they wait.
+    /// Closes all of them for good. Waits for as long as log threads wait for room.
     void close() { m_runner.close(); }
 
     std::size_t size() const;
 
 private:
     using Key = std::pair<SituationStatus::Source, std::string>;
+    static constexpr auto fileSource = SituationStatus::FILE;
+    static constexpr auto apiSource = SituationStatus::API;
+
     struct Record {
         SituationConfig config;
         std::shared_ptr<SituationCounts> counts = std::make_shared<SituationCounts>();
@@ -116,7 +121,7 @@ private:
         std::string problem = {}; ///< why it cannot run; empty: it can
     };
     using Records = std::map<Key, Record>;
-    /// The situations as a change wants them.
+    /// The situations as they will be after a change.
     struct Draft {
         Records records;
         std::set<std::string> stoppedFiles;
@@ -132,6 +137,7 @@ private:
     Change statusAfter(const Changed& changed) const;
     Change setStopped(const std::string& name, bool isStopped);
     static const Records::value_type* named(const Records& records, const std::string& name);
+    static std::string runnerKey(const Key& key);
 
     // With m_mutex held.
     void publish(const Key& key, const Draft& draft);
@@ -140,13 +146,13 @@ private:
     void runAgain(const Key& key, const Record& record);
     SituationStatus statusOf(const Key& key, const Record& record) const;
 
-    SituationStore m_store;              ///< used by the change that has its turn
-    std::set<std::string> m_keptStopped; ///< as the store has m_stoppedFiles; used like it
+    SituationStore m_store;              ///< used by the change whose turn it is
+    std::set<std::string> m_keptStopped; ///< m_stoppedFiles as saved; used like m_store
 
-    mutable std::mutex m_mutex; ///< guards what follows; held for moments
+    mutable std::mutex m_mutex; ///< guards what follows; held only briefly
     std::condition_variable m_turnEnded;
     bool m_isChanging =
-        false; ///< a change by the API has its turn, until it is saved and published
+        false; ///< a change through the API is in progress, until it is saved and published
     Records m_records;
     std::set<std::string> m_stoppedFiles; ///< names of the file's situations that are stopped
 

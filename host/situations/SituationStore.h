@@ -12,32 +12,32 @@
 
 namespace zrm::host {
 
-/// What of the situations outlives the process: those made through the API, and which of all are
-/// stopped. One file, of a version that it names, written as a whole: to a temporary beside it that
-/// is synced and renamed, so that it is the old or the new one whenever the process or the machine
-/// ends. One thread at a time.
+/// The part of the situations that survives the process: those created through the API, and which
+/// ones are stopped. One file with a version number, always written as a whole: to a temporary file
+/// that is synced and renamed, so that a crash leaves either the old or the new one. One thread at
+/// a time.
 class SituationStore {
 public:
     struct Made {
         SituationConfig config;
         bool isStopped = false;
-        std::string problem = {}; ///< found by load: why it cannot run; empty: it can
+        std::string problem = {}; ///< set by load: why it cannot run; empty: it can
     };
     struct Content {
-        std::vector<Made> made;                ///< through the API
-        std::vector<std::string> stoppedFiles; ///< names of situations of the file
-        std::string message = {}; ///< found by load: what is to be said about it, if anything
+        std::vector<Made> made;                ///< created through the API
+        std::vector<std::string> stoppedFiles; ///< names of stopped situations of the file
+        std::string message = {};              ///< set by load: a message for the operator, if any
     };
 
-    /// An empty path: nothing is kept.
+    /// An empty path: nothing is saved.
     explicit SituationStore(std::string path) : m_path(std::move(path)) {}
 
-    /// Reads the file; nothing when there is none. One that is not what it should be is moved
-    /// aside. Where that, or reading, fails, nothing is saved until the next start, so that nothing
-    /// is lost; the content's message then says what happened.
+    /// Reads the file; empty content when there is none. An invalid file is moved aside. If that or
+    /// reading fails, nothing is saved until the next start, so that nothing is lost; the content's
+    /// message then says what happened.
     Content load();
 
-    /// Replaces the file, which stays as it was when that fails.
+    /// Replaces the file; on failure the old one stays.
     Result<void> save(const Content& content);
 
 private:

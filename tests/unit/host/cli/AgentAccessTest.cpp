@@ -99,12 +99,13 @@ TEST_F(AgentAccessTest, FurtherCertificatesAreTrustedBesideTheConfiguredOne) {
 
 TEST_F(AgentAccessTest, TheTokenIsSentUnencryptedOnlyToThisMachine) {
     options.url = "http://logs.example.org:7186";
-    expectError(CLI_USAGE, "--url: the token would reach logs.example.org unencrypted; use https, "
-                           "or an SSH tunnel");
+    expectError(CliStatus::USAGE,
+                "--url: the token would reach logs.example.org unencrypted; use https, "
+                "or an SSH tunnel");
     setenv("ZRM_URL", "http://192.0.2.7", 1);
     options.url.clear();
     expectError(
-        CLI_USAGE,
+        CliStatus::USAGE,
         "ZRM_URL: the token would reach 192.0.2.7 unencrypted; use https, or an SSH tunnel");
 }
 
@@ -122,16 +123,17 @@ TEST_F(AgentAccessTest, InvalidAddressesAreRefused) {
          {"localhost:7186", "http://", "ftp://localhost", "http://a b:1", "https://", "https://a b",
           "https://a/path", "https://user@a", "http://localhost/path", "http://[::1"}) {
         options.url = url;
-        expectError(CLI_USAGE, "--url: '" + std::string(url) +
-                                   "' is not an address; write it as http://127.0.0.1:7186");
+        expectError(CliStatus::USAGE, "--url: '" + std::string(url) +
+                                          "' is not an address; write it as http://127.0.0.1:7186");
     }
 }
 
 TEST_F(AgentAccessTest, AMissingConfigurationIsReported) {
     options.config = directory.file("absent.toml");
-    expectError(CLI_USAGE, options.config +
-                               " does not exist: name the agent's configuration with --config, or "
-                               "its address with --url");
+    expectError(CliStatus::USAGE,
+                options.config +
+                    " does not exist: name the agent's configuration with --config, or "
+                    "its address with --url");
 }
 
 TEST_F(AgentAccessTest, ErrorsInTheAgentsOwnKeysAreIgnored) {
@@ -148,7 +150,7 @@ TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsReported) {
         AgentAccess::find(options);
         FAIL() << "no error";
     } catch (const CliError& error) {
-        EXPECT_EQ(error.status(), CLI_USAGE);
+        EXPECT_EQ(error.status(), CliStatus::USAGE);
         const std::string text = error.what();
         EXPECT_NE(text.find("zrm.toml:1: state_directory: "), std::string::npos) << text;
         EXPECT_NE(text.find("\n" + options.config + ":3: http.listen"), std::string::npos) << text;
@@ -158,30 +160,30 @@ TEST_F(AgentAccessTest, EveryProblemOfAddressAndTokenIsReported) {
 TEST_F(AgentAccessTest, AConfigurationWithoutHttpHasNoAddress) {
     write("zrm.toml", "");
     expectError(
-        CLI_USAGE,
+        CliStatus::USAGE,
         options.config +
             " turns HTTP off: give [http] a listen address, or give the address with --url");
 }
 
 TEST_F(AgentAccessTest, AnUnspecifiedPortIsNotAnAddress) {
     write("zrm.toml", "[http]\nlisten = \"127.0.0.1:0\"\n");
-    expectError(CLI_USAGE,
+    expectError(CliStatus::USAGE,
                 options.config +
                     " leaves the port open: give the address that the agent reported with --url");
 }
 
 TEST_F(AgentAccessTest, AMissingTokenIsReported) {
     options.tokenFile = directory.file("absent");
-    expectError(CLI_FORBIDDEN,
+    expectError(CliStatus::FORBIDDEN,
                 "cannot read the token " + options.tokenFile +
                     ": No such file or directory; the agent creates it when it starts with HTTP");
 }
 
 TEST_F(AgentAccessTest, AFileWithoutATokenIsReported) {
     options.tokenFile = write("two-lines", "one\ntwo\n");
-    expectError(CLI_FORBIDDEN,
+    expectError(CliStatus::FORBIDDEN,
                 options.tokenFile + " does not contain a token: one line of visible characters");
     options.tokenFile = write("blank", "\n");
-    expectError(CLI_FORBIDDEN,
+    expectError(CliStatus::FORBIDDEN,
                 options.tokenFile + " does not contain a token: one line of visible characters");
 }

@@ -81,29 +81,30 @@ TEST_F(AgentClientTest, AnAnswerWithoutABodyIsNull) {
 
 TEST_F(AgentClientTest, AProblemIsReportedWithItsField) {
     answer(400, R"({"status":400,"detail":"'is' is not an operator","field":"where[0]"})");
-    expectAnswer(CLI_REFUSED, "where[0]: 'is' is not an operator");
+    expectAnswer(CliStatus::REFUSED, "where[0]: 'is' is not an operator");
 }
 
 TEST_F(AgentClientTest, AProblemWithoutAField) {
     answer(409, R"({"status":409,"detail":"the history is off"})");
-    expectAnswer(CLI_REFUSED, "the history is off");
+    expectAnswer(CliStatus::REFUSED, "the history is off");
 }
 
 TEST_F(AgentClientTest, AnErrorWithoutAProblemDocumentIsReported) {
     answer(502, "<html>");
-    expectAnswer(CLI_REFUSED, "the agent at " + url + " answered with status 502");
+    expectAnswer(CliStatus::REFUSED, "the agent at " + url + " answered with status 502");
 }
 
 TEST_F(AgentClientTest, ARejectedTokenIsReported) {
     answer(401, "{}");
-    expectAnswer(CLI_FORBIDDEN, "the agent at " + url +
-                                    " does not accept the token from its file: give the right one "
-                                    "with --token-file or --config");
+    expectAnswer(CliStatus::FORBIDDEN,
+                 "the agent at " + url +
+                     " does not accept the token from its file: give the right one "
+                     "with --token-file or --config");
 }
 
 TEST_F(AgentClientTest, AnotherProgramAtTheAddressIsReported) {
     answer(200, "<html>");
-    expectAnswer(CLI_UNREACHABLE,
+    expectAnswer(CliStatus::UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
@@ -111,9 +112,10 @@ TEST_F(AgentClientTest, AnAgentThatIsNotRunningIsReported) {
     agent.begin();
     url = agent.connection().url;
     agent.end();
-    expectAnswer(CLI_UNREACHABLE, "cannot reach the agent at " + url +
-                                      ": is zrmagent running? (systemctl status zrmagent; another "
-                                      "address: --url or --config)");
+    expectAnswer(CliStatus::UNREACHABLE,
+                 "cannot reach the agent at " + url +
+                     ": is zrmagent running? (systemctl status zrmagent; another "
+                     "address: --url or --config)");
 }
 
 TEST_F(AgentClientTest, AnEndlessAnswerIsReportedAndTakesBoundedMemory) {
@@ -122,13 +124,13 @@ TEST_F(AgentClientTest, AnEndlessAnswerIsReportedAndTakesBoundedMemory) {
                                      ScriptedServer::Reply::KEEP, "4\r\nmore\r\n"};
     });
     AgentClient client({server.url(), "the-token", "its file"});
-    expectError([&] { client.get("/x"); }, CLI_UNREACHABLE,
+    expectError([&] { client.get("/x"); }, CliStatus::UNREACHABLE,
                 "what answers at " + server.url() + " is not a zrmagent: its answer does not end");
 }
 
 TEST_F(AgentClientTest, ADeeplyNestedAnswerIsReported) {
     answer(200, R"({"a":)" + std::string(1'000'000, '[') + std::string(1'000'000, ']') + '}');
-    expectAnswer(CLI_UNREACHABLE,
+    expectAnswer(CliStatus::UNREACHABLE,
                  "what answers at " + url + " is not a zrmagent: its answer is not a JSON object");
 }
 
@@ -141,7 +143,7 @@ TEST_F(AgentClientTest, AnEndlessEventOfAStreamIsReported) {
     SseParser parser([](const std::string&) {});
     expectError(
         [&] { client.stream("/x", {}, [&](std::string_view piece) { parser.take(piece); }); },
-        CLI_UNREACHABLE,
+        CliStatus::UNREACHABLE,
         "what answers is not a zrmagent: an event of its stream is longer than 1 MB");
 }
 

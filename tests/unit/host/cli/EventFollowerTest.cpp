@@ -163,7 +163,7 @@ TEST_F(EventFollowerTest, ARefusalEndsTheFollowing) {
         follow(0, 1);
         FAIL() << "no error";
     } catch (const CliError& error) {
-        EXPECT_EQ(error.status(), CLI_REFUSED);
+        EXPECT_EQ(error.status(), CliStatus::REFUSED);
         EXPECT_STREQ(error.what(), "the history is off");
     }
 }

@@ -51,7 +51,7 @@ protected:
         return text;
     }
     /// Runs zrmctl; its output and errors are kept.
-    int run(std::vector<std::string> arguments) {
+    CliStatus run(std::vector<std::string> arguments) {
         if (arguments.front() != "--url") {
             arguments.insert(arguments.begin(), {"--url", agent.connection().url});
         }
@@ -62,7 +62,7 @@ protected:
         }
         testing::internal::CaptureStdout();
         testing::internal::CaptureStderr();
-        const int status = Program().run(static_cast<int>(words.size()), words.data());
+        const CliStatus status = Program().run(static_cast<int>(words.size()), words.data());
         output = testing::internal::GetCapturedStdout();
         errors = testing::internal::GetCapturedStderr();
         return status;
@@ -107,40 +107,42 @@ TEST_F(ProgramTest, AnUnexpectedAnswerCrashesNoCommand) {
     for (const std::string& body : bodies) {
         answerWith(body);
         for (const std::vector<std::string>& command : commands) {
-            const int status = run(command);
-            EXPECT_TRUE(body[0] == '{' ? status <= CLI_UNREACHABLE : status == CLI_UNREACHABLE)
-                << command.front() << " with " << body << ": " << status << errors;
+            const CliStatus status = run(command);
+            EXPECT_TRUE(body[0] == '{' ? status <= CliStatus::UNREACHABLE
+                                       : status == CliStatus::UNREACHABLE)
+                << command.front() << " with " << body << ": " << static_cast<int>(status)
+                << errors;
         }
     }
     answerWith(R"({"columns":1,"rows":[{}]})");
-    EXPECT_EQ(run({"report", "/x", "--format", "csv"}), CLI_UNREACHABLE);
+    EXPECT_EQ(run({"report", "/x", "--format", "csv"}), CliStatus::UNREACHABLE);
     EXPECT_EQ(errors, "zrmctl: what answers is not a zrmagent of this version: its answer has a "
                       "different form\n");
 }
 
 TEST_F(ProgramTest, AnUnknownColumnOfAReportIsRefused) {
     answerWith(R"({"columns":["ENTRYTIME","ENTRYDESC"],"rows":[{"ENTRYDESC":"a, b"}]})");
-    EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CLI_USAGE);
+    EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CliStatus::USAGE);
     EXPECT_EQ(output, "");
     EXPECT_EQ(errors, "zrmctl: --columns: 'BOGUS' is not a column; the columns are ENTRYTIME, "
                       "ENTRYDESC\n");
-    EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CLI_DONE);
+    EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CliStatus::DONE);
     EXPECT_EQ(output, "ENTRYDESC\r\n\"a, b\"\r\n");
-    EXPECT_EQ(run({"report", "/x", "--json", "--columns", "ENTRYDESC"}), CLI_DONE);
+    EXPECT_EQ(run({"report", "/x", "--json", "--columns", "ENTRYDESC"}), CliStatus::DONE);
     EXPECT_EQ(output, "{\"columns\":[\"ENTRYDESC\"],\"rows\":[{\"ENTRYDESC\":\"a, b\"}]}\n");
 }
 
 TEST_F(ProgramTest, ReadsTheNumberOfAnEvent) {
     for (const char* const number :
          {"99999999999999999999999", "9223372036854775808", "1.5", "-1", "x", "", " 1", "1x"}) {
-        EXPECT_EQ(run({"events", "-f", "--after", number}), CLI_USAGE) << number;
+        EXPECT_EQ(run({"events", "-f", "--after", number}), CliStatus::USAGE) << number;
         EXPECT_EQ(errors,
                   "zrmctl: --after: '" + std::string(number) +
                       "' is not the id of an event; zrmctl events --help lists its options\n");
-        EXPECT_EQ(run({"events", "--before", number}), CLI_USAGE) << number;
+        EXPECT_EQ(run({"events", "--before", number}), CliStatus::USAGE) << number;
     }
     answerWith(R"({"events":[{"id":8}]})");
-    EXPECT_EQ(run({"events", "--json", "--after", "9223372036854775807"}), CLI_DONE);
+    EXPECT_EQ(run({"events", "--json", "--after", "9223372036854775807"}), CliStatus::DONE);
     EXPECT_EQ(output, "{\"id\":8}\n");
 }
 
@@ -155,7 +157,7 @@ TEST_F(ProgramTest, InvalidUtf8IsRefused) {
           {"situations", "add", "x", "--text", "caf\xe9"},
           {"explain", "x", "--line", "caf\xe9"},
           {"report", "/x", "--where", "ENTRYDESC = '\xff'"}}) {
-        EXPECT_EQ(run(command), CLI_USAGE);
+        EXPECT_EQ(run(command), CliStatus::USAGE);
         EXPECT_EQ(errors, "zrmctl: the command line, or the file that it names, is not valid "
                           "UTF-8, which the agent's API requires\n");
     }
@@ -168,19 +170,19 @@ TEST_F(ProgramTest, ExactlyOneSubjectIsExplained) {
         asked = request.body;
         return HttpAnswer::json(R"({"explanations":[{}]})");
     });
-    EXPECT_EQ(run({"explain", "x"}), CLI_DONE);
+    EXPECT_EQ(run({"explain", "x"}), CliStatus::DONE);
     EXPECT_EQ(copy(asked), R"({"situation":"x","last":5})");
-    EXPECT_EQ(run({"explain", "x", "--line", "a b"}), CLI_DONE);
+    EXPECT_EQ(run({"explain", "x", "--line", "a b"}), CliStatus::DONE);
     EXPECT_EQ(copy(asked), R"({"situation":"x","line":"a b"})");
-    EXPECT_EQ(run({"explain", "x", "--log", "/l", "--last", "7"}), CLI_DONE);
+    EXPECT_EQ(run({"explain", "x", "--log", "/l", "--last", "7"}), CliStatus::DONE);
     EXPECT_EQ(copy(asked), R"({"situation":"x","log":"/l","last":7})");
-    EXPECT_EQ(run({"explain", "x", "--event", "7"}), CLI_DONE);
+    EXPECT_EQ(run({"explain", "x", "--event", "7"}), CliStatus::DONE);
     EXPECT_EQ(copy(asked), R"({"situation":"x","event":7})");
     for (const std::vector<std::string>& both :
          {std::vector<std::string>{"explain", "x", "--line", "a", "--last", "2"},
           {"explain", "x", "--event", "1", "--last", "2"},
           {"explain", "x", "--event", "1", "--log", "/l"}}) {
-        EXPECT_EQ(run(both), CLI_USAGE);
+        EXPECT_EQ(run(both), CliStatus::USAGE);
         EXPECT_THAT(errors, HasSubstr("explain one thing"));
     }
 }
@@ -193,43 +195,44 @@ TEST_F(ProgramTest, AnEmptyValueRemovesAMember) {
             R"({"name":"x","text":"t","severity":"info","log":"/l",)"
             R"("when":["a"],"frequency":">= 5","period":"60s","state":"running"})");
     });
-    EXPECT_EQ(run({"situations", "set", "x", "--frequency", "", "--period", ""}), CLI_DONE);
+    EXPECT_EQ(run({"situations", "set", "x", "--frequency", "", "--period", ""}), CliStatus::DONE);
     EXPECT_EQ(copy(put), R"({"name":"x","text":"t","severity":"info","log":"/l","when":["a"]})");
     EXPECT_EQ(run({"situations", "set", "x", "--log", "", "--when", "", "--severity", "major"}),
-              CLI_DONE);
+              CliStatus::DONE);
     EXPECT_EQ(copy(put), R"({"name":"x","text":"t","severity":"major","frequency":">= 5",)"
                          R"("period":"60s"})");
-    EXPECT_EQ(run({"situations", "set", "x"}), CLI_USAGE);
+    EXPECT_EQ(run({"situations", "set", "x"}), CliStatus::USAGE);
 }
 
 TEST_F(ProgramTest, AnErrorNamesTheHelpToRead) {
-    EXPECT_EQ(run({"situations", "bogus"}), CLI_USAGE);
+    EXPECT_EQ(run({"situations", "bogus"}), CliStatus::USAGE);
     EXPECT_THAT(errors, EndsWith("; zrmctl situations --help lists its options\n"));
-    EXPECT_EQ(run({"situations", "show"}), CLI_USAGE);
+    EXPECT_EQ(run({"situations", "show"}), CliStatus::USAGE);
     EXPECT_THAT(errors, EndsWith("; zrmctl situations show --help lists its options\n"));
-    EXPECT_EQ(run({"bogus"}), CLI_USAGE);
+    EXPECT_EQ(run({"bogus"}), CliStatus::USAGE);
     EXPECT_EQ(errors,
               "zrmctl: 'bogus' is not a command; zrmctl --help lists commands and options\n");
     for (const char* const help : {"-h", "--help"}) {
-        EXPECT_EQ(run({"report", help}), CLI_DONE);
+        EXPECT_EQ(run({"report", help}), CliStatus::DONE);
         EXPECT_THAT(output, HasSubstr("--columns"));
     }
 }
 
 TEST_F(ProgramTest, AnEndlessDefinitionIsRefused) {
-    EXPECT_EQ(run({"backtest", "--file", "/dev/zero"}), CLI_USAGE);
+    EXPECT_EQ(run({"backtest", "--file", "/dev/zero"}), CliStatus::USAGE);
     EXPECT_EQ(errors, "zrmctl: /dev/zero is larger than 16 MiB, the most that is read\n");
-    EXPECT_EQ(run({"situations", "add", "x", "--file", directory.path().string()}), CLI_USAGE);
+    EXPECT_EQ(run({"situations", "add", "x", "--file", directory.path().string()}),
+              CliStatus::USAGE);
     EXPECT_EQ(errors, "zrmctl: cannot read " + directory.path().string() + ": Is a directory\n");
 }
 
 TEST_F(ProgramTest, AFileWithoutCertificatesIsRefused) {
     const std::string empty = directory.write("empty.pem", "nothing\n");
     const std::string url = "https://127.0.0.1:1";
-    EXPECT_EQ(run({"--url", url, "--ca-file", empty, "logs"}), CLI_USAGE);
+    EXPECT_EQ(run({"--url", url, "--ca-file", empty, "logs"}), CliStatus::USAGE);
     EXPECT_EQ(errors, "zrmctl: " + empty + " does not contain a certificate in PEM format\n");
     const std::string absent = directory.file("absent.pem");
-    EXPECT_EQ(run({"--url", url, "--ca-file", absent, "logs"}), CLI_USAGE);
+    EXPECT_EQ(run({"--url", url, "--ca-file", absent, "logs"}), CliStatus::USAGE);
     EXPECT_EQ(errors, "zrmctl: cannot read " + absent + ": No such file or directory\n");
 }
 

@@ -1,15 +1,12 @@
 #include "host/config/ConfigFile.h"
 
-#include "support/TemporaryDirectory.h"
+#include "ConfigText.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <fstream>
 #include <string>
 #include <vector>
-
-#include <sys/stat.h>
 
 using namespace zrm::host;
 
@@ -17,20 +14,6 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-
-HostConfig accepted(const std::string& text) {
-    ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    if (!result) {
-        ADD_FAILURE() << result.error().front();
-        return {};
-    }
-    return std::move(*result);
-}
-
-std::vector<std::string> refused(const std::string& text) {
-    const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
-    return result ? std::vector<std::string>{} : result.error();
-}
 
 TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
     const HostConfig config = accepted("");
@@ -125,7 +108,7 @@ TEST(ConfigFile, HttpAndSinksCanBeOff) {
 
 TEST(ConfigFile, RefusesUnknownKeysEverywhere) {
     EXPECT_THAT(
-        refused(R"(colour = "red"
+        problemsOf(R"(colour = "red"
 [agent]
 log_confg = "/etc/zrm/logs.conf"
 [http]
@@ -156,7 +139,7 @@ keep_days = 30
 
 TEST(ConfigFile, RefusesValuesOfAnotherType) {
     EXPECT_THAT(
-        refused(R"([agent]
+        problemsOf(R"([agent]
 log_config = 5
 max_rows = "many"
 trace = true
@@ -185,18 +168,18 @@ severity = { a = 1 }
 }
 
 TEST(ConfigFile, RefusesTablesOfAnotherKind) {
-    EXPECT_THAT(refused("agent = 5\nsink = 'x'\nsituation = [1]\n"),
+    EXPECT_THAT(problemsOf("agent = 5\nsink = 'x'\nsituation = [1]\n"),
                 ElementsAre("zrm.toml:1: agent: is a whole number; write it as [agent]",
                             "zrm.toml:2: sink: is a text; write it as [[sink]]",
                             "zrm.toml:3: situation: is a whole number; write it as "
                             "[[situation]]"));
-    EXPECT_THAT(refused("[situation]\nname = 'a'\n"),
+    EXPECT_THAT(problemsOf("[situation]\nname = 'a'\n"),
                 ElementsAre("zrm.toml:1: situation: is a table; write it as [[situation]]"));
 }
 
 TEST(ConfigFile, RefusesUnusableValues) {
     EXPECT_THAT(
-        refused(R"(state_directory = "zrm"
+        problemsOf(R"(state_directory = "zrm"
 [agent]
 log_config = "logs.conf"
 syslog_conf = "a\u0000b"
@@ -221,9 +204,9 @@ TEST(ConfigFile, RefusesZeroBytesInListsToo) {
     for (const std::string when : {R"("ENTRYDESC contains 'a\u0000b'")",
                                    R"(["ENTRYSRC = 'x'", "ENTRYDESC contains 'a\u0000b'"])"}) {
         EXPECT_THAT(
-            refused("[[situation]]\nname = \"a\"\ntext = \"x\"\nseverity = \"info\"\n"
-                    "log = \"/a\"\nwhen = " +
-                    when),
+            problemsOf("[[situation]]\nname = \"a\"\ntext = \"x\"\nseverity = \"info\"\n"
+                       "log = \"/a\"\nwhen = " +
+                       when),
             ElementsAre("zrm.toml:6: situation.when: contains a NUL character; leave it out"));
     }
 }
@@ -231,7 +214,7 @@ TEST(ConfigFile, RefusesZeroBytesInListsToo) {
 TEST(ConfigFile, RefusesToListenForOtherMachinesWithoutTls) {
     for (const std::string address : {"0.0.0.0:7186", "[::]:7186", "192.168.1.5:7186", "web1:80"}) {
         EXPECT_THAT(
-            refused("http.listen = \"" + address + "\""),
+            problemsOf("http.listen = \"" + address + "\""),
             ElementsAre("zrm.toml:1: http.listen: '" + address +
                         "' can be reached from other machines; write a loopback address "
                         "(127.0.0.1, [::1] or localhost), or add certificate and key, to use TLS"));
@@ -251,15 +234,15 @@ TEST(ConfigFile, ListensForOtherMachinesUnderTls) {
 }
 
 TEST(ConfigFile, RefusesHalfOfACertificate) {
-    EXPECT_THAT(refused("http.certificate = \"/c\""),
+    EXPECT_THAT(problemsOf("http.certificate = \"/c\""),
                 ElementsAre("zrm.toml:1: http.certificate: is given alone; give both certificate "
                             "and key, or neither"));
     EXPECT_THAT(
-        refused("http.key = \"/k\""),
+        problemsOf("http.key = \"/k\""),
         ElementsAre("zrm.toml:1: http.key: is given alone; give both certificate and key, or "
                     "neither"));
     EXPECT_THAT(
-        refused("http = {certificate = \"c\", key = \"k\"}"),
+        problemsOf("http = {certificate = \"c\", key = \"k\"}"),
         ElementsAre("zrm.toml:1: http.certificate: 'c' is not an absolute path; begin it with "
                     "'/'",
                     "zrm.toml:1: http.key: 'k' is not an absolute path; begin it with '/'"));
@@ -267,7 +250,7 @@ TEST(ConfigFile, RefusesHalfOfACertificate) {
 
 TEST(ConfigFile, RefusesSituationsWithoutAUniqueName) {
     EXPECT_THAT(
-        refused(R"([[situation]]
+        problemsOf(R"([[situation]]
 text = "a"
 [[situation]]
 name = ""
@@ -290,7 +273,7 @@ name = "a\nb"
 
 TEST(ConfigFile, RefusesInvalidSituations) {
     EXPECT_THAT(
-        refused(R"([[situation]]
+        problemsOf(R"([[situation]]
 name = "a"
 severity = "fatal"
 log = "auth.log"
@@ -322,14 +305,14 @@ period = "60"
 }
 
 TEST(ConfigFile, FrequencyAndPeriodGoTogether) {
-    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nfrequency = '>= 5'\n"),
+    EXPECT_THAT(problemsOf("[[situation]]\nname = 'a'\nfrequency = '>= 5'\n"),
                 ElementsAre("zrm.toml:3: situation.frequency: has no period; add period "
                             "= \"60s\""));
-    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nperiod = '60s'\n"),
+    EXPECT_THAT(problemsOf("[[situation]]\nname = 'a'\nperiod = '60s'\n"),
                 ElementsAre("zrm.toml:3: situation.period: has no frequency; add "
                             "frequency = \">= 5\""));
-    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nfrequency = '>= 5'\nperiod = '60s'\n"
-                        "when = ['PERIODTHRS = 5']\n"),
+    EXPECT_THAT(problemsOf("[[situation]]\nname = 'a'\nfrequency = '>= 5'\nperiod = '60s'\n"
+                           "when = ['PERIODTHRS = 5']\n"),
                 ElementsAre("zrm.toml:3: situation.frequency: the conditions name FREQTHRESH or "
                             "PERIODTHRS as well; leave those conditions out"));
 }
@@ -338,78 +321,6 @@ TEST(ConfigFile, ThresholdsMayBeAmongTheConditions) {
     const HostConfig config =
         accepted("[[situation]]\nname = 'a'\nwhen = ['FREQTHRESH >= 5', 'PERIODTHRS = 60']\n");
     EXPECT_EQ(config.situations.at(0).conditions.size(), 2u);
-}
-
-std::string repeated(const std::string& text, int times) {
-    std::string all;
-    for (int i = 0; i < times; ++i) {
-        all += text;
-    }
-    return all;
-}
-
-TEST(ConfigFile, DeeplyNestedTextIsRefused) {
-    constexpr int deep = 200'000;
-    const std::string name = repeated("a.", deep) + "a";
-    for (const std::string& text :
-         {name + " = 1\n", "[" + name + "]\n", "[[" + name + "]]\n", "x = {" + name + " = 1}\n",
-          repeated("'a' . ", deep) + "a = 1\n", "x = " + repeated("[", deep) + "\n",
-          "x = " + repeated("{a=", deep) + "\n", "x = \"\"\"a\"\"\"\"\"\n" + name + " = 1\n",
-          "x = '''a''''\n" + name + " = 1\n", "x = \"\\\"\"\n" + name + " = 1\n",
-          "x = '\\'\n" + name + " = 1\n", "# \"\n" + name + " = 1\n"}) {
-        const std::vector<std::string> problems = refused(text);
-        ASSERT_EQ(problems.size(), 1u) << text.substr(0, 40);
-        EXPECT_THAT(problems[0],
-                    testing::MatchesRegex("zrm.toml:[12]: names or brackets are nested "
-                                          "deeper than 32; write at most 32 levels"))
-            << text.substr(0, 40);
-    }
-}
-
-TEST(ConfigFile, BracketsInStringsAndCommentsDoNotNest) {
-    const std::string brackets = repeated("[{.", 100);
-    const HostConfig config =
-        accepted("# " + brackets + "\n[[situation]]\nname = \"\\\"" + repeated("[.", 50) +
-                 "\"\ntext = '''" + brackets + "\n''" + brackets + "'''''\n");
-    EXPECT_EQ(config.situations.at(0).name, "\"" + repeated("[.", 50));
-    EXPECT_EQ(config.situations.at(0).text, brackets + "\n''" + brackets + "''");
-}
-
-TEST(ConfigFile, NamesOnlyTheFirstOfManyProblems) {
-    const std::vector<std::string> problems = refused(repeated("[[situation]]\n", 1000));
-    ASSERT_EQ(problems.size(), 101u);
-    EXPECT_EQ(problems[99], "zrm.toml:100: situation.name: is missing; give the situation a name");
-    EXPECT_EQ(problems[100], "zrm.toml: 900 more problems; correct those above first");
-}
-
-TEST(ConfigFile, AReloadRefusesATruncatedFile) {
-    const TemporaryDirectory directory;
-    const auto reloaded = [&](const std::string& text) {
-        const std::string path = directory.write("zrm.toml", text);
-        const ConfigFile::Result result = ConfigFile::reload(path);
-        return result ? "" : result.error().front().substr(path.size());
-    };
-    const std::string whole = "[[situation]]\nname = 'a'\n";
-    EXPECT_EQ(reloaded(whole), "");
-    EXPECT_EQ(reloaded("# nothing\n"), "");
-    for (const char* const text : {"", "\n", " \r\n\t"}) {
-        EXPECT_EQ(reloaded(text), ": is empty; write the configuration into it again");
-    }
-    for (const char* const rest : {"severity = 'major'", "# cut o"}) {
-        EXPECT_EQ(reloaded(whole + rest),
-                  ":3: the file ends within this line; write the rest of it, or end the line");
-    }
-}
-
-TEST(ConfigFile, APipeIsNotRead) {
-    const TemporaryDirectory directory;
-    const std::string path = directory.file("zrm.toml");
-    ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
-    const ConfigFile::Result result = ConfigFile::load(path);
-    ASSERT_FALSE(result);
-    EXPECT_THAT(result.error(),
-                ElementsAre(path + ": is not a regular file; make it a file that the agent may "
-                                   "read, of at most 4 MiB"));
 }
 
 TEST(ConfigFile, TheRegularExpressionsOfAFileAreLimitedTogether) {
@@ -424,7 +335,7 @@ TEST(ConfigFile, TheRegularExpressionsOfAFileAreLimitedTogether) {
         return text;
     };
     EXPECT_EQ(accepted(file(50)).situations.size(), 50u);
-    const std::vector<std::string> problems = refused(file(100));
+    const std::vector<std::string> problems = problemsOf(file(100));
     ASSERT_FALSE(problems.empty());
     EXPECT_THAT(
         problems.back(),
@@ -432,69 +343,14 @@ TEST(ConfigFile, TheRegularExpressionsOfAFileAreLimitedTogether) {
             "the regular expressions before this one already reach the limit for all of them"));
 }
 
-TEST(ConfigFile, NamesThePlaceOfASyntaxError) {
-    const std::vector<std::string> problems = refused("[agent]\nlog_config = /etc/logs.conf\n");
-    ASSERT_EQ(problems.size(), 1u);
-    EXPECT_THAT(problems[0], testing::MatchesRegex("zrm.toml:2: .*; correct the TOML here"));
-}
-
-TEST(ConfigFile, LoadsFiles) {
-    const TemporaryDirectory directory;
-    const std::string path = directory.write("zrm.toml", "state_directory = \"/srv\"\n");
-    const ConfigFile::Result result = ConfigFile::load(path);
-    ASSERT_TRUE(result);
-    EXPECT_EQ(result->stateDirectory, "/srv");
-}
-
-TEST(ConfigFile, ReportsWhyAFileCannotBeRead) {
-    const TemporaryDirectory directory;
-    const auto problemsOf = [](const std::string& path) { return ConfigFile::load(path).error(); };
-    const std::string cure = "; make it a file that the agent may read, of at most 4 MiB";
-    const std::string missing = directory.file("missing.toml");
-    EXPECT_THAT(problemsOf(missing),
-                ElementsAre(missing + ": cannot be read: No such file or directory" + cure));
-    const std::string folder = directory.path();
-    EXPECT_THAT(problemsOf(folder),
-                ElementsAre(folder + ": cannot be read: Is a directory" + cure));
-    const std::string huge = directory.write("huge.toml", std::string(5 << 20, '\n'));
-    EXPECT_THAT(problemsOf(huge), ElementsAre(huge + ": cannot be read: File too large" + cure));
-}
-
-/// The blocks of a page that are indented as code and have a table of a configuration file.
-std::vector<std::string> examples(const std::string& page) {
-    std::ifstream stream(page);
-    std::vector<std::string> blocks = {""};
-    for (std::string line; std::getline(stream, line);) {
-        if (line.starts_with("    ")) {
-            blocks.back() += line.substr(4) + "\n";
-        } else if (!line.empty()) {
-            blocks.emplace_back();
-        } else if (!blocks.back().empty()) {
-            blocks.back() += "\n";
-        }
-    }
-    std::erase_if(blocks, [](const std::string& block) {
-        return !block.starts_with("[[") && block.find("\n[[") == std::string::npos;
-    });
-    return blocks;
-}
-
-TEST(ConfigFile, TheExamplesOfTheDocumentationAreAccepted) {
-    const std::vector<std::string> blocks = examples(ZRM_DOCS "/configuration.md");
-    EXPECT_EQ(blocks.size(), 9u);
-    for (const std::string& block : blocks) {
-        EXPECT_THAT(refused(block), IsEmpty()) << block;
-    }
-}
-
 TEST(ConfigFile, ReportsWhatIsWrongWithTheHistory) {
     EXPECT_THAT(
-        refused("[history]\n"
-                "enabled = \"yes\"\n"
-                "directory = \"state\"\n"
-                "keep_days = 0\n"
-                "keep_events = 1_000_000_000_001\n"
-                "keep = 1\n"),
+        problemsOf("[history]\n"
+                   "enabled = \"yes\"\n"
+                   "directory = \"state\"\n"
+                   "keep_days = 0\n"
+                   "keep_events = 1_000_000_000_001\n"
+                   "keep = 1\n"),
         ElementsAre("zrm.toml:2: history.enabled: is a text; write true or false",
                     "zrm.toml:3: history.directory: 'state' is not an absolute path; begin it "
                     "with '/'",
@@ -504,9 +360,9 @@ TEST(ConfigFile, ReportsWhatIsWrongWithTheHistory) {
                     "write a number from 1 to 1000000000000",
                     "zrm.toml:6: history.keep: unknown key; the keys here are enabled, "
                     "directory, keep_days, keep_events"));
-    EXPECT_THAT(refused("history = true"),
+    EXPECT_THAT(problemsOf("history = true"),
                 ElementsAre("zrm.toml:1: history: is a boolean; write it as [history]"));
-    EXPECT_THAT(refused("[history]\nkeep_days = 1.5\nkeep_events = \"all\"\n"),
+    EXPECT_THAT(problemsOf("[history]\nkeep_days = 1.5\nkeep_events = \"all\"\n"),
                 ElementsAre("zrm.toml:2: history.keep_days: is a number with a fraction; write a "
                             "whole number",
                             "zrm.toml:3: history.keep_events: is a text; write a whole number"));
