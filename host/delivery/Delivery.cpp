@@ -4,6 +4,7 @@
 #include "host/base/Say.h"
 #include "host/events/QueueSource.h"
 #include "host/framework/EventRoomControl.h"
+#include "host/history/HistoryDirectory.h"
 #include "host/sinks/SinkFactory.h"
 
 #include <cinttypes>
@@ -17,14 +18,25 @@ TRC1_Anchor anchor{"Delivery.cpp"};
 
 constexpr std::size_t queuedEvents = 2048; ///< about 6 MB of Log Entries rows
 
+const std::string& directoryOf(const HostConfig& config) {
+    return config.history.directory.empty() ? config.stateDirectory : config.history.directory;
+}
+
+/// The id after which events are numbered. Without a history that is configured, those that it has
+/// reserved are not given again.
+std::uint64_t newestId(const HostConfig& config, const History* history) {
+    if (history != nullptr) {
+        return history->newest();
+    }
+    return config.history.enabled ? HistoryDirectory::reservedIdsIn(directoryOf(config)) : 0;
+}
+
 /// The configured history; null with the reason when it cannot be opened.
 std::unique_ptr<History> openHistory(const HostConfig& config, std::string& problem) {
     if (!config.history.enabled) {
         return nullptr;
     }
-    const std::string& directory =
-        config.history.directory.empty() ? config.stateDirectory : config.history.directory;
-    auto opened = History::open(config.history, directory);
+    auto opened = History::open(config.history, directoryOf(config));
     if (opened) {
         return std::move(*opened);
     }
@@ -39,7 +51,7 @@ std::unique_ptr<History> openHistory(const HostConfig& config, std::string& prob
 
 Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize)
     : m_format(layout), m_history(openHistory(config, m_historyProblem)),
-      m_queue(queuedEvents, rowSize, m_history == nullptr ? 0 : m_history->newest()) {
+      m_queue(queuedEvents, rowSize, newestId(config, m_history.get())) {
     m_queue.onFull(EventRoomControl::setFull);
     for (const SinkConfig& sink : config.sinks) {
         m_sinks.push_back(
