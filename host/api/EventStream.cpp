@@ -17,6 +17,7 @@
 #include <optional>
 #include <stop_token>
 #include <string>
+#include <system_error>
 #include <thread>
 #include <utility>
 #include <vector>
@@ -79,6 +80,8 @@ public:
     std::shared_ptr<void> takePlace();
     std::size_t count() const noexcept { return m_places->load(); }
 
+    /// Starts the thread with the first client; false when the system has none.
+    bool start();
     void add(EventFilter filter, std::shared_ptr<void> place, std::shared_ptr<BodyChannel> channel);
     /// A client may take more, or has gone. Never waits for long.
     void wake();
@@ -107,7 +110,6 @@ private:
     std::vector<Follower> m_new; ///< not yet known to the thread
     std::stop_source m_wake;     ///< ends the thread's wait
     bool m_isEnding = false;
-    bool m_isRunning = false; ///< the thread will look at what is new
     std::thread m_thread;
 };
 
@@ -115,6 +117,19 @@ std::shared_ptr<void> EventStream::Followers::takePlace() {
     const bool isTooMany = ++*m_places > mostClients;
     std::shared_ptr<void> place(m_places.get(), [places = m_places](void*) { --*places; });
     return isTooMany ? nullptr : place;
+}
+
+bool EventStream::Followers::start() {
+    const std::lock_guard guard(m_mutex);
+    if (m_isEnding || m_thread.joinable()) {
+        return true;
+    }
+    try {
+        m_thread = std::thread(&Followers::run, this);
+        return true;
+    } catch (const std::system_error&) {
+        return false;
+    }
 }
 
 void EventStream::Followers::add(EventFilter filter, std::shared_ptr<void> place,
@@ -128,13 +143,6 @@ void EventStream::Followers::add(EventFilter filter, std::shared_ptr<void> place
     m_new.push_back(
         {std::move(filter), std::move(place), std::move(channel), Clock::now() + m_interval});
     m_wake.request_stop();
-    if (!m_isRunning) {
-        if (m_thread.joinable()) {
-            m_thread.join(); // it has just ended, for want of clients
-        }
-        m_thread = std::thread(&Followers::run, this);
-        m_isRunning = true;
-    }
 }
 
 void EventStream::Followers::wake() {
@@ -162,17 +170,14 @@ void EventStream::Followers::run() {
             const std::lock_guard guard(m_mutex);
             std::move(m_new.begin(), m_new.end(), std::back_inserter(followers));
             m_new.clear();
-            if (m_isEnding || followers.empty()) {
-                m_isRunning = false;
+            if (m_isEnding) {
                 break;
             }
             m_wake = std::stop_source(); // what happens from here on ends the next wait
             wake = m_wake.get_token();
         }
         std::erase_if(followers, [&](Follower& follower) { return !serve(follower); });
-        if (!followers.empty()) {
-            waitForChange(followers, wake);
-        }
+        waitForChange(followers, wake);
     }
     for (const Follower& follower : followers) {
         follower.channel->end();
@@ -274,6 +279,9 @@ HttpAnswer EventStream::open(const HttpRequest& request) {
                              "too many clients are following the events: at most " +
                                  std::to_string(mostClients),
                              "");
+    }
+    if (!m_followers->start()) { // before the client hears that it follows the events
+        throw RequestRefused(503, "the agent has no thread for the stream: try again", "");
     }
     HttpAnswer answer;
     answer.contentType = "text/event-stream";

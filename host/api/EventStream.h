@@ -12,9 +12,9 @@ namespace zrm::host {
 
 class HistoryReader;
 
-/// `GET /api/v1/events/stream`: events as they are committed, as server-sent events. One thread
-/// serves all clients while there are any, and sends each as much as its connection takes. A client
-/// that reads too slowly is disconnected and can continue where it was.
+/// `GET /api/v1/events/stream`: events as they are committed, as server-sent events. One thread,
+/// started for the first client, serves all of them and sends each as much as its connection takes.
+/// A client that reads too slowly is disconnected and can continue where it was.
 class EventStream : public Resource {
 public:
     static constexpr std::size_t mostClients = 32;

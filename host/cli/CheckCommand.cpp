@@ -10,6 +10,8 @@
 #include "host/sources/FoundLogsJson.h"
 
 #include <algorithm>
+#include <optional>
+#include <utility>
 #include <variant>
 #include <vector>
 
@@ -50,15 +52,21 @@ std::string textOf(const ConfigCheck::Line& line, const Terminal& terminal) {
     return text;
 }
 
-/// Says why an agent that runs would not load this content: it takes it for one that is still
-/// being written. A start loads it.
-void noteUnfinished(const std::string& content, const std::string& path) {
+/// What should be known about a configuration that can be used. An agent that runs does not load
+/// one that looks as if it were still being written; a start loads it.
+std::vector<std::string> notesOn(const HostConfig& config, const std::string& content,
+                                 const std::string& path) {
+    std::vector<std::string> notes;
     if (content.find_first_not_of(" \t\r\n") == std::string::npos) {
-        Context::note(path + " is empty: a running agent does not load it");
+        notes.push_back(path + " is empty: a running agent does not load it");
     } else if (content.back() != '\n') {
-        Context::note(path + " has no newline after its last line: a running agent does not load "
-                             "it; add the newline");
+        notes.push_back(path + " has no newline after its last line: a running agent does not load "
+                               "it; add the newline");
     }
+    if (std::optional<std::string> warning = warningOfSecrets(config, path)) {
+        notes.push_back(std::move(*warning));
+    }
+    return notes;
 }
 
 /// What the [[log]] tables match on this machine now.
@@ -139,26 +147,25 @@ CliStatus CheckCommand::checkHost(Context& context) const {
     const std::string content = InputFile(m_host).text();
     const ConfigFile::Result result = ConfigFile::parse(content, m_host);
     const std::vector<std::string> problems = result ? std::vector<std::string>() : result.error();
+    const std::vector<std::string> notes =
+        result ? notesOn(*result, content, m_host) : std::vector<std::string>();
     if (context.options().json) {
-        Json answer{{"accepted", problems.empty()}, {"problems", problems}};
+        Json answer{{"accepted", problems.empty()}, {"problems", problems}, {"notes", notes}};
         if (result && !result->logs.empty()) {
             answer["logs"] = foundLogsJson(find(*result));
         }
         context.printJson(answer);
-    } else if (problems.empty()) {
+        return problems.empty() ? CliStatus::DONE : CliStatus::REFUSED;
+    }
+    if (problems.empty()) {
         std::string text = DisplayText::visible(m_host) + " can be used\n";
         for (const FoundLogs::Source& source : find(*result).sources) {
             text += textOf(source, context.terminal());
         }
         context.print(text);
-        noteUnfinished(content, m_host);
-        if (const auto warning = warningOfSecrets(*result, m_host)) {
-            Context::note(*warning);
-        }
-    } else {
-        for (const std::string& problem : problems) {
-            Context::note(problem);
-        }
+    }
+    for (const std::string& text : problems.empty() ? notes : problems) {
+        Context::note(text);
     }
     return problems.empty() ? CliStatus::DONE : CliStatus::REFUSED;
 }

@@ -4,6 +4,7 @@
 #include "host/base/Say.h"
 #include "host/events/QueueSource.h"
 #include "host/framework/EventRoomControl.h"
+#include "host/history/HistoryDirectory.h"
 #include "host/sinks/SinkFactory.h"
 
 #include <cinttypes>
@@ -17,14 +18,25 @@ TRC1_Anchor anchor{"Delivery.cpp"};
 
 constexpr std::size_t queuedEvents = 2048; ///< about 6 MB of Log Entries rows
 
+const std::string& directoryOf(const HostConfig& config) {
+    return config.history.directory.empty() ? config.stateDirectory : config.history.directory;
+}
+
+/// The id after which events are numbered. Without a history that is configured, those that it has
+/// reserved are not given again.
+std::uint64_t newestId(const HostConfig& config, const History* history) {
+    if (history != nullptr) {
+        return history->newest();
+    }
+    return config.history.enabled ? HistoryDirectory::reservedIdsIn(directoryOf(config)) : 0;
+}
+
 } // namespace
 
 OpenedHistory openHistory(const HostConfig& config) {
     OpenedHistory result;
     if (config.history.enabled) {
-        const std::string& directory =
-            config.history.directory.empty() ? config.stateDirectory : config.history.directory;
-        auto opened = History::open(config.history, directory);
+        auto opened = History::open(config.history, directoryOf(config));
         if (opened) {
             result.history = std::move(*opened);
         } else {
@@ -43,7 +55,7 @@ Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_
                    OpenedHistory opened)
     : m_format(layout), m_historyProblem(std::move(opened.problem)),
       m_history(std::move(opened.history)),
-      m_queue(queuedEvents, rowSize, m_history == nullptr ? 0 : m_history->newest()),
+      m_queue(queuedEvents, rowSize, newestId(config, m_history.get())),
       m_positions(PositionBook::current()) {
     m_positions->setQueue(&m_queue);
     m_queue.onFull(EventRoomControl::setFull);

@@ -86,6 +86,9 @@ std::string TraceControl::levels() {
 
 Result<void> TraceControl::openFile(const std::string& path) {
     const int error = TraceOutput::open(path.c_str());
+    if (error == ELOOP) {
+        return refused(path + " is a symbolic link, which is not followed", "name the file itself");
+    }
     return error == 0 ? Result<void>() : refused(because("cannot open " + path, error));
 }
 

@@ -32,7 +32,9 @@ const TraceFile* g_opened = nullptr; ///< the latest file, also when standard er
 std::atomic<std::time_t> g_lastCheck{0};
 
 int openToAppend(const char* path) noexcept {
-    return ::open(path, O_WRONLY | O_APPEND | O_CREAT | O_NONBLOCK | O_CLOEXEC | O_NOCTTY, 0640);
+    constexpr int flags =
+        O_WRONLY | O_APPEND | O_CREAT | O_NONBLOCK | O_CLOEXEC | O_NOCTTY | O_NOFOLLOW;
+    return ::open(path, flags, 0640);
 }
 
 /// Puts `fd` in the place of `target`, which writers go on using, and returns `target`.

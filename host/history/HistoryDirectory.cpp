@@ -71,6 +71,17 @@ bool lockWhole(int fd) {
 /// Numbers in the lock file overwrite each other.
 constexpr int digitsOfId = 20;
 
+/// The ids that a lock file says are reserved; 0 when it does not.
+std::uint64_t idsIn(int lock) {
+    std::array<char, digitsOfId> text{};
+    const ssize_t length = pread(lock, text.data(), text.size(), 0);
+    std::uint64_t last = 0;
+    const char* const end = text.data() + std::max<ssize_t>(length, 0);
+    const auto [stop, error] = std::from_chars(text.data(), end, last);
+    constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max() / 2;
+    return length == digitsOfId && error == std::errc() && stop == end && last <= mostId ? last : 0;
+}
+
 std::string timeNow() {
     const std::time_t now = WallClock::seconds();
     std::tm utc{};
@@ -153,13 +164,18 @@ void HistoryDirectory::reserveIds(std::uint64_t last) const {
 }
 
 std::uint64_t HistoryDirectory::reservedIds() const {
-    std::array<char, digitsOfId> text{};
-    const ssize_t length = pread(m_lock, text.data(), text.size(), 0);
-    std::uint64_t last = 0;
-    const char* const end = text.data() + std::max<ssize_t>(length, 0);
-    const auto [stop, error] = std::from_chars(text.data(), end, last);
-    constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max() / 2;
-    return length == digitsOfId && error == std::errc() && stop == end && last <= mostId ? last : 0;
+    return idsIn(m_lock);
+}
+
+std::uint64_t HistoryDirectory::reservedIdsIn(const std::string& directory) {
+    const int fd =
+        ::open(lockPathIn(directory).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
+    if (fd == -1) {
+        return 0;
+    }
+    const std::uint64_t last = idsIn(fd);
+    close(fd);
+    return last;
 }
 
 Result<void> HistoryDirectory::makeFile() const {

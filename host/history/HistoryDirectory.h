@@ -38,6 +38,9 @@ public:
     void reserveIds(std::uint64_t last) const;
     /// The last id that may be in use; 0 when unknown.
     std::uint64_t reservedIds() const;
+    /// The same of a directory that cannot be opened, and that this process does not have open: a
+    /// lock of this process would be lost.
+    static std::uint64_t reservedIdsIn(const std::string& directory);
 
     /// Renames the file to a name with the time it was found corrupt, creates an empty one, and
     /// logs it. Nobody may have the file open.
@@ -50,7 +53,10 @@ private:
     Result<void> lock();
     /// Creates the file if it is missing.
     Result<void> makeFile() const;
-    std::string lockPath() const { return m_directory + "/history.lock"; }
+    std::string lockPath() const { return lockPathIn(m_directory); }
+    static std::string lockPathIn(const std::string& directory) {
+        return directory + "/history.lock";
+    }
     bool hasLock() const;
 
     const std::string m_directory;

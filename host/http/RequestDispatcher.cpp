@@ -188,8 +188,10 @@ HttpAnswer RequestDispatcher::refuse(const Admission& admission, const Refusal& 
 }
 
 void RequestDispatcher::count(const Admission& admission, const HttpAnswer& answer) {
-    m_statistics.count(admission.method, admission.route, answer.status,
-                       std::chrono::steady_clock::now() - admission.begin);
+    if (!admission.isCounted->exchange(true)) {
+        m_statistics.count(admission.method, admission.route, answer.status,
+                           std::chrono::steady_clock::now() - admission.begin);
+    }
 }
 
 void RequestDispatcher::setGuard(RequestGuard guard) {

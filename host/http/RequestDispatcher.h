@@ -8,6 +8,7 @@
 #include "host/http/RequestStatistics.h"
 #include "host/http/Router.h"
 
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <cstddef>
@@ -68,6 +69,9 @@ public:
         std::string route;
         std::chrono::steady_clock::time_point begin;
         std::optional<HttpAnswer> refusal; ///< the answer, where a rule speaks against the request
+        /// Whether its answer is in the statistics: a handler may end after the request was refused
+        /// for taking too long. Shared by the threads that may answer.
+        std::shared_ptr<std::atomic<bool>> isCounted = std::make_shared<std::atomic<bool>>(false);
     };
 
     /// `router` outlives the object.
@@ -102,6 +106,7 @@ public:
 
 private:
     void tryAdmit(IncomingRequest& incoming, Admission& admission);
+    /// Counts the first answer to a request.
     void count(const Admission& admission, const HttpAnswer& answer);
     std::shared_ptr<const RequestGuard> guard();
 

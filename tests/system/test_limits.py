@@ -1,5 +1,6 @@
 """Starts with fewer threads or descriptors than the agent would take."""
 
+import http.client
 import os
 import subprocess
 from pathlib import Path
@@ -7,7 +8,7 @@ from pathlib import Path
 import pytest
 
 from api import Api
-from conftest import syslog_line
+from conftest import PATIENCE, syslog_line
 
 
 @pytest.fixture(scope="session")
@@ -27,13 +28,7 @@ def test_a_start_without_a_thread_ends_with_one_sentence(agents, few_threads, hi
         agent.situation(log=agent.log())
         agent.more_sinks = [{"type": "jsonl", "path": str(agent.directory / "more.jsonl")}]
         agent.history = {"enabled": history}
-        agent.environment.update(
-            {
-                "LD_PRELOAD": str(few_threads),
-                "THREADS": str(threads),
-                "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
-            }
-        )
+        agent.environment.update(preloaded(few_threads) | {"THREADS": str(threads)})
         agent.start(trace="error", wait=False)
         try:
             ends.append(agent.process.wait(15))
@@ -49,6 +44,33 @@ def test_a_start_without_a_thread_ends_with_one_sentence(agents, few_threads, hi
     assert ends[0] == 255 and ends[-1] is None
     assert set(ends) == {255, None}, ends
     assert ends.index(None) >= 3, ends
+
+
+def test_a_stream_without_a_thread_is_refused(agent, few_threads):
+    agent.situation(log=agent.log())
+    agent.listen = "127.0.0.1:0"
+    no_threads = agent.directory / "no-threads"
+    agent.environment.update(preloaded(few_threads) | {"NO_THREADS": str(no_threads)})
+    agent.start()
+    api = Api(agent)
+    assert api.request("GET", "/healthz")[0] == 200  # a worker for short requests has been started
+    no_threads.touch()
+    status, _, problem = api.request("GET", "/api/v1/events/stream")
+    assert (status, problem["detail"]) == (503, "the agent has no thread for the stream: try again")
+    no_threads.unlink()
+    connection = http.client.HTTPConnection("127.0.0.1", api.port, timeout=PATIENCE)
+    connection.request("GET", "/api/v1/events/stream", headers={"Authorization": f"Bearer {api.token}"})
+    response = connection.getresponse()
+    assert (response.status, response.readline()) == (200, b"retry: 2000\n")
+    connection.close()
+    assert agent.stop() == 0
+
+
+def preloaded(library):
+    return {
+        "LD_PRELOAD": str(library),
+        "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
+    }
 
 
 def says_why(said):

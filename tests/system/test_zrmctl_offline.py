@@ -124,9 +124,15 @@ def test_the_host_configuration(tmp_path):
         (tmp_path / "unfinished.toml").write_text(content)
         unfinished = str(tmp_path / "unfinished.toml")
         assert run("check", "--host", unfinished) == (f"{unfinished} can be used\n", f"zrmctl: {unfinished}{note}")
+        assert json.loads(run("check", "--host", unfinished, "--json")[0]) == {
+            "accepted": True,
+            "problems": [],
+            "notes": [unfinished + note.rstrip("\n")],
+        }
     assert json.loads(run("check", "--host", path, "--json")[0]) == {
         "accepted": True,
         "problems": [],
+        "notes": [],
     }
     path.write_text("[history]\nkeep_days = 0\nkept = 1\n")
     out, err = run("check", "--host", path, status=1)

@@ -74,6 +74,26 @@ TEST_F(DeliveryTest, EverySinkGetsEveryEventWithAndWithoutAHistory) {
     }
 }
 
+TEST_F(DeliveryTest, GoesOnBehindTheReservedIdsWhereTheHistoryCannotBeOpened) {
+    const std::string file = directory.file("a.jsonl");
+    const HostConfig config = configFor({file});
+    std::filesystem::create_directories(config.stateDirectory + "/history.db"); // not a file
+    std::ofstream(config.stateDirectory + "/history.lock") << "00000000000000065536\n";
+    testing::internal::CaptureStderr();
+    {
+        Delivery delivery(config, testLayout(), sizeof(TestRow));
+        ASSERT_EQ(delivery.history(), nullptr);
+        delivery.start();
+        push(delivery, "a");
+        delivery.finish(Clock::now() + 10s);
+    }
+    EXPECT_TRUE(
+        testing::internal::GetCapturedStderr().starts_with("zrmagent: the history is off: "));
+    std::string line;
+    std::getline(std::ifstream(file), line);
+    EXPECT_TRUE(line.starts_with("{\"id\":65537,")) << line;
+}
+
 TEST_F(DeliveryTest, ReportsWhatWasNotDelivered) {
     const std::string good = directory.file("good.jsonl");
     const HostConfig used = configFor({"/dev/full", good}, false);

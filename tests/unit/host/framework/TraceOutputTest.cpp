@@ -1,5 +1,6 @@
 #include "host/framework/TraceOutput.h"
 
+#include "host/framework/TraceControl.h"
 #include "support/Faults.h"
 #include "support/TemporaryDirectory.h"
 
@@ -14,6 +15,7 @@
 #include <thread>
 
 #include <sys/stat.h>
+#include <unistd.h>
 
 using namespace zrm::host;
 
@@ -46,6 +48,26 @@ TEST_F(TraceOutputTest, AppendsToTheFile) {
     write("one\n");
     write("two\n");
     EXPECT_EQ(contentOf("trace"), "before\none\ntwo\n");
+}
+
+TEST_F(TraceOutputTest, DoesNotFollowALink) {
+    directory.write("target", "kept\n");
+    const std::string link = directory.file("trace");
+    ASSERT_EQ(symlink(directory.file("target").c_str(), link.c_str()), 0);
+    EXPECT_EQ(TraceOutput::open(link.c_str()), ELOOP);
+    const auto opened = TraceControl::openFile(link);
+    ASSERT_FALSE(opened);
+    EXPECT_EQ(opened.error().text(),
+              link + " is a symbolic link, which is not followed; name the file itself");
+    // Nor does a file that was opened before go on there.
+    unlink(link.c_str());
+    ASSERT_EQ(TraceOutput::open(link.c_str()), 0);
+    write("one\n");
+    ASSERT_EQ(rename(link.c_str(), directory.file("moved").c_str()), 0);
+    ASSERT_EQ(symlink(directory.file("target").c_str(), link.c_str()), 0);
+    write("two\n", 5);
+    EXPECT_EQ(contentOf("target"), "kept\n");
+    EXPECT_EQ(contentOf("moved"), "one\ntwo\n");
 }
 
 TEST_F(TraceOutputTest, CreatesAFileThatOthersCannotRead) {
