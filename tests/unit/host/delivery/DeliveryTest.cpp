@@ -81,7 +81,7 @@ TEST_F(DeliveryTest, GoesOnBehindTheReservedIdsWhereTheHistoryCannotBeOpened) {
     std::ofstream(config.stateDirectory + "/history.lock") << "00000000000000065536\n";
     testing::internal::CaptureStderr();
     {
-        Delivery delivery(config, testLayout(), sizeof(TestRow));
+        Delivery delivery(config, testLayout(), sizeof(TestRow), openHistory(config));
         ASSERT_EQ(delivery.history(), nullptr);
         delivery.start();
         push(delivery, "a");
