@@ -121,6 +121,7 @@ private:
         NOTHING, ///< the value is complete
     };
 
+    // cppcheck-suppress uninitMemberVarPrivate ; nothing of the buffer is read before it is written
     explicit JsonWriter(std::string& out) noexcept : m_out(out) {}
     [[noreturn]] static void misused(const char* problem);
     void finish();
