@@ -54,8 +54,8 @@ public:
     /// must not call the queue.
     void onFull(std::function<void(bool isFull)> listener) { m_listener = std::move(listener); }
 
-    /// Copies one row. False when the queue is closed, so that the row was not taken. Where the calling
-    /// thread collects the events of an entry, the row is collected.
+    /// Copies one row. False when the queue is closed, so that the row was not taken. Where the
+    /// calling thread collects the events of an entry, the row is collected.
     bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
 
     /// Copies all events of an entry, which stay together. The last one carries the position behind

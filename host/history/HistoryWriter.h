@@ -27,12 +27,12 @@
 namespace zrm::host {
 
 /// The only writer of the history, on its own thread: takes events from the queue, stores them in
-/// batches and publishes them; stores the sinks' cursors, the logs' positions and the rates; removes
-/// expired events, a few at a time. The events of an entry are stored in one transaction with the
-/// position behind it, and a position without events is stored after the events before it. A failure
-/// is reported once and retried after growing pauses while the events stay in the queue: nothing is
-/// lost, and the logs wait. A corrupt file is replaced by a new one, and removed files are created
-/// again.
+/// batches and publishes them; stores the sinks' cursors, the logs' positions and the rates;
+/// removes expired events, a few at a time. The events of an entry are stored in one transaction
+/// with the position behind it, and a position without events is stored after the events before it.
+/// A failure is reported once and retried after growing pauses while the events stay in the queue:
+/// nothing is lost, and the logs wait. A corrupt file is replaced by a new one, and removed files
+/// are created again.
 class HistoryWriter {
 public:
     using Clock = EventQueue::Clock;
@@ -102,7 +102,7 @@ private:
     Clock::time_point m_nextHousekeeping{};
     Clock::time_point m_nextTending{}; ///< of the cursors
     Clock::time_point m_nextTendingOfPositions;
-    bool m_hasMoreToDo = false;        ///< housekeeping that was not finished
+    bool m_hasMoreToDo = false; ///< housekeeping that was not finished
     RetryPause m_pause;
     std::atomic<std::uint64_t> m_oldest{0};
 

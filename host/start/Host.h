@@ -31,8 +31,9 @@ public:
     Host(const Host&) = delete;
     Host& operator=(const Host&) = delete;
 
-    /// Sets the configuration that was read from this file at start-up, and the notifier of start and
-    /// orderly stop. Opens the history, whose positions the first log needs. Main thread, first.
+    /// Sets the configuration that was read from this file at start-up, and the notifier of start
+    /// and orderly stop. Opens the history, whose positions the first log needs. Main thread,
+    /// first.
     void configure(HostConfig config, WatchedFile file, ServiceNotifier notifier = {});
     /// Finds the logs of the configuration for the log manager, which must not exist yet.
     /// `traceFile`: where the trace goes; empty: not to a file. Main thread, after configure.

@@ -17,9 +17,10 @@ std::string jsonOf(const LogLedgerView& ledger, bool withSamples) {
 
 TEST(LogLedgers, WritesWhatWasReadAndSkipped) {
     LogLedgerView ledger;
-    EXPECT_EQ(jsonOf(ledger, false),
-              R"({"bytes_read":0,"lines":0,"rows":0,"format_errors":0,"without_time":0,)"
-              R"("truncations":0,"skipped_bytes":0,"restarts":0,"last_entry":null,"warnings":[]})");
+    EXPECT_EQ(
+        jsonOf(ledger, false),
+        R"({"bytes_read":0,"lines":0,"rows":0,"format_errors":0,"without_time":0,)"
+        R"("truncations":0,"skipped_bytes":0,"restarts":0,"last_entry":null,"follow":null,"warnings":[]})");
     ledger.bytesRead = 1;
     ledger.lines = 2;
     ledger.rows = 3;
@@ -34,7 +35,7 @@ TEST(LogLedgers, WritesWhatWasReadAndSkipped) {
     ledger.skipped = {{4000, 5, 6, std::nullopt, true}, {5000, 0, 1, 9, false}};
     const std::string numbers =
         R"({"bytes_read":1,"lines":2,"rows":3,"format_errors":4,"without_time":5,"truncations":6,)"
-        R"("skipped_bytes":7,"restarts":8,"last_entry":"1970-01-01T00:00:01.000Z",)"
+        R"("skipped_bytes":7,"restarts":8,"last_entry":"1970-01-01T00:00:01.000Z","follow":null,)"
         R"("warnings":[{"kind":"missing","since":"1970-01-01T00:00:02.000Z",)"
         R"("text":"It is gone."}])";
     EXPECT_EQ(jsonOf(ledger, false), numbers + "}");
