@@ -135,6 +135,7 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
 void FileFollower::enter() {
     const Member& member = m_chain.front();
     m_block.start(member.from, member.tail);
+    m_head = Tail{};
     m_isInBlock = false;
     m_isAtEnd = false;
     m_hasSeen = false;
@@ -295,6 +296,9 @@ char* FileFollower::next() {
         switch (m_block.fill(*m_chain.front().file)) {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
+            if (m_head.length < Tail::size) {
+                noteHead();
+            }
             succeed(m_readRetry);
             break;
         case EntryBlock::Fill::changed:

@@ -99,6 +99,8 @@ private:
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
     void insertMissed();
+    void noteHead();
+    void dropShortCopy(Found& found, std::int64_t offset) const;
     void recover();
     void prepend(Found& found);
     void continueIn(Member& next);
@@ -131,6 +133,7 @@ private:
     LogPosition m_position; ///< if it is not in the block
     bool m_hasPosition = false;
     bool m_isInBlock = false;    ///< the position is the block's, in the file that is read
+    Tail m_head;                 ///< the first bytes of the file that is read
     bool m_isAtEnd = false;      ///< the last read found the end of the file
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
     bool m_hasSeen = false;

@@ -1,6 +1,7 @@
 #include "monitor/FileFollower.h"
 
 #include <algorithm>
+#include <array>
 #include <iterator>
 #include <utility>
 
@@ -69,6 +70,36 @@ void FileFollower::insertMissed() {
     enter();
 }
 
+/// A copy that was made before a truncation is recognised by its beginning.
+void FileFollower::noteHead() {
+    Generation& file = *m_chain.front().file;
+    std::array<char, Tail::size> bytes;
+    if (file.isCompressed()) {
+        return; // never truncated
+    }
+    const std::ptrdiff_t count = file.readAt(bytes.data(), bytes.size(), 0);
+    if (count > 0) {
+        m_head.assign(bytes.data(),
+                      static_cast<std::size_t>(std::min<std::int64_t>(count, m_block.readTo())));
+    }
+}
+
+/// What was written between the copy and the truncation may have been read, so that the copy ends
+/// before the position. All of it was read then, although its time is younger.
+void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
+    const auto isShortCopy = [&](const Member& member) {
+        std::array<char, Tail::size> bytes;
+        const std::ptrdiff_t length = member.file->readAt(bytes.data(), m_head.length, 0);
+        return length > 0 &&
+               std::equal(bytes.begin(), bytes.begin() + length, m_head.bytes.begin()) &&
+               member.file->readAt(bytes.data(), 1, offset) <= 0;
+    };
+    const auto copy = std::find_if(found.younger.begin(), found.younger.end(), isShortCopy);
+    if (copy != found.younger.end()) {
+        found.younger.erase(copy);
+    }
+}
+
 /// The file no longer has what was read of it: it was truncated. The rest of the old contents is
 /// read from a copy, as far as there is one; then the file is read from its beginning.
 void FileFollower::recover() {
@@ -82,6 +113,9 @@ void FileFollower::recover() {
     truncated.tail = Tail{};
     const bool isOwn = identityOf(at) == truncated.file->identity();
     Found found = find(at, Search::byContents, nullptr);
+    if (isOwn && !found.holder) {
+        dropShortCopy(found, at.offset);
+    }
     if (isOwn ? !found.holder : found.younger.empty()) {
         const std::int64_t from = isOwn ? at.offset : 0;
         m_ledger.noteLost(from, std::max(from, known));

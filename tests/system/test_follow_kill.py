@@ -6,7 +6,7 @@ import random
 import sqlite3
 import time
 from collections import defaultdict
-from signal import SIGKILL
+from signal import SIGKILL, SIGTERM
 
 import pytest
 from conftest import syslog_line, wait_until
@@ -69,7 +69,8 @@ class Writer:
 
 
 @pytest.mark.slow
-def test_a_killed_agent_raises_each_event_once_and_in_order(agent):
+@pytest.mark.parametrize("number, ends", [(SIGKILL, KILLS), (SIGTERM, KILLS // 3)], ids=("killed", "stopped"))
+def test_an_agent_that_ends_under_load_raises_each_event_once_and_in_order(agent, number, ends):
     print(f"seed {SEED}")
     dice = random.Random(SEED)
     agent.sink = None
@@ -99,13 +100,14 @@ def test_a_killed_agent_raises_each_event_once_and_in_order(agent):
 
     for writer in writers:
         writer.write()
-    for number in range(KILLS):
-        agent.start(wait=False, trace="error")
-        if number == 0:  # from here on there are positions
+    for run in range(ends):
+        agent.start(wait=number == SIGTERM)  # it takes the signal once it has blocked it
+        if run == 0:  # from here on there are positions
             wait_until(lambda: len(stored(agent)) >= len(writers), "events of every log")
         work(dice.uniform(0.1, 3))
-        agent.send(SIGKILL)
-        agent.wait_end()
+        agent.send(number)
+        assert agent.wait_end() == (-SIGKILL if number == SIGKILL else 0)
+        assert "were not read" not in agent.stderr.text()  # the next run reads them
         work(dice.uniform(0, 0.2))  # while nobody reads
     for writer in writers:
         writer.write()
@@ -123,4 +125,4 @@ def test_a_killed_agent_raises_each_event_once_and_in_order(agent):
         name = writer.path.name
         assert raised["every", name] == list(range(1, writer.last + 1)), f"seed {SEED}, {name}"
         assert raised["fifth", name] == list(range(5, writer.last + 1, 5)), f"seed {SEED}, {name}"
-    assert sum(writer.rotations for writer in writers) > KILLS // 2
+    assert sum(writer.rotations for writer in writers) > ends // 2

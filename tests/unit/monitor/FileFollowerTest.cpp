@@ -183,6 +183,25 @@ TEST_F(FileFollowerTest, RecoversFromACopyWhatATruncationRemoved) {
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(FileFollowerTest, DoesNotReadACopyAgainThatEndsBeforeThePosition) {
+    for (const std::size_t length : {std::size_t{3}, std::size_t{400}}) {
+        fs::remove(file("app.log.1"));
+        look();
+        const std::string line = std::string(length, 'x') + "\n";
+        append(line);
+        EXPECT_EQ(look(), line);
+        fs::copy_file(m_path, file("app.log.1"));
+        append("between\n");
+        EXPECT_EQ(look(), "between\n"); // before the truncation
+        // As if the copy had been made while the follower was reading.
+        fs::last_write_time(file("app.log.1"), fs::last_write_time(m_path) + seconds(1));
+        fs::resize_file(m_path, 0);
+        append("new\n");
+        EXPECT_EQ(looks(3), "new\n");
+    }
+    EXPECT_EQ(m_ledger.recoveredBytes(), 0);
+}
+
 TEST_F(FileFollowerTest, RecoversFromACompressedCopy) {
     look();
     append("a\n");
