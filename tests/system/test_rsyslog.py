@@ -1,7 +1,6 @@
 """A real system logger writes what real programs send."""
 
 import os
-import re
 import subprocess
 import tempfile
 import time
@@ -9,7 +8,7 @@ from pathlib import Path
 
 import pytest
 
-from conftest import PATIENCE, ROOT, wait_until
+from conftest import PATIENCE, wait_until
 
 CONFIGURATION = """\
 module(load="imuxsock" SysSock.Use="off")
@@ -92,16 +91,13 @@ def test_what_programs_log_becomes_events(agent, system_logger):
     assert len(events) == 4
 
 
-def test_the_layout_that_dev_run_writes_reads_iso_times(agent, system_logger):
-    text = (ROOT / "dev").read_text()
-    layout = re.search(r"local iso='([^']+)'", text).group(1)
-    rest = re.search(r'echo "\$1 ;N ;U ;\$iso ([a-z ]+)"', text).group(1)
-    agent.configure(f"{system_logger.iso} ;N ;U ;{layout} {rest}")
+def test_a_followed_log_of_iso_times_needs_no_layout(agent, system_logger):
+    agent.follow(system_logger.iso, start="beginning")
     agent.situation(log=system_logger.iso)
     agent.start()
     before = time.strftime("%m%d%H%M%S")
     system_logger.send("sshd[77]", "auth.info", "Failed password for root from 203.0.113.7")
-    (event,) = agent.wait_events(1)
+    _, event = agent.wait_events(2)  # the first was there before the start
     row = event["row"]
     assert (row["ENTRYSRC"], row["ENTRYDESC"]) == (
         "sshd[77]",
