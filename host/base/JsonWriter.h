@@ -167,7 +167,7 @@ private:
     std::uint64_t m_objects = 0; ///< a bit for each open level, the innermost lowest: is an object
     unsigned m_depth = 0;
     Next m_next = Next::VALUE;
-    char m_buffer[1024]{}; ///< not yet in the text, whose growth is checked once for all of this
+    char m_buffer[1024]; ///< not yet in the text, whose growth is checked once for all of this
 };
 
 } // namespace zrm::host

@@ -52,7 +52,7 @@ OpenedHistory openHistory(const HostConfig& config) {
 }
 
 Delivery::Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize,
-                   OpenedHistory opened)
+                   OpenedHistory&& opened)
     : m_format(layout), m_historyProblem(std::move(opened.problem)),
       m_history(std::move(opened.history)),
       m_queue(queuedEvents, rowSize, newestId(config, m_history.get())),

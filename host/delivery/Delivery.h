@@ -30,7 +30,7 @@ class Delivery {
 public:
     /// Creates the queue for rows of this layout; starts no thread.
     Delivery(const HostConfig& config, const RowLayout& layout, std::size_t rowSize,
-             OpenedHistory opened);
+             OpenedHistory&& opened);
     ~Delivery();
     Delivery(const Delivery&) = delete;
     Delivery& operator=(const Delivery&) = delete;

@@ -12,8 +12,7 @@
 
 namespace zrm::host {
 
-PathSearch::PathSearch(const std::string& pattern) {
-    paths = {""};
+PathSearch::PathSearch(const std::string& pattern) : paths{""} {
     std::size_t begin = 1;
     while (begin <= pattern.size() && !paths.empty()) {
         const std::size_t end = std::min(pattern.find('/', begin), pattern.size());
