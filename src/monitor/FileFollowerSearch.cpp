@@ -106,6 +106,14 @@ FileFollower::Found FileFollower::findYounger(const GenerationReference& referen
 /// False if a file of the directory's list was gone when it was to be opened.
 bool FileFollower::tryFind(const LogPosition& position, Search search, Generation* named,
                            Found& found) {
+    // Usually the present file has the position. The directory may be large, and is not read then.
+    Member present;
+    present.from = position.offset;
+    if (named != nullptr && named->identity() == identityOf(position) &&
+        named->holds(position, present.tail)) {
+        found.holder = std::move(present);
+        return true;
+    }
     const std::vector<GenerationFile> files =
         findGenerations(siblingPath(), static_cast<ino_t>(position.inode));
     bool vanished = false;
@@ -114,7 +122,7 @@ bool FileFollower::tryFind(const LogPosition& position, Search search, Generatio
         return false;
     }
     if (found.holder && named != nullptr && found.holder->file == nullptr) {
-        return true; // the present file has it
+        return true; // the present file has the same contents
     }
     // Without a file that has the guard, an identity says nothing: inodes are used again.
     GenerationReference reference{std::nullopt, m_modified};
@@ -126,17 +134,14 @@ bool FileFollower::tryFind(const LogPosition& position, Search search, Generatio
     return openYounger(reference, files, named, found);
 }
 
-/// The file that has the position: the one with its identity, else one with the same contents. A
-/// member without a file stands for `named`.
+/// The file that has the position: another than `named` with its identity, else one with the same
+/// contents. A member without a file stands for `named`.
 std::optional<FileFollower::Member>
 FileFollower::findHolder(const LogPosition& position, Search search, Generation* named,
                          const std::vector<GenerationFile>& files, bool& vanished) {
     const FileIdentity wanted = identityOf(position);
     Member member;
     member.from = position.offset;
-    if (named != nullptr && named->identity() == wanted && named->holds(position, member.tail)) {
-        return member;
-    }
     const auto opens = [&](const GenerationFile& file) {
         member.file = Generation::open(file.path);
         if (hasVanished(member.file.get(), file)) {

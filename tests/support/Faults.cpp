@@ -10,6 +10,7 @@
 #include <map>
 #include <new>
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <pthread.h>
 #include <signal.h>
@@ -157,6 +158,7 @@ WRAP_ERRNO(int, gethostname, -1, (char* name, size_t size), (name, size))
 WRAP_ERRNO(int, kill, -1, (pid_t pid, int signal), (pid, signal))
 WRAP_ERRNO(struct tm*, localtime_r, nullptr, (const time_t* time, struct tm* result),
            (time, result))
+WRAP_ERRNO(DIR*, opendir, nullptr, (const char* path), (path))
 WRAP_ERRNO(off_t, lseek, -1, (int fd, off_t offset, int whence), (fd, offset, whence))
 WRAP_ERRNO(long, pathconf, -1, (const char* path, int name), (path, name))
 WRAP_ERRNO(int, pipe, -1, (int* fds), (fds))

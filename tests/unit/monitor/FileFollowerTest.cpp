@@ -268,6 +268,25 @@ TEST_F(FileFollowerTest, FollowsASymbolicLinkToItsNewTarget) {
     EXPECT_EQ(looks(2), "1b\n2\n");
 }
 
+TEST_F(FileFollowerTest, ResumesInThePresentFileWithoutReadingTheDirectory) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    append("b\n");
+    restart();
+    {
+        const Fault reads("opendir", 0, {.skip = 0, .times = 0});
+        EXPECT_EQ(look(), "b\n");
+        EXPECT_EQ(reads.calls(), 0);
+    }
+    rename("app.log", "app.log.1");
+    append("c\n");
+    restart();
+    const Fault reads("opendir", 0, {.skip = 0, .times = 0});
+    EXPECT_EQ(looks(2), "c\n");
+    EXPECT_GT(reads.calls(), 0);
+}
+
 TEST_F(FileFollowerTest, ResumesAfterRotationsWhileItWasStopped) {
     look();
     append("a\n");
