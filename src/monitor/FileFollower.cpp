@@ -136,6 +136,7 @@ void FileFollower::enter() {
     const Member& member = m_chain.front();
     m_block.start(member.from, member.tail);
     m_head = Tail{};
+    m_known = 0;
     m_isInBlock = false;
     m_isAtEnd = false;
     m_hasSeen = false;
@@ -296,6 +297,7 @@ char* FileFollower::next() {
         switch (m_block.fill(*m_chain.front().file)) {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
+            m_known = std::max(m_seen.size, m_block.readTo()); // the file is still the same
             if (m_head.length < Tail::size) {
                 noteHead();
             }

@@ -136,6 +136,7 @@ private:
     Tail m_head;                 ///< the first bytes of the file that is read
     bool m_isAtEnd = false;      ///< the last read found the end of the file
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
+    std::int64_t m_known = 0;    ///< size that its present contents had for certain
     bool m_hasSeen = false;
     std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name

@@ -104,7 +104,7 @@ void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
 /// read from a copy, as far as there is one; then the file is read from its beginning.
 void FileFollower::recover() {
     const LogPosition at = *position();
-    const std::int64_t known = std::max(m_seen.size, m_block.readTo());
+    const std::int64_t known = std::max(m_known, m_block.readTo());
     m_position = at;
     m_hasPosition = true;
     m_isInBlock = false;

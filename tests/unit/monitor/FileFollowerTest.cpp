@@ -222,6 +222,16 @@ TEST_F(FileFollowerTest, NoticesATruncationThatGrewPastThePosition) {
     EXPECT_EQ(look(), "b\nsomething longer than before\n");
 }
 
+TEST_F(FileFollowerTest, DoesNotRecordWhatIsInTheFileAfterATruncationAsLost) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    fs::resize_file(m_path, 0);
+    append("something longer than before\n");
+    EXPECT_EQ(look(), "something longer than before\n");
+    EXPECT_EQ(m_ledger.lostBytes(), 0);
+}
+
 TEST_F(FileFollowerTest, RecordsWhatIsLost) {
     look();
     append("0123456789\n");
