@@ -121,8 +121,11 @@ void zrm_rmmonlog_agent::buildTableRow(zrm_rmmonlog_data_t* row, LogFile* log) {
         row->logsize = static_cast<std::int32_t>(status.st_size);
     } else {
         const ErrorText error(errno);
-        trace.error()("stat() command failed for %s;  errno = %d; %s.", log->fileNameLocal(),
-                      error.number(), error.text());
+        // A followed log may be without a file for a while; its ledger shows it.
+        if (log->followSettings() == nullptr || error.number() != ENOENT) {
+            trace.error()("stat() command failed for %s;  errno = %d; %s.", log->fileNameLocal(),
+                          error.number(), error.text());
+        }
         std::memset(row->logmoddate, '0', sizeof row->logmoddate);
         row->logsize = -1;
     }

@@ -17,6 +17,7 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::SizeIs;
 
 using MonitoredLogsRow = MonitoredLogs;
 
@@ -119,6 +120,14 @@ TEST_F(MonitoredLogsRow, ARemovedFileIsMarked) {
     EXPECT_EQ(row(0).logsize, -1);
     EXPECT_EQ(text(row(0).logmoddate), "0000000000000000");
     EXPECT_EQ(text(row(0).timestamp), "1270115080000000") << "the rest of the row is there";
+}
+
+TEST_F(MonitoredLogsRow, AFollowedLogWithoutAFileIsMarkedButNotTraced) {
+    m_logs.add(m_directory.file("gone.log")).setFollowed();
+    EXPECT_THAT(sample(TRC1_ERROR), IsEmpty());
+    EXPECT_EQ(row(0).logsize, -1);
+    const Fault fault("stat", EACCES);
+    EXPECT_THAT(sample(TRC1_ERROR), SizeIs(1));
 }
 
 TEST_F(MonitoredLogsRow, AFileThatCannotBeExaminedIsMarked) {

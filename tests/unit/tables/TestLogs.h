@@ -2,6 +2,7 @@
 #define ZRM_TESTS_TEST_LOGS_H
 
 #include "logmgr/LogManager.h"
+#include "logs/FollowSettings.h"
 #include "logs/RequestThresholds.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "monitor/LogFile.h"
@@ -22,6 +23,7 @@ public:
     void setUTF8Name(const std::string& name);
     void setNoName();
     void setType(char type) { LogType = type; }
+    void setFollowed() { LogFollowSettings = std::make_shared<const zrm::FollowSettings>(); }
     void setDebugMode(char mode) { LogDebugMode = mode; }
     void setStatus(_MonitorStatus status, std::time_t changed);
     void setCounts(std::int64_t events, std::int64_t errors);
