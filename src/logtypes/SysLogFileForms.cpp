@@ -40,9 +40,7 @@ template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::
 std::size_t fillSource(char* column, std::size_t width, const SyslogParts& parts) {
     std::size_t length = 0;
     const auto append = [&](std::string_view text) {
-        const std::size_t count = std::min(text.size(), width - length);
-        std::memcpy(column + length, text.data(), count);
-        length += count;
+        length += text.copy(column + length, width - length);
     };
     append(parts.source);
     if (!parts.processId.empty()) {
