@@ -1,7 +1,6 @@
 // The lines of syslog files that are followed, in any form that SyslogForms knows.
 
 #include "base/BrevanTime.h"
-#include "base/RowBytes.h"
 #include "base/TraceScope.h"
 #include "base/UTF8Conv.h"
 #include "framework/locale.h"
@@ -31,9 +30,7 @@ std::string_view withoutLineEnd(const char* line) {
 
 /// Fills a blank column with as much of the text as it takes, and returns how much that is.
 template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::string_view text) {
-    const std::size_t length = std::min(text.size(), width);
-    RowBytes::copy(column, text.data(), length);
-    return length;
+    return text.copy(column, width);
 }
 
 /// Fills the source column with "app[process]".

@@ -29,10 +29,10 @@ struct SyslogTime {
 
 /// The rest of a syslog line. Parts that it does not have are empty.
 struct SyslogParts {
-    std::string_view host;
-    std::string_view source;    ///< of RFC 5424: APP-NAME[PROCID]
-    std::string_view processId; ///< of RFC 5424; the source is then APP-NAME alone
-    std::string_view description;
+    std::string_view host = "";
+    std::string_view source = "";    ///< of RFC 5424: APP-NAME[PROCID]
+    std::string_view processId = ""; ///< of RFC 5424; the source is then APP-NAME alone
+    std::string_view description = "";
 };
 
 /// The forms of lines that system loggers write, recognised line by line. A line may begin with a
