@@ -157,7 +157,7 @@ void LogReader::checkOwnFiles(ConfigSection& section, const std::string& path, u
                               const LogConfig& log) {
     for (const auto& [file, what] : m_ownFiles) {
         const bool isExcluded =
-            std::any_of(log.excludes.begin(), log.excludes.end(), [&file](const auto& pattern) {
+            std::any_of(log.excludes.begin(), log.excludes.end(), [&file = file](const auto& pattern) {
                 return PathPattern::excludes(pattern, file);
             });
         if (isExcluded || (path != file && !PathPattern::matches(path, file))) {
