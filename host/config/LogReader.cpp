@@ -156,10 +156,9 @@ void LogReader::readPaths(ConfigSection& section, LogConfig& log) {
 void LogReader::checkOwnFiles(ConfigSection& section, const std::string& path, unsigned line,
                               const LogConfig& log) {
     for (const auto& [file, what] : m_ownFiles) {
-        const bool isExcluded =
-            std::any_of(log.excludes.begin(), log.excludes.end(), [&file = file](const auto& pattern) {
-                return PathPattern::excludes(pattern, file);
-            });
+        const bool isExcluded = std::any_of(
+            log.excludes.begin(), log.excludes.end(),
+            [&file = file](const auto& pattern) { return PathPattern::excludes(pattern, file); });
         if (isExcluded || (path != file && !PathPattern::matches(path, file))) {
             continue;
         }
