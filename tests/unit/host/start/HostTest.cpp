@@ -84,7 +84,10 @@ protected:
     }
 
     /// What SYS1_Main does with these arguments.
-    static void start(std::vector<std::string> arguments) {
+    void start(std::vector<std::string> arguments) const {
+        if (arguments.empty()) {
+            arguments = {"--config", write("")};
+        }
         arguments.insert(arguments.begin(), "zrmagent");
         std::vector<char*> pointers;
         for (std::string& argument : arguments) {
@@ -116,9 +119,13 @@ protected:
     RecordingTrace trace{TRC1_ERROR};
     TemporaryDirectory own;
     std::string directory;
-    /// Writes the configuration file and returns its path.
+    /// Writes the configuration file and returns its path. The history stays in the test's
+    /// directory.
     std::string write(const std::string& text) const {
-        std::ofstream(directory + "/zrm.toml") << text;
+        const bool hasState = text.find("state_directory") != std::string::npos;
+        const std::string state = hasState ? "" : "state_directory = '" + directory + "/state'\n";
+        const bool hasTables = text.find('[') != std::string::npos;
+        std::ofstream(directory + "/zrm.toml") << (hasTables ? state + text : text + state);
         return directory + "/zrm.toml";
     }
     std::string sink() const {
