@@ -122,10 +122,9 @@ protected:
     /// Writes the configuration file and returns its path. The history stays in the test's
     /// directory.
     std::string write(const std::string& text) const {
-        const bool hasState = text.find("state_directory") != std::string::npos;
-        const std::string state = hasState ? "" : "state_directory = '" + directory + "/state'\n";
-        const bool hasTables = text.find('[') != std::string::npos;
-        std::ofstream(directory + "/zrm.toml") << (hasTables ? state + text : text + state);
+        const bool needsState = text.empty() || text.starts_with("[agent]");
+        std::ofstream(directory + "/zrm.toml")
+            << (needsState ? "state_directory = '" + directory + "/state'\n" : "") << text;
         return directory + "/zrm.toml";
     }
     std::string sink() const {
