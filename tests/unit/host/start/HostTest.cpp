@@ -86,7 +86,7 @@ protected:
     /// What SYS1_Main does with these arguments.
     void start(std::vector<std::string> arguments) const {
         if (arguments.empty()) {
-            arguments = {"--config", write("")};
+            arguments = {"--config", write(state())};
         }
         arguments.insert(arguments.begin(), "zrmagent");
         std::vector<char*> pointers;
@@ -119,17 +119,15 @@ protected:
     RecordingTrace trace{TRC1_ERROR};
     TemporaryDirectory own;
     std::string directory;
-    /// Writes the configuration file and returns its path. The history stays in the test's
-    /// directory.
+    /// Writes the configuration file and returns its path.
     std::string write(const std::string& text) const {
-        const bool needsState = text.empty() || text.starts_with("[agent]");
-        std::ofstream(directory + "/zrm.toml")
-            << (needsState ? "state_directory = '" + directory + "/state'\n" : "") << text;
+        std::ofstream(directory + "/zrm.toml") << text;
         return directory + "/zrm.toml";
     }
+    /// Keeps the history in the test's directory.
+    std::string state() const { return "state_directory = '" + directory + "/state'\n"; }
     std::string sink() const {
-        return "state_directory = '" + directory + "/state'\n[[sink]]\ntype = 'jsonl'\npath = '" +
-               output() + "'\n";
+        return state() + "[[sink]]\ntype = 'jsonl'\npath = '" + output() + "'\n";
     }
     /// From here on standard error goes to a file, where this process and its parent can read it.
     void errorsToFile() const {
@@ -176,8 +174,8 @@ TEST_F(HostTest, AnUnusableConfigurationEndsTheProcessWithEveryProblem) {
 
 TEST_F(HostTest, TheConfigurationSetsWhatTheEnvironmentLeavesOpen) {
     setenv("ZRM_MAX_ROWS", "25", 1);
-    start({"--config", write("[agent]\nlog_config = '/etc/logs.conf'\n"
-                             "max_rows = 50\ntrace = 'detail'\n")});
+    start({"--config", write(state() + "[agent]\nlog_config = '/etc/logs.conf'\n"
+                                       "max_rows = 50\ntrace = 'detail'\n")});
     EXPECT_STREQ(std::getenv("ZRM_CONFIG_FILE"), "/etc/logs.conf");
     EXPECT_STREQ(std::getenv("ZRM_MAX_ROWS"), "25");
     EXPECT_STREQ(std::getenv("QFW_TRC1"), "detail");
@@ -186,7 +184,7 @@ TEST_F(HostTest, TheConfigurationSetsWhatTheEnvironmentLeavesOpen) {
 TEST_F(HostTest, UnusableTraceLevelsOfTheEnvironmentAreReported) {
     setenv("QFW_TRC1", "loud", 1);
     testing::internal::CaptureStderr();
-    start({"--config", write("")});
+    start({"--config", write(state())});
     EXPECT_THAT(testing::internal::GetCapturedStderr(),
                 testing::MatchesRegex("zrmagent: QFW_TRC1: .*; only errors are traced\n"));
 }
@@ -242,7 +240,7 @@ TEST_F(HostTest, AnExitBeforeTheMainLoopNeedsNothing) {
     EXPECT_EXIT(
         {
             std::atexit([] { AGF_Shutdown(1); });
-            start({"--config", write("")});
+            start({"--config", write(state())});
             std::exit(4);
         },
         testing::ExitedWithCode(4), "");
