@@ -35,7 +35,7 @@ TEST_F(ConsoleResourceTest, ServesThePage) {
 TEST_F(ConsoleResourceTest, SendsTheContentTypeOfEachFile) {
     const std::vector<std::pair<std::string, std::string>> files = {
         {"index.html", "text/html; charset=utf-8"},
-        {"console.css", "text/css; charset=utf-8"},
+        {"style/base.css", "text/css; charset=utf-8"},
         {"main.js", "text/javascript; charset=utf-8"},
         {"views/logs.js", "text/javascript; charset=utf-8"},
         {"chart.js", "text/javascript; charset=utf-8"},
