@@ -41,6 +41,13 @@ void publish(const FoundLogs& found) {
 } // namespace
 
 struct LogList::Shared {
+    /// The thread looks soon.
+    void ask() {
+        const std::lock_guard guard(mutex);
+        isAsked = true;
+        changed.notify_all();
+    }
+
     std::mutex mutex; ///< guards the members below
     std::condition_variable changed;
     bool isEnded = false;
@@ -51,13 +58,17 @@ struct LogList::Shared {
 
     LogFinder finder; ///< used by the thread, and before it starts
     std::function<void()> announce;
+    std::chrono::seconds interval;
 };
 
-LogList::LogList(std::function<void()> changed) : m_shared(std::make_shared<Shared>()) {
+LogList::LogList(std::function<void()> changed, std::chrono::seconds interval)
+    : m_shared(std::make_shared<Shared>()) {
     m_shared->announce = std::move(changed);
+    m_shared->interval = interval;
 }
 
 LogList::~LogList() {
+    FurtherLogs::setOnRefresh(nullptr);
     const std::lock_guard guard(m_shared->mutex);
     m_shared->isEnded = true;
     m_shared->changed.notify_all();
@@ -79,6 +90,7 @@ void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
 bool LogList::start() {
     try {
         std::thread(run, m_shared).detach();
+        FurtherLogs::setOnRefresh([shared = m_shared] { shared->ask(); });
     } catch (const std::system_error&) {
         return false;
     }
@@ -102,7 +114,7 @@ std::shared_ptr<const FoundLogs> LogList::found() {
 void LogList::run(const std::shared_ptr<Shared>& shared) {
     std::unique_lock lock(shared->mutex);
     for (;;) {
-        shared->changed.wait_for(lock, interval,
+        shared->changed.wait_for(lock, shared->interval,
                                  [&] { return shared->isEnded || shared->isAsked; });
         if (shared->isEnded) {
             return;

@@ -17,13 +17,14 @@ namespace zrm::host {
 /// forever is abandoned at the end.
 class LogList {
 public:
-    static constexpr std::chrono::seconds interval{5};
+    static constexpr std::chrono::seconds defaultInterval{5};
 
     /// Looked at besides the files of the configuration, for example by way of a descriptor.
     using OwnFiles = std::map<std::string, std::string>;
 
     /// `changed` is called on the list's thread after a changed list was published.
-    explicit LogList(std::function<void()> changed);
+    explicit LogList(std::function<void()> changed,
+                     std::chrono::seconds interval = defaultInterval);
     /// Does not wait for the thread.
     ~LogList();
     LogList(const LogList&) = delete;
@@ -32,7 +33,8 @@ public:
     /// Takes the tables of the configuration and looks at once, on the calling thread; for the
     /// start, before the log manager exists. Publishes nothing if there are no tables.
     void begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles);
-    /// Starts the thread. Returns false if no thread can be started.
+    /// Starts the thread, which looks at every interval, and at once when the log manager
+    /// refreshes. Returns false if no thread can be started.
     bool start();
     /// Takes the tables of a changed configuration. The thread looks soon.
     void apply(const std::vector<LogConfig>& logs, OwnFiles ownFiles);

@@ -36,6 +36,7 @@ std::uint32_t LogManager::refresh() {
     if (DebugLog && DebugLogP == nullptr) {
         openDebugLog();
     }
+    FurtherLogs::noteRefresh();
     const bool isFurtherNew = takeFurtherLogs();
     const std::uint32_t validCount = getValidLogs();
     if (validCount > 0 || isFurtherNew || IsConfigEmptied) {

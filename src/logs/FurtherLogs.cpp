@@ -8,8 +8,9 @@ namespace zrm::FurtherLogs {
 namespace {
 
 struct Published {
-    std::mutex mutex; ///< guards the list
+    std::mutex mutex; ///< guards the members below
     std::shared_ptr<const List> logs;
+    std::function<void()> onRefresh;
 };
 
 /// Never destroyed: threads that outlive main may use it.
@@ -30,6 +31,20 @@ std::shared_ptr<const List> published() {
     Published& present = state();
     const std::lock_guard guard(present.mutex);
     return present.logs;
+}
+
+void setOnRefresh(std::function<void()> called) {
+    Published& present = state();
+    const std::lock_guard guard(present.mutex);
+    present.onRefresh = std::move(called);
+}
+
+void noteRefresh() {
+    Published& present = state();
+    const std::lock_guard guard(present.mutex);
+    if (present.onRefresh) {
+        present.onRefresh();
+    }
 }
 
 } // namespace zrm::FurtherLogs

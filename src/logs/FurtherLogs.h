@@ -1,6 +1,7 @@
 #ifndef ZRM_FURTHER_LOGS_H
 #define ZRM_FURTHER_LOGS_H
 
+#include <functional>
 #include <memory>
 #include <string>
 #include <vector>
@@ -33,6 +34,13 @@ void publish(std::shared_ptr<const List> logs);
 
 /// The list published last; null if there was none.
 std::shared_ptr<const List> published();
+
+/// Sets what a refresh calls, or nothing. The function runs on the log manager's thread and must
+/// not wait.
+void setOnRefresh(std::function<void()> called);
+
+/// Calls that function: a refresh has begun.
+void noteRefresh();
 
 } // namespace FurtherLogs
 

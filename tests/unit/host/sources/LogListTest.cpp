@@ -66,6 +66,16 @@ TEST_F(LogListTest, ANewFileChangesTheList) {
     EXPECT_EQ(before->size(), 1U);
 }
 
+TEST_F(LogListTest, LooksAtOnceWhenTheLogManagerRefreshes) {
+    LogList patient([this] { ++changes; }, std::chrono::hours(1));
+    patient.begin({table(directory.file("*.log"))}, {});
+    ASSERT_TRUE(patient.start());
+    directory.write("a.log", "");
+    FurtherLogs::noteRefresh();
+    ASSERT_TRUE(waitForChanges(1));
+    EXPECT_EQ(FurtherLogs::published()->size(), 1U);
+}
+
 TEST_F(LogListTest, TakesTablesThatAreAddedAndRemoved) {
     list.begin({}, {});
     ASSERT_TRUE(list.start());
