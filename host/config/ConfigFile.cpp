@@ -13,6 +13,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstdlib>
 #include <limits>
 #include <optional>
 #include <utility>
@@ -294,6 +295,23 @@ std::optional<std::string> warningOfSecrets(const HostConfig& config, const std:
            " contains secrets and every user can read it: move them into separate files "
            "(secret_file, headers_file), or remove the permissions of other users (chmod o= " +
            path + ')';
+}
+
+std::optional<std::string> warningOfDebug(const HostConfig& config, const std::string& path) {
+    constexpr const char* variable = "AGENT_DEBUG_LOG";
+    const char* const value = std::getenv(variable);
+    const auto log = std::find_if(config.logs.begin(), config.logs.end(),
+                                  [](const LogConfig& one) { return one.debug; });
+    const bool isNamed =
+        (value != nullptr && *value != '\0') ||
+        std::any_of(config.environment.begin(), config.environment.end(),
+                    [](const EnvironmentSetting& one) { return one.variable == variable; });
+    if (log == config.logs.end() || isNamed) {
+        return std::nullopt;
+    }
+    return path + ':' + std::to_string(log->line) +
+           ": log.debug: has no effect without a debug log; write debug_log = "
+           "\"/var/lib/zrm/debug.log\" in [agent], or remove the key";
 }
 
 } // namespace zrm::host

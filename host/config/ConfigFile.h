@@ -36,6 +36,10 @@ public:
 /// can read the file.
 std::optional<std::string> warningOfSecrets(const HostConfig& config, const std::string& path);
 
+/// A warning when the configuration read from this file turns on the debug mode of a log, and
+/// neither it nor the environment names a debug log.
+std::optional<std::string> warningOfDebug(const HostConfig& config, const std::string& path);
+
 } // namespace zrm::host
 
 #endif

@@ -78,15 +78,21 @@ std::optional<std::string> ConfigSection::text(std::string_view key) {
     return text;
 }
 
-/// Adds a text of a list, or records what is wrong with it.
-void ConfigSection::addText(std::vector<Text>& texts, std::string_view key,
-                            const toml::value<std::string>& text) {
-    const unsigned line = lineOf(text.source());
-    if (text->find('\0') != std::string::npos) {
-        problem(line, key, "contains a NUL character", "leave it out");
-        return;
+/// Adds a text of a list, or records what is wrong with it and returns false.
+bool ConfigSection::addText(std::vector<Text>& texts, std::string_view key,
+                            const toml::node& item) {
+    const auto* const text = item.as_string();
+    if (text == nullptr) {
+        wrongType(key, item, "write a list of texts in quotes");
+        return false;
     }
-    texts.emplace_back(*text, line);
+    const unsigned line = lineOf(text->source());
+    if (text->get().find('\0') != std::string::npos) {
+        problem(line, key, "contains a NUL character", "leave it out");
+        return false;
+    }
+    texts.emplace_back(text->get(), line);
+    return true;
 }
 
 std::optional<std::int64_t> ConfigSection::number(std::string_view key) {
@@ -113,27 +119,20 @@ std::optional<bool> ConfigSection::truth(std::string_view key) {
     return node->as_boolean()->get();
 }
 
-std::vector<ConfigSection::Text> ConfigSection::texts(std::string_view key) {
+std::optional<std::vector<ConfigSection::Text>> ConfigSection::texts(std::string_view key) {
     const toml::node* const node = find(key);
-    std::vector<Text> texts;
     if (node == nullptr) {
-        return texts;
+        return std::nullopt;
     }
-    constexpr const char* cure = "write a list of texts in quotes";
-    if (const auto* const one = node->as_string()) {
-        addText(texts, key, *one);
-    } else if (const toml::array* const list = node->as_array()) {
+    std::vector<Text> texts;
+    const toml::array* const list = node->as_array();
+    bool isRight = list != nullptr || addText(texts, key, *node);
+    if (list != nullptr) {
         for (const toml::node& item : *list) {
-            if (const auto* const text = item.as_string()) {
-                addText(texts, key, *text);
-            } else {
-                wrongType(key, item, cure);
-            }
+            isRight = addText(texts, key, item) && isRight;
         }
-    } else {
-        wrongType(key, *node, cure);
     }
-    return texts;
+    return isRight ? std::optional(std::move(texts)) : std::nullopt;
 }
 
 const toml::table* ConfigSection::table(std::string_view key) {

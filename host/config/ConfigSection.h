@@ -29,8 +29,8 @@ public:
     std::optional<std::string> text(std::string_view key);
     std::optional<std::int64_t> number(std::string_view key);
     std::optional<bool> truth(std::string_view key);
-    /// A text or a list of texts; empty when the key is missing.
-    std::vector<Text> texts(std::string_view key);
+    /// A text or a list of texts; none when the key is missing or a problem was recorded.
+    std::optional<std::vector<Text>> texts(std::string_view key);
     /// A table, as in [key]; null when it is missing.
     const toml::table* table(std::string_view key);
     /// The tables of [[key]]; none when it is missing. An empty list is not missing.
@@ -50,8 +50,7 @@ public:
 
 private:
     const toml::node* find(std::string_view key);
-    void addText(std::vector<Text>& texts, std::string_view key,
-                 const toml::value<std::string>& text);
+    bool addText(std::vector<Text>& texts, std::string_view key, const toml::node& item);
     void wrongType(std::string_view key, const toml::node& node, const char* cure);
 
     const std::string m_name;

@@ -66,6 +66,13 @@ void refuse(ConfigSection& section, std::string_view key, const LogConfig& log) 
     }
 }
 
+constexpr const char* openBracketCure =
+    "close it with ']' in the same name, or write '\\[' for the character itself";
+
+std::string openBracket(const std::string& pattern) {
+    return "'" + pattern + "' has a '[' without its ']'";
+}
+
 /// Why a path or a glob cannot be used, and what to write instead; empty if it can.
 std::pair<std::string, std::string> problemOfPath(const std::string& path) {
     if (path.empty() || path.front() != '/') {
@@ -82,6 +89,9 @@ std::pair<std::string, std::string> problemOfPath(const std::string& path) {
     if (path.find("**") != std::string::npos) {
         return {"'" + path + "' holds '**', which does not search directories of every depth",
                 "write one '*' for each level of directories"};
+    }
+    if (PathPattern::hasOpenBracket(path)) {
+        return {openBracket(path), openBracketCure};
     }
     return {};
 }
@@ -115,21 +125,24 @@ LogConfig LogReader::read(const toml::table& table) {
 
 void LogReader::readPaths(ConfigSection& section, LogConfig& log) {
     constexpr const char* cure = R"(write path = "/var/log/syslog", or a list of paths and globs)";
-    const std::vector<ConfigSection::Text> paths = section.texts("path");
+    const auto paths = section.texts("path");
     if (!section.has("path")) {
         section.problem("path", "is missing", cure);
         return;
     }
-    if (paths.empty()) {
+    if (!paths) {
+        return;
+    }
+    if (paths->empty()) {
         section.problem("path", "names no file", cure);
         return;
     }
-    if (paths.size() > mostPaths) {
-        section.problem("path", "has " + std::to_string(paths.size()) + " items",
+    if (paths->size() > mostPaths) {
+        section.problem("path", "has " + std::to_string(paths->size()) + " items",
                         "write at most " + std::to_string(mostPaths) + ", and globs for the rest");
         return;
     }
-    for (const auto& [path, line] : paths) {
+    for (const auto& [path, line] : *paths) {
         const auto [what, itsCure] = problemOfPath(path);
         if (!what.empty()) {
             section.problem(line, "path", what, itsCure);
@@ -174,7 +187,8 @@ void LogReader::checkOwnFiles(ConfigSection& section, const std::string& path, u
 }
 
 void LogReader::readExcludes(ConfigSection& section, LogConfig& log) {
-    for (const auto& [pattern, line] : section.texts("exclude")) {
+    const auto patterns = section.texts("exclude");
+    for (const auto& [pattern, line] : patterns.value_or(std::vector<ConfigSection::Text>())) {
         if (pattern.empty() || (pattern.find('/') != std::string::npos && pattern[0] != '/')) {
             section.problem(line, "exclude", "'" + pattern + "' is neither a path nor a file name",
                             "begin a path with '/', or write a file name without any '/'");
@@ -182,6 +196,8 @@ void LogReader::readExcludes(ConfigSection& section, LogConfig& log) {
             section.problem(line, "exclude",
                             "the pattern has " + std::to_string(pattern.size()) + " bytes",
                             "write at most " + std::to_string(longestPath));
+        } else if (PathPattern::hasOpenBracket(pattern)) {
+            section.problem(line, "exclude", openBracket(pattern), openBracketCure);
         } else {
             log.excludes.push_back(pattern);
         }

@@ -13,6 +13,9 @@ namespace PathPattern {
 /// Whether the text holds anything but literal characters.
 bool isPattern(std::string_view text) noexcept;
 
+/// Whether a '[' has no ']' in the same name. Such a pattern matches only a literal '['.
+bool hasOpenBracket(std::string_view text) noexcept;
+
 /// Whether a pattern matches a whole path.
 bool matches(const std::string& pattern, const std::string& path) noexcept;
 

@@ -46,7 +46,8 @@ SituationConfig SituationReader::read(const toml::table& table) {
     text.text = fields.text("text");
     text.severity = fields.text("severity");
     text.log = fields.text("log");
-    const std::vector<ConfigSection::Text> conditions = section.texts("when");
+    const std::vector<ConfigSection::Text> conditions =
+        section.texts("when").value_or(std::vector<ConfigSection::Text>());
     for (const auto& [condition, line] : conditions) {
         text.when.push_back(condition);
     }

@@ -186,7 +186,8 @@ void Host::reload() {
         for (const std::string& problem : reloaded.error()) {
             say("%s", problem.c_str());
         }
-        say("%s was not loaded; the situations stay as they were", m_file.path().c_str());
+        say("%s was not loaded; the situations and the logs stay as they were",
+            m_file.path().c_str());
         m_serving->noteUnusableConfig();
         return;
     }
@@ -202,6 +203,9 @@ void Host::reload() {
     m_serving->apply(config.situations, removesMost);
     if (config.logs != m_config.logs) {
         m_logs.apply(config.logs, ownFiles(config));
+        if (const auto warning = warningOfDebug(config, m_file.path())) {
+            say("%s", warning->c_str());
+        }
     }
     if (config.environment != m_config.environment || config.http != m_config.http ||
         config.sinks != m_config.sinks || config.history != m_config.history ||

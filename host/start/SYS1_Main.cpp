@@ -53,8 +53,10 @@ HostConfig readConfig(const std::string& path) {
         }
         std::exit(unusableStatus);
     }
-    if (const auto warning = warningOfSecrets(*config, path)) {
-        say("%s", warning->c_str());
+    for (const auto& warning : {warningOfSecrets(*config, path), warningOfDebug(*config, path)}) {
+        if (warning) {
+            say("%s", warning->c_str());
+        }
     }
     return std::move(*config);
 }

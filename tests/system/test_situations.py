@@ -102,7 +102,7 @@ def test_a_changed_situation_file_is_loaded_and_a_broken_one_is_not(agent):
 
     good = agent.zrm_toml.read_text()
     agent.zrm_toml.write_text(good + "\n[[situation]]\nname = 5\n")
-    agent.wait_trace("was not loaded; the situations stay as they were")
+    agent.wait_trace("was not loaded; the situations and the logs stay as they were")
     log.append(syslog_line("two"))
     assert [e["situation"] for e in agent.wait_events(2)] == ["first"] * 2
 

@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <optional>
 #include <string>
 
@@ -48,4 +49,21 @@ TEST_F(ConfigSecretsTest, WarnsAboutNothingElse) {
          {"", "secret_file = '/etc/zrm/secret'", "headers = { X-Scope-OrgID = 'a' }"}) {
         EXPECT_EQ(warning(harmless, 0644), std::nullopt) << harmless;
     }
+}
+
+TEST(ConfigDebug, WarnsAboutADebugModeWithoutADebugLog) {
+    const auto warning = [](const std::string& text) {
+        const ConfigFile::Result result = ConfigFile::parse(text, "zrm.toml");
+        return warningOfDebug(result.value(), "zrm.toml");
+    };
+    const std::string debug = "[[log]]\npath = '/a'\n[[log]]\npath = '/b'\ndebug = true\n";
+    ASSERT_EQ(unsetenv("AGENT_DEBUG_LOG"), 0);
+    EXPECT_EQ(warning(debug),
+              "zrm.toml:3: log.debug: has no effect without a debug log; write debug_log = "
+              "\"/var/lib/zrm/debug.log\" in [agent], or remove the key");
+    EXPECT_EQ(warning("[[log]]\npath = '/a'\n"), std::nullopt);
+    EXPECT_EQ(warning("[agent]\ndebug_log = '/d.log'\n" + debug), std::nullopt);
+    ASSERT_EQ(setenv("AGENT_DEBUG_LOG", "/d.log", 1), 0);
+    EXPECT_EQ(warning(debug), std::nullopt);
+    ASSERT_EQ(unsetenv("AGENT_DEBUG_LOG"), 0);
 }

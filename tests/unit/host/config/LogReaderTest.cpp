@@ -102,6 +102,27 @@ TEST(LogReader, SaysWhatIsWrongWithAPath) {
                 ElementsAre("zrm.toml:4: log.path: '/a' is named at line 2 already; name it once"));
     EXPECT_THAT(refused("[[log]]\npath = '/" + std::string(5000, 'a') + "'\n"),
                 ElementsAre("zrm.toml:2: log.path: the path has 5001 bytes; write at most 4095"));
+    EXPECT_THAT(refused("[[log]]\npath = 1\n"),
+                ElementsAre("zrm.toml:2: log.path: is a whole number; write a list of texts in "
+                            "quotes"));
+    EXPECT_EQ(refused("[[log]]\npath = [\n1\n]\nexclude = ['a', true]\n").size(), 2U);
+}
+
+TEST(LogReader, RefusesABracketThatIsNotClosed) {
+    const std::string cure =
+        "; close it with ']' in the same name, or write '\\[' for the character itself";
+    EXPECT_THAT(refused("[[log]]\npath = ['/var/log/[x', '/a/[b/c]']\nexclude = ['[!]*']\n"),
+                ElementsAre("zrm.toml:2: log.path: '/var/log/[x' has a '[' without its ']'" + cure,
+                            "zrm.toml:2: log.path: '/a/[b/c]' has a '[' without its ']'" + cure,
+                            "zrm.toml:3: log.exclude: '[!]*' has a '[' without its ']'" + cure));
+    for (const char* const closed :
+         {"/a[0-9]", "/a]", "/[]]", "/[!]a]", "/\\[x", "/[\\]]", "/[[:digit:]x]", "/[a]/[b]"}) {
+        EXPECT_THAT(refused(std::string("[[log]]\npath = '") + closed + "'\n"), IsEmpty())
+            << closed;
+    }
+    for (const char* const open : {"/[]", "/[^]", "/[\\]", "/[[:digit:]", "/[[:digit"}) {
+        EXPECT_EQ(refused(std::string("[[log]]\npath = '") + open + "'\n").size(), 1U) << open;
+    }
 }
 
 TEST(LogReader, RefusesWhatTheAgentWritesItself) {

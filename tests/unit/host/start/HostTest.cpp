@@ -270,7 +270,7 @@ TEST_F(HostTest, AChangedFileChangesTheSituationsAndABrokenOneDoesNot) {
                               ": logs and situations are reloaded; every other change takes "
                               "effect at the next start\nzrmagent: " +
                               file + ":1: .*; correct the TOML here\nzrmagent: " + file +
-                              " was not loaded; the situations stay as they were\n"));
+                              " was not loaded; the situations and the logs stay as they were\n"));
 }
 
 TEST_F(HostTest, ATruncatedFileChangesNothingAndLostSituationsAreReported) {
@@ -307,7 +307,8 @@ TEST_F(HostTest, ATruncatedFileChangesNothingAndLostSituationsAreReported) {
         },
         testing::ExitedWithCode(0), "");
     const std::string file = "zrmagent: " + directory + "/zrm.toml";
-    const std::string kept = file + " was not loaded; the situations stay as they were\n";
+    const std::string kept =
+        file + " was not loaded; the situations and the logs stay as they were\n";
     EXPECT_EQ(errors(),
               file + ": is empty; write the configuration into it again\n" + kept + file +
                   ":7: the file ends within this line; write the rest of it, or end the line\n" +
