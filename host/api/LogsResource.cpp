@@ -13,17 +13,16 @@
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
-#include "host/sources/FoundLogsJson.h"
 #include "host/sources/LogList.h"
 
 #include <algorithm>
+#include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
-
-#include <nlohmann/json.hpp>
 
 namespace zrm::host {
 
@@ -69,10 +68,36 @@ void writeLogs(JsonWriter& json, const Sample& sample, const std::vector<LogLedg
     }
 }
 
-/// What the [[log]] tables match.
-std::string tables() {
-    using Json = nlohmann::ordered_json;
-    return foundLogsJson(*LogList::found()).dump(-1, ' ', false, Json::error_handler_t::replace);
+/// The [[log]] tables: all, or those that name or match the log with this path.
+std::vector<FoundLogs::Source> tablesOf(const std::optional<std::string>& log) {
+    const std::shared_ptr<const FoundLogs> found = LogList::found();
+    if (found->sources.empty()) {
+        return {};
+    }
+    std::set<std::string> configured;
+    for (const LogLedgerView& ledger : LogLedgers::read()) {
+        if (!ledger.follow) {
+            configured.insert(ledger.log);
+        }
+    }
+    std::vector<FoundLogs::Source> tables = found->sourcesBeside(configured);
+    std::erase_if(tables,
+                  [&](const FoundLogs::Source& table) { return log && !table.mentions(*log); });
+    return tables;
+}
+
+/// Why a log that was asked for is not there.
+std::string absence(const std::string& log, const std::vector<FoundLogs::Source>& tables) {
+    std::string text = "the agent does not monitor this log";
+    for (const FoundLogs::Source& table : tables) {
+        for (const FoundLogs::PassedOver& one : table.passedOver) {
+            if (one.file == log) {
+                text += "; the [[log]] at line " + std::to_string(table.line) +
+                        " passes over it: " + one.reason;
+            }
+        }
+    }
+    return text;
 }
 
 /// The configured but unmonitored logs: all, or the one with this path.
@@ -93,10 +118,11 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
     const std::size_t count = sample ? sample->size() : 0;
     const UnmonitoredLogs::Result configured = UnmonitoredLogs::read();
     const std::vector<UnmonitoredLogs::Log> unmonitored = chosen(configured.logs, log);
-    if (log && count == 0 && unmonitored.empty()) {
-        throw RequestRefused(404, "the agent does not monitor this log", "log");
-    }
     std::vector<LogLedgerView> ledgers = LogLedgers::read(log.value_or(""));
+    const std::vector<FoundLogs::Source> tables = tablesOf(log);
+    if (log && count == 0 && unmonitored.empty()) {
+        throw RequestRefused(404, absence(*log, tables), "log");
+    }
     for (LogLedgerView& ledger : ledgers) {
         ledger.warnings = m_watch.of(ledger.log);
     }
@@ -111,8 +137,11 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
         }
         json.endArray().key("configuration");
         configured.writeConfiguration(json);
-        json.key("tables").raw(log ? "[]" : tables());
-        json.key("time").time(WallClock::now()).endObject();
+        json.key("tables").beginArray();
+        for (const FoundLogs::Source& table : tables) {
+            table.write(json);
+        }
+        json.endArray().key("time").time(WallClock::now()).endObject();
     }));
 }
 

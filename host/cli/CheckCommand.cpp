@@ -1,5 +1,6 @@
 #include "host/cli/Commands.h"
 
+#include "host/base/JsonWriter.h"
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
 #include "host/cli/DisplayText.h"
@@ -7,10 +8,12 @@
 #include "host/config/ConfigFile.h"
 #include "host/config/OwnFiles.h"
 #include "host/diagnose/ConfigCheck.h"
-#include "host/sources/FoundLogsJson.h"
+#include "host/sources/LogFinder.h"
 
 #include <algorithm>
 #include <optional>
+#include <set>
+#include <string>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -63,15 +66,48 @@ std::vector<std::string> notesOn(const HostConfig& config, const std::string& co
         notes.push_back(path + " has no newline after its last line: a running agent does not load "
                                "it; add the newline");
     }
-    if (std::optional<std::string> warning = warningOfSecrets(config, path)) {
-        notes.push_back(std::move(*warning));
+    for (const std::optional<std::string>& warning :
+         {warningOfSecrets(config, path), warningOfDebug(config, path)}) {
+        if (warning) {
+            notes.push_back(*warning);
+        }
     }
     return notes;
 }
 
+/// The logs that the agent would monitor by the lines of its log configuration.
+std::set<std::string> configuredLogs(const HostConfig& config) {
+    std::set<std::string> logs;
+    const auto setting =
+        std::find_if(config.environment.begin(), config.environment.end(),
+                     [](const auto& one) { return one.variable == "ZRM_CONFIG_FILE"; });
+    if (setting == config.environment.end() || !ConfigCheck::checkFile(setting->value)) {
+        return logs;
+    }
+    for (const ConfigCheck::Line& line :
+         ConfigCheck::check(InputFile(setting->value).text()).lines) {
+        if (line.verdict == ConfigCheck::Verdict::ACCEPTED) {
+            logs.insert(line.log);
+        }
+    }
+    return logs;
+}
+
 /// What the [[log]] tables match on this machine now.
-FoundLogs find(const HostConfig& config) {
-    return LogFinder().look(config.logs, ownFilesOf(config), LogFinder::Clock::now());
+std::vector<FoundLogs::Source> find(const HostConfig& config) {
+    return LogFinder()
+        .look(config.logs, ownFilesOf(config), LogFinder::Clock::now())
+        .sourcesBeside(configuredLogs(config));
+}
+
+Json tablesJson(const std::vector<FoundLogs::Source>& tables) {
+    return Json::parse(JsonWriter::text([&](JsonWriter& json) {
+        json.beginArray();
+        for (const FoundLogs::Source& table : tables) {
+            table.write(json);
+        }
+        json.endArray();
+    }));
 }
 
 /// A table of the configuration: its files and what is passed over.
@@ -152,14 +188,14 @@ CliStatus CheckCommand::checkHost(Context& context) const {
     if (context.options().json) {
         Json answer{{"accepted", problems.empty()}, {"problems", problems}, {"notes", notes}};
         if (result && !result->logs.empty()) {
-            answer["logs"] = foundLogsJson(find(*result));
+            answer["logs"] = tablesJson(find(*result));
         }
         context.printJson(answer);
         return problems.empty() ? CliStatus::DONE : CliStatus::REFUSED;
     }
     if (problems.empty()) {
         std::string text = DisplayText::visible(m_host) + " can be used\n";
-        for (const FoundLogs::Source& source : find(*result).sources) {
+        for (const FoundLogs::Source& source : find(*result)) {
             text += textOf(source, context.terminal());
         }
         context.print(text);

@@ -70,11 +70,10 @@ void addLedger(FactList& facts, const Json& ledger) {
         const char* key;
         const char* name;
     };
-    constexpr std::array<Row, 6> rows = {{{"lines", "lines"},
+    constexpr std::array<Row, 5> rows = {{{"lines", "lines"},
                                           {"rows", "rows"},
                                           {"format_errors", "format errors"},
                                           {"without_time", "without a time"},
-                                          {"truncations", "truncations"},
                                           {"restarts", "monitor restarts"}}};
     if (ledger.is_null()) {
         return;
@@ -83,7 +82,11 @@ void addLedger(FactList& facts, const Json& ledger) {
     for (const Row& row : rows) {
         facts.add(row.name, JsonText::text(ledger, row.key));
     }
-    facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
+    if (JsonText::member(ledger, "follow")
+            .is_null()) { // where a log is followed, nothing is skipped
+        facts.add("truncations", JsonText::text(ledger, "truncations"));
+        facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
+    }
     facts.add("last entry", lastEntry(ledger));
     for (const Json& warning : JsonText::member(ledger, "warnings")) {
         facts.add("warning", JsonText::text(warning, "text"), Colour::NOTICE);
@@ -105,6 +108,17 @@ void addFollowing(FactList& facts, const Json& follow) {
         facts.add(name, TimeDisplay::bytes(JsonText::number(follow, key)));
     }
     facts.add("cut entries", JsonText::text(follow, "cut_entries"));
+}
+
+/// The table of the configuration that a followed log comes from.
+void addTable(FactList& facts, const Json& answer) {
+    const std::string log = JsonText::text(JsonText::member(answer, "logs").front(), "log");
+    for (const Json& table : JsonText::member(answer, "tables")) {
+        const Json& files = JsonText::member(table, "files");
+        if (std::find(files.begin(), files.end(), log) != files.end()) {
+            facts.add("configured by", "[[log]] at line " + JsonText::text(table, "line"));
+        }
+    }
 }
 
 /// The latest bytes that were recovered or lost.
@@ -297,6 +311,7 @@ CliStatus LogsCommand::show(Context& context) {
     FactList facts;
     facts.add("log", JsonText::text(logs.front(), "log"));
     facts.add("type", kindOf(row));
+    addTable(facts, answer);
     facts.add("status", status.text, status.colour);
     facts.add("since", TimeDisplay::stamp(JsonText::text(row, "MONTIME")));
     facts.add("size", sizeText(row));

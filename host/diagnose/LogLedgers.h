@@ -16,7 +16,8 @@ class JsonWriter;
 
 /// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
-    std::string kind;   ///< missing, replaced, named_twice, failing, without_time or not_records
+    /// missing, replaced, named_twice, failing, lost, without_time or not_records
+    std::string kind;
     std::int64_t since; ///< when it was first seen
     std::string text;   ///< what is wrong and how to fix it, in sentences
 

@@ -86,6 +86,30 @@ std::optional<LogWarning> ofFollowing(const FollowView& follow) {
                           ". Check the file's permissions and the disk."};
 }
 
+/// What was lost lately of a log of a [[log]] table.
+std::optional<LogWarning> ofLosses(const FollowView& follow) {
+    constexpr std::int64_t day = 24 * 60 * 60 * 1000;
+    const std::int64_t since = WallClock::now() - day;
+    const auto count = std::count_if(follow.lost.begin(), follow.lost.end(),
+                                     [since](const auto& range) { return range.time >= since; });
+    if (count == 0) {
+        return std::nullopt;
+    }
+    const FollowView::Range& last = follow.lost.back();
+    const std::string what =
+        last.from == last.to
+            ? "What followed byte " + std::to_string(last.from) + " was"
+            : "Bytes " + std::to_string(last.from) + " to " + std::to_string(last.to) + " were";
+    const std::string losses =
+        count == 1 ? "" : ", the latest of " + std::to_string(count) + " losses in 24 hours";
+    return LogWarning{
+        "lost", 0,
+        what + " lost at " + UtcTime::text(last.time) + losses +
+            ": removed or rotated away before they were read, and not readable in any "
+            "older file next to the log. Rotate by renaming, or keep the older files "
+            "in the log's directory."};
+}
+
 /// Whether a log of the log configuration is also in the list of logs to follow.
 bool isNamedTwice(const LogLedgerView& log) {
     const std::shared_ptr<const FurtherLogs::List> further = FurtherLogs::published();
@@ -121,6 +145,9 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
                             "line of the log configuration applies. Remove one of them."});
     }
     if (std::optional<LogWarning> warning = log.follow ? ofFollowing(*log.follow) : ofName(log)) {
+        warnings.push_back(std::move(*warning));
+    }
+    if (std::optional<LogWarning> warning = log.follow ? ofLosses(*log.follow) : std::nullopt) {
         warnings.push_back(std::move(*warning));
     }
     if (log.type == 'S' && log.withoutTime > 0 && log.withoutTime * 2 > log.rows) {

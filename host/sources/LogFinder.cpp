@@ -260,11 +260,7 @@ private:
 
     /// Always false.
     bool passOver(const Candidate& candidate, std::string reason) {
-        FoundLogs::Source& source = m_found.sources[candidate.source];
-        ++source.passedOverCount;
-        if (source.passedOver.size() < FoundLogs::mostPassedOver) {
-            source.passedOver.push_back({candidate.name, std::move(reason)});
-        }
+        m_found.sources[candidate.source].passOver(candidate.name, std::move(reason));
         return false;
     }
 

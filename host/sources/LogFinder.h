@@ -2,7 +2,7 @@
 #define ZRM_HOST_LOG_FINDER_H
 
 #include "host/config/LogConfig.h"
-#include "logs/FurtherLogs.h"
+#include "host/sources/FoundLogs.h"
 
 #include <chrono>
 #include <cstdint>
@@ -16,28 +16,6 @@
 #include <sys/stat.h>
 
 namespace zrm::host {
-
-/// What one look at the file system finds for the [[log]] tables.
-struct FoundLogs {
-    /// A file that a glob matches, or a path that is named, and that is not followed.
-    struct PassedOver {
-        std::string file;
-        std::string reason; ///< a sentence without its full stop
-    };
-    /// One table.
-    struct Source {
-        unsigned line = 0;                  ///< in the configuration
-        std::vector<std::string> paths;     ///< as configured
-        std::vector<std::string> files;     ///< that are followed
-        std::vector<PassedOver> passedOver; ///< the first mostPassedOver
-        std::size_t passedOverCount = 0;
-        std::string problem; ///< why the look is incomplete, without a full stop; empty if complete
-    };
-    static constexpr std::size_t mostPassedOver = 100;
-
-    std::vector<Source> sources; ///< in the order of the configuration
-    FurtherLogs::List logs;
-};
 
 /// Finds the files of [[log]] tables, again and again. Remembers the files that it found, so that a
 /// file that appears later, one that was rotated, and one that is gone for a moment are known as

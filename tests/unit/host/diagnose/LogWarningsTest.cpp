@@ -1,5 +1,6 @@
 #include "host/diagnose/LogWarnings.h"
 
+#include "host/base/TimeText.h"
 #include "support/TemporaryDirectory.h"
 
 #include <cstring>
@@ -66,6 +67,27 @@ TEST_F(LogWarningsTest, ChecksTheNameOfAnOpenFile) {
     EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("copytruncate"));
     log.openFile.reset(); // its monitor has ended, which its status says
     EXPECT_THAT(kindsOf(log), IsEmpty());
+}
+
+TEST_F(LogWarningsTest, WarnsAboutWhatWasLostWithinADay) {
+    constexpr std::int64_t hour = 60 * 60 * 1000;
+    const std::int64_t now = WallClock::now();
+    LogLedgerView log = opened();
+    log.follow.emplace().state = "reading";
+    EXPECT_THAT(kindsOf(log), IsEmpty());
+    log.follow->lost = {{now - 25 * hour, 0, 100, ""}};
+    EXPECT_THAT(kindsOf(log), IsEmpty());
+    log.follow->lost.push_back({now - 23 * hour, 200, 260, ""});
+    ASSERT_THAT(kindsOf(log), ElementsAre("lost"));
+    EXPECT_THAT(LogWarnings::of(log)[0].text,
+                testing::StartsWith("Bytes 200 to 260 were lost at " +
+                                    UtcTime::text(now - 23 * hour) + ": removed"));
+    log.follow->lost.push_back({now, 300, 300, ""});
+    log.follow->problem = "open failed and is tried again: Too many levels of symbolic links";
+    EXPECT_THAT(kindsOf(log), ElementsAre("failing", "lost"));
+    EXPECT_THAT(LogWarnings::of(log)[1].text,
+                testing::StartsWith("What followed byte 300 was lost at " + UtcTime::text(now) +
+                                    ", the latest of 2 losses in 24 hours: "));
 }
 
 TEST_F(LogWarningsTest, WarnsAboutASyslogFileWithoutTimes) {
