@@ -162,7 +162,7 @@ export function loading(text = "Loading") {
 }
 
 /** The agent's problems as a sentence. */
-const sentence = (text) =>
+export const sentence = (text) =>
   `${text.charAt(0).toUpperCase()}${text.slice(1)}${/[.!?]$/.test(text) ? "" : "."}`;
 
 /** Why something failed; what a lost connection stopped is tried again once it is back. */

@@ -24,6 +24,7 @@ const WARNED = {
   replaced: "Replaced",
   named_twice: "Named twice",
   failing: "Failing",
+  lost: "Lost bytes",
   without_time: "No times",
   not_records: "Wrong type",
 };
@@ -58,7 +59,9 @@ export function judge({ row, ledger }) {
     return {
       level: "warn",
       state: "No file",
-      why: "The file does not exist now. It may have been moved away.",
+      why: ledger?.follow
+        ? "No file has this name now. The agent reads one as soon as it appears."
+        : "The file does not exist now. It may have been moved away.",
     };
   }
   const errors = ledger?.format_errors ?? row.NUMERRORS;

@@ -2,7 +2,8 @@
 
 import { get, withQuery } from "../api.js";
 import { drawRates } from "../charts.js";
-import { empty, failure, fill, h, loading, table } from "../dom.js";
+import { empty, failure, fill, h, loading, sentence, table } from "../dom.js";
+import { followPairs, rangesPanel, tableName, tableOf } from "../following.js";
 import { bytes, number, plural, stamp, time } from "../format.js";
 import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
@@ -62,11 +63,12 @@ export async function show(element, path) {
         logs: [log],
         unmonitored: [other],
         configuration,
+        tables,
       } = await get(withQuery("/api/v1/logs", { log: path }));
       rates.hidden = report.hidden = !log;
       trial.hidden = !"US".includes(log?.row.LOGTYPE ?? " ");
       if (log) {
-        drawState(state, log, configuration);
+        drawState(state, log, configuration, tableOf(path, tables));
         drawLedger(ledger, log);
       } else {
         drawUnmonitored(state, other, configuration);
@@ -79,7 +81,9 @@ export async function show(element, path) {
           state,
           empty(
             "This log is not monitored",
-            "It is not in the log configuration. Add it there, then re-read the configuration.",
+            error.message.includes("[[log]]")
+              ? sentence(error.message)
+              : "Add a [[log]] table for it to zrm.toml, or a line to the log configuration.",
             h("a", { className: "button", href: "#/logs" }, "All logs"),
           ),
         );
@@ -134,26 +138,17 @@ export async function show(element, path) {
   };
 }
 
-/** How a log of a [[log]] table is followed; nothing for another log. */
-function followPairs(follow) {
-  if (!follow) return [];
-  return [
-    ["Following", follow.problem ? `${follow.state}; ${follow.problem}` : follow.state],
-    ["Generation", follow.generation ?? "none"],
-    ["Generations read", number(follow.generations)],
-    ["Position", bytes(follow.position)],
-    ["Behind", bytes(follow.behind)],
-    ["Recovered from copies", bytes(follow.recovered_bytes)],
-    ["Lost in rotations", bytes(follow.lost_bytes)],
-  ];
-}
-
-function drawState(element, log, configuration) {
+function drawState(element, log, configuration, source) {
   const { level, state, why } = judge(log);
   const { row } = log;
   const ledger = log.ledger || {};
+  const follow = ledger.follow;
   const pairs = [
     ["Kind", kindOf(row)],
+    [
+      "Configured by",
+      source ? tableName(source) : follow ? "a [[log]] table" : "log configuration",
+    ],
     ["Status", row.MONSTATUS],
     ["Monitored since", stamp(row.MONTIME)],
     ["File changed", stamp(row.LOGMODDATE)],
@@ -162,13 +157,12 @@ function drawState(element, log, configuration) {
     ["Entries", number(ledger.rows ?? row.NUMEVENTS)],
     ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
     ["Without a time", number(ledger.without_time)],
-    ["Truncations", number(ledger.truncations)],
-    ["Skipped", bytes(ledger.skipped_bytes)],
+    !follow && ["Truncations", number(ledger.truncations)],
+    !follow && ["Skipped", bytes(ledger.skipped_bytes)],
     ["Restarts of the monitor", number(ledger.restarts)],
-    ...followPairs(ledger.follow),
     ["Last entry", time(ledger.last_entry)],
     ["Debug log", row.DEBUGMODE === "Y" ? "every entry is copied to it" : "off"],
-  ];
+  ].filter(Boolean);
   if (row.FORMATTER)
     pairs.push([row.LOGTYPE === "E" ? "Command" : "Format", h("code", {}, row.FORMATTER)]);
   fill(
@@ -176,13 +170,18 @@ function drawState(element, log, configuration) {
     h("p", {}, h("span", { className: `state ${level}` }, state)),
     why && h("p", { className: `why ${level}` }, why),
     level === "bad" && h("p", { className: "hint" }, again(configuration)),
-    h(
-      "dl",
-      { className: "facts" },
-      pairs.map(([name, value]) => h("div", {}, h("dt", {}, name), h("dd", {}, value))),
-    ),
+    facts(pairs),
+    follow && h("h2", {}, "Following"),
+    follow && facts(followPairs(follow)),
   );
 }
+
+const facts = (pairs) =>
+  h(
+    "dl",
+    { className: "facts" },
+    pairs.map(([name, value]) => h("div", {}, h("dt", {}, name), h("dd", {}, value))),
+  );
 
 function drawUnmonitored(element, log, configuration) {
   const { level, state, why } = judgeUnmonitored(log);
@@ -199,9 +198,10 @@ function drawUnmonitored(element, log, configuration) {
 }
 
 function drawLedger(element, log) {
-  const { rejected = [], skipped = [] } = log.ledger || {};
+  const { rejected = [], skipped = [], follow } = log.ledger || {};
   fill(
     element,
+    follow && rangesPanel(follow),
     h(
       "section",
       { className: "panel flush" },

@@ -3,6 +3,7 @@
 import { get, post, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
 import { button, debounce, empty, failure, fill, h, loading, say, select, table } from "../dom.js";
+import { tableName, tablesPanel } from "../following.js";
 import { ago, briefTime, bytes, number, rate, rateText } from "../format.js";
 import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
@@ -42,6 +43,7 @@ class LogsPage {
   #seen = new Map(); // by log: [{at, lines}] of the answers of the last minutes
   #askedRates = -Infinity;
   #newest = null;
+  #tables = "";
 
   constructor(element) {
     this.counts = h("p", { className: "counts", role: "status" });
@@ -65,6 +67,7 @@ class LogsPage {
     this.cure = h("p", { className: "hint" });
     this.trouble = h("div", { role: "alert" });
     this.list = h("section", { className: "panel flush", "aria-label": "Logs" }, loading());
+    this.tables = h("div", {});
     this.lately = h("section", { className: "panel flush", "aria-label": "Recent events" });
     fill(
       element,
@@ -87,6 +90,7 @@ class LogsPage {
       this.trouble,
       this.cure,
       this.list,
+      this.tables,
       this.lately,
     );
   }
@@ -111,7 +115,7 @@ class LogsPage {
     return () => clearInterval(timer);
   }
 
-  #take({ logs, unmonitored, configuration, time }) {
+  #take({ logs, unmonitored, configuration, tables, time }) {
     this.logs = [
       ...logs.map((log) => ({ ...log, ...judge(log) })),
       ...unmonitored.map((log) => ({ ...log, ...judgeUnmonitored(log), row: null })),
@@ -124,7 +128,8 @@ class LogsPage {
       this.#seen.set(log, seen);
     }
     this.configuration = configuration;
-    this.isIdle = logs.length === 0;
+    this.hasTables = tables.length > 0;
+    this.isIdle = logs.length === 0 && !this.hasTables;
     say(
       this.trouble,
       configuration?.problem &&
@@ -134,7 +139,22 @@ class LogsPage {
           `The log configuration ${configuration.file} cannot be read: ${configuration.problem}. ` +
             "The agent keeps the logs it has, or uses the system's syslog configuration.",
         ),
+      tables
+        .filter(({ problem }) => problem)
+        .map((one) => h("p", { className: "panel problem" }, `${tableName(one)}: ${one.problem}`)),
     );
+    this.#drawTables(tables);
+  }
+
+  /** Leaves the panel alone while nothing changes, so that what is opened stays open. */
+  #drawTables(tables) {
+    const text = JSON.stringify(tables);
+    if (text === this.#tables) return;
+    this.#tables = text;
+    const open = [...this.tables.querySelectorAll("details[open]")].map((one) => one.dataset.key);
+    fill(this.tables, tables.length > 0 && tablesPanel(tables));
+    for (const one of this.tables.querySelectorAll("details"))
+      one.open = open.includes(one.dataset.key);
   }
 
   async #reread() {
@@ -280,8 +300,10 @@ class LogsPage {
         this.list,
         empty(
           "No log is monitored",
-          "The file that log_config names lists the logs, one path per line. Add one, then " +
-            "re-read the configuration. Without a log the agent ends after a minute.",
+          this.hasTables
+            ? "No [[log]] table matches a file now. The agent waits for one."
+            : "Name your logs in [[log]] tables of zrm.toml, then restart the agent: without a " +
+                "log it ends after a minute.",
           h("a", { className: "button", href: "#/try" }, "Create a line for a log"),
         ),
       );

@@ -1,0 +1,114 @@
+"""What the console shows of logs of [[log]] tables: where they come from, and what rotations cost."""
+
+from signal import SIGCONT, SIGSTOP
+
+import pytest
+from browser.conftest import harness, until
+
+from browser.support import failed_login
+
+
+@pytest.fixture
+def followed(agent):
+    """A log that is followed, beside files that its table passes over."""
+    directory = agent.directory / "logs"
+    directory.mkdir()
+    agent.app = harness.Log(directory / "app.log")
+    agent.app.path.write_text(failed_login(0))
+    (directory / "app.log.2.gz").write_bytes(b"")
+    agent.shared = agent.log("logs/shared.log")
+    agent.follow(directory / "*.log*", rotate_wait="1s")
+    agent.follow(agent.directory / "none" / "*.log")
+    agent.situation(log=agent.app)
+    agent.sink = agent.directory / "events"
+    agent.start()
+    agent.wait_open(agent.app)
+    return agent
+
+
+def ledger(page, log):
+    logs = page.api.request("GET", f"/api/v1/logs?log={log}")[2].get("logs") or [{}]
+    return logs[0].get("ledger") or {"follow": {"position": None, "behind": None}, "warnings": []}
+
+
+def lose_and_recover(agent, page):
+    """The log is truncated twice: a copy holds what was lost first, nothing holds the rest."""
+    log = agent.app
+    log.append(failed_login(1))
+    agent.wait_events(1)
+    agent.send(SIGSTOP)
+    log.append(failed_login(2))
+    log.path.with_name("app.log.1").write_bytes(log.path.read_bytes())
+    log.path.write_text(failed_login(3))
+    agent.send(SIGCONT)
+    agent.wait_events(3)
+    log.append("half a line")
+    until(lambda: ledger(page, log)["follow"]["behind"] == 11, "the half line to be seen")
+    log.path.write_bytes(b"")
+    until(lambda: ledger(page, log)["warnings"], "the warning")
+
+
+def test_a_followed_log_shows_what_was_recovered_and_lost(page, followed, fast_polls):
+    page.on(followed)
+    page.open_log(followed.app)
+    page.wait_text("Nothing was lost, and nothing had to be recovered.")
+    fact = "//dt[.='{}']/following-sibling::dd"
+    assert page.text_of(fact.format("State")) == "reading the file of this name"
+    assert page.text_of(fact.format("Generation")) == str(followed.app)
+    assert page.text_of(fact.format("Configured by")).startswith("[[log]] at line ")
+    assert "Truncations" not in page.text()
+    page.pictures("log-followed")
+    lose_and_recover(followed, page)
+    until(lambda: len(page.rows("Recovered and lost")) == 2, "both ranges")
+    lost, recovered = page.rows("Recovered and lost")
+    size = len(failed_login(3))
+    assert "Lost" in lost and f"{size} {size + 11} 11" in lost
+    assert "Recovered" in recovered and recovered.endswith(f"{followed.app}.1")
+    assert page.text_of(fact.format("Lost in rotations")) == "11 B"
+    page.wait_text(f"Bytes {size} to {size + 11} were lost at ")
+    assert page.text_of("//*[@class='state warn']") == "Lost bytes"
+    page.pictures("log-lost")
+    page.go("Logs")
+    page.wait_text("2 with warnings")
+    assert "Lost bytes" in page.text_of("//tbody/tr[contains(., 'app.log')]")
+    page.pictures("logs-lost")
+
+
+def test_the_tables_show_what_they_match_and_pass_over(page, followed, fast_polls):
+    page.on(followed)
+    page.wait_text("Tables of the configuration")
+    items = page.all("[aria-label=Tables] li")
+    assert "follows 1 file" in items[0].text and f"{followed.directory}/logs/*.log*" in items[0].text
+    assert "It is compressed." not in page.text()
+    page.find("//summary[normalize-space()='Passes over 2 files']").click()
+    page.wait_text(f"{followed.app}.2.gz It is compressed.")
+    page.wait_text(f"{followed.shared} The log configuration names it, too, and its line applies.")
+    page.wait_text("No file that can be followed matches now.")
+    page.pictures("logs-tables")
+    followed.app.path.with_name("app.log.3.gz").write_bytes(b"")
+    page.wait_text("Passes over 3 files", 30)
+    page.wait_text("It is compressed.")  # still open
+    page.open_log(followed.shared)
+    page.wait_text("Monitored since")
+    assert page.text_of("//dt[.='Configured by']/following-sibling::dd") == "log configuration"
+    page.open_log(f"{followed.app}.2.gz")
+    page.wait_text("This log is not monitored")
+    page.wait_text("passes over it: It is compressed.")
+    page.pictures("log-passed-over")
+    page.expect_complaints()
+
+
+def test_a_log_that_cannot_be_read_shows_why(page, followed, fast_polls):
+    page.on(followed)
+    directory = followed.app.path.parent
+    directory.rename(followed.directory / "hidden")
+    directory.symlink_to(directory)  # fails for every user
+    page.wait_text("Failing", 30)
+    page.wait_text("Too many levels of symbolic links")
+    page.open_log(followed.app)
+    page.wait_text("The log cannot be read at present")
+    assert "Too many levels of symbolic links" in page.text_of("//dt[.='Problem']/following-sibling::dd")
+    page.pictures("log-failing")
+    directory.unlink()
+    (followed.directory / "hidden").rename(directory)
+    until(lambda: page.text_of("//span[starts-with(@class, 'state')]") == "Running", "the end of the warning", 30)
