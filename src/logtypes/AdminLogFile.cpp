@@ -107,16 +107,9 @@ void AdminLogFile::processLogData() {
 
 void AdminLogFile::openAdminLog() {
     TraceScope trace(anchor);
-    int fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    if (fd >= 0 && DescriptorReserve::has(fd)) {
-        close(fd);
-        fd = -1;
-        errno = EMFILE;
-    }
-    LogFD = fd;
+    LogFD = DescriptorReserve::openLog(fileNameLocal());
     if (LogFD < 0) {
         const ErrorText error(errno);
-        DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s. errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
         setMonitorStatus(MONITOR_ERR_OPEN);

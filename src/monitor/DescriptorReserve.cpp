@@ -4,7 +4,9 @@
 #include <atomic>
 #include <cerrno>
 
+#include <fcntl.h>
 #include <sys/resource.h>
+#include <unistd.h>
 
 namespace zrm {
 
@@ -22,22 +24,29 @@ rlim_t limitOfDescriptors() {
     return isLimited ? limit.rlim_cur : 0;
 }
 
+bool isInReserve(int descriptor) {
+    // A new descriptor is always the lowest free one. A high number means that few are left.
+    const rlim_t limit = limitOfDescriptors();
+    return limit != 0 && static_cast<rlim_t>(descriptor) >= limit - DescriptorReserve::size();
+}
+
 } // namespace
 
 std::uint64_t DescriptorReserve::size() {
     return std::min(mostReserved, limitOfDescriptors() / partReserved);
 }
 
-bool DescriptorReserve::has(int descriptor) {
-    // A new descriptor is always the lowest free one. A high number means that few are left.
-    const rlim_t limit = limitOfDescriptors();
-    return limit != 0 && static_cast<rlim_t>(descriptor) >= limit - size();
-}
-
-void DescriptorReserve::noteFailure(int number) noexcept {
-    if (number == EMFILE || number == ENFILE) {
+int DescriptorReserve::openLog(const char* path) noexcept {
+    int descriptor = open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (descriptor >= 0 && isInReserve(descriptor)) {
+        close(descriptor);
+        descriptor = -1;
+        errno = EMFILE;
+    }
+    if (descriptor < 0 && (errno == EMFILE || errno == ENFILE)) {
         failed.fetch_add(1, std::memory_order_relaxed);
     }
+    return descriptor;
 }
 
 std::uint64_t DescriptorReserve::failures() noexcept {

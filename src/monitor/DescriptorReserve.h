@@ -14,11 +14,10 @@ namespace DescriptorReserve {
 /// of the limit if that is less.
 std::uint64_t size();
 
-/// True if the descriptor, just opened for a log, belongs to the reserve.
-bool has(int descriptor);
-
-/// Records with its errno that a log could not be opened. Counts it if descriptors ran out.
-void noteFailure(int number) noexcept;
+/// Opens a log's file for reading. Does not block: a pipe may be in its place. Returns the
+/// descriptor, or -1 with errno: EMFILE if only descriptors of the reserve are left. Counts the
+/// failure if descriptors ran out.
+int openLog(const char* path) noexcept;
 
 /// The number of failed opens of a log since the start because descriptors ran out.
 std::uint64_t failures() noexcept;

@@ -1,5 +1,7 @@
 #include "monitor/FileFollower.h"
 
+#include "base/WallTime.h"
+
 #include <algorithm>
 #include <cerrno>
 #include <ctime>
@@ -19,8 +21,7 @@ constexpr int mostReadFailures = 5; ///< of a file that others follow
 } // namespace
 
 FileFollower::Moment FileFollower::Moment::now() noexcept {
-    timespec wall{};
-    clock_gettime(CLOCK_REALTIME, &wall);
+    const std::timespec wall = wallTime();
     return {std::chrono::steady_clock::now(),
             static_cast<std::int64_t>(wall.tv_sec) * 1'000'000'000 + wall.tv_nsec};
 }

@@ -1,60 +1,35 @@
 #include "monitor/FollowLedger.h"
 
+#include "base/LockGuard.h"
+#include "base/WallTime.h"
+
 #include <algorithm>
 
 namespace zrm {
 
-namespace {
-
-class LedgerGuard {
-public:
-    explicit LedgerGuard(SYS1_Lock& lock) : m_lock(lock) { SYS1_GetLock(&m_lock); }
-    ~LedgerGuard() { SYS1_ReleaseLock(&m_lock); }
-    LedgerGuard(const LedgerGuard&) = delete;
-    LedgerGuard& operator=(const LedgerGuard&) = delete;
-
-private:
-    SYS1_Lock& m_lock;
-};
-
-std::timespec now() noexcept {
-    std::timespec time{};
-    clock_gettime(CLOCK_REALTIME, &time);
-    return time;
-}
-
-template <typename Range> void keep(std::vector<Range>& ranges, Range range) {
-    if (ranges.size() == FollowLedger::mostKept) {
-        ranges.erase(ranges.begin());
-    }
-    ranges.push_back(std::move(range));
-}
-
-} // namespace
-
 void FollowLedger::noteFailure(const char* call, int number) {
-    const LedgerGuard guard(m_lock);
-    m_failure = Failure{call, number, m_failure ? m_failure->since : now()};
+    const LockGuard guard(&m_lock);
+    m_failure = Failure{call, number, m_failure ? m_failure->since : wallTime()};
 }
 
 void FollowLedger::clearFailure() {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     m_failure.reset();
 }
 
 std::optional<FollowLedger::Failure> FollowLedger::failure() const {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     return m_failure;
 }
 
 void FollowLedger::noteGeneration(const FileIdentity& identity, const std::string& path) {
     m_count.fetch_add(1, std::memory_order_relaxed);
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     m_generation = Generation{identity, path};
 }
 
 std::optional<FollowLedger::Generation> FollowLedger::generation() const {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     return m_generation;
 }
 
@@ -65,30 +40,32 @@ void FollowLedger::notePosition(std::int64_t offset, std::int64_t behind) noexce
 
 void FollowLedger::noteRecovered(const std::string& source, std::int64_t from, std::int64_t to) {
     m_recoveredBytes.fetch_add(to - from, std::memory_order_relaxed);
-    const LedgerGuard guard(m_lock);
-    if (!m_recovered.empty() && m_recovered.back().source == source &&
-        m_recovered.back().to == from) {
-        m_recovered.back().to = to;
-    } else {
-        keep(m_recovered, Recovered{now(), source, from, to});
+    const LockGuard guard(&m_lock);
+    Recovered* const newest = m_recovered.newest();
+    if (newest != nullptr && newest->source == source && newest->to == from) {
+        newest->to = to;
+    } else if (Recovered* const next = m_recovered.next()) {
+        *next = {wallTime(), source, from, to};
     }
 }
 
 void FollowLedger::noteLost(std::int64_t from, std::int64_t to) {
     m_lostBytes.fetch_add(to - from, std::memory_order_relaxed);
     m_losses.fetch_add(1, std::memory_order_relaxed);
-    const LedgerGuard guard(m_lock);
-    keep(m_lost, Lost{now(), from, to});
+    const LockGuard guard(&m_lock);
+    if (Lost* const lost = m_lost.next()) {
+        *lost = {wallTime(), from, to};
+    }
 }
 
 std::vector<FollowLedger::Recovered> FollowLedger::recovered() const {
-    const LedgerGuard guard(m_lock);
-    return m_recovered;
+    const LockGuard guard(&m_lock);
+    return m_recovered.all();
 }
 
 std::vector<FollowLedger::Lost> FollowLedger::lost() const {
-    const LedgerGuard guard(m_lock);
-    return m_lost;
+    const LockGuard guard(&m_lock);
+    return m_lost.all();
 }
 
 const char* followStateText(FollowLedger::State state) noexcept {

@@ -3,6 +3,7 @@
 
 #include "framework/locks.h"
 #include "monitor/FileIdentity.h"
+#include "monitor/Latest.h"
 
 #include <atomic>
 #include <cstdint>
@@ -102,8 +103,8 @@ private:
     mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<Failure> m_failure;
     std::optional<Generation> m_generation;
-    std::vector<Recovered> m_recovered;
-    std::vector<Lost> m_lost;
+    Latest<Recovered, mostKept> m_recovered;
+    Latest<Lost, mostKept> m_lost;
 };
 
 /// The state as a word for people and programs: "waiting", "reading", ...

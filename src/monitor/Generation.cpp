@@ -60,14 +60,8 @@ std::unique_ptr<Generation> Generation::open(const std::string& path) {
         errno = ENOENT;
         return nullptr;
     }
-    int descriptor = ::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    if (descriptor >= 0 && DescriptorReserve::has(descriptor)) {
-        ::close(descriptor);
-        descriptor = -1;
-        errno = EMFILE;
-    }
+    const int descriptor = DescriptorReserve::openLog(path.c_str());
     if (descriptor < 0) {
-        DescriptorReserve::noteFailure(errno);
         return nullptr;
     }
     if (fstat(descriptor, &status) != 0 || !S_ISREG(status.st_mode)) {

@@ -46,16 +46,10 @@ void LogFile::count(std::atomic<std::int64_t>& counter) noexcept {
 
 void LogFile::openLogAndSeek() {
     TraceScope trace(anchor);
-    // Must not block: a pipe in place of the log has no end to seek to.
-    int fd = open(fileNameLocal(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    if (fd >= 0 && DescriptorReserve::has(fd)) {
-        close(fd);
-        fd = -1;
-        errno = EMFILE;
-    }
+    // A pipe in place of the log has no end to seek to.
+    const int fd = DescriptorReserve::openLog(fileNameLocal());
     if (fd < 0) {
         const ErrorText error(errno);
-        DescriptorReserve::noteFailure(error.number());
         trace.error()("Error opening file %s.  errno = %d; %s", fileNameLocal(), error.number(),
                       error.text());
         setMonitorStatus(MONITOR_ERR_OPEN);

@@ -1,29 +1,14 @@
 #include "monitor/LogLedger.h"
 
+#include "base/LockGuard.h"
+#include "base/WallTime.h"
+
 #include <algorithm>
 #include <cstring>
-#include <new>
 
 namespace zrm {
 
 namespace {
-
-class LedgerGuard {
-public:
-    explicit LedgerGuard(SYS1_Lock& lock) : m_lock(lock) { SYS1_GetLock(&m_lock); }
-    ~LedgerGuard() { SYS1_ReleaseLock(&m_lock); }
-    LedgerGuard(const LedgerGuard&) = delete;
-    LedgerGuard& operator=(const LedgerGuard&) = delete;
-
-private:
-    SYS1_Lock& m_lock;
-};
-
-std::timespec now() noexcept {
-    std::timespec time{};
-    clock_gettime(CLOCK_REALTIME, &time);
-    return time;
-}
 
 /// Adds without an atomic read-modify-write: only one thread writes the counter.
 void add(std::atomic<std::int64_t>& counter, std::int64_t count) noexcept {
@@ -32,29 +17,13 @@ void add(std::atomic<std::int64_t>& counter, std::int64_t count) noexcept {
 
 } // namespace
 
-/// The slot for the next entry, replacing the oldest once there are mostKept; null without memory.
-template <typename Entry> Entry* LogLedger::Latest<Entry>::next() noexcept {
-    if (!entries) {
-        entries.reset(new (std::nothrow) Entry[mostKept]);
-    }
-    return entries ? &entries[count++ % mostKept] : nullptr;
-}
-
-template <typename Entry> std::size_t LogLedger::Latest<Entry>::copy(Entry* out) const noexcept {
-    const std::size_t kept = std::min(count, mostKept);
-    for (std::size_t i = 0; i < kept; ++i) {
-        out[i] = entries[(count - kept + i) % mostKept];
-    }
-    return kept;
-}
-
 void LogLedger::noteFile(const std::optional<FileIdentity>& file) noexcept {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     m_file = file;
 }
 
 std::optional<FileIdentity> LogLedger::file() const noexcept {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     return m_file;
 }
 
@@ -64,16 +33,16 @@ void LogLedger::addBytes(std::int64_t count) noexcept {
 
 void LogLedger::noteEntries() noexcept {
     constexpr std::int64_t nanoseconds = 1'000'000'000;
-    const std::timespec time = now();
+    const std::timespec time = wallTime();
     m_lastEntry.store(time.tv_sec * nanoseconds + time.tv_nsec, std::memory_order_relaxed);
 }
 
 void LogLedger::noteRejected(const char* line) noexcept {
     std::size_t length = strnlen(line, sizeof RejectedLine::text);
     length -= length > 0 && line[length - 1] == '\n' ? 1 : 0;
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     if (RejectedLine* const rejected = m_rejectedLines.next()) {
-        rejected->time = now();
+        rejected->time = wallTime();
         rejected->length = length;
         std::memcpy(rejected->text, line, length);
     }
@@ -82,9 +51,9 @@ void LogLedger::noteRejected(const char* line) noexcept {
 void LogLedger::noteTruncated(Truncation kind, std::int64_t from, std::int64_t unread) noexcept {
     add(m_truncations, 1);
     add(m_skipped, from + std::max<std::int64_t>(unread, 0));
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     if (SkippedRange* const skipped = m_skippedRanges.next()) {
-        *skipped = {now(), 0, from, unread, kind};
+        *skipped = {wallTime(), 0, from, unread, kind};
     }
 }
 
@@ -93,12 +62,12 @@ std::int64_t LogLedger::restarts() const noexcept {
 }
 
 std::size_t LogLedger::copyRejected(RejectedLine* lines) const noexcept {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     return m_rejectedLines.copy(lines);
 }
 
 std::size_t LogLedger::copySkipped(SkippedRange* ranges) const noexcept {
-    const LedgerGuard guard(m_lock);
+    const LockGuard guard(&m_lock);
     return m_skippedRanges.copy(ranges);
 }
 

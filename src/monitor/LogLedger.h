@@ -3,12 +3,12 @@
 
 #include "framework/locks.h"
 #include "monitor/FileIdentity.h"
+#include "monitor/Latest.h"
 
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <ctime>
-#include <memory>
 #include <optional>
 
 namespace zrm {
@@ -92,14 +92,6 @@ public:
     std::size_t copySkipped(SkippedRange* ranges) const noexcept;
 
 private:
-    template <typename Entry> struct Latest {
-        std::unique_ptr<Entry[]> entries; ///< mostKept of them, or null
-        std::size_t count = 0;            ///< written so far
-
-        Entry* next() noexcept;
-        std::size_t copy(Entry* out) const noexcept;
-    };
-
     std::atomic<std::int64_t> m_bytes{0};
     std::atomic<std::int64_t> m_truncations{0};
     std::atomic<std::int64_t> m_skipped{0};
@@ -108,8 +100,8 @@ private:
     std::atomic<std::int64_t> m_lastEntry{0};
     mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<FileIdentity> m_file;
-    Latest<RejectedLine> m_rejectedLines;
-    Latest<SkippedRange> m_skippedRanges;
+    Latest<RejectedLine, mostKept> m_rejectedLines;
+    Latest<SkippedRange, mostKept> m_skippedRanges;
 };
 
 } // namespace zrm
