@@ -25,17 +25,31 @@ def disk(tmp_path_factory):
     return library.parent
 
 
-@pytest.mark.parametrize("kind", ("full", "frozen"))
-@pytest.mark.parametrize("refresh", (False, True))
-def test_a_disk_that_takes_nothing_delays_neither_signals_nor_requests(
-    agent, disk, kind, refresh
-):
+def use_disk(agent, disk, kind, **environment):
+    """Gives the agent a disk of this kind; it takes nothing while the returned file exists."""
     flag = agent.directory / "flag"
     agent.environment = {
         "LD_PRELOAD": str(disk / f"{kind}_disk.so"),
         f"{kind.upper()}_DISK": str(flag),
         "ASAN_OPTIONS": "verify_asan_link_order=0",
+        **environment,
     }
+    return flag
+
+
+def refresh_onto(agent, log):
+    """Makes this the only log, and waits until the agent watches it."""
+    agent.configure(str(log))
+    agent.refresh()
+    agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+
+
+@pytest.mark.parametrize("kind", ("full", "frozen"))
+@pytest.mark.parametrize("refresh", (False, True))
+def test_a_disk_that_takes_nothing_delays_neither_signals_nor_requests(
+    agent, disk, kind, refresh
+):
+    flag = use_disk(agent, disk, kind)
     agent.listen = "127.0.0.1:0"
     log, other = agent.log(), agent.log("other.log")
     agent.situation()
@@ -45,9 +59,7 @@ def test_a_disk_that_takes_nothing_delays_neither_signals_nor_requests(
     flood(log, 10_000)
     wait_until(lambda: queue_is_full(api), "a full queue")
     if refresh:
-        agent.configure(str(other))
-        agent.refresh()
-        agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+        refresh_onto(agent, other)
     answers(api)
     begin = time.monotonic()
     api.request("GET", "/api/v1/events")
@@ -61,13 +73,7 @@ def test_a_disk_that_takes_nothing_delays_neither_signals_nor_requests(
 
 @pytest.mark.parametrize("history", (True, False))
 def test_a_sink_on_a_frozen_disk_delays_neither_signals_nor_requests(agent, disk, history):
-    flag = agent.directory / "flag"
-    agent.environment = {
-        "LD_PRELOAD": str(disk / "frozen_disk.so"),
-        "FROZEN_DISK": str(flag),
-        "FROZEN_FILES": ".jsonl",
-        "ASAN_OPTIONS": "verify_asan_link_order=0",
-    }
+    flag = use_disk(agent, disk, "frozen", FROZEN_FILES=".jsonl")
     agent.history = {"enabled": history}
     agent.sink = agent.directory / "events.jsonl"
     agent.listen = "127.0.0.1:0"
@@ -83,9 +89,7 @@ def test_a_sink_on_a_frozen_disk_delays_neither_signals_nor_requests(agent, disk
         )
     else:
         wait_until(lambda: queue_stands_still(api), "a full queue")
-    agent.configure(str(other))
-    agent.refresh()
-    agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+    refresh_onto(agent, other)
     answers(api)
     stop(agent)
     assert agent.sink.read_bytes() == b""

@@ -23,8 +23,14 @@ namespace {
 
 using testing::Contains;
 using testing::ElementsAre;
+using testing::ElementsAreArray;
 using testing::HasSubstr;
 using testing::IsEmpty;
+
+constexpr const char* messagesOfDefaults[] = {
+    "No ZRM_CONFIG_FILE environment variable specified.",
+    "No ZRM_SYSLOG_CONF environment variable specified; using default file /etc/syslog.conf.",
+    "No \"AGENT_DEBUG_LOG\" environment variable specified. Agent debug mode is OFF."};
 
 /// A manager that monitors one log, or, in its variants, none.
 class LogManagerTest : public LogManagerFixture {
@@ -54,12 +60,7 @@ TEST_F(LogManagerTest, ReadsItsEnvironment) {
 
 TEST_F(LogManagerTest, HasDefaultsForAnUnsetEnvironment) {
     manager = std::make_unique<LogManager>();
-    EXPECT_THAT(environmentMessages(),
-                ElementsAre("No ZRM_CONFIG_FILE environment variable specified.",
-                            "No ZRM_SYSLOG_CONF environment variable specified; using default "
-                            "file /etc/syslog.conf.",
-                            "No \"AGENT_DEBUG_LOG\" environment variable specified. Agent debug "
-                            "mode is OFF."));
+    EXPECT_THAT(environmentMessages(), ElementsAreArray(messagesOfDefaults));
     manager->printSelf();
     EXPECT_THAT(trace.messages(),
                 Contains(HasSubstr("SyslogConfFile\t\t\t= \"/etc/syslog.conf\"")));
@@ -70,12 +71,7 @@ TEST_F(LogManagerTest, TreatsEmptyEnvironmentVariablesAsUnset) {
         setenv(name, "", 1);
     }
     manager = std::make_unique<LogManager>();
-    EXPECT_THAT(environmentMessages(),
-                ElementsAre("No ZRM_CONFIG_FILE environment variable specified.",
-                            "No ZRM_SYSLOG_CONF environment variable specified; using default "
-                            "file /etc/syslog.conf.",
-                            "No \"AGENT_DEBUG_LOG\" environment variable specified. Agent debug "
-                            "mode is OFF."));
+    EXPECT_THAT(environmentMessages(), ElementsAreArray(messagesOfDefaults));
 }
 
 TEST_F(LogManagerTest, TracesItsStartAndStopInTheDetailClass) {

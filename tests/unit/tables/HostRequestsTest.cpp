@@ -13,6 +13,7 @@
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
+#include "unit/host/framework/Conditions.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -65,23 +66,6 @@ zrm_rmlogent_data_t rowOf(std::string_view logname, int number, long time = now)
     return row;
 }
 
-Condition text(const std::string& column, _IntfOper op, const std::string& value) {
-    Condition condition;
-    condition.column = column;
-    condition.op = op;
-    condition.text = value;
-    return condition;
-}
-
-Condition number(const std::string& column, _IntfOper op, std::int64_t value) {
-    Condition condition;
-    condition.column = column;
-    condition.op = op;
-    condition.number = value;
-    condition.isNumber = true;
-    return condition;
-}
-
 RequestDetail situation(std::vector<Condition> conditions) {
     RequestDetail detail;
     detail.name = "alpha";
@@ -110,8 +94,8 @@ protected:
 
 TEST_F(HostRequests, ASituationReceivesTheRowsOfItsLog) {
     const Request request(logEntries(),
-                          situation({text("LOGPATH", INTF_EQUAL, "/var/log/"),
-                                     text("LOGNAME", INTF_EQUAL, "auth.log")}),
+                          situation({textCondition("LOGPATH", INTF_EQUAL, "/var/log/"),
+                                     textCondition("LOGNAME", INTF_EQUAL, "auth.log")}),
                           m_receiver);
     ASSERT_TRUE(request.isOpen());
     arrive(rowOf("auth.log", 1));
@@ -142,9 +126,9 @@ TEST_F(HostRequests, ThresholdConditionsHoldForTheRowsTheyLetThrough) {
     for (const Case& test : cases) {
         Receiver receiver;
         const Request request(logEntries(),
-                              situation({text("LOGNAME", INTF_EQUAL, "auth.log"),
-                                         number("FREQTHRESH", test.op, test.value),
-                                         number("PERIODTHRS", INTF_EQUAL, 60)}),
+                              situation({textCondition("LOGNAME", INTF_EQUAL, "auth.log"),
+                                         numberCondition("FREQTHRESH", test.op, test.value),
+                                         numberCondition("PERIODTHRS", INTF_EQUAL, 60)}),
                               receiver);
         for (int i = 1; i <= 3; ++i) {
             arrive(rowOf("syslog", 100)); // does not count
@@ -156,10 +140,12 @@ TEST_F(HostRequests, ThresholdConditionsHoldForTheRowsTheyLetThrough) {
 
 TEST_F(HostRequests, IncompleteThresholdsLetEveryRowThrough) {
     const std::vector<std::vector<Condition>> inert = {
-        {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1), number("PERIODTHRS", INTF_EQUAL, 0)},
-        {number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1)},
-        {number("FREQTHRESH", INTF_LESS, 1), number("PERIODTHRS", INTF_EQUAL, 60)},
-        {number("PERIODTHRS", INTF_EQUAL, 60)},
+        {numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1),
+         numberCondition("PERIODTHRS", INTF_EQUAL, 0)},
+        {numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1)},
+        {numberCondition("FREQTHRESH", INTF_LESS, 1),
+         numberCondition("PERIODTHRS", INTF_EQUAL, 60)},
+        {numberCondition("PERIODTHRS", INTF_EQUAL, 60)},
     };
     for (const std::vector<Condition>& conditions : inert) {
         Receiver receiver;
@@ -171,10 +157,10 @@ TEST_F(HostRequests, IncompleteThresholdsLetEveryRowThrough) {
 }
 
 TEST_F(HostRequests, AThresholdThatTheTableRefusesLetsEveryRowThrough) {
-    const Request request(
-        logEntries(),
-        situation({number("FREQTHRESH", INTF_EQUAL, 3), number("PERIODTHRS", INTF_EQUAL, 60)}),
-        m_receiver);
+    const Request request(logEntries(),
+                          situation({numberCondition("FREQTHRESH", INTF_EQUAL, 3),
+                                     numberCondition("PERIODTHRS", INTF_EQUAL, 60)}),
+                          m_receiver);
     EXPECT_THAT(m_trace.messages(), ElementsAre("Invalid FREQTHRESH threshold compare operator; "
                                                 "value is 1. Threshold ignored."));
     m_trace.clear();
@@ -187,11 +173,12 @@ TEST_F(HostRequests, AReportReadsTheLogNamedByItsEqualConditions) {
     logs.add("/var/log/auth.log").entries = 3;
     logs.add("/var/log/syslog").entries = 5;
     const auto sample = Sample::take(
-        "RMLOGENT",
-        {text("LOGNAME", INTF_NOT_EQUAL, "syslog"), text("LOGPATH", INTF_STARTS, "/var"),
-         text("LOGPATH", INTF_EQUAL, "/var/log/"), text("LOGNAME", INTF_EQUAL, "auth.log"),
-         text("ENTRYTIME", INTF_GREATER_OR_EQUAL, "1260101"),
-         text("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
+        "RMLOGENT", {textCondition("LOGNAME", INTF_NOT_EQUAL, "syslog"),
+                     textCondition("LOGPATH", INTF_STARTS, "/var"),
+                     textCondition("LOGPATH", INTF_EQUAL, "/var/log/"),
+                     textCondition("LOGNAME", INTF_EQUAL, "auth.log"),
+                     textCondition("ENTRYTIME", INTF_GREATER_OR_EQUAL, "1260101"),
+                     textCondition("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
     ASSERT_TRUE(sample.has_value());
     EXPECT_EQ(sample->size(), 3U);
     EXPECT_THAT(logs.calls, ElementsAre("begin", "find /var/log/auth.log", "end"));
@@ -200,11 +187,11 @@ TEST_F(HostRequests, AReportReadsTheLogNamedByItsEqualConditions) {
 TEST_F(HostRequests, ReportsReadTheLogNamedByTheirConditions) {
     TestLogs logs;
     logs.add("/var/log/auth.log").entries = 45;
-    const auto sample =
-        Sample::take("RMLOGENT", {text("LOGPATH", INTF_EQUAL, "/var/log/"),
-                                  text("LOGNAME", INTF_EQUAL, "auth.log"),
-                                  text("ENTRYTIME", INTF_GREATER_OR_EQUAL, "1260101"),
-                                  text("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
+    const auto sample = Sample::take(
+        "RMLOGENT", {textCondition("LOGPATH", INTF_EQUAL, "/var/log/"),
+                     textCondition("LOGNAME", INTF_EQUAL, "auth.log"),
+                     textCondition("ENTRYTIME", INTF_GREATER_OR_EQUAL, "1260101"),
+                     textCondition("ENTRYTIME", INTF_LESS_OR_EQUAL, "1270101000000000")});
     ASSERT_TRUE(sample.has_value());
     EXPECT_EQ(sample->size(), 45U);
     // A short time is used unchanged, so it still compares as a text.
@@ -220,7 +207,8 @@ TEST_F(HostRequests, MonitoredLogsAreSampled) {
     for (const char* const name : {"auth.log", "syslog", "other"}) {
         logs.add(directory.write(name, ""));
     }
-    const auto sample = Sample::take("RMMONLOG", {text("LOGNAME", INTF_NOT_EQUAL, "syslog")});
+    const auto sample =
+        Sample::take("RMMONLOG", {textCondition("LOGNAME", INTF_NOT_EQUAL, "syslog")});
     ASSERT_TRUE(sample.has_value());
     ASSERT_EQ(sample->size(), 2U);
     const RowColumn* const name = sample->layout().find("LOGNAME");
@@ -233,10 +221,10 @@ TEST_F(HostRequests, RefusedRowsCostNoAllocation) {
     for (int i = 0; i < 100; ++i) {
         requests.push_back(std::make_unique<Request>(
             logEntries(),
-            situation({text("LOGNAME", INTF_EQUAL, "auth.log"),
-                       text("ENTRYDESC", INTF_EQUAL, "situation " + std::to_string(i)),
-                       number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 5),
-                       number("PERIODTHRS", INTF_EQUAL, 60)}),
+            situation({textCondition("LOGNAME", INTF_EQUAL, "auth.log"),
+                       textCondition("ENTRYDESC", INTF_EQUAL, "situation " + std::to_string(i)),
+                       numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 5),
+                       numberCondition("PERIODTHRS", INTF_EQUAL, 60)}),
             m_receiver));
     }
     zrm_rmlogent_data_t row = rowOf("auth.log", 1);
@@ -252,9 +240,9 @@ TEST_F(HostRequests, RefusedRowsCostNoAllocation) {
 TEST_F(HostRequests, ARowKeepsTheLastRequestsThresholdsEvenIfItIsSkipped) {
     const Request first(logEntries(), situation({}), m_receiver);
     const auto conditions = [](std::string log, int frequency, int period) {
-        return situation({text("LOGNAME", INTF_EQUAL, std::move(log)),
-                          number("FREQTHRESH", INTF_GREATER_OR_EQUAL, frequency),
-                          number("PERIODTHRS", INTF_EQUAL, period)});
+        return situation({textCondition("LOGNAME", INTF_EQUAL, std::move(log)),
+                          numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, frequency),
+                          numberCondition("PERIODTHRS", INTF_EQUAL, period)});
     };
     const Request second(logEntries(), conditions("syslog", 5, 60), m_receiver);
     zrm_rmlogent_data_t row = rowOf("auth.log", 1);
@@ -270,9 +258,9 @@ TEST_F(HostRequests, ARowKeepsTheLastRequestsThresholdsEvenIfItIsSkipped) {
 }
 
 TEST_F(HostRequests, NoRequestIsSkippedWhileTheTraceWouldShowIt) {
-    const Request mine(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "auth.log")}),
+    const Request mine(logEntries(), situation({textCondition("LOGNAME", INTF_EQUAL, "auth.log")}),
                        m_receiver);
-    const Request other(logEntries(), situation({text("LOGNAME", INTF_EQUAL, "syslog")}),
+    const Request other(logEntries(), situation({textCondition("LOGNAME", INTF_EQUAL, "syslog")}),
                         m_receiver);
     arrive(rowOf("auth.log", 1));
     m_trace.setLevel(TRC1_FINE);
@@ -304,8 +292,8 @@ TEST_F(HostRequests, SituationsComeAndGoWhileRowsArrive) {
     do {
         Receiver receiver;
         const Request passing(logEntries(),
-                              situation({number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1),
-                                         number("PERIODTHRS", INTF_EQUAL, 60)}),
+                              situation({numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1),
+                                         numberCondition("PERIODTHRS", INTF_EQUAL, 60)}),
                               receiver);
         ASSERT_TRUE(passing.isOpen());
     } while (running != 0);

@@ -14,6 +14,7 @@
 #include "support/RecordingTrace.h"
 #include "tables/zrm_rmlogent_manager.h"
 #include "unit/host/analysis/TestLog.h"
+#include "unit/host/framework/Conditions.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -99,19 +100,10 @@ std::string randomCondition(Random& random) {
     }
 }
 
-Condition threshold(const char* column, _IntfOper op, std::int64_t number) {
-    Condition condition;
-    condition.column = column;
-    condition.op = op;
-    condition.number = number;
-    condition.isNumber = true;
-    return condition;
-}
-
 const std::vector<Condition> inertThresholds = {
-    threshold("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1), threshold("FREQTHRESH", INTF_LESS, 1),
-    threshold("FREQTHRESH", INTF_EQUAL, 3), threshold("PERIODTHRS", INTF_EQUAL, 0),
-    threshold("PERIODTHRS", INTF_EQUAL, 60)};
+    numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 1),
+    numberCondition("FREQTHRESH", INTF_LESS, 1), numberCondition("FREQTHRESH", INTF_EQUAL, 3),
+    numberCondition("PERIODTHRS", INTF_EQUAL, 0), numberCondition("PERIODTHRS", INTF_EQUAL, 60)};
 
 SituationConfig randomSituation(Random& random, std::size_t number) {
     SituationText text;

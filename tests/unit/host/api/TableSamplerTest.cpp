@@ -50,10 +50,7 @@ TEST_F(TableSamplerTest, ReturnsRowsAsJson) {
 }
 
 TEST_F(TableSamplerTest, ReturnsTheRowsThatMeetTheConditions) {
-    Condition condition;
-    condition.column = "NUMBER";
-    condition.isNumber = true;
-    condition.number = 2;
+    Condition condition = numberCondition("NUMBER", INTF_EQUAL, 2);
     EXPECT_EQ(sampler.take("RMLOGENT", {condition}).count, 1u);
     condition.number = 3;
     const SampleSource::Rows none = sampler.take("RMLOGENT", {condition});
@@ -62,10 +59,7 @@ TEST_F(TableSamplerTest, ReturnsTheRowsThatMeetTheConditions) {
 }
 
 TEST_F(TableSamplerTest, IsTruncatedWhenTheAgentReadAsManyRowsAsItMay) {
-    Condition condition;
-    condition.column = "NUMBER";
-    condition.isNumber = true;
-    condition.number = 2;
+    const Condition condition = numberCondition("NUMBER", INTF_EQUAL, 2);
     gMaxRows = 3;
     EXPECT_FALSE(sampler.take("RMLOGENT", {condition}).truncated);
     rows = 3;
@@ -78,13 +72,9 @@ TEST_F(TableSamplerTest, ALogIsMonitoredWhenItsNameIsInTheTable) {
     TestManager logs{"RMMONLOG"};
     TableManager::RegisterWithManager(&logs);
     logs.onCreate = entries.onCreate;
-    Condition name;
-    name.column = "LOGNAME";
-    name.text = "a\"b.log";
-    Condition other; // the conditions of a report that do not name its log are not for this table
-    other.column = "NUMBER";
-    other.isNumber = true;
-    other.number = 5;
+    Condition name = textCondition("LOGNAME", INTF_EQUAL, "a\"b.log");
+    // The conditions of a report that do not name its log are not for this table.
+    const Condition other = numberCondition("NUMBER", INTF_EQUAL, 5);
     EXPECT_TRUE(sampler.isMonitored({name, other}));
     name.text = "b.log";
     EXPECT_FALSE(sampler.isMonitored({name, other}));

@@ -4,6 +4,7 @@
 #include "framework/TableManager.h"
 #include "framework/ctreq.h"
 #include "host/framework/Request.h"
+#include "unit/host/framework/Conditions.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -127,32 +128,5 @@ public:
     std::vector<int> numbers;
     std::vector<unsigned> reasons;
 };
-
-inline Condition textCondition(std::string column, _IntfOper op, std::string text) {
-    Condition condition;
-    condition.column = std::move(column);
-    condition.op = op;
-    condition.text = std::move(text);
-    return condition;
-}
-
-inline Condition numberCondition(std::string column, _IntfOper op, std::int64_t number) {
-    Condition condition;
-    condition.column = std::move(column);
-    condition.op = op;
-    condition.number = number;
-    condition.isNumber = true;
-    return condition;
-}
-
-inline Condition listCondition(std::string column, std::vector<std::string> values,
-                               bool isNumber = false) {
-    Condition condition;
-    condition.column = std::move(column);
-    condition.op = INTF_IN;
-    condition.values = std::move(values);
-    condition.isNumber = isNumber;
-    return condition;
-}
 
 #endif

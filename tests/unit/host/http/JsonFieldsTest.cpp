@@ -1,6 +1,6 @@
 #include "host/http/JsonFields.h"
 
-#include "host/http/RequestRefused.h"
+#include "unit/host/http/RefusalOf.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -16,17 +16,8 @@ namespace {
 
 using testing::ElementsAre;
 
-/// Field and detail of the refusal; "accepted" without one.
 std::string refused(const std::string& body, const std::function<void(JsonFields&)>& read) {
-    try {
-        JsonFields fields(body);
-        read(fields);
-        fields.refuseUnknown();
-    } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.refusal().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().text();
-    }
-    return "accepted";
+    return refusalOf<JsonFields>(body, read);
 }
 
 void nothing(JsonFields& /*fields*/) {}

@@ -1,6 +1,6 @@
 #include "host/http/QueryFields.h"
 
-#include "host/http/RequestRefused.h"
+#include "unit/host/http/RefusalOf.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -20,19 +20,9 @@ HttpRequest requestOf(std::multimap<std::string, std::string> query) {
     return request;
 }
 
-/// Field and detail of the refusal; "accepted" without one.
 std::string refused(std::multimap<std::string, std::string> query,
                     const std::function<void(QueryFields&)>& read) {
-    const HttpRequest request = requestOf(std::move(query));
-    try {
-        QueryFields fields(request);
-        read(fields);
-        fields.refuseUnknown();
-    } catch (const RequestRefused& refusal) {
-        EXPECT_EQ(refusal.refusal().status, 400);
-        return refusal.problem().field + ": " + refusal.problem().text();
-    }
-    return "accepted";
+    return refusalOf<QueryFields>(requestOf(std::move(query)), read);
 }
 
 TEST(QueryFields, ReturnsParametersByType) {

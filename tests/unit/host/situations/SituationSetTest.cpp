@@ -27,31 +27,15 @@ using namespace std::chrono_literals;
 using Clock = EventQueue::Clock;
 using testing::ElementsAre;
 
-Condition text(const char* column, const char* value) {
-    Condition condition;
-    condition.column = column;
-    condition.text = value;
-    return condition;
-}
-
-Condition number(const char* column, _IntfOper op, int value) {
-    Condition condition;
-    condition.column = column;
-    condition.op = op;
-    condition.number = value;
-    condition.isNumber = true;
-    return condition;
-}
-
 SituationConfig situation(const std::string& name, std::vector<Condition> conditions) {
     return {name, "", "minor", std::move(conditions)};
 }
 
 /// At least two entries of a source within an hour.
 SituationConfig twoOf(const char* source) {
-    return situation("two",
-                     {text("ENTRYSRC", source), number("FREQTHRESH", INTF_GREATER_OR_EQUAL, 2),
-                      number("PERIODTHRS", INTF_EQUAL, 3600)});
+    return situation("two", {textCondition("ENTRYSRC", INTF_EQUAL, source),
+                             numberCondition("FREQTHRESH", INTF_GREATER_OR_EQUAL, 2),
+                             numberCondition("PERIODTHRS", INTF_EQUAL, 3600)});
 }
 
 /// The time in the form of rows.
@@ -91,7 +75,8 @@ protected:
 };
 
 TEST_F(SituationSetTest, RowsThatMeetTheConditionsBecomeEvents) {
-    situations.apply({situation("ssh", {text("ENTRYSRC", "sshd")}), situation("every", {})});
+    situations.apply({situation("ssh", {textCondition("ENTRYSRC", INTF_EQUAL, "sshd")}),
+                      situation("every", {})});
     EXPECT_EQ(situations.size(), 2u);
     EXPECT_EQ(arrive("cron"), 0u);
     EXPECT_THAT(raised(), ElementsAre("every"));
@@ -132,7 +117,8 @@ TEST_F(SituationSetTest, ARemovedSituationRaisesNothingMore) {
 TEST_F(SituationSetTest, AnUnchangedSituationKeepsItsCounts) {
     situations.apply({twoOf("sshd")});
     arrive("sshd");
-    situations.apply({situation("another", {text("ENTRYSRC", "cron")}), twoOf("sshd")});
+    situations.apply(
+        {situation("another", {textCondition("ENTRYSRC", INTF_EQUAL, "cron")}), twoOf("sshd")});
     arrive("sshd");
     EXPECT_THAT(raised(), ElementsAre("two"));
 }
