@@ -28,6 +28,7 @@ EventQueue::Reader EventQueue::addReader() {
     const std::lock_guard guard(m_mutex);
     m_cursor.push_back(m_next);
     m_awaited.push_back(nobody);
+    m_woken.push_back(0);
     return m_cursor.size() - 1;
 }
 
@@ -145,11 +146,13 @@ void EventQueue::waitForEvents(std::unique_lock<std::mutex>& lock, Reader reader
     }
     m_awaited[reader] = m_cursor[reader] + 1;
     const auto hasThem = [&] { return m_closed || m_next >= m_awaited[reader]; };
+    const auto isOver = [&] { return hasThem() || m_woken[reader] != m_wakes; };
     if (limit == Clock::time_point::max()) {
-        m_changed.wait(lock, hasThem);
+        m_changed.wait(lock, isOver);
     } else {
-        m_changed.wait_until(lock, limit, hasThem);
+        m_changed.wait_until(lock, limit, isOver);
     }
+    m_woken[reader] = m_wakes;
     if (m_cursor[reader] != m_next) {
         // Waking a thread costs more than an event, so one wake-up should serve many.
         m_awaited[reader] = m_cursor[reader] + quarter();
@@ -178,6 +181,14 @@ void EventQueue::release(Reader reader, std::size_t count) {
             m_changed.notify_all(); // other readers waiting for the events kept aside
         }
     }
+}
+
+void EventQueue::wake() {
+    {
+        const std::lock_guard guard(m_mutex);
+        ++m_wakes;
+    }
+    m_changed.notify_all();
 }
 
 bool EventQueue::ended(Reader reader) const {

@@ -65,10 +65,14 @@ public:
 
     /// Waits for events until the limit, and a few milliseconds for more once the first has
     /// arrived. Returns the oldest ones that the reader has not released, at most `most`; they stay
-    /// unchanged until released. Empty only when none arrived in time, or when the queue is closed
-    /// and the reader has released everything.
+    /// unchanged until released. Empty only when none arrived in time, when the readers were woken,
+    /// or when the queue is closed and the reader has released everything.
     std::span<const Event> read(Reader reader, std::size_t most,
                                 Clock::time_point limit = Clock::time_point::max());
+
+    /// Ends the wait of the readers, or the next one of a reader that does not wait now, because
+    /// there is something else to do. Any thread.
+    void wake();
 
     /// True when the queue is closed and the reader has released everything.
     bool ended(Reader reader) const;
@@ -117,6 +121,8 @@ private:
     std::function<void(bool)> m_listener;
     bool m_isFull = false; ///< as last reported to the listener
     bool m_closed = false;
+    std::uint64_t m_wakes = 0;          ///< how often the readers were woken
+    std::vector<std::uint64_t> m_woken; ///< per reader: m_wakes at its last wait
 };
 
 } // namespace zrm::host

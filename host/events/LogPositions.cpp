@@ -2,6 +2,7 @@
 #include "framework/LogPositions.h"
 
 #include "host/events/EntryEvents.h"
+#include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
 
 using namespace zrm::host;
@@ -62,8 +63,13 @@ void LogPositions::endEntry(const LogPosition& behind) {
 }
 
 void LogPositions::reached(const LogPosition& position) {
-    if (!m_state->book->isClosed()) {
-        m_state->log->reached(m_state->follower, position);
+    if (m_state->book->isClosed()) {
+        return;
+    }
+    const bool isFirst = m_state->log->reached(m_state->follower, position);
+    EventQueue* const queue = m_state->book->queue();
+    if (isFirst && queue != nullptr && m_state->book->isKept()) {
+        queue->wake(); // until it is stored, a crash would lose where the log began
     }
 }
 

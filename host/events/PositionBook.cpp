@@ -29,6 +29,11 @@ std::optional<LogPosition> FollowedLog::newest() const {
     return m_newest;
 }
 
+bool FollowedLog::isStored() const {
+    const std::lock_guard guard(m_mutex);
+    return m_isSaved && m_kept;
+}
+
 void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& events,
                        const std::shared_ptr<FollowedLog>& self, const LogPosition& behind) {
     const std::lock_guard guard(m_mutex);
@@ -45,11 +50,14 @@ void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& 
     m_reached.reset();
 }
 
-void FollowedLog::reached(Follower follower, const LogPosition& position) {
+bool FollowedLog::reached(Follower follower, const LogPosition& position) {
     const std::lock_guard guard(m_mutex);
-    if (follower == m_follower && !m_hasRefused && position != m_newest) {
-        m_newest = m_reached = position;
+    if (follower != m_follower || m_hasRefused || position == m_newest) {
+        return false;
     }
+    const bool isFirst = !m_newest;
+    m_newest = m_reached = position;
+    return isFirst;
 }
 
 std::optional<LogPosition> FollowedLog::unsaved(std::uint64_t event) const {
@@ -99,10 +107,17 @@ void PositionBook::makeCurrent(std::shared_ptr<PositionBook> book) {
     theCurrent().book = std::move(book);
 }
 
-PositionBook::PositionBook(const std::vector<PositionValue>& stored, bool isKept)
-    : m_isKept(isKept) {
-    for (const PositionValue& value : stored) {
+PositionBook::PositionBook(const PositionValues& stored, bool isKept)
+    : m_isKept(isKept), m_paths(stored.paths) {
+    for (const PositionValue& value : stored.logs) {
         m_logs.emplace(value.log, std::make_shared<FollowedLog>(value.log, value.position));
+    }
+}
+
+void PositionBook::setQueue(EventQueue* queue) {
+    m_queue.store(queue);
+    if (queue != nullptr && m_isKept) {
+        queue->wake(); // there may be positions already
     }
 }
 
@@ -114,6 +129,23 @@ std::shared_ptr<FollowedLog> PositionBook::log(std::string_view name) {
                     .first;
     }
     return found->second;
+}
+
+std::map<std::string, LogPosition> PositionBook::positions() const {
+    std::map<std::string, LogPosition> positions;
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, log] : m_logs) {
+        if (const std::optional<LogPosition> newest = log->newest()) {
+            positions.emplace(name, *newest);
+        }
+    }
+    return positions;
+}
+
+bool PositionBook::isStored(std::string_view log) const {
+    const std::lock_guard guard(m_mutex);
+    const auto found = m_logs.find(log);
+    return found != m_logs.end() && found->second->isStored();
 }
 
 std::vector<PositionValue> PositionBook::unsaved(std::uint64_t event) const {
@@ -137,6 +169,7 @@ void PositionBook::saved(const std::vector<PositionValue>& values) {
 }
 
 void PositionBook::forgetSaved() {
+    m_paths.forgetSaved();
     const std::lock_guard guard(m_mutex);
     for (const auto& [name, log] : m_logs) {
         log->forgetSaved();

@@ -2,6 +2,7 @@
 #define ZRM_HOST_POSITION_BOOK_H
 
 #include "framework/LogPositions.h"
+#include "host/events/WatchedPaths.h"
 
 #include <atomic>
 #include <cstdint>
@@ -26,6 +27,13 @@ struct PositionValue {
     bool operator==(const PositionValue&) const = default;
 };
 
+/// What the store keeps of logs between two runs.
+struct PositionValues {
+    std::vector<PositionValue> logs;
+    std::vector<WatchedPath> paths;
+    bool operator==(const PositionValues&) const = default;
+};
+
 /// What is known of one followed log's position. Any thread.
 class FollowedLog {
 public:
@@ -44,11 +52,14 @@ public:
     void end(Follower follower);
     /// The newest position that the queue has or that was reached.
     std::optional<LogPosition> newest() const;
+    /// True if the store has a position of the log.
+    bool isStored() const;
     /// Gives the events to the queue. When it does not take them, because it is closed or null,
     /// later positions are ignored. `self` is this object.
     void push(Follower follower, EventQueue* queue, const EntryEvents& events,
               const std::shared_ptr<FollowedLog>& self, const LogPosition& behind);
-    void reached(Follower follower, const LogPosition& position);
+    /// True if it is the log's first position, which should be stored at once.
+    bool reached(Follower follower, const LogPosition& position);
 
     // For the writer of the store.
 
@@ -76,24 +87,31 @@ private:
 class PositionBook {
 public:
     /// `isKept`: what the writer is given survives the process.
-    PositionBook(const std::vector<PositionValue>& stored, bool isKept);
+    PositionBook(const PositionValues& stored, bool isKept);
 
     /// The book that logs are followed with. One that keeps nothing at first. Any thread.
     static std::shared_ptr<PositionBook> current();
     static void makeCurrent(std::shared_ptr<PositionBook> book);
     /// A new book whose positions end with the process.
     static std::shared_ptr<PositionBook> unkept() {
-        return std::make_shared<PositionBook>(std::vector<PositionValue>{}, false);
+        return std::make_shared<PositionBook>(PositionValues{}, false);
     }
 
     bool isKept() const noexcept { return m_isKept; }
 
     /// What the position of this log is. Any thread.
     std::shared_ptr<FollowedLog> log(std::string_view name);
+    /// The newest position of each log that has one. Any thread.
+    std::map<std::string, LogPosition> positions() const;
+    /// True if the store has a position of this log. Any thread.
+    bool isStored(std::string_view log) const;
+
+    WatchedPaths& paths() noexcept { return m_paths; }
+    const WatchedPaths& paths() const noexcept { return m_paths; }
 
     /// The queue that takes events, from its creation on; null before and after. It outlives the
     /// logs' threads.
-    void setQueue(EventQueue* queue) noexcept { m_queue.store(queue); }
+    void setQueue(EventQueue* queue);
     EventQueue* queue() const noexcept { return m_queue.load(); }
 
     /// No more events or positions are taken: from now on not every situation judges what is read.
@@ -114,6 +132,7 @@ public:
 
 private:
     const bool m_isKept;
+    WatchedPaths m_paths;
     std::atomic<EventQueue*> m_queue{nullptr};
     std::atomic<bool> m_isClosed{false};
     mutable std::mutex m_mutex; ///< guards the map

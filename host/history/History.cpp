@@ -34,7 +34,7 @@ std::uint64_t newestOfCorrupt(const std::string& path) {
 
 /// The positions of logs in a file about to be moved aside, if they can be read. The files' guards
 /// tell whether they still fit.
-std::vector<PositionValue> positionsOfCorrupt(const std::string& path) {
+PositionValues positionsOfCorrupt(const std::string& path) {
     try {
         Database database(path, Database::Use::READ);
         return PositionTable::read(database);
@@ -72,7 +72,7 @@ Result<std::unique_ptr<HistoryFile>> openOrReplace(const HistoryDirectory& direc
                 throw;
             }
             const std::uint64_t newest = newestOfCorrupt(directory.file());
-            const std::vector<PositionValue> positions = positionsOfCorrupt(directory.file());
+            const PositionValues positions = positionsOfCorrupt(directory.file());
             if (const Result<void> moved = directory.moveAside(error.what()); !moved) {
                 return tl::unexpected(moved.error());
             }

@@ -125,8 +125,13 @@ void HistoryFile::putPositions(const std::vector<PositionValue>& positions) {
     }
 }
 
-void HistoryFile::keepPositions(const std::vector<PositionValue>& positions) {
-    inTransaction([&] { putPositions(positions); });
+void HistoryFile::keepPositions(const PositionValues& positions) {
+    inTransaction([&] {
+        putPositions(positions.logs);
+        for (const WatchedPath& path : positions.paths) {
+            m_positions.keep(path);
+        }
+    });
 }
 
 std::vector<std::string> HistoryFile::removeOldPositions(std::int64_t time) {

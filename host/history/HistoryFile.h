@@ -49,10 +49,10 @@ public:
     /// Removes sinks that have not been used for this many days.
     void removeOldCursors(int days);
 
-    void keepPositions(const std::vector<PositionValue>& positions);
-    std::vector<PositionValue> positions() { return PositionTable::read(m_database); }
+    void keepPositions(const PositionValues& positions);
+    PositionValues positions() { return PositionTable::read(m_database); }
     /// Removes the positions of logs last followed before this time (milliseconds since 1970), and
-    /// returns their names.
+    /// returns their names. Also removes the paths last watched before it.
     std::vector<std::string> removeOldPositions(std::int64_t time);
 
     /// Adds the entries of minutes that are over.

@@ -61,11 +61,14 @@ void HistoryWriter::run() {
     EntryBatch batch;
     for (;;) {
         const auto now = Clock::now();
-        const std::span<const Event> events =
-            m_queue->read(m_reader, batchSize, m_hasMoreToDo ? now : now + housekeepingInterval);
+        const auto limit = m_hasMoreToDo ? now : now + housekeepingInterval;
+        const std::span<const Event> events = m_queue->read(m_reader, batchSize, limit);
         if (events.empty()) {
             if (m_queue->ended(m_reader)) {
                 break;
+            }
+            if (Clock::now() < limit) { // woken: a log has its first position
+                m_nextHousekeeping = now;
             }
             housekeep(true);
             continue;
@@ -282,11 +285,15 @@ void HistoryWriter::tendCursors() {
 }
 
 /// Only what stands behind stored events: an entry whose events are lost is judged again.
-void HistoryWriter::storePositions() {
-    const std::vector<PositionValue> moved = m_positions.unsaved(m_recent.newest());
-    if (!moved.empty()) {
+void HistoryWriter::storePositions(bool isLast) {
+    PositionValues moved;
+    moved.logs = m_positions.unsaved(m_recent.newest());
+    const bool isNow = isLast || !moved.logs.empty();
+    moved.paths = m_positions.paths().unsaved(isNow ? 0 : WatchedPaths::storedEvery);
+    if (moved != PositionValues{}) {
         m_file->keepPositions(moved);
-        m_positions.saved(moved);
+        m_positions.saved(moved.logs);
+        m_positions.paths().saved(moved.paths);
     }
 }
 
@@ -359,7 +366,7 @@ void HistoryWriter::storeRest() {
     }
     const bool stored = attempt([&] {
         storeCursors();
-        storePositions();
+        storePositions(true);
         storeEntries();
     });
     if (!stored) {

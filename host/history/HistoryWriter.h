@@ -80,7 +80,7 @@ private:
     void housekeep(bool idle);
     void storeCursors();
     void tendCursors();
-    void storePositions();
+    void storePositions(bool isLast = false);
     void tendPositions();
     void storeEntries();
     HistoryFile::Limits limits();

@@ -10,8 +10,8 @@
 
 namespace zrm::host {
 
-/// The position of each followed log, as stored in the history. Used by one thread at a time.
-/// Throws DatabaseError.
+/// The position of each followed log, as stored in the history, and the paths that were watched.
+/// Used by one thread at a time. Throws DatabaseError.
 class PositionTable {
 public:
     explicit PositionTable(Database& database);
@@ -19,16 +19,20 @@ public:
     /// Stores a position, and that the log was followed at this time (milliseconds since 1970).
     void keep(const PositionValue& value, std::int64_t noted);
 
+    void keep(const WatchedPath& path);
+
     /// Removes the positions of logs that were last followed before this time, and returns their
-    /// names.
+    /// names. Also removes the paths that were last watched before it.
     std::vector<std::string> removeNotedBefore(std::int64_t time);
 
-    /// All positions.
-    static std::vector<PositionValue> read(Database& database);
+    /// All positions and paths.
+    static PositionValues read(Database& database);
 
 private:
     Statement m_keep;
     Statement m_remove;
+    Statement m_keepPath;
+    Statement m_removePaths;
 };
 
 } // namespace zrm::host

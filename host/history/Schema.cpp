@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 5> steps = {
+constexpr std::array<const char*, 6> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -46,6 +46,10 @@ constexpr std::array<const char*, 5> steps = {
     "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
     " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
     " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL) WITHOUT ROWID;",
+    // 6: when the file of a position was modified, and when the files of each path or glob of the
+    // configuration all had positions last (milliseconds since 1970).
+    "ALTER TABLE log_positions ADD COLUMN modified INTEGER NOT NULL DEFAULT 0;"
+    "CREATE TABLE watched_paths (path TEXT PRIMARY KEY, watched INTEGER NOT NULL) WITHOUT ROWID;",
 };
 
 } // namespace

@@ -70,13 +70,19 @@ std::vector<std::string> originsOf(const std::string& path) {
     return origins;
 }
 
+/// True if both files are in the same directory, where the generations of a log are looked for.
+bool isBeside(std::string_view one, std::string_view other) {
+    return one.substr(0, one.rfind('/')) == other.substr(0, other.rfind('/'));
+}
+
 } // namespace
 
 /// A path that is named or matched.
 struct LogFinder::Candidate {
     std::string name;
     std::size_t source;
-    bool isNamed; ///< by itself, not by a glob
+    bool isNamed;            ///< by itself, not by a glob
+    const std::string* path; ///< of the configuration, that names or matches it
     bool isThere = false;
     Identity identity{};
     bool isNewcomer = false;
@@ -98,6 +104,9 @@ public:
 
     FoundLogs run() {
         m_found.sources.resize(m_logs.size());
+        if (!m_finder.m_hasLooked) {
+            takeUp();
+        }
         collect();
         std::vector<Candidate> candidates;
         for (Candidate& candidate : m_candidates) {
@@ -127,6 +136,28 @@ public:
     }
 
 private:
+    /// Before the first look: logs that lost their name after the last run have not been read to
+    /// their ends.
+    void takeUp() {
+        for (const std::string& log : m_finder.m_earlier.renamedLogs()) {
+            if (!isConfigured(log)) {
+                continue;
+            }
+            const LogPosition& position = m_finder.m_earlier.positions().at(log);
+            m_finder.m_known.emplace(
+                log, Known{Identity{position.device, position.inode}, m_now, false});
+        }
+    }
+
+    bool isConfigured(const std::string& name) const {
+        return std::any_of(m_logs.begin(), m_logs.end(), [&name](const LogConfig& log) {
+            return std::any_of(log.paths.begin(), log.paths.end(), [&name](const auto& path) {
+                return PathPattern::isPattern(path) ? PathPattern::matches(path, name)
+                                                    : path == name;
+            });
+        });
+    }
+
     void collect() {
         for (std::size_t index = 0; index < m_logs.size(); ++index) {
             FoundLogs::Source& source = m_found.sources[index];
@@ -134,14 +165,14 @@ private:
             source.paths = m_logs[index].paths;
             for (const std::string& path : m_logs[index].paths) {
                 if (!PathPattern::isPattern(path)) {
-                    add({path, index, true});
+                    add({path, index, true, &path});
                     continue;
                 }
                 PathSearch search(path);
                 source.problem = search.problem.empty() ? source.problem : search.problem;
                 const bool isNew = m_finder.m_searched.contains(path);
                 for (std::string& name : search.paths) {
-                    Candidate candidate{std::move(name), index, false};
+                    Candidate candidate{std::move(name), index, false, &path};
                     candidate.isNewcomer = isNew;
                     add(std::move(candidate));
                 }
@@ -155,7 +186,7 @@ private:
         for (const auto& [name, known] : m_finder.m_known) {
             if (m_now - known.seen < keptAbsent && !m_sourceOf.contains(name) &&
                 PathPattern::matches(pattern, name)) {
-                add({name, index, false});
+                add({name, index, false, &pattern});
             }
         }
     }
@@ -191,6 +222,7 @@ private:
             const ErrorText error(errno);
             const bool isGone = error.number() == ENOENT || error.number() == ENOTDIR;
             const bool isKept = candidate.isNamed || m_finder.m_known.contains(candidate.name);
+            candidate.isNewcomer = candidate.isNewcomer || isGone; // once it is there
             return isKept || passOver(candidate, isGone ? "It is a link that leads nowhere"
                                                         : std::string("It cannot be looked at: ") +
                                                               error.text());
@@ -200,6 +232,10 @@ private:
                                                                : "It is not a regular file");
         }
         candidate.isThere = true;
+        if (!m_finder.m_searched.contains(*candidate.path)) {
+            candidate.isNewcomer = m_logs[candidate.source].follow.resume &&
+                                   m_finder.m_earlier.isNewSince(*candidate.path, status);
+        }
         candidate.identity = {status.st_dev, status.st_ino};
         if (const auto own = m_ownFiles.find(candidate.identity); own != m_ownFiles.end()) {
             return passOver(candidate, "It is " + own->second +
@@ -246,11 +282,16 @@ private:
             return true;
         }
         const auto rotated = m_finder.m_rotated.find(candidate.name);
+        const std::string earlier =
+            m_finder.m_hasLooked || m_finder.m_earlier.positions().contains(candidate.name)
+                ? ""
+                : m_finder.m_earlier.logOf(candidate.name, candidate.identity);
         bool isRotated =
             rotated != m_finder.m_rotated.end() && rotated->second == candidate.identity;
         for (const auto& [name, known] : m_finder.m_known) {
             isRotated = isRotated || known.identity == candidate.identity;
         }
+        isRotated = isRotated || (m_names.contains(earlier) && isBeside(earlier, candidate.name));
         if (isRotated) {
             m_rotated.emplace(candidate.name, candidate.identity);
             return passOver(candidate, "It was followed under another name before it was rotated");
@@ -296,6 +337,7 @@ private:
             }
             known.emplace(candidate.name, now);
         }
+        m_finder.m_hasLooked = true;
         m_finder.m_known = std::move(known);
         m_finder.m_rotated = std::move(m_rotated);
         m_finder.m_searched.clear();

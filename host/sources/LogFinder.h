@@ -2,6 +2,7 @@
 #define ZRM_HOST_LOG_FINDER_H
 
 #include "host/config/LogConfig.h"
+#include "host/sources/EarlierRun.h"
 #include "host/sources/FoundLogs.h"
 
 #include <chrono>
@@ -11,6 +12,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <sys/stat.h>
@@ -28,13 +30,15 @@ public:
     /// rotation that creates the new file late.
     static constexpr std::chrono::seconds keptAbsent{60};
 
+    /// `earlier`: what is known from before the first look.
+    explicit LogFinder(EarlierRun earlier = {}) : m_earlier(std::move(earlier)) {}
+
     /// Looks once. `ownFiles`: the files that the agent writes, by path, and what each is.
     FoundLogs look(const std::vector<LogConfig>& logs,
                    const std::map<std::string, std::string>& ownFiles, Clock::time_point now);
 
 private:
-    /// A file's device and inode.
-    using Identity = std::pair<dev_t, ino_t>;
+    using Identity = EarlierRun::Identity;
     struct Known {
         std::optional<Identity> identity; ///< when it was last there
         Clock::time_point seen;
@@ -47,6 +51,8 @@ private:
     std::map<std::string, Identity> m_rotated; ///< followed under another name before
     /// The paths and globs of the last look: a file that one of these matches now is new.
     std::set<std::string> m_searched;
+    EarlierRun m_earlier;
+    bool m_hasLooked = false;
 };
 
 } // namespace zrm::host

@@ -1,5 +1,7 @@
 #include "host/sources/LogList.h"
 
+#include "host/base/TimeText.h"
+#include "host/events/PositionBook.h"
 #include "logs/FollowSettings.h"
 
 #include <algorithm>
@@ -12,6 +14,9 @@
 namespace zrm::host {
 
 namespace {
+
+/// The first looks follow each other quickly, so that the history soon knows what is watched.
+constexpr int quickLooks = 5;
 
 bool isSame(const FurtherLog& a, const FurtherLog& b) {
     return a.name == b.name && a.type == b.type && a.debugMode == b.debugMode &&
@@ -76,6 +81,7 @@ LogList::~LogList() {
 
 void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
     apply(logs, std::move(ownFiles));
+    m_shared->finder = LogFinder(EarlierRun(*PositionBook::current()));
     if (logs.empty()) {
         return;
     }
@@ -113,8 +119,9 @@ std::shared_ptr<const FoundLogs> LogList::found() {
 
 void LogList::run(const std::shared_ptr<Shared>& shared) {
     std::unique_lock lock(shared->mutex);
-    for (;;) {
-        shared->changed.wait_for(lock, shared->interval,
+    for (int looks = 0;;) {
+        const std::chrono::milliseconds interval = shared->interval;
+        shared->changed.wait_for(lock, looks < quickLooks ? interval / quickLooks : interval,
                                  [&] { return shared->isEnded || shared->isAsked; });
         if (shared->isEnded) {
             return;
@@ -123,15 +130,18 @@ void LogList::run(const std::shared_ptr<Shared>& shared) {
         if (!shared->isUsed) {
             continue;
         }
+        ++looks;
         const std::vector<LogConfig> logs = shared->logs;
         const OwnFiles ownFiles = shared->ownFiles;
         lock.unlock();
+        const std::int64_t time = WallClock::now();
         auto found = std::make_shared<const FoundLogs>(
             shared->finder.look(logs, ownFiles, LogFinder::Clock::now()));
         lock.lock();
         if (shared->isEnded) {
             return;
         }
+        EarlierRun::noteLook(*PositionBook::current(), logs, *found, time);
         const auto before = exchange(found);
         const bool isPublished = FurtherLogs::published() != nullptr;
         lock.unlock();

@@ -14,6 +14,8 @@ struct LogPosition {
     std::int64_t offset = 0;       ///< bytes before the next entry
     std::uint64_t guard = 0;       ///< hash of the last `guardLength` bytes before the offset
     std::uint32_t guardLength = 0; ///< bytes; 0 at the beginning of a file
+    std::int64_t modified = 0;     ///< latest modification of what was read, ns since the epoch;
+                                   ///< 0: unknown
 
     bool operator==(const LogPosition&) const = default;
 };

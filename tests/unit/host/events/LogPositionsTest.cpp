@@ -72,7 +72,7 @@ protected:
     EventQueue queue{4, rowSize};
     EventQueue::Reader reader = queue.addReader();
     std::shared_ptr<PositionBook> book =
-        std::make_shared<PositionBook>(std::vector<PositionValue>{{"/old", at(7)}}, true);
+        std::make_shared<PositionBook>(PositionValues{{{"/old", at(7)}}, {}}, true);
 };
 
 TEST_F(LogPositionsTest, AnEntrysEventsEnterTheQueueTogetherAndTheLastCarriesThePosition) {
@@ -191,6 +191,26 @@ TEST_F(LogPositionsTest, TheNewestFollowerOfALogTakesOver) {
         EXPECT_EQ(after.stored(), at(2));
     }).join();
     EXPECT_THAT(take(), ElementsAre("a /log1", "b again /log2"));
+}
+
+TEST_F(LogPositionsTest, TheFirstPositionOfALogIsForTheWriterToStoreAtOnce) {
+    LogPositions log("/log");
+    queue.read(reader, 1, EventQueue::Clock::now()); // the writer begins
+    std::thread writer([&] {
+        EXPECT_TRUE(
+            queue.read(reader, 1, EventQueue::Clock::now() + std::chrono::hours(1)).empty());
+        EXPECT_THAT(book->unsaved(0), ElementsAre(PositionValue{"/log", at(0)}));
+    });
+    log.reached(at(0));
+    writer.join();
+}
+
+TEST_F(LogPositionsTest, PositionsFromBeforeThereWasAQueueAreForTheWriterToStoreAtOnce) {
+    book->setQueue(nullptr);
+    LogPositions log("/log");
+    log.reached(at(0));
+    book->setQueue(&queue);
+    EXPECT_TRUE(queue.read(reader, 1, EventQueue::Clock::now() + std::chrono::hours(1)).empty());
 }
 
 TEST_F(LogPositionsTest, WhatTheQueueRefusesIsNotPassed) {

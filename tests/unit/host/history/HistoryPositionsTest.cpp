@@ -18,6 +18,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -36,11 +37,12 @@ namespace {
 using namespace std::chrono_literals;
 using Clock = HistoryWriter::Clock;
 using testing::ElementsAre;
+using testing::IsEmpty;
 
 constexpr std::int64_t day = 24 * 60 * 60'000;
 
 LogPosition at(std::int64_t offset) {
-    return {UINT64_MAX, 2, offset, UINT64_MAX - 7, 256};
+    return {UINT64_MAX, 2, offset, UINT64_MAX - 7, 256, 1'800'000'000'123'456'789};
 }
 
 class HistoryPositionsTest : public testing::Test {
@@ -258,11 +260,31 @@ TEST_F(HistoryPositionsTest, ACorruptFileGivesItsPositionsToTheNewOneWhereTheyCa
     EXPECT_EQ(storedOffset("/log"), 10);
 }
 
+TEST_F(HistoryPositionsTest, TheNextRunKnowsUntilWhenPathsWereWatched) {
+    using Watched = std::map<std::string, std::int64_t>;
+    open();
+    WatchedPaths& paths = history->positions()->paths();
+    paths.note("/log/*", 1'000'000);
+    EXPECT_TRUE(eventually([&] { return paths.unsaved(0).empty(); }));
+    paths.note("/log/*", 1'000'001); // renewed seldom, and at the end
+    EXPECT_THAT(paths.unsaved(WatchedPaths::storedEvery), IsEmpty());
+    EXPECT_EQ(number("SELECT watched FROM watched_paths"), 1'000'000);
+    close();
+    open();
+    EXPECT_EQ(history->positions()->paths().all(), (Watched{{"/log/*", 1'000'001}}));
+    EXPECT_THAT(history->positions()->paths().unsaved(0), IsEmpty());
+    std::filesystem::remove_all(state);
+    EXPECT_TRUE(eventually([&] {
+        return std::filesystem::exists(file()) && history->positions()->paths().unsaved(0).empty();
+    }));
+    EXPECT_EQ(number("SELECT watched FROM watched_paths"), 1'000'001);
+}
+
 TEST_F(HistoryPositionsTest, AThousandPositionsAreReadInMuchLessThanASecond) {
     open();
-    std::vector<PositionValue> values;
+    PositionValues values;
     for (int number = 0; number < 1000; ++number) {
-        values.push_back({"/var/log/" + std::to_string(number), at(number)});
+        values.logs.push_back({"/var/log/" + std::to_string(number), at(number)});
     }
     close();
     HistoryFile(file()).keepPositions(values);
@@ -272,18 +294,27 @@ TEST_F(HistoryPositionsTest, AThousandPositionsAreReadInMuchLessThanASecond) {
     EXPECT_LT(Clock::now() - begin, 500ms);
 }
 
+TEST(HistoryFilePositions, PathsNotWatchedForLongAreRemoved) {
+    const TemporaryDirectory directory;
+    HistoryFile file(directory.file("history.db"));
+    const std::int64_t now = WallClock::now();
+    file.keepPositions({{}, {{"/old", now - 31 * day}, {"/new", now}}});
+    EXPECT_THAT(file.removeOldPositions(now - 30 * day), IsEmpty());
+    EXPECT_THAT(file.positions().paths, ElementsAre(WatchedPath{"/new", now}));
+}
+
 TEST(HistoryFilePositions, ThoseOfLogsNotFollowedForLongAreRemovedByName) {
     const TemporaryDirectory directory;
     const std::string path = directory.file("history.db");
     HistoryFile file(path);
-    file.keepPositions({{"/old", at(1)}, {"/new", at(2)}});
-    file.keepPositions({{"/new", at(3)}});
+    file.keepPositions({{{"/old", at(1)}, {"/new", at(2)}}, {}});
+    file.keepPositions({{{"/new", at(3)}}, {}});
     const std::int64_t now = WallClock::now();
     Database(path, Database::Use::WRITE)
         .run("UPDATE log_positions SET noted = " + std::to_string(now - 31 * day) +
              " WHERE log = '/old'");
     EXPECT_THAT(file.removeOldPositions(now - 30 * day), ElementsAre("/old"));
-    EXPECT_THAT(file.positions(), ElementsAre(PositionValue{"/new", at(3)}));
+    EXPECT_THAT(file.positions().logs, ElementsAre(PositionValue{"/new", at(3)}));
     EXPECT_THAT(file.removeOldPositions(now - 30 * day), ElementsAre());
 }
 

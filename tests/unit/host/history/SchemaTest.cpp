@@ -53,7 +53,7 @@ TEST_F(SchemaTest, CreatesTheTablesOfANewFile) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     for (const char* const table : {"events", "labels", "logs", "marks", "origin", "cursors",
-                                    "minutes", "rates", "log_positions"}) {
+                                    "minutes", "rates", "log_positions", "watched_paths"}) {
         EXPECT_TRUE(hasTable(database, table)) << table;
     }
     Schema::bringUpToDate(database);
@@ -122,8 +122,23 @@ TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     EXPECT_EQ(database.number("SELECT id FROM events"), 41);
-    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6)");
+    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7)");
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheFifthVersionUpToDate) {
+    database.run(firstVersion);
+    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
+                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
+                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL) WITHOUT ROWID;"
+                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6);"
+                 "PRAGMA user_version = 5");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
+    EXPECT_EQ(database.number("SELECT modified FROM log_positions"), 0) << "unknown";
+    EXPECT_EQ(database.number("SELECT count(*) FROM watched_paths"), 0);
 }
 
 TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {

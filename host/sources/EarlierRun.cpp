@@ -1,0 +1,118 @@
+#include "host/sources/EarlierRun.h"
+
+#include "host/base/TimeText.h"
+#include "host/events/PositionBook.h"
+#include "host/sources/FoundLogs.h"
+#include "monitor/Generation.h"
+
+#include <algorithm>
+#include <memory>
+#include <set>
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+namespace zrm::host {
+
+namespace {
+
+/// File systems keep times less exactly than the clock does (milliseconds).
+constexpr std::int64_t exactness = 2000;
+
+std::int64_t millisecondsOf(const timespec& time) {
+    return static_cast<std::int64_t>(time.tv_sec) * 1000 + time.tv_nsec / 1'000'000;
+}
+
+/// Whether somebody can read the file and note a position in it.
+bool isReadable(const std::string& path) {
+    struct stat status;
+    return ::stat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode) &&
+           ::faccessat(AT_FDCWD, path.c_str(), R_OK, AT_EACCESS) == 0;
+}
+
+/// The inodes of the entries of a directory.
+std::set<ino_t> inodesIn(const std::string& directory) {
+    std::set<ino_t> inodes;
+    const std::unique_ptr<DIR, int (*)(DIR*)> stream(::opendir(directory.c_str()), ::closedir);
+    // Only this call uses the stream. NOLINTNEXTLINE(concurrency-mt-unsafe)
+    while (const dirent* const entry = stream ? ::readdir(stream.get()) : nullptr) {
+        inodes.insert(entry->d_ino);
+    }
+    return inodes;
+}
+
+} // namespace
+
+EarlierRun::EarlierRun(const PositionBook& book)
+    : m_watched(book.paths().all()), m_positions(book.positions()) {
+    for (const auto& [log, position] : m_positions) {
+        m_logs.emplace(Identity{position.device, position.inode}, log);
+    }
+}
+
+bool EarlierRun::isNewSince(const std::string& path, const struct stat& file) const {
+    const auto found = m_watched.find(path);
+    if (found == m_watched.end()) {
+        return false;
+    }
+    // If the clock was set back, the times of files say nothing: rather too much than too little.
+    return found->second > WallClock::now() ||
+           millisecondsOf(file.st_mtim) >= found->second - exactness;
+}
+
+std::string EarlierRun::logOf(const std::string& file, const Identity& identity) const {
+    const auto [begin, end] = m_logs.equal_range(identity);
+    for (auto log = begin; log != end; ++log) {
+        const LogPosition& position = m_positions.at(log->second);
+        if (log->second == file || position.guardLength == 0) {
+            continue;
+        }
+        Tail tail;
+        const std::unique_ptr<Generation> opened = Generation::open(file);
+        if (opened && opened->holds(position, tail)) {
+            return log->second;
+        }
+    }
+    return "";
+}
+
+std::vector<std::string> EarlierRun::renamedLogs() const {
+    std::vector<std::string> logs;
+    std::map<std::string, std::set<ino_t>> directories;
+    for (const auto& [log, position] : m_positions) {
+        struct stat status;
+        if (::stat(log.c_str(), &status) == 0) {
+            continue;
+        }
+        const std::string directory = log.substr(0, log.rfind('/') + 1);
+        auto known = directories.find(directory);
+        if (known == directories.end()) {
+            known = directories.emplace(directory, inodesIn(directory)).first;
+        }
+        if (known->second.contains(static_cast<ino_t>(position.inode))) {
+            logs.push_back(log);
+        }
+    }
+    return logs;
+}
+
+void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs,
+                          const FoundLogs& found, std::int64_t time) {
+    for (std::size_t index = 0; index < found.sources.size(); ++index) {
+        const FoundLogs::Source& source = found.sources[index];
+        const bool isComplete =
+            logs[index].follow.resume && source.problem.empty() &&
+            std::all_of(source.files.begin(), source.files.end(), [&](const std::string& file) {
+                return book.isStored(file) || !isReadable(file);
+            });
+        if (!isComplete) {
+            continue;
+        }
+        for (const std::string& path : logs[index].paths) {
+            book.paths().note(path, time);
+        }
+    }
+}
+
+} // namespace zrm::host

@@ -1,0 +1,56 @@
+#ifndef ZRM_HOST_EARLIER_RUN_H
+#define ZRM_HOST_EARLIER_RUN_H
+
+#include "framework/LogPositions.h"
+#include "host/config/LogConfig.h"
+
+#include <cstdint>
+#include <map>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include <sys/stat.h>
+
+namespace zrm::host {
+
+struct FoundLogs;
+class PositionBook;
+
+/// What the history knows of the files that [[log]] tables name, from before this start. Not
+/// changed after it was made.
+class EarlierRun {
+public:
+    /// A file's device and inode.
+    using Identity = std::pair<dev_t, ino_t>;
+
+    /// Knows nothing: the first run.
+    EarlierRun() = default;
+    explicit EarlierRun(const PositionBook& book);
+
+    /// True if an earlier run watched the path or glob, and a file of it that has no position was
+    /// written to since: it was not there before, or nobody has read it.
+    bool isNewSince(const std::string& path, const struct stat& file) const;
+    /// The logs with a stored position, by name.
+    const std::map<std::string, LogPosition>& positions() const noexcept { return m_positions; }
+    /// The log whose stored position is in this file, recognised by what the file has before it.
+    /// Empty if there is none, and for the log of that name itself. Reads the file.
+    std::string logOf(const std::string& file, const Identity& identity) const;
+    /// The logs with a stored position in a file that is still in the log's directory, but no
+    /// longer under the log's name. Reads directories.
+    std::vector<std::string> renamedLogs() const;
+
+    /// Notes in the book that the files of the tables were looked for at this time (milliseconds
+    /// since 1970), for those tables whose files all have stored positions by now.
+    static void noteLook(PositionBook& book, const std::vector<LogConfig>& logs,
+                         const FoundLogs& found, std::int64_t time);
+
+private:
+    std::map<std::string, std::int64_t> m_watched; ///< until when, by path or glob
+    std::map<std::string, LogPosition> m_positions;
+    std::multimap<Identity, std::string> m_logs; ///< by the file of the position
+};
+
+} // namespace zrm::host
+
+#endif
