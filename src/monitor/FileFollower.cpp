@@ -50,9 +50,17 @@ std::optional<FileIdentity> FileFollower::file() const noexcept {
     return m_chain.empty() ? std::nullopt : std::optional(m_chain.front().file->identity());
 }
 
+LogPosition FileFollower::positionInBlock() const noexcept {
+    LogPosition position =
+        positionOf(m_chain.front().file->identity(), m_block.offset(), m_block.tail());
+    position.modified =
+        std::max(m_modified == INT64_MAX ? 0 : m_modified, m_hasSeen ? m_seen.modified : 0);
+    return position;
+}
+
 std::optional<LogPosition> FileFollower::position() const noexcept {
     if (m_isInBlock) {
-        return positionOf(m_chain.front().file->identity(), m_block.offset(), m_block.tail());
+        return positionInBlock();
     }
     return m_hasPosition ? std::optional(m_position) : std::nullopt;
 }
@@ -83,6 +91,9 @@ bool FileFollower::begin() {
         return false;
     }
     enter();
+    if (m_stored && m_chain.front().hadName && m_block.readTo() == 0) {
+        insertMissed(); // it may have been truncated before anything of it was read
+    }
     return true;
 }
 
@@ -98,6 +109,7 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     member.from = isFromEnd ? status.size : 0;
     m_modified = status.modified;
     m_position = positionOf(named->identity(), member.from, member.tail);
+    m_position.modified = status.modified;
     m_hasPosition = true;
     member.file = std::move(named);
     member.hadName = true;
@@ -108,17 +120,20 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
 void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
     m_position = stored;
     m_hasPosition = true;
-    m_modified = INT64_MAX;
+    m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
     Found found = find(stored, Search::byContents, named.get());
-    const bool isHeld = found.holder.has_value();
+    const bool isHeld = found.holder.has_value() || stored.offset == 0;
     Member present;
     if (found.holder && !found.holder->file) {
         present = std::move(*found.holder);
         found.holder.reset();
-    } else if (!isHeld && named) {
+    } else if (!isHeld && (named || !found.younger.empty())) {
         m_ledger.noteLost(stored.offset, stored.offset);
     }
-    const Generation* const first = found.holder ? found.holder->file.get() : named.get();
+    // A copy of the present file may be younger than the position.
+    const Generation* const first = found.holder           ? found.holder->file.get()
+                                    : stored.modified == 0 ? named.get()
+                                                           : nullptr;
     Generation::Status status;
     if (first != nullptr && first->status(status)) {
         m_modified = status.modified;
@@ -192,8 +207,8 @@ bool FileFollower::checkFile() {
         if (m_hasSeen && m_isInBlock) {
             noteModified(m_seen.modified); // before what is found now was done
         }
-        if (m_chain.front().hadName && m_block.readTo() == 0) {
-            insertMissed();
+        if (m_chain.front().hadName && m_block.readTo() == 0 && insertMissed()) {
+            return true;
         }
     }
     m_seen = now;
@@ -226,9 +241,10 @@ void FileFollower::switchToNext() {
     Generation::Status status{};
     const bool hasStatus = finished.file->status(status);
     if (m_block.readTo() > 0) {
-        m_position = positionOf(finished.file->identity(), m_block.offset(), m_block.tail());
-        m_hasPosition = true;
         noteModified(hasStatus ? status.modified : m_seen.modified);
+        m_position = positionOf(finished.file->identity(), m_block.offset(), m_block.tail());
+        m_position.modified = m_modified;
+        m_hasPosition = true;
     }
     if (finished.isRecovery && m_block.offset() > finished.from) {
         m_ledger.noteRecovered(finished.file->path(), finished.from, m_block.offset());

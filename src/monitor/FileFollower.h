@@ -98,7 +98,7 @@ private:
 
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
-    void insertMissed();
+    bool insertMissed();
     void noteHead();
     void dropShortCopy(Found& found, std::int64_t offset) const;
     void recover();
@@ -112,6 +112,7 @@ private:
     bool checkFile();
     bool isFinished() const noexcept;
     void noteModified(std::int64_t time) noexcept;
+    LogPosition positionInBlock() const noexcept;
     void switchToNext();
     bool handleFailedRead();
     char* finish();

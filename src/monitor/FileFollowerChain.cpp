@@ -43,8 +43,8 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
 }
 
 /// The present file has nothing that was read, so that a truncation is not seen in it. What was in
-/// it before may be in a copy.
-void FileFollower::insertMissed() {
+/// it before may be in a copy. True if there is one, which is read first.
+bool FileFollower::insertMissed() {
     Found found = find(m_position, Search::byIdentity, nullptr);
     const bool isHeld = found.holder.has_value();
     found.holder.reset();
@@ -58,7 +58,7 @@ void FileFollower::insertMissed() {
         });
     }
     if (found.younger.empty()) {
-        return;
+        return false;
     }
     if (!isHeld) {
         continueIn(found.younger.front());
@@ -68,6 +68,7 @@ void FileFollower::insertMissed() {
     }
     prepend(found);
     enter();
+    return true;
 }
 
 /// A copy that was made before a truncation is recognised by its beginning.
@@ -103,6 +104,7 @@ void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
 /// The file no longer has what was read of it: it was truncated. The rest of the old contents is
 /// read from a copy, as far as there is one; then the file is read from its beginning.
 void FileFollower::recover() {
+    m_ledger.noteTruncation();
     const LogPosition at = *position();
     const std::int64_t known = std::max(m_known, m_block.readTo());
     m_position = at;

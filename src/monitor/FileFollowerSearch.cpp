@@ -150,8 +150,15 @@ FileFollower::findHolder(const LogPosition& position, Search search, Generation*
         }
         return member.file && member.file->holds(position, member.tail);
     };
+    // Without bytes before the position, a file that was written to since may be another one that
+    // has the same inode. It is read by its age.
+    const auto isSure = [&position](const GenerationFile& file) {
+        return position.guardLength > 0 || position.modified == 0 ||
+               file.modified <= position.modified;
+    };
     for (const GenerationFile& file : files) {
-        if (file.identity == wanted && !isKnown(file.identity, named) && opens(file)) {
+        if (file.identity == wanted && isSure(file) && !isKnown(file.identity, named) &&
+            opens(file)) {
             return member;
         }
     }
@@ -193,7 +200,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
         }
         // The file of the position may have been written to after it was read.
         Tail tail;
-        const bool isRead = member.file && m_hasPosition && !m_isInBlock &&
+        const bool isRead = member.file && m_hasPosition && !m_isInBlock && m_position.offset > 0 &&
                             file.identity == identityOf(m_position) &&
                             member.file->holds(m_position, tail);
         if (member.file && !isRead) {

@@ -67,6 +67,7 @@ public:
     /// Ranges of one source that follow each other are kept as one.
     void noteRecovered(const std::string& source, std::int64_t from, std::int64_t to);
     void noteLost(std::int64_t from, std::int64_t to);
+    void noteTruncation() noexcept { m_truncations.fetch_add(1, std::memory_order_relaxed); }
     void noteCut() noexcept { m_cut.fetch_add(1, std::memory_order_relaxed); }
 
     // On any thread.
@@ -85,6 +86,10 @@ public:
     std::int64_t lostBytes() const noexcept { return m_lostBytes.load(std::memory_order_relaxed); }
     /// How often something was lost, the times included at which no byte was known of.
     std::int64_t losses() const noexcept { return m_losses.load(std::memory_order_relaxed); }
+    /// How often the file that is read was truncated.
+    std::int64_t truncations() const noexcept {
+        return m_truncations.load(std::memory_order_relaxed);
+    }
     /// Entries of which only the beginning was judged, because they are too long.
     std::int64_t cutEntries() const noexcept { return m_cut.load(std::memory_order_relaxed); }
     /// The latest ranges, oldest first.
@@ -99,6 +104,7 @@ private:
     std::atomic<std::int64_t> m_recoveredBytes{0};
     std::atomic<std::int64_t> m_lostBytes{0};
     std::atomic<std::int64_t> m_losses{0};
+    std::atomic<std::int64_t> m_truncations{0};
     std::atomic<std::int64_t> m_cut{0};
     mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<Failure> m_failure;

@@ -30,6 +30,26 @@ FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t rec
     return options;
 }
 
+/// Traces what has been lost since `known` losses. Returns how many there are now.
+std::int64_t traceLosses(const FollowLedger& ledger, const char* file, std::int64_t known) {
+    TraceScope trace(anchor);
+    const std::int64_t losses = ledger.losses();
+    if (losses == known) {
+        return losses;
+    }
+    const FollowLedger::Lost lost = ledger.lost().back();
+    if (lost.from < lost.to) {
+        trace.error()("Lines of %s were lost: bytes %lld to %lld were removed before they were "
+                      "read, and no copy has them.",
+                      file, static_cast<long long>(lost.from), static_cast<long long>(lost.to));
+    } else {
+        trace.error()("Lines of %s may have been lost: the file in which reading stopped at byte "
+                      "%lld is gone, with what was written to it after that.",
+                      file, static_cast<long long>(lost.from));
+    }
+    return losses;
+}
+
 } // namespace
 
 void LogFile::followLog(std::size_t recordLength) {
@@ -41,17 +61,20 @@ void LogFile::followLog(std::size_t recordLength) {
     if (stored) {
         follower.resumeAt(*stored);
     }
+    std::int64_t losses = 0;
     for (bool isLast = false; !isLast;) {
         // What is there when the log is to end is still read.
         isLast = monitorStatus() != MONITOR_RUNNING;
         m_pulse.work("looks at the log");
         if (follower.look(FileFollower::Moment::now())) {
+            noteFollowed(follower, positions); // where a log begins is known before it is read
             if (!readEntries(follower, positions)) {
                 break;
             }
             noteFollowed(follower, positions);
         }
         noteFollowFailure();
+        losses = traceLosses(*m_followLedger, fileNameLocal(), losses);
         m_pulse.rest();
         if (!isLast) {
             timeval interval = lookInterval;
@@ -100,7 +123,7 @@ void LogFile::noteFollowed(FileFollower& follower, LogPositions& positions) {
     follower.noteProgress();
 }
 
-/// Traces a failure once, however often the call is tried again.
+/// Traces a failure once, however often the call is tried again, and its end.
 void LogFile::noteFollowFailure() {
     TraceScope trace(anchor);
     const auto failure = m_followLedger->failure();
@@ -108,6 +131,8 @@ void LogFile::noteFollowFailure() {
         const ErrorText error(failure->number);
         trace.error()("Error while following file %s: %s failed and is tried again. errno = %d; %s",
                       fileNameLocal(), failure->call, error.number(), error.text());
+    } else if (!failure && m_isFailureTraced) {
+        trace.error()("File %s is read again.", fileNameLocal());
     }
     m_isFailureTraced = failure.has_value();
 }

@@ -1,8 +1,12 @@
 """Logs of [[log]] tables through rotations and stops: each entry once."""
 
+import contextlib
 import os
+import sqlite3
 
-from conftest import Log, descriptions, syslog_line
+from api import Api
+from conftest import Log, descriptions, syslog_line, wait_until
+from test_ledger import ledger_of
 
 
 def followed(agent, **keys):
@@ -63,6 +67,70 @@ def test_what_was_written_while_the_agent_was_stopped_is_read(agent):
     agent.start()
     log.append(syslog_line("five"))
     assert descriptions(agent.wait_events(5)) == ["one", "two", "three", "four", "five"]
+
+
+def test_a_file_that_appears_while_the_agent_is_stopped_is_read_from_its_beginning(agent):
+    """A log whose name has the date, over midnight."""
+    logs = agent.directory / "logs"
+    logs.mkdir()
+    (logs / "old.log").write_text(syslog_line("before the first start"))
+    yesterday = Log(logs / "app-20261121.log")
+    yesterday.path.write_text("")
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    agent.follow(logs / "*.log")
+    agent.situation()
+    agent.start()
+    agent.wait_open(yesterday)
+    yesterday.append(syslog_line("yesterday"))
+    agent.wait_events(1)
+    wait_until(lambda: watched(agent), "the glob to be known as watched")
+    assert agent.stop() == 0
+    (logs / "app-20261122.log").write_text(syslog_line("today"))
+    moved = logs / "moved.log"
+    moved.write_text(syslog_line("long ago"))
+    os.utime(moved, (1_700_000_000, 1_700_000_000))
+    agent.start()
+    assert descriptions(agent.wait_events(2)) == ["yesterday", "today"]
+    assert agent.stop() == 0
+    assert len(agent.events()) == 2
+
+
+def watched(agent):
+    """The paths of which the history knows that they were watched."""
+    with contextlib.closing(sqlite3.connect(agent.directory / "state" / "history.db")) as history:
+        return history.execute("SELECT path, watched FROM watched_paths").fetchall()
+
+
+def test_without_the_file_of_the_position_the_younger_generations_are_read(agent):
+    log = followed(agent)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    assert agent.stop() == 0
+    log.path.unlink()
+    first = agent.directory / "app.log.2"
+    first.write_text(syslog_line("two"))
+    later = os.stat(first).st_mtime_ns + 2_000_000_000
+    second = agent.directory / "app.log.1"
+    second.write_text(syslog_line("three"))
+    os.utime(second, ns=(later, later))
+    log.path.write_text(syslog_line("four"))
+    agent.start()
+    assert descriptions(agent.wait_events(4)) == ["one", "two", "three", "four"]
+    agent.wait_trace(f"Lines of {log} may have been lost: the file in which reading stopped at byte")
+    assert agent.stop() == 0
+
+
+def test_truncations_are_counted(agent):
+    agent.listen = "127.0.0.1:0"
+    log = followed(agent)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    log.path.write_bytes(b"")
+    log.append(syslog_line("two"))
+    agent.wait_events(2)
+    agent.api = Api(agent)
+    assert ledger_of(agent, log)["truncations"] == 1
 
 
 def test_without_resumption_the_log_begins_at_its_end(agent):

@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <filesystem>
+#include <fstream>
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -62,6 +63,14 @@ protected:
     void copyAndTruncate(std::string_view to) {
         fs::copy_file(m_path, file(to));
         fs::resize_file(m_path, 0);
+    }
+
+    /// Writes a file, or takes one as it is, and sets its time of modification.
+    static void age(const std::string& path, int secondsAgo, std::string_view text = {}) {
+        if (!text.empty()) {
+            std::ofstream(path) << text;
+        }
+        fs::last_write_time(path, fs::file_time_type::clock::now() - seconds(secondsAgo));
     }
 
     /// Begins another follower at the position.
@@ -181,6 +190,7 @@ TEST_F(FileFollowerTest, RecoversFromACopyWhatATruncationRemoved) {
     EXPECT_EQ(m_ledger.recovered()[0].to, 10);
     EXPECT_EQ(m_ledger.recoveredBytes(), 4);
     EXPECT_EQ(m_ledger.losses(), 0);
+    EXPECT_EQ(m_ledger.truncations(), 1);
 }
 
 TEST_F(FileFollowerTest, DoesNotReadACopyAgainThatEndsBeforeThePosition) {
@@ -351,6 +361,61 @@ TEST_F(FileFollowerTest, APositionOfAFileThatIsGoneBeginsAtTheBeginning) {
     append("entirely new\n");
     begin(position);
     EXPECT_EQ(look(), "entirely new\n");
+}
+
+TEST_F(FileFollowerTest, WithoutTheFileOfThePositionReadsTheYoungerGenerations) {
+    age(file("app.log.1"), 50, "before the position\n");
+    age(m_path, 45);
+    look();
+    append("a\n");
+    age(m_path, 40);
+    EXPECT_EQ(look(), "a\n");
+    const auto position = m_follower->position();
+    begin();
+    fs::remove(m_path);
+    fs::remove(file("app.log.1"));
+    age(file("app.log.3"), 60, "before the position\n");
+    age(file("app.log.2"), 30, "b\n");
+    age(file("app.log.1"), 20, "c\n");
+    begin(position);
+    EXPECT_EQ(looks(3), "b\nc\n"); // nothing has the log's name yet
+    EXPECT_EQ(m_ledger.losses(), 1);
+    append("d\n");
+    EXPECT_EQ(looks(3), "d\n");
+    EXPECT_EQ(m_ledger.losses(), 1);
+    EXPECT_EQ(m_ledger.lost().at(0).from, position->offset);
+}
+
+TEST_F(FileFollowerTest, APositionWithoutATimeHasNoYoungerGenerations) {
+    look();
+    append("a\n");
+    look();
+    auto position = m_follower->position();
+    EXPECT_NE(position->modified, 0);
+    position->modified = 0; // stored by an earlier version
+    begin();
+    fs::remove(m_path);
+    age(file("app.log.1"), 10, "perhaps read\n");
+    append("b\n");
+    begin(position);
+    EXPECT_EQ(looks(3), "b\n");
+    EXPECT_EQ(m_ledger.losses(), 1);
+}
+
+TEST_F(FileFollowerTest, ReadsTheCopiesOfAFileThatWasTruncatedBeforeAnythingOfItWasRead) {
+    m_options.fromBeginning = true;
+    age(m_path, 50);
+    fs::resize_file(m_path, 0);
+    age(m_path, 50);
+    begin();
+    EXPECT_EQ(look(), "");
+    const auto position = m_follower->position();
+    begin();
+    append("a\n");
+    copyAndTruncate("app.log.1");
+    append("b\n");
+    begin(position);
+    EXPECT_EQ(looks(3), "a\nb\n");
 }
 
 TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsReadAsFarAsItGoes) {

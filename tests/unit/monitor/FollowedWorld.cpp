@@ -319,9 +319,9 @@ void FollowedWorld::noteEnd(int last) {
     findMissing();
 }
 
-void FollowedWorld::noteStart() {
+void FollowedWorld::noteStart(bool hasPosition) {
     findMissing();
-    // Without the file of the position nobody knows which generations are younger.
+    // Only generations whose names begin with the log's are looked for by their times.
     const bool isFound = std::any_of(m_files.begin(), m_files.end(), [this](const auto& file) {
         return has(*file.second, m_last);
     });
@@ -332,9 +332,10 @@ void FollowedWorld::noteStart() {
         reopen();
     }
     std::set<int> there;
-    const auto present = m_files.find(m_target);
-    if (present != m_files.end()) {
-        there.insert(present->second->entries.begin(), present->second->entries.end());
+    for (const auto& [path, file] : m_files) {
+        if ((hasPosition && m_style != Style::SYMLINK) || path == m_target) {
+            there.insert(file->entries.begin(), file->entries.end());
+        }
     }
     for (std::size_t i = static_cast<std::size_t>(m_delivered + 1); i < m_entries.size(); ++i) {
         m_entries[i].mayMiss = m_entries[i].mayMiss || there.count(static_cast<int>(i)) == 0;

@@ -52,8 +52,8 @@ public:
     void noteLook();
     /// The follower has ended; `last` is the last entry before its position, -1 if there is none.
     void noteEnd(int last);
-    /// A follower begins at the position of the one that ended.
-    void noteStart();
+    /// A follower begins at the position of the one that ended, if that had one.
+    void noteStart(bool hasPosition);
     /// What was delivered last.
     void noteDelivered(int last) { m_delivered = last; }
 

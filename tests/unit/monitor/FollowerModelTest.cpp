@@ -30,7 +30,7 @@ public:
         if (m_stored.position) {
             m_follower->resumeAt(*m_stored.position);
         }
-        m_world.noteStart();
+        m_world.noteStart(m_stored.position.has_value());
         look(std::chrono::milliseconds(0));
     }
 
