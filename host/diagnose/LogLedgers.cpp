@@ -5,6 +5,7 @@
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
 #include "logmgr/LogManager.h"
+#include "monitor/FollowLedger.h"
 #include "monitor/LogFile.h"
 
 #include <algorithm>
@@ -42,8 +43,10 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.file = log.fileNameLocal();
     view.type = log.type();
     view.procedure = log.procedure();
+    view.truncations = ledger.truncations();
     if (const FollowLedger* const follow = log.followLedger()) {
         view.follow = FollowView::of(*follow);
+        view.truncations = follow->truncations();
     }
     view.openFile = ledger.file();
     view.bytesRead = ledger.bytesRead();
@@ -51,7 +54,6 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.formatErrors = log.numFormatErrors();
     view.lines = log.numEvents();
     view.rows = view.lines - view.formatErrors;
-    view.truncations = ledger.truncations();
     view.skippedBytes = ledger.skippedBytes();
     view.withoutTime = ledger.withoutTime();
     view.restarts = ledger.restarts();

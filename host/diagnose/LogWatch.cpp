@@ -32,6 +32,11 @@ std::optional<std::int64_t> beginOf(const Warnings& before, const std::string& l
     return same == found->second.end() ? std::nullopt : std::optional(same->since);
 }
 
+/// Whether the log's thread has reported the same.
+bool isTraced(const LogLedgerView& log, const LogWarning& warning) {
+    return warning.kind == "failing" && log.follow && !log.follow->problem.empty();
+}
+
 } // namespace
 
 struct LogWatch::Shared {
@@ -103,7 +108,7 @@ void LogWatch::run(const std::shared_ptr<Shared>& shared) {
             for (LogWarning& warning : warnings) {
                 const std::optional<std::int64_t> begin = beginOf(before, log.log, warning.kind);
                 warning.since = begin.value_or(WallClock::now());
-                if (!begin) {
+                if (!begin && !isTraced(log, warning)) {
                     lines.push_back(log.log + ": " + warning.text);
                 }
             }

@@ -67,6 +67,15 @@ protected:
     }};
 };
 
+TEST_F(LogWatchTest, DoesNotAnnounceAFailureThatTheLogsThreadHasReported) {
+    m_log.follow = FollowView{};
+    m_log.follow->problem = "open failed and is tried again: Permission denied";
+    ASSERT_TRUE(waitFor(1));
+    m_log.follow->problem.clear();
+    ASSERT_TRUE(waitFor(0));
+    EXPECT_THAT(announced(), IsEmpty());
+}
+
 TEST_F(LogWatchTest, ChecksAtMostOncePerInterval) {
     for (int i = 0; i < 5; ++i) {
         m_watch.tick(m_now, [this] {
