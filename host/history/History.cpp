@@ -137,8 +137,10 @@ void History::finish(HistoryWriter::Clock::time_point limit) {
     const std::uint64_t left = m_writer.finish(limit);
     m_recent.end();
     if (left > 0 && !std::exchange(m_toldOfRest, true)) {
-        say("%" PRIu64 " events were not stored in the history %s: %s", left,
-            m_directory->file().c_str(), m_writer.problem().c_str());
+        const bool hasFollowed = !m_positions->positions().empty();
+        say("%" PRIu64 " events were not stored in the history %s: %s%s", left,
+            m_directory->file().c_str(), m_writer.problem().c_str(),
+            hasFollowed ? "; entries of [[log]] logs are read again at the next start" : "");
     }
 }
 

@@ -228,7 +228,9 @@ private:
                                                               error.text());
         }
         if (!S_ISREG(status.st_mode)) {
-            return passOver(candidate, S_ISDIR(status.st_mode) ? "It is a directory"
+            // What a followed log was is read to its end, and its state says what has its name.
+            return m_finder.m_known.contains(candidate.name) ||
+                   passOver(candidate, S_ISDIR(status.st_mode) ? "It is a directory"
                                                                : "It is not a regular file");
         }
         candidate.isThere = true;

@@ -16,6 +16,7 @@
 #include <string>
 #include <utility>
 
+#include <signal.h>
 #include <unistd.h>
 
 using namespace zrm;
@@ -74,9 +75,22 @@ void setTrace(const std::string& file) {
     }
 }
 
+/// Ends a process that is asked to stop before anything reads a log. The agent takes signals
+/// otherwise only once its manager thread waits for them, and the history may take long to open.
+void endAtOnceWhenAsked() {
+    for (const int number : {SIGTERM, SIGINT}) {
+        struct sigaction action {};
+        if (sigaction(number, nullptr, &action) == 0 && action.sa_handler == SIG_DFL) {
+            action.sa_handler = [](int) { _exit(0); };
+            sigaction(number, &action, nullptr);
+        }
+    }
+}
+
 } // namespace
 
 void SYS1_Main(int* argc, char** argv, const char* /*component*/) {
+    endAtOnceWhenAsked();
     StandardStreams::fill();
     Descriptors::raiseLimit();
     EventRoomControl::hold(); // until the situations are open

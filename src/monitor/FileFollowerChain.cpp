@@ -113,7 +113,9 @@ void FileFollower::recover() {
     Member& truncated = m_chain.front();
     truncated.from = 0;
     truncated.tail = Tail{};
-    const bool isOwn = identityOf(at) == truncated.file->identity();
+    // Not if the file was truncated before, and nothing in it was judged since.
+    const bool isOwn =
+        identityOf(at) == truncated.file->identity() && at.offset == m_block.offset();
     Found found = find(at, Search::byContents, nullptr);
     if (isOwn && !found.holder) {
         dropShortCopy(found, at.offset);

@@ -4,6 +4,7 @@ import contextlib
 import os
 import sqlite3
 
+import pytest
 from api import Api
 from conftest import Log, descriptions, syslog_line, wait_until
 from test_ledger import ledger_of
@@ -119,6 +120,30 @@ def test_without_the_file_of_the_position_the_younger_generations_are_read(agent
     assert descriptions(agent.wait_events(4)) == ["one", "two", "three", "four"]
     agent.wait_trace(f"Lines of {log} may have been lost: the file in which reading stopped at byte")
     assert agent.stop() == 0
+
+
+@pytest.mark.slow
+def test_a_log_whose_name_a_directory_takes_is_read_to_its_end_and_then_its_successor(agent):
+    agent.listen = "127.0.0.1:0"
+    log = followed(agent)
+    agent.api = Api(agent)
+    rotated = Log(agent.directory / "app.log.1")
+    log.path.rename(rotated.path)
+    log.path.mkdir()
+    wait_until(lambda: followed_as(agent, log)["state"] == "not a file", "the state of the log")
+    agent.refresh()  # looks for the files again
+    agent.wait_trace("not a regular file")
+    rotated.append(syslog_line("still written"))
+    assert descriptions(agent.wait_events(1)) == ["still written"]
+    log.path.rmdir()
+    log.path.write_text(syslog_line("new"))
+    assert descriptions(agent.wait_events(2)) == ["still written", "new"]
+
+
+def followed_as(agent, log):
+    status, _, answer = agent.api.request("GET", f"/api/v1/logs?log={log}")
+    assert status == 200, answer
+    return answer["logs"][0]["ledger"]["follow"]
 
 
 def test_truncations_are_counted(agent):

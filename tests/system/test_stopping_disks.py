@@ -3,6 +3,7 @@
 import subprocess
 import time
 from pathlib import Path
+from signal import SIGINT, SIGTERM
 
 import pytest
 from api import Api
@@ -42,6 +43,17 @@ def refresh_onto(agent, log):
     agent.configure(str(log))
     agent.refresh()
     agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
+
+
+@pytest.mark.parametrize("number", (SIGTERM, SIGINT))
+def test_a_stop_while_the_history_opens_is_a_stop(agent, disk, number):
+    flag = use_disk(agent, disk, "frozen")
+    flag.touch()
+    agent.log()
+    agent.start(wait=False)
+    lock = agent.directory / "state" / "history.lock"
+    wait_until(lambda: lock.exists() or not agent.running(), "the history to be opened")
+    assert stop(agent, number) == 0
 
 
 @pytest.mark.parametrize("kind", ("full", "frozen"))

@@ -212,6 +212,19 @@ TEST_F(FileFollowerTest, DoesNotReadACopyAgainThatEndsBeforeThePosition) {
     EXPECT_EQ(m_ledger.recoveredBytes(), 0);
 }
 
+TEST_F(FileFollowerTest, RecoversAnUnfinishedLineOfAFileThatIsTruncatedTwice) {
+    look();
+    append("a long line\n");
+    EXPECT_EQ(look(), "a long line\n");
+    fs::resize_file(m_path, 0);
+    EXPECT_EQ(look(), "");
+    append("half");
+    EXPECT_EQ(look(), "");
+    copyAndTruncate("app.log.1");
+    append("new\n");
+    EXPECT_EQ(looks(3), "half\nnew\n");
+}
+
 TEST_F(FileFollowerTest, RecoversFromACompressedCopy) {
     look();
     append("a\n");

@@ -200,6 +200,22 @@ TEST_F(LogFinderTest, AFileThatIsGoneStaysForAWhile) {
     EXPECT_TRUE(isNewcomer(file("app.log")));
 }
 
+TEST_F(LogFinderTest, AFollowedLogStaysWhenItsNameIsNoLongerAFiles) {
+    create("app.log");
+    create("named.log");
+    logs = {table({file("*.log"), file("named.log")})};
+    look();
+    for (const char* const name : {"app.log", "named.log"}) {
+        rename(name, std::string(name) + ".1");
+        std::filesystem::create_directory(file(name));
+    }
+    now += LogFinder::keptAbsent + 1s;
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log"), file("named.log")));
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log"), file("named.log")));
+}
+
 TEST_F(LogFinderTest, OneFileOfTwoNamesIsFollowedOnce) {
     create("a.log");
     ASSERT_EQ(symlink(file("a.log").c_str(), file("current.log").c_str()), 0);
