@@ -19,9 +19,9 @@ namespace {
 
 TRC1_Anchor anchor{"Backtest.cpp"};
 
-constexpr std::uint64_t entriesPerLook = 1024; ///< at the clock
+constexpr std::uint64_t entriesPerLook = 1024; ///< between two looks at the clock
 
-/// Behind every time of an entry.
+/// Later than the time of any entry.
 constexpr std::string_view never = "9999999999999999";
 
 constexpr char errorLog = 'E';
@@ -48,7 +48,7 @@ struct Backtest::Limits {
     const std::function<bool()>& isCancelled;
     std::chrono::steady_clock::time_point deadline = std::chrono::steady_clock::now() + patience;
 
-    std::uint64_t looked = 0; ///< at entries, also at those behind the last time
+    std::uint64_t looked = 0; ///< entries read, including those after the last time
     const char* reason = "";  ///< which limit was reached
 
     bool areReached(const Result& result) {
@@ -87,8 +87,8 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     TraceScope trace(anchor);
     _RequestThresholds window{};
     from.copy(window.startTime, sizeof window.startTime - 1);
-    // A log would pass over what is behind the last time in one go, which nothing could end; the
-    // error log's command is told the time instead.
+    // With an end, a log would skip the entries after it in one go, which nothing could
+    // interrupt. The error log's command needs the end as its argument.
     const std::string_view end = log.type() == errorLog ? std::string_view(to) : never;
     end.copy(window.endTime, sizeof window.endTime - 1);
     const ReportOutcome outcome(ReportedFile::monitored);

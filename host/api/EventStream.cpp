@@ -32,7 +32,7 @@ TRC1_Anchor anchor{"EventStream.cpp"};
 
 constexpr std::size_t eventsAtOnce = 200;
 
-/// The id after which a client wants to go on; none when it wants what is new.
+/// The id after which a client wants to go on; none when it wants only what is new.
 std::optional<std::uint64_t> resumeAfter(const HttpRequest& request, QueryFields& query) {
     constexpr std::uint64_t mostId = std::numeric_limits<std::int64_t>::max();
     const std::optional<std::uint64_t> after = query.number("after", 0, mostId);
@@ -184,7 +184,7 @@ void EventStream::Followers::run() {
     }
 }
 
-/// Gives a client what there is for it. False when it follows no longer.
+/// Gives a client what there is for it. False when it no longer follows the stream.
 bool EventStream::Followers::serve(Follower& follower) const {
     TraceScope trace(anchor);
     if (!follower.channel->isOpen()) {
@@ -229,8 +229,8 @@ Result<std::string> EventStream::Followers::next(Follower& follower) const {
     return text;
 }
 
-/// Waits until there are events for a client that can take them, or one must hear that the stream
-/// is alive, or a client's state has changed.
+/// Waits until there are events for a client that can take them, or one needs a sign that the
+/// stream is alive, or a client's state has changed.
 void EventStream::Followers::waitForChange(const std::vector<Follower>& followers,
                                            const std::stop_token& wake) const {
     std::uint64_t known = std::numeric_limits<std::int64_t>::max();

@@ -196,7 +196,7 @@ CliStatus EventsCommand::list(Context& context) {
     add("from", m_from.empty() ? "" : Context::time("--from", m_from));
     add("to", m_to.empty() ? "" : Context::time("--to", m_to));
     Json events = find(context, query, m_limit > 0 ? m_limit : usualLimit).events;
-    std::reverse(events.begin(), events.end()); // the newest stands where the eye is
+    std::reverse(events.begin(), events.end()); // the newest is next to the prompt
     if (events.empty()) {
         Context::note("no such event");
         return CliStatus::REFUSED;

@@ -24,7 +24,7 @@ namespace {
 
 using Json = JsonText::Json;
 
-/// What a table shows unless it is told otherwise, where any entry has it.
+/// The columns that a table shows by default, those that are blank in every entry excepted.
 constexpr std::array usualColumns = {"ENTRYTIME", "ENTRYSYS",   "ENTRYSRC",
                                      "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC"};
 

@@ -44,14 +44,14 @@ constexpr std::array meanings = {
     Meaning{CURLE_SEND_ERROR, Outcome::sendFailed},
     Meaning{CURLE_RECV_ERROR, Outcome::brokenOff},
     Meaning{CURLE_GOT_NOTHING, Outcome::brokenOff},
-    Meaning{CURLE_OK, Outcome::brokenOff}, // the library takes the end within a head for an end
+    Meaning{CURLE_OK, Outcome::brokenOff}, // the connection ended within a head
     Meaning{CURLE_UNSUPPORTED_PROTOCOL, Outcome::notHttp},
     Meaning{CURLE_WEIRD_SERVER_REPLY, Outcome::notHttp},
     Meaning{CURLE_WRITE_ERROR, Outcome::notHttp},   // the head was refused
-    Meaning{CURLE_OUT_OF_MEMORY, Outcome::notHttp}, // so the library says of a line above 100 kB
+    Meaning{CURLE_OUT_OF_MEMORY, Outcome::notHttp}, // also for a line above 100 kB
 };
 
-/// What a request has come to that got no whole head.
+/// The outcome of a request that did not get a complete head.
 Outcome outcomeOf(CURLcode code) {
     const auto* const found = std::find_if(meanings.begin(), meanings.end(),
                                            [&](const Meaning& m) { return m.code == code; });
@@ -264,7 +264,7 @@ void HttpClient::Implementation::setTls() {
 
 void HttpClient::Implementation::setRequest() {
     m_headers = {};
-    m_headers.add("Expect:"); // the library would wait for leave to send a large body
+    m_headers.add("Expect:"); // or the library waits for permission to send a large body
     for (const std::string& header : m_request->headers) {
         // The library takes a header without a value for one that is not to be sent.
         m_headers.add(header.ends_with(": ") ? header.substr(0, header.size() - 2) + ';' : header);

@@ -17,8 +17,8 @@ using namespace zrm::host;
 std::atomic<unsigned> TRC1_Generation{1};
 
 unsigned TRC1_Sync(TRC1_Anchor& anchor) noexcept {
-    // Another thread may store an older level after this one stored its own. Whoever stores looks
-    // afterwards whether the generation has moved on, so the last to store has the latest.
+    // Another thread may store an older level after this one stored its own. Each of them
+    // checks afterwards whether the generation has moved on, so the last to store has the latest.
     for (;;) {
         const unsigned generation = TRC1_Generation.load();
         if (TraceCapture::exists()) {

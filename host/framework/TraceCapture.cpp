@@ -52,7 +52,7 @@ void TraceCapture::add(const char* format, std::va_list arguments) noexcept {
             m_errors += text;
         }
     } catch (const std::bad_alloc&) {
-        // One reason fewer.
+        // Without memory, the answer lacks this reason.
     }
 }
 

@@ -23,7 +23,7 @@ constexpr std::chrono::milliseconds longestPause{10'000};
 constexpr std::chrono::seconds housekeepingInterval{1};
 constexpr std::int64_t millisecondsPerDay = 24 * 60 * 60'000;
 
-/// The place of a sink that is no longer in the configuration is kept so long.
+/// How long the place of a sink that is no longer in the configuration is kept.
 constexpr int daysOfUnusedCursors = 30;
 constexpr std::chrono::hours tendingInterval{24};
 /// After the start; until then nobody knows which logs are still followed.
@@ -162,7 +162,7 @@ Result<void> HistoryWriter::openFile() {
     return {};
 }
 
-/// Keeps that ids up to this one may have been given.
+/// Records in the lock file that ids up to this one may have been given.
 void HistoryWriter::reserveIds(std::uint64_t last) {
     m_directory.reserveIds(last);
     m_reserved = last;
@@ -276,7 +276,8 @@ void HistoryWriter::storeCursors() {
     }
 }
 
-/// The sinks that run are in use, also those that get no events; who was not for long is forgotten.
+/// Marks all running sinks as in use, also those that get no events, and forgets those that have
+/// not been in use for long.
 void HistoryWriter::tendCursors() {
     m_cursors.forgetSaved();
     storeCursors();

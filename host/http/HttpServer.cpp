@@ -118,7 +118,7 @@ private:
     asio::steady_timer m_pause{m_lanes.front().io};
     std::size_t m_nextLane = 0;
     WorkerPool m_workers;
-    WorkerPool m_quickWorkers; ///< last: the workers use what stands above
+    WorkerPool m_quickWorkers; ///< last: the workers use the members above
 };
 
 HttpServer::Network::Network(const Router& router, Size size)

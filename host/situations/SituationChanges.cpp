@@ -184,8 +184,7 @@ SituationSet::Changed SituationSet::changeInTurn(const std::function<Changed(Dra
     return changed;
 }
 
-/// Saves that stopped situations which left the file are forgotten, so that this survives a
-/// restart.
+/// Stores which situations of the file are stopped, without those that have left the file.
 void SituationSet::keepStoppedFiles() {
     TraceScope trace(anchor);
     const Turn turn(*this);
