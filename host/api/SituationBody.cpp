@@ -24,13 +24,12 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
 }
 
 SituationConfig SituationBody::situation(JsonFields& fields, const std::string& name) {
-    SituationConfig situation;
-    const auto problems = SituationValidator::check(text(fields, name), situation);
+    auto [situation, problems] = SituationValidator::check(text(fields, name));
     if (!problems.empty()) {
         const SituationProblem& first = problems.front();
         throw RequestRefused(400, {first.what, first.cure, fields.place(first.field)});
     }
-    return situation;
+    return std::move(situation);
 }
 
 } // namespace zrm::host

@@ -133,9 +133,8 @@ HttpAnswer SituationsResource::validate(const HttpRequest& request) {
     JsonFields fields(request.body);
     Json problems = Json::array();
     try {
-        SituationConfig situation;
         const SituationText text = SituationBody::text(fields);
-        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+        for (const SituationProblem& problem : SituationValidator::check(text).problems) {
             problems.push_back(jsonOf(problem));
         }
     } catch (const RequestRefused& refused) {

@@ -54,10 +54,9 @@ SituationConfig SituationReader::read(const toml::table& table) {
     text.frequency = fields.text("frequency");
     text.period = fields.text("period");
 
-    SituationConfig situation;
+    auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;
-    for (const SituationProblem& problem :
-         SituationValidator::check(text, situation, m_patterns.ofNext())) {
+    for (const SituationProblem& problem : problems) {
         isNamed = isNamed && problem.field != "name";
         if (problem.condition) {
             section.problem(conditions[*problem.condition].second, "when", problem.what,
@@ -71,7 +70,7 @@ SituationConfig SituationReader::read(const toml::table& table) {
         noteName(section, situation.name);
     }
     section.refuseUnknownKeys();
-    return situation;
+    return std::move(situation);
 }
 
 void SituationReader::noteName(ConfigSection& section, const std::string& name) {

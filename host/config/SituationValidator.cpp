@@ -193,11 +193,11 @@ void addThresholds(const SituationText& text, SituationConfig& situation, Proble
 
 } // namespace
 
-std::vector<SituationProblem> SituationValidator::check(const SituationText& text,
-                                                        SituationConfig& situation,
-                                                        PatternBudget budget) {
-    Problems problems;
-    situation = {};
+SituationValidator::Verdict SituationValidator::check(const SituationText& text,
+                                                      PatternBudget budget) {
+    Verdict verdict;
+    SituationConfig& situation = verdict.situation;
+    Problems& problems = verdict.problems;
     situation.name = text.name.value_or("");
     situation.text = text.text.value_or("");
     situation.severity = text.severity.value_or(defaultSeverity);
@@ -214,7 +214,7 @@ std::vector<SituationProblem> SituationValidator::check(const SituationText& tex
     addConditions(text, situation, budget, problems);
     situation.patternSize = budget.used();
     addThresholds(text, situation, problems);
-    return problems;
+    return verdict;
 }
 
 } // namespace zrm::host

@@ -37,11 +37,13 @@ public:
     static constexpr std::size_t mostConditions = 100;
     static constexpr std::size_t longestConditions = 65536; ///< bytes of all of them
 
-    /// Builds the situation from the text and returns all problems. The situation is meaningless
-    /// when there are any. The budget is for its regular expressions.
-    static std::vector<SituationProblem> check(const SituationText& text,
-                                               SituationConfig& situation,
-                                               PatternBudget budget = PatternBudget());
+    /// What the text says, and everything that is wrong with it.
+    struct Verdict {
+        SituationConfig situation; ///< cannot be run if there are problems
+        std::vector<SituationProblem> problems;
+    };
+    /// The budget is for the situation's regular expressions.
+    static Verdict check(const SituationText& text, PatternBudget budget = PatternBudget());
 };
 
 } // namespace zrm::host

@@ -85,11 +85,12 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     text.period = optionalText(object, "period");
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
-    for (const SituationProblem& problem :
-         SituationValidator::check(text, made.config, patterns.ofNext())) {
+    auto [config, problems] = SituationValidator::check(text, patterns.ofNext());
+    for (const SituationProblem& problem : problems) {
         made.problem += (made.problem.empty() ? "" : "; ") + problem.field + ": " + problem.text();
     }
-    patterns.spend(made.config.patternSize);
+    patterns.spend(config.patternSize);
+    made.config = std::move(config);
     return made;
 }
 

@@ -34,8 +34,8 @@ protected:
             text.frequency = frequency;
             text.period = "60s";
         }
-        SituationConfig config;
-        EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+        const auto [config, problems] = SituationValidator::check(text);
+        EXPECT_THAT(problems, IsEmpty());
         Backtest test(config, entries);
         return test.run(logs, from, to, [this] { return isCancelled; });
     }

@@ -37,8 +37,8 @@ SituationConfig situation(const char* frequency = nullptr) {
         text.frequency = frequency;
         text.period = "60s";
     }
-    SituationConfig config;
-    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    const auto [config, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
     return config;
 }
 

@@ -127,8 +127,8 @@ SituationConfig randomSituation(Random& random, std::size_t number) {
             text.frequency = "< 2"; // the other cannot be reached, and is refused
         }
     }
-    SituationConfig config;
-    for (const SituationProblem& problem : SituationValidator::check(text, config)) {
+    auto [config, problems] = SituationValidator::check(text);
+    for (const SituationProblem& problem : problems) {
         ADD_FAILURE() << problem.field << ": " << problem.text();
     }
     if (kind == 3) { // refused when somebody writes it; the agent takes it for no threshold

@@ -28,8 +28,8 @@ SituationConfig situation(std::vector<std::string> when, const char* frequency =
         text.frequency = frequency;
         text.period = period;
     }
-    SituationConfig config;
-    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    const auto [config, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
     return config;
 }
 

@@ -22,9 +22,8 @@ SituationText named(std::string name) {
 
 /// The fields that are wrong.
 std::vector<std::string> fieldsOf(const SituationText& text) {
-    SituationConfig situation;
     std::vector<std::string> fields;
-    for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+    for (const SituationProblem& problem : SituationValidator::check(text).problems) {
         fields.push_back(problem.field);
     }
     return fields;
@@ -38,8 +37,8 @@ TEST(SituationValidator, KeepsTheTextAndBuildsConditions) {
     text.when = {"ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed'"};
     text.frequency = "> 4";
     text.period = "1m";
-    SituationConfig situation;
-    EXPECT_THAT(SituationValidator::check(text, situation), IsEmpty());
+    const auto [situation, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
     EXPECT_EQ(situation.name, "ssh");
     EXPECT_EQ(situation.text, "Failed logins");
     EXPECT_EQ(situation.severity, "major");
@@ -57,8 +56,8 @@ TEST(SituationValidator, KeepsTheTextAndBuildsConditions) {
 }
 
 TEST(SituationValidator, OnlyANameIsRequired) {
-    SituationConfig situation;
-    EXPECT_THAT(SituationValidator::check(named("a"), situation), IsEmpty());
+    const auto [situation, problems] = SituationValidator::check(named("a"));
+    EXPECT_THAT(problems, IsEmpty());
     EXPECT_EQ(situation.severity, "warning");
     EXPECT_THAT(situation.conditions, IsEmpty());
     EXPECT_FALSE(situation.log);
@@ -99,8 +98,7 @@ TEST(SituationValidator, ReportsEveryProblemWithItsPlace) {
     text.frequency = "often";
     EXPECT_THAT(fieldsOf(text), ElementsAre("name", "severity", "log", "when[1]", "when[2]",
                                             "frequency", "frequency"));
-    SituationConfig situation;
-    const auto problems = SituationValidator::check(text, situation);
+    const auto problems = SituationValidator::check(text).problems;
     EXPECT_THAT(problems[3].what, HasSubstr("in \"NOTHING = 'x'\": 'NOTHING' is not a column"));
     EXPECT_THAT(problems[3].cure, HasSubstr("the columns are ORIGINNODE, "));
 }
@@ -119,9 +117,9 @@ TEST(SituationValidator, RegularExpressionsAreLimitedAloneAndTogether) {
     const auto problemsOf = [](const char* pattern, std::size_t times) {
         SituationText text = named("a");
         text.when.assign(times, std::string("ENTRYDESC matches '") + pattern + "'");
-        SituationConfig situation;
+        const auto [situation, problems] = SituationValidator::check(text);
         std::vector<std::string> texts;
-        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+        for (const SituationProblem& problem : problems) {
             texts.push_back(problem.field + ": " + problem.what);
         }
         if (texts.empty()) {
@@ -152,9 +150,8 @@ TEST(SituationValidator, RefusesThresholdsThatHaveNoEffect) {
     const auto refused = [](std::vector<std::string> when) {
         SituationText text = named("a");
         text.when = std::move(when);
-        SituationConfig situation;
         std::vector<std::string> texts;
-        for (const SituationProblem& problem : SituationValidator::check(text, situation)) {
+        for (const SituationProblem& problem : SituationValidator::check(text).problems) {
             texts.push_back(problem.field + ": " + problem.text());
         }
         return texts;

@@ -37,8 +37,8 @@ SituationConfig situation(const std::string& name, std::vector<std::string> when
     text.name = name;
     text.when = std::move(when);
     text.severity = severity;
-    SituationConfig config;
-    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    const auto [config, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
     return config;
 }
 

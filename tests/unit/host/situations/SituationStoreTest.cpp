@@ -35,8 +35,8 @@ SituationConfig situation(const std::string& name) {
     text.when = {"ENTRYSRC = 'it''s'", "ENTRYDESC matches '[\"\\\\]'"};
     text.frequency = ">= 2";
     text.period = "1h";
-    SituationConfig config;
-    EXPECT_THAT(SituationValidator::check(text, config), IsEmpty());
+    const auto [config, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
     return config;
 }
 
