@@ -259,7 +259,7 @@ void LogReader::readFollowing(ConfigSection& section, LogConfig& log) {
     using std::chrono::seconds;
     constexpr seconds longestWait = std::chrono::hours(1);
     if (log.type == 'E') {
-        for (const char* const key : {"follow", "start", "rotate_wait"}) {
+        for (const char* const key : {"follow", "start", "rotate_wait", "rotated_to"}) {
             refuse(section, key, log);
         }
     }
@@ -279,6 +279,18 @@ void LogReader::readFollowing(ConfigSection& section, LogConfig& log) {
                             "write for example \"2s\" or \"5m\"");
         } else {
             log.follow.rotateWait = *wait;
+        }
+    }
+    if (const std::optional<std::string> directory = section.text("rotated_to")) {
+        if (directory->empty() || directory->size() > longestPath) {
+            section.problem("rotated_to",
+                            directory->empty()
+                                ? "is not a directory"
+                                : "has " + std::to_string(directory->size()) + " bytes",
+                            "write the directory to which rotation moves older files, for example "
+                            "\"/var/log/old\"");
+        } else {
+            log.follow.rotatedTo = *directory;
         }
     }
 }

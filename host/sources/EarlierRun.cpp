@@ -1,9 +1,11 @@
 #include "host/sources/EarlierRun.h"
 
 #include "host/base/TimeText.h"
+#include "host/config/PathPattern.h"
 #include "host/events/PositionBook.h"
 #include "host/sources/FoundLogs.h"
 #include "monitor/Generation.h"
+#include "monitor/GenerationNames.h"
 
 #include <algorithm>
 #include <memory>
@@ -29,6 +31,17 @@ bool isReadable(const std::string& path) {
     struct stat status;
     return ::stat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode) &&
            ::faccessat(AT_FDCWD, path.c_str(), R_OK, AT_EACCESS) == 0;
+}
+
+/// The first table that names or matches the log.
+const LogConfig* tableOf(const std::vector<LogConfig>& logs, const std::string& name) {
+    const auto isOf = [&name](const std::string& path) {
+        return PathPattern::isPattern(path) ? PathPattern::matches(path, name) : path == name;
+    };
+    const auto table = std::find_if(logs.begin(), logs.end(), [&isOf](const LogConfig& log) {
+        return std::any_of(log.paths.begin(), log.paths.end(), isOf);
+    });
+    return table == logs.end() ? nullptr : &*table;
 }
 
 /// The inodes of the entries of a directory.
@@ -77,24 +90,29 @@ std::string EarlierRun::logOf(const std::string& file, const Identity& identity)
     return "";
 }
 
-std::vector<std::string> EarlierRun::renamedLogs() const {
-    std::vector<std::string> logs;
+std::vector<std::string> EarlierRun::renamedLogs(const std::vector<LogConfig>& logs) const {
+    std::vector<std::string> renamed;
     std::map<std::string, std::set<ino_t>> directories;
-    for (const auto& [log, position] : m_positions) {
-        struct stat status;
-        if (::stat(log.c_str(), &status) == 0) {
-            continue;
-        }
-        const std::string directory = log.substr(0, log.rfind('/') + 1);
+    const auto isIn = [&directories](const std::string& directory, std::uint64_t inode) {
         auto known = directories.find(directory);
         if (known == directories.end()) {
             known = directories.emplace(directory, inodesIn(directory)).first;
         }
-        if (known->second.contains(static_cast<ino_t>(position.inode))) {
-            logs.push_back(log);
+        return known->second.contains(static_cast<ino_t>(inode));
+    };
+    for (const auto& [log, position] : m_positions) {
+        struct stat status;
+        const LogConfig* const table = tableOf(logs, log);
+        if (table == nullptr || ::stat(log.c_str(), &status) == 0) {
+            continue;
+        }
+        const std::string moved = rotationDirectory(log, table->follow.rotatedTo);
+        if (isIn(log.substr(0, log.rfind('/') + 1), position.inode) ||
+            (!moved.empty() && isIn(moved, position.inode))) {
+            renamed.push_back(log);
         }
     }
-    return logs;
+    return renamed;
 }
 
 void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs,

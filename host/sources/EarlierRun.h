@@ -36,9 +36,9 @@ public:
     /// The log whose stored position is in this file, recognised by what the file has before it.
     /// Empty if there is none, and for the log of that name itself. Reads the file.
     std::string logOf(const std::string& file, const Identity& identity) const;
-    /// The logs with a stored position in a file that is still in the log's directory, but no
-    /// longer under the log's name. Reads directories.
-    std::vector<std::string> renamedLogs() const;
+    /// The logs of these tables with a stored position in a file that has another name by now.
+    /// Reads the directories in which rotation leaves files.
+    std::vector<std::string> renamedLogs(const std::vector<LogConfig>& logs) const;
 
     /// Notes in the book that the files of the tables were looked for at this time (milliseconds
     /// since 1970), for those tables whose files all have stored positions by now.

@@ -4,6 +4,7 @@
 #include "host/base/Utf8.h"
 #include "host/config/PathPattern.h"
 #include "host/sources/PathSearch.h"
+#include "monitor/GenerationNames.h"
 
 #include <algorithm>
 #include <array>
@@ -70,11 +71,6 @@ std::vector<std::string> originsOf(const std::string& path) {
     return origins;
 }
 
-/// True if both files are in the same directory, where the generations of a log are looked for.
-bool isBeside(std::string_view one, std::string_view other) {
-    return one.substr(0, one.rfind('/')) == other.substr(0, other.rfind('/'));
-}
-
 } // namespace
 
 /// A path that is named or matched.
@@ -139,23 +135,11 @@ private:
     /// Before the first look: logs that lost their name after the last run have not been read to
     /// their ends.
     void takeUp() {
-        for (const std::string& log : m_finder.m_earlier.renamedLogs()) {
-            if (!isConfigured(log)) {
-                continue;
-            }
+        for (const std::string& log : m_finder.m_earlier.renamedLogs(m_logs)) {
             const LogPosition& position = m_finder.m_earlier.positions().at(log);
             m_finder.m_known.emplace(
                 log, Known{Identity{position.device, position.inode}, m_now, false});
         }
-    }
-
-    bool isConfigured(const std::string& name) const {
-        return std::any_of(m_logs.begin(), m_logs.end(), [&name](const LogConfig& log) {
-            return std::any_of(log.paths.begin(), log.paths.end(), [&name](const auto& path) {
-                return PathPattern::isPattern(path) ? PathPattern::matches(path, name)
-                                                    : path == name;
-            });
-        });
     }
 
     void collect() {
@@ -274,6 +258,14 @@ private:
         return true;
     }
 
+    /// True if the file is where the generations of the log are looked for.
+    bool isWhereRotated(const Candidate& candidate, const std::string& log) const {
+        const std::string directory = candidate.name.substr(0, candidate.name.rfind('/') + 1);
+        const std::string& rotatedTo = m_logs[m_sourceOf.at(log)].follow.rotatedTo;
+        return directory == log.substr(0, log.rfind('/') + 1) ||
+               directory == rotationDirectory(log, rotatedTo);
+    }
+
     /// False if the file is, or was until it was rotated, followed under another name.
     bool isFirstName(const Candidate& candidate) {
         const auto [same, isFirst] = m_identities.emplace(candidate.identity, candidate.name);
@@ -293,7 +285,7 @@ private:
         for (const auto& [name, known] : m_finder.m_known) {
             isRotated = isRotated || known.identity == candidate.identity;
         }
-        isRotated = isRotated || (m_names.contains(earlier) && isBeside(earlier, candidate.name));
+        isRotated = isRotated || (m_names.contains(earlier) && isWhereRotated(candidate, earlier));
         if (isRotated) {
             m_rotated.emplace(candidate.name, candidate.identity);
             return passOver(candidate, "It was followed under another name before it was rotated");

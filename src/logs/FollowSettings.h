@@ -36,6 +36,9 @@ struct FollowSettings {
     bool isNewcomer = false;
     /// How long a rotated file must have been quiet before its successor is read.
     std::chrono::milliseconds rotateWait{2000};
+    /// A directory to which rotation moves older files, absolute or seen from the log's own. Empty:
+    /// they stay in the log's directory.
+    std::string rotatedTo;
     /// What times without a zone mean, as a name of the time zone database. Empty: local time.
     std::string timezone;
     std::vector<ZoneOffset> zone; ///< the offsets of `timezone`, oldest first

@@ -33,6 +33,7 @@ public:
         bool byName = true;         ///< false: the file that was opened, whatever its name
         bool fromBeginning = false; ///< for a log without a position whose file is there already
         std::chrono::milliseconds rotateWait{2000};
+        std::string rotatedTo;        ///< see FollowSettings
         std::size_t recordLength = 0; ///< 0: the entries are lines
     };
     struct Moment {
@@ -94,7 +95,7 @@ private:
     bool openYounger(const GenerationReference& reference, const std::vector<GenerationFile>& files,
                      Generation* named, Found& found);
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
-    std::string siblingPath();
+    std::vector<GenerationFile> generations(ino_t inode = 0);
 
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);

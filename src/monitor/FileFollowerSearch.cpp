@@ -64,13 +64,14 @@ std::unique_ptr<Generation> FileFollower::openNamed() {
     return named;
 }
 
-/// The path beside which the generations lie: a symbolic link's target.
-std::string FileFollower::siblingPath() {
+/// The files beside the log, or beside the target of a symbolic link, and those that rotation has
+/// moved.
+std::vector<GenerationFile> FileFollower::generations(ino_t inode) {
     const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
     if (real) {
         m_siblings = real.get();
     }
-    return m_siblings.empty() ? m_path : m_siblings;
+    return findGenerations(m_siblings.empty() ? m_path : m_siblings, inode, m_options.rotatedTo);
 }
 
 bool FileFollower::isKnown(const FileIdentity& file, const Generation* named) const noexcept {
@@ -96,7 +97,7 @@ FileFollower::Found FileFollower::findYounger(const GenerationReference& referen
     Found found;
     for (int attempt = 0; attempt < mostAttempts; ++attempt) {
         found = Found{};
-        if (openYounger(reference, findGenerations(siblingPath()), named, found)) {
+        if (openYounger(reference, generations(), named, found)) {
             break;
         }
     }
@@ -114,8 +115,7 @@ bool FileFollower::tryFind(const LogPosition& position, Search search, Generatio
         found.holder = std::move(present);
         return true;
     }
-    const std::vector<GenerationFile> files =
-        findGenerations(siblingPath(), static_cast<ino_t>(position.inode));
+    const std::vector<GenerationFile> files = generations(static_cast<ino_t>(position.inode));
     bool vanished = false;
     found.holder = findHolder(position, search, named, files, vanished);
     if (vanished) {

@@ -100,17 +100,14 @@ std::optional<GenerationName> GenerationName::parse(std::string_view name, std::
     return parseAddition(plain.substr(stem.size(), plain.size() - stem.size() - extension.size()));
 }
 
-std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode) {
-    std::vector<GenerationFile> files;
-    const std::size_t slash = logPath.rfind('/');
-    if (slash == std::string::npos) {
-        return files;
-    }
-    const std::string directory = logPath.substr(0, slash + 1);
-    const std::string_view log = std::string_view(logPath).substr(slash + 1);
+namespace {
+
+/// Adds those of one directory.
+void addGenerations(const std::string& directory, std::string_view log, ino_t inode,
+                    std::vector<GenerationFile>& files) {
     const std::unique_ptr<DIR, int (*)(DIR*)> entries(opendir(directory.c_str()), closedir);
     if (!entries) {
-        return files;
+        return;
     }
     // Only this call uses the stream. NOLINTNEXTLINE(concurrency-mt-unsafe)
     while (const dirent* const entry =
@@ -135,6 +132,36 @@ std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t in
                          status.st_size,
                          *name,
                          isCompressedName(entry->d_name)});
+    }
+}
+
+} // namespace
+
+std::string rotationDirectory(const std::string& logPath, const std::string& rotatedTo) {
+    if (rotatedTo.empty()) {
+        return rotatedTo;
+    }
+    const bool isAbsolute = rotatedTo.front() == '/';
+    return (isAbsolute ? std::string() : logPath.substr(0, logPath.rfind('/') + 1)) + rotatedTo +
+           '/';
+}
+
+std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode,
+                                            const std::string& rotatedTo) {
+    std::vector<GenerationFile> files;
+    const std::size_t slash = logPath.rfind('/');
+    if (slash == std::string::npos) {
+        return files;
+    }
+    const std::string_view log = std::string_view(logPath).substr(slash + 1);
+    addGenerations(logPath.substr(0, slash + 1), log, inode, files);
+    const std::string moved = rotationDirectory(logPath, rotatedTo);
+    struct stat mine;
+    struct stat other;
+    if (!moved.empty() && stat(moved.c_str(), &other) == 0 &&
+        stat(logPath.substr(0, slash + 1).c_str(), &mine) == 0 &&
+        !(FileIdentity{mine.st_dev, mine.st_ino} == FileIdentity{other.st_dev, other.st_ino})) {
+        addGenerations(moved, log, inode, files);
     }
     return files;
 }

@@ -41,9 +41,14 @@ struct GenerationFile {
     bool isCompressed;
 };
 
-/// The regular files beside the log whose names begin with the log's, without the log itself, and
-/// the one with the inode, whatever its name; at most 10,000.
-std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode = 0);
+/// The directory, with a slash at its end, to which rotation moves the log's older files, given
+/// what FollowSettings says of it. Empty if that is empty.
+std::string rotationDirectory(const std::string& logPath, const std::string& rotatedTo);
+
+/// The regular files beside the log, and where rotation moves them, whose names begin with the
+/// log's, without the log itself, and the one with the inode, whatever its name; at most 10,000.
+std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode = 0,
+                                            const std::string& rotatedTo = {});
 
 /// The last generation that was read.
 struct GenerationReference {

@@ -26,6 +26,7 @@ FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t rec
     options.fromBeginning =
         settings.isNewcomer || settings.start == FollowSettings::Start::beginning;
     options.rotateWait = settings.rotateWait;
+    options.rotatedTo = settings.rotatedTo;
     options.recordLength = recordLength;
     return options;
 }

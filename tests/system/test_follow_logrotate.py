@@ -20,6 +20,8 @@ WAYS = {
     "rename, compressed later": "create\ncompress\ndelaycompress",
     "copy and truncate": "copytruncate",
     "copy, truncate and compress": "copytruncate\ncompress",
+    "rename to another directory": "create\nolddir old",
+    "copy to another directory and truncate": "copytruncate\nolddir old",
 }
 
 
@@ -40,7 +42,7 @@ class Rotation:
 def contents(log):
     """The numbers of the lines that are in the log's files."""
     numbers = set()
-    for path in log.parent.glob(log.name + "*"):
+    for path in [*log.parent.glob(log.name + "*"), *log.parent.glob(f"old/{log.name}*")]:
         opener = gzip.open if path.suffix == ".gz" else open
         with opener(path, "rb") as stream:
             numbers.update(int(line.split()[5]) for line in stream.read().splitlines() if line.count(b" ") >= 5)
@@ -56,7 +58,9 @@ def test_every_line_is_raised_once_whatever_logrotate_does(agent, way):
     log.write_text(syslog_line("1 line"))
     agent.sink = None
     agent.agent_keys["log_config"] = None
-    agent.follow(log, start="beginning", rotate_wait="1s")
+    (directory / "old").mkdir(mode=0o755)
+    keys = {"rotated_to": "old"} if "olddir" in WAYS[way] else {}
+    agent.follow(log, start="beginning", rotate_wait="1s", **keys)
     agent.situation("every")
     agent.start(trace="error", wait=False)
     wait_until(lambda: stored(agent)["every", "app.log"], "the first line")

@@ -399,6 +399,25 @@ TEST_F(FileFollowerTest, WithoutTheFileOfThePositionReadsTheYoungerGenerations) 
     EXPECT_EQ(m_ledger.lost().at(0).from, position->offset);
 }
 
+TEST_F(FileFollowerTest, ResumesInTheDirectoryToWhichRotationMovesFiles) {
+    for (const char* const directory : {"old", "."}) {
+        m_options.rotatedTo = directory;
+        fs::create_directory(file("old"));
+        const std::string to = file(directory) + "/app.log";
+        restart();
+        look();
+        append("a\n");
+        EXPECT_EQ(look(), "a\n");
+        append("b\n");
+        fs::rename(m_path, to + ".2");
+        std::ofstream(to + ".1") << "c\n";
+        append("d\n");
+        restart();
+        EXPECT_EQ(looks(4), "b\nc\nd\n") << directory;
+        EXPECT_EQ(m_ledger.losses(), 0);
+    }
+}
+
 TEST_F(FileFollowerTest, APositionWithoutATimeHasNoYoungerGenerations) {
     look();
     append("a\n");

@@ -81,4 +81,10 @@ TEST(YoungerThan, TakesNoFileThatIsNotKnownToBeAGeneration) {
     EXPECT_EQ(names(youngerThan(files, {std::nullopt, 10})), "app.log.1 ");
 }
 
+TEST(RotationDirectory, IsSeenFromTheLogsDirectoryUnlessItIsAbsolute) {
+    EXPECT_EQ(rotationDirectory("/var/log/app.log", ""), "");
+    EXPECT_EQ(rotationDirectory("/var/log/app.log", "old"), "/var/log/old/");
+    EXPECT_EQ(rotationDirectory("/var/log/app.log", "/srv/old"), "/srv/old/");
+}
+
 } // namespace

@@ -51,6 +51,7 @@ follow      = "file"
 resume      = false
 start       = "beginning"
 rotate_wait = "5s"
+rotated_to  = "old"
 debug       = true
 timezone    = "Europe/Berlin"
 
@@ -69,6 +70,7 @@ type = "accounting"
     EXPECT_EQ(log.follow.start, FollowSettings::Start::beginning);
     EXPECT_FALSE(log.follow.resume);
     EXPECT_EQ(log.follow.rotateWait, std::chrono::seconds(5));
+    EXPECT_EQ(log.follow.rotatedTo, "old");
     EXPECT_EQ(log.follow.timezone, "Europe/Berlin");
     EXPECT_GT(log.follow.zone.size(), 50U);
     EXPECT_EQ(logs[1].type, 'A');
@@ -153,6 +155,7 @@ rotate_wait = "2 s"
 timezone = "Nowhere/Town"
 exclude = "sub/x"
 entry = 1
+rotated_to = ""
 )"),
                 ElementsAre("zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
                             "\"text\", \"accounting\" or \"errorlog\"",
@@ -168,7 +171,10 @@ entry = 1
                             "zrm.toml:8: log.exclude: 'sub/x' is neither a path nor a file name; "
                             "begin a path with '/', or write a file name without any '/'",
                             "zrm.toml:9: log.entry: unknown key; the keys here are type, exclude, "
-                            "path, format, debug, follow, start, rotate_wait, resume, timezone"));
+                            "path, format, debug, follow, start, rotate_wait, rotated_to, resume, "
+                            "timezone",
+                            "zrm.toml:10: log.rotated_to: is not a directory; write the directory "
+                            "to which rotation moves older files, for example \"/var/log/old\""));
 }
 
 TEST(LogReader, RefusesKeysThatHaveNoMeaningForAType) {

@@ -156,6 +156,20 @@ TEST_F(EarlierRunTest, ALogWithoutASuccessorIsReadToItsEnd) {
     EXPECT_THAT(names(), ElementsAre(other));
 }
 
+TEST_F(EarlierRunTest, ALogThatRotationHasMovedIsReadToItsEnd) {
+    fs::create_directory(file("old"));
+    const std::string log = create("app.log", 0, "one\n");
+    read(log, log);
+    watched(file("*.log"), 50);
+    watched(file("old/*"), 50);
+    table(file("*.log"));
+    table(file("old/*"));
+    logs[0].follow.rotatedTo = "old";
+    fs::rename(log, file("old/app.log.1"));
+    begin();
+    EXPECT_THAT(names(), ElementsAre(log));
+}
+
 TEST_F(EarlierRunTest, ALogThatIsGoneIsNotFollowed) {
     const std::string log = create("app.log", 0, "one\n");
     const std::string other = create("other.log", 100);
