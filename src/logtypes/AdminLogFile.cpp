@@ -87,6 +87,10 @@ AdminLogFile::AdminLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(lo
     startThread();
 }
 
+AdminLogFile::AdminLogFile(const ValidLog& log, Unmonitored) : LogFile(log, nullptr) {
+    const TraceScope trace(anchor);
+}
+
 AdminLogFile::~AdminLogFile() {
     TraceScope trace(anchor);
     stopThread();

@@ -51,6 +51,11 @@ public:
     /// `toUTF8` is not 0, else the local code page.
     static void formatEntryDesc(char* dest, unsigned long room, const utmp* record, int toUTF8);
 
+protected:
+    /// Creates a log that is not monitored and starts no thread. Used to format records.
+    struct Unmonitored {};
+    AdminLogFile(const ValidLog& log, Unmonitored);
+
 private:
     void openAdminLog();
     void closeAdminLog();

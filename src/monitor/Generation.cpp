@@ -98,6 +98,10 @@ void Generation::showPosition(std::int64_t offset) noexcept {
     }
 }
 
+std::int64_t Generation::compressedBytesRead() const noexcept {
+    return std::max<std::int64_t>(lseek(m_descriptor, 0, SEEK_CUR), 0);
+}
+
 std::ptrdiff_t Generation::readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept {
     return m_isCompressed ? readCompressed(buffer, room, offset)
                           : pread(m_descriptor, buffer, room, static_cast<off_t>(offset));

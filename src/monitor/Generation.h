@@ -68,6 +68,8 @@ public:
     /// Moves the descriptor's own position, which nothing here reads, so that the system's tools
     /// show how far a plain file was read.
     void showPosition(std::int64_t offset) noexcept;
+    /// How many bytes of a compressed file were read so far.
+    std::int64_t compressedBytesRead() const noexcept;
     /// False and errno if it cannot be found out.
     bool status(Status& status) const noexcept;
     const FileIdentity& identity() const noexcept { return m_identity; }

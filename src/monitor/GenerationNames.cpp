@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <memory>
+#include <set>
 #include <tuple>
 
 #include <dirent.h>
@@ -195,6 +196,35 @@ std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files
                   return std::tuple(age(a), !a.isCompressed, std::string_view(a.path)) <
                          std::tuple(age(b), !b.isCompressed, std::string_view(b.path));
               });
+    return generations;
+}
+
+std::vector<GenerationFile> newestFirst(std::vector<GenerationFile> files) {
+    std::erase_if(files, [](const GenerationFile& file) {
+        return file.name.scheme == GenerationName::Scheme::other;
+    });
+    const bool isByName = std::all_of(files.begin(), files.end(), [&](const GenerationFile& file) {
+        return isSameScheme(file.name, files.front().name);
+    });
+    const auto age = [isByName](const GenerationFile& file) {
+        return isByName ? rank(file.name) : file.modified;
+    };
+    std::sort(files.begin(), files.end(), [&](const GenerationFile& a, const GenerationFile& b) {
+        return std::tuple(age(b), a.isCompressed, std::string_view(a.path)) <
+               std::tuple(age(a), b.isCompressed, std::string_view(b.path));
+    });
+    std::set<std::string_view> plain;
+    for (const GenerationFile& file : files) {
+        if (!file.isCompressed) {
+            plain.insert(file.path);
+        }
+    }
+    std::vector<GenerationFile> generations;
+    for (const GenerationFile& file : files) {
+        if (!file.isCompressed || !plain.contains(withoutCompression(file.path))) {
+            generations.push_back(file);
+        }
+    }
     return generations;
 }
 

@@ -62,6 +62,11 @@ struct GenerationReference {
 std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files,
                                         const GenerationReference& reference);
 
+/// The generations among the files, the newest first: by their names if all follow the same scheme,
+/// else by the times of last modification. A compressed file beside a plain one of the same name is
+/// its copy and left out.
+std::vector<GenerationFile> newestFirst(std::vector<GenerationFile> files);
+
 } // namespace zrm
 
 #endif

@@ -87,4 +87,26 @@ TEST(RotationDirectory, IsSeenFromTheLogsDirectoryUnlessItIsAbsolute) {
     EXPECT_EQ(rotationDirectory("/var/log/app.log", "/srv/old"), "/srv/old/");
 }
 
+TEST(NewestFirst, GoesByTheNamesIfTheyAgree) {
+    EXPECT_EQ(names(newestFirst({file("app.log.10.gz", 11, 9), file("app.log.2", 12, 1),
+                                 file("app.log.1", 13, 2), file("app.log.bak", 14, 3)})),
+              "app.log.1 app.log.2 app.log.10.gz ");
+    EXPECT_EQ(
+        names(newestFirst({file("app.log-20261119", 11, 9), file("app.log-20261121.gz", 12, 1)})),
+        "app.log-20261121.gz app.log-20261119 ");
+    EXPECT_EQ(names(newestFirst({})), "");
+}
+
+TEST(NewestFirst, GoesByTimesIfTheyDoNot) {
+    EXPECT_EQ(names(newestFirst({file("app.log.1", 11, 10), file("app.log-20261119", 12, 30),
+                                 file("app.log.old", 13, 20)})),
+              "app.log-20261119 app.log.old app.log.1 ");
+}
+
+TEST(NewestFirst, LeavesOutTheCompressedCopyOfAPlainFile) {
+    EXPECT_EQ(names(newestFirst({file("app.log.1.gz", 11, 10), file("app.log.1", 12, 10),
+                                 file("app.log.2.gz", 13, 9)})),
+              "app.log.1 app.log.2.gz ");
+}
+
 } // namespace

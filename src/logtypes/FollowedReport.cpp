@@ -1,0 +1,280 @@
+#include "logtypes/FollowedReport.h"
+
+#include "base/BrevanTime.h"
+#include "base/ErrorText.h"
+#include "framework/cancellation.h"
+#include "logtypes/EntryReader.h"
+#include "logtypes/ZoneTime.h"
+#include "monitor/BackwardBlock.h"
+#include "monitor/EntryBlock.h"
+#include "monitor/GenerationNames.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <ctime>
+#include <deque>
+#include <string_view>
+#include <utility>
+
+#include <sys/stat.h>
+
+namespace zrm {
+
+namespace {
+
+constexpr std::size_t stampLength = EntryReader::stampLength;
+/// Entries may be out of order by as much: those of several writers, and those of the hour that
+/// daylight saving time repeats.
+constexpr std::int64_t disorder = 3600;
+/// So many entries in a row must be further away before the rest of a file counts as further away
+/// still. A clock that was wrong for some entries does not end a report.
+constexpr unsigned farEntries = 10'000;
+constexpr std::size_t rowsPerProgress = 256;
+constexpr const char* noFile = "there is no such file";
+
+/// The time stamp so many seconds later. A stamp that is not a time stays.
+std::string later(const std::string& stamp, std::int64_t seconds) {
+    const CivilTime time = ZoneTime::ofStamp(stamp.c_str());
+    std::string result = stamp;
+    if (time.isValid()) {
+        ZoneTime::writeStamp(time.seconds() + seconds, result.data());
+    }
+    return result;
+}
+
+std::string_view timeOf(const zrm_rmlogent_data_t& row) noexcept {
+    return {row.entrytime, stampLength};
+}
+
+std::string presentTime() {
+    std::string stamp(stampLength, ' ');
+    BrevanTime::generateTimestamp(std::time(nullptr), stamp.data());
+    return stamp;
+}
+
+std::string openProblem(const std::string& path, int error) {
+    struct stat status;
+    if (error == ENOENT) {
+        return stat(path.c_str(), &status) != 0 ? noFile
+               : S_ISREG(status.st_mode)        ? "its compression cannot be read"
+                                                : "it is not a regular file";
+    }
+    return std::string("it cannot be opened: ") + ErrorText(error).text();
+}
+
+std::string readProblem(const Generation& generation, std::int64_t offset, int error) {
+    const std::string place = std::to_string(offset);
+    return generation.isCompressed()
+               ? "it is damaged: only the first " + place + " bytes of its contents can be read"
+               : "reading it failed before byte " + place + ": " + ErrorText(error).text();
+}
+
+} // namespace
+
+FollowedReport::FollowedReport(std::string path, EntryReader& entries, Options options)
+    : m_path(std::move(path)), m_entries(entries), m_options(std::move(options)),
+      m_longBefore(later(m_options.from, -disorder)), m_longAfter(later(m_options.to, disorder)),
+      m_newest(presentTime()) {}
+
+void FollowedReport::run(Receiver& receiver) {
+    findFiles();
+    for (File& file : m_files) {
+        if (isEnded() || !readFile(file, receiver)) {
+            break;
+        }
+        receiver.progress(m_done, m_total);
+    }
+}
+
+bool FollowedReport::isEnded() {
+    m_isCancelled = m_isCancelled || CTX1_IsCancelled();
+    return m_isCancelled || isLimited();
+}
+
+/// The present file is opened first: if it is renamed now, it is recognised among the others.
+void FollowedReport::findFiles() {
+    m_present = Generation::open(m_path);
+    const int error = errno;
+    std::string problem = m_present ? "" : openProblem(m_path, error);
+    std::vector<GenerationFile> generations = newestFirst(findGenerations(m_path));
+    // A log may be without a file after a rotation, until its next line is written.
+    if (m_present || problem != noFile || generations.empty()) {
+        Generation::Status status{};
+        const std::int64_t size = m_present && m_present->status(status) ? status.size : 0;
+        m_files.push_back({m_path, size, std::nullopt, false, std::move(problem)});
+    }
+    for (GenerationFile& generation : generations) {
+        if (!m_present || generation.identity != m_present->identity()) {
+            m_files.push_back(
+                {std::move(generation.path), generation.size, generation.identity, false, ""});
+        }
+    }
+    for (const File& file : m_files) {
+        m_total += file.size;
+    }
+}
+
+/// False if the files after this one are older than the report's window.
+bool FollowedReport::readFile(File& file, Receiver& receiver) {
+    const std::unique_ptr<Generation> generation = open(file);
+    std::string first;
+    if (generation) {
+        first = firstTime(*generation);
+        if (first.empty() || first <= m_longAfter) {
+            file.isRead = true;
+            generation->isCompressed() ? readForward(*generation, file, receiver)
+                                       : readBackward(*generation, file, receiver);
+        }
+        m_newest = first.empty() ? m_newest : std::min(m_newest, first);
+    }
+    m_done += file.size;
+    return first.empty() || first >= m_longBefore;
+}
+
+/// Null, with the file's problem, if it cannot be opened or has become another one.
+std::unique_ptr<Generation> FollowedReport::open(File& file) {
+    if (!file.identity) {
+        return std::move(m_present);
+    }
+    std::unique_ptr<Generation> generation = Generation::open(file.path);
+    const int error = errno;
+    if (!generation) {
+        file.problem = openProblem(file.path, error);
+    } else if (generation->identity() != *file.identity) {
+        file.problem = "it was replaced while the report was being read";
+        generation.reset();
+    }
+    return generation;
+}
+
+/// The time of the first entry in the first block; empty if there is none.
+std::string FollowedReport::firstTime(Generation& generation) {
+    EntryBlock block(m_entries.recordLength());
+    block.start(0, {});
+    const EntryBlock::Fill filled = block.fill(generation);
+    char* entry = filled == EntryBlock::Fill::more ? block.next() : nullptr;
+    for (; entry != nullptr; entry = block.next()) {
+        if (m_entries.read(entry, m_newest.data(), m_row)) {
+            return std::string(timeOf(m_row));
+        }
+    }
+    return {};
+}
+
+/// Reads an entry into the row and compares its time with the report's window.
+FollowedReport::Place FollowedReport::place(char* entry, const std::string& newest) {
+    if (!m_entries.read(entry, newest.data(), m_row)) {
+        ++m_skipped;
+        return Place::unfit;
+    }
+    const std::string_view time = timeOf(m_row);
+    if (time > m_options.to) {
+        return time > m_longAfter ? Place::farTooNew : Place::tooNew;
+    }
+    if (time < m_options.from) {
+        return time < m_longBefore ? Place::farTooOld : Place::tooOld;
+    }
+    if (m_reached.empty() || time < m_reached) {
+        m_reached = time;
+    }
+    return Place::within;
+}
+
+/// Counts the entries in a row that are far from the window. True once there are enough.
+bool FollowedReport::isFar(Place where, Place farPlace, unsigned& far) noexcept {
+    if (where != Place::unfit) {
+        far = where == farPlace ? far + 1 : 0;
+    }
+    return far >= farEntries;
+}
+
+void FollowedReport::give(const zrm_rmlogent_data_t& row, Receiver& receiver) {
+    ++m_given;
+    receiver.give(row);
+    if (m_given % rowsPerProgress == 0) {
+        receiver.progress(m_done, m_total);
+    }
+}
+
+void FollowedReport::readBackward(Generation& generation, File& file, Receiver& receiver) {
+    BackwardBlock block(m_entries.recordLength());
+    block.start(file.size);
+    std::string newest = m_newest;
+    unsigned far = 0;
+    for (BackwardBlock::Fill filled = block.fill(generation); filled != BackwardBlock::Fill::end;
+         filled = block.fill(generation)) {
+        if (filled == BackwardBlock::Fill::changed) {
+            file.problem = "it was truncated while the report was being read";
+            return;
+        }
+        if (filled == BackwardBlock::Fill::failed) {
+            file.problem = readProblem(generation, block.offset(), errno);
+            return;
+        }
+        while (char* const entry = block.next()) {
+            const Place where = place(entry, newest);
+            if (isFar(where, Place::farTooOld, far)) {
+                return;
+            }
+            if (where != Place::unfit && timeOf(m_row) < newest) {
+                newest = timeOf(m_row);
+            }
+            if (where == Place::within && receiver.meets(m_row)) {
+                give(m_row, receiver);
+                if (isLimited()) {
+                    return;
+                }
+            }
+        }
+        receiver.progress(m_done + file.size - block.offset(), m_total);
+        if (isEnded()) {
+            return;
+        }
+    }
+}
+
+/// Keeps the newest rows, as many as may still be given, and gives them at the end.
+void FollowedReport::readForward(Generation& generation, File& file, Receiver& receiver) {
+    EntryBlock block(m_entries.recordLength());
+    block.start(0, {});
+    const std::size_t mostRows = m_options.limit - m_given;
+    std::deque<zrm_rmlogent_data_t> kept;
+    bool isPast = false;
+    unsigned far = 0;
+    const auto look = [&](char* entry) {
+        const Place where = place(entry, m_newest);
+        isPast = isFar(where, Place::farTooNew, far);
+        if (where == Place::within && receiver.meets(m_row)) {
+            kept.push_back(m_row);
+            if (kept.size() > mostRows) {
+                kept.pop_front();
+            }
+        }
+    };
+    for (EntryBlock::Fill filled = EntryBlock::Fill::more; !isPast;) {
+        filled = block.fill(generation);
+        if (filled == EntryBlock::Fill::end) {
+            if (char* const entry = block.rest()) {
+                look(entry);
+            }
+            break;
+        }
+        if (filled != EntryBlock::Fill::more) {
+            file.problem = readProblem(generation, block.readTo(), errno);
+            break;
+        }
+        char* entry = nullptr;
+        while (!isPast && (entry = block.next()) != nullptr) {
+            look(entry);
+        }
+        receiver.progress(m_done + std::min(generation.compressedBytesRead(), file.size), m_total);
+        if (isEnded()) {
+            return;
+        }
+    }
+    for (auto row = kept.rbegin(); row != kept.rend() && !m_isCancelled; ++row) {
+        give(*row, receiver);
+    }
+}
+
+} // namespace zrm

@@ -1,0 +1,102 @@
+#ifndef ZRM_FOLLOWED_REPORT_H
+#define ZRM_FOLLOWED_REPORT_H
+
+#include "logs/zrm_rmlogent_data.h"
+#include "monitor/FileIdentity.h"
+#include "monitor/Generation.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace zrm {
+
+class EntryReader;
+
+/// Reads a followed log for a report: the file that has its name and its older generations, the
+/// newest entry first. A line that does not fit, or a file that cannot be read, does not end it. A
+/// generation of which only the beginning shows that it has nothing between the two times is not
+/// read any further, and none that is older than the first time is opened. Compressed generations
+/// are read once, from their beginning on, and only the rows that may be given are kept. Memory is
+/// bounded whatever the files have. One thread; ends when its request does (CTX1_IsCancelled).
+class FollowedReport {
+public:
+    /// What the report asks of its caller and gives to it.
+    class Receiver {
+    public:
+        virtual ~Receiver() = default;
+        /// Whether a row between the two times meets the conditions of the report.
+        virtual bool meets(zrm_rmlogent_data_t& row) = 0;
+        /// The next row; rows come newest first.
+        virtual void give(const zrm_rmlogent_data_t& row) = 0;
+        /// Called after each block: how many of all bytes of the files were read or passed over.
+        virtual void progress(std::int64_t read, std::int64_t total) = 0;
+    };
+
+    struct Options {
+        std::string from; ///< time stamp of 16 characters, as `to`
+        std::string to;
+        std::size_t limit = 1; ///< rows, at least 1
+    };
+
+    struct File {
+        std::string path;
+        std::int64_t size = 0;                ///< bytes
+        std::optional<FileIdentity> identity; ///< of an older generation
+        bool isRead = false;                  ///< false: it has nothing between the two times
+        std::string problem;                  ///< why not all of it was read, as a clause
+    };
+
+    /// `path` is in the local code page. `entries` outlives the object.
+    FollowedReport(std::string path, EntryReader& entries, Options options);
+
+    void run(Receiver& receiver);
+
+    /// The files that were there when the report began, the newest first.
+    const std::vector<File>& files() const noexcept { return m_files; }
+    /// Lines that are not entries, in what was read.
+    std::uint64_t skipped() const noexcept { return m_skipped; }
+    /// True if the limit ended the report; there may be more rows.
+    bool isLimited() const noexcept { return m_given == m_options.limit; }
+    bool isCancelled() const noexcept { return m_isCancelled; }
+    /// ENTRYTIME of the oldest entry between the two times, or empty if there was none.
+    const std::string& reached() const noexcept { return m_reached; }
+
+private:
+    enum class Place : unsigned char { unfit, tooNew, within, tooOld, farTooOld, farTooNew };
+
+    void findFiles();
+    bool readFile(File& file, Receiver& receiver);
+    std::unique_ptr<Generation> open(File& file);
+    std::string firstTime(Generation& generation);
+    void readBackward(Generation& generation, File& file, Receiver& receiver);
+    void readForward(Generation& generation, File& file, Receiver& receiver);
+    bool isEnded();
+    Place place(char* entry, const std::string& newest);
+    static bool isFar(Place where, Place farPlace, unsigned& far) noexcept;
+    void give(const zrm_rmlogent_data_t& row, Receiver& receiver);
+
+    const std::string m_path;
+    EntryReader& m_entries;
+    const Options m_options;
+    const std::string m_longBefore; ///< older entries end the reading of a file
+    const std::string m_longAfter;
+
+    std::vector<File> m_files;
+    std::unique_ptr<Generation> m_present; ///< opened before the older generations are looked for
+    std::string m_newest;                  ///< no entry that is still to be read is much newer
+    std::int64_t m_done = 0;
+    std::int64_t m_total = 0;
+    std::size_t m_given = 0;
+    std::uint64_t m_skipped = 0;
+    bool m_isCancelled = false;
+    std::string m_reached;
+    zrm_rmlogent_data_t m_row{};
+};
+
+} // namespace zrm
+
+#endif
