@@ -1,18 +1,21 @@
 #include "host/api/ReportResource.h"
 
-#include "base/ProcessValues.h"
 #include "base/TraceScope.h"
-#include "host/base/JsonWriter.h"
+#include "host/api/ReportStream.h"
 #include "host/base/TimeText.h"
-#include "host/config/Columns.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/config/ConditionParser.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
 
+#include <condition_variable>
+#include <mutex>
 #include <optional>
+#include <set>
 #include <string>
+#include <system_error>
+#include <thread>
 #include <utility>
 
 namespace zrm::host {
@@ -22,6 +25,7 @@ namespace {
 TRC1_Anchor anchor{"ReportResource.cpp"};
 
 constexpr std::size_t mostConditions = 100;
+constexpr const char* lines = "application/x-ndjson";
 
 /// The default end of a report: the last time that a stamp can express.
 constexpr const char* endOfTime = "1991231235959999";
@@ -65,6 +69,8 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     report.from = readTime(fields, "from", fields.text("from"));
     report.to = readTime(fields, "to", fields.optionalText("to"));
     const std::vector<std::string> where = fields.texts("where", mostConditions);
+    report.limit = static_cast<std::size_t>(fields.optionalNumber("limit", 1, mostRows)
+                                                .value_or(static_cast<std::int64_t>(report.limit)));
     fields.refuseUnknown();
     if (report.from > report.to) {
         fields.refuse("to", "is before from");
@@ -77,9 +83,90 @@ ReportRequest ReportRequest::parse(std::string_view body) {
         if (!condition) {
             fields.refuse("where[" + std::to_string(index) + "]", condition.error());
         }
+        report.where.push_back(*condition);
         report.conditions.push_back(std::move(*condition));
     }
     return report;
+}
+
+/// The reports that are being read.
+class ReportResource::Running {
+public:
+    /// Reads a report on a thread of its own. Throws RequestRefused.
+    static void start(const std::shared_ptr<Running>& running,
+                      const std::shared_ptr<ReportStream>& stream);
+    void cancel();
+    void waitForEnd(std::chrono::steady_clock::time_point limit);
+
+private:
+    bool add(const std::shared_ptr<ReportStream>& stream);
+    void remove(const std::shared_ptr<ReportStream>& stream);
+
+    std::mutex m_mutex; ///< guards the members below
+    std::condition_variable m_ended;
+    std::set<std::shared_ptr<ReportStream>> m_streams;
+    bool m_isEnding = false;
+};
+
+bool ReportResource::Running::add(const std::shared_ptr<ReportStream>& stream) {
+    const std::lock_guard guard(m_mutex);
+    if (!m_isEnding) {
+        m_streams.insert(stream);
+    }
+    return !m_isEnding;
+}
+
+void ReportResource::Running::remove(const std::shared_ptr<ReportStream>& stream) {
+    {
+        const std::lock_guard guard(m_mutex);
+        m_streams.erase(stream);
+    }
+    m_ended.notify_all();
+}
+
+/// The thread is left behind where a file system does not let it go.
+void ReportResource::Running::start(const std::shared_ptr<Running>& running,
+                                    const std::shared_ptr<ReportStream>& stream) {
+    if (!running->add(stream)) {
+        throw RequestRefused(503, "the agent is stopping", "");
+    }
+    try {
+        std::thread([running, stream]() mutable {
+            stream->run();
+            running->remove(stream);
+        }).detach();
+    } catch (const std::system_error&) {
+        running->remove(stream);
+        throw RequestRefused(503, "the agent has no thread for the report: try again", "");
+    }
+}
+
+void ReportResource::Running::cancel() {
+    const std::lock_guard guard(m_mutex);
+    m_isEnding = true;
+    for (const std::shared_ptr<ReportStream>& stream : m_streams) {
+        stream->cancel();
+    }
+}
+
+void ReportResource::Running::waitForEnd(std::chrono::steady_clock::time_point limit) {
+    std::unique_lock lock(m_mutex);
+    m_ended.wait_until(lock, limit, [this] { return m_streams.empty(); });
+}
+
+ReportResource::ReportResource(TableManager& entries)
+    : m_entries(entries), m_running(std::make_shared<Running>()) {}
+
+ReportResource::~ReportResource() {
+    cancel();
+}
+
+void ReportResource::cancel() {
+    m_running->cancel();
+}
+
+void ReportResource::waitForEnd(std::chrono::steady_clock::time_point limit) {
+    m_running->waitForEnd(limit);
 }
 
 void ReportResource::addRoutes(Router& router) {
@@ -89,23 +176,29 @@ void ReportResource::addRoutes(Router& router) {
 
 HttpAnswer ReportResource::report(const HttpRequest& request) {
     TraceScope trace(anchor);
-    const ReportRequest wanted = ReportRequest::parse(request.body);
-    // Checked first: the agent treats a report on an unknown log as an internal error.
-    if (!m_source.isMonitored(wanted.conditions)) {
+    ReportRequest wanted = ReportRequest::parse(request.body);
+    std::unique_ptr<LogReport> report = LogReport::open(wanted, m_entries);
+    if (report == nullptr) {
         throw RequestRefused(404, "the agent does not monitor this log", "log");
     }
-    const SampleSource::Rows rows = m_source.take("RMLOGENT", wanted.conditions);
-    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
-        json.beginObject().member("log", wanted.log);
-        json.member("from", wanted.from).member("to", wanted.to);
-        json.key("columns").beginArray();
-        for (const Column& column : columnsOf("RMLOGENT")) {
-            json.value(column.name);
-        }
-        json.endArray();
-        rows.write(json);
-        json.member("max_rows", gMaxRows).endObject();
-    }));
+    if (!report->isOpen()) {
+        throw RequestRefused(503, "the agent cannot take any more requests", "");
+    }
+    const bool isLines = request.accept.find(lines) != std::string::npos;
+    const auto stream = std::make_shared<ReportStream>(std::move(wanted), std::move(report),
+                                                       isLines ? ReportStream::Form::lines
+                                                               : ReportStream::Form::document);
+    Running::start(m_running, stream);
+    // The last copy is gone with the connection, or where the answer never reaches one.
+    const std::shared_ptr<ReportStream> client(stream.get(),
+                                               [stream](ReportStream*) { stream->cancel(); });
+    HttpAnswer answer;
+    answer.contentType = isLines ? lines : answer.contentType;
+    answer.stream.begin = [client](std::shared_ptr<BodyChannel> channel) {
+        client->attach(std::move(channel));
+    };
+    answer.stream.changed = [client] { client->wake(); };
+    return answer;
 }
 
 } // namespace zrm::host

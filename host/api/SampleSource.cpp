@@ -2,9 +2,9 @@
 
 #include "base/ProcessValues.h"
 #include "base/TraceScope.h"
+#include "host/api/ReportRoom.h"
 #include "host/events/RowJson.h"
 #include "host/framework/Sample.h"
-#include "host/http/RequestRefused.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>
@@ -12,7 +12,6 @@
 #include <cstdint>
 #include <iterator>
 #include <optional>
-#include <semaphore>
 #include <utility>
 
 namespace zrm::host {
@@ -37,29 +36,6 @@ void SampleSource::Rows::write(JsonWriter& json) const {
 
 namespace {
 
-constexpr int mostReports = 4; ///< concurrent reports: each may keep a disk and a processor busy
-std::counting_semaphore<mostReports> reportRoom{mostReports};
-
-/// One running report while it exists.
-class Room {
-public:
-    explicit Room(bool isReport) : m_isReport(isReport) {
-        if (isReport && !reportRoom.try_acquire()) {
-            throw RequestRefused(503, "four reports are already running: try again", "");
-        }
-    }
-    ~Room() {
-        if (m_isReport) {
-            reportRoom.release();
-        }
-    }
-    Room(const Room&) = delete;
-    Room& operator=(const Room&) = delete;
-
-private:
-    const bool m_isReport;
-};
-
 std::string rowsOf(const Sample& sample) {
     const RowJson format(sample.layout());
     return JsonWriter::text([&](JsonWriter& json) {
@@ -76,7 +52,10 @@ std::string rowsOf(const Sample& sample) {
 SampleSource::Rows TableSampler::take(std::string_view table,
                                       const std::vector<Condition>& conditions) {
     TraceScope trace(anchor);
-    const Room room(table == "RMLOGENT");
+    std::optional<ReportRoom> room;
+    if (table == "RMLOGENT") {
+        room.emplace();
+    }
     const ReportOutcome outcome;
     const std::optional<Sample> sample = Sample::take(table, conditions, "HTTP");
     Rows rows;

@@ -29,6 +29,7 @@ constexpr HttpLimits answerLimits{.connect = 5s, .head = 120s, .whole = 900s, .s
 constexpr HttpLimits streamLimits{.connect = 5s, .head = 45s, .whole = 0s, .silence = 45s};
 
 constexpr std::size_t longestAnswer = 256 * 1024 * 1024; ///< bytes
+constexpr std::size_t longestLine = 1024 * 1024;         ///< bytes
 constexpr std::size_t longestProblem = 64 * 1024;        ///< bytes
 
 bool isSuccess(int status) {
@@ -78,6 +79,8 @@ public:
     void stop() { m_stop.request_stop(); }
 
     Json ask(HttpClientRequest request);
+    void lines(HttpClientRequest request, const std::string& last,
+               const std::function<void(Json&&)>& receiver);
     void stream(HttpClientRequest request, const std::function<void(std::string_view)>& receiver);
 
 private:
@@ -132,6 +135,39 @@ Json AgentClient::Implementation::ask(HttpClientRequest request) {
         throw foreign("its answer is not a JSON object");
     }
     return document;
+}
+
+void AgentClient::Implementation::lines(HttpClientRequest request, const std::string& last,
+                                        const std::function<void(Json&&)>& receiver) {
+    std::string text; // of a problem, or the line that is not complete
+    bool isOver = false;
+    request.limits = answerLimits;
+    request.headers.emplace_back("Accept: application/x-ndjson");
+    request.receive = [&](int status, std::string_view piece) {
+        if (text.size() + piece.size() > longestLine) {
+            throw foreign("its answer does not end");
+        }
+        text += piece;
+        for (std::size_t end = 0;
+             isSuccess(status) && (end = text.find('\n')) != std::string::npos;) {
+            Json line = JsonText::parse(std::string_view(text).substr(0, end));
+            if (!line.is_object()) {
+                throw foreign("its answer is not JSON objects");
+            }
+            text.erase(0, end + 1);
+            isOver = line.contains(last);
+            receiver(std::move(line));
+        }
+        return true;
+    };
+    const HttpClientAnswer answer = send(request);
+    if (answer.status != 0 && !isSuccess(answer.status)) {
+        throw refused(answer.status, text);
+    }
+    if (answer.outcome != Outcome::whole || !isOver) {
+        throw CliError(CliStatus::UNREACHABLE, "the connection to the agent at " + m_access.url +
+                                                   " ended before the answer did");
+    }
 }
 
 void AgentClient::Implementation::stream(HttpClientRequest request,
@@ -209,20 +245,35 @@ Json AgentClient::get(const std::string& path, const Query& query) {
     return m_implementation->ask({.method = "GET", .target = withQuery(path, query)});
 }
 
-Json AgentClient::send(const std::string& method, const std::string& path, const Json& body) {
-    std::string text;
-    if (!body.is_null()) {
-        try {
-            text = body.dump();
-        } catch (const Json::type_error&) {
-            throw CliError(CliStatus::USAGE,
-                           "the command line, or the file that it names, is not valid "
-                           "UTF-8, which the agent's API requires");
-        }
+namespace {
+
+/// Empty for a null value.
+std::string textOf(const Json& body) {
+    if (body.is_null()) {
+        return "";
     }
+    try {
+        return body.dump();
+    } catch (const Json::type_error&) {
+        throw CliError(CliStatus::USAGE,
+                       "the command line, or the file that it names, is not valid "
+                       "UTF-8, which the agent's API requires");
+    }
+}
+
+} // namespace
+
+Json AgentClient::send(const std::string& method, const std::string& path, const Json& body) {
+    const std::string text = textOf(body);
     const bool hasBody = method != "DELETE" || !text.empty();
     return m_implementation->ask(
         {.method = method, .target = path, .body = hasBody ? &text : nullptr});
+}
+
+void AgentClient::lines(const std::string& path, const Json& body, const std::string& last,
+                        const std::function<void(Json&&)>& receiver) {
+    const std::string text = textOf(body);
+    m_implementation->lines({.method = "POST", .target = path, .body = &text}, last, receiver);
 }
 
 void AgentClient::stream(const std::string& path, const Query& query,

@@ -29,6 +29,11 @@ public:
     /// Sends a body (null: none) with a method; null when the answer has none.
     Json send(const std::string& method, const std::string& path, const Json& body);
 
+    /// Sends a body and passes on the answer, an object on each line, as it arrives. Throws also
+    /// when the answer ends before its last object, which has the member `last`.
+    void lines(const std::string& path, const Json& body, const std::string& last,
+               const std::function<void(Json&&)>& receiver);
+
     /// Reads an endless answer and passes its pieces on. Returns when it is interrupted or after
     /// stop; throws CliError when it does not begin.
     void stream(const std::string& path, const Query& query,

@@ -96,6 +96,8 @@ public:
     CliStatus run(Context& context) override;
 
 private:
+    class Receiver;
+
     CLI::App* m_command;
     std::string m_log;
     std::string m_from = "-24h";
@@ -103,6 +105,7 @@ private:
     std::vector<std::string> m_where;
     std::vector<std::string> m_columns;
     std::string m_format = "table";
+    std::size_t m_limit = 1000;
 };
 
 /// `zrmctl situations [list|show|add|set|remove|start|stop|validate]`.

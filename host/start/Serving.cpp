@@ -23,6 +23,7 @@
 #include "host/metrics/MetricsResource.h"
 #include "host/start/Watchdog.h"
 
+#include <algorithm>
 #include <cinttypes>
 #include <string>
 #include <system_error>
@@ -36,6 +37,8 @@ TRC1_Anchor anchor{"Serving.cpp"};
 
 /// Time for opening the situations at startup; nothing else waits for it longer.
 constexpr std::chrono::seconds openingLimit{30};
+/// Time for reports to end. One that reads a hanging file system is left behind.
+constexpr std::chrono::milliseconds reportLimit{800};
 /// Time for the logs' threads to count what they skip.
 constexpr std::chrono::milliseconds countingLimit{800};
 
@@ -132,7 +135,9 @@ void Serving::addResources(TableManager& entries) {
     addResource(std::make_unique<LogsResource>(m_watch));
     addResource(std::make_unique<SampleResource>(m_sampler));
     addResource(std::make_unique<DiagnoseResource>());
-    addResource(std::make_unique<ReportResource>(m_sampler));
+    auto reports = std::make_unique<ReportResource>(entries);
+    m_reports = reports.get();
+    addResource(std::move(reports));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
     auto analysis =
@@ -188,7 +193,9 @@ void Serving::startHttp(const HostConfig& config) {
 
 void Serving::abandonHttp(Clock::time_point limit) {
     m_analysis->cancel();
+    m_reports->cancel();
     m_http.abandon(limit);
+    m_reports->waitForEnd(limit);
 }
 
 void Serving::stop(Clock::time_point limit) {
@@ -198,7 +205,9 @@ void Serving::stop(Clock::time_point limit) {
     PulseRegistry::waitUntilAllRest(Clock::now() + countingLimit);
     m_watchdog.noteStage("ending HTTP");
     m_analysis->cancel();
+    m_reports->cancel();
     m_http.stop(limit);
+    m_reports->waitForEnd(std::min(limit, Clock::now() + reportLimit));
     m_watchdog.noteStage("closing the situations");
     m_delivery.closePositions();
     m_situations.close();

@@ -25,6 +25,7 @@ namespace zrm::host {
 
 class AnalysisResource;
 class EventStream;
+class ReportResource;
 class Watchdog;
 
 /// Everything that lives while the host serves: the delivery of events, the situations, HTTP.
@@ -89,6 +90,7 @@ private:
     Router m_router;
     std::vector<std::unique_ptr<Resource>> m_resources; ///< what answers over HTTP
     AnalysisResource* m_analysis = nullptr;             ///< one of these
+    ReportResource* m_reports = nullptr;                ///< one of these
     std::optional<Credentials> m_credentials;           ///< none: HTTP is off
     HttpServer m_http;
 };

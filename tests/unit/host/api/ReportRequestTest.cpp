@@ -39,12 +39,24 @@ TEST(ReportRequest, ReadsLogWindowAndConditions) {
     EXPECT_EQ(report.conditions[3].text, report.to);
     EXPECT_EQ(report.conditions[4].op, INTF_STARTS);
     EXPECT_EQ(report.conditions[5].number, 5);
+    ASSERT_EQ(report.where.size(), 2u);
+    EXPECT_EQ(report.where[1].number, 5);
+    EXPECT_EQ(report.limit, 1000u);
 }
 
 TEST(ReportRequest, WithoutAnEndGoesUpToTheNewestEntry) {
     const ReportRequest report = ReportRequest::parse(R"({"log":"/a","from":"2026-11-20"})");
     EXPECT_EQ(report.to, "1991231235959999");
     EXPECT_EQ(report.conditions.size(), 4u);
+}
+
+TEST(ReportRequest, ReadsTheLimit) {
+    const auto limit = [](const std::string& number) {
+        return ReportRequest::parse(R"({"log":"/a","from":"2026-11-20","limit":)" + number + '}')
+            .limit;
+    };
+    EXPECT_EQ(limit("1"), 1u);
+    EXPECT_EQ(limit("10000"), 10'000u);
 }
 
 TEST(ReportRequest, ReportsTheWrongField) {
@@ -64,7 +76,8 @@ TEST(ReportRequest, ReportsTheWrongField) {
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","where":"ENTRYSRC = 'a'"})"),
               "where: write a list of at most 100 texts");
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","conditions":[]})"),
-              "conditions: unknown member; the members are log, from, to, where");
+              "conditions: unknown member; the members are log, from, to, where, limit");
+    EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","limit":10001})").substr(0, 7), "limit: ");
 }
 
 } // namespace

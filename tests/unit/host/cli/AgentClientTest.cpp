@@ -165,3 +165,49 @@ TEST_F(AgentClientTest, AStreamThatBeginsAfterStopEnds) {
     client.stream("/stream", {}, [&](std::string_view) { ++pieces; });
     EXPECT_EQ(pieces, 0);
 }
+
+namespace {
+
+/// The sum of the numbers in the lines of an answer in chunks; an error's text ends it.
+std::string linesOf(const std::string& body) {
+    const ScriptedServer server([&](const ScriptedServer::Request&) {
+        return ScriptedServer::Reply{"HTTP/1.1 200 OK\r\nConnection: close\r\n\r\n" + body,
+                                     ScriptedServer::Reply::CLOSE};
+    });
+    AgentClient client({server.url(), "the-token", "its file"});
+    std::string result;
+    try {
+        client.lines("/x", {{"a", 1}}, "end",
+                     [&](AgentClient::Json&& line) { result += line.dump() + ' '; });
+    } catch (const CliError& error) {
+        const std::string text = error.what();
+        EXPECT_EQ(error.status(), CliStatus::UNREACHABLE);
+        return result + text.substr(text.find(server.url()) + server.url().size());
+    }
+    return result;
+}
+
+} // namespace
+
+TEST_F(AgentClientTest, PassesOnTheLinesOfAnAnswer) {
+    EXPECT_EQ(linesOf("{\"row\":1}\n{\"end\":2}\n"), R"({"row":1} {"end":2} )");
+}
+
+TEST_F(AgentClientTest, AnAnswerInLinesWithoutItsEndIsReported) {
+    EXPECT_EQ(linesOf("{\"row\":1}\n{\"end\":"), R"({"row":1}  ended before the answer did)");
+    EXPECT_EQ(linesOf("7\n"), " is not a zrmagent: its answer is not JSON objects");
+    EXPECT_EQ(linesOf(std::string(1'100'000, 'x')), " is not a zrmagent: its answer does not end");
+}
+
+TEST_F(AgentClientTest, AProblemInPlaceOfLinesIsReported) {
+    agent.routes().add("POST", "/x", [](const HttpRequest&) {
+        return HttpAnswer{404, "application/problem+json", R"({"detail":"no such log"})"};
+    });
+    agent.begin();
+    AgentClient client(agent.connection());
+    expectError(
+        [&] {
+            client.lines("/x", {{"a", 1}}, "end", [](AgentClient::Json&&) {});
+        },
+        CliStatus::REFUSED, "no such log");
+}

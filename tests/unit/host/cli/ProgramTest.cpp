@@ -103,7 +103,9 @@ TEST_F(ProgramTest, AnUnexpectedAnswerCrashesNoCommand) {
         R"({"columns":1,"rows":{"a":1},"logs":5,"events":{"a":{"id":-1}},"situations":"x",)"
         R"("newest":"q","explanations":7,"raised_at":3,"truncated":[]})",
         R"({"rows":[1,2],"columns":[1],"events":[1],"logs":[[]],"situations":[null],)"
-        R"("explanations":[[]],"raised_at":[1]})"};
+        R"("explanations":[[]],"raised_at":[1]})",
+        "{\"begin\":1}\n{\"row\":1}\n{\"progress\":1}\n{\"end\":1}\n",
+        "{\"row\":[]}\n{\"end\":{\"files\":{\"a\":1},\"skipped\":\"x\",\"truncated\":{}}}\n"};
     for (const std::string& body : bodies) {
         answerWith(body);
         for (const std::vector<std::string>& command : commands) {
@@ -114,14 +116,15 @@ TEST_F(ProgramTest, AnUnexpectedAnswerCrashesNoCommand) {
                 << errors;
         }
     }
-    answerWith(R"({"columns":1,"rows":[{}]})");
+    answerWith("{\"begin\":{\"columns\":1}}\n{\"end\":{}}\n");
     EXPECT_EQ(run({"report", "/x", "--format", "csv"}), CliStatus::UNREACHABLE);
     EXPECT_EQ(errors, "zrmctl: what answers is not a zrmagent of this version: its answer has a "
                       "different form\n");
 }
 
 TEST_F(ProgramTest, AnUnknownColumnOfAReportIsRefused) {
-    answerWith(R"({"columns":["ENTRYTIME","ENTRYDESC"],"rows":[{"ENTRYDESC":"a, b"}]})");
+    answerWith("{\"begin\":{\"columns\":[\"ENTRYTIME\",\"ENTRYDESC\"]}}\n"
+               "{\"row\":{\"ENTRYDESC\":\"a, b\"}}\n{\"end\":{\"count\":1}}\n");
     EXPECT_EQ(run({"report", "/x", "--columns", "ENTRYDESC,BOGUS"}), CliStatus::USAGE);
     EXPECT_EQ(output, "");
     EXPECT_EQ(errors, "zrmctl: --columns: 'BOGUS' is not a column; the columns are ENTRYTIME, "
@@ -129,7 +132,8 @@ TEST_F(ProgramTest, AnUnknownColumnOfAReportIsRefused) {
     EXPECT_EQ(run({"report", "/x", "--format", "csv", "--columns", "entrydesc"}), CliStatus::DONE);
     EXPECT_EQ(output, "ENTRYDESC\r\n\"a, b\"\r\n");
     EXPECT_EQ(run({"report", "/x", "--json", "--columns", "ENTRYDESC"}), CliStatus::DONE);
-    EXPECT_EQ(output, "{\"columns\":[\"ENTRYDESC\"],\"rows\":[{\"ENTRYDESC\":\"a, b\"}]}\n");
+    EXPECT_EQ(output,
+              "{\"columns\":[\"ENTRYDESC\"],\"rows\":[{\"ENTRYDESC\":\"a, b\"}],\"count\":1}\n");
 }
 
 TEST_F(ProgramTest, ReadsTheNumberOfAnEvent) {

@@ -1,0 +1,129 @@
+#include "host/analysis/LogReport.h"
+
+#include "base/ProcessValues.h"
+#include "host/analysis/MonitoredLogs.h"
+#include "host/framework/RequestLimit.h"
+#include "host/framework/Sample.h"
+#include "host/framework/TraceCapture.h"
+#include "logtypes/EntryReader.h"
+#include "monitor/LogFile.h"
+#include "monitor/ReportOutcome.h"
+
+#include <algorithm>
+#include <chrono>
+#include <optional>
+#include <utility>
+
+namespace zrm::host {
+
+namespace {
+
+constexpr const char* wasEnded = "the report was ended: it took too long, or the agent is stopping";
+/// A refresh waits for a sample.
+constexpr std::chrono::seconds sampleLimit{32};
+
+class FilteredRows : public FollowedReport::Receiver {
+public:
+    FilteredRows(EntryFilter& filter, LogReport::Receiver& receiver)
+        : m_filter(filter), m_receiver(receiver) {}
+
+    bool meets(zrm_rmlogent_data_t& row) override { return m_filter.meets(row); }
+    void give(const zrm_rmlogent_data_t& row) override {
+        ++count;
+        m_receiver.row(reinterpret_cast<const char*>(&row));
+    }
+    void progress(std::int64_t read, std::int64_t total) override {
+        m_receiver.progress(read, total);
+    }
+
+    std::size_t count = 0;
+
+private:
+    EntryFilter& m_filter;
+    LogReport::Receiver& m_receiver;
+};
+
+/// Why a followed log was not read completely; empty if it was.
+std::string reasonOf(const FollowedReport& report) {
+    if (report.isCancelled()) {
+        return wasEnded;
+    }
+    for (const FollowedReport::File& file : report.files()) {
+        if (!file.problem.empty()) {
+            return "not all of " + file.path + " was read: " + file.problem;
+        }
+    }
+    return report.isLimited() ? "the report has found as many entries as it may" : "";
+}
+
+} // namespace
+
+std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entries) {
+    const TraceSilence silence;
+    const MonitoredLogs logs;
+    const LogFile* const log = logs.find(query.log);
+    if (log == nullptr) {
+        return nullptr;
+    }
+    std::unique_ptr<EntryReader> reader;
+    if (log->followSettings() != nullptr) {
+        reader = EntryReader::of(*log);
+    }
+    return std::unique_ptr<LogReport>(
+        new LogReport(std::move(query), entries, log->fileNameLocal(), std::move(reader)));
+}
+
+LogReport::LogReport(ReportQuery query, TableManager& entries, std::string path,
+                     std::unique_ptr<EntryReader> reader)
+    : m_query(std::move(query)), m_path(std::move(path)), m_reader(std::move(reader)),
+      m_filter(m_query.where, entries) {}
+
+LogReport::~LogReport() = default;
+
+LogReport::Result LogReport::run(Receiver& receiver) {
+    return m_reader != nullptr ? runFollowed(receiver) : runSample(receiver);
+}
+
+LogReport::Result LogReport::runFollowed(Receiver& receiver) {
+    const TraceSilence silence; // a line that does not fit is counted, not traced
+    FollowedReport report(m_path, *m_reader, {m_query.from, m_query.to, m_query.limit});
+    FilteredRows rows(m_filter, receiver);
+    report.run(rows);
+    return {rows.count,
+            report.isLimited(),
+            {report.reached(), reasonOf(report)},
+            report.skipped(),
+            report.files()};
+}
+
+LogReport::Result LogReport::runSample(Receiver& receiver) const {
+    Result result;
+    RequestLimit* const outer = RequestLimit::current();
+    RequestLimit limit(RequestLimit::Clock::now() + sampleLimit,
+                       [outer] { return outer != nullptr && outer->isReached(); });
+    const ReportOutcome outcome;
+    const std::optional<Sample> sample = Sample::take("RMLOGENT", m_query.conditions, "HTTP");
+    if (!sample) {
+        result.reach.reason = "the agent cannot take any more requests";
+        return result;
+    }
+    const bool wasLimitReached = limit.wasReached();
+    result.count = std::min(sample->size(), m_query.limit);
+    for (std::size_t index = 0; index < result.count; ++index) {
+        receiver.row(sample->row(index));
+    }
+    // The agent counts the rows that it reads, before the conditions.
+    result.isTruncated =
+        sample->offered() >= static_cast<std::uint64_t>(gMaxRows) || sample->size() > m_query.limit;
+    result.reach.reached = outcome.reached();
+    if (wasLimitReached) {
+        result.reach.reason = wasEnded;
+    } else if (!outcome.isComplete()) {
+        result.reach.reason = outcome.reason();
+    } else if (result.isTruncated) {
+        result.reach.reason = "the report has found as many entries as it may";
+    }
+    return result;
+}
+
+} // namespace zrm::host

@@ -1,0 +1,85 @@
+#ifndef ZRM_HOST_LOG_REPORT_H
+#define ZRM_HOST_LOG_REPORT_H
+
+#include "host/analysis/EntryFilter.h"
+#include "host/analysis/LogTail.h"
+#include "host/framework/Condition.h"
+#include "logtypes/FollowedReport.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+class TableManager;
+
+namespace zrm {
+class EntryReader;
+} // namespace zrm
+
+namespace zrm::host {
+
+/// What a report asks for.
+struct ReportQuery {
+    std::string log;  ///< full path
+    std::string from; ///< 16-character time stamp, as `to`
+    std::string to;
+    std::vector<Condition> where;      ///< all must hold
+    std::vector<Condition> conditions; ///< all of the above, in the form that the table takes
+    std::size_t limit = 1000;          ///< rows
+};
+
+/// One report on a monitored log. A followed log is read over all its generations, apart from its
+/// monitor: no refresh waits for that. A log of the log configuration is read by a sample of Log
+/// Entries, as it always is. One thread at a time.
+class LogReport {
+public:
+    class Receiver {
+    public:
+        virtual ~Receiver() = default;
+        /// A row that meets the conditions; they come newest first.
+        virtual void row(const char* row) = 0;
+        /// How many of all bytes were read or passed over so far. Only for a followed log.
+        virtual void progress(std::int64_t read, std::int64_t total) = 0;
+    };
+
+    struct Result {
+        std::size_t count = 0;    ///< rows
+        bool isTruncated = false; ///< there may be more: a limit ended the report
+        Reach reach;
+        std::uint64_t skipped = 0;               ///< lines that are not entries
+        std::vector<FollowedReport::File> files; ///< of a followed log, newest first
+    };
+
+    /// Null if the log is not monitored. May wait for a refresh. The table's manager outlives the
+    /// object, which does not need the log any more.
+    static std::unique_ptr<LogReport> open(ReportQuery query, TableManager& entries);
+    ~LogReport();
+    LogReport(const LogReport&) = delete;
+    LogReport& operator=(const LogReport&) = delete;
+
+    /// False if the agent cannot take any more requests; run must not be called then.
+    bool isOpen() const noexcept { return m_filter.isOpen(); }
+    const RowLayout& layout() const { return m_filter.layout(); }
+
+    /// Reads the log, once. Ends early when the thread's RequestLimit is reached. No row is given
+    /// while a refresh would have to wait, so the receiver may wait for its client.
+    Result run(Receiver& receiver);
+
+private:
+    LogReport(ReportQuery query, TableManager& entries, std::string path,
+              std::unique_ptr<EntryReader> reader);
+
+    Result runFollowed(Receiver& receiver);
+    Result runSample(Receiver& receiver) const;
+
+    const ReportQuery m_query;
+    const std::string m_path;                    ///< in the local code page
+    const std::unique_ptr<EntryReader> m_reader; ///< null: the log is not followed
+    EntryFilter m_filter;
+};
+
+} // namespace zrm::host
+
+#endif
