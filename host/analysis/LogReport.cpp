@@ -5,6 +5,7 @@
 #include "host/framework/RequestLimit.h"
 #include "host/framework/Sample.h"
 #include "host/framework/TraceCapture.h"
+#include "logs/FollowSettings.h"
 #include "logtypes/EntryReader.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
@@ -65,18 +66,17 @@ std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entr
     if (log == nullptr) {
         return nullptr;
     }
-    std::unique_ptr<EntryReader> reader;
+    std::unique_ptr<LogReport> report(new LogReport(std::move(query), entries));
     if (log->followSettings() != nullptr) {
-        reader = EntryReader::of(*log);
+        report->m_path = log->fileNameLocal();
+        report->m_rotatedTo = log->followSettings()->rotatedTo;
+        report->m_reader = EntryReader::of(*log);
     }
-    return std::unique_ptr<LogReport>(
-        new LogReport(std::move(query), entries, log->fileNameLocal(), std::move(reader)));
+    return report;
 }
 
-LogReport::LogReport(ReportQuery query, TableManager& entries, std::string path,
-                     std::unique_ptr<EntryReader> reader)
-    : m_query(std::move(query)), m_path(std::move(path)), m_reader(std::move(reader)),
-      m_filter(m_query.where, entries) {}
+LogReport::LogReport(ReportQuery query, TableManager& entries)
+    : m_query(std::move(query)), m_filter(m_query.where, entries) {}
 
 LogReport::~LogReport() = default;
 
@@ -86,7 +86,8 @@ LogReport::Result LogReport::run(Receiver& receiver) {
 
 LogReport::Result LogReport::runFollowed(Receiver& receiver) {
     const TraceSilence silence; // a line that does not fit is counted, not traced
-    FollowedReport report(m_path, *m_reader, {m_query.from, m_query.to, m_query.limit});
+    FollowedReport report(m_path, *m_reader,
+                          {m_query.from, m_query.to, m_query.limit, m_rotatedTo});
     FilteredRows rows(m_filter, receiver);
     report.run(rows);
     return {rows.count,

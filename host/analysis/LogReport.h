@@ -68,16 +68,17 @@ public:
     Result run(Receiver& receiver);
 
 private:
-    LogReport(ReportQuery query, TableManager& entries, std::string path,
-              std::unique_ptr<EntryReader> reader);
+    LogReport(ReportQuery query, TableManager& entries);
 
     Result runFollowed(Receiver& receiver);
     Result runSample(Receiver& receiver) const;
 
     const ReportQuery m_query;
-    const std::string m_path;                    ///< in the local code page
-    const std::unique_ptr<EntryReader> m_reader; ///< null: the log is not followed
     EntryFilter m_filter;
+    // Of a followed log.
+    std::unique_ptr<EntryReader> m_reader; ///< null: the log is not followed
+    std::string m_path;                    ///< in the local code page
+    std::string m_rotatedTo;               ///< see FollowSettings
 };
 
 } // namespace zrm::host

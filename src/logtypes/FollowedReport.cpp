@@ -11,6 +11,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <ctime>
 #include <deque>
 #include <string_view>
@@ -96,7 +97,10 @@ void FollowedReport::findFiles() {
     m_present = Generation::open(m_path);
     const int error = errno;
     std::string problem = m_present ? "" : openProblem(m_path, error);
-    std::vector<GenerationFile> generations = newestFirst(findGenerations(m_path));
+    // The generations of a symbolic link are beside the file to which it leads.
+    const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
+    std::vector<GenerationFile> generations =
+        newestFirst(findGenerations(real ? real.get() : m_path, 0, m_options.rotatedTo));
     // A log may be without a file after a rotation, until its next line is written.
     if (m_present || problem != noFile || generations.empty()) {
         Generation::Status status{};

@@ -39,7 +39,8 @@ public:
     struct Options {
         std::string from; ///< time stamp of 16 characters, as `to`
         std::string to;
-        std::size_t limit = 1; ///< rows, at least 1
+        std::size_t limit = 1;      ///< rows, at least 1
+        std::string rotatedTo = {}; ///< see FollowSettings
     };
 
     struct File {

@@ -17,6 +17,7 @@
 #include <gmock/gmock.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -78,7 +79,7 @@ protected:
         }
         rows = {};
         report = std::make_unique<FollowedReport>(path, *entries,
-                                                  FollowedReport::Options{from, to, limit});
+                                                  FollowedReport::Options{from, to, limit, ""});
         report->run(rows);
         return rows.given;
     }
@@ -295,6 +296,19 @@ TEST_F(FollowedReportTest, AFileIsReadOnceUnderTwoNames) {
     EXPECT_THAT(run(), ElementsAre("two", "one"));
 }
 
+TEST_F(FollowedReportTest, GenerationsAreWhereRotationMovesThemAndBesideALinksTarget) {
+    std::filesystem::create_directories(directory.path() / "real/old");
+    directory.write("real/app.log", line("10-05", "three"));
+    directory.write("real/app.log.1", line("10-04", "two"));
+    directory.write("real/old/app.log.2", line("10-03", "one"));
+    ASSERT_EQ(symlink("real/app.log", path.c_str()), 0);
+    entries = entriesOf<SysLogFile>('S');
+    report = std::make_unique<FollowedReport>(
+        path, *entries, FollowedReport::Options{always, endOfTime, 10, "old"});
+    report->run(rows);
+    EXPECT_THAT(rows.given, ElementsAre("three", "two", "one"));
+}
+
 TEST_F(FollowedReportTest, AGenerationThatIsReplacedMeanwhileIsNamed) {
     directory.write("app.log", line("10-05", "two"));
     directory.write("app.log.1", line("10-04", "one"));
@@ -309,7 +323,7 @@ TEST_F(FollowedReportTest, AGenerationThatIsReplacedMeanwhileIsNamed) {
     } rotating(directory);
     entries = entriesOf<SysLogFile>('S');
     report = std::make_unique<FollowedReport>(path, *entries,
-                                              FollowedReport::Options{always, endOfTime, 10});
+                                              FollowedReport::Options{always, endOfTime, 10, ""});
     report->run(rotating);
     EXPECT_THAT(rotating.given, ElementsAre("two"));
     EXPECT_THAT(problems(), ElementsAre(".1: it was replaced while the report was being read"));
@@ -329,8 +343,8 @@ TEST_F(FollowedReportTest, WhatIsTruncatedMeanwhileIsNamed) {
         std::string path;
     } truncating(path);
     entries = entriesOf<SysLogFile>('S');
-    report = std::make_unique<FollowedReport>(path, *entries,
-                                              FollowedReport::Options{always, endOfTime, 100'000});
+    report = std::make_unique<FollowedReport>(
+        path, *entries, FollowedReport::Options{always, endOfTime, 100'000, ""});
     report->run(truncating);
     EXPECT_FALSE(truncating.given.empty());
     EXPECT_THAT(problems(), ElementsAre(": it was truncated while the report was being read"));
