@@ -10,10 +10,12 @@
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
+#include "host/sources/LogList.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
@@ -60,14 +62,55 @@ std::vector<std::string> loggedLines(const JsonFields& fields, const std::string
     return std::move(*lines);
 }
 
+/// How the lines of a trial are judged.
+struct TrialRules {
+    bool isSyslog = false;
+    TableSettings settings; ///< null: by the rules of the log configuration
+};
+
+/// The settings of a log of a [[log]] table; null for any other log.
+TableSettings settingsOf(const std::optional<std::string>& log) {
+    const std::shared_ptr<const FoundLogs> found = LogList::found();
+    const auto one = std::find_if(found->logs.begin(), found->logs.end(),
+                                  [&](const FurtherLog& each) { return each.name == log; });
+    const std::vector<LogLedgerView> monitored =
+        one == found->logs.end() ? std::vector<LogLedgerView>() : LogLedgers::read(*log);
+    return monitored.empty() || !monitored[0].follow ? nullptr : one->settings;
+}
+
+TrialRules rulesOf(JsonFields& fields, const std::optional<std::string>& log) {
+    const std::string type = fields.optionalText("type").value_or("text");
+    if (type != "text" && type != "syslog") {
+        fields.refuse("type", "write \"text\" or \"syslog\"");
+    }
+    const std::optional<std::string> rules = fields.optionalText("rules");
+    if (rules && *rules != "log_config" && *rules != "table") {
+        fields.refuse("rules", "write \"log_config\" or \"table\"");
+    }
+    const std::optional<std::string> timezone = fields.optionalText("timezone");
+    TrialRules judged{type == "syslog", rules == "log_config" ? nullptr : settingsOf(log)};
+    const bool isTable = rules.value_or("") == "table" || judged.isSyslog || timezone;
+    if (isTable && rules == "log_config") {
+        fields.refuse("rules", "only a [[log]] table has a timezone, or lines that need no format");
+    }
+    if (timezone || (isTable && !judged.settings)) {
+        const auto settings = FormatTrial::settingsOf(timezone.value_or(""));
+        if (!settings) {
+            fields.refuse("timezone", "'" + *timezone + "' is not a time zone of this machine");
+        }
+        judged.settings = *settings;
+    }
+    return judged;
+}
+
 /// An answer contains what every directive reads from every line; this limits the total.
 void refuseTooMuch(const JsonFields& fields, const std::string& format, std::string_view log,
-                   const std::vector<std::string>& lines) {
+                   const TableSettings& settings, const std::vector<std::string>& lines) {
     std::size_t pieces = 0;
     for (const std::string& line : lines) {
-        pieces += FormatTrial::piecesOf(line);
+        pieces += settings ? 1 : FormatTrial::piecesOf(line);
     }
-    const std::size_t directives = FormatTrial(format, log).result().directives.size();
+    const std::size_t directives = FormatTrial(format, log, settings).result().directives.size();
     if (pieces * directives > DiagnoseResource::mostValues) {
         fields.refuse(fields.has("last") ? "last" : "lines",
                       "try fewer lines: with " + std::to_string(directives) +
@@ -105,8 +148,9 @@ void DiagnoseResource::addRoutes(Router& router) {
 HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
     TraceScope trace(anchor);
     JsonFields fields(request.body);
-    const std::string format = fields.text("format");
     const std::optional<std::string> log = fields.optionalText("log");
+    const TrialRules rules = rulesOf(fields, log);
+    const std::string format = rules.isSyslog ? "" : fields.text("format");
     const auto last =
         fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::mostLines));
     const bool hasLines = fields.has("lines");
@@ -123,8 +167,13 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
     }
     const bool isNamed = log && !log->empty();
     const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::someLog;
-    refuseTooMuch(fields, format, name, lines);
-    return HttpAnswer::json(FormatTrial::json(FormatTrial::run(format, lines, name)));
+    if (rules.isSyslog) {
+        return HttpAnswer::json(
+            FormatTrial::json(FormatTrial::runSyslog(lines, name, rules.settings)));
+    }
+    refuseTooMuch(fields, format, name, rules.settings, lines);
+    return HttpAnswer::json(
+        FormatTrial::json(FormatTrial::run(format, lines, name, rules.settings)));
 }
 
 HttpAnswer DiagnoseResource::checkConfig(const HttpRequest& request) {

@@ -234,8 +234,11 @@ public:
 
 private:
     CLI::App* m_command;
-    std::string m_format;
+    std::string m_format; ///< with --type syslog, the file
     std::string m_file;
+    std::string m_type = "text";
+    std::string m_timezone;
+    bool m_isTable = false;
     std::size_t m_lines = 100;
 };
 

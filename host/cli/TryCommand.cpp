@@ -129,7 +129,31 @@ std::string coverageOf(const FormatTrial::Result& result, const Terminal& termin
            '\n';
 }
 
-/// The path that the configuration line names.
+TableSettings settingsOf(const std::string& timezone) {
+    std::optional<TableSettings> settings = FormatTrial::settingsOf(timezone);
+    if (!settings) {
+        throw CliError(CliStatus::USAGE, "try: '" + timezone +
+                                             "' is not a time zone of this machine; write UTC or a "
+                                             "name like Europe/Berlin");
+    }
+    return std::move(*settings);
+}
+
+/// What to write into the configuration.
+std::string configurationOf(const FormatTrial::Result& result) {
+    if (result.table.empty()) {
+        return DisplayText::visible(result.configurationLine) + '\n';
+    }
+    std::string text;
+    for (std::string_view rest = result.table; !rest.empty();) {
+        const std::size_t end = std::min(rest.find('\n'), rest.size() - 1);
+        text += DisplayText::visible(rest.substr(0, end)) + '\n';
+        rest.remove_prefix(end + 1);
+    }
+    return text;
+}
+
+/// The path that the configuration names.
 std::string logOf(const std::string& file) {
     std::error_code error;
     const std::filesystem::path path = std::filesystem::absolute(file, error);
@@ -143,10 +167,18 @@ TryCommand::TryCommand(CLI::App& program)
     : m_command(program.add_subcommand("try", "Try a format on a file; needs no agent")) {
     m_command
         ->add_option("FORMAT", m_format,
-                     "The format as in the log configuration, after the third ';'")
+                     "The format as in the configuration; left out with --type syslog")
         ->required();
-    m_command->add_option("FILE", m_file, "The file with the lines; - is standard input")
-        ->required();
+    m_command->add_option("FILE", m_file, "The file with the lines; - is standard input");
+    m_command->add_flag("--table", m_isTable,
+                        "Judge the lines as a [[log]] table does, not the log configuration");
+    m_command
+        ->add_option("--type", m_type, "text or syslog; syslog needs no format, implies --table")
+        ->type_name("TYPE")
+        ->check(CLI::IsMember({"text", "syslog"}));
+    m_command
+        ->add_option("--timezone", m_timezone, "What times without a zone mean; implies --table")
+        ->type_name("ZONE");
     m_command->add_option("--lines", m_lines, "The number of lines, from the first (default 100)")
         ->type_name("COUNT")
         ->check(CLI::Range(std::size_t{1}, mostLines));
@@ -157,13 +189,23 @@ bool TryCommand::isChosen() const {
 }
 
 CliStatus TryCommand::run(Context& context) {
-    InputFile file(m_file);
+    const bool isSyslog = m_type == "syslog";
+    if (isSyslog == !m_file.empty()) {
+        throw CliError(CliStatus::USAGE, isSyslog ? "try: with --type syslog, name the file alone"
+                                                  : "try: FILE is required");
+    }
+    const std::string& path = isSyslog ? m_format : m_file;
+    InputFile file(path);
     std::vector<std::string> lines;
     std::optional<std::string> next;
     while (lines.size() < m_lines && (next = file.line())) {
         lines.push_back(std::move(*next));
     }
-    const FormatTrial::Result result = FormatTrial::run(m_format, lines, logOf(m_file));
+    const bool isTable = isSyslog || m_isTable || !m_timezone.empty();
+    const TableSettings settings = isTable ? settingsOf(m_timezone) : nullptr;
+    const FormatTrial::Result result =
+        isSyslog ? FormatTrial::runSyslog(lines, logOf(path), settings)
+                 : FormatTrial::run(m_format, lines, logOf(path), settings);
     const CliStatus status =
         result.accepted && result.matched > 0 ? CliStatus::DONE : CliStatus::REFUSED;
     if (context.options().json) {
@@ -179,9 +221,9 @@ CliStatus TryCommand::run(Context& context) {
         context.print(textOf(++number, line, context.terminal()));
     }
     context.print((result.lines.empty() ? "" : "\n") + coverageOf(result, context.terminal()) +
-                  DisplayText::visible(result.configurationLine) + '\n');
+                  configurationOf(result));
     if (lines.empty()) {
-        Context::note(m_file + " has no lines to try the format on");
+        Context::note(path + " has no lines to try the format on");
     }
     return status;
 }

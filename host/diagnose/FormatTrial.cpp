@@ -1,15 +1,15 @@
 #include "host/diagnose/FormatTrial.h"
 
 #include "base/TraceScope.h"
-#include "host/events/RowText.h"
+#include "host/diagnose/TrialLine.h"
 #include "host/framework/TraceCapture.h"
+#include "logs/FollowSettings.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <cstring>
 #include <memory>
@@ -29,8 +29,8 @@ TRC1_Anchor anchor{"FormatTrial.cpp"};
 class TrialLog : public UserLogFile {
 public:
     /// Takes a learned format.
-    explicit TrialLog(std::unique_ptr<StringParser> format)
-        : TrialLog(std::move(format), noLine()) {}
+    TrialLog(std::unique_ptr<StringParser> format, const TableSettings& settings)
+        : TrialLog(std::move(format), trialLine('U', settings)) {}
 
     const StringParser& format() const noexcept { return *SPAnchor; }
 
@@ -39,14 +39,7 @@ private:
         : UserLogFile(*line, Unmonitored{}) {
         SPAnchor = std::move(format);
     }
-    /// A configuration line that names no log.
-    static std::unique_ptr<ValidLog> noLine();
 };
-
-std::unique_ptr<ValidLog> TrialLog::noLine() {
-    char line[] = "";
-    return std::make_unique<ValidLog>(CONFIG_USER, line, nullptr);
-}
 
 namespace {
 
@@ -56,10 +49,13 @@ constexpr std::string_view fields = " ;N ;U ;"; ///< between the log and the for
 
 } // namespace
 
-ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log) : m_log(log) {
-    const std::size_t begin = std::min(format.find_first_not_of(blanks), format.size());
+ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log, Source source)
+    : m_log(log) {
+    const bool isLine = source == Source::line;
+    const std::size_t begin =
+        isLine ? std::min(format.find_first_not_of(blanks), format.size()) : 0;
     m_written = format.substr(begin);
-    m_lineLength = m_log.size() + fields.size() + m_written.size();
+    m_lineLength = m_written.size() + (isLine ? m_log.size() + fields.size() : 0);
     m_length = m_written.size();
     for (std::size_t at = m_written.find(nameToken); at != std::string::npos;
          at = m_written.find(nameToken, at + nameToken.size())) {
@@ -67,14 +63,15 @@ ConfiguredFormat::ConfiguredFormat(std::string_view format, std::string_view log
         m_length -= nameToken.size();
     }
     if (!isTooLong()) {
-        expand(begin);
+        expand(begin, source);
     }
 }
 
 /// `begin` is the offset of the specifier in the original.
-void ConfiguredFormat::expand(std::size_t begin) {
+void ConfiguredFormat::expand(std::size_t begin, Source source) {
     std::string configured = m_written;
-    const std::size_t firstBlank = configured.find_first_of(blanks);
+    const std::size_t firstBlank =
+        source == Source::line ? configured.find_first_of(blanks) : std::string::npos;
     if (firstBlank != std::string::npos && firstBlank + 1 < configured.size()) {
         configured[firstBlank] = ' ';
     }
@@ -104,8 +101,6 @@ std::size_t ConfiguredFormat::original(std::size_t position) const {
 
 namespace {
 
-using Row = zrm_rmlogent_data_t;
-
 constexpr std::size_t longestPiece = 2047; ///< the most bytes that the agent reads as one line
 constexpr std::size_t mostValue = 2048;    ///< bytes of a printed value that are shown
 constexpr std::string_view countDirective = "%n";
@@ -113,23 +108,8 @@ constexpr std::string_view countDirective = "%n";
 /// The column for each field name, in the order of the names.
 constexpr const char* columnOfField[] = {
     "ENTRYTIME", "ENTRYTIME", "ENTRYTIME", "ENTRYTIME",  "ENTRYTIME", "ENTRYTIME",
-    "ENTRYSYS",  "ENTRYSRC",  "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC",
+    "ENTRYSYS",  "ENTRYSRC",  "ENTRYTYPE", "ENTRYCLASS", "ENTRYDESC", "ENTRYTIME",
 };
-
-/// The columns filled from a line.
-const std::array<RowColumn, 8>& entryColumns() {
-    static const auto* const columns = new std::array<RowColumn, 8>{{
-        {"ENTRYTIME", offsetof(Row, entrytime), sizeof Row::entrytime, COLUMN_CHARACTER},
-        {"ENTRYSYS", offsetof(Row, entrysys), sizeof Row::entrysys, COLUMN_CHARACTER},
-        {"ENTRYSRC", offsetof(Row, entrysrc), sizeof Row::entrysrc, COLUMN_CHARACTER},
-        {"ENTRYTYPE", offsetof(Row, entrytype), sizeof Row::entrytype, COLUMN_CHARACTER},
-        {"ENTRYCLASS", offsetof(Row, entryclass), sizeof Row::entryclass, COLUMN_CHARACTER},
-        {"ENTRYDESC", offsetof(Row, entrydesc), sizeof Row::entrydesc, COLUMN_CHARACTER},
-        {"UENTRYSRC", offsetof(Row, uentrysrc), sizeof Row::uentrysrc, COLUMN_UTF8},
-        {"UENTRYDESC", offsetof(Row, uentrydesc), sizeof Row::uentrydesc, COLUMN_UTF8},
-    }};
-    return *columns; // never destroyed: threads outlive main
-}
 
 /// A scan directive in two parts: the literal text before it, and the conversion.
 struct Parts {
@@ -194,14 +174,23 @@ std::string capitalised(std::string text) {
 
 } // namespace
 
-FormatTrial::FormatTrial(std::string_view format, std::string_view log) : m_format(format, log) {
+FormatTrial::FormatTrial(std::string_view format, std::string_view log, TableSettings settings)
+    : m_settings(std::move(settings)),
+      m_format(format, log,
+               m_settings ? ConfiguredFormat::Source::table : ConfiguredFormat::Source::line) {
     TraceScope trace(anchor);
-    const std::size_t lineEnd = std::min(format.find('\n'), format.find('\0'));
+    // A [[log]] table may have a format of several lines.
+    const std::size_t lineEnd =
+        std::min(m_settings ? std::string_view::npos : format.find('\n'), format.find('\0'));
     if (lineEnd != std::string_view::npos) {
         refuse("A configuration line holds neither line ends nor NUL characters.", lineEnd);
         return;
     }
-    if (m_format.lineLength() > ConfiguredFormat::mostInLine) {
+    if (m_settings && m_format.lineLength() > ConfiguredFormat::mostInLine) {
+        refuse("The format has " + std::to_string(m_format.lineLength()) +
+                   " bytes; write at most 1022.",
+               std::nullopt);
+    } else if (m_format.lineLength() > ConfiguredFormat::mostInLine) {
         refuse("The configuration line would have " + std::to_string(m_format.lineLength()) +
                    " characters; the agent reads lines of up to 1022.",
                std::nullopt);
@@ -225,7 +214,9 @@ void FormatTrial::refuse(std::string reason, std::optional<std::size_t> position
 void FormatTrial::learn() {
     TraceScope trace(anchor);
     TraceCapture errors;
-    auto format = std::make_unique<StringParser>(m_format.text().c_str(), UserLogFile::fields());
+    auto format = std::make_unique<StringParser>(m_format.text().c_str(),
+                                                 m_settings ? UserLogFile::followedFields()
+                                                            : UserLogFile::fields());
     if (format->status() != OBJECT_FORMAT_LEARNED) {
         std::string reason = errors.take();
         const std::size_t position = format->learnedTo();
@@ -233,9 +224,13 @@ void FormatTrial::learn() {
                m_format.original(position));
         return;
     }
-    m_log = std::make_unique<TrialLog>(std::move(format));
+    m_log = std::make_unique<TrialLog>(std::move(format), m_settings);
     m_result.accepted = true;
-    m_result.configurationLine = m_format.line();
+    if (m_settings) {
+        m_result.table = tableText(m_format.log(), m_format.written(), m_settings->timezone);
+    } else {
+        m_result.configurationLine = m_format.line();
+    }
     describeDirectives();
 }
 
@@ -256,7 +251,8 @@ void FormatTrial::describeDirectives() {
 }
 
 FormatTrial::Line FormatTrial::scan(std::string_view line) {
-    return scanPiece((std::string(line) + '\n').substr(0, longestPiece));
+    return m_settings ? scanPiece(std::string(line.substr(0, longestPiece - 1)) + '\n')
+                      : scanPiece((std::string(line) + '\n').substr(0, longestPiece));
 }
 
 /// `piece` is a line as the agent reads it, including its line end, if any.
@@ -265,16 +261,12 @@ FormatTrial::Line FormatTrial::scanPiece(std::string piece) {
     TraceCapture errors;
     Line line;
     line.line = piece.ends_with('\n') ? piece.substr(0, piece.size() - 1) : piece;
-    const auto row = std::make_unique<Row>();
+    const auto row = std::make_unique<zrm_rmlogent_data_t>();
     line.matched = m_log->formatEntryAsRow(piece.data(), row.get(), nullptr) == 0;
     std::string messages = errors.take();
     explain(piece.c_str(), line);
     if (line.matched) {
-        std::string room;
-        for (const RowColumn& column : entryColumns()) {
-            line.row.emplace_back(
-                column.name, RowText::of(column, reinterpret_cast<const char*>(row.get()), room));
-        }
+        line.row = entryTexts(*row);
     }
     if (line.matched || line.reason.empty()) {
         line.reason = std::move(messages);
@@ -320,14 +312,19 @@ void FormatTrial::explain(const char* text, Line& line) const {
 }
 
 FormatTrial::Result FormatTrial::run(std::string_view format, const std::vector<std::string>& lines,
-                                     std::string_view log) {
+                                     std::string_view log, const TableSettings& settings) {
     TraceScope trace(anchor);
-    FormatTrial trial(format, log);
+    FormatTrial trial(format, log, settings);
     Result result = trial.result();
     if (!result.accepted) {
         return result;
     }
     for (const std::string& line : lines) {
+        if (settings) {
+            result.lines.push_back(trial.scan(line));
+            result.matched += result.lines.back().matched ? 1 : 0;
+            continue;
+        }
         const std::string whole = line + '\n';
         for (std::size_t at = 0; at < whole.size(); at += longestPiece) {
             result.lines.push_back(trial.scanPiece(whole.substr(at, longestPiece)));

@@ -54,7 +54,7 @@ Json lineJson(const FormatTrial::Line& line) {
                           {"name", field.name},
                           {"column", field.column},
                           {"value", field.value},
-                          {"directive", field.directive}});
+                          {"directive", orNull(field.directive)}});
     }
     Json row;
     for (const auto& [column, text] : line.row) {
@@ -93,7 +93,8 @@ std::string FormatTrial::json(const Result& result) {
                        {{"lines", result.lines.size()},
                         {"matched", result.matched},
                         {"percent", percent(result)}}},
-                      {"configuration_line", orNull(result.configurationLine)}};
+                      {"configuration_line", orNull(result.configurationLine)},
+                      {"table", orNull(result.table)}};
     return object.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 

@@ -44,6 +44,7 @@ LogLedgerView numbersOf(const LogFile& log) {
     view.type = log.type();
     view.procedure = log.procedure();
     view.truncations = ledger.truncations();
+    view.settings = log.followSettings();
     if (const FollowLedger* const follow = log.followLedger()) {
         view.follow = FollowView::of(*follow);
         view.truncations = follow->truncations();
@@ -92,7 +93,7 @@ void addReasons(LogLedgerView& view) {
         }
         return;
     }
-    FormatTrial trial(view.procedure, view.log);
+    FormatTrial trial(view.procedure, view.log, view.settings);
     for (LogLedgerView::Rejected& rejected : view.rejected) {
         rejected.reason = trial.isAccepted() ? trial.scan(rejected.line).reason : "";
     }

@@ -5,10 +5,15 @@
 #include "monitor/FileIdentity.h"
 
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
+
+namespace zrm {
+struct FollowSettings;
+}
 
 namespace zrm::host {
 
@@ -48,8 +53,9 @@ struct LogLedgerView {
     std::string file;                     ///< the same in the process's code page
     std::optional<FileIdentity> openFile; ///< the file that the monitor currently reads
     char type = 'S';
-    std::string procedure;            ///< a user log's format
-    std::optional<FollowView> follow; ///< none: a log of the log configuration
+    std::string procedure;                          ///< a user log's format
+    std::shared_ptr<const FollowSettings> settings; ///< null: a log of the log configuration
+    std::optional<FollowView> follow;               ///< none: a log of the log configuration
     std::int64_t bytesRead = 0;
     std::int64_t lines = 0;
     std::int64_t rows = 0;

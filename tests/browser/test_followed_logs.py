@@ -112,3 +112,32 @@ def test_a_log_that_cannot_be_read_shows_why(page, followed, fast_polls):
     directory.unlink()
     (followed.directory / "hidden").rename(directory)
     until(lambda: page.text_of("//span[starts-with(@class, 'state')]") == "Running", "the end of the warning", 30)
+
+
+def test_lines_are_tried_as_a_table_would_judge_them(page, agent):
+    agent.environment["TZ"] = "Europe/Berlin"
+    log = harness.Log(agent.directory / "app.log")
+    log.path.write_text("2026-11-20T06:03:09Z web1 app[1]: first\n2026-11-20 06:03:09 second\n")
+    agent.follow(log, timezone="America/New_York", start="beginning")
+    agent.start()
+    agent.wait_open(log)
+    page.on(agent, "try")
+    page.wait_text("100% of the lines fit")
+    assert "type = 'text'" in page.text_of("//*[@aria-label='Table']")
+    page.type("Lines", "2026-11-20 06:03:09 ERROR payment: Card declined")
+    page.type("Time zone", "UTC")
+    page.wait_text("timezone = 'UTC'")
+    page.wait_text("2026-11-20 07:03:09")
+    page.type("Time zone", "Nowhere/Town")
+    page.wait_text("'Nowhere/Town' is not a time zone of this machine")
+    page.pictures("try-table")
+    page.open(f"try?log={log}")
+    page.wait_text("50% of the lines fit")
+    page.wait_text("The line is in no form that system loggers write")
+    page.wait_text("timezone = 'America/New_York'")
+    assert page.text_of("//*[@aria-label='Table']").startswith(f"[[log]]\npath = '{log}'")
+    assert [mark.text for mark in page.all(".lines mark.f2")] == ["app[1]"]
+    page.pictures("try-syslog")
+    page.choose("Judge as", "Line of the log configuration")
+    page.wait_text("0% of the lines fit")
+    page.expect_complaints()

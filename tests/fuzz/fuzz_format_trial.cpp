@@ -27,7 +27,7 @@ void examine(const FormatTrial::Line& line, const FormatTrial::Result& result) {
     require(!line.directive || *line.directive < result.directives.size());
     for (const FormatTrial::Field& field : line.fields) {
         require(field.from <= field.to && field.to <= line.line.size());
-        require(field.directive < result.directives.size());
+        require(field.directive && *field.directive < result.directives.size());
     }
 }
 

@@ -197,3 +197,72 @@ def test_a_log_that_cannot_be_read_has_a_warning_until_it_can(agent):
     hidden.rename(directory)
     agent.wait_events(1)
     wait_until(lambda: not client.ledger(log)["warnings"], "the end of the warning")
+
+
+def test_a_trial_judges_lines_as_the_table_of_their_log(agent):
+    log = Log(agent.directory / "app.log")
+    log.path.write_text("Nov 20 06:03:09 web1 app[1]: first\nneither\n")
+    agent.environment["TZ"] = "Europe/Berlin"
+    agent.follow(log, timezone="UTC")
+    text = Log(agent.directory / "text.log")
+    text.path.write_text("2026-11-20T06:03:09Z hello\n")
+    zoned = "A,\"%d-%d-%dT%d:%d:%d%s %99s\",year month day hour minute second zone description"
+    agent.follow(text, type="text", format=zoned)
+    plain = agent.log("plain.log", b"2026-11-20T06:03:09Z hello\n")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(text)
+    client = Client(agent)
+
+    def trial(expected=200, **body):
+        status, _, answer = client.api.request("POST", "/api/v1/try", body)
+        assert status == expected, answer
+        return answer
+
+    answer = trial(type="syslog", log=str(log), last=2)
+    assert [line["matched"] for line in answer["lines"]] == [True, False]
+    assert answer["lines"][0]["row"]["ENTRYTIME"].endswith("070309000")
+    assert answer["lines"][1]["row"]["ENTRYDESC"] == "neither"
+    assert answer["configuration_line"] is None
+    assert answer["table"] == f"[[log]]\npath = '{log}'\ntimezone = 'UTC'\n"
+    (line,) = trial(format=zoned, log=str(text), last=1)["lines"]
+    assert line["row"]["ENTRYTIME"] == "1261120070309000"
+    assert not trial(format=zoned, log=str(plain), last=1)["accepted"]
+    assert trial(format=zoned, log=str(plain), last=1, rules="table")["accepted"]
+    assert trial(format=zoned, lines=["x"], rules="log_config", log=str(text))["accepted"] is False
+    assert trial(400, format="A", lines=["x"], timezone="Nowhere/Town")["field"] == "timezone"
+    assert trial(400, lines=["x"])["field"] == "format"
+    assert trial(400, type="xml", lines=["x"])["field"] == "type"
+    assert trial(400, rules="none", format="A")["field"] == "rules"
+    assert trial(400, rules="log_config", type="syslog", lines=["x"])["field"] == "rules"
+
+
+@pytest.mark.slow
+def test_a_rejected_line_of_a_table_has_its_reason(agent):
+    text = Log(agent.directory / "text.log")
+    text.path.write_text("")
+    zoned = "A,\"%d-%d-%dT%d:%d:%d%s %99s\",year month day hour minute second zone description"
+    agent.follow(text, type="text", format=zoned, start="beginning")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    client = Client(agent)
+    text.append("2026-11-20T06:03:09Z fits\n2026-11-20T no time\n")
+    (rejected,) = wait_until(lambda: client.ledger(text).get("rejected"), "the rejected line")
+    assert rejected["reason"] == "A number for %d is expected here."
+
+
+def test_the_client_tries_lines_as_a_table_would(tmp_path):
+    file = tmp_path / "sys.log"
+    file.write_text("2026-11-20T06:03:09Z web1 app[1]: first\nneither\n")
+    status, text, errors = run(["try", "--type", "syslog", "--timezone", "UTC", str(file)], TZ="Europe/Berlin")
+    assert (status, errors) == (0, "")
+    assert "ENTRYTIME   2026-11-20 07:03:09" in text and "1 of 2 lines fit (50.0 %)" in text
+    assert text.endswith(f"[[log]]\npath = '{file}'\ntimezone = 'UTC'\n")
+    zoned = 'A,"%d-%d-%dT%d:%d:%d%s" , year month day hour minute second zone'
+    assert run(["try", zoned, str(file)])[0] == 1
+    status, text, _ = run(["try", "--table", zoned, str(file)], TZ="Europe/Berlin")
+    assert status == 0 and "ENTRYTIME   2026-11-20 07:03:09" in text
+    assert run(["try", "--type", "syslog", "A", str(file)])[0] == 2
+    assert run(["try", "A"])[2] == "zrmctl: try: FILE is required\n"
+    status, _, errors = run(["try", "--timezone", "Nowhere/Town", "A", str(file)])
+    assert status == 2 and "'Nowhere/Town' is not a time zone of this machine" in errors

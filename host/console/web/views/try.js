@@ -13,16 +13,43 @@ const SAMPLE =
 // The parts of the time share a colour; the other fields have one each.
 const COLOURS = { system: "f1", source: "f2", type: "f3", class: "f4", description: "f5" };
 const MOST_LINES = 200;
+const SOME_LOG = "/path/to/the.log";
+const RULES = [
+  ["table", "Text log of a [[log]] table"],
+  ["syslog", "Syslog file of a [[log]] table"],
+  ["log_config", "Line of the log configuration"],
+];
 
 export async function show(element, query) {
-  const { logs } = await get("/api/v1/logs");
-  new TryPage(element, logs, query.get("log") || "");
+  const { logs, tables, configuration } = await get("/api/v1/logs");
+  const rules = tables.length > 0 || !configuration ? "table" : "log_config";
+  new TryPage(element, logs, rules, query.get("log") || "");
+}
+
+/** The rules by which the agent judges the lines of a log. */
+function rulesOf(log) {
+  if (!log.ledger?.follow) return "log_config";
+  return log.row.LOGTYPE === "S" ? "syslog" : "table";
 }
 
 class TryPage {
-  constructor(element, logs, log) {
+  constructor(element, logs, rules, log) {
     const known = logs.find((one) => one.log === log);
     const again = debounce(() => this.#try(), 250);
+    this.rules = field(
+      "Judge as",
+      select(RULES, known ? rulesOf(known) : rules, {
+        onchange: () => {
+          this.#showRules();
+          this.#try();
+        },
+      }),
+    );
+    this.timezone = field(
+      "Time zone",
+      h("input", { type: "text", spellcheck: false, placeholder: "local time", oninput: again }),
+      "What times without a zone mean: UTC, or a name such as Europe/Berlin.",
+    );
     this.format = field(
       "Format",
       h("textarea", {
@@ -45,7 +72,10 @@ class TryPage {
       }),
       "One entry per line, as in the log.",
     );
-    this.log = select(logs.map((one) => one.log).sort(), log || undefined, { "aria-label": "Log" });
+    this.log = select(logs.map((one) => one.log).sort(), log || undefined, {
+      "aria-label": "Log",
+      onchange: () => this.#judgeAs(logs.find((one) => one.log === this.log.value)),
+    });
     this.count = select(["10", "50", "200"], "50", { "aria-label": "How many lines" });
     this.result = h("div", { className: "stack", role: "region", "aria-label": "Result" });
     fill(
@@ -54,6 +84,7 @@ class TryPage {
       h(
         "div",
         { className: "panel" },
+        h("div", { className: "fields" }, this.rules, this.timezone),
         this.format,
         this.lines,
         logs.length > 0 &&
@@ -69,8 +100,33 @@ class TryPage {
       ),
       this.result,
     );
+    this.#showRules();
     if (log) this.#take();
     else this.#try();
+  }
+
+  #judgeAs(log) {
+    this.rules.control.value = rulesOf(log);
+    this.#showRules();
+  }
+
+  #showRules() {
+    const rules = this.rules.control.value;
+    this.format.hidden = rules === "syslog";
+    this.timezone.hidden = rules === "log_config";
+  }
+
+  /** What the request says of the rules, and the format where they need one. */
+  #asked() {
+    const rules = this.rules.control.value;
+    const format = this.format.control.value;
+    if (rules === "log_config") return { rules, format };
+    const asked = {
+      rules: "table",
+      timezone: this.timezone.control.value.trim() || undefined,
+      log: this.takenFrom, // whose table may have a time zone
+    };
+    return rules === "syslog" ? { ...asked, type: "syslog" } : { ...asked, format };
   }
 
   /** A try with the previous lines would be wrong by now; one asked for meanwhile follows. */
@@ -80,7 +136,7 @@ class TryPage {
     this.lines.setProblem("");
     try {
       const answer = await post("/api/v1/try", {
-        format: this.format.control.value,
+        ...this.#asked(),
         log: this.log.value,
         last: Number(this.count.value),
       });
@@ -108,10 +164,10 @@ class TryPage {
       .split("\n")
       .filter((line) => line !== "")
       .slice(0, MOST_LINES);
-    const format = this.format.control.value.trim();
+    const asked = this.#asked();
     this.abort?.abort();
     this.abort = new AbortController();
-    if (!format || lines.length === 0) {
+    if (asked.format?.trim() === "" || lines.length === 0) {
       fill(
         this.result,
         h(
@@ -123,9 +179,11 @@ class TryPage {
       return;
     }
     try {
-      this.#draw(await post("/api/v1/try", { format, lines }, this.abort.signal));
+      this.#draw(await post("/api/v1/try", { ...asked, lines }, this.abort.signal));
     } catch (error) {
-      if (error.name !== "AbortError")
+      if (error.field === "timezone") {
+        this.timezone.setProblem(error.message);
+      } else if (error.name !== "AbortError")
         fill(
           this.result,
           h(
@@ -138,6 +196,7 @@ class TryPage {
   }
 
   #draw(answer) {
+    this.timezone.setProblem("");
     this.format.setProblem(answer.accepted ? "" : `The format cannot be used: ${answer.reason}`);
     if (!answer.accepted) {
       fill(
@@ -151,7 +210,7 @@ class TryPage {
       );
       return;
     }
-    const names = fieldNames(answer.directives);
+    const names = fieldNames(answer);
     if (answer.lines.length === 0) fill(this.result, this.#configuration(answer));
     else
       fill(
@@ -164,19 +223,26 @@ class TryPage {
   }
 
   #configuration(answer) {
-    if (!answer.configuration_line) return null;
-    const path = this.takenFrom || "/path/to/the.log";
-    const text = answer.configuration_line.replace(/^\S+/, path);
+    const isTable = Boolean(answer.table);
+    if (!isTable && !answer.configuration_line) return null;
+    const path = this.takenFrom || SOME_LOG;
+    const text = isTable
+      ? answer.table.trimEnd().replace(`'${SOME_LOG}'`, () => tomlString(path))
+      : answer.configuration_line.replace(/^\S+/, () => path);
     const said = h("span", { role: "status", className: "hint" });
     const code = h(
       "pre",
-      { className: "copyable", tabIndex: 0, "aria-label": "Configuration line" },
+      {
+        className: "copyable",
+        tabIndex: 0,
+        "aria-label": isTable ? "Table" : "Configuration line",
+      },
       text,
     );
     return h(
       "section",
       { className: "panel" },
-      h("h2", {}, "Line for the agent's configuration"),
+      h("h2", {}, isTable ? "Table for zrm.toml" : "Line for the agent's configuration"),
       code,
       h(
         "p",
@@ -191,19 +257,23 @@ class TryPage {
           }
         }),
         said,
-        h(
-          "span",
-          { className: "hint" },
-          this.takenFrom
-            ? "Put it in the log configuration in place of the log's current line, then press " +
-                "“Re-read configuration” under Logs."
-            : "Put the log's own path in front, add the line to the log configuration, then " +
-                "press “Re-read configuration” under Logs.",
-        ),
+        h("span", { className: "hint" }, this.#advice(isTable)),
       ),
     );
   }
+
+  #advice(isTable) {
+    if (isTable)
+      return "Put it into zrm.toml with the log's own path. The agent notices the change.";
+    return this.takenFrom
+      ? "Put it in the log configuration in place of the log's current line, then press " +
+          "“Re-read configuration” under Logs."
+      : "Put the log's own path in front, add the line to the log configuration, then " +
+          "press “Re-read configuration” under Logs.";
+  }
 }
+
+const tomlString = (text) => (text.includes("'") ? JSON.stringify(text) : `'${text}'`);
 
 /** A text with a mark at a byte of it. */
 function markedAt(text, position) {
@@ -228,7 +298,11 @@ class Offsets {
   }
 }
 
-const fieldNames = (directives) => [...new Set(directives.map((one) => one.field).filter(Boolean))];
+/** The names in a format; without one, those in the lines. */
+function fieldNames({ directives, lines }) {
+  const named = directives.length > 0 ? directives : lines.flatMap(({ fields }) => fields);
+  return [...new Set(named.map((one) => one.field ?? one.name).filter(Boolean))];
+}
 
 function colourOf(names, name) {
   return names.includes(name) ? COLOURS[name] || "f0" : "forgotten";

@@ -263,16 +263,18 @@ TEST(FormatTrial, LeavesTheTraceAlone) {
 }
 
 TEST(FormatTrial, WritesJson) {
-    EXPECT_EQ(FormatTrial::json(FormatTrial::run("A", {"x"})),
-              R"({"accepted":false,"reason":"Scan for start of format specifier failed; looking )"
-              R"(for \" %*1[Aa] , \"%n\" but found:  A","position":1,"directives":[],"lines":[],)"
-              R"("coverage":{"lines":0,"matched":0,"percent":0.0},"configuration_line":null})");
-    EXPECT_EQ(FormatTrial::json(FormatTrial::run("A,\"%d\",day", {"x"})),
-              R"({"accepted":true,"reason":null,"position":null,"directives":[{"text":"%d",)"
-              R"("from":3,"to":5,"field":"day","column":"ENTRYTIME"}],"lines":[{"line":"x",)"
-              R"("matched":false,"fields":[],"row":null,"failed_at":0,"directive":0,"reason":)"
-              R"("A number for %d is expected here."}],"coverage":{"lines":1,"matched":0,)"
-              R"("percent":0.0},"configuration_line":"/path/to/the.log ;N ;U ;A,\"%d\",day"})");
+    EXPECT_EQ(
+        FormatTrial::json(FormatTrial::run("A", {"x"})),
+        R"({"accepted":false,"reason":"Scan for start of format specifier failed; looking )"
+        R"(for \" %*1[Aa] , \"%n\" but found:  A","position":1,"directives":[],"lines":[],)"
+        R"("coverage":{"lines":0,"matched":0,"percent":0.0},"configuration_line":null,"table":null})");
+    EXPECT_EQ(
+        FormatTrial::json(FormatTrial::run("A,\"%d\",day", {"x"})),
+        R"({"accepted":true,"reason":null,"position":null,"directives":[{"text":"%d",)"
+        R"("from":3,"to":5,"field":"day","column":"ENTRYTIME"}],"lines":[{"line":"x",)"
+        R"("matched":false,"fields":[],"row":null,"failed_at":0,"directive":0,"reason":)"
+        R"("A number for %d is expected here."}],"coverage":{"lines":1,"matched":0,)"
+        R"("percent":0.0},"configuration_line":"/path/to/the.log ;N ;U ;A,\"%d\",day","table":null})");
 }
 
 // The trial against the agent itself: the same configuration line, the same rows.
