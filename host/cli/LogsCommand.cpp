@@ -70,10 +70,11 @@ void addLedger(FactList& facts, const Json& ledger) {
         const char* key;
         const char* name;
     };
-    constexpr std::array<Row, 5> rows = {{{"lines", "lines"},
+    constexpr std::array<Row, 6> rows = {{{"lines", "lines"},
                                           {"rows", "rows"},
                                           {"format_errors", "format errors"},
                                           {"without_time", "without a time"},
+                                          {"truncations", "truncations"},
                                           {"restarts", "monitor restarts"}}};
     if (ledger.is_null()) {
         return;
@@ -84,7 +85,6 @@ void addLedger(FactList& facts, const Json& ledger) {
     }
     if (JsonText::member(ledger, "follow")
             .is_null()) { // where a log is followed, nothing is skipped
-        facts.add("truncations", JsonText::text(ledger, "truncations"));
         facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
     }
     facts.add("last entry", lastEntry(ledger));

@@ -143,6 +143,7 @@ def test_the_client_shows_everything_about_a_followed_log(agent):
         "rows": "3",
         "format errors": "0",
         "without a time": "0",
+        "truncations": "2",
         "monitor restarts": "0",
         "following": "reading",
         "generation": str(log),

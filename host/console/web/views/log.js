@@ -157,7 +157,7 @@ function drawState(element, log, configuration, source) {
     ["Entries", number(ledger.rows ?? row.NUMEVENTS)],
     ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
     ["Without a time", number(ledger.without_time)],
-    !follow && ["Truncations", number(ledger.truncations)],
+    ["Truncations", number(ledger.truncations)],
     !follow && ["Skipped", bytes(ledger.skipped_bytes)],
     ["Restarts of the monitor", number(ledger.restarts)],
     ["Last entry", time(ledger.last_entry)],
