@@ -89,6 +89,7 @@ EntryBlock::Fill EntryBlock::fill(Generation& file) noexcept {
 char* EntryBlock::next() noexcept {
     restore();
     m_isCut = false;
+    m_given = m_begin;
     if (m_recordLength != 0) {
         return nextRecord();
     }
@@ -152,6 +153,7 @@ char* EntryBlock::restOfLongLine() noexcept {
 /// Ends the line that stands behind the block.
 char* EntryBlock::endLong(std::size_t length, bool isCut) noexcept {
     m_isCut = isCut;
+    m_given = notInBlock;
     m_isInLongLine = false;
     m_isTailAside = false;
     longLine()[length] = '\n';
@@ -174,6 +176,15 @@ char* EntryBlock::rest() noexcept {
     std::memcpy(longLine(), m_block.get() + m_begin, length);
     m_begin = m_end;
     return endLong(length, false);
+}
+
+bool EntryBlock::takeBack() noexcept {
+    if (m_given == notInBlock) {
+        return false;
+    }
+    restore();
+    m_begin = m_given;
+    return true;
 }
 
 void EntryBlock::release() noexcept {

@@ -38,6 +38,9 @@ public:
     /// The unfinished line at the end of a file to which nothing is added any more, as an entry.
     /// Null if there is none; an unfinished record is dropped.
     char* rest() noexcept;
+    /// Takes back the entry that next has just given, which the next call gives again. False if it
+    /// cannot: the beginning of a long line, or the rest of a file.
+    bool takeBack() noexcept;
     /// Frees the memory and forgets an unfinished line, which is read again. Keeps it in the middle
     /// of a line that is too long to be read again.
     void release() noexcept;
@@ -52,6 +55,8 @@ public:
     bool isCut() const noexcept { return m_isCut; }
 
 private:
+    static constexpr std::size_t notInBlock = SIZE_MAX;
+
     bool allocate() noexcept;
     void compact() noexcept;
     void restore() noexcept;
@@ -64,6 +69,7 @@ private:
     std::unique_ptr<char[]> m_block;
     std::size_t m_begin = 0; ///< the first byte not given yet
     std::size_t m_end = 0;   ///< one past the last byte read
+    std::size_t m_given = 0; ///< where the entry begins that was given last; notInBlock: elsewhere
     std::int64_t m_readTo = 0;
     Tail m_tail;
     bool m_isTailAside = true; ///< m_tail has the bytes before the next entry; the block need not

@@ -303,7 +303,7 @@ char* FileFollower::next() {
     }
     for (;;) {
         if (char* const entry = m_block.next()) {
-            m_isInBlock = true;
+            m_wasInBlock = std::exchange(m_isInBlock, true);
             if (m_block.isCut()) [[unlikely]] {
                 m_ledger.noteCut();
             }
@@ -341,6 +341,12 @@ char* FileFollower::next() {
             break;
         }
     }
+}
+
+bool FileFollower::takeBack() noexcept {
+    const bool isTaken = m_block.takeBack();
+    m_isInBlock = isTaken ? m_wasInBlock : m_isInBlock;
+    return isTaken;
 }
 
 void FileFollower::noteProgress() {

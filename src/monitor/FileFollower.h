@@ -53,6 +53,9 @@ public:
     bool look(const Moment& now);
     /// The next entry as EntryBlock gives it, or null if there is none until the next look.
     char* next();
+    /// Takes back the entry that next has just given, so that the position is before it. False if
+    /// it cannot.
+    bool takeBack() noexcept;
     /// Behind the last entry. None before a file has been opened.
     std::optional<LogPosition> position() const noexcept;
     /// How many bytes were read since the last call.
@@ -134,6 +137,7 @@ private:
     EntryBlock m_block;
     LogPosition m_position; ///< if it is not in the block
     bool m_hasPosition = false;
+    bool m_wasInBlock = false;   ///< m_isInBlock before the last entry
     bool m_isInBlock = false;    ///< the position is the block's, in the file that is read
     Tail m_head;                 ///< the first bytes of the file that is read
     bool m_isAtEnd = false;      ///< the last read found the end of the file

@@ -70,6 +70,10 @@ void LogFile::followLog(std::size_t recordLength) {
         if (follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read
             if (!readEntries(follower, positions)) {
+                // Who follows the log next judges this entry, and none of those before it again.
+                if (follower.takeBack()) {
+                    noteFollowed(follower, positions);
+                }
                 break;
             }
             noteFollowed(follower, positions);

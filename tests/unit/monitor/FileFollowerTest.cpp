@@ -519,6 +519,46 @@ TEST_F(FileFollowerTest, AnInterruptedReadIsNotAFailure) {
     EXPECT_FALSE(m_ledger.failure());
 }
 
+TEST_F(FileFollowerTest, TakesBackAnEntryThatIsNotJudged) {
+    look();
+    append("a\nb\nc\n");
+    m_now += seconds(1);
+    ASSERT_TRUE(m_follower->look({m_now, 0}));
+    EXPECT_STREQ(m_follower->next(), "a\n");
+    const auto behind = m_follower->position();
+    EXPECT_STREQ(m_follower->next(), "b\n");
+    EXPECT_TRUE(m_follower->takeBack());
+    EXPECT_EQ(m_follower->position(), behind);
+    restart();
+    EXPECT_EQ(look(), "b\nc\n");
+}
+
+TEST_F(FileFollowerTest, TheFirstEntryOfAFileTakenBackLeavesThePositionInTheOneBefore) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    const auto behind = m_follower->position();
+    rename("app.log", "app.log.1");
+    append("b\n");
+    look();
+    m_now += seconds(3);
+    ASSERT_TRUE(m_follower->look({m_now, 0}));
+    EXPECT_STREQ(m_follower->next(), "b\n");
+    EXPECT_NE(m_follower->position()->inode, behind->inode);
+    EXPECT_TRUE(m_follower->takeBack());
+    EXPECT_EQ(m_follower->position()->inode, behind->inode);
+    EXPECT_EQ(m_follower->position()->offset, behind->offset);
+}
+
+TEST_F(FileFollowerTest, TheBeginningOfALongLineIsNotTakenBack) {
+    look();
+    append(std::string(3000, 'x') + "\n");
+    m_now += seconds(1);
+    ASSERT_TRUE(m_follower->look({m_now, 0}));
+    ASSERT_NE(m_follower->next(), nullptr);
+    EXPECT_FALSE(m_follower->takeBack());
+}
+
 TEST_F(FileFollowerTest, GivesWholeRecords) {
     m_options.recordLength = 4;
     begin();
