@@ -116,6 +116,18 @@ History::~History() {
     m_recent.end();
 }
 
+std::set<std::string> History::logs() {
+    return reading([](Database& database) {
+               std::set<std::string> paths;
+               Statement logs(database, "SELECT path FROM logs");
+               while (logs.step()) {
+                   paths.emplace(logs.text(0));
+               }
+               return paths;
+           })
+        .value_or(std::set<std::string>());
+}
+
 std::unique_ptr<EventSource> History::source(const std::string& key, const std::string& name) {
     std::uint64_t event = newest();
     try {

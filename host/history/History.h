@@ -41,6 +41,10 @@ public:
     /// The positions of followed logs, as they were stored and as they move.
     const std::shared_ptr<PositionBook>& positions() const noexcept { return m_positions; }
 
+    /// The paths of the logs of which it has events or counts of entries. Empty if it cannot be
+    /// read.
+    std::set<std::string> logs();
+
     /// Begins to store the queue's events, which `format` renders. Their ids follow newest().
     void start(EventQueue& queue, EventJson format);
 

@@ -6,6 +6,8 @@
 #include "host/config/OwnFiles.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
+#include "logs/FollowSettings.h"
+#include "logs/FurtherLogs.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -61,6 +63,26 @@ void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifi
 void Host::findLogs(std::string traceFile) {
     m_traceFile = std::move(traceFile);
     m_logs.begin(m_config.logs, ownFiles(m_config));
+    sayWhatIsReadAgain();
+}
+
+/// The logs that an earlier run monitored as lines of the log configuration have no positions.
+void Host::sayWhatIsReadAgain() const {
+    const auto found = FurtherLogs::published();
+    if (!found || m_history.history == nullptr) {
+        return;
+    }
+    const std::set<std::string> monitored = m_history.history->logs();
+    for (const FurtherLog& log : *found) {
+        const FollowSettings& settings = *log.settings;
+        if (settings.resume && settings.start == FollowSettings::Start::beginning &&
+            !settings.isNewcomer && monitored.contains(log.name) &&
+            !m_history.history->positions()->isStored(log.name)) {
+            say("%s was monitored before, but not as a log of a [[log]] table: start = "
+                "\"beginning\" reads it again, and its entries raise events again",
+                log.name.c_str());
+        }
+    }
 }
 
 LogList::OwnFiles Host::ownFiles(const HostConfig& config) const {

@@ -67,6 +67,7 @@ private:
     void tick(int number);
     void reload();
     void sayNoLogs() const;
+    void sayWhatIsReadAgain() const;
     LogList::OwnFiles ownFiles(const HostConfig& config) const;
     void stop();
     void setState(State state);

@@ -146,6 +146,29 @@ def followed_as(agent, log):
     return answer["logs"][0]["ledger"]["follow"]
 
 
+def test_a_log_that_moves_from_the_log_configuration_begins_where_start_says(agent):
+    log = agent.log("app.log", b"")
+    other = agent.log("other.log", b"")
+    agent.sink = agent.directory / "events"
+    agent.situation()
+    agent.start()
+    for one in (log, other):
+        one.append(syslog_line(f"as a line of it: {one.path.name}"))
+    agent.wait_events(2)
+    assert agent.stop() == 0
+    agent.configure("# none")
+    agent.follow(log, start="beginning")
+    agent.follow(other)
+    agent.start()
+    agent.wait_trace(f"{log} was monitored before, but not as a log of a [[log]] table")
+    assert not agent.trace(f"{other} was monitored before")
+    assert descriptions(agent.wait_events(3))[-1] == "as a line of it: app.log"
+    assert agent.stop() == 0
+    agent.start()  # from here on there is a position
+    agent.wait_open(log)
+    assert not agent.trace("was monitored before")
+
+
 def test_truncations_are_counted(agent):
     agent.listen = "127.0.0.1:0"
     log = followed(agent)

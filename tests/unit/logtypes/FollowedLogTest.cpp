@@ -31,8 +31,8 @@ protected:
     ~FollowedLogTest() override { EventRoomControl::setFull(false); }
 
     std::unique_ptr<SysLogFile> start() {
-        const ValidLog log(FurtherLog{m_path, 'S', 'N', "",
-                                      std::make_shared<const FollowSettings>(m_settings)});
+        const ValidLog log(
+            FurtherLog{m_path, 'S', 'N', "", std::make_shared<const FollowSettings>(m_settings)});
         return std::make_unique<SysLogFile>(log, nullptr);
     }
     static std::vector<std::string> descriptions() {
@@ -68,9 +68,10 @@ TEST_F(FollowedLogTest, AFailureIsTracedOnceAndSoIsItsEnd) {
     EXPECT_TRUE(waitUntil([&] { return trace.messages().size() >= 2; }));
     directory.append("app.log", "one\n");
     EXPECT_EQ(EventRecorder::waitForRows(1).size(), 1U);
-    EXPECT_THAT(trace.messages(),
-                ElementsAre(ContainsRegex("Error while following file .*: open failed and is tried"),
-                            ContainsRegex("File .* is read again.")));
+    EXPECT_THAT(
+        trace.messages(),
+        ElementsAre(ContainsRegex("Error while following file .*: open failed and is tried"),
+                    ContainsRegex("File .* is read again.")));
 }
 
 } // namespace

@@ -22,6 +22,16 @@ using namespace std::chrono_literals;
 using testing::IsEmpty;
 using HistoryTest = HistoryFixture;
 
+TEST_F(HistoryTest, KnowsTheLogsOfItsEventsAndEntries) {
+    open();
+    EXPECT_THAT(history->logs(), IsEmpty());
+    pushAndWait(1);
+    history->addEntries({1, {{"/var/log/quiet.log", 3}}});
+    close();
+    open();
+    EXPECT_THAT(history->logs(), testing::ElementsAre("/var/log/app.log", "/var/log/quiet.log"));
+}
+
 TEST_F(HistoryTest, StoresAndReturnsEvents) {
     open();
     EXPECT_EQ(history->newest(), 0u);
