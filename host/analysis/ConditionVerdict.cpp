@@ -2,9 +2,12 @@
 
 #include "host/config/ConditionBuilder.h"
 #include "host/events/RowText.h"
+#include "host/framework/FieldCondition.h"
 
 #include <algorithm>
 #include <iterator>
+#include <optional>
+#include <string_view>
 #include <utility>
 
 namespace zrm::host {
@@ -21,7 +24,10 @@ std::string quoted(const std::string& text) {
 
 std::string valueOf(const Condition& condition) {
     if (condition.op != INTF_IN) {
-        return condition.isNumber ? std::to_string(condition.number) : quoted(condition.text);
+        if (!condition.isNumber) {
+            return quoted(condition.text);
+        }
+        return condition.isOnField() ? condition.text : std::to_string(condition.number);
     }
     std::string list;
     for (const std::string& value : condition.values) {
@@ -56,8 +62,8 @@ const char* denial(_IntfOper op) {
 } // namespace
 
 std::string ConditionVerdict::textOf(const Condition& condition) {
-    return condition.column + ' ' + std::string(ConditionBuilder::nameOf(condition.op)) + ' ' +
-           valueOf(condition);
+    return ConditionBuilder::written(condition.column) + ' ' +
+           std::string(ConditionBuilder::nameOf(condition.op)) + ' ' + valueOf(condition);
 }
 
 ConditionJudge::ConditionJudge(std::vector<Condition> conditions, const RowLayout& layout)
@@ -77,11 +83,38 @@ std::vector<ConditionVerdict> ConditionJudge::judge(char* row) const {
     return verdicts;
 }
 
+/// Judges a condition on a field, whose value is null if the entry does not have the field.
+void ConditionJudge::judgeField(std::size_t index, ConditionVerdict& verdict) const {
+    const Condition& condition = m_conditions[index];
+    const FieldCondition& onField = *m_compiled[index].onField();
+    const std::string field = ConditionBuilder::written(condition.column);
+    const std::optional<std::string_view> value = onField.value();
+    verdict.holds = onField.holds();
+    if (!value) {
+        verdict.value = nullptr;
+        verdict.refusal = verdict.holds ? "" : "the entry has no " + field;
+        return;
+    }
+    std::string room;
+    const std::string text(RowText::ofLocal(*value, room));
+    verdict.value = text;
+    if (!verdict.holds && condition.isNumber && !FieldNumber::of(*value)) {
+        verdict.refusal = field + ' ' + quoted(text) + " is not a number";
+    } else if (!verdict.holds) {
+        verdict.refusal =
+            field + ' ' + quoted(text) + ' ' + denial(condition.op) + ' ' + valueOf(condition);
+    }
+}
+
 ConditionVerdict ConditionJudge::verdict(std::size_t index, char* row) const {
     const Condition& condition = m_conditions[index];
     ConditionVerdict verdict;
     verdict.condition = ConditionVerdict::textOf(condition);
     const RowColumn* const column = m_layout.find(condition.column);
+    if (m_compiled[index].onField() != nullptr) {
+        judgeField(index, verdict);
+        return verdict;
+    }
     if (column == nullptr) {
         verdict.refusal = "the entry has no column " + condition.column;
         return verdict;

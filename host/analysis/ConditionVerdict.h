@@ -16,8 +16,9 @@ namespace zrm::host {
 
 /// The result of checking one condition against one entry.
 struct ConditionVerdict {
-    std::string condition;                         ///< as operators write it
-    std::variant<std::string, std::int64_t> value; ///< of the column
+    std::string condition; ///< as operators write it
+    /// Of the column or field; null for a field that the entry does not have.
+    std::variant<std::string, std::int64_t, std::nullptr_t> value;
     bool holds = false;
     std::string refusal; ///< "ENTRYDESC 'Accepted' does not contain 'Failed'"; empty when it holds
 
@@ -38,6 +39,7 @@ public:
 
 private:
     ConditionVerdict verdict(std::size_t index, char* row) const;
+    void judgeField(std::size_t index, ConditionVerdict& verdict) const;
 
     const std::vector<Condition> m_conditions;
     const RowLayout& m_layout;

@@ -1,13 +1,17 @@
 #include "host/analysis/Explainer.h"
 
 #include "base/TraceScope.h"
+#include "host/analysis/LineEntry.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/StoredRow.h"
 #include "host/events/RowJson.h"
+#include "host/events/RowText.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <deque>
 #include <optional>
+#include <string_view>
 #include <utility>
 
 namespace zrm::host {
@@ -28,6 +32,16 @@ std::vector<Condition> withoutThresholds(std::vector<Condition> conditions) {
 
 std::string numberOf(long count, const char* one, const char* several) {
     return std::to_string(count) + ' ' + (count == 1 ? one : several);
+}
+
+/// Whether a line, of which a piece is given, may be the entry of an event, which has its text as
+/// far as it is kept.
+bool isSameText(std::string_view line, std::string_view text) {
+    std::string room;
+    line.remove_suffix(line.ends_with('\r') ? 1 : 0);
+    const std::string_view shown = RowText::ofLocal(line, room);
+    const std::size_t length = std::min(shown.size(), text.size());
+    return shown.substr(0, length) == text.substr(0, length);
 }
 
 std::string boundOf(const Replay& replay) {
@@ -88,7 +102,7 @@ Result<std::vector<Explanation>> Explainer::last(LogFile& log, std::size_t numbe
     std::vector<Explanation> explanations;
     explanations.reserve(seen.size());
     for (Seen& entry : seen) {
-        explanations.push_back(describe(entry));
+        explanations.push_back(describe(&log, entry));
     }
     return explanations;
 }
@@ -108,7 +122,7 @@ Result<std::vector<Explanation>> Explainer::line(LogFile& log, std::string_view 
         }
     });
     if (found) {
-        return std::vector{describe(*found)};
+        return std::vector{describe(&log, *found)};
     }
     return nextLine(log, line, matched);
 }
@@ -133,7 +147,7 @@ Result<std::vector<Explanation>> Explainer::nextLine(LogFile& log, std::string_v
                 }
             }
             Seen seen = judge(replay, text, row);
-            explanations.push_back(describe(seen));
+            explanations.push_back(describe(&log, seen));
         });
     if (!whole) {
         return tl::unexpected(whole.error());
@@ -147,8 +161,9 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
     bool isExact = false;
     if (log != nullptr) {
         read(*log, [&](auto line, zrm_rmlogent_data_t* row) {
-            const bool isEntry =
-                row != nullptr && StoredRow::isSameEntry(layout(), *row, entry.row);
+            const bool isEntry = row != nullptr &&
+                                 StoredRow::isSameEntry(layout(), *row, entry.row) &&
+                                 (!line || !entry.text || isSameText(*line, *entry.text));
             Seen seen = judge(m_replay, line, row);
             // Among identical entries, take the one with the same count as the event.
             if (isEntry && !isExact) {
@@ -164,6 +179,9 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
         found.emplace();
         found->isRow = true;
         found->row = entry.row;
+        found->line = entry.text;
+        LineEntry line(log, entry.text ? std::string_view(*entry.text) : "");
+        const LogEntry::Offer offer(line);
         zrm_rmlogent_data_t row = entry.row;
         found->verdict.matches = m_replay.matches(row);
         if (!m_replay.hasThresholds()) {
@@ -174,12 +192,14 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
         }
     }
     found->event = entry.id;
-    return describe(*found);
+    return describe(log, *found);
 }
 
-Explanation Explainer::describe(Seen& seen) {
+Explanation Explainer::describe(const LogFile* log, Seen& seen) {
     Explanation explanation;
     explanation.line = std::move(seen.line);
+    LineEntry entry(log, explanation.line ? std::string_view(*explanation.line) : "");
+    const LogEntry::Offer offer(entry);
     explanation.event = seen.event;
     if (m_replay.hasThresholds()) {
         explanation.window = {

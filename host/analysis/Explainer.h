@@ -37,6 +37,7 @@ public:
         std::uint64_t id;
         bool isOwn; ///< of this same situation: its row has the number of entries counted
         zrm_rmlogent_data_t row;
+        std::optional<std::string> text = std::nullopt; ///< of the entry, if the event has it
     };
 
     /// The table's manager must outlive the object. `isStopped`: the situation is not running.
@@ -67,7 +68,7 @@ private:
     Result<void> read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
                                                              zrm_rmlogent_data_t* row)>& entry);
     Seen judge(Replay& replay, std::optional<std::string_view> line, zrm_rmlogent_data_t* row);
-    Explanation describe(Seen& seen);
+    Explanation describe(const LogFile* log, Seen& seen);
     void decide(Explanation& explanation, const Seen& seen) const;
     Result<std::vector<Explanation>> nextLine(LogFile& log, std::string_view line,
                                               const Stamps& before);

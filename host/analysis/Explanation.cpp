@@ -2,6 +2,8 @@
 
 #include "host/base/JsonWriter.h"
 
+#include <cstddef>
+#include <type_traits>
 #include <variant>
 
 namespace zrm::host {
@@ -10,7 +12,15 @@ namespace {
 
 void write(JsonWriter& json, const ConditionVerdict& verdict) {
     json.beginObject().member("condition", verdict.condition).key("value");
-    std::visit([&](const auto& held) { json.value(held); }, verdict.value);
+    std::visit(
+        [&](const auto& held) {
+            if constexpr (std::is_same_v<decltype(held), const std::nullptr_t&>) {
+                json.null();
+            } else {
+                json.value(held);
+            }
+        },
+        verdict.value);
     json.member("holds", verdict.holds).endObject();
 }
 

@@ -1,6 +1,7 @@
 #include "host/analysis/LogTail.h"
 
 #include "base/TraceScope.h"
+#include "host/analysis/LineEntry.h"
 #include "host/base/JsonWriter.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "logs/RequestThresholds.h"
@@ -137,10 +138,10 @@ void LogTail::pieces(int fd, const Entry& entry) {
     zrm_rmlogent_data_t row;
     std::string line;
     // A busy log that grows meanwhile must not keep this loop from ending.
-    std::size_t read = 0;
-    for (char* piece; read < 2 * longest && (piece = reader.next()) != nullptr;) {
+    std::size_t bytes = 0;
+    for (char* piece; bytes < 2 * longest && (piece = reader.next()) != nullptr;) {
         line = piece; // building the row may change it
-        read += line.size() + 1;
+        bytes += line.size() + 1;
         const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
         if (isRow && m_reach.reached.empty()) {
             note(row);
@@ -148,6 +149,8 @@ void LogTail::pieces(int fd, const Entry& entry) {
         if (line.ends_with('\n')) {
             line.pop_back();
         }
+        LineEntry read(&m_log, line);
+        const LogEntry::Offer offer(read);
         entry(line, isRow ? &row : nullptr);
     }
 }

@@ -38,7 +38,8 @@ public:
     static constexpr std::size_t longestLine = 16 * 1024;   ///< bytes of a line passed to read
 
     /// One entry, oldest first. `line` is none if the log has no lines, `row` null if the line
-    /// yields none; both may be changed and are valid until the function returns.
+    /// yields none; both may be changed and are valid until the function returns. The line is the
+    /// entry of the thread (LogEntry) that long.
     using Entry =
         std::function<void(std::optional<std::string_view> line, zrm_rmlogent_data_t* row)>;
 

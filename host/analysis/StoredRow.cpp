@@ -39,6 +39,13 @@ bool StoredRow::fill(zrm_rmlogent_data_t& row, const RowLayout& layout, std::str
     return true;
 }
 
+std::optional<std::string> StoredRow::entryText(std::string_view event) {
+    const auto document = nlohmann::json::parse(event, nullptr, false);
+    const auto entry = document.is_object() ? document.find("entry") : document.end();
+    return entry != document.end() && entry->is_string() ? std::optional(entry->get<std::string>())
+                                                         : std::nullopt;
+}
+
 bool StoredRow::isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
                             const zrm_rmlogent_data_t& right) {
     const auto* const leftBytes = reinterpret_cast<const char*>(&left);

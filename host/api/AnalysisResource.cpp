@@ -19,6 +19,7 @@
 #include "host/http/Router.h"
 #include "monitor/LogFile.h"
 
+#include <algorithm>
 #include <limits>
 #include <optional>
 #include <utility>
@@ -176,6 +177,7 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     if (!StoredRow::fill(entry.row, explainer.layout(), event->json)) {
         throw RequestRefused(500, "the event has no row", "event");
     }
+    entry.text = StoredRow::entryText(event->json);
     const MonitoredLogs logs;
     std::vector<Explanation> explanations{explainer.event(logs.find(event->log), entry)};
     return {std::move(explanations), explainer.reach(), event->log};
@@ -189,6 +191,12 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     fields.refuseUnknown();
     if (from > to) {
         fields.refuse("to", "is before from");
+    }
+    const auto& conditions = wanted.situation.conditions;
+    if (std::any_of(conditions.begin(), conditions.end(),
+                    [](const Condition& condition) { return condition.isOnField(); })) {
+        fields.refuse("situation", "a backtest cannot judge conditions on fields: explain judges "
+                                   "the newest entries of a log");
     }
     if (!m_room.try_acquire()) {
         throw RequestRefused(503, "two backtests are already running: try again", "");

@@ -90,6 +90,9 @@ Condition readFilter(const ConditionBuilder& builder, const json& filter, const 
         problem.field.insert(0, field + '.');
         throw RequestRefused(400, std::move(problem));
     }
+    if (condition->isOnField()) {
+        refuse("a sample has no fields: name a column", field + ".column");
+    }
     return std::move(*condition);
 }
 

@@ -1,23 +1,24 @@
 #include "host/config/ConditionBuilder.h"
 
+#include "base/EntryFields.h"
 #include "host/base/TimeText.h"
 
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <charconv>
+#include <iterator>
 #include <limits>
 #include <optional>
 #include <utility>
-
-#include <re2/re2.h>
 
 namespace zrm::host {
 
 namespace {
 
-constexpr std::size_t longestPattern = 4096; ///< bytes
-constexpr std::size_t mostValues = 1000;     ///< values in a list
-constexpr std::size_t longestList = 16384;   ///< total bytes of the values of a list
+constexpr std::size_t longestPattern = PatternBudget::longestPattern;
+constexpr std::size_t mostValues = 1000;   ///< values in a list
+constexpr std::size_t longestList = 16384; ///< total bytes of the values of a list
 
 std::string quoted(std::string_view text) {
     return '\'' + std::string(text) + '\'';
@@ -64,44 +65,62 @@ Result<void> checkNumber(std::int64_t number) {
     return {};
 }
 
-/// Checks a regular expression. Compilation stops not far above the largest size: its
-/// memory limit allows a few times as much.
-Result<void> checkRegex(const std::string& value, PatternBudget& budget) {
-    constexpr std::int64_t memory = 512 * 1024;
-    constexpr const char* cure =
-        "repeat less, and write [A-Za-z] or \\w instead of a class of Unicode such as \\pL";
-    if (budget.isSpent()) {
-        return badValue(
-            "the regular expressions before this one already reach the limit for all of them",
-            cure);
+tl::unexpected<Problem> notAnOperator(std::string_view op) {
+    return refused(quoted(op) + " is not an operator",
+                   "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in", "op");
+}
+
+/// Checks that there is a list where the operator takes one, and only there.
+Result<void> checkCount(_IntfOper code, std::string_view op, const ConditionValue& value) {
+    if (value.isList == (code == INTF_IN)) {
+        return {};
     }
-    RE2::Options options(RE2::Quiet);
-    options.set_max_mem(memory);
-    const RE2 pattern(value, options);
-    const std::size_t size =
-        pattern.ok() ? static_cast<std::size_t>(pattern.ProgramSize()) : std::size_t{0};
-    if (size > PatternBudget::ofPattern || pattern.error_code() == RE2::ErrorPatternTooLarge) {
-        budget.spend(PatternBudget::ofPattern);
-        return badValue(quoted(value) + " is too large a regular expression", cure);
+    return value.isList ? badValue(quoted(op) + " takes one value", "use in for a list")
+                        : badValue("in takes a list", "write the values in brackets");
+}
+
+/// Checks the sizes of a list, whose values the condition has.
+Result<void> checkList(const Condition& condition) {
+    std::size_t bytes = 0;
+    for (const std::string& value : condition.values) {
+        bytes += value.size() + 1;
+        if (value.find('\n') != std::string::npos) {
+            return badValue("a value of the list has a line end",
+                            "no column can contain one: remove it");
+        }
     }
-    if (!pattern.ok()) {
-        return badValue(quoted(value) + " is not a regular expression: " + pattern.error(),
-                        "correct it (RE2 syntax)");
+    if (condition.values.empty() || condition.values.size() > mostValues) {
+        return badValue("the list has " + std::to_string(condition.values.size()) + " values",
+                        "write 1 to " + std::to_string(mostValues) + " values");
     }
-    budget.spend(size);
-    if (budget.isExceeded()) {
-        return badValue("together with this one the regular expressions are too large", cure);
+    if (bytes > longestList) {
+        return badValue("the list has " + std::to_string(bytes) + " bytes",
+                        "write at most " + std::to_string(longestList));
     }
     return {};
 }
 
-/// Checks a value of contains, starts or matches.
-Result<void> checkPattern(_IntfOper op, const std::string& value, PatternBudget& budget) {
-    if (value.empty() || value.size() > longestPattern) {
-        return badValue("the value has " + std::to_string(value.size()) + " bytes",
-                        "write 1 to " + std::to_string(longestPattern) + " bytes");
+Result<void> checkFieldName(std::string_view field) {
+    const auto refuse = [](std::string what) {
+        return refused(std::move(what), "write field. and 1 to 255 bytes, without NUL", "column");
+    };
+    if (field.empty()) {
+        return refuse("the field has no name");
     }
-    return op == INTF_MATCHES ? checkRegex(value, budget) : Result<void>();
+    if (field.size() > EntryFields::longestName) {
+        return refuse("the field's name has " + std::to_string(field.size()) + " bytes");
+    }
+    return field.find('\0') == field.npos ? Result<void>() : refuse("the field's name has a NUL");
+}
+
+/// A number as conditions on fields have it.
+std::string numberText(const ConditionValue::Item& item) {
+    if (const auto* const whole = std::get_if<std::int64_t>(&item)) {
+        return std::to_string(*whole);
+    }
+    char text[32];
+    const auto end = std::to_chars(std::begin(text), std::end(text), std::get<double>(item));
+    return {text, end.ptr};
 }
 
 tl::unexpected<Problem> notANumber(const Column& column) {
@@ -157,7 +176,8 @@ std::vector<std::string_view> ConditionBuilder::operatorNames() {
     return names;
 }
 
-ConditionBuilder::ConditionBuilder(std::string_view table) : m_columns(columnsOf(table)) {}
+ConditionBuilder::ConditionBuilder(std::string_view table)
+    : m_columns(columnsOf(table)), m_hasFields(table == "RMLOGENT") {}
 
 Result<const Column*> ConditionBuilder::column(std::string_view name) const {
     if (const Column* const column = findColumn(m_columns, name)) {
@@ -173,12 +193,16 @@ Result<const Column*> ConditionBuilder::column(std::string_view name) const {
     for (const Column& column : m_columns) {
         names += std::string(column.name) + (&column == &m_columns.back() ? "" : ", ");
     }
+    names += m_hasFields ? ", and field.NAME for the fields of entries" : "";
     return unknown("the columns are " + names);
 }
 
 Result<Condition> ConditionBuilder::build(std::string_view columnName, std::string_view op,
                                           const ConditionValue& value,
                                           PatternBudget& budget) const {
+    if (const auto field = fieldOf(columnName); field && m_hasFields) {
+        return onField(*field, op, value, budget);
+    }
     const Result<const Column*> found = column(columnName);
     if (!found) {
         return tl::unexpected(found.error());
@@ -186,18 +210,15 @@ Result<Condition> ConditionBuilder::build(std::string_view columnName, std::stri
     const Column& column = **found;
     const Operator* const known = findOperator(op);
     if (known == nullptr) {
-        return refused(quoted(op) + " is not an operator",
-                       "the operators are =, !=, >=, <=, <, >, contains, starts, matches, in",
-                       "op");
+        return notAnOperator(op);
     }
     if (column.isNumber && !known->forNumbers) {
         return refused(std::string(column.name) + " holds numbers and '" + std::string(op) +
                            "' compares text",
                        "use =, !=, >=, <=, <, > or in", "op");
     }
-    if (value.isList != (known->code == INTF_IN)) {
-        return value.isList ? badValue(quoted(op) + " takes one value", "use in for a list")
-                            : badValue("in takes a list", "write the values in brackets");
+    if (const Result<void> count = checkCount(known->code, op, value); !count) {
+        return tl::unexpected(count.error());
     }
     return known->code == INTF_IN ? several(column, value) : single(column, *known, value, budget);
 }
@@ -222,7 +243,7 @@ Result<Condition> ConditionBuilder::single(const Column& column, const Operator&
         }
         condition.text = std::get<std::string>(item);
         checked = op.forNumbers ? checkWhole(column, condition.text)
-                                : checkPattern(op.code, condition.text, budget);
+                                : budget.check(op.code, condition.text);
     }
     if (!checked) {
         return tl::unexpected(checked.error());
@@ -231,17 +252,12 @@ Result<Condition> ConditionBuilder::single(const Column& column, const Operator&
 }
 
 Result<Condition> ConditionBuilder::several(const Column& column, const ConditionValue& value) {
-    if (value.items.empty() || value.items.size() > mostValues) {
-        return badValue("the list has " + std::to_string(value.items.size()) + " values",
-                        "write 1 to " + std::to_string(mostValues) + " values");
-    }
     Condition condition;
     condition.column = column.name;
     condition.op = INTF_IN;
     condition.isNumber = column.isNumber;
     constexpr Operator equal{"=", INTF_EQUAL, true};
     PatternBudget noPatterns;
-    std::size_t bytes = 0;
     for (const ConditionValue::Item& item : value.items) {
         Result<Condition> one = single(column, equal, {{item}, false}, noPatterns);
         if (!one) {
@@ -249,17 +265,75 @@ Result<Condition> ConditionBuilder::several(const Column& column, const Conditio
         }
         condition.values.push_back(column.isNumber ? std::to_string(one->number)
                                                    : std::move(one->text));
-        bytes += condition.values.back().size() + 1;
-        if (condition.values.back().find('\n') != std::string::npos) {
-            return badValue("a value of the list has a line end",
-                            "no column can contain one: remove it");
-        }
     }
-    if (bytes > longestList) {
-        return badValue("the list has " + std::to_string(bytes) + " bytes",
-                        "write at most " + std::to_string(longestList));
+    if (const Result<void> checked = checkList(condition); !checked) {
+        return tl::unexpected(checked.error());
     }
     return condition;
+}
+
+/// A condition on a field, which holds text and numbers: the value decides.
+Result<Condition> ConditionBuilder::onField(std::string_view field, std::string_view op,
+                                            const ConditionValue& value,
+                                            PatternBudget& budget) const {
+    const Operator* const known = findOperator(op);
+    const auto isText = [](const ConditionValue::Item& item) {
+        return std::holds_alternative<std::string>(item);
+    };
+    Result<void> checked = checkFieldName(field);
+    if (checked && known == nullptr) {
+        return notAnOperator(op);
+    }
+    checked = checked ? checkCount(known->code, op, value) : checked;
+    if (!checked) {
+        return tl::unexpected(checked.error());
+    }
+    Condition condition;
+    condition.column = "field." + std::string(field);
+    condition.op = known->code;
+    condition.isNumber = !value.items.empty() && !isText(value.items.front());
+    if (condition.isNumber && !known->forNumbers) {
+        return badValue(quoted(op) + " compares text", "write the value in quotes");
+    }
+    for (const ConditionValue::Item& item : value.items) {
+        if (isText(item) == condition.isNumber) {
+            return badValue("the list has texts and numbers", "write all of its values in quotes");
+        }
+        condition.values.push_back(isText(item) ? std::get<std::string>(item) : numberText(item));
+    }
+    if (known->code == INTF_IN) {
+        checked = checkList(condition);
+    } else {
+        condition.text = std::move(condition.values.front());
+        condition.values.clear();
+        if (!known->forNumbers) {
+            checked = budget.check(condition.op, condition.text);
+        } else if (condition.text.size() > longestPattern) {
+            checked = badValue("the value has " + std::to_string(condition.text.size()) + " bytes",
+                               "write at most " + std::to_string(longestPattern) + " bytes");
+        }
+    }
+    if (!checked) {
+        return tl::unexpected(checked.error());
+    }
+    return condition;
+}
+
+bool ConditionBuilder::isPlainFieldCharacter(char c) noexcept {
+    constexpr std::string_view others = "=!<>~'\x7f";
+    return static_cast<unsigned char>(c) > ' ' && others.find(c) == others.npos;
+}
+
+std::string ConditionBuilder::written(std::string_view column) {
+    const auto field = fieldOf(column);
+    if (!field || std::all_of(field->begin(), field->end(), &isPlainFieldCharacter)) {
+        return std::string(column);
+    }
+    std::string text = "field.'";
+    for (const char c : *field) {
+        text += c == '\'' ? "''" : std::string(1, c);
+    }
+    return text + '\'';
 }
 
 Result<std::vector<Condition>> ConditionBuilder::ofLog(std::string_view path) {

@@ -3,9 +3,9 @@
 
 #include "host/base/Result.h"
 #include "host/config/Columns.h"
+#include "host/config/PatternBudget.h"
 #include "host/framework/Condition.h"
 
-#include <algorithm>
 #include <array>
 #include <cstddef>
 #include <cstdint>
@@ -17,37 +17,9 @@
 
 namespace zrm::host {
 
-/// Limits the total size of the regular expressions of several conditions, in instructions of their
-/// compiled programs. Each instruction costs microseconds to compile and a few bytes of memory
-/// while the condition is in force, and a pattern of a few bytes can have hundreds of thousands.
-/// Used by one thread.
-class PatternBudget {
-public:
-    static constexpr std::size_t ofPattern = 10'000;
-    static constexpr std::size_t ofSituation = 20'000; ///< also for the filters of one request
-    /// For all situations of the configuration file, and for all those made through the API.
-    static constexpr std::size_t ofSource = 1'000'000;
-
-    explicit PatternBudget(std::size_t most = ofSituation) noexcept : m_most(most) {}
-
-    void spend(std::size_t size) noexcept { m_used += size; }
-    std::size_t used() const noexcept { return m_used; }
-    bool isExceeded() const noexcept { return m_used > m_most; }
-    /// The part of its source's budget that the next situation may use.
-    PatternBudget ofNext() const noexcept {
-        return PatternBudget(isSpent() ? 0 : std::min(m_most - m_used, ofSituation));
-    }
-    /// Whether there is no budget left for another pattern.
-    bool isSpent() const noexcept { return m_used >= m_most; }
-
-private:
-    std::size_t m_most;
-    std::size_t m_used = 0;
-};
-
 /// A value as written by the operator: one text or number, or a list of them.
 struct ConditionValue {
-    using Item = std::variant<std::string, std::int64_t>;
+    using Item = std::variant<std::string, std::int64_t, double>;
     std::vector<Item> items;
     bool isList = false;
 };
@@ -58,9 +30,11 @@ class ConditionBuilder {
 public:
     explicit ConditionBuilder(std::string_view table);
 
-    /// The condition COLUMN OP VALUE. Values of time columns may be ISO 8601 times; the condition
-    /// stores them as 16-character time stamps. Conditions of one situation share a budget for
-    /// their regular expressions. The field of a problem is "column", "op" or "value".
+    /// The condition COLUMN OP VALUE. Instead of a column it may name a field of log entries,
+    /// "field." and the field's name, whose values are texts and numbers. Values of time columns
+    /// may be ISO 8601 times; the condition stores them as 16-character time stamps. Conditions of
+    /// one situation share a budget for their regular expressions. The field of a problem is
+    /// "column", "op" or "value".
     Result<Condition> build(std::string_view column, std::string_view op,
                             const ConditionValue& value, PatternBudget& budget) const;
 
@@ -70,6 +44,11 @@ public:
 
     /// The operator as written in conditions; empty for an unknown code.
     static std::string_view nameOf(_IntfOper op) noexcept;
+
+    /// A column or field as written in conditions.
+    static std::string written(std::string_view column);
+    /// Whether the name of a field needs no quotes in conditions.
+    static bool isPlainFieldCharacter(char c) noexcept;
 
     /// The operators as written in conditions.
     static std::vector<std::string_view> operatorNames();
@@ -82,8 +61,11 @@ private:
     static Result<Condition> single(const Column& column, const Operator& op,
                                     const ConditionValue& value, PatternBudget& budget);
     static Result<Condition> several(const Column& column, const ConditionValue& value);
+    Result<Condition> onField(std::string_view field, std::string_view op,
+                              const ConditionValue& value, PatternBudget& budget) const;
 
     std::span<const Column> m_columns;
+    bool m_hasFields; ///< the table's rows are log entries
 };
 
 } // namespace zrm::host

@@ -52,7 +52,7 @@ tl::unexpected<Problem> badValue(std::string what, std::string cure) {
     return refused(std::move(what), std::move(cure), "value");
 }
 
-Result<ConditionValue::Item> quotedText(Scanner& scanner) {
+Result<std::string> quotedText(Scanner& scanner) {
     std::string text;
     while (!scanner.atEnd()) {
         text += scanner.takeWhile([](char c) { return c != '\''; });
@@ -67,23 +67,33 @@ Result<ConditionValue::Item> quotedText(Scanner& scanner) {
     return badValue("the text has no closing quote", "end it with '");
 }
 
+template <typename Number> bool isNumber(std::string_view word, Number& number) {
+    const auto [end, error] = std::from_chars(word.data(), word.data() + word.size(), number);
+    return error == std::errc() && end == word.data() + word.size();
+}
+
 Result<ConditionValue::Item> item(Scanner& scanner) {
     scanner.skipBlanks();
     if (scanner.take('\'')) {
-        return quotedText(scanner);
+        return quotedText(scanner).map(
+            [](std::string&& text) { return ConditionValue::Item(std::move(text)); });
     }
     const std::string_view word =
         scanner.takeWhile([](char c) { return c != ',' && c != ']' && c != ' ' && c != '\t'; });
-    std::int64_t number = 0;
-    const auto [end, error] = std::from_chars(word.data(), word.data() + word.size(), number);
     if (word.empty()) {
         return badValue("the value is missing", form);
     }
-    if (error != std::errc() || end != word.data() + word.size()) {
-        return badValue("'" + std::string(word) + "' is not a value",
-                        "write text in single quotes and numbers without");
+    std::int64_t whole = 0;
+    double decimal = 0;
+    if (isNumber(word, whole)) {
+        return whole;
     }
-    return number;
+    // The library also reads "inf" and "nan".
+    if (word.find_first_not_of("0123456789.-eE") == word.npos && isNumber(word, decimal)) {
+        return decimal;
+    }
+    return badValue("'" + std::string(word) + "' is not a value",
+                    "write text in single quotes and numbers without");
 }
 
 /// Reads the rest of a list, behind its bracket.
@@ -114,6 +124,22 @@ Result<ConditionValue> single(Scanner& scanner) {
     });
 }
 
+/// Reads the name of a column, or "field." and the name of a field, which may be in quotes.
+Result<std::string> columnName(Scanner& scanner) {
+    std::string name(scanner.takeWhile(isWordCharacter));
+    if (name.empty()) {
+        return refused("the column is missing", form, "column");
+    }
+    if (!scanner.take('.')) {
+        return name;
+    }
+    name += '.';
+    if (!scanner.take('\'')) {
+        return name.append(scanner.takeWhile(&ConditionBuilder::isPlainFieldCharacter));
+    }
+    return quotedText(scanner).map([&](std::string&& field) { return name + field; });
+}
+
 /// Reads a value, behind which nothing may follow.
 Result<ConditionValue> lastValue(Scanner& scanner) {
     Result<ConditionValue> value = scanner.take('[') ? list(scanner) : single(scanner);
@@ -130,9 +156,9 @@ Result<ConditionValue> lastValue(Scanner& scanner) {
 Result<Condition> ConditionParser::parse(std::string_view text, PatternBudget& budget) const {
     Scanner scanner(text);
     scanner.skipBlanks();
-    const std::string_view column = scanner.takeWhile(isWordCharacter);
-    if (column.empty()) {
-        return refused("the column is missing", form, "column");
+    const Result<std::string> column = columnName(scanner);
+    if (!column) {
+        return tl::unexpected(column.error());
     }
     scanner.skipBlanks();
     std::string_view op = scanner.takeWhile(isSign);
@@ -145,10 +171,10 @@ Result<Condition> ConditionParser::parse(std::string_view text, PatternBudget& b
     scanner.skipBlanks();
     const Result<ConditionValue> value = lastValue(scanner);
     if (value) {
-        return m_builder.build(column, op, *value, budget);
+        return m_builder.build(*column, op, *value, budget);
     }
     // A wrong column or operator is a better message than a value that is unreadable because of it.
-    Result<Condition> probe = m_builder.build(column, op, {{std::string("x")}, false}, budget);
+    Result<Condition> probe = m_builder.build(*column, op, {{std::string("x")}, false}, budget);
     if (!probe && probe.error().field != "value") {
         return probe;
     }

@@ -1,5 +1,6 @@
 #include "host/config/LogReader.h"
 
+#include "base/EntryFields.h"
 #include "host/base/TimeText.h"
 #include "host/config/OwnFiles.h"
 #include "host/config/PathPattern.h"
@@ -119,6 +120,7 @@ LogConfig LogReader::read(const toml::table& table) {
     readFollowing(section, log);
     readResumption(section, log);
     readTimezone(section, log);
+    readKeep(section, log);
     section.refuseUnknownKeys();
     return log;
 }
@@ -321,6 +323,51 @@ void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
         section.problem("timezone", "'" + *zone + "' is not a time zone of this machine",
                         "write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
                         "list-timezones lists them)");
+    }
+}
+
+std::vector<std::string> LogReader::namesOfFields(ConfigSection& section,
+                                                  const std::vector<ConfigSection::Text>& names) {
+    std::vector<std::string> fields;
+    if (names.size() > EntryFields::most) {
+        section.problem("keep", "has " + std::to_string(names.size()) + " items",
+                        "write at most " + std::to_string(EntryFields::most) +
+                            ", or [\"*\"] for all fields");
+        return fields;
+    }
+    for (const auto& [name, line] : names) {
+        if (name.empty() || name.size() > EntryFields::longestName) {
+            section.problem(line, "keep", "'" + name + "' is not the name of a field",
+                            "write 1 to " + std::to_string(EntryFields::longestName) + " bytes");
+        } else if (name.starts_with("field.")) {
+            section.problem(line, "keep", "'" + name + "' begins with 'field.'",
+                            "write '" + name.substr(6) + "'");
+        } else {
+            fields.push_back(name);
+        }
+    }
+    return fields;
+}
+
+/// What events have of their entries beside the rows.
+void LogReader::readKeep(ConfigSection& section, LogConfig& log) {
+    if (log.type != 'S') {
+        refuse(section, "keep", log);
+    }
+    if (log.type != 'S' && log.type != 'U') {
+        refuse(section, "entry_bytes", log);
+    }
+    if (const auto names = section.texts("keep")) {
+        log.follow.keep.fields = namesOfFields(section, *names);
+    }
+    constexpr std::int64_t most = EntryKeep::longestText;
+    if (const std::optional<std::int64_t> bytes = section.number("entry_bytes")) {
+        if (*bytes < 0 || *bytes > most) {
+            section.problem("entry_bytes", std::to_string(*bytes) + " is out of bounds",
+                            "write a number from 0 to " + std::to_string(most));
+        } else {
+            log.follow.keep.textBytes = static_cast<std::size_t>(*bytes);
+        }
     }
 }
 

@@ -7,6 +7,7 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 namespace zrm::host {
 
@@ -31,6 +32,9 @@ private:
     void readFollowing(ConfigSection& section, LogConfig& log);
     void readResumption(ConfigSection& section, LogConfig& log);
     void readTimezone(ConfigSection& section, LogConfig& log);
+    void readKeep(ConfigSection& section, LogConfig& log);
+    static std::vector<std::string> namesOfFields(ConfigSection& section,
+                                                  const std::vector<ConfigSection::Text>& names);
 
     const HostConfig& m_config;
     ConfigProblems& m_problems;

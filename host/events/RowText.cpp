@@ -13,27 +13,34 @@ namespace {
 /// No single-byte character needs more bytes in UTF-8, and no longer one needs more per byte.
 constexpr std::size_t maxGrowth = 3;
 
-const LOC2_Locale& codeSetOf(const RowColumn& column) {
+const LOC2_Locale& localCodeSet() {
     const LOC2_Locale* const local = LOC2_GetLocale(0, 0, 0, nullptr);
-    return column.type == COLUMN_UTF8 || local->codePage == 0 ? *CodePages::byNumber(LOC2_UTF8)
-                                                              : *local;
+    return local->codePage == 0 ? *CodePages::byNumber(LOC2_UTF8) : *local;
 }
 
-} // namespace
-
-std::string_view RowText::of(const RowColumn& column, const char* row, std::string& room) {
-    const std::string_view text = column.text(row);
+/// The text as valid UTF-8, as RowText::of gives it.
+std::string_view inUtf8(std::string_view text, bool isUtf8, std::string& room) {
     if (Utf8::validPrefix(text) == text.size()) {
         return text;
     }
     const LOC2_Locale& utf8 = *CodePages::byNumber(LOC2_UTF8);
     room.resize(text.size() * maxGrowth);
     Converted converted =
-        Converter::convert(utf8, room.data(), room.size(), codeSetOf(column), text);
+        Converter::convert(utf8, room.data(), room.size(), isUtf8 ? utf8 : localCodeSet(), text);
     if (!converted.supported) {
         converted = Converter::convert(utf8, room.data(), room.size(), utf8, text);
     }
     return {room.data(), converted.written};
+}
+
+} // namespace
+
+std::string_view RowText::of(const RowColumn& column, const char* row, std::string& room) {
+    return inUtf8(column.text(row), column.type == COLUMN_UTF8, room);
+}
+
+std::string_view RowText::ofLocal(std::string_view text, std::string& room) {
+    return inUtf8(text, false, room);
 }
 
 namespace {

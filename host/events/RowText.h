@@ -16,6 +16,9 @@ public:
     /// in the process's code page, except in columns of type UTF-8; what is valid in neither
     /// becomes U+FFFD.
     static std::string_view of(const RowColumn& column, const char* row, std::string& room);
+
+    /// The same for any text of a log.
+    static std::string_view ofLocal(std::string_view text, std::string& room);
 };
 
 /// The full path of a row's log, for either table. Any thread.

@@ -7,6 +7,8 @@
 #include "host/base/Utf8.h"
 #include "host/framework/ColumnText.h"
 #include "host/framework/Condition.h"
+#include "host/framework/FieldCondition.h"
+#include "host/framework/Operators.h"
 
 #include <algorithm>
 #include <charconv>
@@ -26,31 +28,6 @@ namespace {
 
 TRC1_Anchor anchor{"CompiledCondition.cpp"};
 
-/// True for the six operators that compare by order.
-bool isRelational(_IntfOper op) noexcept {
-    return op >= INTF_EQUAL && op <= INTF_GREATER;
-}
-
-/// Whether the operator holds for two values, given their order: negative if the first is less, 0
-/// if they are equal, positive if it is greater. False for operators that do not compare by order.
-bool compares(_IntfOper op, std::int64_t order) noexcept {
-    switch (op) {
-    case INTF_EQUAL:
-        return order == 0;
-    case INTF_NOT_EQUAL:
-        return order != 0;
-    case INTF_GREATER_OR_EQUAL:
-        return order >= 0;
-    case INTF_LESS_OR_EQUAL:
-        return order <= 0;
-    case INTF_LESS:
-        return order < 0;
-    case INTF_GREATER:
-        return order > 0;
-    }
-    return false;
-}
-
 /// Parses a number: decimal digits with an optional minus sign and nothing else.
 std::optional<std::int64_t> numberOf(std::string_view text) noexcept {
     std::int64_t value = 0;
@@ -61,14 +38,6 @@ std::optional<std::int64_t> numberOf(std::string_view text) noexcept {
     }
     return value;
 }
-
-/// -1, 0 or 1 if the first number is less than, equal to or greater than the second.
-int orderOf(std::int64_t left, std::int64_t right) noexcept {
-    return left < right ? -1 : left > right ? 1 : 0;
-}
-
-/// Memory for a pattern's program and its cached matching states, in bytes.
-constexpr std::int64_t patternMemory = 2 * 1024 * 1024;
 
 /// The columns that name a log. Most situations are for one log, and most rows come from others;
 /// names differ more than directories.
@@ -83,20 +52,6 @@ int logRank(std::string_view column) {
         }
     }
     return 0;
-}
-
-std::string_view textOf(const SEL1_FILTERINFO& filter) {
-    return {filter.value, static_cast<std::size_t>(std::max<int>(filter.valueLength, 0))};
-}
-
-std::vector<std::string_view> linesOf(std::string_view text) {
-    std::vector<std::string_view> lines;
-    for (std::size_t end; (end = text.find('\n')) != std::string_view::npos;) {
-        lines.push_back(text.substr(0, end));
-        text.remove_prefix(end + 1);
-    }
-    lines.push_back(text);
-    return lines;
 }
 
 /// The part of a value that a column of this width can hold.
@@ -117,7 +72,10 @@ bool isByteMatch(const RowColumn& column, std::string_view pattern) {
 
 CompiledCondition::CompiledCondition(const SEL1_FILTERINFO& filter, const RowColumn* column)
     : m_op(filter.compareOperator), m_value(textOf(filter)), m_filter(&filter) {
-    if (column == nullptr) {
+    if (const auto field = fieldOf(filter.columnName); column == nullptr && field) {
+        m_field = std::make_unique<FieldCondition>(*field, filter);
+        m_kind = Kind::FIELD;
+    } else if (column == nullptr) {
         m_kind = Kind::FOREIGN;
     } else {
         m_offset = column->offset;
@@ -181,14 +139,8 @@ void CompiledCondition::compileText(const RowColumn& column) {
 
 void CompiledCondition::compilePattern(const RowColumn& column) {
     TraceScope trace(anchor);
-    re2::RE2::Options options;
-    options.set_log_errors(false);
-    options.set_max_mem(patternMemory);
-    if (isByteMatch(column, m_value)) {
-        options.set_encoding(re2::RE2::Options::EncodingLatin1);
-    }
-    m_pattern =
-        std::make_unique<re2::RE2>(re2::StringPiece(m_value.data(), m_value.size()), options);
+    m_pattern = compiledPattern(m_value, isByteMatch(column, m_value) ? PatternText::bytes
+                                                                      : PatternText::utf8);
     if (m_pattern->ok()) {
         m_kind = Kind::MATCHES;
     } else {
@@ -216,7 +168,7 @@ bool CompiledCondition::holds(ctreq* request, char* row) const {
         return false;
     case Kind::INTEGER:
         std::memcpy(&number, field, sizeof number);
-        return compares(m_op, orderOf(number, m_number));
+        return compares(m_op, orderOf<std::int64_t>(number, m_number));
     case Kind::INTEGER_IN:
         std::memcpy(&number, field, sizeof number);
         return std::find(m_numbers.begin(), m_numbers.end(), number) != m_numbers.end();
@@ -232,6 +184,8 @@ bool CompiledCondition::holds(ctreq* request, char* row) const {
         return contains(field);
     case Kind::MATCHES:
         return matches(field);
+    case Kind::FIELD:
+        return m_field->holds();
     case Kind::FOREIGN:
         return request->ColumnIsException(row, const_cast<char*>(m_filter->columnName), m_op,
                                           const_cast<char*>(m_filter->value)) != 0;

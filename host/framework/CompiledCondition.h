@@ -18,6 +18,8 @@ class ctreq;
 
 namespace zrm::host {
 
+class FieldCondition;
+
 /// One condition prepared for evaluation: column found, numbers parsed, pattern compiled. A column
 /// is compared without its padding; a value longer than the column is cut to the column's width
 /// when compared by order, since that is all the column can hold. An invalid condition (no number
@@ -25,8 +27,8 @@ namespace zrm::host {
 /// nor allocates, except in RE2 for patterns.
 class CompiledCondition {
 public:
-    /// `column` is null for a column that the table does not describe: then the table itself
-    /// evaluates it. The filter's texts must outlive the object.
+    /// `column` is null for a field, and for a column that the table does not describe: then the
+    /// table itself evaluates it. The filter's texts must outlive the object.
     CompiledCondition(const SEL1_FILTERINFO& filter, const RowColumn* column);
     CompiledCondition(CompiledCondition&&) noexcept;
     CompiledCondition& operator=(CompiledCondition&&) noexcept;
@@ -38,6 +40,9 @@ public:
     /// The same for a condition with isOnText(), given the text of its column in that row
     /// (ColumnText::unpadded).
     bool holdsFor(const char* row, std::string_view text) const noexcept;
+
+    /// For a condition on a field; null for any other.
+    const FieldCondition* onField() const noexcept { return m_field.get(); }
 
     /// True for a condition on a column that names a log: its result is the same for all rows of
     /// that log.
@@ -65,6 +70,7 @@ private:
         TEXT_IN,
         STARTS,
         CONTAINS,
+        FIELD, ///< may have to read the entry's fields, but once for all conditions
         MATCHES,
         FOREIGN,
     };
@@ -88,9 +94,10 @@ private:
     std::size_t m_width = 0;
     std::string_view m_value;
     std::int64_t m_number = 0;
-    std::vector<std::int64_t> m_numbers;    ///< of INTEGER_IN
-    std::vector<std::string_view> m_values; ///< of TEXT_IN
-    std::unique_ptr<re2::RE2> m_pattern;    ///< of MATCHES
+    std::vector<std::int64_t> m_numbers;     ///< of INTEGER_IN
+    std::vector<std::string_view> m_values;  ///< of TEXT_IN
+    std::unique_ptr<re2::RE2> m_pattern;     ///< of MATCHES
+    std::unique_ptr<FieldCondition> m_field; ///< of FIELD
     const SEL1_FILTERINFO* m_filter;
 };
 

@@ -28,9 +28,16 @@ std::string joined(const std::vector<std::string>& values) {
     return result;
 }
 
+std::int16_t typeOf(const Condition& condition) {
+    if (condition.isNumber && condition.isOnField()) {
+        return SEL1_DECIMAL;
+    }
+    return condition.isNumber && condition.op != INTF_IN ? SEL1_INTEGER : SEL1_CHARACTER;
+}
+
 /// The bytes that a condition compares; a text ends at its first NUL.
 std::string valueOf(const Condition& condition) {
-    if (condition.isNumber && condition.op != INTF_IN) {
+    if (typeOf(condition) == SEL1_INTEGER) {
         return numberValue(condition.number);
     }
     std::string value = condition.op == INTF_IN ? joined(condition.values) : condition.text;
@@ -49,9 +56,8 @@ FilterList::FilterList(const std::vector<Condition>& conditions) {
         const auto length = static_cast<std::int16_t>(value.size());
         // Padded with NULs: ColumnIsException gets a value without its length.
         value.resize(std::max(value.size(), readable));
-        const bool isNumber = condition.isNumber && condition.op != INTF_IN;
-        m_filters.push_back({condition.column.c_str(), condition.op,
-                             isNumber ? SEL1_INTEGER : SEL1_CHARACTER, length, value.c_str()});
+        m_filters.push_back(
+            {condition.column.c_str(), condition.op, typeOf(condition), length, value.c_str()});
     }
 }
 

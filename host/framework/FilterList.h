@@ -11,6 +11,8 @@ namespace zrm::host {
 
 /// Data type of text filter values.
 inline constexpr std::int16_t SEL1_CHARACTER = 452;
+/// Data type of the numbers that fields are compared with: decimal text.
+inline constexpr std::int16_t SEL1_DECIMAL = 484;
 
 /// A request's conditions in the form that the agent reads. A number is published as 8 bytes in
 /// host order. A text is published without padding, followed by a NUL; 16 bytes are readable

@@ -1,6 +1,8 @@
 #ifndef ZRM_FOLLOW_SETTINGS_H
 #define ZRM_FOLLOW_SETTINGS_H
 
+#include "framework/LogEntry.h"
+
 #include <chrono>
 #include <cstdint>
 #include <string>
@@ -42,6 +44,7 @@ struct FollowSettings {
     /// What times without a zone mean, as a name of the time zone database. Empty: local time.
     std::string timezone;
     std::vector<ZoneOffset> zone; ///< the offsets of `timezone`, oldest first
+    EntryKeep keep;               ///< in events
 
     /// Logs of equal settings need no new monitor.
     bool operator==(const FollowSettings&) const = default;

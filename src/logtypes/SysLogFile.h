@@ -34,6 +34,8 @@ public:
     /// Always returns 0. A line that does not begin with a month leaves the entry columns blank.
     long formatEntryAsRow(char* line, void* row, void* reportState) override;
     void processLogData() override;
+    /// See SyslogFields.
+    void readFields(std::string_view text, EntryFields& fields) const override;
 
 protected:
     /// Creates a log that is not monitored and starts no thread. Used to try out lines.

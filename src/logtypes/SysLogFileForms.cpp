@@ -7,6 +7,7 @@
 #include "logs/FollowSettings.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
+#include "logtypes/SyslogFields.h"
 #include "logtypes/SyslogForms.h"
 
 #include <algorithm>
@@ -75,6 +76,10 @@ void SysLogFile::writeFollowedTime(char* out, const SyslogTime& time, void* repo
     if (ZoneTime::writeStamp(seconds, out) && report != nullptr) {
         std::memcpy(report->timestamp, out, stampLength);
     }
+}
+
+void SysLogFile::readFields(std::string_view text, EntryFields& fields) const {
+    SyslogFields::read(text, fields);
 }
 
 char* SysLogFile::formatFollowedTime(char* out, char* line, void* reportState) const {

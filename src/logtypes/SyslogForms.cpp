@@ -177,16 +177,26 @@ SyslogParts splitRfc5424(std::string_view text) {
     parts.host = takeField(text);
     parts.source = takeField(text);
     parts.processId = takeField(text);
-    takeField(text); // MSGID
-    const std::string_view data = takeStructuredData(text);
+    parts.messageId = takeField(text);
+    parts.data = takeStructuredData(text);
     if (text.starts_with(byteOrderMark)) {
         text.remove_prefix(byteOrderMark.size());
     }
-    parts.description = text.empty() ? data : text;
+    parts.description = text.empty() ? parts.data : text;
     return parts;
 }
 
 } // namespace
+
+std::optional<unsigned> SyslogForms::priority(std::string_view line) noexcept {
+    constexpr unsigned mostPriority = 191;
+    unsigned number = 0;
+    for (std::size_t at = 1; at + 1 < priorityLength(line); ++at) {
+        number = number * 10 + static_cast<unsigned>(line[at] - '0');
+    }
+    return priorityLength(line) > 0 && number <= mostPriority ? std::optional(number)
+                                                              : std::nullopt;
+}
 
 SyslogTime SyslogForms::recognise(std::string_view line) noexcept {
     SyslogTime time;

@@ -32,6 +32,8 @@ struct SyslogParts {
     std::string_view host = "";
     std::string_view source = "";    ///< of RFC 5424: APP-NAME[PROCID]
     std::string_view processId = ""; ///< of RFC 5424; the source is then APP-NAME alone
+    std::string_view messageId = ""; ///< of RFC 5424
+    std::string_view data = "";      ///< of RFC 5424: the structured data
     std::string_view description = "";
 };
 
@@ -44,6 +46,9 @@ SyslogTime recognise(std::string_view line) noexcept;
 
 /// The rest of a line whose beginning was recognised. A line that was not is all description.
 SyslogParts split(std::string_view line, const SyslogTime& time) noexcept;
+
+/// The number in the line's "<PRI>": facility * 8 + severity. None if it has none, or no valid one.
+std::optional<unsigned> priority(std::string_view line) noexcept;
 
 /// The year of a time without one: the one that brings it nearest to, but at most a day behind,
 /// the reference.

@@ -1,5 +1,7 @@
 #include "monitor/EntryBlock.h"
 
+#include "framework/LogEntry.h"
+
 #include <algorithm>
 #include <array>
 #include <cerrno>
@@ -11,7 +13,10 @@ namespace zrm {
 namespace {
 
 constexpr std::size_t blockSize = 256 * 1024;
-constexpr std::size_t longestText = 2046; ///< of a line, without its newline
+constexpr std::size_t longestLine = 2046; ///< as it is given, without its newline
+constexpr std::size_t longestText = EntryKeep::longestText;
+
+static_assert(longestText + 2 * Tail::size < blockSize); // an unfinished line leaves room to read
 
 } // namespace
 
@@ -22,12 +27,13 @@ void EntryBlock::start(std::int64_t offset, const Tail& tail) noexcept {
     m_isTailAside = true;
     m_isInLongLine = false;
     m_isTerminated = false;
+    setText(nullptr, 0);
 }
 
 bool EntryBlock::allocate() noexcept {
     if (!m_block) {
-        // Behind the block there is room for a terminator and for a long line.
-        m_block.reset(new (std::nothrow) char[blockSize + 1 + longestText + 2]);
+        // Behind the block there is room for a terminator, for a long line and for its text.
+        m_block.reset(new (std::nothrow) char[blockSize + 1 + longestLine + 2 + longestText]);
         if (!m_block) {
             errno = ENOMEM;
             return false;
@@ -38,6 +44,25 @@ bool EntryBlock::allocate() noexcept {
 
 char* EntryBlock::longLine() const noexcept {
     return m_block.get() + blockSize + 1;
+}
+
+char* EntryBlock::longText() const noexcept {
+    return longLine() + longestLine + 2;
+}
+
+std::string_view EntryBlock::text() const noexcept {
+    std::string_view text(m_text, std::min(m_textLength, longestText));
+    text.remove_suffix(!isTextCut() && text.ends_with('\r') ? 1 : 0);
+    return text;
+}
+
+bool EntryBlock::isTextCut() const noexcept {
+    return m_textLength > longestText;
+}
+
+void EntryBlock::setText(const char* text, std::size_t length) noexcept {
+    m_text = text;
+    m_textLength = length;
 }
 
 void EntryBlock::restore() noexcept {
@@ -107,9 +132,10 @@ char* EntryBlock::next() noexcept {
     if (const void* const newline = std::memchr(line, '\n', available)) {
         const auto length = static_cast<std::size_t>(static_cast<const char*>(newline) - line);
         m_begin += length + 1;
-        if (length > longestText) {
-            std::memcpy(longLine(), line, longestText);
-            return endLong(longestText, true);
+        setText(line, length);
+        if (length > longestLine) {
+            std::memcpy(longLine(), line, longestLine);
+            return endLong(longestLine, true);
         }
         m_behind = m_block[m_begin];
         m_block[m_begin] = '\0';
@@ -120,7 +146,8 @@ char* EntryBlock::next() noexcept {
         m_longLineBegin = offset();
         m_tail = tail();
         m_isTailAside = true;
-        std::memcpy(longLine(), line, longestText);
+        std::memcpy(longLine(), line, longestLine);
+        std::memcpy(longText(), line, longestText);
         m_isInLongLine = true;
         m_begin = m_end;
     }
@@ -133,6 +160,7 @@ char* EntryBlock::nextRecord() noexcept {
     }
     char* const record = m_block.get() + m_begin;
     m_begin += m_recordLength;
+    setText(nullptr, 0);
     return record;
 }
 
@@ -147,7 +175,8 @@ char* EntryBlock::restOfLongLine() noexcept {
         return nullptr;
     }
     m_begin += static_cast<std::size_t>(static_cast<const char*>(newline) - text) + 1;
-    return endLong(longestText, true);
+    setText(longText(), longestText + 1);
+    return endLong(longestLine, true);
 }
 
 /// Ends the line that stands behind the block.
@@ -167,15 +196,18 @@ char* EntryBlock::rest() noexcept {
     const std::size_t length = m_end - m_begin;
     if (m_isInLongLine) {
         m_begin = m_end;
-        return endLong(longestText, true);
+        setText(longText(), longestText + 1);
+        return endLong(longestLine, true);
     }
     if (length == 0 || m_recordLength != 0) {
         m_begin = m_end;
         return nullptr;
     }
-    std::memcpy(longLine(), m_block.get() + m_begin, length);
+    const std::size_t given = std::min(length, longestLine);
+    setText(m_block.get() + m_begin, length);
+    std::memcpy(longLine(), m_text, given);
     m_begin = m_end;
-    return endLong(length, false);
+    return endLong(given, given < length);
 }
 
 bool EntryBlock::takeBack() noexcept {

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <string_view>
 
 namespace zrm {
 
@@ -45,6 +46,12 @@ public:
     /// of a line that is too long to be read again.
     void release() noexcept;
 
+    /// The text of the last entry in full, without its line end; the first EntryKeep::longestText
+    /// bytes of a longer one. Empty for a record. Valid as long as the entry.
+    std::string_view text() const noexcept;
+    /// True if the last entry is longer than its text.
+    bool isTextCut() const noexcept;
+
     /// Where the next entry begins.
     std::int64_t offset() const noexcept;
     /// The bytes before that.
@@ -64,6 +71,8 @@ private:
     char* restOfLongLine() noexcept;
     char* endLong(std::size_t length, bool isCut) noexcept;
     char* longLine() const noexcept;
+    char* longText() const noexcept;
+    void setText(const char* text, std::size_t length) noexcept;
 
     const std::size_t m_recordLength;
     std::unique_ptr<char[]> m_block;
@@ -78,6 +87,8 @@ private:
     bool m_isTerminated = false; ///< m_behind is to be put back at m_begin
     char m_behind = '\0';
     bool m_isCut = false;
+    const char* m_text = nullptr; ///< of the last entry, m_textLength bytes as far as they are kept
+    std::size_t m_textLength = 0;
 };
 
 } // namespace zrm

@@ -14,6 +14,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -56,6 +57,9 @@ public:
     /// Takes back the entry that next has just given, so that the position is before it. False if
     /// it cannot.
     bool takeBack() noexcept;
+    /// The text of the last entry, and whether the entry is longer, as EntryBlock gives them.
+    std::string_view text() const noexcept { return m_block.text(); }
+    bool isTextCut() const noexcept { return m_block.isTextCut(); }
     /// Behind the last entry. None before a file has been opened.
     std::optional<LogPosition> position() const noexcept;
     /// How many bytes were read since the last call.

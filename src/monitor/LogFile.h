@@ -15,13 +15,16 @@
 #include <cstdint>
 #include <cstdio>
 #include <ctime>
+#include <string_view>
 
 #include <pthread.h>
 #include <sys/time.h>
 
 namespace zrm {
 
+class EntryFields;
 class FileFollower;
+class FollowedEntry;
 class FollowLedger;
 class LogPositions;
 class ValidLog;
@@ -88,6 +91,10 @@ public:
     /// Judges one entry as the log's thread does: counts it and offers its row. False if the log
     /// has to end or the process is ending before the row could be offered.
     virtual bool deliverEntry(char* entry);
+
+    /// Adds the fields of an entry, given its text (see LogEntry). A kind of log whose entries have
+    /// no fields adds none. The fields are views into the text. Any thread.
+    virtual void readFields(std::string_view text, EntryFields& fields) const;
 
     void startThread();
     /// Asks a running monitor to end, so that stopThread waits less: each thread checks its status
@@ -185,7 +192,7 @@ private:
     static void fillChangingColumns(zrm_rmlogent_data_t* row);
     bool checkForChange();
     bool readGrowth();
-    bool readEntries(FileFollower& follower, LogPositions& positions);
+    bool readEntries(FileFollower& follower, LogPositions& positions, FollowedEntry& current);
     void noteFollowed(FileFollower& follower, LogPositions& positions);
     void noteFollowFailure();
     void noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind);

@@ -5,6 +5,7 @@
 #include "framework/LogPositions.h"
 #include "logs/FollowSettings.h"
 #include "monitor/FileFollower.h"
+#include "monitor/FollowedEntry.h"
 
 #include <sys/select.h>
 
@@ -58,6 +59,8 @@ void LogFile::followLog(std::size_t recordLength) {
     const FollowSettings& settings = *followSettings();
     FileFollower follower(fileNameLocal(), optionsFor(settings, recordLength), *m_followLedger);
     LogPositions positions(fileNameUTF8());
+    FollowedEntry current(*this, follower);
+    const LogEntry::Offer offer(current);
     const auto stored = settings.resume ? positions.stored() : std::nullopt;
     if (stored) {
         follower.resumeAt(*stored);
@@ -69,7 +72,7 @@ void LogFile::followLog(std::size_t recordLength) {
         m_pulse.work("looks at the log");
         if (follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read
-            if (!readEntries(follower, positions)) {
+            if (!readEntries(follower, positions, current)) {
                 // Who follows the log next judges this entry, and none of those before it again.
                 if (follower.takeBack()) {
                     noteFollowed(follower, positions);
@@ -91,13 +94,14 @@ void LogFile::followLog(std::size_t recordLength) {
 
 /// Judges what there is to read. False if the log has to end before an entry was judged, which then
 /// is not behind the position.
-bool LogFile::readEntries(FileFollower& follower, LogPositions& positions) {
+bool LogFile::readEntries(FileFollower& follower, LogPositions& positions, FollowedEntry& current) {
     TraceScope trace(anchor);
     m_pulse.work("reads the log");
     const std::int64_t entriesBefore = numEvents();
     auto noted = std::chrono::steady_clock::now();
     bool isJudged = true;
     for (unsigned entries = 1; char* const entry = follower.next(); ++entries) {
+        current.begin();
         positions.beginEntry();
         isJudged = !isReadingOver() && deliverEntry(entry);
         if (!isJudged) {
@@ -117,6 +121,8 @@ bool LogFile::readEntries(FileFollower& follower, LogPositions& positions) {
     }
     return trace.result(isJudged);
 }
+
+void LogFile::readFields(std::string_view /*text*/, EntryFields& /*fields*/) const {}
 
 /// Records how far the log was read.
 void LogFile::noteFollowed(FileFollower& follower, LogPositions& positions) {

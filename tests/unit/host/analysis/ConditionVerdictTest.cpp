@@ -40,7 +40,8 @@ TEST_F(ConditionVerdictTest, WritesConditionsAsTheyAreRead) {
          {"ENTRYSRC = 'sshd'", "ENTRYSRC != ''", "ENTRYSRC >= 'a'", "ENTRYSRC <= 'a'",
           "ENTRYSRC < 'a'", "ENTRYSRC > 'a'", "ENTRYDESC contains 'it''s'", "ENTRYDESC starts ' x'",
           "ENTRYDESC matches '^a\\d+$'", "ENTRYSRC in ['a', 'b''c', '']", "SAMPLENO = -5",
-          "SAMPLENO in [1, 2]"}) {
+          "SAMPLENO in [1, 2]", "field.status >= 500", "field.time > 1.5", "field.user = '7'",
+          "field.'odd ''name' != 'x'", "field.status in [500, 1.5]"}) {
         EXPECT_EQ(ConditionVerdict::textOf(parsed(text)), text);
         EXPECT_EQ(parsed(ConditionVerdict::textOf(parsed(text))), parsed(text));
     }

@@ -22,6 +22,11 @@ Condition parsed(const std::string& text, const char* table = "RMLOGENT") {
     return *result;
 }
 
+Problem problem(const std::string& text, const char* table = "RMLOGENT") {
+    const auto result = ConditionParser(table).parse(text);
+    return result ? Problem{"accepted"} : result.error();
+}
+
 std::string refused(const std::string& text, const char* table = "RMLOGENT") {
     const auto result = ConditionParser(table).parse(text);
     return result ? "accepted" : reasonOf(result);
@@ -70,6 +75,50 @@ TEST(ConditionParser, ReadsLists) {
     EXPECT_THAT(numbers.values, ElementsAre("1", "-2"));
 }
 
+TEST(ConditionParser, ReadsFields) {
+    const Condition text = parsed("field.user = 'root'");
+    EXPECT_EQ(text.column, "field.user");
+    EXPECT_EQ(text.text, "root");
+    EXPECT_FALSE(text.isNumber);
+    const Condition number = parsed("field.request_time>1.5");
+    EXPECT_EQ(number.column, "field.request_time");
+    EXPECT_EQ(number.op, INTF_GREATER);
+    EXPECT_EQ(number.text, "1.5");
+    EXPECT_TRUE(number.isNumber);
+    EXPECT_EQ(parsed("field.status != -7").text, "-7");
+    EXPECT_EQ(parsed("field.big < 1e300").text, "1e+300");
+    EXPECT_EQ(parsed("field.user matches '^r'").op, INTF_MATCHES);
+    const Condition list = parsed("field.status in [500, 502.5]");
+    EXPECT_TRUE(list.isNumber);
+    EXPECT_THAT(list.values, ElementsAre("500", "502.5"));
+    EXPECT_THAT(parsed("field.user in ['a', '7']").values, ElementsAre("a", "7"));
+}
+
+TEST(ConditionParser, NamesOfFieldsAreAnyText) {
+    EXPECT_EQ(parsed("field.origin@32473.ip = ''").column, "field.origin@32473.ip");
+    EXPECT_EQ(parsed("field.a/b[0]:c\xc3\xbc contains 'x'").column, "field.a/b[0]:c\xc3\xbc");
+    EXPECT_EQ(parsed("field.'an odd ''name'' =1' = 2").column, "field.an odd 'name' =1");
+}
+
+TEST(ConditionParser, RefusesWhatAFieldCannotBeComparedWith) {
+    EXPECT_EQ(problem("field. = 1").field, "column");
+    EXPECT_EQ(problem("field.'' = 1").field, "column");
+    EXPECT_EQ(problem("field.'open = 1").field, "value");
+    EXPECT_EQ(problem("field." + std::string(256, 'x') + " = 1").field, "column");
+    EXPECT_EQ(problem("field.x is 1").field, "op");
+    EXPECT_EQ(problem("field.x contains 5").what, "'contains' compares text");
+    EXPECT_EQ(problem("field.x in ['a', 5]").what, "the list has texts and numbers");
+    EXPECT_EQ(problem("field.x in [5, 'a']").what, "the list has texts and numbers");
+    EXPECT_EQ(problem("field.x in []").what, "the list has 0 values");
+    EXPECT_EQ(problem("field.x = [1]").field, "value");
+    EXPECT_EQ(problem("field.x > abc").field, "value");
+    EXPECT_EQ(problem("field.x > inf").field, "value");
+    EXPECT_EQ(problem("field.x matches '('").field, "value");
+    EXPECT_EQ(problem("field.x = '" + std::string(4097, 'x') + "'").field, "value");
+    EXPECT_EQ(problem("FIELD.x = 1").field, "column");
+    EXPECT_EQ(problem("field.x = 1", "RMMONLOG").field, "column");
+}
+
 TEST(ConditionParser, TimesBecomeTimeStamps) {
     EXPECT_EQ(parsed("ENTRYTIME >= '2026-11-20T07:03:09'").text, "1261120070309000");
     EXPECT_EQ(parsed("ENTRYTIME >= '1261120070309000'").text, "1261120070309000");
@@ -85,7 +134,8 @@ TEST(ConditionParser, RefusesUnknownColumns) {
     EXPECT_EQ(refused("ENTRYSOURCE = 'a'"),
               "'ENTRYSOURCE' is not a column; the columns are ORIGINNODE, LOGPATH, LOGNAME, "
               "ENTRYTIME, ENTRYSYS, ENTRYSRC, ENTRYTYPE, ENTRYCLASS, ENTRYDESC, FREQTHRESH, "
-              "PERIODTHRS, TIMESTAMP, SAMPLENO, ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, UENTRYDESC");
+              "PERIODTHRS, TIMESTAMP, SAMPLENO, ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, "
+              "UENTRYDESC, and field.NAME for the fields of entries");
     EXPECT_EQ(refused("entrysrc = 'a'"),
               "'entrysrc' is not a column; write it in upper case: ENTRYSRC");
     // The columns of one table are not those of the other.
@@ -119,8 +169,7 @@ TEST(ConditionParser, RefusesMalformedValues) {
     EXPECT_EQ(refused("LOGSIZE = 5k", "RMMONLOG"),
               "'5k' is not a value; write text in single quotes and numbers without");
     EXPECT_EQ(refused("LOGSIZE = 99999999999999999999", "RMMONLOG"),
-              "'99999999999999999999' is not a value; write text in single quotes and numbers "
-              "without");
+              "LOGSIZE holds numbers; write the value as a whole number without quotes");
     EXPECT_EQ(refused("ENTRYSRC in ['a' 'b']"), "the list has no end; end it with ]");
     EXPECT_EQ(refused("ENTRYSRC in ['a'"), "the list has no end; end it with ]");
     EXPECT_EQ(refused("ENTRYSRC = 'a' and ENTRYDESC = 'b'"),

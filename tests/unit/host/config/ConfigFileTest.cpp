@@ -292,7 +292,8 @@ period = "60"
             "zrm.toml:5: situation.when: in \"ENTRYSOURCE = 'x'\": 'ENTRYSOURCE' is not a column; "
             "the columns are ORIGINNODE, LOGPATH, LOGNAME, ENTRYTIME, ENTRYSYS, ENTRYSRC, "
             "ENTRYTYPE, ENTRYCLASS, ENTRYDESC, FREQTHRESH, PERIODTHRS, TIMESTAMP, SAMPLENO, "
-            "ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, UENTRYDESC",
+            "ROWNO, ULOGPATH, ULOGNAME, UENTRYSRC, UENTRYDESC, and field.NAME for the fields of "
+            "entries",
             "zrm.toml:6: situation.when: in \"ENTRYSRC is 'x'\": 'is' is not an operator; the "
             "operators are =, !=, >=, <=, <, >, contains, starts, matches, in",
             "zrm.toml:7: situation.when: in \"ENTRYSRC = 5\": ENTRYSRC holds text; write the "

@@ -40,6 +40,34 @@ TEST(LogReader, APathAloneIsASyslogFileFollowedByName) {
     EXPECT_EQ(logs[0].follow.rotateWait, std::chrono::seconds(2));
 }
 
+TEST(LogReader, ReadsWhatEventsKeepOfTheirEntries) {
+    const EntryKeep usual = accepted("[[log]]\npath = '/a'\n")[0].follow.keep;
+    EXPECT_EQ(usual.fields, std::nullopt);
+    EXPECT_EQ(usual.textBytes, 65536U);
+    const EntryKeep keep =
+        accepted("[[log]]\npath = '/a'\nkeep = ['user', '*']\nentry_bytes = 0\n")[0].follow.keep;
+    EXPECT_EQ(keep.fields, (std::vector<std::string>{"user", "*"}));
+    EXPECT_EQ(keep.textBytes, 0U);
+    EXPECT_EQ(accepted("[[log]]\npath = '/a'\nkeep = []\n")[0].follow.keep.fields,
+              std::vector<std::string>{});
+}
+
+TEST(LogReader, RefusesWhatEventsCannotKeep) {
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\nkeep = ['', 'field.user']\nentry_bytes = 65537\n"),
+                ElementsAre("zrm.toml:3: log.keep: '' is not the name of a field; write 1 to 255 "
+                            "bytes",
+                            "zrm.toml:3: log.keep: 'field.user' begins with 'field.'; write 'user'",
+                            "zrm.toml:4: log.entry_bytes: 65537 is out of bounds; write a number "
+                            "from 0 to 65536"));
+    EXPECT_EQ(
+        refused("[[log]]\npath = '/a'\ntype = 'accounting'\nkeep = 'a'\nentry_bytes = 1\n").size(),
+        2U);
+    EXPECT_EQ(refused("[[log]]\npath = '/a'\ntype = 'text'\nkeep = 'a'\nformat = "
+                      "'A,\"%d %255[^\\n]\" , year description'\n")
+                  .size(),
+              1U);
+}
+
 TEST(LogReader, ReadsEverythingThatATableMaySay) {
     const std::vector<LogConfig> logs = accepted(R"(
 [[log]]
@@ -172,7 +200,7 @@ rotated_to = ""
                             "begin a path with '/', or write a file name without any '/'",
                             "zrm.toml:9: log.entry: unknown key; the keys here are type, exclude, "
                             "path, format, debug, follow, start, rotate_wait, rotated_to, resume, "
-                            "timezone",
+                            "timezone, keep, entry_bytes",
                             "zrm.toml:10: log.rotated_to: is not a directory; write the directory "
                             "to which rotation moves older files, for example \"/var/log/old\""));
 }

@@ -1,0 +1,64 @@
+#ifndef ZRM_ENTRY_FIELDS_H
+#define ZRM_ENTRY_FIELDS_H
+
+#include <cstddef>
+#include <memory>
+#include <optional>
+#include <span>
+#include <string_view>
+#include <vector>
+
+namespace zrm {
+
+/// The fields of one entry: flat names and text values. Reused from entry to entry; after the first
+/// entries it allocates nothing. Names and values are views into the entry's text or into memory of
+/// the object, valid until clear(). Bounded in number and bytes, whatever an entry contains. One
+/// thread.
+class EntryFields {
+public:
+    struct Field {
+        std::string_view name;
+        std::string_view value;
+    };
+
+    static constexpr std::size_t most = 256;        ///< fields of an entry
+    static constexpr std::size_t longestName = 255; ///< bytes
+    static constexpr std::size_t room = 64 * 1024;  ///< bytes for texts that are built
+
+    /// Forgets all fields.
+    void clear() noexcept;
+
+    /// Adds a field. Both texts must stay valid until clear(). Of several fields of one name the
+    /// first counts. A field without a name, with too long a name, or beyond the most is left out.
+    void add(std::string_view name, std::string_view value) noexcept;
+
+    /// Appends to a text that is built in the object's memory.
+    EntryFields& append(std::string_view part) noexcept;
+    /// Ends that text. None if there was no room for all of it.
+    std::optional<std::string_view> takeText() noexcept;
+
+    /// The value of the field with this name; null if the entry has none.
+    const std::string_view* find(std::string_view name) const noexcept;
+
+    /// All fields in the order of the entry.
+    std::span<const Field> all() const noexcept { return m_fields; }
+
+    /// How many fields were left out because there was no room for them.
+    std::size_t leftOut() const noexcept { return m_leftOut; }
+    /// Counts a field that could not be added.
+    void noteLeftOut() noexcept { ++m_leftOut; }
+
+private:
+    bool reserve() noexcept;
+
+    std::vector<Field> m_fields;
+    std::unique_ptr<char[]> m_texts; ///< `room` bytes, once a text was built
+    std::size_t m_used = 0;          ///< bytes, also of the text that is being built
+    std::size_t m_textBegin = 0;     ///< of the text that is being built
+    bool m_hasRoom = true;           ///< for the text that is being built
+    std::size_t m_leftOut = 0;
+};
+
+} // namespace zrm
+
+#endif
