@@ -7,6 +7,10 @@
 #include <memory>
 #include <vector>
 
+namespace zrm {
+class LogEntry;
+} // namespace zrm
+
 namespace zrm::host {
 
 /// The events that one entry of a followed log has raised, collected on the log's thread until the
@@ -24,8 +28,11 @@ public:
         m_rows.insert(m_rows.end(), row, row + rowSize);
         m_situations.push_back(situation);
     }
+    /// What the entry has beside the rows: completes the events before they leave.
+    void describe(LogEntry& entry);
     void clear() noexcept {
         m_situations.clear();
+        m_details.clear();
         m_rows.clear();
     }
 
@@ -35,11 +42,16 @@ public:
         return m_situations[index];
     }
     const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }
+    /// Null until the entry was described.
+    std::shared_ptr<const EntryDetail> detail(std::size_t index) const noexcept {
+        return index < m_details.size() ? m_details[index] : nullptr;
+    }
 
 private:
     std::size_t m_rowSize = 0;
     std::vector<std::shared_ptr<const SituationLabel>> m_situations;
     std::vector<char> m_rows;
+    std::vector<std::shared_ptr<const EntryDetail>> m_details; ///< as many as events, or none
 };
 
 } // namespace zrm::host

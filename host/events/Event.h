@@ -3,10 +3,12 @@
 
 #include "framework/LogPositions.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace zrm::host {
 
@@ -16,8 +18,18 @@ class FollowedLog;
 /// events.
 struct SituationLabel {
     std::string name;
-    std::string severity;  ///< info, minor, warning, major or critical
-    std::string text = {}; ///< its description for people; may be empty
+    std::string severity;                 ///< info, minor, warning, major or critical
+    std::string text = {};                ///< its description for people; may be empty
+    std::vector<std::string> fields = {}; ///< names of the fields that its conditions name
+};
+
+/// What an event has of its entry beside the row, as JSON values. Immutable.
+struct EntryDetail {
+    std::string fields; ///< an object; empty: none
+    std::string text;   ///< a string; empty: none
+    bool isCut = false; ///< the entry is longer than its text
+
+    std::size_t bytes() const noexcept { return fields.size() + text.size(); }
 };
 
 /// One event in the queue.
@@ -25,8 +37,9 @@ struct Event {
     std::uint64_t id = 0;    ///< counted from 1 in the order of arrival
     std::int64_t raised = 0; ///< milliseconds since 1970-01-01, UTC
     std::shared_ptr<const SituationLabel> situation;
-    const char* row = nullptr;        ///< the row's bytes, owned by the queue
-    bool endsEntry = true;            ///< false: its entry has raised the next event, too
+    const char* row = nullptr;                 ///< the row's bytes, owned by the queue
+    std::shared_ptr<const EntryDetail> detail; ///< null: the row is all there is
+    bool endsEntry = true;                     ///< false: its entry has raised the next event, too
     std::shared_ptr<FollowedLog> log; ///< with the last event of an entry of a followed log
     LogPosition behind;               ///< where the log's next entry begins
 };

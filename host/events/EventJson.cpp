@@ -17,8 +17,23 @@ void EventJson::append(std::string& text, const Event& event) const {
         json.key(m_raisedKey).time(event.raised);
         json.key(m_rowKey);
         m_row.write(json, event.row);
+        if (event.detail != nullptr) {
+            writeDetail(json, *event.detail);
+        }
         json.endObject();
     });
+}
+
+void EventJson::writeDetail(JsonWriter& json, const EntryDetail& detail) const {
+    if (!detail.fields.empty()) {
+        json.key(m_fieldsKey).raw(detail.fields);
+    }
+    if (!detail.text.empty()) {
+        json.key(m_entryKey).raw(detail.text);
+    }
+    if (detail.isCut) {
+        json.member("entry_cut", true);
+    }
 }
 
 void EventJson::appendLog(std::string& text, const Event& event) const {

@@ -9,8 +9,9 @@
 
 namespace zrm::host {
 
-/// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}. Immutable, so
-/// any thread.
+/// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}, and for the log
+/// of a [[log]] table also {"fields", "entry", "entry_cut"} where there is such a thing. Immutable,
+/// so any thread.
 class EventJson {
 public:
     explicit EventJson(RowLayout layout);
@@ -23,12 +24,16 @@ public:
     void appendLog(std::string& text, const Event& event) const;
 
 private:
+    void writeDetail(JsonWriter& json, const EntryDetail& detail) const;
+
     RowLayout m_layout;
     RowJson m_row;
     JsonKey m_situationKey{"situation"};
     JsonKey m_severityKey{"severity"};
     JsonKey m_raisedKey{"raised"};
     JsonKey m_rowKey{"row"};
+    JsonKey m_fieldsKey{"fields"};
+    JsonKey m_entryKey{"entry"};
 };
 
 } // namespace zrm::host

@@ -13,6 +13,10 @@ namespace {
 /// How long a woken reader waits for more events, unless many have already arrived.
 constexpr std::chrono::milliseconds gatherTime{5};
 
+std::size_t bytesOf(const Event& event) {
+    return event.detail == nullptr ? 0 : event.detail->bytes();
+}
+
 } // namespace
 
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
@@ -66,6 +70,7 @@ std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
         Event event;
         event.raised = raised;
         event.situation = events.situation(index);
+        event.detail = events.detail(index);
         event.endsEntry = index + 1 == events.size();
         if (event.endsEntry) {
             event.log = log;
@@ -91,6 +96,7 @@ void EventQueue::announce(std::unique_lock<std::mutex>& lock) {
 /// Gives an event its id and its place, behind all others.
 void EventQueue::add(Event event, const char* row) {
     event.id = m_last + m_next + m_aside.size() + 1;
+    m_detailBytes += bytesOf(event);
     if (m_aside.empty() && hasSlot()) {
         put(event, row);
     } else {
@@ -107,6 +113,7 @@ void EventQueue::put(const Event& event, const char* row) {
     slot.id = event.id;
     slot.raised = event.raised;
     slot.situation = event.situation;
+    slot.detail = event.detail;
     slot.endsEntry = event.endsEntry;
     slot.log = event.log;
     slot.behind = event.behind;
@@ -124,8 +131,9 @@ void EventQueue::takeFromAside() {
 /// Threads waiting for room are woken when there is room for many events.
 void EventQueue::noteRoom() {
     const std::uint64_t used = m_next - slowest();
-    const bool isFull =
-        m_isFull ? !m_aside.empty() || used > m_events.size() - quarter() : !hasSlot();
+    const bool isFull = m_isFull ? !m_aside.empty() || used > m_events.size() - quarter() ||
+                                       m_detailBytes > detailRoom - detailRoom / 4
+                                 : !hasSlot() || m_detailBytes >= detailRoom;
     if (isFull != m_isFull) {
         m_isFull = isFull;
         if (m_listener) {
@@ -173,7 +181,9 @@ std::span<const Event> EventQueue::read(Reader reader, std::size_t most, Clock::
 
 void EventQueue::release(Reader reader, std::size_t count) {
     const std::lock_guard guard(m_mutex);
+    const std::uint64_t before = slowest();
     m_cursor[reader] += count;
+    dropDetails(before);
     if (m_isFull) {
         takeFromAside();
         noteRoom();
@@ -189,6 +199,15 @@ void EventQueue::wake() {
         ++m_wakes;
     }
     m_changed.notify_all();
+}
+
+/// Frees the details of the events that every reader has released now.
+void EventQueue::dropDetails(std::uint64_t from) {
+    for (const std::uint64_t end = slowest(); from < end; ++from) {
+        Event& event = m_events[from % m_events.size()];
+        m_detailBytes -= bytesOf(event);
+        event.detail.reset();
+    }
 }
 
 bool EventQueue::ended(Reader reader) const {

@@ -31,9 +31,9 @@ struct QueueState {
 /// The bounded way of events from the log threads to the sinks: one ring of rows with a cursor per
 /// reader, so that every reader gets every event in order and the memory does not grow with their
 /// number. A push never waits: log threads ask whether there is room before they offer a row, and
-/// wait while the ring is full, until a quarter of it is free. The log file is the buffer and
-/// nothing is dropped. What one row raises beyond the ring's end is kept aside. Nothing is
-/// allocated per event otherwise.
+/// wait while the ring is full or its events have too many bytes beside their rows, until a quarter
+/// of it is free. The log file is the buffer and
+/// nothing is dropped. What one entry raises beyond the ring's end is kept aside.
 ///
 /// Readers and the listener are added before the first push. Afterwards push may be called on any
 /// thread, and read and release of one reader on that reader's thread alone; the rest on any.
@@ -41,6 +41,9 @@ class EventQueue {
 public:
     using Clock = std::chrono::steady_clock;
     using Reader = std::size_t;
+
+    /// Bytes of the events' details (EntryDetail) with which the queue is full.
+    static constexpr std::size_t detailRoom = std::size_t{16} * 1024 * 1024;
 
     /// Room for `capacity` events of rows of `rowSize` bytes. The ids of the events follow `last`.
     EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last = 0);
@@ -105,6 +108,7 @@ private:
     void put(const Event& event, const char* row);
     void takeFromAside();
     void noteRoom();
+    void dropDetails(std::uint64_t from);
     bool isAwaited() const;
 
     const std::size_t m_rowSize;
@@ -118,6 +122,7 @@ private:
     std::vector<std::uint64_t> m_awaited; ///< per reader: m_next at which it is woken
     std::uint64_t m_next = 0;             ///< the next event to be pushed
     std::deque<Aside> m_aside;            ///< events after those of the ring, in order
+    std::size_t m_detailBytes = 0;        ///< of all events that some reader has not released
     std::function<void(bool)> m_listener;
     bool m_isFull = false; ///< as last reported to the listener
     bool m_closed = false;

@@ -1,6 +1,8 @@
 // The host's implementation of LogPositions.h.
 #include "framework/LogPositions.h"
 
+#include "framework/LogEntry.h"
+
 #include "host/events/EntryEvents.h"
 #include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
@@ -56,6 +58,9 @@ bool LogPositions::hasEvents() const noexcept {
 
 void LogPositions::endEntry(const LogPosition& behind) {
     if (hasEvents() && !m_state->book->isClosed()) {
+        if (LogEntry* const entry = LogEntry::ofThisThread) {
+            m_state->events.describe(*entry);
+        }
         m_state->log->push(m_state->follower, m_state->book->queue(), m_state->events, m_state->log,
                            behind);
     }

@@ -104,6 +104,14 @@ bool EventText::isIn(std::string_view log, std::string_view document) const {
     if (situation != event.end() && hasText(*situation)) {
         return true;
     }
+    const auto entry = event.find("entry");
+    if (entry != event.end() && hasText(*entry)) {
+        return true;
+    }
+    const auto fields = event.find("fields");
+    if (fields != event.end() && std::any_of(fields->begin(), fields->end(), hasText)) {
+        return true;
+    }
     const auto row = event.find("row");
     if (row == event.end()) {
         return false;

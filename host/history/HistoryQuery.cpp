@@ -17,6 +17,9 @@ namespace {
 constexpr auto noBound = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 constexpr auto partSize = static_cast<std::int64_t>(EventTable::partSize);
 
+/// A page with so many bytes of events ends.
+constexpr std::size_t mostBytes = std::size_t{8} * 1024 * 1024;
+
 /// A search checks the clock once per this many events.
 constexpr std::size_t eventsBetweenLooksAtTheClock = 64;
 
@@ -145,6 +148,7 @@ void HistoryQuery::look(const Statement& statement) {
     const EventRecord event = row.record();
     if (isWanted(event)) {
         if (row.isIntact()) {
+            m_bytes += event.json.size();
             m_found.events.push_back({event.id, event.raised, std::string(event.situation),
                                       std::string(event.severity), std::string(event.log),
                                       std::string(event.json)});
@@ -152,8 +156,9 @@ void HistoryQuery::look(const Statement& statement) {
             m_found.damaged.push_back(event.id);
         }
     }
-    if (!m_text.isEmpty() && ++m_looked % eventsBetweenLooksAtTheClock == 0 &&
-        Clock::now() >= m_searchLimit) {
+    if (m_bytes > mostBytes ||
+        (!m_text.isEmpty() && ++m_looked % eventsBetweenLooksAtTheClock == 0 &&
+         Clock::now() >= m_searchLimit)) {
         m_found.reached = event.id;
     }
 }

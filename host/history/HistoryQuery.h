@@ -48,6 +48,7 @@ private:
     const EventText m_text;
     const Clock::time_point m_searchLimit;
     std::size_t m_looked = 0; ///< number of events examined
+    std::size_t m_bytes = 0;  ///< of the events found
     EventPage m_found;
 };
 

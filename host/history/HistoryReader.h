@@ -44,7 +44,8 @@ struct EventPage {
     std::vector<StoredEvent> events; ///< in the filter's order
     /// Ids of corrupted events, which are not among the events.
     std::vector<std::uint64_t> damaged = {};
-    /// Set when a text search stopped early: the id of the last event examined.
+    /// Set when the page ended early, because a text search took long or the events are large: the
+    /// id of the last event examined.
     std::optional<std::uint64_t> reached = std::nullopt;
 };
 
@@ -82,7 +83,7 @@ public:
 
     virtual ~HistoryReader() = default;
 
-    /// The events that pass the filter, in its order. A text search may stop early.
+    /// The events that pass the filter, in its order. The page may end early.
     virtual Result<EventPage> query(const EventFilter& filter) = 0;
 
     /// The event with this id; none when the history does not (or no longer) contain it. A

@@ -17,6 +17,7 @@ namespace {
 TRC1_Anchor anchor{"HistorySource.cpp"};
 
 constexpr std::uint64_t readAtOnce = 256;
+constexpr std::size_t bytesAtOnce = std::size_t{8} * 1024 * 1024;
 constexpr std::chrono::seconds pauseAfterFailure{1};
 
 } // namespace
@@ -122,12 +123,13 @@ std::shared_ptr<const EventBatch> HistorySource::readFile() {
     return batch;
 }
 
-/// False when the event is damaged and others must be delivered before it.
+/// False when the batch is to end: it is large, or the event is damaged and others must be
+/// delivered before it.
 bool HistorySource::addTo(EventBatch& batch, const StoredEventRow& row) {
     const EventRecord event = row.record();
     if (row.isIntact()) {
         batch.add(event);
-        return true;
+        return batch.textBytes() < bytesAtOnce;
     }
     if (!batch.empty()) {
         return false;

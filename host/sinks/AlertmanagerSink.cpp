@@ -5,18 +5,47 @@
 #include "host/base/TimeText.h"
 #include "host/sinks/EventRow.h"
 
+#include <algorithm>
+#include <set>
+#include <string>
 #include <string_view>
 
 namespace zrm::host {
 
 namespace {
 
+/// The name of an annotation has letters, digits and underlines only.
+std::string annotationName(std::string_view field) {
+    std::string name = "field_" + std::string(field);
+    std::replace_if(
+        name.begin(), name.end(),
+        [](char c) { return (c < '0' || c > '9') && (c < 'A' || c > 'Z') && (c < 'a' || c > 'z'); },
+        '_');
+    return name;
+}
+
+/// Fields whose names become the same give one annotation, of the first.
+void writeFields(JsonWriter& json, const EventRow& row) {
+    std::set<std::string> names;
+    for (const EventRow::Field& field : row.fields()) {
+        const auto [name, isNew] = names.insert(annotationName(field.name));
+        if (isNew) {
+            json.member(*name, field.value);
+        }
+    }
+}
+
 void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow& row) {
     const std::string_view what = event.text.empty() ? event.situation : event.text;
     json.beginObject().member("summary", std::string(what) + " in " + std::string(event.log));
     json.member("description", row.description());
     json.member("source", row.source());
-    json.member("event", std::to_string(event.id)).endObject();
+    json.member("event", std::to_string(event.id));
+    if (!row.entry().empty()) {
+        json.member("entry", row.entry());
+    }
+    writeFields(json, row);
+    json.endObject();
 }
 
 } // namespace

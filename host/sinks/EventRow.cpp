@@ -13,6 +13,16 @@ EventRow::EventRow(const EventRecord& event) {
     if (row == json.end() || !row->is_object()) {
         return;
     }
+    if (const auto entry = json.find("entry"); entry != json.end() && entry->is_string()) {
+        m_entry = entry->get<std::string>();
+    }
+    if (const auto fields = json.find("fields"); fields != json.end() && fields->is_object()) {
+        for (const auto& [name, value] : fields->items()) {
+            if (value.is_string()) {
+                m_fields.push_back({name, value.get<std::string>()});
+            }
+        }
+    }
     for (const auto& [name, value] : row->items()) {
         if (value.is_string()) {
             m_columns.push_back({name, value.get<std::string>()});

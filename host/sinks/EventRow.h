@@ -37,8 +37,8 @@ constexpr const SeverityCodes& SeverityCodes::of(std::string_view severity) noex
     return found == severityCodes.end() ? severityCodes[2] : *found;
 }
 
-/// The row of an event, parsed from the event's JSON for sinks that write it in another form.
-/// Immutable, so any thread.
+/// The row of an event and what it has of its entry beside the row, parsed from the event's JSON
+/// for sinks that write it in another form. Immutable, so any thread.
 class EventRow {
 public:
     struct Column {
@@ -55,7 +55,18 @@ public:
     /// The text of a character column; empty when there is no column of this name.
     std::string_view text(std::string_view column) const;
 
-    /// The text of the entry.
+    struct Field {
+        std::string name;
+        std::string value;
+    };
+
+    /// The fields of the entry that the event has, in the order of the entry.
+    std::span<const Field> fields() const noexcept { return m_fields; }
+
+    /// The whole entry as it stands in the log; empty if the event does not have it.
+    const std::string& entry() const noexcept { return m_entry; }
+
+    /// The text of the entry, as far as its column holds it.
     std::string_view description() const;
 
     /// The program, or part of a program, that wrote the entry.
@@ -66,6 +77,8 @@ public:
 
 private:
     std::vector<Column> m_columns;
+    std::vector<Field> m_fields;
+    std::string m_entry;
 };
 
 } // namespace zrm::host

@@ -46,6 +46,12 @@ void writeAttributes(JsonWriter& json, const EventRecord& event, const EventRow&
             writeAttribute(json, key, text);
         }
     }
+    for (const EventRow::Field& field : row.fields()) {
+        writeAttribute(json, "zrm.field." + field.name, field.value);
+    }
+    if (!row.entry().empty()) {
+        writeAttribute(json, "zrm.entry", row.entry());
+    }
     json.endArray();
 }
 

@@ -67,6 +67,38 @@ void appendParameter(std::string& data, const char* name, std::string_view value
     data += '"';
 }
 
+/// The name of a parameter: printable ASCII, at most 32 bytes.
+std::string parameterName(std::string_view field) {
+    constexpr std::size_t longestName = 32;
+    std::string name(field.substr(0, longestName));
+    std::replace_if(
+        name.begin(), name.end(),
+        [](char c) { return c <= ' ' || c > '~' || c == '=' || c == ']' || c == '"'; }, '_');
+    return name;
+}
+
+/// The fields as an element of structured data, as far as it takes at most this many bytes.
+void appendFields(std::string& data, const EventRow& row, std::size_t most) {
+    std::string parameters;
+    for (const EventRow::Field& field : row.fields()) {
+        const std::size_t before = parameters.size();
+        appendParameter(parameters, parameterName(field.name).c_str(), field.value);
+        if (parameters.size() > most) {
+            parameters.resize(before);
+        }
+    }
+    if (!parameters.empty()) {
+        data += "[zrm-fields@32473" + parameters + ']';
+    }
+}
+
+/// The description, or the whole entry if the column holds only its beginning.
+std::string_view textOf(const EventRow& row) {
+    constexpr std::size_t width = 256; // of ENTRYDESC
+    const bool isCut = row.text("ENTRYDESC").size() >= width - 1;
+    return isCut && !row.entry().empty() ? row.entry() : row.description();
+}
+
 /// The text on one line, with the mark that tells UTF-8 where it is not ASCII, in at most this
 /// many bytes.
 std::string messageText(std::string_view description, std::size_t most) {
@@ -100,8 +132,10 @@ std::string SyslogMessage::text(const EventRecord& event) const {
     appendParameter(text, "situation", event.situation);
     appendParameter(text, "severity", event.severity);
     appendParameter(text, "log", event.log);
-    text += "] ";
-    return text + messageText(row.description(), longest - std::min(text.size(), longest));
+    text += ']';
+    appendFields(text, row, longest / 2);
+    text += ' ';
+    return text + messageText(textOf(row), longest - std::min(text.size(), longest));
 }
 
 } // namespace zrm::host

@@ -5,14 +5,29 @@
 #include "host/base/TimeText.h"
 #include "host/framework/Status.h"
 
+#include <algorithm>
 #include <chrono>
+#include <string>
 #include <utility>
+#include <vector>
 
 namespace zrm::host {
 
 namespace {
 
 TRC1_Anchor anchor{"Situation.cpp"};
+
+/// The fields that the conditions name, each once.
+std::vector<std::string> fieldsOf(const std::vector<Condition>& conditions) {
+    std::vector<std::string> fields;
+    for (const Condition& condition : conditions) {
+        const auto field = fieldOf(condition.column);
+        if (field && std::find(fields.begin(), fields.end(), *field) == fields.end()) {
+            fields.emplace_back(*field);
+        }
+    }
+    return fields;
+}
 
 RequestDetail detailOf(const SituationConfig& config) {
     RequestDetail detail;
@@ -26,8 +41,9 @@ RequestDetail detailOf(const SituationConfig& config) {
 
 Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
                      std::shared_ptr<SituationCounts> counts)
-    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(SituationLabel{
-                                       m_config.name, m_config.severity, m_config.text})),
+    : m_config(std::move(config)),
+      m_label(std::make_shared<const SituationLabel>(SituationLabel{
+          m_config.name, m_config.severity, m_config.text, fieldsOf(m_config.conditions)})),
       m_queue(queue), m_counts(std::move(counts)),
       m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
     TraceScope trace(anchor);

@@ -1,0 +1,154 @@
+"""Fields and texts of the entries of [[log]] tables: conditions on them, and what events keep."""
+
+import pytest
+from api import Api
+from conftest import Log, descriptions, syslog_line
+from situations import Situations
+
+RFC5424 = '<{pri}>1 2026-11-20T06:03:09Z web1 app 8710 ID47 [req@32473 status="{status}" user="{user}"] {text}\n'
+
+
+def file(agent, name="app.log"):
+    log = Log(agent.directory / name)
+    log.path.write_text("")
+    return log
+
+
+def test_conditions_on_fields_raise_events_that_keep_them(agent):
+    log = file(agent)
+    agent.follow(log, start="beginning")
+    agent.situation(log=log, when=["field.req@32473.status >= 500", "field.severity in ['crit', 'err']"])
+    agent.start()
+    for pri, status in ((34, "99"), (34, "500"), (38, "500"), (34, "1000.5"), (34, "none")):
+        log.append(RFC5424.format(pri=pri, status=status, user="root", text=f"status {status}"))
+    log.append(syslog_line("without fields of that kind"))
+    events = agent.wait_events(2)
+    assert agent.stop() == 0
+    assert descriptions(agent.events()) == ["status 500", "status 1000.5"]
+    assert events[0]["fields"] == {"severity": "crit", "req@32473.status": "500"}
+    assert events[0]["entry"].startswith("<34>1 2026-11-20T06:03:09Z web1 app 8710")
+    assert "entry_cut" not in events[0]
+
+
+def test_long_hosts_and_tags_are_whole_in_the_fields(agent):
+    host = "ip-10-0-0-17.eu-central-1.compute.internal-" + "x" * 20
+    tag = "systemd-networkd-wait-online-" + "y" * 200
+    log = file(agent)
+    agent.follow(log, start="beginning", keep=["host", "tag", "pid"])
+    agent.situation(log=log, when=[f"field.host = '{host}'", f"field.tag = '{tag}'"])
+    agent.start()
+    log.append(f"Nov 20 07:03:09 {host} {tag}[12345]: text\n")
+    (event,) = agent.wait_events(1)
+    assert event["fields"] == {"host": host, "tag": tag, "pid": "12345"}
+    assert event["row"]["ENTRYSYS"] == host[:32]
+
+
+def test_the_text_of_an_event_is_the_whole_entry(agent):
+    log = file(agent)
+    short = file(agent, "short.log")
+    none = file(agent, "none.log")
+    agent.follow(log, start="beginning")
+    agent.follow(short, start="beginning", entry_bytes=40)
+    agent.follow(none, start="beginning", entry_bytes=0)
+    agent.situation(when=["field.message contains 'needle'"])
+    agent.start()
+    line = syslog_line("x" * 50_000 + " needle")
+    for one in (log, short, none):
+        one.append(line)
+    events = {event["row"]["LOGNAME"]: event for event in agent.wait_events(3)}
+    assert events["app.log"]["entry"] == line.rstrip("\n")
+    assert "entry_cut" not in events["app.log"]
+    assert events["short.log"]["entry"] == line[:40]
+    assert events["short.log"]["entry_cut"] is True
+    assert "entry" not in events["none.log"]
+
+
+def test_logs_of_the_log_configuration_stay_as_they_were(agent):
+    log = agent.log("app.log")
+    agent.situation(log=log, when=["field.host != 'other'"])
+    agent.start()
+    log.append(syslog_line("text"))
+    (event,) = agent.wait_events(1)
+    assert set(event) == {"id", "situation", "severity", "raised", "row"}
+
+
+@pytest.mark.slow
+def test_hostile_fields_are_bounded(agent):
+    log = file(agent)
+    agent.follow(log, start="beginning", keep="*")
+    agent.situation(log=log, when=["field.user != 'x'"])
+    agent.start()
+    many = " ".join(f'p{number}="{number}"' for number in range(10_000))
+    log.append(f"<34>1 2026-11-20T06:03:09Z h a p m [s {many}] many\n")
+    log.append(b'<34>1 2026-11-20T06:03:09Z h a p m [s \xff\x01="\xc3(\x00\x1b[31m"] odd\n')
+    log.append(b"<34>1 2026-11-20T06:03:09Z h a p m [s x=\"" + b"\\" * 100_000 + b"\n")
+    many, odd, _ = agent.wait_events(3)
+    assert len(many["fields"]) == 256
+    assert many["fields"]["s.p0"] == "0"
+    assert odd["fields"]["s.\ufffd\x01"] == "\ufffd(\x00\x1b[31m"
+    assert agent.stop() == 0
+
+
+def test_the_api_the_client_and_the_search_have_them(agent):
+    log = file(agent)
+    agent.follow(log, start="beginning")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    situations = Situations(agent)
+    assert situations.add("api", when=["field.pid > 400.5"])["when"] == ["field.pid > 400.5"]
+    situations.wait_opened(1)
+    log.append("Nov 20 07:03:09 web1 sshd[412]: Failed " + "." * 300 + " needle\n")
+    (event,) = agent.wait_events(1)
+    assert event["fields"] == {"pid": "412"}
+    api = Api(agent)
+    assert api.request("GET", "/api/v1/events?text=needle")[2]["events"] == [event]
+    assert api.request("GET", "/api/v1/events?text=nothing")[2]["events"] == []
+    status, _, problem = api.request(
+        "POST", "/api/v1/situations", {"name": "bad", "when": ["field.pid contains 4"]}
+    )
+    assert status == 400
+    assert "'contains' compares text" in problem["detail"]
+    status, _, problem = api.request(
+        "POST",
+        "/api/v1/reports",
+        {"log": str(log), "from": "2026-11-20", "where": ["field.pid = 412"]},
+    )
+    assert (status, problem["field"]) == (400, "where[0]")
+
+
+def test_explain_says_what_a_field_was(agent):
+    log = file(agent)
+    agent.follow(log, start="beginning")
+    agent.listen = "127.0.0.1:0"
+    agent.situation(name="slow", log=log, when=["ENTRYDESC contains 'text'", "field.req@32473.status >= 500"])
+    agent.start()
+    log.append(RFC5424.format(pri=34, status="404", user="root", text="text"))
+    log.append(RFC5424.format(pri=34, status="503", user="root", text="text"))
+    log.append(RFC5424.format(pri=34, status="-", user="root", text="text"))
+    log.append(syslog_line("text"))
+    (event,) = agent.wait_events(1)
+    api = Api(agent)
+
+    def explained(**body):
+        status, _, answer = api.request("POST", "/api/v1/explain", {"situation": "slow", **body})
+        assert status == 200, answer
+        return answer["explanations"]
+
+    decisions = [one["decision"].split(": ", 1)[1] for one in explained(last=4)]
+    assert decisions == [
+        "field.req@32473.status '404' is less than 500.",
+        "every condition holds.",
+        "field.req@32473.status '-' is not a number.",
+        "the entry has no field.req@32473.status.",
+    ]
+    (one,) = explained(event=event["id"])
+    assert [verdict["value"] for verdict in one["conditions"]][-2:] == ["text", "503"]
+    (one,) = explained(line=syslog_line("other text").rstrip())
+    assert [verdict["value"] for verdict in one["conditions"]][-2:] == ["other text", None]
+    log.path.write_text("")
+    (one,) = explained(event=event["id"])
+    assert one["raised"] is True, "the event has the entry"
+    status, _, problem = api.request(
+        "POST", "/api/v1/backtest", {"situation": "slow", "from": "2026-11-20", "to": "2026-11-21"}
+    )
+    assert (status, "conditions on fields" in problem["detail"]) == (400, True)
