@@ -1,5 +1,6 @@
 """What the console shows of logs of [[log]] tables: where they come from, and what rotations cost."""
 
+import gzip
 from signal import SIGCONT, SIGSTOP
 
 import pytest
@@ -140,3 +141,16 @@ def test_lines_are_tried_as_a_table_would_judge_them(page, agent):
     page.choose("Judge as", "Line of the log configuration")
     page.wait_text("0% of the lines fit")
     page.expect_complaints()
+
+
+def test_a_report_shows_the_files_that_it_has_read(page, followed):
+    app = followed.app
+    app.append("no syslog line\n")
+    with gzip.open(f"{app}.1.gz", "wt", encoding="ascii") as stream:
+        stream.write(failed_login(3))
+    page.on(followed, "reports")
+    page.run_report(app.path, "2 entries")
+    page.wait_text("2 of 3 files read, 1 line passed over")
+    page.wait_text(f"{app}.1.gz")
+    page.wait_text("not read completely: it is damaged")
+    page.pictures("report-files")

@@ -113,6 +113,29 @@ export async function request(method, path, body, abort) {
 export const get = (path, abort) => request("GET", path, undefined, abort);
 export const post = (path, body = {}, abort) => request("POST", path, body, abort);
 
+/** Posts a body and takes each line of the answer, an object, as it arrives; the last has `end`. */
+export async function postForLines(path, body, abort, take) {
+  const headers = { Accept: "application/x-ndjson" };
+  const response = await open(path, { method: "POST", headers, body, signal: abort });
+  const reader = response.body.getReader();
+  const decoder = new TextDecoder();
+  let rest = "";
+  let isOver = false;
+  while (!isOver) {
+    const { done, value } = await reader.read().catch((error) => {
+      throw error.name === "AbortError" ? error : lost();
+    });
+    if (done) throw lost();
+    const lines = (rest + decoder.decode(value, { stream: true })).split("\n");
+    rest = lines.pop();
+    for (const line of lines) {
+      const object = JSON.parse(line);
+      isOver = "end" in object;
+      take(object);
+    }
+  }
+}
+
 /** Path and query; lists repeat their key, empty values are left out. */
 export function withQuery(path, values) {
   const query = new URLSearchParams();

@@ -1,9 +1,10 @@
 // Reports: what a log held between two times.
 
-import { get, post } from "../api.js";
+import { get, postForLines } from "../api.js";
 import { Conditions } from "../conditions.js";
-import { button, empty, failure, field, fill, h, select, visible } from "../dom.js";
-import { ENTRY_COLUMNS, offsetOf, plural, reachText, stamp } from "../format.js";
+import { button, empty, failure, field, fill, h, select } from "../dom.js";
+import { bytes, offsetOf, plural } from "../format.js";
+import { ReportResult } from "../report-result.js";
 
 const HOUR = 3600 * 1000;
 const PRESETS = [
@@ -76,6 +77,8 @@ export async function show(element, query) {
 }
 
 class ReportPage {
+  #progress = null; // of the run under way
+
   constructor(element, logs, columns, log) {
     this.columns = columns;
     this.result = h(
@@ -97,6 +100,7 @@ class ReportPage {
     };
     this.from = field("From", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.to = field("To", h("input", { type: "datetime-local", step: 1, oninput: own }));
+    this.limit = field("Entries at most", select(["100", "1000", "10000"], "1000"));
     this.conditions = new Conditions(columns, [], () => this.conditions.setProblems([]));
     this.zone = h("p", { className: "hint" });
     this.run = h("button", { className: "primary" }, "Run the report");
@@ -114,7 +118,7 @@ class ReportPage {
             this.#run();
           },
         },
-        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to),
+        h("div", { className: "fields" }, this.log, this.preset, this.from, this.to, this.limit),
         this.zone,
         this.conditions.element,
         h("p", { className: "actions" }, this.run),
@@ -171,10 +175,15 @@ class ReportPage {
         from: from.toISOString(),
         to: to.toISOString(),
         where: this.conditions.texts,
+        limit: Number(this.limit.control.value),
       };
-      this.answer = await post("/api/v1/reports", body, abort.signal);
-      this.sort = null;
-      this.#draw();
+      const answer = { rows: [] };
+      await postForLines("/api/v1/reports", body, abort.signal, (line) => {
+        if (line.row) answer.rows.push(line.row);
+        else if (line.progress) this.#progress = { ...line.progress, found: answer.rows.length };
+        else Object.assign(answer, line.begin, line.end);
+      });
+      new ReportResult(this.result, answer);
     } catch (error) {
       if (abort !== this.abort) return;
       this.#fail(error);
@@ -184,7 +193,16 @@ class ReportPage {
 
   #showProgress() {
     const begin = performance.now();
-    const elapsed = h("span", {}, "Reading the log, 0 s");
+    this.#progress = null;
+    const text = () => {
+      const seconds = Math.round((performance.now() - begin) / 1000);
+      const { read, total, found } = this.#progress ?? {};
+      const far =
+        total > 0 &&
+        `: ${bytes(read)} of ${bytes(total)}, ${plural(found, "entry", "entries")} found`;
+      return `Reading the log, ${seconds} s${far || ""}`;
+    };
+    const elapsed = h("span", {}, text());
     fill(
       this.result,
       h(
@@ -199,7 +217,7 @@ class ReportPage {
       ),
     );
     this.timer = setInterval(() => {
-      elapsed.textContent = `Reading the log, ${Math.round((performance.now() - begin) / 1000)} s`;
+      elapsed.textContent = text();
     }, 500);
   }
 
@@ -230,167 +248,5 @@ class ReportPage {
           : failure(new Error("A condition is invalid; it is marked above.")),
       ),
     );
-  }
-
-  #draw() {
-    const { rows, truncated, max_rows: most, complete } = this.answer;
-    if (rows.length === 0) {
-      fill(
-        this.result,
-        h(
-          "div",
-          { className: "panel" },
-          empty(
-            "No entries",
-            truncated
-              ? `None of the newest ${most} entries of this period meets the conditions; ` +
-                  "a report reads no more than that. Choose a shorter period."
-              : complete
-                ? "The log has no entries in this period that meet the conditions."
-                : `None of the entries read meets the conditions. ${reachText(this.answer)}`,
-          ),
-        ),
-      );
-      return;
-    }
-    const all = h("input", { type: "checkbox", onchange: () => this.#drawTable(all.checked) });
-    this.holder = h("div", {
-      className: "panel flush",
-      tabIndex: 0,
-      role: "region",
-      "aria-label": "Entries",
-    });
-    fill(
-      this.result,
-      h(
-        "div",
-        { className: "head" },
-        h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
-        truncated &&
-          h(
-            "p",
-            { className: "why warn" },
-            `Only the newest ${most} entries of the period were read. ` +
-              "Choose a shorter period for the rest.",
-          ),
-        !truncated && !complete && h("p", { className: "why warn" }, reachText(this.answer)),
-        h(
-          "div",
-          { className: "push" },
-          h("label", { className: "check" }, all, "All columns"),
-          button("CSV", () => this.#download("csv", "text/csv", this.#csv()), {
-            "aria-label": "Download as CSV",
-          }),
-          button(
-            "JSON",
-            () =>
-              this.#download(
-                "json",
-                "application/json",
-                `${visible(JSON.stringify(this.answer.rows, null, 2))}\n`,
-              ),
-            { "aria-label": "Download as JSON" },
-          ),
-        ),
-      ),
-      this.holder,
-    );
-    this.#drawTable(false);
-  }
-
-  #drawTable(isWhole) {
-    const { rows } = this.answer;
-    const shown = isWhole
-      ? Object.keys(rows[0]).map((name) => [name, name])
-      : ENTRY_COLUMNS.filter(([name]) => rows.some((row) => row[name] !== ""));
-    const sorted = this.sort ? [...rows].sort((a, b) => this.#compare(a, b)) : rows;
-    const head = shown.map(([name, label]) => {
-      const isSorted = this.sort?.name === name;
-      return h(
-        "th",
-        {
-          scope: "col",
-          className: name.endsWith("DESC") ? "" : "fit",
-          role: "columnheader",
-          "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none",
-        },
-        button(
-          `${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`,
-          () => {
-            this.sort = { name, up: isSorted ? !this.sort.up : true };
-            this.#drawTable(isWhole);
-            this.holder.querySelector(`[data-name="${name}"]`).focus();
-          },
-          { "data-name": name },
-        ),
-      );
-    });
-    fill(
-      this.holder,
-      h(
-        "table",
-        { role: "table", className: isWhole ? "" : "cards sortable" },
-        h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
-        h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
-        h(
-          "tbody",
-          { role: "rowgroup" },
-          sorted.map((row) =>
-            h(
-              "tr",
-              { role: "row" },
-              shown.map(([name, label]) =>
-                h(
-                  "td",
-                  {
-                    role: "cell",
-                    "data-label": label,
-                    className: name.endsWith("DESC")
-                      ? "wide break"
-                      : name === "ENTRYTIME"
-                        ? "fit whole"
-                        : "fit",
-                  },
-                  name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]),
-                ),
-              ),
-            ),
-          ),
-        ),
-      ),
-    );
-  }
-
-  #compare(a, b) {
-    const { name, up } = this.sort;
-    const order =
-      typeof a[name] === "number"
-        ? a[name] - b[name]
-        : a[name] < b[name]
-          ? -1
-          : a[name] > b[name]
-            ? 1
-            : 0;
-    return up ? order : -order;
-  }
-
-  // What a log holds must neither steer a terminal nor be a formula to a spreadsheet.
-  #csv() {
-    const cell = (value) => {
-      const text = visible(String(value));
-      const safe = typeof value === "string" && /^[=+\-@\t]/.test(text) ? `'${text}` : text;
-      return /[",\r\n]/.test(safe) ? `"${safe.replaceAll('"', '""')}"` : safe;
-    };
-    const names = Object.keys(this.answer.rows[0]);
-    return [names, ...this.answer.rows.map((row) => names.map((name) => row[name]))]
-      .map((row) => `${row.map(cell).join(",")}\r\n`)
-      .join("");
-  }
-
-  #download(ending, type, text) {
-    const url = URL.createObjectURL(new Blob([text], { type }));
-    const name = this.answer.log.split("/").pop();
-    h("a", { href: url, download: `${name}.${ending}` }).click();
-    setTimeout(() => URL.revokeObjectURL(url), 1000);
   }
 }
