@@ -1,5 +1,6 @@
 #include "host/sources/CompressedGeneration.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <archive.h>
@@ -22,19 +23,31 @@ public:
         : m_file(std::move(file)), m_isAtEnd(isAtEnd) {}
 
     std::ptrdiff_t read(char* buffer, std::size_t room) noexcept override {
-        if (m_isAtEnd) {
-            return 0;
+        // Block by block: archive_read_data forgets what it has read when the next block is
+        // damaged.
+        while (m_left == 0 && !m_isAtEnd) {
+            la_int64_t offset = 0;
+            const void* block = nullptr;
+            const int result = archive_read_data_block(m_file.get(), &block, &m_left, &offset);
+            if (result != ARCHIVE_OK && result != ARCHIVE_RETRY && result != ARCHIVE_EOF) {
+                return -1;
+            }
+            m_block = static_cast<const char*>(block);
+            m_isAtEnd = result == ARCHIVE_EOF;
+            m_left = result == ARCHIVE_OK ? m_left : 0;
         }
-        la_ssize_t count = ARCHIVE_RETRY;
-        while (count == ARCHIVE_RETRY) {
-            count = archive_read_data(m_file.get(), buffer, room);
-        }
-        return count < 0 ? -1 : static_cast<std::ptrdiff_t>(count);
+        const std::size_t count = std::min(room, m_left);
+        std::copy_n(m_block, count, buffer);
+        m_block += count;
+        m_left -= count;
+        return static_cast<std::ptrdiff_t>(count);
     }
 
 private:
     const Archive m_file;
-    const bool m_isAtEnd;
+    bool m_isAtEnd;
+    const char* m_block = nullptr; ///< decompressed and not given yet; the archive's
+    std::size_t m_left = 0;
 };
 
 } // namespace

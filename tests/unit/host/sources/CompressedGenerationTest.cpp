@@ -126,6 +126,26 @@ TEST_P(CompressedGenerationTest, OfAFileThatIsCutOffItGivesTheBeginningAndFails)
     }
 }
 
+TEST_P(CompressedGenerationTest, ALargeReadLosesNothingToTheDamageBehindIt) {
+    std::string contents(2'500'000, '\0'); // several blocks, whatever the compression
+    for (char& byte : contents) {
+        byte = static_cast<char>(dice());
+    }
+    CompressedFile(path, GetParam(), contents);
+    const std::string whole = bytes();
+    write(whole.substr(0, whole.size() / 2));
+    const auto reader = open();
+    ASSERT_NE(reader, nullptr);
+    std::string got(contents.size(), '\0');
+    std::size_t total = 0;
+    for (std::ptrdiff_t count = 1; count > 0;) {
+        count = reader->read(got.data() + total, got.size() - total);
+        total += count > 0 ? static_cast<std::size_t>(count) : 0;
+    }
+    EXPECT_GT(total, contents.size() / 4);
+    EXPECT_TRUE(contents.starts_with(got.substr(0, total)));
+}
+
 TEST_P(CompressedGenerationTest, EmptyContentsAreNoDamage) {
     CompressedFile(path, GetParam(), "");
     const auto reader = open();
