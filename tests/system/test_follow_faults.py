@@ -1,0 +1,213 @@
+"""Logs of [[log]] tables on a host where something is off: an old history, the clock, a bad copy."""
+
+import gzip
+import os
+import re
+import sqlite3
+import subprocess
+import sys
+from contextlib import closing
+from pathlib import Path
+from signal import SIGCONT, SIGSTOP
+
+import pytest
+from api import Api
+from conftest import ROOT, Log, descriptions, syslog_line, wait_until
+
+sys.path.insert(0, str(ROOT / "tests/tools"))
+from accounting import record  # noqa: E402
+
+HOUR = 3600
+
+
+def followed(agent, content="", **keys):
+    log = Log(agent.directory / "app.log")
+    log.path.write_bytes(content.encode() if isinstance(content, str) else content)
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    agent.follow(log, **{"rotate_wait": "1s", **keys})
+    agent.situation(log=log)
+    return log
+
+
+# ---------------------------------------------------------------------- a history of before
+
+
+def schema_steps():
+    """The SQL of each version of the history, as the agent has it."""
+    text = (ROOT / "host/history/Schema.cpp").read_text(encoding="utf-8")
+    table = text[text.index("steps = {") : text.index("};\n\n} // namespace")]
+    steps = re.split(r"^    // \d+: ", table, flags=re.M)[1:]
+    return ["".join(re.findall(r'^    "(.*?)",?$', step, flags=re.M)) for step in steps]
+
+
+def history_file(agent):
+    return agent.directory / "state/history.db"
+
+
+def test_a_history_without_positions_is_taken_over(agent):
+    """Version 4 is the last that knows nothing of followed logs."""
+    log = followed(agent, syslog_line("before the start"))
+    history_file(agent).parent.mkdir()
+    with closing(sqlite3.connect(history_file(agent))) as database:
+        for step in schema_steps()[:4]:
+            database.executescript(step)
+        database.execute("INSERT INTO logs VALUES (1, '/var/log/old.log')")
+        database.execute("INSERT INTO labels VALUES (1, 'old', 'minor', 1, 'Old')")
+        database.execute("INSERT INTO events VALUES (41, 1795158189412, 1, '{\"id\": 41}', NULL)")
+        database.execute("PRAGMA user_version = 4")
+        database.commit()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("one"))
+    wait_until(lambda: [event["id"] for event in agent.events()][-1:] == [42], "the event after the old one")
+    status, _, answer = Api(agent).request("GET", "/api/v1/events?situation=old")
+    assert status == 200 and len(answer["events"]) == 1
+    assert agent.stop() == 0
+    log.append(syslog_line("while it was stopped"))
+    agent.start()
+    wait_until(lambda: descriptions(agent.events()[-2:]) == ["one", "while it was stopped"], "the rest")
+    assert agent.stop() == 0
+    with closing(sqlite3.connect(history_file(agent))) as database:
+        assert database.execute("PRAGMA user_version").fetchone()[0] == len(schema_steps())
+
+
+# ---------------------------------------------------------------------- the clock
+
+
+@pytest.fixture(scope="session")
+def clock(tmp_path_factory):
+    library = tmp_path_factory.mktemp("preload") / "clock.so"
+    source = Path(__file__).with_name("clock.c")
+    subprocess.run(["cc", "-shared", "-fPIC", "-o", library, source, "-ldl"], check=True)
+    return library
+
+
+@pytest.mark.slow
+def test_a_clock_that_is_set_back_neither_stops_nor_repeats_entries(agent, clock):
+    offset = agent.directory / "offset"
+    offset.write_text("0")
+    agent.environment.update(
+        {
+            "LD_PRELOAD": str(clock),
+            "CLOCK_OFFSET": str(offset),
+            "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
+        }
+    )
+    log = followed(agent)
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("before"))
+    (before,) = agent.wait_events(1)
+    offset.write_text(str(-HOUR))
+    log.append(syslog_line("after"))
+    after = agent.wait_events(2)[1]
+    assert after["raised"] < before["raised"]
+    log.path.rename(agent.directory / "app.log.1")  # older and newer are told apart without the clock
+    log.path.write_text(syslog_line("rotated"))
+    agent.wait_events(3)
+    assert agent.stop() == 0
+    log.append(syslog_line("while it was stopped"))
+    agent.start()
+    assert descriptions(agent.wait_events(4)) == ["before", "after", "rotated", "while it was stopped"]
+    offset.write_text("0")
+    log.append(syslog_line("set forward"))
+    agent.wait_events(5)
+    assert agent.stop() == 0
+    assert [event["id"] for event in agent.events()] == [1, 2, 3, 4, 5]
+    assert not agent.trace("Error")
+
+
+# ---------------------------------------------------------------------- login accounting
+
+
+def test_an_accounting_log_is_followed_through_a_rotation(agent):
+    log = followed(agent, record("before"), type="accounting")
+
+    def users():
+        return [re.match(r"user = (\w+)", text)[1] for text in descriptions(agent.events())]
+
+    agent.start()
+    agent.wait_open(log)
+    log.append(record("first"))
+    agent.wait_events(1)
+    log.append(record("last"))
+    log.path.rename(agent.directory / "app.log.1")
+    log.path.write_bytes(record("present"))
+    agent.wait_events(3)
+    assert users() == ["first", "last", "present"]
+    assert agent.stop() == 0
+    log.append(record("stopped"))
+    log.path.rename(agent.directory / "app.log.1")
+    log.path.write_bytes(record("new"))
+    agent.start()
+    agent.wait_events(5)
+    log.append(record("whole") + record("cut")[:15])
+    agent.wait_events(6)
+    log.append(record("cut")[15:])
+    agent.wait_events(7)
+    assert users() == ["first", "last", "present", "stopped", "new", "whole", "cut"]
+    assert agent.stop() == 0
+
+
+# ---------------------------------------------------------------------- a damaged copy
+
+
+def follow_of(agent, log):
+    answer = Api(agent).request("GET", f"/api/v1/logs?log={log}")[2]
+    logs = answer.get("logs") or [{}]
+    return (logs[0].get("ledger") or {}).get("follow") or {"lost": [], "state": ""}
+
+
+def warnings_of(agent, log):
+    return Api(agent).request("GET", f"/api/v1/logs?log={log}")[2]["logs"][0]["ledger"]["warnings"]
+
+
+@pytest.mark.slow
+@pytest.mark.parametrize("is_running", [True, False])
+def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
+    log = followed(agent)
+    other = Log(agent.directory / "other.log")
+    other.path.write_text("")
+    agent.follow(other)
+    agent.situation("other", log=other)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    agent.wait_open(other)
+    log.append(syslog_line("known"))
+    agent.wait_events(1)
+    known = log.path.stat().st_size
+    if is_running:
+        agent.send(SIGSTOP)
+    else:
+        assert agent.stop() == 0
+    unread = "".join(syslog_line(f"unread {number} " + os.urandom(40).hex()) for number in range(4000))
+    log.append(unread)
+    packed = gzip.compress(log.path.read_bytes())
+    (agent.directory / "app.log.1.gz").write_bytes(packed[: len(packed) // 2])
+    if is_running:
+        log.path.write_text(syslog_line("present"))
+        agent.send(SIGCONT)
+    else:
+        log.path.unlink()
+        log.path.write_text(syslog_line("present"))
+        agent.start()
+    wait_until(lambda: "present" in descriptions(agent.events()), "the present file to be read")
+    got = descriptions(agent.events())
+    recovered = [int(text.split()[1]) for text in got if text.startswith("unread")]
+    assert recovered == list(range(len(recovered))) and 0 < len(recovered) < 4000  # up to the damage
+    assert got == ["known", *[text for text in got if text.startswith("unread")], "present"]
+    wait_until(lambda: follow_of(agent, log)["lost"], "the loss in the ledger")
+    follow = follow_of(agent, log)
+    (lost,) = follow["lost"]
+    assert known <= lost["from"] <= lost["to"]
+    assert follow["state"] == "reading" and follow["problem"] is None
+    (warning,) = wait_until(lambda: warnings_of(agent, log), "the warning")
+    assert warning["kind"] == "lost"
+    other.append(syslog_line("undisturbed"))
+    wait_until(lambda: "undisturbed" in descriptions(agent.events()), "the other log")
+    log.append(syslog_line("later"))
+    wait_until(lambda: descriptions(agent.events())[-1] == "later", "the next entry")
+    assert agent.stop() == 0
