@@ -106,8 +106,8 @@ std::optional<LogWarning> ofLosses(const FollowView& follow) {
         "lost", 0,
         what + " lost at " + UtcTime::text(last.time) + losses +
             ": removed or rotated away before they were read, and not readable in any "
-            "older file next to the log. Rotate by renaming, or keep the older files "
-            "in the log's directory."};
+            "older file. Rotate by renaming, or keep the older files in the log's directory or "
+            "name theirs in rotated_to."};
 }
 
 /// Whether a log of the log configuration is also in the list of logs to follow.

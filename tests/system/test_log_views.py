@@ -126,7 +126,7 @@ def test_the_client_shows_everything_about_a_followed_log(agent):
     assert re.fullmatch(r"\d+ B", read)
     warning = shown.pop("warning")
     assert warning.startswith(f"Bytes {size} to {size + 11} were lost at 2")
-    assert warning.endswith("Rotate by renaming, or keep the older files in the log's directory.")
+    assert warning.endswith("or name theirs in rotated_to.")
     for name in ("since", "changed", "last entry"):
         assert re.fullmatch(TIME, shown.pop(name)), name
     assert shown.pop("generations").isdigit()
