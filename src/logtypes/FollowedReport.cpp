@@ -83,8 +83,14 @@ void FollowedReport::run(Receiver& receiver) {
         if (isEnded() || !readFile(file, receiver)) {
             break;
         }
-        receiver.progress(m_done, m_total);
+        show(m_done, receiver);
     }
+}
+
+/// Shows how much was read of all files. What the caller has seen once is never less later.
+void FollowedReport::show(std::int64_t read, Receiver& receiver) {
+    m_read = std::max(m_read, read);
+    receiver.progress(m_read, m_total);
 }
 
 bool FollowedReport::isEnded() {
@@ -196,7 +202,7 @@ void FollowedReport::give(const zrm_rmlogent_data_t& row, Receiver& receiver) {
     ++m_given;
     receiver.give(row);
     if (m_given % rowsPerProgress == 0) {
-        receiver.progress(m_done, m_total);
+        show(m_read, receiver);
     }
 }
 
@@ -230,7 +236,7 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
                 }
             }
         }
-        receiver.progress(m_done + file.size - block.offset(), m_total);
+        show(m_done + file.size - block.offset(), receiver);
         if (isEnded()) {
             return;
         }
@@ -271,7 +277,7 @@ void FollowedReport::readForward(Generation& generation, File& file, Receiver& r
         while (!isPast && (entry = block.next()) != nullptr) {
             look(entry);
         }
-        receiver.progress(m_done + std::min(generation.compressedBytesRead(), file.size), m_total);
+        show(m_done + std::min(generation.compressedBytesRead(), file.size), receiver);
         if (isEnded()) {
             return;
         }

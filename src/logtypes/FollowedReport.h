@@ -79,6 +79,7 @@ private:
     Place place(char* entry, const std::string& newest);
     static bool isFar(Place where, Place farPlace, unsigned& far) noexcept;
     void give(const zrm_rmlogent_data_t& row, Receiver& receiver);
+    void show(std::int64_t read, Receiver& receiver);
 
     const std::string m_path;
     EntryReader& m_entries;
@@ -89,7 +90,8 @@ private:
     std::vector<File> m_files;
     std::unique_ptr<Generation> m_present; ///< opened before the older generations are looked for
     std::string m_newest;                  ///< no entry that is still to be read is much newer
-    std::int64_t m_done = 0;
+    std::int64_t m_done = 0;               ///< bytes of the files before the one that is read
+    std::int64_t m_read = 0;               ///< bytes read so far, as the receiver knows
     std::int64_t m_total = 0;
     std::size_t m_given = 0;
     std::uint64_t m_skipped = 0;

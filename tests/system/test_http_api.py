@@ -172,6 +172,9 @@ def test_a_report_takes_conditions_as_texts(serving):
     assert (answer["from"], answer["to"]) == (stamp(begin + 10), stamp(begin + 19))
     assert (answer["count"], answer["truncated"], answer["max_rows"]) == (2, False, 1000)
     assert answer["columns"] == list(answer["rows"][0])
+    status, _, answer = api.request("POST", "/api/v1/reports", {**body, "limit": 1})
+    assert [row["ENTRYDESC"] for row in answer["rows"]] == ["number 14"]
+    assert (answer["truncated"], answer["complete"]) == (True, False)
     # Without an end, up to the newest entry.
     status, _, answer = api.request("POST", "/api/v1/reports", {"log": str(log), "from": as_iso(begin + 290)})
     assert answer["count"] == 10

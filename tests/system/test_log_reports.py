@@ -218,6 +218,26 @@ def test_rows_come_as_they_are_found_and_the_reading_ends_with_the_caller(agent)
     assert agent.stop() == 0
 
 
+def test_a_refresh_does_not_wait_for_a_report(agent):
+    log = agent.directory / "app.log"
+    log.touch()
+    os.truncate(log, 1 << 40)
+    other = agent.log("other.log")
+    agent.listen = f"127.0.0.1:{free_port()}"
+    agent.follow(log)
+    agent.start()
+    api = Api(agent)
+    connection, response = lines_of(api, {"log": str(log), "from": FROM})
+    response.readline()
+    agent.log("further.log")
+    agent.refresh()
+    wait_until(lambda: len(api.logs()) == 3, f"a log besides {log} and {other}")
+    before = cpu_seconds(agent)
+    wait_until(lambda: cpu_seconds(agent) > before + 0.2, "the reading that goes on")
+    connection.close()
+    assert agent.stop() == 0
+
+
 def test_a_stop_does_not_wait_for_a_report(busy):
     agent, log, api = busy
     connection, response = lines_of(api, {"log": str(log), "from": FROM, "where": ["ENTRYDESC = 'none'"]})

@@ -196,6 +196,17 @@ TEST_F(FollowedReportTest, TheLimitCountsTheRowsThatMeetTheConditions) {
     EXPECT_FALSE(report->isLimited());
 }
 
+TEST_F(FollowedReportTest, TheProgressNeverGoesBack) {
+    std::string text = "GZ";
+    for (int number = 0; number < 30'000; ++number) {
+        text += line("10-04", "text");
+    }
+    directory.write("app.log", line("10-05", "newest"));
+    directory.write("app.log.1.gz", text);
+    EXPECT_THAT(run(always, endOfTime, 1000), SizeIs(1000)); // the receiver checks it
+    EXPECT_EQ(rows.done, line("10-05", "newest").size() + text.size());
+}
+
 TEST_F(FollowedReportTest, GenerationsOutsideTheWindowAreNotRead) {
     directory.write("app.log", line("10-05", "five"));
     directory.write("app.log.1.gz", "GZ" + line("10-04", "four"));
