@@ -37,6 +37,9 @@ constexpr const char* syslogCure =
     "times (RSYSLOG_TraditionalFileFormat).";
 constexpr const char* accountingCure = "Linux's wtmp has other records and cannot be read as type "
                                        "A: remove its line from the log configuration.";
+constexpr const char* tableAccountingCure =
+    "Linux's wtmp has other records and cannot be read as type \"accounting\": remove it from the "
+    "[[log]] table, or exclude it there.";
 
 /// A syslog file that is not monitored.
 class TrialSyslog : public SysLogFile {
@@ -134,6 +137,38 @@ bool isPlausible(const AdminLogFile::utmp& record, std::time_t now) {
            isText(record.ut_line, sizeof record.ut_line);
 }
 
+/// Why a file does not consist of accounting records; none if it may.
+std::optional<std::string> notRecords(const std::string& path,
+                                      const std::optional<FileIdentity>& opened) {
+    constexpr std::size_t length = AdminLogFile::recordLength;
+    struct stat status {};
+    std::array<AdminLogFile::utmp, recordsTried> records;
+    ssize_t count = 0;
+    const Result<MonitoredLogFile> file = MonitoredLogFile::open(path, opened);
+    if (file && ::fstat(file->descriptor(), &status) == 0) {
+        const off_t from = std::max<off_t>(0, status.st_size - static_cast<off_t>(sizeof records));
+        count = ::pread(file->descriptor(), records.data(), sizeof records,
+                        from - from % off_t{length});
+    }
+    if (count <= 0) {
+        return std::nullopt;
+    }
+    if (status.st_size % off_t{length} != 0) {
+        return "The file does not consist of login records of 40 bytes: its size, " +
+               std::to_string(status.st_size) + " bytes, is not a multiple of 40. ";
+    }
+    const std::time_t now = WallClock::seconds();
+    const AdminLogFile::utmp* const first = records.data();
+    const AdminLogFile::utmp* const end = first + static_cast<std::size_t>(count) / length;
+    const bool isRight = std::all_of(
+        first, end, [now](const AdminLogFile::utmp& record) { return isPlausible(record, now); });
+    if (isRight) {
+        return std::nullopt;
+    }
+    return "The file does not consist of login records of 40 bytes: what it holds cannot be "
+           "such records. ";
+}
+
 } // namespace
 
 std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
@@ -162,8 +197,9 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
                                    std::string(syslogCure))});
     }
     if (log.type == 'A') {
-        if (std::optional<std::string> text = ofAccountingFile(log.file, log.openFile)) {
-            warnings.push_back({"not_records", 0, std::move(*text)});
+        if (const std::optional<std::string> text = notRecords(log.file, log.openFile)) {
+            warnings.push_back(
+                {"not_records", 0, *text + (log.follow ? tableAccountingCure : accountingCure)});
         }
     }
     return warnings;
@@ -172,35 +208,11 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
 std::optional<std::string>
 LogWarnings::ofAccountingFile(const std::string& path, const std::optional<FileIdentity>& opened) {
     TraceScope trace(anchor);
-    constexpr std::size_t length = AdminLogFile::recordLength;
-    struct stat status {};
-    std::array<AdminLogFile::utmp, recordsTried> records;
-    ssize_t count = 0;
-    const Result<MonitoredLogFile> file = MonitoredLogFile::open(path, opened);
-    if (file && ::fstat(file->descriptor(), &status) == 0) {
-        const off_t from = std::max<off_t>(0, status.st_size - static_cast<off_t>(sizeof records));
-        count = ::pread(file->descriptor(), records.data(), sizeof records,
-                        from - from % off_t{length});
+    std::optional<std::string> text = notRecords(path, opened);
+    if (text) {
+        *text += accountingCure;
     }
-    if (count <= 0) {
-        return std::nullopt;
-    }
-    if (status.st_size % off_t{length} != 0) {
-        return "The file does not consist of login records of 40 bytes: its size, " +
-               std::to_string(status.st_size) + " bytes, is not a multiple of 40. " +
-               accountingCure;
-    }
-    const std::time_t now = WallClock::seconds();
-    const AdminLogFile::utmp* const first = records.data();
-    const AdminLogFile::utmp* const end = first + static_cast<std::size_t>(count) / length;
-    const bool isRight = std::all_of(
-        first, end, [now](const AdminLogFile::utmp& record) { return isPlausible(record, now); });
-    if (isRight) {
-        return std::nullopt;
-    }
-    return std::string("The file does not consist of login records of 40 bytes: what it "
-                       "holds cannot be such records. ") +
-           accountingCure;
+    return text;
 }
 
 std::optional<std::string> LogWarnings::ofSyslogFile(const std::string& path) {

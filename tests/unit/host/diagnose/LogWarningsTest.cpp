@@ -113,6 +113,13 @@ TEST_F(LogWarningsTest, WarnsAboutAFileWithoutAccountingRecords) {
                 testing::Optional(HasSubstr("cannot be such records")));
     EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.file("none")), std::nullopt);
     EXPECT_EQ(LogWarnings::ofAccountingFile(m_directory.path()), std::nullopt);
+    LogLedgerView log;
+    log.type = 'A';
+    log.file = m_directory.write("wtmp", "x");
+    ASSERT_THAT(kindsOf(log), ElementsAre("not_records"));
+    EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("its line from the log configuration"));
+    log.follow.emplace();
+    EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("remove it from the [[log]] table"));
     // Five records of Linux have the size of 48 of these.
     std::string linux;
     for (int i = 0; i < 5; ++i) {
