@@ -6,9 +6,11 @@ const KINDS = { U: "Text", S: "Syslog", A: "Accounting", E: "Error log" };
 export const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
 
 /** What makes the agent take a log up again after its trouble is fixed. */
-export const again = (configuration) =>
-  `After the fix, change or touch ${configuration?.file ?? "the log configuration"}, ` +
-  "then press “Re-read configuration” under Logs.";
+export const again = (configuration, isFollowed) =>
+  isFollowed
+    ? "After the fix, change the log's [[log]] table, or restart the agent."
+    : `After the fix, change or touch ${configuration?.file ?? "the log configuration"}, ` +
+      "then press “Re-read configuration” under Logs.";
 const WHY = [
   ["log open failed", "The file cannot be opened: it is missing, or the agent may not read it."],
   ["format command", "The format of this log cannot be used. Correct it under “Try a format”."],

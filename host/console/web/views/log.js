@@ -169,7 +169,7 @@ function drawState(element, log, configuration, source) {
     element,
     h("p", {}, h("span", { className: `state ${level}` }, state)),
     why && h("p", { className: `why ${level}` }, why),
-    level === "bad" && h("p", { className: "hint" }, again(configuration)),
+    level === "bad" && h("p", { className: "hint" }, again(configuration, Boolean(follow))),
     facts(pairs),
     follow && h("h2", {}, "Following"),
     follow && facts(followPairs(follow)),

@@ -165,7 +165,8 @@ class LogsPage {
         h(
           "p",
           { className: "hint" },
-          "The agent is re-reading its log configuration. An unchanged file changes nothing.",
+          "The agent is re-reading its log configuration and looking for new files. " +
+            "An unchanged file changes nothing.",
         ),
       );
       setTimeout(() => this.list.isConnected && this.load(), TAKES_A_WHILE);
@@ -282,10 +283,14 @@ class LogsPage {
 
   draw() {
     const judged = this.logs;
-    this.cure.textContent = judged.some(({ level }) => level === "bad")
-      ? again(this.configuration) +
-        (this.isIdle ? " Without a log to monitor, the agent ends after a minute." : "")
-      : "";
+    const bad = judged.filter(({ level }) => level === "bad");
+    this.cure.textContent =
+      bad.length > 0
+        ? again(
+            this.configuration,
+            bad.every(({ ledger }) => ledger?.follow),
+          ) + (this.isIdle ? " Without a log to monitor, the agent ends after a minute." : "")
+        : "";
     const counted = (level) => judged.filter((log) => log.level === level).length;
     say(
       this.counts,
