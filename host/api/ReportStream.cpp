@@ -33,10 +33,10 @@ void ReportStream::attach(std::shared_ptr<BodyChannel> channel) {
     {
         const std::lock_guard guard(m_mutex);
         if (!m_isCancelled) {
-            m_channel = std::move(channel);
+            m_channel.swap(channel);
         }
     }
-    if (channel != nullptr) {
+    if (channel != nullptr) { // it is not wanted any more
         channel->end();
     }
     m_changed.notify_all();
