@@ -2,10 +2,10 @@
 
 #include "logs/FurtherLogs.h"
 #include "logs/ValidLog.h"
+#include "logs/ZoneTime.h"
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/SysLogFile.h"
 #include "logtypes/UserLogFile.h"
-#include "logtypes/ZoneTime.h"
 #include "parser/StringParser.h"
 
 #include <cstring>

@@ -1,7 +1,7 @@
 #ifndef ZRM_SYSLOG_FORMS_H
 #define ZRM_SYSLOG_FORMS_H
 
-#include "logtypes/ZoneTime.h"
+#include "logs/ZoneTime.h"
 
 #include <cstddef>
 #include <cstdint>

@@ -3,8 +3,8 @@
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
 #include "logs/FollowSettings.h"
+#include "logs/ZoneTime.h"
 #include "logtypes/EntryTime.h"
-#include "logtypes/ZoneTime.h"
 
 #include <algorithm>
 #include <cerrno>

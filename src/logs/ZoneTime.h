@@ -37,6 +37,17 @@ std::optional<std::int32_t> takeOffset(std::string_view& text) noexcept;
 /// Both in seconds; at least one offset.
 std::int64_t toUtc(std::int64_t civil, const std::vector<ZoneOffset>& zone) noexcept;
 
+/// The UTC times at which a zone's clock shows one time: two in the hour that the clock repeats.
+struct UtcTimes {
+    std::int64_t first;
+    std::int64_t second; ///< the same as the first if there is only one
+};
+
+/// The UTC times, in seconds, at which this is the zone's time. Without offsets, the zone is local
+/// time. A time that the clock skips is taken as if it had not been changed yet. Looks offsets up
+/// several times, so keep the result.
+UtcTimes utcTimes(std::int64_t civil, const std::vector<ZoneOffset>& zone) noexcept;
+
 /// The local time at this UTC time, both in seconds. Asks the C library once in a quarter of an
 /// hour of log time.
 std::int64_t toLocal(std::int64_t utc) noexcept;

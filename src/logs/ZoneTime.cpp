@@ -1,4 +1,4 @@
-#include "logtypes/ZoneTime.h"
+#include "logs/ZoneTime.h"
 
 #include "base/DigitPairs.h"
 #include "logs/FollowSettings.h"
@@ -36,6 +36,33 @@ std::int64_t floorDivide(std::int64_t number, std::int64_t divisor) noexcept {
 year_month_day dayOf(const CivilTime& time) noexcept {
     return {std::chrono::year(time.year), std::chrono::month(time.month),
             std::chrono::day(time.day)};
+}
+
+/// The difference of local time from UTC at this UTC time.
+std::int64_t localOffsetAt(std::int64_t utc) noexcept {
+    const auto time = static_cast<std::time_t>(utc);
+    std::tm local;
+    if (localtime_r(&time, &local) == nullptr) {
+        return 0;
+    }
+    const CivilTime civil{local.tm_year + 1900,
+                          static_cast<unsigned>(local.tm_mon) + 1,
+                          static_cast<unsigned>(local.tm_mday),
+                          static_cast<unsigned>(local.tm_hour),
+                          static_cast<unsigned>(local.tm_min),
+                          static_cast<unsigned>(local.tm_sec)};
+    return civil.seconds() - utc;
+}
+
+/// The same for a zone, which is local time if it has no offsets.
+std::int64_t offsetAt(std::int64_t utc, const std::vector<ZoneOffset>& zone) noexcept {
+    if (zone.empty()) {
+        return localOffsetAt(utc);
+    }
+    const auto later = std::upper_bound(
+        zone.begin(), zone.end(), utc,
+        [](std::int64_t time, const ZoneOffset& offset) { return time < offset.since; });
+    return later == zone.begin() ? later->seconds : (later - 1)->seconds;
 }
 
 /// A two-digit number at a place of the text; -1 if there is none.
@@ -104,21 +131,23 @@ std::int64_t ZoneTime::toUtc(std::int64_t civil, const std::vector<ZoneOffset>& 
     return civil - current->seconds;
 }
 
+ZoneTime::UtcTimes ZoneTime::utcTimes(std::int64_t civil,
+                                      const std::vector<ZoneOffset>& zone) noexcept {
+    // Offsets differ by less than a day, and changes are further apart than two.
+    const std::int64_t before = offsetAt(civil - daySeconds, zone);
+    const std::int64_t after = offsetAt(civil + daySeconds, zone);
+    const std::int64_t first = civil - before;
+    const std::int64_t second = civil - after;
+    if (before == after || offsetAt(second, zone) != after) {
+        return {first, first};
+    }
+    return offsetAt(first, zone) == before ? UtcTimes{first, second} : UtcTimes{second, second};
+}
+
 std::int64_t ZoneTime::toLocal(std::int64_t utc) noexcept {
     const std::int64_t quarter = floorDivide(utc, quarterHour);
     if (quarter != localOffset.quarter) {
-        const auto begin = static_cast<std::time_t>(quarter * quarterHour);
-        std::tm local;
-        if (localtime_r(&begin, &local) == nullptr) {
-            return utc;
-        }
-        const CivilTime civil{local.tm_year + 1900,
-                              static_cast<unsigned>(local.tm_mon) + 1,
-                              static_cast<unsigned>(local.tm_mday),
-                              static_cast<unsigned>(local.tm_hour),
-                              static_cast<unsigned>(local.tm_min),
-                              static_cast<unsigned>(local.tm_sec)};
-        localOffset = {quarter, civil.seconds() - quarter * quarterHour};
+        localOffset = {quarter, localOffsetAt(quarter * quarterHour)};
     }
     return utc + localOffset.seconds;
 }
