@@ -1,0 +1,184 @@
+#include "monitor/EarlierEntries.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <ctime>
+#include <iterator>
+#include <utility>
+
+namespace zrm {
+
+namespace {
+
+constexpr std::int64_t firstStep = 64 * 1024; ///< bytes, doubled from step to step
+constexpr int entriesPerLook = 16;
+constexpr int entriesPerClock = 1024; ///< entries between two looks at the clock
+
+/// Gives the whole entries of a file that begin in a range of it.
+class RangeReader {
+public:
+    RangeReader(Generation& file, std::int64_t from, std::int64_t to, std::size_t recordLength)
+        : m_file(file), m_to(to), m_block(recordLength), m_isLines(recordLength == 0),
+          // The reading may begin within a line.
+          m_isFirst(m_isLines && from > 0) {
+        m_block.start(m_isLines ? from : from - from % static_cast<std::int64_t>(recordLength), {});
+    }
+
+    /// Null at the end, and where the file cannot be read.
+    char* next() {
+        for (;;) {
+            char* entry = m_block.next();
+            if (entry == nullptr) {
+                const EntryBlock::Fill fill = m_block.fill(m_file);
+                if (fill == EntryBlock::Fill::more) {
+                    continue;
+                }
+                entry = fill == EntryBlock::Fill::end ? m_block.rest() : nullptr;
+            }
+            if (entry == nullptr || m_block.offset() > m_to) {
+                return nullptr;
+            }
+            if (!std::exchange(m_isFirst, false)) {
+                return entry;
+            }
+        }
+    }
+
+private:
+    Generation& m_file;
+    const std::int64_t m_to;
+    EntryBlock m_block;
+    const bool m_isLines;
+    bool m_isFirst;
+};
+
+} // namespace
+
+void EarlierEntries::read(Generation& file, std::int64_t offset, std::int64_t period,
+                          const TimeOf& timeOf, const Take& take) {
+    findParts(file, offset, period, timeOf);
+    const auto end = std::chrono::steady_clock::now() + patience;
+    int entries = 0;
+    const auto takeInTime = [&](char* entry) {
+        return take(entry) &&
+               (++entries % entriesPerClock != 0 || std::chrono::steady_clock::now() < end);
+    };
+    for (auto part = m_parts.rbegin(); part != m_parts.rend(); ++part) {
+        if (!readPart(*part, takeInTime)) {
+            break;
+        }
+    }
+}
+
+void EarlierEntries::findParts(Generation& file, std::int64_t offset, std::int64_t period,
+                               const TimeOf& timeOf) {
+    if (addPart(file, offset, period, timeOf)) {
+        return;
+    }
+    std::vector<GenerationFile> files = olderThan(file);
+    for (auto older = files.rbegin(); older != files.rend() && m_room > 0; ++older) {
+        std::unique_ptr<Generation> generation = Generation::open(older->path);
+        const auto isCopied = [&](const Part& part) { return generation->isCopyOf(*part.file); };
+        if (!generation || generation->isCopyOf(file) ||
+            std::any_of(m_parts.begin(), m_parts.end(), isCopied)) {
+            continue;
+        }
+        Generation::Status status{};
+        const bool isPlain = !generation->isCompressed() && generation->status(status);
+        const bool isFound =
+            addPart(*generation, isPlain ? status.size : mostBytes, period, timeOf);
+        m_older.push_back(std::move(generation));
+        if (isFound) {
+            return;
+        }
+    }
+}
+
+/// Adds as much of the file before `to` as is needed. True if that is enough.
+bool EarlierEntries::addPart(Generation& file, std::int64_t to, std::int64_t period,
+                             const TimeOf& timeOf) {
+    if (to == 0) {
+        return false;
+    }
+    if (!m_periodBegin) {
+        m_periodBegin = newestTime(file, to, timeOf) - period;
+    }
+    std::int64_t from = 0;
+    bool isFound = false;
+    if (file.isCompressed()) {
+        // Read forward, however much of it is needed.
+        isFound = isBeforePeriod(file, 0, timeOf);
+        m_room -= mostBytes / 4;
+    } else {
+        std::int64_t step = firstStep;
+        do {
+            from = std::max<std::int64_t>({to - step, to - m_room, 0});
+            isFound = isBeforePeriod(file, from, timeOf);
+            step *= 2;
+        } while (!isFound && from > 0 && to - from < m_room);
+        m_room -= to - from;
+    }
+    m_parts.push_back({&file, from, to});
+    return isFound || m_room <= 0;
+}
+
+/// The generations older than the file, the oldest first.
+std::vector<GenerationFile> EarlierEntries::olderThan(const Generation& file) const {
+    const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
+    std::vector<GenerationFile> files =
+        youngerThan(findGenerations(real ? real.get() : m_path), {std::nullopt, INT64_MIN});
+    const auto self = std::find_if(files.begin(), files.end(), [&file](const GenerationFile& one) {
+        return one.identity == file.identity();
+    });
+    files.erase(self, files.end());
+    return files;
+}
+
+/// The time of the last entry before `to` that has one, else that of the file's last change.
+std::int64_t EarlierEntries::newestTime(Generation& file, std::int64_t to,
+                                        const TimeOf& timeOf) const {
+    std::optional<std::int64_t> newest;
+    if (!file.isCompressed()) {
+        RangeReader reader(file, std::max<std::int64_t>(to - firstStep, 0), to, m_recordLength);
+        while (char* const entry = reader.next()) {
+            if (const auto range = timeOf(entry)) {
+                newest = range->earliest;
+            }
+        }
+    }
+    Generation::Status status{};
+    if (!newest && file.status(status)) {
+        newest = status.modified / 1'000'000'000;
+    }
+    return newest.value_or(std::time(nullptr));
+}
+
+/// True if the entries at this place are older than the period. One alone may be out of order.
+bool EarlierEntries::isBeforePeriod(Generation& file, std::int64_t at, const TimeOf& timeOf) const {
+    RangeReader reader(file, at, INT64_MAX, m_recordLength);
+    bool hasTime = false;
+    for (int entries = 0; entries < entriesPerLook; ++entries) {
+        char* const entry = reader.next();
+        const auto range = entry != nullptr ? timeOf(entry) : std::nullopt;
+        if (range && range->latest > *m_periodBegin) {
+            return false;
+        }
+        hasTime = hasTime || range.has_value();
+        if (entry == nullptr) {
+            break;
+        }
+    }
+    return hasTime;
+}
+
+bool EarlierEntries::readPart(const Part& part, const Take& take) const {
+    RangeReader reader(*part.file, part.from, part.to, m_recordLength);
+    while (char* const entry = reader.next()) {
+        if (!take(entry)) {
+            return false;
+        }
+    }
+    return true;
+}
+
+} // namespace zrm

@@ -1,0 +1,68 @@
+#ifndef ZRM_EARLIER_ENTRIES_H
+#define ZRM_EARLIER_ENTRIES_H
+
+#include "logs/EntryClock.h"
+#include "monitor/EntryBlock.h"
+#include "monitor/Generation.h"
+#include "monitor/GenerationNames.h"
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace zrm {
+
+/// Reads once more the entries of a followed log that lie before a place in one of its files: at
+/// least those of the last `period` before the newest of them, in this file and in older
+/// generations. Reads only what that needs, and never more than a limit. One thread.
+class EarlierEntries {
+public:
+    static constexpr std::int64_t mostBytes = 64 * 1024 * 1024;
+    static constexpr std::chrono::seconds patience{5};
+
+    /// When an entry was written; none if it does not say so. May change the entry.
+    using TimeOf = std::function<std::optional<EntryClock::Range>(char* entry)>;
+    /// Takes an entry. Returns false to end the reading.
+    using Take = std::function<bool(char* entry)>;
+
+    /// `recordLength`: bytes of a record; 0: the entries are lines.
+    EarlierEntries(std::string path, std::size_t recordLength)
+        : m_path(std::move(path)), m_recordLength(recordLength) {}
+
+    /// Gives the entries of `file` before the offset, and those of older generations before them,
+    /// oldest first. There may be further entries before the period among them.
+    void read(Generation& file, std::int64_t offset, std::int64_t period, const TimeOf& timeOf,
+              const Take& take);
+
+private:
+    /// A range of a file.
+    struct Part {
+        Generation* file;
+        std::int64_t from;
+        std::int64_t to;
+    };
+
+    void findParts(Generation& file, std::int64_t offset, std::int64_t period,
+                   const TimeOf& timeOf);
+    bool addPart(Generation& file, std::int64_t to, std::int64_t period, const TimeOf& timeOf);
+    std::vector<GenerationFile> olderThan(const Generation& file) const;
+    std::int64_t newestTime(Generation& file, std::int64_t to, const TimeOf& timeOf) const;
+    bool isBeforePeriod(Generation& file, std::int64_t at, const TimeOf& timeOf) const;
+    bool readPart(const Part& part, const Take& take) const;
+
+    const std::string m_path;
+    const std::size_t m_recordLength;
+    std::vector<Part> m_parts; ///< newest first
+    std::vector<std::unique_ptr<Generation>> m_older;
+    std::optional<std::int64_t> m_periodBegin; ///< the period follows this time
+    std::int64_t m_room = mostBytes;           ///< bytes that may still be read
+};
+
+} // namespace zrm
+
+#endif

@@ -1,0 +1,147 @@
+#include "monitor/EarlierEntries.h"
+
+#include "FakeCompression.h"
+#include "support/TemporaryDirectory.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <random>
+#include <string>
+#include <vector>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+using namespace zrm;
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+/// Entries are lines "SECONDS text"; others have no time.
+std::optional<EntryClock::Range> timeOf(char* entry) {
+    char* end = nullptr;
+    const std::int64_t time = std::strtoll(entry, &end, 10);
+    if (end == entry) {
+        return std::nullopt;
+    }
+    return EntryClock::Range{time, time};
+}
+
+class EarlierEntriesTest : public testing::Test {
+protected:
+    std::vector<std::string> read(const std::string& name, std::int64_t offset,
+                                  std::int64_t period) {
+        const auto file = Generation::open(m_directory.file(name));
+        EarlierEntries earlier(m_directory.file("log"), 0);
+        std::vector<std::string> entries;
+        earlier.read(*file, offset, period, timeOf, [&](char* entry) {
+            entries.emplace_back(entry, std::strcspn(entry, "\n"));
+            return entries.size() != m_most;
+        });
+        return entries;
+    }
+    /// Writes a file and makes it older than those written before.
+    void write(const std::string& name, const std::string& content) {
+        const std::string path = m_directory.write(name, content);
+        m_age += 100;
+        const timespec times[2] = {{1'000'000 - m_age, 0}, {1'000'000 - m_age, 0}};
+        ASSERT_EQ(utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
+    }
+    static std::string lines(int from, int to) {
+        std::string text;
+        for (int second = from; second < to; ++second) {
+            text += std::to_string(second) + " entry\n";
+        }
+        return text;
+    }
+
+    const FakeCompression m_compression;
+    TemporaryDirectory m_directory;
+    std::size_t m_most = 0;
+    std::time_t m_age = 0;
+};
+
+TEST_F(EarlierEntriesTest, EndsAtThePlace) {
+    write("log", "1 a\n2 b\n3 c\n");
+    EXPECT_THAT(read("log", 8, 60), ElementsAre("1 a", "2 b"));
+    EXPECT_THAT(read("log", 12, 60), ElementsAre("1 a", "2 b", "3 c"));
+    EXPECT_THAT(read("log", 0, 60), IsEmpty());
+}
+
+TEST_F(EarlierEntriesTest, ReadsALargeFileOnlyAsFarBackAsThePeriodGoes) {
+    const std::string content = lines(100'000, 900'000);
+    write("log", content);
+    const auto entries = read("log", static_cast<std::int64_t>(content.size()), 60);
+    EXPECT_EQ(entries.back(), "899999 entry");
+    EXPECT_THAT(entries, SizeIs(testing::AllOf(testing::Ge(60U), testing::Le(10'000U))));
+    EXPECT_THAT(read("log", static_cast<std::int64_t>(content.size()), 500'000),
+                SizeIs(testing::Ge(500'000U)));
+}
+
+TEST_F(EarlierEntriesTest, AnOldEntryDoesNotEndTheSearch) {
+    std::string content = lines(100'000, 120'000);
+    // At every place at which the search may look.
+    for (std::size_t at = content.find('\n', content.size() - 140'000); at < content.size() - 2000;
+         at = content.find('\n', at + 1000)) {
+        content.insert(at + 1, "5 old\n");
+    }
+    write("log", content);
+    const auto entries = read("log", static_cast<std::int64_t>(content.size()), 15'000);
+    EXPECT_THAT(entries, testing::Contains("105000 entry"));
+}
+
+TEST_F(EarlierEntriesTest, GoesBackIntoOlderGenerations) {
+    write("log", "103 c\n");
+    write("log.1", "101 a\n102 b\nno time");
+    write("log.2", "9 older\n10 older\n");
+    write("log.3", "8 not read\n");
+    EXPECT_THAT(read("log", 6, 60),
+                ElementsAre("9 older", "10 older", "101 a", "102 b", "no time", "103 c"));
+    EXPECT_THAT(read("log", 0, 60),
+                ElementsAre("9 older", "10 older", "101 a", "102 b", "no time"));
+    EXPECT_THAT(read("log.1", 6, 60), ElementsAre("9 older", "10 older", "101 a"));
+}
+
+TEST_F(EarlierEntriesTest, ReadsCompressedGenerationsAndNoFileTwice) {
+    write("log", "103 c\n");
+    write("log.1", "103 c\n");
+    write("log.2", "101 a\n102 b\n");
+    write("log.2.gz", "GZ101 a\n102 b\n");
+    write("log.3.gz", "GZ99 x\n100 y\n");
+    write("log.4.gz", "GZ7 older\n");
+    write("log.5.gz", "GZ8 not read\n");
+    EXPECT_THAT(read("log", 6, 60),
+                ElementsAre("7 older", "99 x", "100 y", "101 a", "102 b", "103 c"));
+}
+
+TEST_F(EarlierEntriesTest, EndsWhenToldTo) {
+    write("log", "1 a\n2 b\n3 c\n");
+    m_most = 2;
+    EXPECT_THAT(read("log", 12, 60), ElementsAre("1 a", "2 b"));
+}
+
+TEST_F(EarlierEntriesTest, WithoutTimesTheFilesTimeOfChangeDecides) {
+    write("log", "a\nb\n");
+    write("log.1", "1 c\n");
+    EXPECT_THAT(read("log", 4, 60), ElementsAre("1 c", "a", "b"));
+}
+
+TEST_F(EarlierEntriesTest, ReadsRecords) {
+    write("log", "1aa2bb3cc");
+    const auto file = Generation::open(m_directory.file("log"));
+    EarlierEntries earlier(m_directory.file("log"), 3);
+    std::string read;
+    earlier.read(*file, 6, 60, timeOf, [&](char* record) {
+        read.append(record, 3);
+        return true;
+    });
+    EXPECT_EQ(read, "1aa2bb");
+}
+
+} // namespace
