@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "logs/EntryClock.h"
 #include "logs/RequestThresholds.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
@@ -101,10 +102,17 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         return;
     }
     const auto row = std::make_unique<zrm_rmlogent_data_t>();
+    const bool isFollowed = log.followSettings() != nullptr;
+    EntryClock clock(log.followSettings(), EntryClock::Reading::backward);
+    const std::size_t first = m_matched.size();
     while (log.getNextLogEntry(row.get(), report, &window) != nullptr) {
         if (limits.areReached(result)) {
             result.isTruncated = true;
             break;
+        }
+        std::optional<std::int64_t> instant;
+        if (isFollowed) {
+            instant = clock.next(lastEntryMoment, row->entrytime);
         }
         if (std::memcmp(row->entrytime, to.data(), sizeof row->entrytime) > 0) {
             continue;
@@ -113,9 +121,14 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         reach.reached.assign(row->entrytime, sizeof row->entrytime);
         if (m_replay.matches(*row)) {
             ++result.matched;
-            Stamp& stamp = m_matched.emplace_back();
-            std::memcpy(stamp.data(), row->entrytime, stamp.size());
+            Matched& matched = m_matched.emplace_back();
+            std::memcpy(matched.time.data(), row->entrytime, matched.time.size());
+            matched.order = matched.time;
+            matched.instant = instant;
         }
+    }
+    if (isFollowed) {
+        keepOrder(first);
     }
     log.endReportRequest(&report);
     reach.reason = result.isTruncated ? limits.reason : outcome.reason();
@@ -140,16 +153,36 @@ void Backtest::addReach(const LogFile& log, Reach reach, Result& result) {
     }
 }
 
+/// Entries of a followed log from this one on stay in the log's order: they count as they are read,
+/// also where their times go back.
+void Backtest::keepOrder(std::size_t first) {
+    Stamp newest{};
+    for (std::size_t index = m_matched.size(); index-- > first;) {
+        newest = std::max(newest, m_matched[index].order);
+        m_matched[index].order = newest;
+    }
+}
+
+Replay::Verdict Backtest::count(const Matched& matched) {
+    if (!matched.instant) {
+        return m_replay.count(matched.time.data());
+    }
+    const EntryInstant instant(*matched.instant);
+    return m_replay.count(matched.time.data());
+}
+
 void Backtest::replay(Result& result) {
     TraceScope trace(anchor);
     // Entries of one second stay as the log has them, which is newest first here.
     std::reverse(m_matched.begin(), m_matched.end());
-    std::stable_sort(m_matched.begin(), m_matched.end());
-    for (const Stamp& stamp : m_matched) {
-        if (m_replay.count(stamp.data()).isRaised) {
+    std::stable_sort(
+        m_matched.begin(), m_matched.end(),
+        [](const Matched& left, const Matched& right) { return left.order < right.order; });
+    for (const Matched& matched : m_matched) {
+        if (count(matched).isRaised) {
             ++result.raised;
             if (result.raisedAt.size() < mostTimes) {
-                result.raisedAt.emplace_back(stamp.data(), stamp.size());
+                result.raisedAt.emplace_back(matched.time.data(), matched.time.size());
             }
         }
     }

@@ -7,8 +7,10 @@
 
 #include <array>
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -55,15 +57,23 @@ public:
 private:
     using Stamp = std::array<char, 16>;
     struct Limits;
+    /// An entry that met every condition.
+    struct Matched {
+        Stamp time;
+        Stamp order;                         ///< time by which entries of all logs are ordered
+        std::optional<std::int64_t> instant; ///< of a followed log
+    };
 
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
               Result& result);
+    void keepOrder(std::size_t first);
+    Replay::Verdict count(const Matched& matched);
     void replay(Result& result);
     static void addReach(const LogFile& log, Reach reach, Result& result);
     std::string decisionOf(const Result& result) const;
 
     Replay m_replay;
-    std::vector<Stamp> m_matched; ///< newest first within a log, one log after another
+    std::vector<Matched> m_matched; ///< newest first within a log, one log after another
 };
 
 } // namespace zrm::host

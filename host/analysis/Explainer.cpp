@@ -6,6 +6,7 @@
 #include "host/analysis/StoredRow.h"
 #include "host/events/RowJson.h"
 #include "host/events/RowText.h"
+#include "logs/EntryClock.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -110,12 +111,12 @@ Result<std::vector<Explanation>> Explainer::last(LogFile& log, std::size_t numbe
 Result<std::vector<Explanation>> Explainer::line(LogFile& log, std::string_view line) {
     TraceScope trace(anchor);
     std::optional<Seen> found;
-    Stamps matched;
+    Times matched;
     // If the log cannot be read, no entries precede the line.
     read(log, [&](auto text, zrm_rmlogent_data_t* row) {
         Seen seen = judge(m_replay, text, row);
         if (seen.verdict.matches && m_replay.hasThresholds()) {
-            matched.push_back(stampOf(seen.row));
+            matched.push_back({stampOf(seen.row), EntryInstant::ofThisThread()});
         }
         if (text == line) {
             found = std::move(seen);
@@ -127,9 +128,23 @@ Result<std::vector<Explanation>> Explainer::line(LogFile& log, std::string_view 
     return nextLine(log, line, matched);
 }
 
+/// Counts the entries up to that of the last time.
+void Explainer::countBefore(Replay& replay, const Times& before, const Written& last) {
+    for (const Written& written : before) {
+        if (written.instant) {
+            const EntryInstant instant(*written.instant);
+            if (*written.instant <= last.instant) {
+                replay.count(written.stamp.data());
+            }
+        } else if (written.stamp <= last.stamp) {
+            replay.count(written.stamp.data());
+        }
+    }
+}
+
 /// The line as if it came after all entries up to its time.
 Result<std::vector<Explanation>> Explainer::nextLine(LogFile& log, std::string_view line,
-                                                     const Stamps& before) {
+                                                     const Times& before) {
     TraceScope trace(anchor);
     Replay replay(m_situation, m_entries);
     bool isFirst = true;
@@ -140,11 +155,7 @@ Result<std::vector<Explanation>> Explainer::nextLine(LogFile& log, std::string_v
     const Result<void> whole =
         LogTail(log).readLine(line, [&](auto text, zrm_rmlogent_data_t* row) {
             if (row != nullptr && std::exchange(isFirst, false)) {
-                for (const std::string& stamp : before) {
-                    if (stamp <= stampOf(*row)) {
-                        replay.count(stamp.data());
-                    }
-                }
+                countBefore(replay, before, {stampOf(*row), EntryInstant::ofThisThread()});
             }
             Seen seen = judge(replay, text, row);
             explanations.push_back(describe(&log, seen));

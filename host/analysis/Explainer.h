@@ -63,15 +63,21 @@ public:
 private:
     /// An entry and the verdict on it.
     struct Seen;
-    using Stamps = std::vector<std::string>;
+    /// When an entry was written.
+    struct Written {
+        std::string stamp;
+        std::optional<std::int64_t> instant; ///< of a followed log
+    };
+    using Times = std::vector<Written>;
 
     Result<void> read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
                                                              zrm_rmlogent_data_t* row)>& entry);
     Seen judge(Replay& replay, std::optional<std::string_view> line, zrm_rmlogent_data_t* row);
+    static void countBefore(Replay& replay, const Times& before, const Written& last);
     Explanation describe(const LogFile* log, Seen& seen);
     void decide(Explanation& explanation, const Seen& seen) const;
     Result<std::vector<Explanation>> nextLine(LogFile& log, std::string_view line,
-                                              const Stamps& before);
+                                              const Times& before);
 
     const SituationConfig m_situation;
     const bool m_isStopped;

@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <utility>
 #include <vector>
 
 #include <fcntl.h>
@@ -78,6 +79,8 @@ bool seekTail(int fd) {
 
 } // namespace
 
+LogTail::LogTail(LogFile& log) : m_log(log), m_clock(log.followSettings()) {}
+
 bool LogTail::hasLines() const noexcept {
     return m_log.type() == 'U' || m_log.type() == 'S';
 }
@@ -139,9 +142,14 @@ void LogTail::pieces(int fd, const Entry& entry) {
     std::string line;
     // A busy log that grows meanwhile must not keep this loop from ending.
     std::size_t bytes = 0;
+    bool isLineBegun = false;
     for (char* piece; bytes < 2 * longest && (piece = reader.next()) != nullptr;) {
         line = piece; // building the row may change it
         bytes += line.size() + 1;
+        const bool isRest = std::exchange(isLineBegun, !line.ends_with('\n'));
+        if (isRest && m_log.followSettings() != nullptr) {
+            continue; // a line of a followed log is one entry
+        }
         const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
         if (isRow && m_reach.reached.empty()) {
             note(row);
@@ -151,8 +159,22 @@ void LogTail::pieces(int fd, const Entry& entry) {
         }
         LineEntry read(&m_log, line);
         const LogEntry::Offer offer(read);
-        entry(line, isRow ? &row : nullptr);
+        if (isRow) {
+            give(entry, line, row, lastEntryMoment);
+        } else {
+            entry(line, nullptr);
+        }
     }
+}
+
+void LogTail::give(const Entry& entry, std::optional<std::string_view> line,
+                   zrm_rmlogent_data_t& row, const EntryMoment& moment) {
+    if (m_log.followSettings() == nullptr) {
+        entry(line, &row);
+        return;
+    }
+    const EntryInstant instant(m_clock.next(moment, row.entrytime));
+    entry(line, &row);
 }
 
 /// The entries of a report over all times, newest first.
@@ -168,8 +190,10 @@ void LogTail::entries(const Entry& entry) {
         return;
     }
     std::vector<zrm_rmlogent_data_t> rows(1);
+    std::vector<EntryMoment> moments;
     while (rows.size() <= mostEntries &&
            m_log.getNextLogEntry(&rows.back(), report, &always) != nullptr) {
+        moments.push_back(lastEntryMoment);
         rows.emplace_back();
     }
     if (rows.size() > mostEntries) {
@@ -181,8 +205,9 @@ void LogTail::entries(const Entry& entry) {
     if (!rows.empty()) {
         note(rows.back());
     }
-    std::for_each(rows.rbegin(), rows.rend(),
-                  [&](zrm_rmlogent_data_t& row) { entry(std::nullopt, &row); });
+    for (std::size_t index = rows.size(); index-- > 0;) {
+        give(entry, std::nullopt, rows[index], moments[index]);
+    }
 }
 
 void LogTail::note(const zrm_rmlogent_data_t& oldest) {

@@ -2,6 +2,7 @@
 #define ZRM_HOST_LOG_TAIL_H
 
 #include "host/base/Result.h"
+#include "logs/EntryClock.h"
 #include "logs/zrm_rmlogent_data.h"
 
 #include <cstddef>
@@ -30,7 +31,8 @@ struct Reach {
 
 /// Reads the end of a log, and lines that it might contain, as its monitor would: in the same
 /// pieces and with the log's own operation that makes rows. The monitor is not affected: rows are
-/// made in the way of reports, and its counters do not count them.
+/// made in the way of reports, and its counters do not count them. While an entry of a followed log
+/// is given, its EntryInstant exists.
 class LogTail {
 public:
     static constexpr std::size_t longest = 4 * 1024 * 1024; ///< bytes of a text log
@@ -44,7 +46,7 @@ public:
         std::function<void(std::optional<std::string_view> line, zrm_rmlogent_data_t* row)>;
 
     /// The log outlives the object.
-    explicit LogTail(LogFile& log) : m_log(log) {}
+    explicit LogTail(LogFile& log);
 
     /// Whether the log is a file of lines; otherwise its entries come from its reports, and no line
     /// can be passed.
@@ -64,9 +66,12 @@ private:
     void pieces(int fd, const Entry& entry);
     void entries(const Entry& entry);
 
+    void give(const Entry& entry, std::optional<std::string_view> line, zrm_rmlogent_data_t& row,
+              const EntryMoment& moment);
     void note(const zrm_rmlogent_data_t& oldest);
 
     LogFile& m_log;
+    EntryClock m_clock;
     Reach m_reach;
     bool m_isCut = false; ///< the log begins before what is read
 };

@@ -53,6 +53,10 @@ protected:
         frequency = newest.countEvents(period, newest.eventTime());
         return *frequency;
     }
+    long countFollowed(std::int64_t instant) override {
+        frequency = zrm_rmlogent_agent::countFollowed(instant);
+        return *frequency;
+    }
 };
 
 Replay::Replay(const SituationConfig& situation, TableManager& entries)

@@ -18,8 +18,9 @@ namespace zrm::host {
 
 /// Judges entries as a situation would, without being one: a request of the agent's own, which no
 /// log offers anything to and which raises nothing. Conditions and thresholds are judged by the
-/// very code that monitors; only the period in which entries are counted ends at the time of the
-/// newest entry and not now, as if each entry had been read when it was written. One thread.
+/// very code that monitors. Of a log of the log configuration, the period in which entries are
+/// counted ends at the time of the newest entry and not now, as if each entry had been read when it
+/// was written. While an EntryInstant exists, an entry is one of a followed log. One thread.
 class Replay {
 public:
     struct Verdict {

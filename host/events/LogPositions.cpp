@@ -43,6 +43,10 @@ bool LogPositions::areKept() const noexcept {
     return m_state->book->isKept();
 }
 
+bool LogPositions::isFirstOfRun() const noexcept {
+    return m_state->follower == FollowedLog::firstFollower;
+}
+
 std::optional<LogPosition> LogPositions::stored() const {
     return m_state->log->newest();
 }

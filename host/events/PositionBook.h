@@ -48,6 +48,7 @@ public:
 
     /// Identifies who follows the log; what others say of its position is ignored from now on.
     using Follower = std::uint64_t;
+    static constexpr Follower firstFollower = 1; ///< of the process
     Follower begin();
     void end(Follower follower);
     /// The newest position that the queue has or that was reached.

@@ -56,16 +56,16 @@ void TraceCapture::add(const char* format, std::va_list arguments) noexcept {
     }
 }
 
-TraceSilence::TraceSilence() noexcept {
-    ++t_silences;
-}
-
-TraceSilence::~TraceSilence() {
-    --t_silences;
-}
-
-bool TraceSilence::isOn() noexcept {
-    return t_silences != 0;
-}
-
 } // namespace zrm::host
+
+TRC1_Silence::TRC1_Silence() noexcept {
+    ++zrm::host::t_silences;
+}
+
+TRC1_Silence::~TRC1_Silence() {
+    --zrm::host::t_silences;
+}
+
+bool TRC1_Silence::isOn() noexcept {
+    return zrm::host::t_silences != 0;
+}

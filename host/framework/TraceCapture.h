@@ -1,6 +1,8 @@
 #ifndef ZRM_HOST_TRACE_CAPTURE_H
 #define ZRM_HOST_TRACE_CAPTURE_H
 
+#include "framework/traceSilence.h"
+
 #include <cstdarg>
 #include <string>
 
@@ -34,19 +36,8 @@ private:
     std::string m_errors;
 };
 
-/// While it exists, nothing that the constructing thread traces is written; other threads trace as
-/// usual and at the same cost. Used when entries are judged again to answer a query, which does not
-/// belong in the trace of monitoring.
-class TraceSilence {
-public:
-    TraceSilence() noexcept;
-    ~TraceSilence();
-    TraceSilence(const TraceSilence&) = delete;
-    TraceSilence& operator=(const TraceSilence&) = delete;
-
-    /// Whether the calling thread has one. For the trace facility.
-    static bool isOn() noexcept;
-};
+/// For entries that are judged again to answer a query.
+using TraceSilence = TRC1_Silence;
 
 } // namespace zrm::host
 

@@ -90,6 +90,11 @@ unsigned ctreq::CheckForException(char* row) {
     return 1;
 }
 
+bool ctreq::MeetsConditions(char* row) {
+    return !m_framework->stopped.load(std::memory_order_relaxed) &&
+           m_framework->conditionsOf(*this).holds(row);
+}
+
 unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,
                                   char* /*value*/) {
     return 0;

@@ -69,6 +69,8 @@ int zrmMain(int argc, char** argv) {
     }
     getSystemName();
     LogFile::setRowReceiver(zrm_rmlogent_manager::EventArrived);
+    LogFile::setEarlierReceiver(
+        {zrm_rmlogent_manager::LongestPeriod, zrm_rmlogent_manager::CountEarlier});
     auto* const logManager = new (std::nothrow) LogManager;
     if (logManager == nullptr) {
         endWithoutMemory(trace, sizeof(LogManager));

@@ -37,6 +37,10 @@ public:
     /// for the first time after a start.
     bool areKept() const noexcept;
 
+    /// True for the log's first object of the run: what is before the stored position was judged by
+    /// an earlier run.
+    bool isFirstOfRun() const noexcept;
+
     /// The newest position that this run or an earlier one has stored or is about to store. None
     /// for a new log.
     std::optional<LogPosition> stored() const;

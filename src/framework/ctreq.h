@@ -56,6 +56,9 @@ public:
     int IsException(_IntfOper op, const char* column, const char* value, int width);
     /// Compares an integer column with an 8-byte number in host order, which may be unaligned.
     int IsException(_IntfOper op, int column, const char* value);
+    /// True if the row meets the request's conditions. Unlike CheckForException, leaves nothing
+    /// behind: it was judged before.
+    bool MeetsConditions(char* row);
     /// Dumps the conditions to the trace.
     void DumpThresholds();
     /// Sends the `count` rows collected so far.

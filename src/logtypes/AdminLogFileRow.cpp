@@ -5,6 +5,7 @@
 #include "base/TraceScope.h"
 #include "base/UTF8Conv.h"
 #include "framework/locale.h"
+#include "logs/EntryClock.h"
 #include "logs/zrm_rmlogent_data.h"
 
 #include <algorithm>
@@ -86,6 +87,9 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
     EntryRow entryRow(*this, row);
     auto& columns = entryRow.columns();
 
+    if (followSettings() != nullptr) {
+        lastEntryMoment = {EntryMoment::Kind::instant, entry.ut_time};
+    }
     if (entryRow.isOwn()) {
         m_quarterHour.generateTimestamp(entry.ut_time, columns.entrytime);
     } else {

@@ -4,6 +4,7 @@
 #include "base/TraceScope.h"
 #include "base/UTF8Conv.h"
 #include "framework/locale.h"
+#include "logs/EntryClock.h"
 #include "logs/FollowSettings.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
@@ -69,8 +70,11 @@ void SysLogFile::writeFollowedTime(char* out, const SyslogTime& time, void* repo
     std::int64_t seconds = civil.seconds();
     const std::vector<ZoneOffset>& zone = followSettings()->zone;
     if (time.offset) {
-        seconds = ZoneTime::toLocal(seconds - *time.offset);
+        seconds -= *time.offset;
+        lastEntryMoment = {EntryMoment::Kind::instant, seconds};
+        seconds = ZoneTime::toLocal(seconds);
     } else if (!zone.empty()) {
+        lastEntryMoment = {EntryMoment::Kind::zoned, seconds};
         seconds = ZoneTime::toLocal(ZoneTime::toUtc(seconds, zone));
     }
     if (ZoneTime::writeStamp(seconds, out) && report != nullptr) {

@@ -2,6 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "base/TraceScope.h"
+#include "logs/EntryClock.h"
 #include "logs/FollowSettings.h"
 #include "logs/ZoneTime.h"
 #include "logtypes/EntryTime.h"
@@ -266,8 +267,11 @@ void UserLogFile::convertToLocalTime(const char* zone, EntryTime& time) const {
     text.remove_prefix(std::min(text.find_first_not_of(" .,0123456789"), text.size()));
     std::int64_t seconds = civil.seconds();
     if (const std::optional<std::int32_t> offset = ZoneTime::takeOffset(text)) {
-        seconds = ZoneTime::toLocal(seconds - *offset);
+        seconds -= *offset;
+        lastEntryMoment = {EntryMoment::Kind::instant, seconds};
+        seconds = ZoneTime::toLocal(seconds);
     } else if (!offsets.empty()) {
+        lastEntryMoment = {EntryMoment::Kind::zoned, seconds};
         seconds = ZoneTime::toLocal(ZoneTime::toUtc(seconds, offsets));
     }
     civil = CivilTime::of(seconds);

@@ -44,6 +44,9 @@ public:
         }
     }
 
+    /// Of the last entry.
+    std::string_view text() const noexcept { return m_block.text(); }
+
 private:
     Generation& m_file;
     const std::int64_t m_to;
@@ -59,8 +62,8 @@ void EarlierEntries::read(Generation& file, std::int64_t offset, std::int64_t pe
     findParts(file, offset, period, timeOf);
     const auto end = std::chrono::steady_clock::now() + patience;
     int entries = 0;
-    const auto takeInTime = [&](char* entry) {
-        return take(entry) &&
+    const auto takeInTime = [&](char* entry, std::string_view text) {
+        return take(entry, text) &&
                (++entries % entriesPerClock != 0 || std::chrono::steady_clock::now() < end);
     };
     for (auto part = m_parts.rbegin(); part != m_parts.rend(); ++part) {
@@ -75,9 +78,8 @@ void EarlierEntries::findParts(Generation& file, std::int64_t offset, std::int64
     if (addPart(file, offset, period, timeOf)) {
         return;
     }
-    std::vector<GenerationFile> files = olderThan(file);
-    for (auto older = files.rbegin(); older != files.rend() && m_room > 0; ++older) {
-        std::unique_ptr<Generation> generation = Generation::open(older->path);
+    for (const GenerationFile& older : olderThan(file)) {
+        std::unique_ptr<Generation> generation = Generation::open(older.path);
         const auto isCopied = [&](const Part& part) { return generation->isCopyOf(*part.file); };
         if (!generation || generation->isCopyOf(file) ||
             std::any_of(m_parts.begin(), m_parts.end(), isCopied)) {
@@ -122,15 +124,17 @@ bool EarlierEntries::addPart(Generation& file, std::int64_t to, std::int64_t per
     return isFound || m_room <= 0;
 }
 
-/// The generations older than the file, the oldest first.
+/// The generations older than the file, the newest first.
 std::vector<GenerationFile> EarlierEntries::olderThan(const Generation& file) const {
     const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
     std::vector<GenerationFile> files =
-        youngerThan(findGenerations(real ? real.get() : m_path), {std::nullopt, INT64_MIN});
+        newestFirst(findGenerations(real ? real.get() : m_path, 0, m_rotatedTo));
     const auto self = std::find_if(files.begin(), files.end(), [&file](const GenerationFile& one) {
         return one.identity == file.identity();
     });
-    files.erase(self, files.end());
+    if (self != files.end()) {
+        files.erase(files.begin(), self + 1);
+    }
     return files;
 }
 
@@ -174,7 +178,7 @@ bool EarlierEntries::isBeforePeriod(Generation& file, std::int64_t at, const Tim
 bool EarlierEntries::readPart(const Part& part, const Take& take) const {
     RangeReader reader(*part.file, part.from, part.to, m_recordLength);
     while (char* const entry = reader.next()) {
-        if (!take(entry)) {
+        if (!take(entry, reader.text())) {
             return false;
         }
     }

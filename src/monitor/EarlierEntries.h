@@ -13,6 +13,8 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
 namespace zrm {
@@ -27,12 +29,14 @@ public:
 
     /// When an entry was written; none if it does not say so. May change the entry.
     using TimeOf = std::function<std::optional<EntryClock::Range>(char* entry)>;
-    /// Takes an entry. Returns false to end the reading.
-    using Take = std::function<bool(char* entry)>;
+    /// Takes an entry, with its text as of EntryBlock. Returns false to end the reading.
+    using Take = std::function<bool(char* entry, std::string_view text)>;
 
-    /// `recordLength`: bytes of a record; 0: the entries are lines.
-    EarlierEntries(std::string path, std::size_t recordLength)
-        : m_path(std::move(path)), m_recordLength(recordLength) {}
+    /// `rotatedTo` as in FollowSettings. `recordLength`: bytes of a record; 0: the entries are
+    /// lines.
+    EarlierEntries(std::string path, std::string rotatedTo, std::size_t recordLength)
+        : m_path(std::move(path)), m_rotatedTo(std::move(rotatedTo)), m_recordLength(recordLength) {
+    }
 
     /// Gives the entries of `file` before the offset, and those of older generations before them,
     /// oldest first. There may be further entries before the period among them.
@@ -56,6 +60,7 @@ private:
     bool readPart(const Part& part, const Take& take) const;
 
     const std::string m_path;
+    const std::string m_rotatedTo;
     const std::size_t m_recordLength;
     std::vector<Part> m_parts; ///< newest first
     std::vector<std::unique_ptr<Generation>> m_older;

@@ -2,6 +2,7 @@
 
 #include "base/RowBytes.h"
 #include "base/TraceScope.h"
+#include "logs/EntryClock.h"
 #include "monitor/LogFile.h"
 
 namespace zrm {
@@ -22,6 +23,7 @@ EntryRow::EntryRow(LogFile& log, void* row)
       m_own(row == log.ownRow() ? &log.m_ownRow : nullptr) {
     TraceScope trace(anchor);
     char* const bytes = static_cast<char*>(row);
+    lastEntryMoment = {};
     // While the flow class is traced, fillCommonColumns must run for each row.
     if (m_own != nullptr && m_own->m_isReusable && !trace.isOn(TRC1_FLOW)) {
         RowBytes::blank(bytes + entryBegin,

@@ -58,6 +58,13 @@ LogPosition FileFollower::positionInBlock() const noexcept {
     return position;
 }
 
+std::optional<FileFollower::Place> FileFollower::place() const noexcept {
+    if (m_chain.empty()) {
+        return std::nullopt;
+    }
+    return Place{*m_chain.front().file, m_block.offset()};
+}
+
 std::optional<LogPosition> FileFollower::position() const noexcept {
     if (m_isInBlock) {
         return positionInBlock();

@@ -62,6 +62,12 @@ public:
     bool isTextCut() const noexcept { return m_block.isTextCut(); }
     /// Behind the last entry. None before a file has been opened.
     std::optional<LogPosition> position() const noexcept;
+    /// The file that is read, and where in it the next entry begins. None while there is no file.
+    struct Place {
+        Generation& file;
+        std::int64_t offset;
+    };
+    std::optional<Place> place() const noexcept;
     /// How many bytes were read since the last call.
     std::int64_t takeBytesRead() noexcept { return std::exchange(m_bytesRead, 0); }
     /// Updates the position in the ledger.

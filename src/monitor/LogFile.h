@@ -2,6 +2,7 @@
 #define ZRM_LOG_FILE_H
 
 #include "framework/Pulse.h"
+#include "logs/EntryClock.h"
 #include "logs/LogBase.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "monitor/EntryRow.h"
@@ -56,6 +57,18 @@ public:
     /// Sets the receiver of the rows of all logs; null discards them. Call it while no log has a
     /// thread.
     static void setRowReceiver(RowReceiver receiver) noexcept { m_rowReceiver = receiver; }
+    /// Counts entries that were judged before the log's thread began, so that thresholds go on
+    /// where an earlier run ended. Nothing is raised for them.
+    struct EarlierReceiver {
+        /// The longest period, in seconds, in which a situation on the log counts entries; 0: none
+        /// does. The row has the columns of the log.
+        std::int64_t (*period)(zrm_rmlogent_data_t& row);
+        void (*count)(zrm_rmlogent_data_t& row);
+    };
+    /// Call it while no log has a thread.
+    static void setEarlierReceiver(const EarlierReceiver& receiver) noexcept {
+        m_earlierReceiver = receiver;
+    }
     /// Sets the open debug log of all logs, or null. The stream must stay open as long as any log
     /// that may write to it exists.
     static void setDebugLog(std::FILE* stream) noexcept;
@@ -136,9 +149,9 @@ protected:
     /// The body of the monitoring thread of such a log: returns when the log has to end. Bytes of a
     /// record; 0: its entries are lines.
     void followLog(std::size_t recordLength);
-    /// Waits for room and offers a row to the situations. Returns false if the log has to end or
-    /// the process is ending before there is room. Then nothing was offered, and the entry counts
-    /// as skipped.
+    /// Waits for room and offers a row to the situations, right after formatting it. Returns false
+    /// if the log has to end or the process is ending before there is room. Then nothing was
+    /// offered, and the entry counts as skipped.
     bool offer(zrm_rmlogent_data_t* row);
     /// Counts further entries as skipped if the process is ending.
     static void notePassedOver(std::uint64_t entries) noexcept;
@@ -190,8 +203,11 @@ private:
 
     void initializeLock();
     static void fillChangingColumns(zrm_rmlogent_data_t* row);
+    bool waitAndOffer(zrm_rmlogent_data_t* row);
     bool checkForChange();
     bool readGrowth();
+    std::int64_t timeOf(zrm_rmlogent_data_t& row);
+    void recount(FileFollower& follower, std::size_t recordLength);
     bool readEntries(FileFollower& follower, LogPositions& positions, FollowedEntry& current);
     void noteFollowed(FileFollower& follower, LogPositions& positions);
     void noteFollowFailure();
@@ -206,11 +222,14 @@ private:
     bool hasWaitedEnough() noexcept;
 
     static inline RowReceiver m_rowReceiver = nullptr;
+    static inline EarlierReceiver m_earlierReceiver{};
 
     bool m_hasThread = false; ///< LogThread must be joined; used only when starting and stopping
     // Used by the log's thread only.
     std::chrono::steady_clock::time_point m_end{}; ///< when a log that has to end stops reading
     bool m_isFailureTraced = false;
+    bool m_isMissingTimeTraced = false;
+    EntryClock m_clock{followSettings()}; ///< of a followed log
     LineReader m_lineReader;
     ReadGuard m_guard;
     OwnRow m_ownRow;

@@ -7,6 +7,8 @@
 #include "monitor/FileFollower.h"
 #include "monitor/FollowedEntry.h"
 
+#include <utility>
+
 #include <sys/select.h>
 
 namespace zrm {
@@ -66,12 +68,16 @@ void LogFile::followLog(std::size_t recordLength) {
         follower.resumeAt(*stored);
     }
     std::int64_t losses = 0;
+    bool isRecountDue = stored.has_value() && positions.isFirstOfRun();
     for (bool isLast = false; !isLast;) {
         // What is there when the log is to end is still read.
         isLast = monitorStatus() != MONITOR_RUNNING;
         m_pulse.work("looks at the log");
         if (follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read
+            if (std::exchange(isRecountDue, false)) {
+                recount(follower, recordLength);
+            }
             if (!readEntries(follower, positions, current)) {
                 // Who follows the log next judges this entry, and none of those before it again.
                 if (follower.takeBack()) {
@@ -123,6 +129,18 @@ bool LogFile::readEntries(FileFollower& follower, LogPositions& positions, Follo
 }
 
 void LogFile::readFields(std::string_view /*text*/, EntryFields& /*fields*/) const {}
+
+/// The time of the entry that the row was just made of, in seconds since 1970-01-01 UTC.
+std::int64_t LogFile::timeOf(zrm_rmlogent_data_t& row) {
+    const std::int64_t time = m_clock.next(lastEntryMoment, row.entrytime);
+    if (!m_clock.hadTime() && !std::exchange(m_isMissingTimeTraced, true)) {
+        TraceScope trace(anchor);
+        trace.error()("Entry without a time that can be read in file %s. Such entries count with "
+                      "the time of the entry before them. Further ones are not traced.",
+                      fileNameLocal());
+    }
+    return time;
+}
 
 /// Records how far the log was read.
 void LogFile::noteFollowed(FileFollower& follower, LogPositions& positions) {

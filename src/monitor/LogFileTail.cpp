@@ -186,6 +186,14 @@ bool LogFile::readGrowth() {
 }
 
 bool LogFile::offer(zrm_rmlogent_data_t* row) {
+    if (!isFollowed()) {
+        return waitAndOffer(row);
+    }
+    const EntryInstant instant(timeOf(*row));
+    return waitAndOffer(row);
+}
+
+bool LogFile::waitAndOffer(zrm_rmlogent_data_t* row) {
     while (!EventRoom::mayOffer() ||
            (m_rowReceiver != nullptr && m_rowReceiver(row, 1) == tableNoRoom))
         [[unlikely]] {

@@ -2,10 +2,14 @@
 
 #include "base/TraceScope.h"
 #include "logmgr/LogManager.h"
+#include "logs/EntryClock.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <ctime>
+#include <iterator>
 #include <new>
+#include <string_view>
 
 namespace zrm {
 
@@ -16,6 +20,13 @@ TRC1_Anchor anchor{"zrm_rmlogent_agent.cpp"};
 // Reasons of ctreq::Stopped.
 constexpr unsigned stoppedCorruptedChain = 1;
 constexpr unsigned stoppedInvalidSampleType = 2;
+
+/// True if all rows of a log have the same value in the condition's column.
+bool isOnLog(const SEL1_FILTERINFO& filter) {
+    constexpr std::string_view columns[] = {"ORIGINNODE", "LOGPATH", "LOGNAME", "ULOGPATH",
+                                            "ULOGNAME"};
+    return std::ranges::find(columns, std::string_view(filter.columnName)) != std::end(columns);
+}
 
 /// Traces an event of a situation, with the time as ctime prints it, including the newline.
 void traceSituation(const TraceScope& trace, const char* event, const char* name) {
@@ -102,11 +113,8 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     TraceScope trace(anchor);
     trace.fine()("Performing frequency/period threshold checks for situation %s.", name());
     auto* const entry = reinterpret_cast<zrm_rmlogent_data_t*>(row);
-    if (!addEventTime(entry->entrytime)) {
-        return trace.result(0U);
-    }
-    const long frequency =
-        countEvents(*timestampChain, static_cast<long>(thresholds.periodThreshold));
+    const std::optional<std::int64_t>& instant = EntryInstant::ofThisThread();
+    const long frequency = instant ? countFollowed(*instant) : countByArrival(entry->entrytime);
     if (frequency == -1) {
         trace.error()("Timestamp chain corrupted.  Stopping situation.");
         Stopped(stoppedCorruptedChain);
@@ -114,7 +122,6 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
         return trace.result(0U);
     }
     if (frequency == 0) {
-        dropTimestampChain();
         return trace.result(0U);
     }
     const bool isUpperBound = thresholds.freqThreshold < 0;
@@ -132,8 +139,60 @@ unsigned zrm_rmlogent_agent::insertWithinThresholds(char* row) {
     return trace.result(ctreq::InsertRow(row));
 }
 
+/// For logs of the log configuration: adds the time to the chain and counts what arrived in the
+/// period. 0: the entry does not count; -1: the chain is corrupted.
+long zrm_rmlogent_agent::countByArrival(const char* entrytime) {
+    if (!addEventTime(entrytime)) {
+        return 0;
+    }
+    const long frequency =
+        countEvents(*timestampChain, static_cast<long>(thresholds.periodThreshold));
+    if (frequency == 0) {
+        dropTimestampChain();
+    }
+    return frequency;
+}
+
+long zrm_rmlogent_agent::countFollowed(std::int64_t instant) {
+    TraceScope trace(anchor);
+    try {
+        return trace.result(
+            static_cast<long>(followedTimes.add(instant, thresholds.periodThreshold)));
+    } catch (const std::bad_alloc&) {
+        trace.error()("Memory for the times of situation %s could not be allocated. Event "
+                      "discarded.",
+                      name());
+        return trace.result(0L);
+    }
+}
+
 long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) {
     return newest.countEvents(period);
+}
+
+std::int64_t zrm_rmlogent_agent::periodOn(zrm_rmlogent_data_t& row) {
+    TraceScope trace(anchor);
+    if (!hasThresholds()) {
+        return trace.result(std::int64_t{0});
+    }
+    ResetFilterIndex();
+    SEL1_FILTERINFO* filter = nullptr;
+    while (GetFilterInfo(&filter) == 0) {
+        if (isOnLog(*filter) &&
+            ColumnIsException(reinterpret_cast<char*>(&row), const_cast<char*>(filter->columnName),
+                              filter->compareOperator, const_cast<char*>(filter->value)) == 0) {
+            return trace.result(std::int64_t{0});
+        }
+    }
+    return trace.result(thresholds.periodThreshold);
+}
+
+void zrm_rmlogent_agent::countEarlier(zrm_rmlogent_data_t& row) {
+    TraceScope trace(anchor);
+    if (hasThresholds() && EntryInstant::ofThisThread() &&
+        MeetsConditions(reinterpret_cast<char*>(&row))) {
+        countFollowed(*EntryInstant::ofThisThread());
+    }
 }
 
 /// Adds the entry's time to the chain. False if the time does not convert or memory runs out.

@@ -2,9 +2,11 @@
 #define ZRM_RMLOGENT_AGENT_H
 
 #include "logs/RequestThresholds.h"
+#include "tables/EntryWindows.h"
 #include "tables/Timestamp.h"
 #include "tables/zrm_rmlogent_base.h"
 
+#include <cstdint>
 #include <memory>
 
 namespace zrm {
@@ -36,6 +38,11 @@ public:
     unsigned AddData(zrm_rmlogent_data_t* rows, int count) override;
     /// Writes only the threshold columns. They are 0 unless both thresholds are in force.
     void writeThresholds(zrm_rmlogent_data_t* rows, int count) const;
+    /// The period, in seconds, in which the situation counts entries of the log that the row's
+    /// columns name; 0: it counts none of them.
+    std::int64_t periodOn(zrm_rmlogent_data_t& row);
+    /// Counts an entry of a followed log that was judged before, if it meets the conditions.
+    void countEarlier(zrm_rmlogent_data_t& row);
     /// True if the trace shows to which requests a row is offered.
     static bool isTraced();
 
@@ -45,6 +52,8 @@ protected:
     /// Counts the chain's entries within the period. For monitored logs the period ends now; for
     /// replayed entries it ends with the newest of them.
     virtual long countEvents(Timestamp& newest, long period);
+    /// Counts an entry of a followed log. 0 if memory runs out.
+    virtual long countFollowed(std::int64_t instant);
 
 private:
     void TakeSampleDestructor();
@@ -55,6 +64,7 @@ private:
     }
     void getFreqPeriodThresholds();
     unsigned insertWithinThresholds(char* row);
+    long countByArrival(const char* entrytime);
     bool addEventTime(const char* entrytime);
     void dropTimestampChain();
 
@@ -67,8 +77,10 @@ private:
     std::unique_ptr<zrm_rmlogent_data_t[]> reportRows; ///< one batch of a report's sample
     LogFile* logFile = nullptr;                        ///< the log that a report reads
     _RequestThresholds thresholds{};
-    Timestamp* timestampChain = nullptr; ///< owned; head of the chain of recent entry times
-    void* reportHandle = nullptr;        ///< the log's state for a report
+    /// Owned; head of the chain of recent entry times in logs of the log configuration.
+    Timestamp* timestampChain = nullptr;
+    EntryWindows followedTimes;   ///< recent entries of logs that are followed
+    void* reportHandle = nullptr; ///< the log's state for a report
 };
 
 } // namespace zrm

@@ -5,6 +5,7 @@
 #include "tables/TableOperations.h"
 #include "tables/zrm_rmlogent_agent.h"
 
+#include <algorithm>
 #include <atomic>
 
 namespace zrm {
@@ -15,6 +16,19 @@ TRC1_Anchor anchor{"zrm_rmlogent_manager.cpp"};
 
 /// The table's one manager. The logs' threads may read it before the table is registered.
 std::atomic<zrm_rmlogent_manager*> theManager{nullptr};
+
+/// Calls the function with each open situation, under the manager's lock.
+template <typename Function> void forEachSituation(const Function& function) {
+    zrm_rmlogent_manager* const manager = theManager.load(std::memory_order_acquire);
+    if (manager == nullptr) {
+        return;
+    }
+    const LockGuard guard(manager->lock());
+    CtreqListIter next(manager->requests());
+    while (void* const element = next.Next()) {
+        function(*static_cast<zrm_rmlogent_agent*>(static_cast<ctreq*>(element)));
+    }
+}
 
 } // namespace
 
@@ -59,6 +73,19 @@ unsigned zrm_rmlogent_manager::AddDataToEvent(zrm_rmlogent_data_t* rows, int cou
         static_cast<zrm_rmlogent_agent*>(static_cast<ctreq*>(last))->writeThresholds(rows, count);
     }
     return trace.result(status);
+}
+
+std::int64_t zrm_rmlogent_manager::LongestPeriod(zrm_rmlogent_data_t& row) {
+    TraceScope trace(anchor);
+    std::int64_t longest = 0;
+    forEachSituation(
+        [&](zrm_rmlogent_agent& agent) { longest = std::max(longest, agent.periodOn(row)); });
+    return trace.result(longest);
+}
+
+void zrm_rmlogent_manager::CountEarlier(zrm_rmlogent_data_t& row) {
+    TraceScope trace(anchor);
+    forEachSituation([&](zrm_rmlogent_agent& agent) { agent.countEarlier(row); });
 }
 
 /// True if the trace shows to which requests a row is offered. That involves several source files,

@@ -4,6 +4,8 @@
 #include "framework/TableManager.h"
 #include "logs/zrm_rmlogent_data.h"
 
+#include <cstdint>
+
 namespace zrm {
 
 /// Manager of the Log Entries table: creates its request objects and passes new rows to every open
@@ -18,6 +20,13 @@ public:
     /// dispatch status. Before the table is registered, does nothing and returns 0. Returns
     /// tableNoRoom if nothing was offered because the framework has no room (EventRoom).
     static unsigned EventArrived(zrm_rmlogent_data_t* rows, int count);
+
+    /// The longest period, in seconds, in which an open situation counts entries of the log that
+    /// the row's columns name; 0: none does.
+    static std::int64_t LongestPeriod(zrm_rmlogent_data_t& row);
+    /// Counts an entry that was judged before towards the thresholds of the open situations.
+    /// Nothing is raised. Called by the threads of all logs.
+    static void CountEarlier(zrm_rmlogent_data_t& row);
 
     unsigned AddDataToEvent(zrm_rmlogent_data_t* rows, int count);
 

@@ -38,10 +38,11 @@ protected:
     std::vector<std::string> read(const std::string& name, std::int64_t offset,
                                   std::int64_t period) {
         const auto file = Generation::open(m_directory.file(name));
-        EarlierEntries earlier(m_directory.file("log"), 0);
+        EarlierEntries earlier(m_directory.file("log"), "", 0);
         std::vector<std::string> entries;
-        earlier.read(*file, offset, period, timeOf, [&](char* entry) {
-            entries.emplace_back(entry, std::strcspn(entry, "\n"));
+        earlier.read(*file, offset, period, timeOf, [&](char* entry, std::string_view text) {
+            EXPECT_EQ(text, std::string_view(entry, std::strcspn(entry, "\n")));
+            entries.emplace_back(text);
             return entries.size() != m_most;
         });
         return entries;
@@ -135,9 +136,9 @@ TEST_F(EarlierEntriesTest, WithoutTimesTheFilesTimeOfChangeDecides) {
 TEST_F(EarlierEntriesTest, ReadsRecords) {
     write("log", "1aa2bb3cc");
     const auto file = Generation::open(m_directory.file("log"));
-    EarlierEntries earlier(m_directory.file("log"), 3);
+    EarlierEntries earlier(m_directory.file("log"), "", 3);
     std::string read;
-    earlier.read(*file, 6, 60, timeOf, [&](char* record) {
+    earlier.read(*file, 6, 60, timeOf, [&](char* record, std::string_view) {
         read.append(record, 3);
         return true;
     });

@@ -128,6 +128,10 @@ unsigned ctreq::CheckForException(char* row) {
     return !test.accepts || test.accepts(row) ? 1 : 0;
 }
 
+bool ctreq::MeetsConditions(char* row) {
+    return CheckForException(row) != 0;
+}
+
 unsigned ctreq::GetFilterInfo(SEL1_FILTERINFO** filter) {
     TestRequest& test = m_framework->test;
     if (m_framework->nextFilter == test.filters.size()) {

@@ -10,6 +10,7 @@
 #include "host/events/EventQueue.h"
 #include "host/framework/Request.h"
 #include "host/situations/SituationSet.h"
+#include "logs/EntryClock.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "tables/zrm_rmlogent_manager.h"
@@ -24,6 +25,7 @@
 #include <cstring>
 #include <map>
 #include <memory>
+#include <optional>
 #include <random>
 #include <string>
 #include <variant>
@@ -254,12 +256,18 @@ TEST_F(LiveModel, AReplayAgreesWithMonitoring) {
             replays.push_back(std::make_unique<Replay>(configs.back(), entries));
         }
         live.apply(configs);
+        const bool isFollowed = round % 2 == 1;
         int seconds = 0;
         FakeClock clock(1'700'000'000);
         for (int count = 0; count < 60 && !HasFailure(); ++count) {
             seconds += static_cast<int>(random() % 3 == 0 ? random() % 40 : random() % 2);
             clock.set(1'700'000'000 + seconds);
             const zrm_rmlogent_data_t row = randomRow(random, seconds);
+            std::optional<EntryInstant> instant; // of a followed log, also late and out of order
+            if (isFollowed) {
+                const int late = random() % 4 == 0 ? static_cast<int>(random() % 200) - 50 : 0;
+                instant.emplace(1'700'000'000 + seconds - late);
+            }
             const auto raised = raisedBy(row);
             raisedInAll += raised.size();
             for (std::size_t number = 0; number < configs.size(); ++number) {

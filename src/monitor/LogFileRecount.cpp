@@ -1,0 +1,88 @@
+#include "base/EntryFields.h"
+#include "base/TraceScope.h"
+#include "framework/EventRoom.h"
+#include "framework/LogEntry.h"
+#include "framework/traceSilence.h"
+#include "logs/FollowSettings.h"
+#include "monitor/EarlierEntries.h"
+#include "monitor/FileFollower.h"
+#include "monitor/LogFile.h"
+
+namespace zrm {
+
+// Counts entries of a followed log again that an earlier run has judged.
+
+namespace {
+
+TRC1_Anchor anchor{"LogFileRecount.cpp"};
+
+/// The entry that is counted, for conditions on its fields.
+class EarlierEntry final : public LogEntry {
+public:
+    explicit EarlierEntry(const LogFile& log) : m_log(log) {}
+
+    void begin(std::string_view text) noexcept {
+        m_text = text;
+        m_hasFields = false;
+    }
+    std::string_view text() const override { return m_text; }
+    bool isCut() const override { return false; }
+    const EntryFields& fields() override {
+        if (!m_hasFields) {
+            m_fields.clear();
+            m_log.readFields(m_text, m_fields);
+            m_hasFields = true;
+        }
+        return m_fields;
+    }
+    const EntryKeep& keep() const override { return m_log.followSettings()->keep; }
+
+private:
+    const LogFile& m_log;
+    std::string_view m_text;
+    EntryFields m_fields;
+    bool m_hasFields = false;
+};
+
+} // namespace
+
+/// Counts the entries just before the position again, for the thresholds of situations.
+void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
+    TraceScope trace(anchor);
+    const auto place = follower.place();
+    if (!place || m_earlierReceiver.count == nullptr) {
+        return;
+    }
+    const auto isRunning = [this] { return monitorStatus() == MONITOR_RUNNING; };
+    if (EventRoom::now() == EventRoom::State::HELD) {
+        EventRoom::wait(isRunning); // the situations are still being opened
+    }
+    m_pulse.work("counts earlier entries again");
+    zrm_rmlogent_data_t* const row = ownRow();
+    const EntryRow withoutEntry(*this, row);
+    const std::int64_t period = m_earlierReceiver.period(*row);
+    if (period == 0) {
+        return;
+    }
+    const TRC1_Silence silence; // the earlier run has traced it
+    EarlierEntry current(*this);
+    const LogEntry::Offer offer(current);
+    EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength);
+    earlier.read(
+        place->file, place->offset, period,
+        [&](char* entry) {
+            return formatEntryAsRow(entry, row, nullptr) == 0
+                       ? m_clock.rangeOf(lastEntryMoment, row->entrytime)
+                       : std::nullopt;
+        },
+        [&](char* entry, std::string_view text) {
+            current.begin(text);
+            if (formatEntryAsRow(entry, row, nullptr) == 0) {
+                const EntryInstant instant(m_clock.next(lastEntryMoment, row->entrytime));
+                m_earlierReceiver.count(*row);
+            }
+            return isRunning();
+        });
+}
+
+} // namespace zrm

@@ -1,0 +1,169 @@
+#include "tables/EntryWindows.h"
+
+#include <algorithm>
+#include <iterator>
+#include <utility>
+
+namespace zrm {
+
+namespace {
+
+/// No entries are further apart.
+constexpr std::int64_t longestPeriod = std::int64_t{1} << 42;
+
+} // namespace
+
+std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
+    period = std::min(period, longestPeriod);
+    ++m_additions;
+    std::int64_t most = 0;
+    for (Group& group : m_groups) {
+        if (group.takes(time, period)) {
+            most = std::max(most, group.add(time, period));
+            group.used = m_additions;
+        }
+    }
+    if (most == 0) {
+        Group& group = spareGroup();
+        group.begin(time);
+        group.used = m_additions;
+        return 1;
+    }
+    if (m_groups.size() > 1) {
+        joinAt(time);
+    }
+    return most;
+}
+
+/// A group to begin anew: the one that has not been used for longest, if there are enough.
+EntryWindows::Group& EntryWindows::spareGroup() {
+    if (m_groups.size() < mostGroups) {
+        return m_groups.emplace_back();
+    }
+    return *std::min_element(m_groups.begin(), m_groups.end(),
+                             [](const Group& a, const Group& b) { return a.used < b.used; });
+}
+
+/// Groups whose newest entries are of the same time would take the same entries from now on: the
+/// one with most is enough.
+void EntryWindows::joinAt(std::int64_t newest) {
+    const auto hasMet = [newest](const Group& group) { return group.newest() == newest; };
+    const auto kept = std::find_if(m_groups.begin(), m_groups.end(), hasMet);
+    for (auto group = kept; group != m_groups.end();) {
+        if (group == kept || !hasMet(*group)) {
+            ++group;
+            continue;
+        }
+        if (kept->count() < group->count()) {
+            std::swap(*kept, *group);
+        }
+        group = m_groups.erase(group);
+    }
+}
+
+void EntryWindows::Group::begin(std::int64_t time) {
+    m_seconds.clear();
+    m_seconds.push_back({time, 1});
+    m_begin = 0;
+    m_count = 1;
+    m_newest = time;
+    m_width = 0;
+}
+
+bool EntryWindows::Group::isSameSecond(std::int64_t left, std::int64_t right) const noexcept {
+    return left >> m_width == right >> m_width;
+}
+
+std::int64_t EntryWindows::Group::add(std::int64_t time, std::int64_t period) {
+    if (time < m_newest) {
+        return addLate(time, period);
+    }
+    addNewest(time, period);
+    return m_count;
+}
+
+void EntryWindows::Group::addNewest(std::int64_t time, std::int64_t period) {
+    if (isSameSecond(m_seconds.back().time, time)) {
+        m_seconds.back().time = time;
+        ++m_seconds.back().entries;
+    } else {
+        m_seconds.push_back({time, 1});
+    }
+    ++m_count;
+    m_newest = time;
+    while (m_seconds[m_begin].time <= time - period) {
+        m_count -= m_seconds[m_begin++].entries;
+    }
+    // The period before is kept for late entries.
+    while (m_seconds.front().time <= time - 2 * period) {
+        m_seconds.pop_front();
+        --m_begin;
+    }
+    if (m_seconds.size() > mostSeconds) {
+        widen();
+        findBegin(period);
+    }
+}
+
+/// An entry that is older than the newest one.
+std::int64_t EntryWindows::Group::addLate(std::int64_t time, std::int64_t period) {
+    // Usually it is not much older.
+    auto at = m_seconds.end();
+    std::int64_t newer = 0;
+    while (at != m_seconds.begin() && std::prev(at)->time > time &&
+           !isSameSecond(std::prev(at)->time, time)) {
+        --at;
+        newer += at->entries;
+    }
+    if (at != m_seconds.begin() && isSameSecond(std::prev(at)->time, time)) {
+        addTo(*std::prev(at), time, period);
+    } else {
+        m_seconds.insert(at, {time, 1});
+        ++m_count;
+    }
+    std::int64_t own = m_count - newer;
+    for (std::size_t index = m_begin; index-- > 0 && m_seconds[index].time > time - period;) {
+        own += m_seconds[index].entries;
+    }
+    const std::int64_t most = std::max(own, m_count);
+    if (m_seconds.size() > mostSeconds) {
+        widen();
+        findBegin(period);
+    }
+    return most;
+}
+
+void EntryWindows::Group::addTo(Second& second, std::int64_t time, std::int64_t period) {
+    const bool wasOutside = second.time <= m_newest - period;
+    ++second.entries;
+    second.time = std::max(second.time, time);
+    m_count += wasOutside ? second.entries : 1;
+    m_begin -= wasOutside ? 1 : 0;
+}
+
+/// Joins neighbours until few enough are left.
+void EntryWindows::Group::widen() {
+    while (m_seconds.size() > mostSeconds) {
+        ++m_width;
+        Seconds joined;
+        for (const Second& second : m_seconds) {
+            if (!joined.empty() && isSameSecond(joined.back().time, second.time)) {
+                joined.back().time = second.time;
+                joined.back().entries += second.entries;
+            } else {
+                joined.push_back(second);
+            }
+        }
+        m_seconds = std::move(joined);
+    }
+}
+
+void EntryWindows::Group::findBegin(std::int64_t period) {
+    m_begin = m_seconds.size();
+    m_count = 0;
+    while (m_begin > 0 && m_seconds[m_begin - 1].time > m_newest - period) {
+        m_count += m_seconds[--m_begin].entries;
+    }
+}
+
+} // namespace zrm
