@@ -4,6 +4,7 @@
 #include "host/config/PathPattern.h"
 #include "host/events/PositionBook.h"
 #include "host/sources/FoundLogs.h"
+#include "logs/FurtherLogs.h"
 #include "monitor/Generation.h"
 #include "monitor/GenerationNames.h"
 
@@ -57,21 +58,23 @@ std::set<ino_t> inodesIn(const std::string& directory) {
 
 } // namespace
 
-EarlierRun::EarlierRun(const PositionBook& book)
-    : m_watched(book.paths().all()), m_positions(book.positions()) {
+EarlierRun::EarlierRun(const PositionBook& book, std::set<std::string> monitored)
+    : m_watched(book.paths().all()), m_positions(book.positions()),
+      m_monitored(std::move(monitored)) {
     for (const auto& [log, position] : m_positions) {
         m_logs.emplace(Identity{position.device, position.inode}, log);
     }
 }
 
-bool EarlierRun::isNewSince(const std::string& path, const struct stat& file) const {
+bool EarlierRun::isNewSince(const std::string& path, const std::string& file,
+                            const struct stat& status) const {
     const auto found = m_watched.find(path);
-    if (found == m_watched.end()) {
+    if (found == m_watched.end() || m_monitored.contains(file)) {
         return false;
     }
     // If the clock was set back, the times of files say nothing: rather too much than too little.
     return found->second > WallClock::now() ||
-           millisecondsOf(file.st_mtim) >= found->second - exactness;
+           millisecondsOf(status.st_mtim) >= found->second - exactness;
 }
 
 std::string EarlierRun::logOf(const std::string& file, const Identity& identity) const {
@@ -122,7 +125,7 @@ void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs
         const bool isComplete =
             logs[index].follow.resume && source.problem.empty() &&
             std::all_of(source.files.begin(), source.files.end(), [&](const std::string& file) {
-                return book.isStored(file) || !isReadable(file);
+                return book.isStored(file) || FurtherLogs::isLeftOut(file) || !isReadable(file);
             });
         if (!isComplete) {
             continue;

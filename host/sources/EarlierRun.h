@@ -6,6 +6,7 @@
 
 #include <cstdint>
 #include <map>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -26,11 +27,14 @@ public:
 
     /// Knows nothing: the first run.
     EarlierRun() = default;
-    explicit EarlierRun(const PositionBook& book);
+    /// `monitored`: the logs of which there are events or entries, also those that were lines of
+    /// the log configuration and have no position.
+    explicit EarlierRun(const PositionBook& book, std::set<std::string> monitored = {});
 
     /// True if an earlier run watched the path or glob, and a file of it that has no position was
     /// written to since: it was not there before, or nobody has read it.
-    bool isNewSince(const std::string& path, const struct stat& file) const;
+    bool isNewSince(const std::string& path, const std::string& file,
+                    const struct stat& status) const;
     /// The logs with a stored position, by name.
     const std::map<std::string, LogPosition>& positions() const noexcept { return m_positions; }
     /// The log whose stored position is in this file, recognised by what the file has before it.
@@ -41,13 +45,15 @@ public:
     std::vector<std::string> renamedLogs(const std::vector<LogConfig>& logs) const;
 
     /// Notes in the book that the files of the tables were looked for at this time (milliseconds
-    /// since 1970), for those tables whose files all have stored positions by now.
+    /// since 1970), for those tables whose files all have stored positions by now, except those
+    /// that cannot be read and those that nobody follows.
     static void noteLook(PositionBook& book, const std::vector<LogConfig>& logs,
                          const FoundLogs& found, std::int64_t time);
 
 private:
     std::map<std::string, std::int64_t> m_watched; ///< until when, by path or glob
     std::map<std::string, LogPosition> m_positions;
+    std::set<std::string> m_monitored;
     std::multimap<Identity, std::string> m_logs; ///< by the file of the position
 };
 

@@ -219,8 +219,9 @@ private:
         }
         candidate.isThere = true;
         if (!m_finder.m_searched.contains(*candidate.path)) {
-            candidate.isNewcomer = m_logs[candidate.source].follow.resume &&
-                                   m_finder.m_earlier.isNewSince(*candidate.path, status);
+            candidate.isNewcomer =
+                m_logs[candidate.source].follow.resume &&
+                m_finder.m_earlier.isNewSince(*candidate.path, candidate.name, status);
         }
         candidate.identity = {status.st_dev, status.st_ino};
         if (const auto own = m_ownFiles.find(candidate.identity); own != m_ownFiles.end()) {

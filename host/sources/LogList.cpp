@@ -79,9 +79,10 @@ LogList::~LogList() {
     m_shared->changed.notify_all();
 }
 
-void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles) {
+void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles,
+                    std::set<std::string> monitored) {
     apply(logs, std::move(ownFiles));
-    m_shared->finder = LogFinder(EarlierRun(*PositionBook::current()));
+    m_shared->finder = LogFinder(EarlierRun(*PositionBook::current(), std::move(monitored)));
     if (logs.empty()) {
         return;
     }

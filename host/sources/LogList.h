@@ -7,6 +7,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -32,7 +33,9 @@ public:
 
     /// Takes the tables of the configuration and looks at once, on the calling thread; for the
     /// start, before the log manager exists. Publishes nothing if there are no tables.
-    void begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles);
+    /// `monitored`: the logs that the history knows (EarlierRun).
+    void begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles,
+               std::set<std::string> monitored = {});
     /// Starts the thread, which looks at every interval, and at once when the log manager
     /// refreshes. Returns false if no thread can be started.
     bool start();

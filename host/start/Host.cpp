@@ -62,17 +62,18 @@ void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifi
 
 void Host::findLogs(std::string traceFile) {
     m_traceFile = std::move(traceFile);
-    m_logs.begin(m_config.logs, ownFiles(m_config));
-    sayWhatIsReadAgain();
+    const std::set<std::string> monitored =
+        m_history.history == nullptr ? std::set<std::string>() : m_history.history->logs();
+    m_logs.begin(m_config.logs, ownFiles(m_config), monitored);
+    sayWhatIsReadAgain(monitored);
 }
 
 /// The logs that an earlier run monitored as lines of the log configuration have no positions.
-void Host::sayWhatIsReadAgain() const {
+void Host::sayWhatIsReadAgain(const std::set<std::string>& monitored) const {
     const auto found = FurtherLogs::published();
     if (!found || m_history.history == nullptr) {
         return;
     }
-    const std::set<std::string> monitored = m_history.history->logs();
     for (const FurtherLog& log : *found) {
         const FollowSettings& settings = *log.settings;
         if (settings.resume && settings.start == FollowSettings::Start::beginning &&

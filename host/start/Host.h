@@ -11,6 +11,7 @@
 #include <condition_variable>
 #include <memory>
 #include <mutex>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -67,7 +68,7 @@ private:
     void tick(int number);
     void reload();
     void sayNoLogs() const;
-    void sayWhatIsReadAgain() const;
+    void sayWhatIsReadAgain(const std::set<std::string>& monitored) const;
     LogList::OwnFiles ownFiles(const HostConfig& config) const;
     void stop();
     void setState(State state);

@@ -5,7 +5,10 @@
 #include "monitor/LogFile.h"
 
 #include <map>
+#include <set>
+#include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace zrm {
@@ -46,14 +49,17 @@ std::uint32_t LogManager::buildFurtherLogs() {
         LogFile* present;
     };
     std::vector<Build> builds;
+    std::set<std::string> leftOut;
     for (const FurtherLog& further : *FurtherLogsTaken) {
         auto log = std::make_unique<ValidLog>(further);
         if (!log->isValid()) {
+            leftOut.insert(further.name);
             continue;
         }
         if (configured.contains(log->fileNameLocal())) {
             trace.detail()("The log configuration names %s, too; its line applies.",
                            log->fileNameLocal());
+            leftOut.insert(further.name);
             continue;
         }
         const auto present = followed.find(log->fileNameLocal());
@@ -64,6 +70,7 @@ std::uint32_t LogManager::buildFurtherLogs() {
             last.present->askToStop();
         }
     }
+    FurtherLogs::noteLeftOut(std::move(leftOut));
     for (const Build& build : builds) {
         buildLogObject(*build.log, build.present);
     }

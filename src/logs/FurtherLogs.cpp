@@ -10,6 +10,7 @@ namespace {
 struct Published {
     std::mutex mutex; ///< guards the members below
     std::shared_ptr<const List> logs;
+    std::set<std::string> leftOut;
     std::function<void()> onRefresh;
 };
 
@@ -31,6 +32,18 @@ std::shared_ptr<const List> published() {
     Published& present = state();
     const std::lock_guard guard(present.mutex);
     return present.logs;
+}
+
+void noteLeftOut(std::set<std::string> names) {
+    Published& present = state();
+    const std::lock_guard guard(present.mutex);
+    present.leftOut.swap(names);
+}
+
+bool isLeftOut(const std::string& name) {
+    Published& present = state();
+    const std::lock_guard guard(present.mutex);
+    return present.leftOut.contains(name);
 }
 
 void setOnRefresh(std::function<void()> called) {

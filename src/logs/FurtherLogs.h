@@ -3,6 +3,7 @@
 
 #include <functional>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -34,6 +35,13 @@ void publish(std::shared_ptr<const List> logs);
 
 /// The list published last; null if there was none.
 std::shared_ptr<const List> published();
+
+/// The log manager says which logs of the list it does not follow: the log configuration names
+/// them, too, or they cannot be followed at all.
+void noteLeftOut(std::set<std::string> names);
+
+/// True if the log manager does not follow this log of the list, as it said last.
+bool isLeftOut(const std::string& name);
 
 /// Sets what a refresh calls, or nothing. The function runs on the log manager's thread and must
 /// not wait.

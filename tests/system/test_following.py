@@ -169,6 +169,26 @@ def test_a_log_that_moves_from_the_log_configuration_begins_where_start_says(age
     assert not agent.trace("was monitored before")
 
 
+@pytest.mark.slow
+def test_a_log_of_both_lists_that_leaves_the_log_configuration_is_not_read_again(agent):
+    log = agent.log("app.log", b"")
+    agent.sink = agent.directory / "events"
+    agent.follow(agent.directory / "*.log")
+    agent.situation()
+    agent.start()
+    log.append(syslog_line("as a line of it"))
+    agent.wait_events(1)
+    wait_until(lambda: watched(agent), "the glob to be known as watched")
+    assert agent.stop() == 0
+    agent.configure("# none")
+    log.append(syslog_line("while it was stopped"))
+    (agent.directory / "new.log").write_text(syslog_line("in a new file"))
+    agent.start()
+    agent.wait_events(2)
+    assert agent.stop() == 0
+    assert descriptions(agent.events()) == ["as a line of it", "in a new file"]
+
+
 def test_truncations_are_counted(agent):
     agent.listen = "127.0.0.1:0"
     log = followed(agent)

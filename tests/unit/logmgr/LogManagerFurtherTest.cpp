@@ -144,6 +144,8 @@ TEST_F(LogManagerFurtherTest, AFileInBothListsBelongsToTheConfiguration) {
     start();
     EXPECT_THAT(logs(), ElementsAre(a, b));
     EXPECT_EQ(object(a)->followSettings(), nullptr);
+    EXPECT_TRUE(FurtherLogs::isLeftOut(a));
+    EXPECT_FALSE(FurtherLogs::isLeftOut(b));
     // It changes hands both ways.
     configure(b + "\n");
     refresh();
@@ -151,6 +153,8 @@ TEST_F(LogManagerFurtherTest, AFileInBothListsBelongsToTheConfiguration) {
     ASSERT_NE(object(a), nullptr);
     EXPECT_NE(object(a)->followSettings(), nullptr);
     EXPECT_EQ(object(b)->followSettings(), nullptr);
+    EXPECT_FALSE(FurtherLogs::isLeftOut(a));
+    EXPECT_TRUE(FurtherLogs::isLeftOut(b));
 }
 
 TEST_F(LogManagerFurtherTest, AnEmptiedConfigurationGivesItsLogsUp) {

@@ -14,6 +14,7 @@
 #include <chrono>
 #include <filesystem>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -56,7 +57,7 @@ protected:
         logs.push_back(log);
     }
     void begin() {
-        finder = std::make_unique<LogFinder>(EarlierRun(PositionBook(stored, true)));
+        finder = std::make_unique<LogFinder>(EarlierRun(PositionBook(stored, true), monitored));
         look();
     }
     void look() { found = finder->look(logs, {}, now); }
@@ -80,6 +81,7 @@ protected:
 
     TemporaryDirectory directory;
     PositionValues stored;
+    std::set<std::string> monitored;
     std::vector<LogConfig> logs;
     std::unique_ptr<LogFinder> finder;
     LogFinder::Clock::time_point now{};
@@ -117,6 +119,14 @@ TEST_F(EarlierRunTest, WithoutResumptionNothingOfTheEarlierRunCounts) {
     create("app.log", 10);
     watched(file("*.log"), 50);
     table(file("*.log"), false);
+    begin();
+    EXPECT_THAT(newcomers(), IsEmpty());
+}
+
+TEST_F(EarlierRunTest, AFileThatWasALineOfTheLogConfigurationIsNotNew) {
+    monitored = {create("app.log", 10)};
+    watched(file("*.log"), 50);
+    table(file("*.log"));
     begin();
     EXPECT_THAT(newcomers(), IsEmpty());
 }
@@ -229,6 +239,21 @@ TEST_F(NoteLookTest, APathIsWatchedOnceEachOfItsFilesHasAStoredPosition) {
     create("c.log");
     note(4);
     EXPECT_EQ(watchedUntil(glob), 3);
+}
+
+TEST_F(NoteLookTest, AFileThatTheLogManagerLeavesOutNeedsNoPosition) {
+    const std::string a = create("a.log");
+    const std::string b = create("b.log");
+    const std::string glob = file("*.log");
+    table(glob);
+    begin();
+    store(a);
+    FurtherLogs::noteLeftOut({b});
+    note(1);
+    EXPECT_EQ(watchedUntil(glob), 1);
+    FurtherLogs::noteLeftOut({});
+    note(2);
+    EXPECT_EQ(watchedUntil(glob), 1);
 }
 
 TEST_F(NoteLookTest, APathWithoutAFileIsWatched) {
