@@ -203,7 +203,9 @@ bool FileFollower::openYounger(const GenerationReference& reference,
         const bool isRead = member.file && m_hasPosition && !m_isInBlock && m_position.offset > 0 &&
                             file.identity == identityOf(m_position) &&
                             member.file->holds(m_position, tail);
-        if (member.file && !isRead) {
+        // Empty ones do not count: the files after them would never be reached.
+        char first;
+        if (member.file && !isRead && member.file->readAt(&first, 1, 0) > 0) {
             candidates.push_back(std::move(member));
         }
     }
@@ -220,9 +222,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
                });
     };
     for (auto member = candidates.begin(); member != candidates.end();) {
-        char first;
-        const bool isEmpty = member->file->readAt(&first, 1, 0) <= 0;
-        member = isEmpty || isCopy(*member) ? candidates.erase(member) : member + 1;
+        member = isCopy(*member) ? candidates.erase(member) : member + 1;
     }
     found.younger = std::move(candidates);
     return true;

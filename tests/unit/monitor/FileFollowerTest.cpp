@@ -333,6 +333,18 @@ TEST_F(FileFollowerTest, ResumesAfterRotationsWhileItWasStopped) {
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(FileFollowerTest, ManyEmptyGenerationsDoNotHideTheFilesAfterThem) {
+    look();
+    append("a\n");
+    rename("app.log", "app.log.41");
+    for (int number = 1; number <= 40; ++number) {
+        m_directory.write("app.log." + std::to_string(number), "");
+    }
+    append("b\n");
+    restart();
+    EXPECT_EQ(looks(3), "a\nb\n");
+}
+
 TEST_F(FileFollowerTest, ResumesInACompressedFile) {
     look();
     append("a\n");
