@@ -123,7 +123,7 @@ void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs
     for (std::size_t index = 0; index < found.sources.size(); ++index) {
         const FoundLogs::Source& source = found.sources[index];
         const bool isComplete =
-            logs[index].follow.resume && source.problem.empty() &&
+            logs[index].follow.resume &&
             std::all_of(source.files.begin(), source.files.end(), [&](const std::string& file) {
                 return book.isStored(file) || FurtherLogs::isLeftOut(file) || !isReadable(file);
             });

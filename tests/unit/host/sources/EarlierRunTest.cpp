@@ -263,6 +263,17 @@ TEST_F(NoteLookTest, APathWithoutAFileIsWatched) {
     EXPECT_EQ(watchedUntil(file("later.log")), 1);
 }
 
+TEST_F(NoteLookTest, AnUnreadableDirectoryDoesNotKeepAPathFromBeingWatched) {
+    const std::string a = create("a.log");
+    table(file("*.log"));
+    begin();
+    store(a);
+    look();
+    found.sources.front().problem = "The directory /var/log/private cannot be read";
+    EarlierRun::noteLook(*book, logs, found, 1);
+    EXPECT_EQ(watchedUntil(file("*.log")), 1);
+}
+
 TEST_F(NoteLookTest, WithoutResumptionNoPathIsWatched) {
     table(file("*.log"), false);
     begin();
