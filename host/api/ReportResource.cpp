@@ -83,10 +83,6 @@ ReportRequest ReportRequest::parse(std::string_view body) {
         if (!condition) {
             fields.refuse("where[" + std::to_string(index) + "]", condition.error());
         }
-        if (condition->isOnField()) {
-            fields.refuse("where[" + std::to_string(index) + "]",
-                          "a report has no fields: name a column");
-        }
         report.where.push_back(*condition);
         report.conditions.push_back(std::move(*condition));
     }

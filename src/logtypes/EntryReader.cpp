@@ -24,6 +24,9 @@ public:
         std::memcpy(m_context.timestamp, newest, stampLength);
         return m_log.formatEntryAsRow(entry, &row, &m_context) == 0 && row.entrytime[0] != ' ';
     }
+    void readFields(std::string_view text, EntryFields& fields) const override {
+        m_log.readFields(text, fields);
+    }
 
 private:
     struct Log : SysLogFile {

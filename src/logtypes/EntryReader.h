@@ -5,9 +5,11 @@
 
 #include <cstddef>
 #include <memory>
+#include <string_view>
 
 namespace zrm {
 
+class EntryFields;
 class LogFile;
 
 /// Makes rows of the entries of a followed log, as its monitor does, but apart from it: it keeps
@@ -32,6 +34,8 @@ public:
     /// characters) is the latest time that the entry may have, give or take a day: it decides the
     /// year of a time without one. False if the entry does not fit the log's format or has no time.
     virtual bool read(char* entry, const char* newest, zrm_rmlogent_data_t& row) = 0;
+    /// See LogFile::readFields.
+    virtual void readFields(std::string_view /*text*/, EntryFields& /*fields*/) const {}
 };
 
 } // namespace zrm

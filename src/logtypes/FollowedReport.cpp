@@ -1,7 +1,9 @@
 #include "logtypes/FollowedReport.h"
 
 #include "base/BrevanTime.h"
+#include "base/EntryFields.h"
 #include "base/ErrorText.h"
+#include "framework/LogEntry.h"
 #include "framework/cancellation.h"
 #include "logs/ZoneTime.h"
 #include "logtypes/EntryReader.h"
@@ -69,6 +71,42 @@ std::string readProblem(const Generation& generation, std::int64_t offset, int e
                ? "it is damaged: only the first " + place + " bytes of its contents can be read"
                : "reading it failed before byte " + place + ": " + ErrorText(error).text();
 }
+
+/// The entry of a block whose row is judged by the conditions of a report.
+class ReportedEntry final : public LogEntry {
+public:
+    explicit ReportedEntry(const EntryReader& entries) : m_entries(entries) {}
+
+    /// Whether the row of the block's last entry meets the conditions.
+    template <class Block>
+    bool isMet(const Block& block, zrm_rmlogent_data_t& row, FollowedReport::Receiver& receiver) {
+        m_text = block.text();
+        m_isCut = block.isTextCut();
+        m_hasFields = false;
+        const Offer offer(*this);
+        return receiver.meets(row);
+    }
+
+    std::string_view text() const override { return m_text; }
+    bool isCut() const override { return m_isCut; }
+    const EntryFields& fields() override {
+        if (!m_hasFields) {
+            m_fields.clear();
+            m_entries.readFields(m_text, m_fields);
+            m_hasFields = true;
+        }
+        return m_fields;
+    }
+    const EntryKeep& keep() const override { return m_keep; }
+
+private:
+    const EntryReader& m_entries;
+    std::string_view m_text;
+    bool m_isCut = false;
+    const EntryKeep m_keep;
+    EntryFields m_fields;
+    bool m_hasFields = false;
+};
 
 } // namespace
 
@@ -209,6 +247,7 @@ void FollowedReport::give(const zrm_rmlogent_data_t& row, Receiver& receiver) {
 void FollowedReport::readBackward(Generation& generation, File& file, Receiver& receiver) {
     BackwardBlock block(m_entries.recordLength());
     block.start(file.size);
+    ReportedEntry judged(m_entries);
     std::string newest = m_newest;
     unsigned far = 0;
     for (BackwardBlock::Fill filled = block.fill(generation); filled != BackwardBlock::Fill::end;
@@ -229,7 +268,7 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
             if (where != Place::unfit && timeOf(m_row) < newest) {
                 newest = timeOf(m_row);
             }
-            if (where == Place::within && receiver.meets(m_row)) {
+            if (where == Place::within && judged.isMet(block, m_row, receiver)) {
                 give(m_row, receiver);
                 if (isLimited()) {
                     return;
@@ -249,12 +288,13 @@ void FollowedReport::readForward(Generation& generation, File& file, Receiver& r
     block.start(0, {});
     const std::size_t mostRows = m_options.limit - m_given;
     std::deque<zrm_rmlogent_data_t> kept;
+    ReportedEntry judged(m_entries);
     bool isPast = false;
     unsigned far = 0;
     const auto look = [&](char* entry) {
         const Place where = place(entry, m_newest);
         isPast = isFar(where, Place::farTooNew, far);
-        if (where == Place::within && receiver.meets(m_row)) {
+        if (where == Place::within && judged.isMet(block, m_row, receiver)) {
             kept.push_back(m_row);
             if (kept.size() > mostRows) {
                 kept.pop_front();

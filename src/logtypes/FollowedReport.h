@@ -28,7 +28,8 @@ public:
     class Receiver {
     public:
         virtual ~Receiver() = default;
-        /// Whether a row between the two times meets the conditions of the report.
+        /// Whether a row between the two times meets the conditions of the report. Its entry is
+        /// that of the thread (LogEntry).
         virtual bool meets(zrm_rmlogent_data_t& row) = 0;
         /// The next row; rows come newest first.
         virtual void give(const zrm_rmlogent_data_t& row) = 0;

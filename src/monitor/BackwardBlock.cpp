@@ -1,5 +1,6 @@
 #include "monitor/BackwardBlock.h"
 
+#include "framework/LogEntry.h"
 #include "monitor/Generation.h"
 
 #include <algorithm>
@@ -10,7 +11,8 @@ namespace zrm {
 namespace {
 
 constexpr std::size_t largestBlock = 256 * 1024;
-constexpr std::size_t longestText = 2046; ///< of a line, without its newline
+constexpr std::size_t longestLine = 2046; ///< as it is given, without its newline
+constexpr std::size_t longestText = EntryKeep::longestText;
 
 /// The position behind the last newline among the first `size` bytes; 0 if there is none.
 std::size_t behindLastNewline(const char* text, std::size_t size) noexcept {
@@ -25,7 +27,7 @@ std::size_t behindLastNewline(const char* text, std::size_t size) noexcept {
 BackwardBlock::BackwardBlock(std::size_t recordLength)
     : m_recordLength(recordLength),
       m_blockSize(recordLength == 0 ? largestBlock : largestBlock - largestBlock % recordLength),
-      m_block(new char[largestBlock + longestText + 2]), m_line(new char[longestText + 2]) {}
+      m_block(new char[largestBlock + longestText + 2]), m_line(new char[longestLine + 2]) {}
 
 void BackwardBlock::start(std::int64_t size) noexcept {
     m_end = 0;
@@ -97,6 +99,7 @@ char* BackwardBlock::nextRecord() noexcept {
         return nullptr;
     }
     m_end -= m_recordLength;
+    m_text = {};
     return m_block.get() + m_end;
 }
 
@@ -111,12 +114,15 @@ char* BackwardBlock::line(std::size_t begin, std::size_t end) noexcept {
     }
     const bool hasNewline = text[end - 1] == '\n' && !m_isCut;
     const std::size_t length = end - begin - (hasNewline ? 1 : 0);
+    m_isTextCut = m_isCut || length > longestText;
     m_isCut = false;
-    if (hasNewline && length <= longestText) {
+    m_text = std::string_view(text + begin, std::min(length, longestText));
+    m_text.remove_suffix(!m_isTextCut && m_text.ends_with('\r') ? 1 : 0);
+    if (hasNewline && length <= longestLine) {
         text[end] = '\0'; // the first byte of a line that was given before
         return text + begin;
     }
-    const std::size_t given = std::min(length, longestText);
+    const std::size_t given = std::min(length, longestLine);
     std::memcpy(m_line.get(), text + begin, given);
     m_line[given] = '\n';
     m_line[given + 1] = '\0';

@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <string_view>
 
 namespace zrm {
 
@@ -34,6 +35,9 @@ public:
     /// The entry before the last one, or null if more must be read. A line ends with newline and
     /// NUL. It is valid until the next call.
     char* next() noexcept;
+    /// The text of the last entry, and whether the entry is longer, as EntryBlock gives them.
+    std::string_view text() const noexcept { return m_text; }
+    bool isTextCut() const noexcept { return m_isTextCut; }
     /// The offset of the oldest byte in memory.
     std::int64_t offset() const noexcept { return m_offset; }
 
@@ -50,6 +54,8 @@ private:
     std::size_t m_end = 0;                ///< one past the last byte not given yet
     std::int64_t m_offset = 0;
     bool m_isCut = false; ///< the line before m_end is longer than what is in memory
+    std::string_view m_text;
+    bool m_isTextCut = false;
 };
 
 } // namespace zrm

@@ -1,5 +1,7 @@
 """Fields and texts of the entries of [[log]] tables: conditions on them, and what events keep."""
 
+import gzip
+
 import pytest
 from api import Api
 from conftest import Log, descriptions, syslog_line
@@ -108,12 +110,40 @@ def test_the_api_the_client_and_the_search_have_them(agent):
     )
     assert status == 400
     assert "'contains' compares text" in problem["detail"]
-    status, _, problem = api.request(
-        "POST",
-        "/api/v1/reports",
-        {"log": str(log), "from": "2026-11-20", "where": ["field.pid = 412"]},
-    )
-    assert (status, problem["field"]) == (400, "where[0]")
+
+
+def test_reports_judge_fields_in_plain_and_compressed_generations(agent):
+    log = file(agent)
+    lines = [
+        RFC5424.format(pri=34, status=status, user=user, text=f"{user} {status} " + "." * 3000)
+        for status in (200, 500, 1000)
+        for user in ("a", "b")
+    ]
+    with gzip.open(f"{log}.1.gz", "wt") as older:
+        older.writelines(lines[:3])
+    log.append("".join(lines[3:]))
+    agent.follow(log, start="beginning")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+
+    def found(*where):
+        status, _, answer = api.request(
+            "POST",
+            "/api/v1/reports",
+            {"log": str(log), "from": "2026-11-20", "to": "2026-11-21", "where": list(where)},
+        )
+        assert status == 200, answer
+        return [row["ENTRYDESC"].rstrip(". ") for row in answer["rows"]]
+
+    assert found("field.req@32473.status >= 500") == ["b 1000", "a 1000", "b 500", "a 500"]
+    assert found("field.req@32473.status > 100", "field.req@32473.user = 'a'") == [
+        "a 1000",
+        "a 500",
+        "a 200",
+    ]
+    assert len(found("field.message contains '.. '")) == 0
+    assert found("field.absent = 'x'") == []
 
 
 def test_explain_says_what_a_field_was(agent):

@@ -61,6 +61,40 @@ protected:
     TemporaryDirectory m_directory;
 };
 
+/// The texts of the entries that a block gives, each with whether it is cut.
+template <class Block> std::vector<std::string> textsOf(Block& block, Generation& file) {
+    std::vector<std::string> texts;
+    while (block.fill(file) == Block::Fill::more) {
+        while (block.next() != nullptr) {
+            texts.push_back(std::string(block.text()) + (block.isTextCut() ? "..." : ""));
+        }
+    }
+    return texts;
+}
+
+TEST_F(BackwardBlockTest, TheTextsAreThoseOfEntryBlock) {
+    std::mt19937 random(7);
+    std::string content;
+    for (int line = 0; line < 60; ++line) {
+        const std::size_t lengths[] = {3, 2047, 65'535, 65'536, 65'537, 100'000, 700'000};
+        content += std::to_string(line) + std::string(lengths[random() % 7], 'x');
+        content += random() % 2 == 0 ? "\r\n" : "\n";
+    }
+    const std::string path = m_directory.write("log", content);
+    BackwardBlock backward(0);
+    backward.start(static_cast<std::int64_t>(content.size()));
+    std::vector<std::string> texts = textsOf(backward, *Generation::open(path));
+    std::reverse(texts.begin(), texts.end());
+    EntryBlock forward(0);
+    forward.start(0, {});
+    const std::vector<std::string> expected = textsOf(forward, *Generation::open(path));
+    ASSERT_EQ(texts.size(), 60u);
+    for (std::size_t line = 0; line < texts.size(); ++line) {
+        EXPECT_TRUE(texts[line] == expected[line])
+            << line << ": " << texts[line].size() << " and " << expected[line].size() << " bytes";
+    }
+}
+
 TEST_F(BackwardBlockTest, GivesTheLastLineFirst) {
     EXPECT_THAT(read("one\ntwo\n\nthree\n"), ElementsAre("three\n", "\n", "two\n", "one\n"));
     EXPECT_THAT(read(""), IsEmpty());
