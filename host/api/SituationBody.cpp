@@ -19,6 +19,9 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
     text.when = fields.texts("when", SituationValidator::mostConditions);
     text.frequency = fields.optionalText("frequency");
     text.period = fields.optionalText("period");
+    if (fields.has("context")) {
+        text.context = fields.number("context", 0, SituationValidator::mostContext);
+    }
     fields.refuseUnknown();
     return text;
 }

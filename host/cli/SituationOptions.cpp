@@ -5,7 +5,9 @@
 #include "host/cli/JsonText.h"
 
 #include <algorithm>
+#include <charconv>
 #include <iterator>
+#include <system_error>
 #include <utility>
 
 #include <CLI/CLI.hpp>
@@ -37,6 +39,16 @@ Json withoutState(Json definition) {
         member = member->is_null() ? definition.erase(member) : std::next(member);
     }
     return definition;
+}
+
+int numberOf(const std::string& text) {
+    int number = 0;
+    const char* const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, number);
+    if (error != std::errc() || stop != end) {
+        throw CliError(CliStatus::USAGE, "--context: '" + text + "' is not a number of entries");
+    }
+    return number;
 }
 
 } // namespace
@@ -74,6 +86,7 @@ void SituationOptions::addTo(CLI::App& command) {
     addMember("frequency", m_frequency, "COUNT",
               "At least or at most this many entries, for example \">= 5\"");
     addMember("period", m_period, "TIME", "Within this time, for example 60s, 5m, 1h");
+    addMember("context", m_context, "COUNT", "How many entries before it an event has, 0 to 100");
 }
 
 bool SituationOptions::areGiven() const {
@@ -90,6 +103,10 @@ Json SituationOptions::definition(const Json& base) const {
         } else if (member.option->count() > 0) {
             definition[member.key] = *member.value;
         }
+    }
+    if (const auto context = definition.find("context");
+        context != definition.end() && context->is_string()) {
+        definition["context"] = numberOf(context->get<std::string>());
     }
     if (m_when == std::vector<std::string>{""}) {
         definition.erase("when");

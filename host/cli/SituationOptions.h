@@ -47,6 +47,7 @@ private:
     std::vector<std::string> m_when;
     std::string m_frequency;
     std::string m_period;
+    std::string m_context;
 };
 
 } // namespace zrm::host

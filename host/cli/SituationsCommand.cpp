@@ -49,6 +49,8 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
     facts.add("frequency", frequency.empty()
                                ? ""
                                : frequency + " within " + JsonText::text(situation, "period"));
+    const std::string context = JsonText::text(situation, "context");
+    facts.add("context", context == "0" ? "" : context);
     for (const char* const key : {"offered", "matched", "discarded", "raised"}) {
         facts.add(key, count(situation, key));
     }

@@ -50,6 +50,7 @@ struct SituationConfig {
     std::vector<std::string> when = {};
     std::optional<std::string> frequency = std::nullopt;
     std::optional<std::string> period = std::nullopt;
+    std::size_t context = 0;     ///< earlier entries of the log that its events have
     std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };

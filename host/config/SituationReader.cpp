@@ -53,6 +53,7 @@ SituationConfig SituationReader::read(const toml::table& table) {
     }
     text.frequency = fields.text("frequency");
     text.period = fields.text("period");
+    text.context = section.number("context");
 
     auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;

@@ -214,6 +214,12 @@ SituationValidator::Verdict SituationValidator::check(const SituationText& text,
     addConditions(text, situation, budget, problems);
     situation.patternSize = budget.used();
     addThresholds(text, situation, problems);
+    if (text.context && (*text.context < 0 || *text.context > mostContext)) {
+        problems.push_back(
+            {{std::to_string(*text.context) + " is not a usable number of entries",
+              "write a number from 0 to " + std::to_string(mostContext), "context"}});
+    }
+    situation.context = static_cast<std::size_t>(text.context.value_or(0));
     return verdict;
 }
 

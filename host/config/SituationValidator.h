@@ -6,6 +6,7 @@
 #include "host/config/HostConfig.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -22,6 +23,7 @@ struct SituationText {
     std::vector<std::string> when;
     std::optional<std::string> frequency;
     std::optional<std::string> period;
+    std::optional<std::int64_t> context;
 };
 
 /// What is wrong with a situation, in a field such as "name" or "when[0]".
@@ -35,6 +37,7 @@ public:
     static constexpr std::size_t longestName = 128;  ///< bytes
     static constexpr std::size_t longestText = 1024; ///< bytes
     static constexpr std::size_t mostConditions = 100;
+    static constexpr std::int64_t mostContext = 100;
     static constexpr std::size_t longestConditions = 65536; ///< bytes of all of them
 
     /// What the text says, and everything that is wrong with it.

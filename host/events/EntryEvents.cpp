@@ -4,6 +4,7 @@
 #include "framework/LogEntry.h"
 #include "host/base/JsonWriter.h"
 #include "host/base/Utf8.h"
+#include "host/events/EntryContext.h"
 #include "host/events/RowText.h"
 
 #include <algorithm>
@@ -45,34 +46,47 @@ std::string fieldsText(LogEntry& entry, const Names& names) {
     return isEmpty ? std::string() : text;
 }
 
-EntryDetail detailOf(LogEntry& entry, const Names& names) {
-    EntryDetail detail;
-    detail.fields = fieldsText(entry, names);
-    const std::string_view text = entry.text();
-    if (text.empty() || entry.keep().textBytes == 0) {
-        return detail;
-    }
-    const std::string_view kept = Utf8::prefix(text, entry.keep().textBytes);
+std::string textOf(LogEntry& entry) {
+    const std::string_view kept = Utf8::prefix(entry.text(), entry.keep().textBytes);
     std::string room;
-    detail.isCut = kept.size() < text.size() || entry.isCut();
-    detail.text =
-        JsonWriter::text([&](JsonWriter& json) { json.value(RowText::ofLocal(kept, room)); });
-    return detail;
+    return kept.empty() ? std::string() : JsonWriter::text([&](JsonWriter& json) {
+        json.value(RowText::ofLocal(kept, room));
+    });
+}
+
+std::string contextText(const EntryContext& context, std::size_t entries) {
+    const std::vector<std::string_view> texts = context.before(entries);
+    std::string room;
+    return texts.empty() ? std::string() : JsonWriter::text([&](JsonWriter& json) {
+        json.beginArray();
+        for (const std::string_view text : texts) {
+            json.value(RowText::ofLocal(text, room));
+        }
+        json.endArray();
+    });
 }
 
 } // namespace
 
-void EntryEvents::describe(LogEntry& entry) {
-    const auto& kept = entry.keep().fields;
-    const Names* last = nullptr;
+void EntryEvents::describe(LogEntry& entry, const EntryContext& context) {
+    const EntryKeep& keep = entry.keep();
+    const SituationLabel* last = nullptr;
     m_details.clear();
     for (const auto& situation : m_situations) {
-        const Names& names = kept ? *kept : situation->fields;
         // Situations mostly keep the same.
-        m_details.push_back(last != nullptr && *last == names
-                                ? m_details.back()
-                                : std::make_shared<const EntryDetail>(detailOf(entry, names)));
-        last = &names;
+        if (last != nullptr && last->fields == situation->fields &&
+            last->context == situation->context) {
+            m_details.push_back(m_details.back());
+            continue;
+        }
+        last = situation.get();
+        auto detail = std::make_shared<EntryDetail>();
+        detail->fields = fieldsText(entry, keep.fields ? *keep.fields : situation->fields);
+        detail->text = textOf(entry);
+        detail->isCut =
+            !detail->text.empty() && (entry.isCut() || entry.text().size() > keep.textBytes);
+        detail->context = contextText(context, situation->context);
+        m_details.push_back(std::move(detail));
     }
 }
 

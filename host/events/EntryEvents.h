@@ -13,6 +13,8 @@ class LogEntry;
 
 namespace zrm::host {
 
+class EntryContext;
+
 /// The events that one entry of a followed log has raised, collected on the log's thread until the
 /// entry ends. Keeps its memory from entry to entry.
 class EntryEvents {
@@ -28,8 +30,9 @@ public:
         m_rows.insert(m_rows.end(), row, row + rowSize);
         m_situations.push_back(situation);
     }
-    /// What the entry has beside the rows: completes the events before they leave.
-    void describe(LogEntry& entry);
+    /// What the entry has beside the rows: completes the events before they leave. `context` ends
+    /// with the entry.
+    void describe(LogEntry& entry, const EntryContext& context);
     void clear() noexcept {
         m_situations.clear();
         m_details.clear();

@@ -21,15 +21,17 @@ struct SituationLabel {
     std::string severity;                 ///< info, minor, warning, major or critical
     std::string text = {};                ///< its description for people; may be empty
     std::vector<std::string> fields = {}; ///< names of the fields that its conditions name
+    std::size_t context = 0;              ///< earlier entries that its events have
 };
 
 /// What an event has of its entry beside the row, as JSON values. Immutable.
 struct EntryDetail {
-    std::string fields; ///< an object; empty: none
-    std::string text;   ///< a string; empty: none
-    bool isCut = false; ///< the entry is longer than its text
+    std::string fields;  ///< an object; empty: none
+    std::string text;    ///< a string; empty: none
+    bool isCut = false;  ///< the entry is longer than its text
+    std::string context; ///< an array of strings, the oldest entry first; empty: none
 
-    std::size_t bytes() const noexcept { return fields.size() + text.size(); }
+    std::size_t bytes() const noexcept { return fields.size() + text.size() + context.size(); }
 };
 
 /// One event in the queue.

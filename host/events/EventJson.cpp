@@ -34,6 +34,9 @@ void EventJson::writeDetail(JsonWriter& json, const EntryDetail& detail) const {
     if (detail.isCut) {
         json.member("entry_cut", true);
     }
+    if (!detail.context.empty()) {
+        json.key(m_contextKey).raw(detail.context);
+    }
 }
 
 void EventJson::appendLog(std::string& text, const Event& event) const {

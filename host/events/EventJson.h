@@ -10,8 +10,8 @@
 namespace zrm::host {
 
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}, and for the log
-/// of a [[log]] table also {"fields", "entry", "entry_cut"} where there is such a thing. Immutable,
-/// so any thread.
+/// of a [[log]] table also {"fields", "entry", "entry_cut", "context"} where there is such a thing.
+/// Immutable, so any thread.
 class EventJson {
 public:
     explicit EventJson(RowLayout layout);
@@ -34,6 +34,7 @@ private:
     JsonKey m_rowKey{"row"};
     JsonKey m_fieldsKey{"fields"};
     JsonKey m_entryKey{"entry"};
+    JsonKey m_contextKey{"context"};
 };
 
 } // namespace zrm::host

@@ -3,6 +3,8 @@
 
 #include "framework/LogEntry.h"
 
+#include "host/events/ContextDemand.h"
+#include "host/events/EntryContext.h"
 #include "host/events/EntryEvents.h"
 #include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
@@ -29,10 +31,24 @@ public:
         events.clear();
     }
 
+    /// Keeps the entry that begins for the events of later ones, if a situation wants that.
+    void noteContext() {
+        if (ContextDemand::generation() != demand) {
+            demand = ContextDemand::generation();
+            context.keep(ContextDemand::of(log->name()));
+        }
+        const LogEntry* const entry = LogEntry::ofThisThread;
+        if (context.isKept() && entry != nullptr) {
+            context.add(entry->text());
+        }
+    }
+
     const std::shared_ptr<PositionBook> book;
     const std::shared_ptr<FollowedLog> log;
     const FollowedLog::Follower follower;
     EntryEvents events;
+    EntryContext context;
+    std::uint64_t demand = 0; ///< generation of ContextDemand that `context` meets
 };
 
 LogPositions::LogPositions(const char* log) : m_state(std::make_unique<State>(log)) {}
@@ -54,6 +70,7 @@ std::optional<LogPosition> LogPositions::stored() const {
 void LogPositions::beginEntry() noexcept {
     m_state->events.clear();
     EntryEvents::ofThisThread = &m_state->events;
+    m_state->noteContext();
 }
 
 bool LogPositions::hasEvents() const noexcept {
@@ -63,7 +80,7 @@ bool LogPositions::hasEvents() const noexcept {
 void LogPositions::endEntry(const LogPosition& behind) {
     if (hasEvents() && !m_state->book->isClosed()) {
         if (LogEntry* const entry = LogEntry::ofThisThread) {
-            m_state->events.describe(*entry);
+            m_state->events.describe(*entry, m_state->context);
         }
         m_state->log->push(m_state->follower, m_state->book->queue(), m_state->events, m_state->log,
                            behind);

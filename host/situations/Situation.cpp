@@ -41,10 +41,10 @@ RequestDetail detailOf(const SituationConfig& config) {
 
 Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
                      std::shared_ptr<SituationCounts> counts)
-    : m_config(std::move(config)),
-      m_label(std::make_shared<const SituationLabel>(SituationLabel{
-          m_config.name, m_config.severity, m_config.text, fieldsOf(m_config.conditions)})),
-      m_queue(queue), m_counts(std::move(counts)),
+    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(SituationLabel{
+                                       m_config.name, m_config.severity, m_config.text,
+                                       fieldsOf(m_config.conditions), m_config.context})),
+      m_queue(queue), m_counts(std::move(counts)), m_context(m_config.log, m_config.context),
       m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
     TraceScope trace(anchor);
     if (!isOpen()) {

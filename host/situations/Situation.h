@@ -2,6 +2,7 @@
 #define ZRM_HOST_SITUATION_H
 
 #include "host/config/HostConfig.h"
+#include "host/events/ContextDemand.h"
 #include "host/events/EventQueue.h"
 #include "host/framework/Request.h"
 
@@ -67,6 +68,7 @@ private:
     EventQueue& m_queue;
     const std::shared_ptr<SituationCounts> m_counts;
     std::atomic<unsigned> m_stopReason{0};
+    const ContextDemand::Hold m_context;
     Request m_request; ///< last member: rows may arrive during its construction
 };
 

@@ -29,7 +29,8 @@ Json SituationJson::definition(const SituationConfig& situation) {
             {"log", orNull(situation.log)},
             {"when", situation.when},
             {"frequency", orNull(situation.frequency)},
-            {"period", orNull(situation.period)}};
+            {"period", orNull(situation.period)},
+            {"context", situation.context}};
 }
 
 Json SituationJson::status(const SituationStatus& status) {

@@ -83,6 +83,7 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     text.when = object.at("when").get<std::vector<std::string>>();
     text.frequency = optionalText(object, "frequency");
     text.period = optionalText(object, "period");
+    text.context = object.value("context", std::int64_t{0});
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
     auto [config, problems] = SituationValidator::check(text, patterns.ofNext());

@@ -182,3 +182,23 @@ def test_explain_says_what_a_field_was(agent):
         "POST", "/api/v1/backtest", {"situation": "slow", "from": "2026-11-20", "to": "2026-11-21"}
     )
     assert (status, "conditions on fields" in problem["detail"]) == (400, True)
+
+
+def test_context_is_the_entries_before(agent):
+    log = file(agent)
+    other = file(agent, "other.log")
+    agent.follow([log, other], start="beginning")
+    agent.situation(name="with", log=log, when=["ENTRYDESC starts 'failed'"], context=2)
+    agent.situation(name="without", when=["ENTRYDESC starts 'failed'"])
+    agent.start()
+    lines = [syslog_line(text) for text in ("one", "two", "three", "failed", "failed again")]
+    log.append("".join(lines))
+    other.append("".join(lines[2:4]))
+    events = agent.wait_events(5)
+    assert agent.stop() == 0
+    texts = [line.rstrip("\n") for line in lines]
+    assert [event["context"] for event in events if event["situation"] == "with"] == [
+        texts[1:3],
+        texts[2:4],
+    ]
+    assert all("context" not in event for event in events if event["situation"] == "without")

@@ -24,6 +24,7 @@ def test_a_situation_is_created_raises_events_and_is_removed(running):
         "when": ["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed'"],
         "frequency": ">= 2",
         "period": "60s",
+        "context": 0,
         "source": "api",
         "state": "running",
         "problem": None,

@@ -10,6 +10,18 @@ import { WindowedList } from "../windowed.js";
 const PAGE = 200;
 const MOST = 20000; // kept in the page; older ones are in the history
 
+/** What the event has of its entry beside the columns. */
+function entryOf({ entry, entry_cut: isCut, fields, context }) {
+  return [
+    context && [h("h3", {}, "Entries before it"), h("pre", {}, context.join("\n"))],
+    entry && [
+      h("h3", {}, isCut ? "Beginning of the entry" : "Entry"),
+      h("pre", { className: "entry" }, entry),
+    ],
+    fields && [h("h3", {}, "Fields"), rowList(fields)],
+  ];
+}
+
 const describe = (event) => event.row?.UENTRYDESC || event.row?.ENTRYDESC || "";
 const logOf = (event) =>
   (event.row?.ULOGPATH || event.row?.LOGPATH || "") +
@@ -374,6 +386,7 @@ class EventsPage {
       ),
       h("p", { className: "actions" }, explain),
       why,
+      entryOf(event),
       h("h3", {}, "Columns"),
       rowList(event.row),
     );

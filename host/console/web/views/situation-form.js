@@ -15,6 +15,7 @@ const BLANK = {
   when: [],
   frequency: null,
   period: null,
+  context: 0,
 };
 const ANY = "*"; // no log has this path
 const UNITS = [
@@ -67,6 +68,17 @@ class Form {
         h("input", { value: situation.text, autocomplete: "off", oninput: changed }),
         "Shown to people when it is raised",
       ),
+      context: field(
+        "Entries before it",
+        h("input", {
+          type: "number",
+          min: 0,
+          max: 100,
+          value: situation.context,
+          oninput: changed,
+        }),
+        "How many earlier lines of the log an event keeps, for logs of [[log]]",
+      ),
       severity: field("Severity", select(SEVERITIES, situation.severity, { onchange: changed })),
       log: field(
         "Log",
@@ -106,6 +118,7 @@ class Form {
           h("div", { className: "fields" }, this.fields.log, this.fields.severity),
           this.conditions.element,
           this.repeats.element,
+          h("div", { className: "fields" }, this.fields.context),
           this.problem,
           h(
             "p",
@@ -183,7 +196,7 @@ class Form {
   }
 
   get definition() {
-    const { name, text, severity, log } = this.fields;
+    const { name, text, severity, log, context } = this.fields;
     return {
       name: name.control.value.trim(),
       text: text.control.value,
@@ -191,6 +204,7 @@ class Form {
       log: [ANY, ""].includes(log.control.value) ? null : log.control.value,
       when: this.conditions.texts,
       ...this.repeats.value,
+      context: Number(context.control.value),
     };
   }
 

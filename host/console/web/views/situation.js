@@ -127,6 +127,7 @@ function definition(situation) {
         ? `raised by ${frequencyText(situation.frequency, situation.period)}`
         : "every match is raised",
     ],
+    ["Entries before it", situation.context || "none"],
     [
       "Comes from",
       situation.source === "file"

@@ -132,7 +132,7 @@ keep_days = 30
             "token_file, key",
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
-            "severity, log, when, frequency, period",
+            "severity, log, when, frequency, period, context",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
             "http, history, sink, log, situation"));
 }

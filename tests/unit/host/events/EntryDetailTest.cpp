@@ -1,16 +1,21 @@
 #include "base/EntryFields.h"
 #include "framework/LogEntry.h"
 #include "framework/LogPositions.h"
+#include "host/events/ContextDemand.h"
+#include "host/events/EntryContext.h"
 #include "host/events/EntryEvents.h"
 #include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
+#include "support/AllocationCount.h"
 #include "unit/host/events/TestEvents.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <optional>
 #include <string>
+#include <utility>
 
 using namespace zrm;
 using namespace zrm::host;
@@ -49,7 +54,7 @@ protected:
         EntryEvents events;
         events.add(naming(std::move(fields)), "row", 3);
         EXPECT_EQ(events.detail(0), nullptr);
-        events.describe(entry);
+        events.describe(entry, {});
         return events.detail(0);
     }
 
@@ -104,7 +109,7 @@ TEST_F(EntryDetailTest, SituationsThatKeepTheSameShareIt) {
     events.add(naming({"user"}), "row", 3);
     events.add(naming({"user"}), "row", 3);
     events.add(naming({}), "row", 3);
-    events.describe(entry);
+    events.describe(entry, {});
     EXPECT_EQ(events.detail(0), events.detail(1));
     EXPECT_NE(events.detail(1), events.detail(2));
     EXPECT_EQ(events.detail(2)->fields, "");
@@ -117,12 +122,13 @@ TEST_F(EntryDetailTest, TheJsonOfAnEventHasIt) {
     const EventJson format(testLayout());
     std::string plain;
     format.append(plain, event);
-    event.detail =
-        std::make_shared<const EntryDetail>(EntryDetail{R"({"a":"b"})", R"("line")", true});
+    event.detail = std::make_shared<const EntryDetail>(
+        EntryDetail{R"({"a":"b"})", R"("line")", true, R"(["before"])"});
     std::string text;
     format.append(text, event);
     plain.pop_back();
-    EXPECT_EQ(text, plain + R"(,"fields":{"a":"b"},"entry":"line","entry_cut":true})");
+    EXPECT_EQ(text, plain + R"(,"fields":{"a":"b"},"entry":"line","entry_cut":true,)" +
+                        R"("context":["before"]})");
 }
 
 TEST_F(EntryDetailTest, TheEventsOfTheThreadsEntryAreDescribed) {
@@ -145,6 +151,66 @@ TEST_F(EntryDetailTest, TheEventsOfTheThreadsEntryAreDescribed) {
     PositionBook::makeCurrent(PositionBook::unkept());
 }
 
+TEST_F(EntryDetailTest, SituationsGetTheEntriesBefore) {
+    const ContextDemand::Hold other("/other", 50);
+    std::optional<ContextDemand::Hold> hold(std::in_place, "/log", 2);
+    EventQueue queue(100, 16);
+    const EventQueue::Reader reader = queue.addReader();
+    const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
+    PositionBook::makeCurrent(book);
+    book->setQueue(&queue);
+    const LogEntry::Offer offer(entry);
+    LogPositions log("/log");
+    const auto wanting = [](std::size_t context) {
+        return std::make_shared<const SituationLabel>(
+            SituationLabel{"watch", "minor", "", {}, context});
+    };
+    const auto raised = [&](std::string text, std::size_t context) {
+        entry.m_text = std::move(text);
+        log.beginEntry();
+        EXPECT_TRUE(queue.push(wanting(context), "0123456789abcdef"));
+        log.endEntry({});
+        const std::string shown = queue.read(reader, 1)[0].detail->context;
+        queue.release(reader, 1);
+        return shown;
+    };
+    EXPECT_EQ(raised("one", 2), "");
+    EXPECT_EQ(raised("two", 2), R"(["one"])");
+    EXPECT_EQ(raised("three", 0), "");
+    EXPECT_EQ(raised("four", 2), R"(["two","three"])");
+    EXPECT_EQ(raised("five", 1), R"(["four"])");
+    {
+        const ContextDemand::Hold every(std::nullopt, 3);
+        EXPECT_EQ(raised("six", 3), R"(["three","four","five"])") << "what was kept so far";
+        EXPECT_EQ(raised("seven", 3), R"(["four","five","six"])");
+    }
+    hold.reset();
+    EXPECT_EQ(raised("eight", 2), "") << "nobody wants it any more";
+    PositionBook::makeCurrent(PositionBook::unkept());
+}
+
+TEST(EntryContext, IsBoundedAndAllocatesNothingPerEntry) {
+    EntryContext context;
+    context.keep(EntryContext::mostEntries + 1);
+    const std::string line(10'000, 'x');
+    const long before = allocationCount();
+    for (int entry = 0; entry < 1000; ++entry) {
+        context.add(line);
+    }
+    EXPECT_EQ(allocationCount(), before);
+    const auto texts = context.before(1000);
+    EXPECT_EQ(texts.size(), EntryContext::mostBytes / EntryContext::longestEntry);
+    EXPECT_EQ(texts.front().size(), EntryContext::longestEntry);
+    context.keep(EntryContext::mostEntries);
+    for (int entry = 0; entry < 1000; ++entry) {
+        context.add(std::to_string(entry));
+    }
+    EXPECT_EQ(context.before(1000).size(), EntryContext::mostEntries);
+    EXPECT_EQ(context.before(1000).front(), "899");
+    context.keep(0);
+    EXPECT_FALSE(context.isKept());
+}
+
 class DetailRoomTest : public testing::Test {
 protected:
     DetailRoomTest() {
@@ -154,7 +220,7 @@ protected:
     void push() {
         EntryEvents events;
         events.add(label, "0123456789abcdef", 16);
-        events.describe(entry);
+        events.describe(entry, {});
         queue.pushEntry(events, nullptr, {});
     }
 
