@@ -5,6 +5,7 @@ import re
 import time
 
 from browser.conftest import until
+from conftest import Log
 from selenium.webdriver.common.by import By
 from selenium.webdriver.common.keys import Keys
 
@@ -197,6 +198,40 @@ def test_events_resume_where_they_were_after_a_lost_connection(page, agent, fast
     page.wait_text("203.0.113.2", 60)
     assert page.text().count("203.0.113.1 ") == 1
     page.expect_complaints()
+
+
+def test_fields_are_asked_for_and_an_event_shows_its_entry(page, agent):
+    log = Log(agent.directory / "followed.log")
+    log.path.write_text("")
+    agent.follow(log, start="beginning")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    page.on(agent, "situations")
+    page.click("New situation")
+    page.type("Name", "high-pid")
+    page.choose("Log", str(log))
+    page.type("Entries before it", "1")
+    page.click("Add a condition")
+    group = "//*[@role='group' and @aria-label='Condition']"
+    page.find(f"{group}//select[@aria-label='Column']/option[.='Field']").click()
+    page.find(f"{group}//input[@aria-label='Field']").send_keys("pid")
+    page.find(f"{group}//select[@aria-label='Operator']/option[.='more than']").click()
+    page.find(f"{group}//input[@aria-label='Value']").send_keys("99.5")
+    page.click("Create situation")
+    page.heading("high-pid")
+    page.wait_text("field.pid > 99.5")
+    page.click("Edit high-pid")
+    page.heading("Edit high-pid")
+    assert page.find(f"{group}//input[@aria-label='Field']").get_attribute("value") == "pid"
+    page.click("Save changes")
+    page.heading("high-pid")
+    log.append(syslog_line("before it", "app[7]") + syslog_line("x" * 300 + " the end", "app[100]"))
+    page.go("Events")
+    page.wait_text("high-pid")
+    page.find("//*[@role='option']").click()
+    page.wait_text("the end")
+    assert "app[7]: before it" in page.text()
+    page.pictures("event-with-fields")
 
 
 def test_markup_in_a_log_line_stays_text(page, agent):

@@ -1,8 +1,9 @@
-// Conditions, chosen from the columns. Their text form is COLUMN OPERATOR VALUE.
+// Conditions, chosen from the columns and fields. Their text form is COLUMN OPERATOR VALUE.
 
 import { button, fill, h, select } from "./dom.js";
 
-const FORM = /^\s*([A-Z]+)\s*(!=|>=|<=|=|<|>|contains\b|starts\b|matches\b|in\b)\s*([^]*)$/;
+const FORM =
+  /^\s*([A-Z]+|field\.[^\s=!<>~']+)\s*(!=|[<>]?=|<|>|contains\b|starts\b|matches\b|in\b)\s*([^]*)$/;
 const NAMES = {
   ENTRYSRC: "Source",
   ENTRYDESC: "Description",
@@ -25,6 +26,10 @@ const WORDS = {
 };
 const FIRST = ["ENTRYSRC", "ENTRYDESC", "ENTRYTYPE", "ENTRYCLASS", "ENTRYSYS", "ENTRYTIME"];
 
+const FIELD = "field."; // before the name of a field, in place of a column
+const NUMBER = /^-?(?:\d+\.?\d*|\.\d+)(?:[eE]-?\d+)?$/;
+const OF_TEXT = ["contains", "starts", "matches"];
+
 const quote = (text) => `'${text.replaceAll("'", "''")}'`;
 
 function unquote(text) {
@@ -37,6 +42,13 @@ function parse(text) {
   const match = FORM.exec(text);
   if (!match) return null;
   const [, column, operator, value] = match;
+  // A field is compared as a number or as text; only a value that cannot be the other keeps that.
+  if (column.startsWith(FIELD)) {
+    const inner = unquote(value);
+    const isText = inner !== null && (!NUMBER.test(inner) || OF_TEXT.includes(operator));
+    const plain = isText ? inner : NUMBER.test(value.trim()) ? value.trim() : null;
+    return plain ? { column, operator, value: plain } : null;
+  }
   if (operator === "in") {
     const list = /^\[([^]*)\]\s*$/.exec(value);
     const items = list && list[1].match(/'(?:[^']|'')*'|-?\d+/g);
@@ -138,9 +150,10 @@ export class Conditions {
       (a, b) => (FIRST.indexOf(a.name) + 1 || 99) - (FIRST.indexOf(b.name) + 1 || 99),
     );
     const changed = () => this.#change();
+    const isField = () => columnBox.value === FIELD;
     const columnBox = select(
-      known.map(({ name }) => [name, NAMES[name] ?? name]),
-      column,
+      [...known.map(({ name }) => [name, NAMES[name] ?? name]), [FIELD, "Field"]],
+      column.startsWith(FIELD) ? FIELD : column,
       {
         "aria-label": "Column",
         onchange: () => {
@@ -149,6 +162,15 @@ export class Conditions {
         },
       },
     );
+    const fieldBox = h("input", {
+      className: "mono field-name",
+      value: column.startsWith(FIELD) ? column.slice(FIELD.length) : "",
+      placeholder: "name of the field",
+      "aria-label": "Field",
+      spellcheck: false,
+      autocomplete: "off",
+      oninput: changed,
+    });
     const operatorBox = h("select", {
       "aria-label": "Operator",
       onchange: () => {
@@ -167,14 +189,14 @@ export class Conditions {
     const isNumber = () => known.find(({ name }) => name === columnBox.value)?.type === "number";
     const offer = () => {
       const before = operatorBox.value || operator;
-      const usable = Object.keys(WORDS).filter(
-        (key) => !isNumber() || !["contains", "starts", "matches"].includes(key),
-      );
+      const usable = Object.keys(WORDS).filter((key) => !isNumber() || !OF_TEXT.includes(key));
       fill(
         operatorBox,
         usable.map((key) => h("option", { value: key }, WORDS[key])),
       );
       operatorBox.value = usable.includes(before) ? before : "=";
+      if (isField()) columnBox.after(fieldBox);
+      else fieldBox.remove();
       hint();
     };
     const hint = () => {
@@ -188,21 +210,30 @@ export class Conditions {
               : "text";
     };
     offer();
-    const write = (text) => (isNumber() ? text.trim() : quote(text));
+    const isBare = (text) =>
+      isNumber() || (isField() && NUMBER.test(text.trim()) && !OF_TEXT.includes(operatorBox.value));
+    const write = (text) => (isBare(text) ? text.trim() : quote(text));
+    const fieldName = () => {
+      const name = fieldBox.value.trim();
+      return /^[^\s=!<>~']+$/.test(name) ? name : quote(name);
+    };
     return {
       element: h(
         "div",
         { className: "condition", role: "group", "aria-label": "Condition" },
         columnBox,
+        isField() && fieldBox,
         operatorBox,
         input,
       ),
       input,
       isBlank: () => input.value === "",
       text: () => {
-        const list = input.value.split(",").map((item) => write(item.trim()));
+        const items = input.value.split(",").map((item) => item.trim());
+        const list = items.every(isBare) ? items : items.map(quote);
         const wanted = operatorBox.value === "in" ? `[${list.join(", ")}]` : write(input.value);
-        return `${columnBox.value} ${operatorBox.value} ${wanted}`;
+        const name = isField() ? FIELD + fieldName() : columnBox.value;
+        return `${name} ${operatorBox.value} ${wanted}`;
       },
     };
   }
