@@ -5,6 +5,7 @@
 #include "host/analysis/Explanation.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "host/analysis/SeenFields.h"
 #include "host/analysis/StoredRow.h"
 #include "host/api/EventQuery.h"
 #include "host/api/SituationBody.h"
@@ -15,6 +16,7 @@
 #include "host/framework/TraceCapture.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/JsonFields.h"
+#include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
 #include "monitor/LogFile.h"
@@ -63,6 +65,31 @@ void AnalysisResource::addRoutes(Router& router) {
                [this](const HttpRequest& request) { return explain(request); });
     router.add("POST", "/api/v1/backtest",
                [this](const HttpRequest& request) { return backtest(request); });
+    router.add("GET", "/api/v1/fields", &AnalysisResource::fields);
+}
+
+HttpAnswer AnalysisResource::fields(const HttpRequest& request) {
+    QueryFields query(request);
+    const std::optional<std::string> path = query.text("log");
+    query.refuseUnknown();
+    if (!path) {
+        throw RequestRefused(400, "is missing: name a log", "log");
+    }
+    const TraceSilence silence;
+    const MonitoredLogs logs;
+    LogFile* const log = logs.find(*path);
+    if (log == nullptr) {
+        throw RequestRefused(404, "the agent does not monitor this log", "log");
+    }
+    SeenFields seen;
+    if (const Result<void> read = seen.read(*log); !read) {
+        throw RequestRefused(409, {read.error().what, read.error().cure, "log"});
+    }
+    return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("log", *path);
+        seen.write(json);
+        json.endObject();
+    }));
 }
 
 /// The situation that a body names or defines; `otherwise` is the name if it does neither.

@@ -48,6 +48,7 @@ private:
 
     HttpAnswer explain(const HttpRequest& request);
     HttpAnswer backtest(const HttpRequest& request);
+    static HttpAnswer fields(const HttpRequest& request);
     Subject subject(JsonFields& fields, const std::string& otherwise = "");
     Explained explainLine(JsonFields& fields);
     Explained explainLast(JsonFields& fields);

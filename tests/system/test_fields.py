@@ -202,3 +202,25 @@ def test_context_is_the_entries_before(agent):
         texts[2:4],
     ]
     assert all("context" not in event for event in events if event["situation"] == "without")
+
+
+def test_the_fields_of_a_log_are_listed(agent):
+    log = file(agent)
+    plain = agent.log("plain.log", content=syslog_line("text").encode())
+    log.append("".join(syslog_line("text", source) for source in ("app[1]", "cron", "app[2]")))
+    agent.follow(log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    status, _, answer = api.request("GET", f"/api/v1/fields?log={log}")
+    assert status == 200
+    assert [(one["name"], one["entries"], one["example"]) for one in answer["fields"]] == [
+        ("host", 3, "web1"),
+        ("message", 3, "text"),
+        ("tag", 3, "app"),
+        ("pid", 2, "2"),
+    ]
+    assert (answer["entries"], answer["complete"]) == (3, True)
+    assert api.request("GET", f"/api/v1/fields?log={plain}")[2]["fields"] == []
+    assert api.request("GET", "/api/v1/fields?log=/absent")[0] == 404
+    assert api.request("GET", "/api/v1/fields")[0] == 400

@@ -92,6 +92,8 @@ EXAMPLES = [
     ("GET", "/api/v1/logs", None, None, 200),
     ("GET", "/api/v1/logs", "/api/v1/logs?log={log}", None, 200),
     ("GET", "/api/v1/logs", "/api/v1/logs?log=/none", None, 404),
+    ("GET", "/api/v1/fields", "/api/v1/fields?log={log}", None, 200),
+    ("GET", "/api/v1/fields", "/api/v1/fields?log=/none", None, 404),
     ("POST", "/api/v1/refresh", None, None, 202),
     ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/RMMONLOG/sample", {}, 200),
     ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/NONE/sample", {}, 404),

@@ -74,11 +74,13 @@ export class Conditions {
     this.#columns = columns;
     this.#change = change;
     this.list = h("div", { className: "stack-small" });
+    this.suggestions = h("datalist", { id: "fields-of-the-log" });
     this.element = h(
       "fieldset",
       {},
       h("legend", {}, "Conditions (all must hold)"),
       this.list,
+      this.suggestions,
       button("Add a condition", () => {
         this.#add(this.#chosen({ column: "ENTRYDESC", operator: "contains", value: "" })).focus();
         this.#change();
@@ -89,6 +91,14 @@ export class Conditions {
       this.#add(parts ? this.#chosen(parts) : this.#raw(text));
     }
     this.#drawEmpty();
+  }
+
+  /** Offers names of fields: those of /api/v1/fields. */
+  suggest(fields) {
+    fill(
+      this.suggestions,
+      fields.map(({ name, example }) => h("option", { value: name, label: `${name}: ${example}` })),
+    );
   }
 
   /** The conditions as texts; one without a value yet is left out. */
@@ -166,6 +176,7 @@ export class Conditions {
       className: "mono field-name",
       value: column.startsWith(FIELD) ? column.slice(FIELD.length) : "",
       placeholder: "name of the field",
+      list: this.suggestions.id,
       "aria-label": "Field",
       spellcheck: false,
       autocomplete: "off",

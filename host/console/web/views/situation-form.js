@@ -1,6 +1,6 @@
 // Makes a situation, or changes one.
 
-import { get, post, request, situationPath } from "../api.js";
+import { get, post, request, situationPath, withQuery } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { debounce, field, fill, h, select } from "../dom.js";
 import { COMPARISONS, SEVERITIES } from "../format.js";
@@ -85,7 +85,12 @@ class Form {
         select(
           [["", "Choose a log"], ...logs, [ANY, "Any log"]],
           situation.log || (name ? ANY : ""),
-          { onchange: changed },
+          {
+            onchange: () => {
+              changed();
+              this.#suggest();
+            },
+          },
         ),
       ),
     };
@@ -132,6 +137,7 @@ class Form {
     );
     this.check = debounce(() => this.#validate(), 350);
     this.#validate();
+    this.#suggest();
   }
 
   #repeats(situation, changed) {
@@ -211,6 +217,17 @@ class Form {
   changed() {
     this.explain.update();
     this.check();
+  }
+
+  /** The names of the chosen log's fields; they only save typing. */
+  async #suggest() {
+    const { log } = this.definition;
+    try {
+      const { fields } = log ? await get(withQuery("/api/v1/fields", { log })) : { fields: [] };
+      this.conditions.suggest(fields);
+    } catch {
+      this.conditions.suggest([]);
+    }
   }
 
   #missing() {
