@@ -239,13 +239,30 @@ private:
         return candidate.isNamed ? 1 : 2;
     }
 
-    bool isChosen(const Candidate& candidate, std::size_t chosen) {
-        if (!candidate.isNamed) {
-            for (const std::string& origin : originsOf(candidate.name)) {
-                if (m_names.contains(origin) || m_finder.m_known.contains(origin)) {
-                    return passOver(candidate, "It is an older generation of " + origin);
-                }
+    /// The log of which the file is an older generation; empty if there is none. A generation that
+    /// was passed over remains one when its log is gone: what it has was read as that log's.
+    std::string logOf(const Candidate& candidate) const {
+        if (candidate.isNamed) {
+            return "";
+        }
+        const auto& stored = m_finder.m_earlier.positions();
+        const bool isOld = !m_finder.m_hasLooked && !candidate.isNewcomer &&
+                           m_logs[candidate.source].follow.resume &&
+                           !stored.contains(candidate.name);
+        for (std::string& origin : originsOf(candidate.name)) {
+            if (m_names.contains(origin) || m_finder.m_known.contains(origin) ||
+                m_finder.m_generations.contains({candidate.identity, origin}) ||
+                (isOld && stored.contains(origin))) {
+                return std::move(origin);
             }
+        }
+        return "";
+    }
+
+    bool isChosen(const Candidate& candidate, std::size_t chosen) {
+        if (const std::string log = logOf(candidate); !log.empty()) {
+            m_generations.emplace(candidate.identity, log);
+            return passOver(candidate, "It is an older generation of " + log);
         }
         if (candidate.isThere && !isFirstName(candidate)) {
             return false;
@@ -335,6 +352,7 @@ private:
         m_finder.m_hasLooked = true;
         m_finder.m_known = std::move(known);
         m_finder.m_rotated = std::move(m_rotated);
+        m_finder.m_generations = std::move(m_generations);
         m_finder.m_searched.clear();
         for (const LogConfig& log : m_logs) {
             m_finder.m_searched.insert(log.paths.begin(), log.paths.end());
@@ -351,6 +369,7 @@ private:
     std::map<Identity, std::string> m_identities;
     std::map<Identity, std::string> m_ownFiles;
     std::map<std::string, Identity> m_rotated;
+    std::set<std::pair<Identity, std::string>> m_generations;
 };
 
 FoundLogs LogFinder::look(const std::vector<LogConfig>& logs,

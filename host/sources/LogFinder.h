@@ -49,6 +49,8 @@ private:
 
     std::map<std::string, Known> m_known;      ///< the followed files by name
     std::map<std::string, Identity> m_rotated; ///< followed under another name before
+    /// Passed over by the last look, each with its log.
+    std::set<std::pair<Identity, std::string>> m_generations;
     /// The paths and globs of the last look: a file that one of these matches now is new.
     std::set<std::string> m_searched;
     EarlierRun m_earlier;

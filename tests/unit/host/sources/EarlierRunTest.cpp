@@ -190,6 +190,20 @@ TEST_F(EarlierRunTest, ALogThatIsGoneIsNotFollowed) {
     EXPECT_THAT(names(), ElementsAre(other));
 }
 
+TEST_F(EarlierRunTest, OlderGenerationsOfALogThatIsGoneAreNotReadAgain) {
+    const std::string log = create("app.log", 0, "one\n");
+    create("app.log.1", 100);
+    const std::string young = create("app.log-20261122", 10);
+    read(log, log);
+    fs::remove(log);
+    watched(file("*"), 50);
+    table(file("*"));
+    begin();
+    EXPECT_THAT(names(), ElementsAre(young));
+    look();
+    EXPECT_THAT(names(), ElementsAre(young));
+}
+
 TEST_F(EarlierRunTest, AnotherFileWithTheSameInodeIsNew) {
     const std::string log = create("app-1.log", 0, "one\n");
     read(log, log);

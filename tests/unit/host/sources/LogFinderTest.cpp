@@ -200,6 +200,31 @@ TEST_F(LogFinderTest, AFileThatIsGoneStaysForAWhile) {
     EXPECT_TRUE(isNewcomer(file("app.log")));
 }
 
+TEST_F(LogFinderTest, OlderGenerationsStayPassedOverWhenTheirLogIsGone) {
+    create("app.log");
+    create("app.log.2");
+    logs = {table({file("*")})};
+    look();
+    rename("app.log", "app.log.1");
+    look();
+    now += LogFinder::keptAbsent;
+    look();
+    EXPECT_THAT(names(), IsEmpty());
+    look();
+    EXPECT_THAT(names(), IsEmpty());
+    EXPECT_EQ(reason(file("app.log.1")), "It is an older generation of " + file("app.log"));
+    rename("app.log.2", "app.log.3");
+    rename("app.log.1", "app.log.2");
+    look();
+    EXPECT_THAT(names(), IsEmpty());
+    const std::string young = create("app.log-20261122"); // from now on the application dates them
+    look();
+    EXPECT_THAT(names(), ElementsAre(young));
+    create("app.log");
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("app.log")));
+}
+
 TEST_F(LogFinderTest, AFollowedLogStaysWhenItsNameIsNoLongerAFiles) {
     create("app.log");
     create("named.log");
