@@ -63,7 +63,9 @@ void LogFile::followLog(std::size_t recordLength) {
     LogPositions positions(fileNameUTF8());
     FollowedEntry current(*this, follower);
     const LogEntry::Offer offer(current);
-    const auto stored = settings.resume ? positions.stored() : std::nullopt;
+    // A log that is followed again, with other settings for example, continues in any case.
+    const bool continues = settings.resume || !positions.isFirstOfRun();
+    const auto stored = continues ? positions.stored() : std::nullopt;
     if (stored) {
         follower.resumeAt(*stored);
     }

@@ -211,3 +211,15 @@ def test_without_resumption_the_log_begins_at_its_end(agent):
     agent.wait_open(log)
     log.append(syslog_line("two"))
     assert descriptions(agent.wait_events(2)) == ["one", "two"]
+
+
+@pytest.mark.parametrize("has_history", [True, False])
+def test_a_log_with_changed_settings_is_not_read_again(agent, has_history):
+    agent.history["enabled"] = has_history
+    log = followed(agent, start="beginning", resume=False)
+    agent.wait_events(1)
+    agent.tables[0]["rotate_wait"] = "3s"
+    agent.reload()
+    agent.wait_trace(f"Deleting log object for file {log}.")
+    log.append(syslog_line("one"))
+    assert descriptions(agent.wait_events(2)) == ["before the start", "one"]
