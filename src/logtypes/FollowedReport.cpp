@@ -164,7 +164,11 @@ void FollowedReport::findFiles() {
 
 /// False if the files after this one are older than the report's window.
 bool FollowedReport::readFile(File& file, Receiver& receiver) {
-    const std::unique_ptr<Generation> generation = open(file);
+    std::unique_ptr<Generation> generation = open(file);
+    if (generation && isCopy(*generation)) {
+        m_done += file.size;
+        return true;
+    }
     std::string first;
     if (generation) {
         first = firstTime(*generation);
@@ -175,8 +179,17 @@ bool FollowedReport::readFile(File& file, Receiver& receiver) {
         }
         m_newest = first.empty() ? m_newest : std::min(m_newest, first);
     }
+    if (generation && !generation->isCompressed()) {
+        m_younger = std::move(generation);
+    }
     m_done += file.size;
     return first.empty() || first >= m_longBefore;
+}
+
+/// Whether the next younger file has all that this one has, as if it was copied and not rotated.
+/// Compressed files are not compared: that would mean to read them.
+bool FollowedReport::isCopy(Generation& older) {
+    return m_younger && !older.isCompressed() && older.isCopyOf(*m_younger);
 }
 
 /// Null, with the file's problem, if it cannot be opened or has become another one.

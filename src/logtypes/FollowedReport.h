@@ -48,7 +48,7 @@ public:
         std::string path;
         std::int64_t size = 0;                ///< bytes
         std::optional<FileIdentity> identity; ///< of an older generation
-        bool isRead = false;                  ///< false: it has nothing between the two times
+        bool isRead = false;                  ///< false: nothing between the two times, or a copy
         std::string problem;                  ///< why not all of it was read, as a clause
     };
 
@@ -73,6 +73,7 @@ private:
     void findFiles();
     bool readFile(File& file, Receiver& receiver);
     std::unique_ptr<Generation> open(File& file);
+    bool isCopy(Generation& older);
     std::string firstTime(Generation& generation);
     void readBackward(Generation& generation, File& file, Receiver& receiver);
     void readForward(Generation& generation, File& file, Receiver& receiver);
@@ -90,6 +91,7 @@ private:
 
     std::vector<File> m_files;
     std::unique_ptr<Generation> m_present; ///< opened before the older generations are looked for
+    std::unique_ptr<Generation> m_younger; ///< the plain file that was read last
     std::string m_newest;                  ///< no entry that is still to be read is much newer
     std::int64_t m_done = 0;               ///< bytes of the files before the one that is read
     std::int64_t m_read = 0;               ///< bytes read so far, as the receiver knows

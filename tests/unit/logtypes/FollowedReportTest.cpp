@@ -307,6 +307,17 @@ TEST_F(FollowedReportTest, AFileIsReadOnceUnderTwoNames) {
     EXPECT_THAT(run(), ElementsAre("two", "one"));
 }
 
+TEST_F(FollowedReportTest, CopiesOfTheLogAreNotReadAgain) {
+    const std::string oldest = line("10-03", "one");
+    directory.write("app.log", oldest + line("10-04", "two") + line("10-05", "three"));
+    directory.write("app.log.1", oldest + line("10-04", "two"));
+    directory.write("app.log.2", oldest);
+    directory.write("app.log.3", line("10-03", "another") + line("10-03", "one"));
+    EXPECT_THAT(run(), ElementsAre("three", "two", "one", "one", "another"));
+    EXPECT_THAT(read(), ElementsAre("", ".3"));
+    EXPECT_THAT(problems(), IsEmpty());
+}
+
 TEST_F(FollowedReportTest, GenerationsAreWhereRotationMovesThemAndBesideALinksTarget) {
     std::filesystem::create_directories(directory.path() / "real/old");
     directory.write("real/app.log", line("10-05", "three"));
