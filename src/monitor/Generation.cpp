@@ -19,6 +19,9 @@ namespace zrm {
 namespace {
 
 constexpr std::size_t comparedBytes = 4096; ///< at either end, to recognise a copy
+/// Of contents that are compressed, which have no end to look at. A limit, since they may be very
+/// much longer than their file.
+constexpr std::int64_t mostComparedBytes = 64 * 1024 * 1024;
 
 std::int64_t nanoseconds(const timespec& time) noexcept {
     return static_cast<std::int64_t>(time.tv_sec) * 1'000'000'000 + time.tv_nsec;
@@ -195,7 +198,30 @@ bool Generation::holds(const LogPosition& position, Tail& tail) {
     return tail.length == position.guardLength && tail.hash() == position.guard;
 }
 
+/// True if all that can be read of the contents is at the beginning of the other's. A file that is
+/// still being compressed cannot be read to its end.
+bool Generation::isBeginningOf(Generation& other) {
+    std::vector<char> mine(comparedBytes);
+    std::vector<char> theirs(comparedBytes);
+    std::int64_t offset = 0;
+    while (offset < mostComparedBytes) {
+        const std::ptrdiff_t length = readWhole(mine.data(), comparedBytes, offset);
+        if (length <= 0) {
+            return offset > 0;
+        }
+        if (other.readWhole(theirs.data(), static_cast<std::size_t>(length), offset) != length ||
+            std::memcmp(mine.data(), theirs.data(), static_cast<std::size_t>(length)) != 0) {
+            return false;
+        }
+        offset += length;
+    }
+    return true;
+}
+
 bool Generation::isCopyOf(Generation& other) {
+    if (m_isCompressed || other.m_isCompressed) {
+        return isBeginningOf(other);
+    }
     std::vector<char> mine(comparedBytes);
     std::vector<char> theirs(comparedBytes);
     const std::ptrdiff_t length = readWhole(mine.data(), comparedBytes, 0);
@@ -205,8 +231,8 @@ bool Generation::isCopyOf(Generation& other) {
         return false;
     }
     Status now;
-    if (m_isCompressed || other.m_isCompressed || !status(now)) {
-        return m_isCompressed || other.m_isCompressed;
+    if (!status(now)) {
+        return false;
     }
     const std::int64_t end =
         std::max<std::int64_t>(now.size - static_cast<std::int64_t>(comparedBytes), 0);

@@ -59,8 +59,8 @@ public:
     std::ptrdiff_t readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept;
     /// True if the contents have the position's guard before its offset, which then are in `tail`.
     bool holds(const LogPosition& position, Tail& tail);
-    /// True if the contents of the other file begin with all contents of this one. For compressed
-    /// files their beginnings decide.
+    /// True if the contents of the other file begin with all contents of this one. Of plain files
+    /// both ends are compared; of compressed ones all that can be read, at most 64 MB.
     bool isCopyOf(Generation& other);
     /// The bytes before the offset. False and errno if they cannot be read.
     bool readTail(std::int64_t offset, Tail& tail) noexcept;
@@ -79,6 +79,7 @@ public:
 private:
     Generation(int descriptor, std::string path, FileIdentity identity, bool isCompressed);
 
+    bool isBeginningOf(Generation& other);
     std::ptrdiff_t readWhole(char* buffer, std::size_t count, std::int64_t offset) noexcept;
     std::ptrdiff_t readCompressed(char* buffer, std::size_t room, std::int64_t offset) noexcept;
     bool restart() noexcept;

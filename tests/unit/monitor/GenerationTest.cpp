@@ -42,4 +42,12 @@ TEST_F(GenerationCopy, IsNotACompressedFileWithMoreInIt) {
     EXPECT_FALSE(isCopy("a.gz", "GZ3\n", "b", "1\n2\n"));
 }
 
+TEST_F(GenerationCopy, IsNotACompressedFileThatOnlyBeginsAlike) {
+    const std::string banner(5000, 's');
+    EXPECT_FALSE(isCopy("a.gz", "GZ" + banner + "2\n", "b", banner + "3\n4\n"));
+    EXPECT_FALSE(isCopy("a", banner + "2\n", "b.gz", "GZ" + banner + "3\n4\n"));
+    EXPECT_TRUE(isCopy("a.gz", "GZ" + banner + "2\n", "b", banner + "2\n3\n"));
+    EXPECT_TRUE(isCopy("a.gz", "GZ" + banner + "2\n\x01", "b", banner + "2\n3\n")); // unfinished
+}
+
 } // namespace
