@@ -116,7 +116,10 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     member.from = isFromEnd ? status.size : 0;
     m_modified = status.modified;
     m_position = positionOf(named->identity(), member.from, member.tail);
-    m_position.modified = status.modified;
+    if (status.size == 0) {
+        noteOlder();
+    }
+    m_position.modified = m_modified;
     m_hasPosition = true;
     member.file = std::move(named);
     member.hadName = true;
@@ -124,6 +127,14 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
 }
 
 /// Continues at a position of an earlier run.
+/// A writer that still has the file before this one open writes to it later than this one was made.
+void FileFollower::noteOlder() {
+    for (const GenerationFile& file : generations()) {
+        m_older.push_back(file.identity);
+        noteModified(file.modified);
+    }
+}
+
 void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
     m_position = stored;
     m_hasPosition = true;
@@ -246,6 +257,7 @@ void FileFollower::switchToNext() {
     Member finished = std::move(m_chain.front());
     m_chain.pop_front();
     Generation::Status status{};
+    m_older.clear();
     const bool hasStatus = finished.file->status(status);
     if (m_block.readTo() > 0) {
         noteModified(hasStatus ? status.modified : m_seen.modified);

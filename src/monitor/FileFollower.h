@@ -124,6 +124,7 @@ private:
     void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
     void checkName();
     bool checkFile();
+    void noteOlder();
     bool isFinished() const noexcept;
     void noteModified(std::int64_t time) noexcept;
     LogPosition positionInBlock() const noexcept;
@@ -141,8 +142,10 @@ private:
     FollowLedger& m_ledger;
     std::optional<LogPosition> m_stored;
     Moment m_now{};
-    bool m_wasAbsent = false;   ///< nothing had the name at an earlier look
-    bool m_isTakenUp = false;   ///< files rotated before the start are read
+    bool m_wasAbsent = false; ///< nothing had the name at an earlier look
+    bool m_isTakenUp = false; ///< files rotated before the start are read
+    /// What was beside the first file, if that was empty: older, whenever it was written to.
+    std::vector<FileIdentity> m_older;
     std::deque<Member> m_chain; ///< the first is read; the last has the name, unless it lost it
     EntryBlock m_block;
     LogPosition m_position; ///< if it is not in the block

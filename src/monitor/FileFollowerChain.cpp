@@ -48,6 +48,9 @@ bool FileFollower::insertMissed() {
     Found found = find(m_position, Search::byIdentity, nullptr);
     const bool isHeld = found.holder.has_value();
     found.holder.reset();
+    std::erase_if(found.younger, [this](const Member& member) {
+        return std::find(m_older.begin(), m_older.end(), member.file->identity()) != m_older.end();
+    });
     if (m_chain.size() > 1) {
         // What was copied after this file had lost its name belongs behind it.
         Generation::Status mine{};

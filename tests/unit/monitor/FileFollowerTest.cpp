@@ -11,6 +11,29 @@ TEST_F(FileFollowerTest, BeginsAtTheEndOfAFileThatIsThere) {
     EXPECT_EQ(m_ledger.state(), State::reading);
 }
 
+TEST_F(FileFollowerTest, WhatWasBesideAnEmptyLogAtTheFirstStartIsOlder) {
+    age(m_path, 50);
+    fs::resize_file(m_path, 0);
+    age(m_path, 50);
+    age(file("app.log.1"), 20, "before the first start\n");
+    EXPECT_EQ(looks(2), "");
+    m_directory.append("app.log.1", "by a writer that still has it\n");
+    append("a\n");
+    EXPECT_EQ(looks(2), "a\n");
+}
+
+TEST_F(FileFollowerTest, RecoversWhatWasTruncatedInALogThatWasEmptyAtTheFirstStart) {
+    fs::resize_file(m_path, 0);
+    age(m_path, 50);
+    age(file("app.log.1"), 20, "before the first start\n");
+    EXPECT_EQ(look(), "");
+    rename("app.log.1", "app.log.2");
+    append("a\n");
+    copyAndTruncate("app.log.1");
+    append("b\n");
+    EXPECT_EQ(looks(3), "a\nb\n");
+}
+
 TEST_F(FileFollowerTest, BeginsAtTheBeginningIfItIsToldTo) {
     m_options.fromBeginning = true;
     begin();
