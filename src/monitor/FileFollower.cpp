@@ -17,6 +17,7 @@ namespace {
 constexpr std::chrono::seconds firstPause{1};
 constexpr std::chrono::seconds longestPause{60};
 constexpr int mostReadFailures = 5; ///< of a file that others follow
+constexpr int readsPerPause = 64;   ///< without an entry, of 256 kB each
 
 } // namespace
 
@@ -115,10 +116,10 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     }
     member.from = isFromEnd ? status.size : 0;
     m_modified = status.modified;
-    m_position = positionOf(named->identity(), member.from, member.tail);
     if (status.size == 0) {
         noteOlder();
     }
+    m_position = positionOf(named->identity(), member.from, member.tail);
     m_position.modified = m_modified;
     m_hasPosition = true;
     member.file = std::move(named);
@@ -126,7 +127,6 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     m_chain.push_back(std::move(member));
 }
 
-/// Continues at a position of an earlier run.
 /// A writer that still has the file before this one open writes to it later than this one was made.
 void FileFollower::noteOlder() {
     for (const GenerationFile& file : generations()) {
@@ -135,6 +135,7 @@ void FileFollower::noteOlder() {
     }
 }
 
+/// Continues at a position of an earlier run.
 void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
     m_position = stored;
     m_hasPosition = true;
@@ -256,8 +257,8 @@ bool FileFollower::isFinished() const noexcept {
 void FileFollower::switchToNext() {
     Member finished = std::move(m_chain.front());
     m_chain.pop_front();
-    Generation::Status status{};
     m_older.clear();
+    Generation::Status status{};
     const bool hasStatus = finished.file->status(status);
     if (m_block.readTo() > 0) {
         noteModified(hasStatus ? status.modified : m_seen.modified);
@@ -317,10 +318,11 @@ char* FileFollower::finish() {
 }
 
 char* FileFollower::next() {
+    m_isPaused = false;
     if (m_chain.empty() || !mayTry(m_readRetry)) {
         return nullptr;
     }
-    for (;;) {
+    for (int reads = 0;; ++reads) {
         if (char* const entry = m_block.next()) {
             m_wasInBlock = std::exchange(m_isInBlock, true);
             if (m_block.isCut()) [[unlikely]] {
@@ -329,6 +331,10 @@ char* FileFollower::next() {
             return entry;
         }
         m_isAtEnd = false;
+        if (reads == readsPerPause) {
+            m_isPaused = true;
+            return nullptr;
+        }
         const std::int64_t from = m_block.readTo();
         switch (m_block.fill(*m_chain.front().file)) {
         case EntryBlock::Fill::more:

@@ -52,8 +52,11 @@ public:
     /// Looks at the file and at the name, about once a second. True if there may be entries. Costs
     /// two system calls if nothing has changed.
     bool look(const Moment& now);
-    /// The next entry as EntryBlock gives it, or null if there is none until the next look.
+    /// The next entry as EntryBlock gives it, or null if there is none until the next look, or if
+    /// many megabytes had none: isPaused says so, and the next call goes on.
     char* next();
+    /// True if the last call of next has stopped before the end, for the caller's other duties.
+    bool isPaused() const noexcept { return m_isPaused; }
     /// Takes back the entry that next has just given, so that the position is before it. False if
     /// it cannot.
     bool takeBack() noexcept;
@@ -121,10 +124,10 @@ private:
 
     bool begin();
     void beginFirst(std::unique_ptr<Generation> named);
+    void noteOlder();
     void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
     void checkName();
     bool checkFile();
-    void noteOlder();
     bool isFinished() const noexcept;
     void noteModified(std::int64_t time) noexcept;
     LogPosition positionInBlock() const noexcept;
@@ -150,10 +153,11 @@ private:
     EntryBlock m_block;
     LogPosition m_position; ///< if it is not in the block
     bool m_hasPosition = false;
-    bool m_wasInBlock = false;   ///< m_isInBlock before the last entry
-    bool m_isInBlock = false;    ///< the position is the block's, in the file that is read
-    Tail m_head;                 ///< the first bytes of the file that is read
-    bool m_isAtEnd = false;      ///< the last read found the end of the file
+    bool m_wasInBlock = false; ///< m_isInBlock before the last entry
+    bool m_isInBlock = false;  ///< the position is the block's, in the file that is read
+    Tail m_head;               ///< the first bytes of the file that is read
+    bool m_isAtEnd = false;    ///< the last read found the end of the file
+    bool m_isPaused = false;
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
     std::int64_t m_known = 0;    ///< size that its present contents had for certain
     bool m_hasSeen = false;

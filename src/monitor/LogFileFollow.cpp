@@ -108,7 +108,16 @@ bool LogFile::readEntries(FileFollower& follower, LogPositions& positions, Follo
     const std::int64_t entriesBefore = numEvents();
     auto noted = std::chrono::steady_clock::now();
     bool isJudged = true;
-    for (unsigned entries = 1; char* const entry = follower.next(); ++entries) {
+    for (unsigned entries = 1;; ++entries) {
+        char* const entry = follower.next();
+        if (entry == nullptr) {
+            if (!follower.isPaused() || isReadingOver()) {
+                break;
+            }
+            m_pulse.work("reads the log");
+            noteFollowed(follower, positions);
+            continue;
+        }
         current.begin();
         positions.beginEntry();
         isJudged = !isReadingOver() && deliverEntry(entry);

@@ -211,3 +211,24 @@ def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
     log.append(syslog_line("later"))
     wait_until(lambda: descriptions(agent.events())[-1] == "later", "the next entry")
     assert agent.stop() == 0
+
+
+# ---------------------------------------------------------------------- a file without entries
+
+
+def test_a_huge_file_without_entries_does_not_hold_up_the_stop(agent):
+    log = followed(agent)
+    agent.start()
+    agent.wait_open(log)
+    os.truncate(log.path, 1 << 42)  # a hole, as a writer leaves it that does not append
+    wait_until(lambda: read_to(agent, log) > 1 << 28, "the hole to be read")
+    assert agent.stop() == 0
+
+
+def read_to(agent, log):
+    """How far the agent's descriptor of the log is moved."""
+    process = Path(f"/proc/{agent.process.pid}")
+    for descriptor in (process / "fd").iterdir():
+        if os.path.realpath(descriptor) == str(log.path):
+            return int((process / "fdinfo" / descriptor.name).read_text().split()[1])
+    return 0

@@ -220,6 +220,25 @@ TEST_F(FileFollowerTest, AnInterruptedReadIsNotAFailure) {
     EXPECT_FALSE(m_ledger.failure());
 }
 
+TEST_F(FileFollowerTest, PausesInAFileThatGivesNoEntries) {
+    look();
+    fs::resize_file(m_path, 100'000'000);
+    append("a\n");
+    m_now += seconds(1);
+    ASSERT_TRUE(m_follower->look({m_now, 0}));
+    EXPECT_EQ(m_follower->next(), nullptr);
+    EXPECT_TRUE(m_follower->isPaused());
+    EXPECT_LT(m_follower->takeBytesRead(), 20'000'000);
+    const char* entry = nullptr;
+    while (entry == nullptr && m_follower->isPaused()) {
+        entry = m_follower->next();
+    }
+    EXPECT_STREQ(entry, "a\n");
+    EXPECT_FALSE(m_follower->isPaused());
+    EXPECT_EQ(m_follower->next(), nullptr);
+    EXPECT_FALSE(m_follower->isPaused());
+}
+
 TEST_F(FileFollowerTest, GivesWholeRecords) {
     m_options.recordLength = 4;
     begin();
