@@ -33,6 +33,15 @@ TEST(EventText, IsFoundInThePartsThatPeopleSearch) {
     EXPECT_FALSE(isFound("roots", "Failed password for Root"));
 }
 
+TEST(EventText, IsFoundInTheEntryAndItsFields) {
+    const std::string document = R"({"id":1,"situation":"s","row":{},)"
+                                 R"("fields":{"user":"Alice"},"entry":"The whole LINE"})";
+    EXPECT_TRUE(EventText("whole line").isIn("/log", document));
+    EXPECT_TRUE(EventText("alice").isIn("/log", document));
+    EXPECT_FALSE(EventText("user").isIn("/log", document));
+    EXPECT_FALSE(EventText("bob").isIn("/log", document));
+}
+
 TEST(EventText, IsNotFoundInNamesNumbersTimesAndTheNode) {
     for (const char* const text :
          {"UENTRYDESC", "row", "web1", "1261120", "17", "major", "\":\""}) {

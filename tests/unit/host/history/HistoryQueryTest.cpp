@@ -45,6 +45,31 @@ TEST_F(HistoryQueryTest, ReturnsCompleteEvents) {
                                         R"({"id":1})"}));
 }
 
+TEST_F(HistoryQueryTest, APageOfLargeEventsEndsEarlyAndSaysWhere) {
+    const std::string json = "\"" + std::string(1024 * 1024, 'x') + "\"";
+    std::vector<EventRecord> events;
+    for (std::uint64_t id = 1; id <= 20; ++id) {
+        events.push_back(testEvent(id));
+        events.back().json = json;
+    }
+    file.store(*batchOf(events), {});
+    EventFilter filter{.newestFirst = false};
+    std::vector<std::uint64_t> ids;
+    int pages = 0;
+    for (bool isMore = true; isMore; ++pages) {
+        const EventPage page = HistoryQuery(database, filter).run();
+        EXPECT_LE(page.events.size(), 9u);
+        for (const StoredEvent& event : page.events) {
+            ids.push_back(event.id);
+        }
+        isMore = page.reached.has_value();
+        filter.after = page.reached.value_or(0);
+    }
+    EXPECT_EQ(ids.size(), 20u);
+    EXPECT_EQ(ids.back(), 20u);
+    EXPECT_EQ(pages, 3);
+}
+
 TEST_F(HistoryQueryTest, ReturnsTheNewestFirstByDefault) {
     file.store(*batchOf(1, 500), {});
     EXPECT_EQ(ids({}).size(), 100u);

@@ -56,6 +56,17 @@ TEST_F(AlertmanagerSinkTest, RaisesAnAlertForEachEvent) {
                                              .dump());
 }
 
+TEST_F(AlertmanagerSinkTest, AnnotationsHaveTheEntryAndItsFields) {
+    events.add({.more = R"(,"fields":{"user":"root","a.b":"1","a-b":"2"},"entry":"the line")"});
+    AlertmanagerSink sink(config());
+    EXPECT_EQ(deliver(sink), 1u);
+    const Json annotations = sent()[0]["annotations"];
+    EXPECT_EQ(annotations["entry"], "the line");
+    EXPECT_EQ(annotations["field_user"], "root");
+    EXPECT_EQ(annotations["field_a_b"], "1") << "the first of those whose names become the same";
+    EXPECT_EQ(annotations.size(), 7u);
+}
+
 TEST_F(AlertmanagerSinkTest, AddsTheConfiguredLabels) {
     events.add({});
     AlertmanagerSink sink(config("resolve_after = '1d'\nlabels = { team = 'ops', _x1 = 'y' }\n"

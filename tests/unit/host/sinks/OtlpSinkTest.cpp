@@ -39,6 +39,20 @@ protected:
     std::stop_source giveUp;
 };
 
+TEST_F(OtlpSinkTest, RecordsHaveTheEntryAndItsFields) {
+    events.add({.more = R"(,"fields":{"user":"root"},"entry":"the line")"});
+    OtlpSink sink(config());
+    ASSERT_GE(deliver(sink), 1u);
+    const Json sent = Json::parse(server.requests()[0].body);
+    const Json& records = sent["resourceLogs"][0]["scopeLogs"][0]["logRecords"];
+    std::map<std::string, std::string> texts;
+    for (const Json& attribute : records[records.size() - 1]["attributes"]) {
+        texts[attribute["key"]] = attribute["value"].value("stringValue", "");
+    }
+    EXPECT_EQ(texts["zrm.field.user"], "root");
+    EXPECT_EQ(texts["zrm.entry"], "the line");
+}
+
 TEST_F(OtlpSinkTest, SendsLogRecords) {
     events.add({.description = "caf\xc3\xa9", .severity = "minor"});
     OtlpSink sink(

@@ -32,7 +32,9 @@ public:
         std::string situation = "ssh-bruteforce";
         std::string severity = "critical";
         std::string log = "/var/log/auth.log";
-        std::string text = {}; ///< of the situation
+        std::string text = {};        ///< of the situation
+        std::string more = {};        ///< further members of the JSON, each behind a comma
+        std::string column = "short"; ///< ENTRYDESC
     };
     static constexpr std::int64_t raisedAt = 1'795'158'189'412; ///< of the first event
 
@@ -42,11 +44,12 @@ public:
         const Entry& kept = m_entries.back();
         const std::uint64_t id = m_records.size() + 1;
         const std::int64_t raised = raisedAt + 1000 * static_cast<std::int64_t>(id - 1);
-        m_texts.push_back(
-            R"({"id":)" + std::to_string(id) + R"(,"situation":")" + kept.situation +
-            R"(","severity":")" + kept.severity + R"(","raised":")" + UtcTime::text(raised) +
-            R"(","row":{"ORIGINNODE":"web1:ZRM","ENTRYSRC":"sshd","ENTRYDESC":"short",)" +
-            R"("SAMPLENO":3,"UENTRYSRC":"","UENTRYDESC":")" + kept.description + R"("}})");
+        m_texts.push_back(R"({"id":)" + std::to_string(id) + R"(,"situation":")" + kept.situation +
+                          R"(","severity":")" + kept.severity + R"(","raised":")" +
+                          UtcTime::text(raised) +
+                          R"(","row":{"ORIGINNODE":"web1:ZRM","ENTRYSRC":"sshd","ENTRYDESC":")" +
+                          kept.column + R"(","SAMPLENO":3,"UENTRYSRC":"","UENTRYDESC":")" +
+                          kept.description + R"("})" + kept.more + "}");
         m_records.push_back(
             {id, raised, kept.situation, kept.severity, kept.log, m_texts.back(), kept.text});
     }

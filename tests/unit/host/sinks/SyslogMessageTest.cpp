@@ -36,6 +36,27 @@ TEST(SyslogMessage, HasHeaderDataAndText) {
     EXPECT_EQ(messageOf({}), expected(26, usualData, "Failed password for root"));
 }
 
+TEST(SyslogMessage, FieldsAreASecondElement) {
+    const std::string message =
+        messageOf({.more = R"(,"fields":{"user":"root","a b=":"x]\"y"},"entry":"the line")"});
+    EXPECT_TRUE(message.ends_with(R"(] Failed password for root)")) << message;
+    EXPECT_NE(message.find(R"(][zrm-fields@32473 user="root" a_b_="x\]\"y"] )"), message.npos)
+        << message;
+}
+
+TEST(SyslogMessage, FieldsTakeAtMostHalfOfTheMessage) {
+    const std::string fields =
+        R"(,"fields":{"long":")" + std::string(5000, 'x') + R"(","user":"root"})";
+    const std::string message = messageOf({.more = fields});
+    EXPECT_NE(message.find(R"([zrm-fields@32473 user="root"] Failed)"), message.npos) << message;
+}
+
+TEST(SyslogMessage, TheEntryTakesThePlaceOfADescriptionThatIsCut) {
+    const std::string message =
+        messageOf({.more = R"(,"entry":"the whole line")", .column = std::string(256, 'x')});
+    EXPECT_TRUE(message.ends_with("] the whole line")) << message;
+}
+
 TEST(SyslogMessage, ThePriorityCombinesFacilityAndSeverity) {
     const auto priority = [](std::string_view facility, const std::string& severity) {
         const std::string message = messageOf({.severity = severity}, facility);
