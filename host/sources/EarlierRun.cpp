@@ -34,13 +34,16 @@ bool isReadable(const std::string& path) {
            ::faccessat(AT_FDCWD, path.c_str(), R_OK, AT_EACCESS) == 0;
 }
 
+/// True if the path or glob of a table names or matches the log.
+bool isOf(const std::string& path, const std::string& name) {
+    return PathPattern::isPattern(path) ? PathPattern::matches(path, name) : path == name;
+}
+
 /// The first table that names or matches the log.
 const LogConfig* tableOf(const std::vector<LogConfig>& logs, const std::string& name) {
-    const auto isOf = [&name](const std::string& path) {
-        return PathPattern::isPattern(path) ? PathPattern::matches(path, name) : path == name;
-    };
-    const auto table = std::find_if(logs.begin(), logs.end(), [&isOf](const LogConfig& log) {
-        return std::any_of(log.paths.begin(), log.paths.end(), isOf);
+    const auto table = std::find_if(logs.begin(), logs.end(), [&name](const LogConfig& log) {
+        return std::any_of(log.paths.begin(), log.paths.end(),
+                           [&name](const std::string& path) { return isOf(path, name); });
     });
     return table == logs.end() ? nullptr : &*table;
 }
@@ -121,17 +124,20 @@ std::vector<std::string> EarlierRun::renamedLogs(const std::vector<LogConfig>& l
 void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs,
                           const FoundLogs& found, std::int64_t time) {
     for (std::size_t index = 0; index < found.sources.size(); ++index) {
-        const FoundLogs::Source& source = found.sources[index];
-        const bool isComplete =
-            logs[index].follow.resume &&
-            std::all_of(source.files.begin(), source.files.end(), [&](const std::string& file) {
-                return book.isStored(file) || FurtherLogs::isLeftOut(file) || !isReadable(file);
-            });
-        if (!isComplete) {
+        if (!logs[index].follow.resume) {
             continue;
         }
+        std::vector<std::string> unknown;
+        for (const std::string& file : found.sources[index].files) {
+            if (!book.isStored(file) && !FurtherLogs::isLeftOut(file) && isReadable(file)) {
+                unknown.push_back(file);
+            }
+        }
         for (const std::string& path : logs[index].paths) {
-            book.paths().note(path, time);
+            if (std::none_of(unknown.begin(), unknown.end(),
+                             [&path](const std::string& file) { return isOf(path, file); })) {
+                book.paths().note(path, time);
+            }
         }
     }
 }

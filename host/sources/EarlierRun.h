@@ -45,8 +45,8 @@ public:
     std::vector<std::string> renamedLogs(const std::vector<LogConfig>& logs) const;
 
     /// Notes in the book that the files of the tables were looked for at this time (milliseconds
-    /// since 1970), for those tables whose files all have stored positions by now, except those
-    /// that cannot be read and those that nobody follows.
+    /// since 1970): each path and glob of which all files have stored positions by now, except
+    /// those that cannot be read and those that nobody follows.
     static void noteLook(PositionBook& book, const std::vector<LogConfig>& logs,
                          const FoundLogs& found, std::int64_t time);
 

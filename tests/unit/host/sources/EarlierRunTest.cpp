@@ -255,6 +255,18 @@ TEST_F(NoteLookTest, APathIsWatchedOnceEachOfItsFilesHasAStoredPosition) {
     EXPECT_EQ(watchedUntil(glob), 3);
 }
 
+TEST_F(NoteLookTest, AFileWithoutAPositionKeepsOnlyItsOwnPathFromBeingWatched) {
+    const std::string a = create("a.log");
+    const std::string b = create("b.txt");
+    table(file("*.log"));
+    logs[0].paths.push_back(b);
+    begin();
+    store(a);
+    note(1);
+    EXPECT_EQ(watchedUntil(file("*.log")), 1);
+    EXPECT_EQ(watchedUntil(b), 0);
+}
+
 TEST_F(NoteLookTest, AFileThatTheLogManagerLeavesOutNeedsNoPosition) {
     const std::string a = create("a.log");
     const std::string b = create("b.log");
