@@ -66,7 +66,7 @@ TEST_F(FollowedLogTest, AFailureIsTracedOnceAndSoIsItsEnd) {
     const Fault fault("open", EACCES);
     const auto log = start();
     EXPECT_TRUE(waitUntil([&] { return trace.messages().size() >= 2; }));
-    directory.append("app.log", "one\n");
+    directory.append("app.log", "2006-10-05T12:00:00 web1 app: one\n");
     EXPECT_EQ(EventRecorder::waitForRows(1).size(), 1U);
     EXPECT_THAT(
         trace.messages(),
