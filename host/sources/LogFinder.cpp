@@ -157,7 +157,7 @@ private:
                 const bool isNew = m_finder.m_searched.contains(path);
                 for (std::string& name : search.paths) {
                     Candidate candidate{std::move(name), index, false, &path};
-                    candidate.isNewcomer = isNew;
+                    candidate.isNewcomer = isNew && !m_finder.m_leftOut.contains(candidate.name);
                     add(std::move(candidate));
                 }
                 keepAbsent(path, index);
@@ -182,6 +182,7 @@ private:
                 return PathPattern::excludes(pattern, candidate.name);
             });
         if (isExcluded) {
+            m_leftOut.insert(std::move(candidate.name));
             return;
         }
         const auto [first, isFirst] = m_sourceOf.emplace(candidate.name, candidate.source);
@@ -225,6 +226,7 @@ private:
         }
         candidate.identity = {status.st_dev, status.st_ino};
         if (const auto own = m_ownFiles.find(candidate.identity); own != m_ownFiles.end()) {
+            m_leftOut.insert(candidate.name);
             return passOver(candidate, "It is " + own->second +
                                            ", to which the agent itself writes: each event would "
                                            "raise the next");
@@ -284,6 +286,24 @@ private:
                directory == rotationDirectory(log, rotatedTo);
     }
 
+    /// The name under which the file was followed until it was renamed; empty if there is none.
+    std::string formerName(const Candidate& candidate) const {
+        for (const auto& [name, known] : m_finder.m_known) {
+            if (known.identity == candidate.identity) {
+                return name;
+            }
+        }
+        const auto rotated = m_finder.m_rotated.find(candidate.name);
+        if (rotated != m_finder.m_rotated.end() && rotated->second.identity == candidate.identity) {
+            return rotated->second.former;
+        }
+        if (m_finder.m_hasLooked || m_finder.m_earlier.positions().contains(candidate.name)) {
+            return "";
+        }
+        std::string earlier = m_finder.m_earlier.logOf(candidate.name, candidate.identity);
+        return m_names.contains(earlier) && isWhereRotated(candidate, earlier) ? earlier : "";
+    }
+
     /// False if the file is, or was until it was rotated, followed under another name.
     bool isFirstName(const Candidate& candidate) {
         const auto [same, isFirst] = m_identities.emplace(candidate.identity, candidate.name);
@@ -293,20 +313,15 @@ private:
         if (m_finder.m_known.contains(candidate.name) || candidate.isNamed) {
             return true;
         }
-        const auto rotated = m_finder.m_rotated.find(candidate.name);
-        const std::string earlier =
-            m_finder.m_hasLooked || m_finder.m_earlier.positions().contains(candidate.name)
-                ? ""
-                : m_finder.m_earlier.logOf(candidate.name, candidate.identity);
-        bool isRotated =
-            rotated != m_finder.m_rotated.end() && rotated->second == candidate.identity;
-        for (const auto& [name, known] : m_finder.m_known) {
-            isRotated = isRotated || known.identity == candidate.identity;
-        }
-        isRotated = isRotated || (m_names.contains(earlier) && isWhereRotated(candidate, earlier));
-        if (isRotated) {
-            m_rotated.emplace(candidate.name, candidate.identity);
-            return passOver(candidate, "It was followed under another name before it was rotated");
+        if (const std::string former = formerName(candidate); !former.empty()) {
+            m_rotated.emplace(candidate.name, Rotated{candidate.identity, former});
+            // Its log is read to the end of this file, and is kept for a while.
+            return passOver(candidate,
+                            m_names.contains(former)
+                                ? "It was followed under another name before it was rotated"
+                                : "It was followed as " + former +
+                                      " until it was renamed, and what is written to it now is not "
+                                      "read; if it is a log of its own, name it before the glob");
         }
         return true;
     }
@@ -353,6 +368,7 @@ private:
         m_finder.m_known = std::move(known);
         m_finder.m_rotated = std::move(m_rotated);
         m_finder.m_generations = std::move(m_generations);
+        m_finder.m_leftOut = std::move(m_leftOut);
         m_finder.m_searched.clear();
         for (const LogConfig& log : m_logs) {
             m_finder.m_searched.insert(log.paths.begin(), log.paths.end());
@@ -368,8 +384,9 @@ private:
     std::set<std::string> m_names;
     std::map<Identity, std::string> m_identities;
     std::map<Identity, std::string> m_ownFiles;
-    std::map<std::string, Identity> m_rotated;
+    std::map<std::string, Rotated> m_rotated;
     std::set<std::pair<Identity, std::string>> m_generations;
+    std::set<std::string> m_leftOut;
 };
 
 FoundLogs LogFinder::look(const std::vector<LogConfig>& logs,

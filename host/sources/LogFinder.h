@@ -44,13 +44,21 @@ private:
         Clock::time_point seen;
         bool isNewcomer;
     };
+    /// A file that was followed under another name before.
+    struct Rotated {
+        Identity identity;
+        std::string former;
+    };
     struct Candidate;
     class Look;
 
-    std::map<std::string, Known> m_known;      ///< the followed files by name
-    std::map<std::string, Identity> m_rotated; ///< followed under another name before
+    std::map<std::string, Known> m_known;     ///< the followed files by name
+    std::map<std::string, Rotated> m_rotated; ///< by the present name
     /// Passed over by the last look, each with its log.
     std::set<std::pair<Identity, std::string>> m_generations;
+    /// Matched by the last look, and excluded or written by the agent: once these are followed,
+    /// they are not new.
+    std::set<std::string> m_leftOut;
     /// The paths and globs of the last look: a file that one of these matches now is new.
     std::set<std::string> m_searched;
     EarlierRun m_earlier;

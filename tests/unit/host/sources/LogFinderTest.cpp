@@ -147,6 +147,22 @@ TEST_F(LogFinderTest, FilesOfANewTableAreNoNewcomers) {
     EXPECT_FALSE(isNewcomer(file("b.txt")));
 }
 
+TEST_F(LogFinderTest, FilesThatWereLeftOutUntilNowAreNoNewcomers) {
+    create("a.log");
+    create("b.log");
+    create("own.log");
+    logs = {table({file("*.log")}, {"b.*"})};
+    ownFiles = {{file("own.log"), "the output of a sink"}};
+    look();
+    logs = {table({file("*.log")})};
+    ownFiles = {};
+    create("c.log");
+    look();
+    EXPECT_FALSE(isNewcomer(file("b.log")));
+    EXPECT_FALSE(isNewcomer(file("own.log")));
+    EXPECT_TRUE(isNewcomer(file("c.log")));
+}
+
 TEST_F(LogFinderTest, PassesOverOlderGenerations) {
     create("app.log");
     for (const char* const name :
@@ -182,6 +198,25 @@ TEST_F(LogFinderTest, AFileThatIsRenamedIsNotANewOne) {
     now += 10min;
     look();
     EXPECT_THAT(names(), ElementsAre(file("app.log")));
+}
+
+TEST_F(LogFinderTest, SaysThatARenamedLogWithoutASuccessorIsNotRead) {
+    create("a.log");
+    logs = {table({file("*.log")})};
+    look();
+    rename("a.log", "b.log");
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("a.log")));
+    now += LogFinder::keptAbsent;
+    for (int looks = 0; looks < 2; ++looks) {
+        look();
+        EXPECT_THAT(names(), IsEmpty());
+        EXPECT_THAT(reason(file("b.log")),
+                    HasSubstr("followed as " + file("a.log") + " until it was renamed"));
+    }
+    logs[0].paths.insert(logs[0].paths.begin(), file("b.log"));
+    look();
+    EXPECT_THAT(names(), ElementsAre(file("b.log")));
 }
 
 TEST_F(LogFinderTest, AFileThatIsGoneStaysForAWhile) {
@@ -284,6 +319,30 @@ TEST_F(LogFinderTest, TakesAtMostTenThousandFiles) {
     EXPECT_EQ(found.logs.size(), 1U);
     EXPECT_EQ(found.sources[0].passedOverCount, 9'999U);
     EXPECT_EQ(found.sources[0].passedOver.size(), FoundLogs::mostPassedOver);
+}
+
+TEST_F(LogFinderTest, FollowsAtMostTenThousandFilesAndKeepsThoseThatItHas) {
+    for (const char* const name : {"one", "two"}) {
+        std::filesystem::create_directory(file(name));
+    }
+    for (int number = 1; number <= 6'000; ++number) {
+        create("two/" + std::to_string(number) + ".log");
+    }
+    logs = {table({file("one/*.log")}), table({file("two/*.log")})};
+    look();
+    EXPECT_EQ(found.logs.size(), 6'000U);
+    for (int number = 1; number <= 6'000; ++number) {
+        create("one/" + std::to_string(number) + ".log");
+    }
+    look();
+    EXPECT_EQ(found.logs.size(), LogFinder::mostFiles);
+    EXPECT_EQ(found.sources[0].files.size(), 4'000U);
+    EXPECT_EQ(found.sources[0].problem,
+              "More than 10000 files match; name the files more narrowly");
+    EXPECT_EQ(found.sources[0].passedOverCount, 2'000U);
+    EXPECT_EQ(found.sources[0].passedOver.front().reason, "There are too many files");
+    EXPECT_EQ(found.sources[1].files.size(), 6'000U);
+    EXPECT_EQ(found.sources[1].problem, "");
 }
 
 TEST_F(LogFinderTest, SaysThatADirectoryCannotBeRead) {
