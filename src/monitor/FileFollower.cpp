@@ -16,8 +16,7 @@ namespace {
 
 constexpr std::chrono::seconds firstPause{1};
 constexpr std::chrono::seconds longestPause{60};
-constexpr int mostReadFailures = 5; ///< of a file that others follow
-constexpr int readsPerPause = 64;   ///< without an entry, of 256 kB each
+constexpr int readsPerPause = 64; ///< without an entry, of 256 kB each
 
 } // namespace
 
@@ -41,7 +40,7 @@ void FileFollower::fail(Retry& retry, const char* call, int number) {
 void FileFollower::succeed(Retry& retry) {
     if (retry.failures > 0) {
         retry = Retry{};
-        if (m_nameRetry.failures == 0 && m_readRetry.failures == 0) {
+        if (m_nameRetry.failures + m_readRetry.failures + m_youngerRetry.failures == 0) {
             m_ledger.clearFailure();
         }
     }
@@ -76,7 +75,7 @@ std::optional<LogPosition> FileFollower::position() const noexcept {
 bool FileFollower::look(const Moment& now) {
     m_now = now;
     if (m_chain.empty()) {
-        return mayTry(m_nameRetry) && begin();
+        return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
     }
     if (m_options.byName && mayTry(m_nameRetry)) {
         checkName();
@@ -141,6 +140,10 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
     m_hasPosition = true;
     m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
     Found found = find(stored, Search::byContents, named.get());
+    noteUnreadable(found);
+    if (found.failed != nullptr && !found.holder && found.younger.empty()) {
+        return;
+    }
     const bool isHeld = found.holder.has_value() || stored.offset == 0;
     Member present;
     if (found.holder && !found.holder->file) {

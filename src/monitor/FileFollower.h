@@ -89,9 +89,12 @@ private:
         bool isRecovery = false; ///< read instead of what a truncation removed
     };
     struct Found {
-        std::optional<Member> holder; ///< the file that has the position
-        std::vector<Member> younger;  ///< the generations after it, without the present file
-        bool isAll = true;            ///< false: there are more of them
+        std::optional<Member> holder;     ///< the file that has the position
+        std::vector<Member> younger;      ///< the generations after it, without the present file
+        bool isAll = true;                ///< false: there are more of them
+        const char* failed = nullptr;     ///< what failed for a generation that is waited for
+        int number = 0;                   ///< errno of that
+        std::vector<std::int64_t> lost{}; ///< known sizes of those that are given up
     };
     /// Counts how long to leave alone what has failed.
     struct Retry {
@@ -110,6 +113,9 @@ private:
                                      const std::vector<GenerationFile>& files, bool& vanished);
     bool openYounger(const GenerationReference& reference, const std::vector<GenerationFile>& files,
                      Generation* named, Found& found);
+    bool waitsFor(const GenerationFile& unreadable, const std::vector<GenerationFile>& files,
+                  const Generation* named, Found& found) const;
+    void noteUnreadable(const Found& found);
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
     std::vector<GenerationFile> generations(ino_t inode = 0);
 
@@ -140,6 +146,8 @@ private:
     void fail(Retry& retry, const char* call, int number);
     void succeed(Retry& retry);
 
+    static constexpr int mostReadFailures = 5; ///< of a file that others follow
+
     const std::string m_path;
     const Options m_options;
     FollowLedger& m_ledger;
@@ -166,6 +174,7 @@ private:
     std::int64_t m_bytesRead = 0;
     Retry m_nameRetry;
     Retry m_readRetry;
+    Retry m_youngerRetry;   ///< of a generation that cannot be read
     std::string m_siblings; ///< the log's path without symbolic links, as last known
 };
 

@@ -18,7 +18,7 @@ constexpr std::size_t mostFiles = 64; ///< waiting to be read
 
 /// Another file has the name: it is read after those that were there before it.
 void FileFollower::extend(std::unique_ptr<Generation> named) {
-    if (m_chain.size() >= mostFiles) {
+    if (m_chain.size() >= mostFiles || !mayTry(m_youngerRetry)) {
         return; // found again when these have been read
     }
     if (m_chain.size() == 1) {
@@ -33,6 +33,7 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
         reference.modified = std::max(reference.modified, m_modified);
     }
     Found found = findYounger(reference, named.get());
+    noteUnreadable(found);
     std::move(found.younger.begin(), found.younger.end(), std::back_inserter(m_chain));
     if (found.isAll) {
         Member present;

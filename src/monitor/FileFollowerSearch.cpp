@@ -74,6 +74,39 @@ std::vector<GenerationFile> FileFollower::generations(ino_t inode) {
     return findGenerations(m_siblings.empty() ? m_path : m_siblings, inode, m_options.rotatedTo);
 }
 
+/// True if a generation that cannot be read is tried again before those after it are read. After
+/// some failures it is lost. Beside a file that is read already, nothing is waited for.
+bool FileFollower::waitsFor(const GenerationFile& unreadable,
+                            const std::vector<GenerationFile>& files, const Generation* named,
+                            Found& found) const {
+    const std::string original = unreadable.path.substr(0, unreadable.path.rfind('.'));
+    const bool isBeingCompressed =
+        unreadable.isCompressed &&
+        (original == m_path || original == m_siblings ||
+         std::any_of(files.begin(), files.end(),
+                     [&original](const GenerationFile& file) { return file.path == original; }));
+    if (unreadable.size == 0 || isBeingCompressed) {
+        return false;
+    }
+    if (m_options.byName && (named != nullptr || m_chain.empty()) &&
+        m_youngerRetry.failures < mostReadFailures) {
+        return true;
+    }
+    found.lost.push_back(unreadable.isCompressed ? 0 : unreadable.size); // of its contents
+    return false;
+}
+
+void FileFollower::noteUnreadable(const Found& found) {
+    if (found.failed != nullptr) {
+        fail(m_youngerRetry, found.failed, found.number);
+        return;
+    }
+    for (const std::int64_t size : found.lost) {
+        m_ledger.noteLost(0, size);
+    }
+    succeed(m_youngerRetry);
+}
+
 bool FileFollower::isKnown(const FileIdentity& file, const Generation* named) const noexcept {
     return (named != nullptr && named->identity() == file) ||
            std::any_of(m_chain.begin(), m_chain.end(),
@@ -195,6 +228,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
         }
         Member member;
         member.file = Generation::open(file.path);
+        int number = member.file ? 0 : errno;
         if (hasVanished(member.file.get(), file)) {
             return false;
         }
@@ -205,8 +239,17 @@ bool FileFollower::openYounger(const GenerationReference& reference,
                             member.file->holds(m_position, tail);
         // Empty ones do not count: the files after them would never be reached.
         char first;
-        if (member.file && !isRead && member.file->readAt(&first, 1, 0) > 0) {
+        const std::ptrdiff_t count = member.file && !isRead ? member.file->readAt(&first, 1, 0) : 0;
+        if (count > 0) {
             candidates.push_back(std::move(member));
+            continue;
+        }
+        number = count < 0 ? errno : number;
+        if (number != 0 && number != ENOENT && waitsFor(file, files, named, found)) {
+            found.failed = count < 0 ? "read of a rotated file" : "open of a rotated file";
+            found.number = number;
+            found.isAll = false;
+            break;
         }
     }
     // A copy that was made without a truncation, or a compressed file beside the original.

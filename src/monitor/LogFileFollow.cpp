@@ -44,11 +44,11 @@ std::int64_t traceLosses(const FollowLedger& ledger, const char* file, std::int6
     const FollowLedger::Lost lost = ledger.lost().back();
     if (lost.from < lost.to) {
         trace.error()("Lines of %s were lost: bytes %lld to %lld were removed before they were "
-                      "read, and no copy has them.",
+                      "read, or cannot be read, and no copy has them.",
                       file, static_cast<long long>(lost.from), static_cast<long long>(lost.to));
     } else {
         trace.error()("Lines of %s may have been lost: the file in which reading stopped at byte "
-                      "%lld is gone, with what was written to it after that.",
+                      "%lld is gone or cannot be read, with what was written to it after that.",
                       file, static_cast<long long>(lost.from));
     }
     return losses;

@@ -286,6 +286,75 @@ TEST_F(FileFollowerTest, TheFirstEntryOfAFileTakenBackLeavesThePositionInTheOneB
     EXPECT_EQ(m_follower->position()->offset, behind->offset);
 }
 
+TEST_F(FileFollowerTest, WaitsForAGenerationThatCannotBeRead) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log.2");
+    m_directory.write("app.log.1.gz", "GZ\x01");
+    append("c\n");
+    restart();
+    EXPECT_EQ(looks(3), "");
+    ASSERT_TRUE(m_ledger.failure());
+    EXPECT_STREQ(m_ledger.failure()->call, "read of a rotated file");
+    m_directory.write("app.log.1.gz", "GZb\n");
+    EXPECT_EQ(looks(5), "b\nc\n");
+    EXPECT_FALSE(m_ledger.failure());
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
+TEST_F(FileFollowerTest, TriesAgainToOpenAGeneration) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log.2");
+    m_directory.write("app.log.1", "b\n");
+    append("c\n");
+    std::string text;
+    {
+        const Fault fault("open", EACCES, {.skip = 1, .times = 1});
+        text = look();
+        EXPECT_EQ(fault.failed(), 1);
+        ASSERT_TRUE(m_ledger.failure());
+        EXPECT_STREQ(m_ledger.failure()->call, "open of a rotated file");
+        EXPECT_EQ(m_ledger.failure()->number, EACCES);
+    }
+    EXPECT_EQ(text + looks(4), "b\nc\n");
+    EXPECT_FALSE(m_ledger.failure());
+}
+
+TEST_F(FileFollowerTest, RecordsAGenerationAsLostThatCannotBeReadForLong) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    fs::remove(m_path);
+    m_directory.write("app.log.1.gz", "GZ\x01");
+    append("c\n");
+    restart();
+    EXPECT_EQ(looks(10), "");
+    EXPECT_EQ(looks(10), "c\n");
+    EXPECT_FALSE(m_ledger.failure());
+    ASSERT_EQ(m_ledger.lost().size(), 2U); // that generation, and the rest of the first file
+    EXPECT_EQ(m_ledger.lost()[0].from, 0);
+    EXPECT_EQ(m_ledger.lost()[0].to, 0); // the length of compressed contents is not known
+    append("d\n");
+    EXPECT_EQ(looks(2), "d\n");
+    EXPECT_EQ(m_ledger.losses(), 2);
+}
+
+TEST_F(FileFollowerTest, DoesNotWaitForAFileThatIsBeingCompressed) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log.2");
+    m_directory.write("app.log.1", "b\n");
+    m_directory.write("app.log.1.gz", "GZ\x01");
+    append("c\n");
+    restart();
+    EXPECT_EQ(looks(3), "b\nc\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 TEST_F(FileFollowerTest, TheBeginningOfALongLineIsNotTakenBack) {
     look();
     append(std::string(3000, 'x') + "\n");
