@@ -302,7 +302,8 @@ bool FileFollower::handleFailedRead() {
         }
         return false;
     }
-    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), m_seen.size));
+    const std::int64_t size = member.file->isCompressed() ? 0 : m_seen.size; // of its contents
+    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), size));
     succeed(m_readRetry);
     switchToNext();
     return true;

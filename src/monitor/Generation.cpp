@@ -126,11 +126,14 @@ std::ptrdiff_t Generation::readCompressed(char* buffer, std::size_t room,
         errno = EIO;
         return -1;
     }
+    std::array<char, 16384> passedOver;
     for (;;) {
         const std::int64_t before = offset - m_readTo;
-        const std::size_t wanted =
-            before > 0 ? std::min(room, static_cast<std::size_t>(before)) : room;
-        const std::ptrdiff_t count = m_reader->read(buffer, wanted);
+        const std::ptrdiff_t count =
+            before > 0
+                ? m_reader->read(passedOver.data(),
+                                 std::min(passedOver.size(), static_cast<std::size_t>(before)))
+                : m_reader->read(buffer, room);
         if (count < 0) {
             m_reader.reset();
             errno = EIO;
@@ -182,17 +185,6 @@ bool Generation::holds(const LogPosition& position, Tail& tail) {
         return false;
     }
     const std::int64_t from = position.offset - position.guardLength;
-    if (m_isCompressed && from > m_readTo) {
-        // Passes over what lies before in large steps.
-        std::vector<char> scratch(65536);
-        while (from > m_readTo) {
-            const auto step = static_cast<std::size_t>(
-                std::min<std::int64_t>(static_cast<std::int64_t>(scratch.size()), from - m_readTo));
-            if (readCompressed(scratch.data(), step, m_readTo) <= 0) {
-                return false;
-            }
-        }
-    }
     const std::ptrdiff_t count = readWhole(tail.bytes.data(), position.guardLength, from);
     tail.length = count > 0 ? static_cast<std::size_t>(count) : 0;
     return tail.length == position.guardLength && tail.hash() == position.guard;

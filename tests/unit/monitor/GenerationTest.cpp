@@ -1,6 +1,7 @@
 #include "monitor/Generation.h"
 
 #include "FakeCompression.h"
+#include "support/Faults.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gtest/gtest.h>
@@ -48,6 +49,19 @@ TEST_F(GenerationCopy, IsNotACompressedFileThatOnlyBeginsAlike) {
     EXPECT_FALSE(isCopy("a", banner + "2\n", "b.gz", "GZ" + banner + "3\n4\n"));
     EXPECT_TRUE(isCopy("a.gz", "GZ" + banner + "2\n", "b", banner + "2\n3\n"));
     EXPECT_TRUE(isCopy("a.gz", "GZ" + banner + "2\n\x01", "b", banner + "2\n3\n")); // unfinished
+}
+
+TEST(GenerationTest, PassesOverCompressedContentsInLargeSteps) {
+    const FakeCompression compression;
+    const TemporaryDirectory directory;
+    const auto file =
+        Generation::open(directory.write("a.gz", "GZ" + std::string(100'000, 'x') + "y"));
+    const Fault reads("read", 0, {.skip = 0, .times = 0});
+    char byte = '\0';
+    EXPECT_EQ(file->readAt(&byte, 1, 100'000), 1);
+    EXPECT_EQ(byte, 'y');
+    EXPECT_GT(reads.calls(), 0);
+    EXPECT_LT(reads.calls(), 100);
 }
 
 } // namespace
