@@ -53,10 +53,15 @@ void setOnRefresh(std::function<void()> called) {
 }
 
 void noteRefresh() {
-    Published& present = state();
-    const std::lock_guard guard(present.mutex);
-    if (present.onRefresh) {
-        present.onRefresh();
+    std::function<void()> called;
+    {
+        Published& present = state();
+        const std::lock_guard guard(present.mutex);
+        called = present.onRefresh;
+    }
+    // Without the lock: whoever is called has locks of its own, with which it publishes.
+    if (called) {
+        called();
     }
 }
 

@@ -43,8 +43,8 @@ void noteLeftOut(std::set<std::string> names);
 /// True if the log manager does not follow this log of the list, as it said last.
 bool isLeftOut(const std::string& name);
 
-/// Sets what a refresh calls, or nothing. The function runs on the log manager's thread and must
-/// not wait.
+/// Sets what a refresh calls, or nothing. The function runs on the log manager's thread, holds no
+/// lock of this list, and must not wait. The one before may still run when this returns.
 void setOnRefresh(std::function<void()> called);
 
 /// Calls that function: a refresh has begun.
