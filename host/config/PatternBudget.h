@@ -35,7 +35,7 @@ public:
     PatternBudget ofNext() const noexcept {
         return PatternBudget(isSpent() ? 0 : std::min(m_most - m_used, ofSituation));
     }
-    /// Whether there is no budget left for another pattern.
+    /// True if nothing is left for another pattern.
     bool isSpent() const noexcept { return m_used >= m_most; }
 
 private:

@@ -24,12 +24,12 @@ public:
     /// Adds the newest entry. Only if entries are kept.
     void add(std::string_view text);
 
-    /// The entries before the newest one, at most so many, the oldest first.
+    /// The entries before the newest one, at most this many, the oldest first.
     std::vector<std::string_view> before(std::size_t entries) const;
 
 private:
     std::size_t count() const noexcept;
-    /// The text that was added so many entries before the newest one.
+    /// The text that was added this many entries before the newest one.
     const std::string& text(std::size_t ago) const noexcept;
 
     std::vector<std::string> m_texts; ///< a ring

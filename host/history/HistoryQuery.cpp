@@ -17,7 +17,7 @@ namespace {
 constexpr auto noBound = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 constexpr auto partSize = static_cast<std::int64_t>(EventTable::partSize);
 
-/// A page with so many bytes of events ends.
+/// A page ends once its events have this many bytes.
 constexpr std::size_t mostBytes = std::size_t{8} * 1024 * 1024;
 
 /// A search checks the clock once per this many events.

@@ -63,7 +63,7 @@ public:
     /// The fields of the entry that the event has, in the order of the entry.
     std::span<const Field> fields() const noexcept { return m_fields; }
 
-    /// The whole entry as it stands in the log; empty if the event does not have it.
+    /// The whole entry, unchanged; empty if the event does not have it.
     const std::string& entry() const noexcept { return m_entry; }
 
     /// The text of the entry, as far as its column holds it.

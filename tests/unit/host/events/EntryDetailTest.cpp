@@ -46,6 +46,12 @@ protected:
         entry.m_fields.add("user", "root");
         entry.m_fields.add("pid", "7");
     }
+    /// Makes a new book the one that logs are followed with, and gives it the queue.
+    static void followWith(EventQueue& queue) {
+        const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
+        PositionBook::makeCurrent(book);
+        book->setQueue(&queue);
+    }
     static std::shared_ptr<const SituationLabel> naming(std::vector<std::string> fields) {
         return std::make_shared<const SituationLabel>(
             SituationLabel{"watch", "minor", "", std::move(fields)});
@@ -134,9 +140,7 @@ TEST_F(EntryDetailTest, TheJsonOfAnEventHasIt) {
 TEST_F(EntryDetailTest, TheEventsOfTheThreadsEntryAreDescribed) {
     EventQueue queue(4, 16);
     const EventQueue::Reader reader = queue.addReader();
-    const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
-    PositionBook::makeCurrent(book);
-    book->setQueue(&queue);
+    followWith(queue);
     {
         const LogEntry::Offer offer(entry);
         LogPositions log("/log");
@@ -156,9 +160,7 @@ TEST_F(EntryDetailTest, SituationsGetTheEntriesBefore) {
     std::optional<ContextDemand::Hold> hold(std::in_place, "/log", 2);
     EventQueue queue(100, 16);
     const EventQueue::Reader reader = queue.addReader();
-    const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
-    PositionBook::makeCurrent(book);
-    book->setQueue(&queue);
+    followWith(queue);
     const LogEntry::Offer offer(entry);
     LogPositions log("/log");
     const auto wanting = [](std::size_t context) {
