@@ -2,13 +2,29 @@
 #define ZRM_FOLLOW_SETTINGS_H
 
 #include "framework/LogEntry.h"
+#include "logs/EntryFormat.h"
+#include "logs/LineJoin.h"
 
 #include <chrono>
 #include <cstdint>
+#include <memory>
 #include <string>
 #include <vector>
 
 namespace zrm {
+
+/// Shares something that does not change and that has a definition. Two are equal if their
+/// definitions are, whether they share one object or not.
+template <class T> struct Defined {
+    std::shared_ptr<const T> value;
+
+    explicit operator bool() const noexcept { return value != nullptr; }
+    const T* operator->() const noexcept { return value.get(); }
+    bool operator==(const Defined& other) const {
+        return value == other.value ||
+               (value && other.value && value->definition() == other.value->definition());
+    }
+};
 
 /// The difference between a zone's time and UTC from a moment on.
 struct ZoneOffset {
@@ -45,6 +61,10 @@ struct FollowSettings {
     std::string timezone;
     std::vector<ZoneOffset> zone; ///< the offsets of `timezone`, oldest first
     EntryKeep keep;               ///< in events
+    /// How entries are taken apart, for logs that have no kind of their own. None: the kind of the
+    /// log says it.
+    Defined<EntryFormat> format;
+    Defined<LineJoin> join; ///< which lines make an entry; none: each is one
 
     /// Logs of equal settings need no new monitor.
     bool operator==(const FollowSettings&) const = default;

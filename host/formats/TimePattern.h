@@ -1,0 +1,39 @@
+#ifndef ZRM_HOST_TIME_PATTERN_H
+#define ZRM_HOST_TIME_PATTERN_H
+
+#include "host/base/Result.h"
+#include "logs/EntryFormat.h"
+
+#include <memory>
+#include <string>
+#include <string_view>
+
+namespace zrm::host {
+
+/// Reads the times of a log's entries. Not changed after it was made; any thread. Reading allocates
+/// nothing and does not ask the locale.
+class TimePattern {
+public:
+    /// A pattern of strftime's directives (with %f for a fraction, %s for seconds since 1970, %z
+    /// for any way to write an offset), or the name of a common form: "iso8601", "epoch" (of
+    /// seconds, milliseconds, microseconds or nanoseconds, told apart by size), "auto" (whichever
+    /// common form fits).
+    static Result<std::shared_ptr<const TimePattern>> compile(const std::string& pattern);
+    /// "auto".
+    static std::shared_ptr<const TimePattern> common();
+
+    TimePattern(const TimePattern&) = delete;
+    TimePattern& operator=(const TimePattern&) = delete;
+    virtual ~TimePattern() = default;
+
+    /// Sets the time of the columns from a text that is nothing but the time. Returns false, and
+    /// leaves the columns alone, if the text is not such a time.
+    virtual bool read(std::string_view text, EntryColumns& columns) const noexcept = 0;
+
+protected:
+    TimePattern() = default;
+};
+
+} // namespace zrm::host
+
+#endif
