@@ -44,6 +44,9 @@ struct FormatDescription {
     std::string unwrap; ///< "docker" or "cri"; empty: entries are the lines themselves
     std::vector<Extract> extracts;
     EntryLines lines;
+
+    /// All that decides what is read from an entry, as a text: EntryFormat::definition.
+    std::string definition() const;
 };
 
 /// The format; a problem names the part of the description that is wrong in Problem::field, as in
