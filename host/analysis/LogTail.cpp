@@ -4,6 +4,7 @@
 #include "host/analysis/LineEntry.h"
 #include "host/base/JsonWriter.h"
 #include "host/diagnose/MonitoredLogFile.h"
+#include "logs/FollowSettings.h"
 #include "logs/RequestThresholds.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
@@ -82,7 +83,9 @@ bool seekTail(int fd) {
 LogTail::LogTail(LogFile& log) : m_log(log), m_clock(log.followSettings()) {}
 
 bool LogTail::hasLines() const noexcept {
-    return m_log.type() == 'U' || m_log.type() == 'S';
+    const auto& settings = m_log.followSettings();
+    return m_log.type() == 'U' || m_log.type() == 'S' ||
+           (settings && settings->format && settings->format->recordLength() == 0);
 }
 
 Result<void> LogTail::read(const Entry& entry) {

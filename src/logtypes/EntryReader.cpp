@@ -4,6 +4,7 @@
 #include "logs/ValidLog.h"
 #include "logs/ZoneTime.h"
 #include "logtypes/AdminLogFile.h"
+#include "logtypes/FormatLogFile.h"
 #include "logtypes/SysLogFile.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
@@ -20,11 +21,12 @@ class SyslogEntries final : public EntryReader {
 public:
     explicit SyslogEntries(const ValidLog& log) : m_log(log) {}
 
-    bool read(char* entry, const char* newest, zrm_rmlogent_data_t& row) override {
+    bool read(char* entry, std::string_view /*text*/, const char* newest,
+              zrm_rmlogent_data_t& row) override {
         std::memcpy(m_context.timestamp, newest, stampLength);
         return m_log.formatEntryAsRow(entry, &row, &m_context) == 0 && row.entrytime[0] != ' ';
     }
-    void readFields(std::string_view text, EntryFields& fields) const override {
+    void readFields(std::string_view text, EntryFields& fields) override {
         m_log.readFields(text, fields);
     }
 
@@ -42,7 +44,8 @@ public:
     explicit TextEntries(const ValidLog& log) : m_log(log) {}
 
     bool hasFormat() const noexcept { return m_log.hasFormat(); }
-    bool read(char* entry, const char* newest, zrm_rmlogent_data_t& row) override {
+    bool read(char* entry, std::string_view /*text*/, const char* newest,
+              zrm_rmlogent_data_t& row) override {
         setDate(newest);
         return m_log.formatEntryAsRow(entry, &row, &m_context) == 0;
     }
@@ -89,7 +92,8 @@ public:
     explicit AccountingEntries(const ValidLog& log) : m_log(log) {}
 
     std::size_t recordLength() const noexcept override { return AdminLogFile::recordLength; }
-    bool read(char* entry, const char* /*newest*/, zrm_rmlogent_data_t& row) override {
+    bool read(char* entry, std::string_view /*text*/, const char* /*newest*/,
+              zrm_rmlogent_data_t& row) override {
         return m_log.formatEntryAsRow(entry, &row, nullptr) == 0;
     }
 
@@ -99,6 +103,28 @@ private:
     };
 
     Log m_log;
+};
+
+class FormatEntries final : public EntryReader {
+public:
+    explicit FormatEntries(const ValidLog& log) : m_log(log), m_reader(m_log.format().reader()) {}
+
+    std::size_t recordLength() const noexcept override { return m_log.format().recordLength(); }
+    bool read(char* /*entry*/, std::string_view text, const char* newest,
+              zrm_rmlogent_data_t& row) override {
+        return m_log.makeRow(*m_reader, text, newest, row);
+    }
+    void readFields(std::string_view text, EntryFields& fields) override {
+        m_reader->readFields(text, fields);
+    }
+
+private:
+    struct Log : FormatLogFile {
+        explicit Log(const ValidLog& log) : FormatLogFile(log, Unmonitored{}) {}
+    };
+
+    Log m_log;
+    const std::unique_ptr<EntryFormat::Reader> m_reader;
 };
 
 } // namespace
@@ -115,6 +141,8 @@ std::unique_ptr<EntryReader> EntryReader::of(const LogFile& log) {
     }
     case 'A':
         return std::make_unique<AccountingEntries>(line);
+    case FormatLogFile::typeLetter:
+        return std::make_unique<FormatEntries>(line);
     default:
         return nullptr;
     }

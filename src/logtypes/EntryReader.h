@@ -30,12 +30,14 @@ public:
 
     /// Bytes of a record; 0: the entries are lines.
     virtual std::size_t recordLength() const noexcept { return 0; }
-    /// Fills the row from a terminated line, which may be changed, or from a record. `newest` (16
-    /// characters) is the latest time that the entry may have, give or take a day: it decides the
-    /// year of a time without one. False if the entry does not fit the log's format or has no time.
-    virtual bool read(char* entry, const char* newest, zrm_rmlogent_data_t& row) = 0;
+    /// Fills the row from a terminated line, which may be changed, or from a record. `text` is as
+    /// of EntryBlock. `newest` (16 characters) is the latest time that the entry may have, give or
+    /// take a day: it decides the year of a time without one. False if the entry does not fit the
+    /// log's format or has no time.
+    virtual bool read(char* entry, std::string_view text, const char* newest,
+                      zrm_rmlogent_data_t& row) = 0;
     /// See LogFile::readFields.
-    virtual void readFields(std::string_view /*text*/, EntryFields& /*fields*/) const {}
+    virtual void readFields(std::string_view /*text*/, EntryFields& /*fields*/) {}
 };
 
 } // namespace zrm

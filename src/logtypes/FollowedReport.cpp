@@ -75,7 +75,7 @@ std::string readProblem(const Generation& generation, std::int64_t offset, int e
 /// The entry of a block whose row is judged by the conditions of a report.
 class ReportedEntry final : public LogEntry {
 public:
-    explicit ReportedEntry(const EntryReader& entries) : m_entries(entries) {}
+    explicit ReportedEntry(EntryReader& entries) : m_entries(entries) {}
 
     /// Whether the row of the block's last entry meets the conditions.
     template <class Block>
@@ -87,7 +87,9 @@ public:
         return receiver.meets(row);
     }
 
-    std::string_view text() const override { return m_text; }
+    std::string_view text() const override {
+        return m_entries.recordLength() == 0 ? m_text : std::string_view();
+    }
     bool isCut() const override { return m_isCut; }
     const EntryFields& fields() override {
         if (!m_hasFields) {
@@ -100,8 +102,8 @@ public:
     const EntryKeep& keep() const override { return m_keep; }
 
 private:
-    const EntryReader& m_entries;
-    std::string_view m_text;
+    EntryReader& m_entries;
+    std::string_view m_text; ///< or the record
     bool m_isCut = false;
     const EntryKeep m_keep;
     EntryFields m_fields;
@@ -215,7 +217,7 @@ std::string FollowedReport::firstTime(Generation& generation) {
     const EntryBlock::Fill filled = block.fill(generation);
     char* entry = filled == EntryBlock::Fill::more ? block.next() : nullptr;
     for (; entry != nullptr; entry = block.next()) {
-        if (m_entries.read(entry, m_newest.data(), m_row)) {
+        if (m_entries.read(entry, block.text(), m_newest.data(), m_row)) {
             return std::string(timeOf(m_row));
         }
     }
@@ -223,8 +225,9 @@ std::string FollowedReport::firstTime(Generation& generation) {
 }
 
 /// Reads an entry into the row and compares its time with the report's window.
-FollowedReport::Place FollowedReport::place(char* entry, const std::string& newest) {
-    if (!m_entries.read(entry, newest.data(), m_row)) {
+FollowedReport::Place FollowedReport::place(char* entry, std::string_view text,
+                                            const std::string& newest) {
+    if (!m_entries.read(entry, text, newest.data(), m_row)) {
         ++m_skipped;
         return Place::unfit;
     }
@@ -274,7 +277,7 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
             return;
         }
         while (char* const entry = block.next()) {
-            const Place where = place(entry, newest);
+            const Place where = place(entry, block.text(), newest);
             if (isFar(where, Place::farTooOld, far)) {
                 return;
             }
@@ -305,7 +308,7 @@ void FollowedReport::readForward(Generation& generation, File& file, Receiver& r
     bool isPast = false;
     unsigned far = 0;
     const auto look = [&](char* entry) {
-        const Place where = place(entry, m_newest);
+        const Place where = place(entry, block.text(), m_newest);
         isPast = isFar(where, Place::farTooNew, far);
         if (where == Place::within && judged.isMet(block, m_row, receiver)) {
             kept.push_back(m_row);

@@ -10,6 +10,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace zrm {
@@ -78,7 +79,7 @@ private:
     void readBackward(Generation& generation, File& file, Receiver& receiver);
     void readForward(Generation& generation, File& file, Receiver& receiver);
     bool isEnded();
-    Place place(char* entry, const std::string& newest);
+    Place place(char* entry, std::string_view text, const std::string& newest);
     static bool isFar(Place where, Place farPlace, unsigned& far) noexcept;
     void give(const zrm_rmlogent_data_t& row, Receiver& receiver);
     void show(std::int64_t read, Receiver& receiver);

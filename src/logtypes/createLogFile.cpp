@@ -3,6 +3,7 @@
 #include "logs/ValidLog.h"
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/ErrLogFile.h"
+#include "logtypes/FormatLogFile.h"
 #include "logtypes/SysLogFile.h"
 #include "logtypes/UserLogFile.h"
 
@@ -26,6 +27,7 @@ constexpr LogKind logKinds[] = {
     {'U', create<UserLogFile>},
     {'A', create<AdminLogFile>},
     {'E', create<ErrLogFile>},
+    {FormatLogFile::typeLetter, create<FormatLogFile>}, // no line of the log configuration says it
 };
 
 const LogKind* findKind(char type) noexcept {

@@ -99,7 +99,7 @@ char* BackwardBlock::nextRecord() noexcept {
         return nullptr;
     }
     m_end -= m_recordLength;
-    m_text = {};
+    m_text = std::string_view(m_block.get() + m_end, m_recordLength);
     return m_block.get() + m_end;
 }
 

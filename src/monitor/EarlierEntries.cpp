@@ -145,7 +145,7 @@ std::int64_t EarlierEntries::newestTime(Generation& file, std::int64_t to,
     if (!file.isCompressed()) {
         RangeReader reader(file, std::max<std::int64_t>(to - firstStep, 0), to, m_recordLength);
         while (char* const entry = reader.next()) {
-            if (const auto range = timeOf(entry)) {
+            if (const auto range = timeOf(entry, reader.text())) {
                 newest = range->earliest;
             }
         }
@@ -163,7 +163,7 @@ bool EarlierEntries::isBeforePeriod(Generation& file, std::int64_t at, const Tim
     bool hasTime = false;
     for (int entries = 0; entries < entriesPerLook; ++entries) {
         char* const entry = reader.next();
-        const auto range = entry != nullptr ? timeOf(entry) : std::nullopt;
+        const auto range = entry != nullptr ? timeOf(entry, reader.text()) : std::nullopt;
         if (range && range->latest > *m_periodBegin) {
             return false;
         }

@@ -27,8 +27,10 @@ public:
     static constexpr std::int64_t mostBytes = 64 * 1024 * 1024;
     static constexpr std::chrono::seconds patience{5};
 
-    /// When an entry was written; none if it does not say so. May change the entry.
-    using TimeOf = std::function<std::optional<EntryClock::Range>(char* entry)>;
+    /// When an entry was written, given with its text as of EntryBlock; none if it does not say so.
+    /// May change the entry.
+    using TimeOf =
+        std::function<std::optional<EntryClock::Range>(char* entry, std::string_view text)>;
     /// Takes an entry, with its text as of EntryBlock. Returns false to end the reading.
     using Take = std::function<bool(char* entry, std::string_view text)>;
 

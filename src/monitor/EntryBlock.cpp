@@ -52,7 +52,7 @@ char* EntryBlock::longText() const noexcept {
 
 std::string_view EntryBlock::text() const noexcept {
     std::string_view text(m_text, std::min(m_textLength, longestText));
-    text.remove_suffix(!isTextCut() && text.ends_with('\r') ? 1 : 0);
+    text.remove_suffix(m_recordLength == 0 && !isTextCut() && text.ends_with('\r') ? 1 : 0);
     return text;
 }
 
@@ -160,7 +160,7 @@ char* EntryBlock::nextRecord() noexcept {
     }
     char* const record = m_block.get() + m_begin;
     m_begin += m_recordLength;
-    setText(nullptr, 0);
+    setText(record, m_recordLength);
     return record;
 }
 

@@ -47,7 +47,7 @@ public:
     void release() noexcept;
 
     /// The text of the last entry in full, without its line end; the first EntryKeep::longestText
-    /// bytes of a longer one. Empty for a record. Valid as long as the entry.
+    /// bytes of a longer one. A record is its own text. Valid as long as the entry.
     std::string_view text() const noexcept;
     /// True if the last entry is longer than its text.
     bool isTextCut() const noexcept;

@@ -109,6 +109,10 @@ public:
     /// no fields adds none. The fields are views into the text. Any thread.
     virtual void readFields(std::string_view text, EntryFields& fields) const;
 
+    /// Why the calling thread's last entry was rejected, as a clause; empty: it does not match the
+    /// format.
+    virtual std::string_view rejectionReason() const noexcept { return {}; }
+
     void startThread();
     /// Asks a running monitor to end, so that stopThread waits less: each thread checks its status
     /// once a second, and many may have to end at once.

@@ -61,7 +61,7 @@ void LogFile::followLog(std::size_t recordLength) {
     const FollowSettings& settings = *followSettings();
     FileFollower follower(fileNameLocal(), optionsFor(settings, recordLength), *m_followLedger);
     LogPositions positions(fileNameUTF8());
-    FollowedEntry current(*this, follower);
+    FollowedEntry current(*this, follower, recordLength == 0);
     const LogEntry::Offer offer(current);
     // A log that is followed again, with other settings for example, continues in any case.
     const bool continues = settings.resume || !positions.isFirstOfRun();

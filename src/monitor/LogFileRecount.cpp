@@ -19,13 +19,13 @@ TRC1_Anchor anchor{"LogFileRecount.cpp"};
 /// The entry that is counted, for conditions on its fields.
 class EarlierEntry final : public LogEntry {
 public:
-    explicit EarlierEntry(const LogFile& log) : m_log(log) {}
+    EarlierEntry(const LogFile& log, bool hasText) : m_log(log), m_hasText(hasText) {}
 
     void begin(std::string_view text) noexcept {
         m_text = text;
         m_hasFields = false;
     }
-    std::string_view text() const override { return m_text; }
+    std::string_view text() const override { return m_hasText ? m_text : std::string_view(); }
     bool isCut() const override { return false; }
     const EntryFields& fields() override {
         if (!m_hasFields) {
@@ -39,7 +39,8 @@ public:
 
 private:
     const LogFile& m_log;
-    std::string_view m_text;
+    const bool m_hasText;    ///< false: a record
+    std::string_view m_text; ///< or the record
     EntryFields m_fields;
     bool m_hasFields = false;
 };
@@ -65,12 +66,13 @@ void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
         return;
     }
     const TRC1_Silence silence; // the earlier run has traced it
-    EarlierEntry current(*this);
+    EarlierEntry current(*this, recordLength == 0);
     const LogEntry::Offer offer(current);
     EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength);
     earlier.read(
         place->file, place->offset, period,
-        [&](char* entry) {
+        [&](char* entry, std::string_view text) {
+            current.begin(text);
             return formatEntryAsRow(entry, row, nullptr) == 0
                        ? m_clock.rangeOf(lastEntryMoment, row->entrytime)
                        : std::nullopt;

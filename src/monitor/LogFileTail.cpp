@@ -246,7 +246,7 @@ bool LogFile::deliverEntry(char* line) {
         }
     } else {
         count(NumFormatErrors);
-        m_ledger.noteRejected(line);
+        m_ledger.noteRejected(line, rejectionReason());
     }
     if (std::FILE* const debugLog = debugLogStream()) {
         writeRecord(debugLog, line, std::strlen(line), isRow ? row : nullptr,

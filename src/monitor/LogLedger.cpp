@@ -37,7 +37,7 @@ void LogLedger::noteEntries() noexcept {
     m_lastEntry.store(time.tv_sec * nanoseconds + time.tv_nsec, std::memory_order_relaxed);
 }
 
-void LogLedger::noteRejected(const char* line) noexcept {
+void LogLedger::noteRejected(const char* line, std::string_view reason) noexcept {
     std::size_t length = strnlen(line, sizeof RejectedLine::text);
     length -= length > 0 && line[length - 1] == '\n' ? 1 : 0;
     const LockGuard guard(&m_lock);
@@ -45,6 +45,7 @@ void LogLedger::noteRejected(const char* line) noexcept {
         rejected->time = wallTime();
         rejected->length = length;
         std::memcpy(rejected->text, line, length);
+        rejected->reason[reason.copy(rejected->reason, sizeof rejected->reason - 1)] = '\0';
     }
 }
 

@@ -10,6 +10,7 @@
 #include <cstdint>
 #include <ctime>
 #include <optional>
+#include <string_view>
 
 namespace zrm {
 
@@ -25,6 +26,7 @@ public:
         std::timespec time; ///< when it was read
         std::size_t length;
         char text[2048];
+        char reason[128]; ///< terminated; empty: it does not match the format
     };
     enum class Truncation {
         seen,    ///< the file became shorter
@@ -52,8 +54,8 @@ public:
     void addBytes(std::int64_t count) noexcept;
     /// Entries were just read.
     void noteEntries() noexcept;
-    /// A line did not match the format.
-    void noteRejected(const char* line) noexcept;
+    /// A line did not match the format. `reason`: why not, if there is more to say.
+    void noteRejected(const char* line, std::string_view reason = {}) noexcept;
     /// `first` is the first character of a row's ENTRYTIME.
     void noteTime(char first) noexcept {
         if (first == ' ') {

@@ -24,7 +24,7 @@ using testing::IsEmpty;
 using testing::SizeIs;
 
 /// Entries are lines "SECONDS text"; others have no time.
-std::optional<EntryClock::Range> timeOf(char* entry) {
+std::optional<EntryClock::Range> timeOf(const char* entry, std::string_view /*text*/) {
     char* end = nullptr;
     const std::int64_t time = std::strtoll(entry, &end, 10);
     if (end == entry) {

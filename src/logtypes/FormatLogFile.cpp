@@ -1,0 +1,216 @@
+#include "logtypes/FormatLogFile.h"
+
+#include "base/BrevanTime.h"
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/LogEntry.h"
+#include "framework/locale.h"
+#include "logs/FollowSettings.h"
+#include "logs/RequestThresholds.h"
+#include "logs/ValidLog.h"
+#include "logtypes/EntryReader.h"
+#include "logtypes/EntryStamp.h"
+#include "monitor/BackwardBlock.h"
+#include "monitor/Generation.h"
+#include "monitor/ReportOutcome.h"
+
+#include <algorithm>
+#include <cstring>
+
+namespace zrm {
+
+namespace {
+
+TRC1_Anchor anchor{"FormatLogFile.cpp"};
+
+/// The reader of the calling thread. A log's thread has one format all its life; other threads have
+/// one after another. It shares the format, which may outlive the log so.
+struct ThreadReader {
+    std::shared_ptr<const EntryFormat> format;
+    std::unique_ptr<EntryFormat::Reader> reader;
+};
+thread_local ThreadReader threadReader;
+
+bool isControl(char character) noexcept {
+    return character == '\n' || character == '\r';
+}
+
+/// Fills a blank column with as much of the text as it takes, on one line, and returns how much
+/// that is.
+template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::string_view text) {
+    const std::size_t length = text.copy(column, width);
+    std::replace_if(column, column + length, isControl, ' ');
+    return length;
+}
+
+} // namespace
+
+/// Reads the present file backwards.
+struct FormatLogFile::Report {
+    std::unique_ptr<Generation> file;
+    std::unique_ptr<EntryReader> entries;
+    std::unique_ptr<BackwardBlock> block;
+    char newest[EntryReader::stampLength];
+};
+
+FormatLogFile::FormatLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
+    TraceScope trace(anchor);
+    if (trace.isOn(TRC1_DETAIL)) {
+        printSelf();
+    }
+    startThread();
+}
+
+FormatLogFile::FormatLogFile(const ValidLog& log, Unmonitored) : LogFile(log, nullptr) {
+    const TraceScope trace(anchor);
+}
+
+FormatLogFile::~FormatLogFile() {
+    TraceScope trace(anchor);
+    stopThread();
+}
+
+void FormatLogFile::processLogData() {
+    TraceScope trace(anchor);
+    followLog(format().recordLength());
+}
+
+EntryFormat::Reader& FormatLogFile::readerOfThread() const {
+    const std::shared_ptr<const EntryFormat>& format = followSettings()->format.value;
+    if (threadReader.format != format) {
+        threadReader.reader = format->reader();
+        threadReader.format = format;
+    }
+    return *threadReader.reader;
+}
+
+/// The whole of an entry of which this is the beginning.
+std::string_view FormatLogFile::wholeEntry(const char* entry) const {
+    if (const std::size_t record = format().recordLength(); record != 0) {
+        return {entry, record};
+    }
+    if (LogEntry::ofThisThread != nullptr) {
+        return LogEntry::ofThisThread->text();
+    }
+    std::string_view line(entry);
+    line.remove_suffix(line.ends_with('\n') ? 1 : 0);
+    line.remove_suffix(line.ends_with('\r') ? 1 : 0);
+    return line;
+}
+
+long FormatLogFile::formatEntryAsRow(char* entry, void* row, void* /*context*/) {
+    TraceScope trace(anchor);
+    const bool isRow = makeRow(readerOfThread(), wholeEntry(entry), nullptr,
+                               *static_cast<zrm_rmlogent_data_t*>(row));
+    return trace.result(isRow ? 0L : -1L);
+}
+
+bool FormatLogFile::makeRow(EntryFormat::Reader& reader, std::string_view entry, const char* newest,
+                            zrm_rmlogent_data_t& row) {
+    TraceScope trace(anchor);
+    EntryRow columns(*this, &row);
+    EntryColumns found;
+    if (!reader.read(entry, found) ||
+        (found.hasTime &&
+         !EntryStamp::write(found, followSettings()->zone, newest, columns->entrytime))) {
+        columns.reject();
+        return trace.result(false);
+    }
+    if (!found.hasTime && newest == nullptr) {
+        EntryStamp::writePresent(columns->entrytime);
+    } else if (!found.hasTime) {
+        std::memcpy(columns->entrytime, newest, sizeof columns->entrytime);
+    }
+    fillColumn(columns->entrysys, found.system);
+    const std::size_t sourceLength = fillColumn(columns->entrysrc, found.source);
+    fillColumn(columns->entrytype, found.type);
+    fillColumn(columns->entryclass, found.entryClass);
+    const std::size_t length = fillColumn(columns->entrydesc, found.description);
+    UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
+                             sourceLength, LOC2_NO_TERMINATOR);
+    const std::int32_t lengthInUTF8 =
+        UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
+                                 columns->entrydesc, length, LOC2_NO_TERMINATOR);
+    columns.setDescriptionLengths(length, lengthInUTF8);
+    return trace.result(true);
+}
+
+bool FormatLogFile::deliverEntry(char* entry) {
+    const std::size_t record = format().recordLength();
+    if (record == 0) {
+        return LogFile::deliverEntry(entry);
+    }
+    count(NumEvents);
+    zrm_rmlogent_data_t* const row = ownRow();
+    if (formatEntryAsRow(entry, row, nullptr) == 0) {
+        if (!offer(row)) {
+            return false;
+        }
+        writeToDebugLog(entry, record, row, sizeof *row);
+    } else {
+        count(NumFormatErrors);
+        writeToDebugLog(entry, record, nullptr, 0);
+    }
+    return true;
+}
+
+void FormatLogFile::readFields(std::string_view text, EntryFields& fields) const {
+    readerOfThread().readFields(text, fields);
+}
+
+std::string_view FormatLogFile::rejectionReason() const noexcept {
+    return threadReader.reader ? threadReader.reader->reason() : std::string_view();
+}
+
+void* FormatLogFile::startReportRequest(void* /*thresholds*/) {
+    TraceScope trace(anchor);
+    auto report = std::make_unique<Report>();
+    report->file = Generation::open(fileNameLocal());
+    Generation::Status status{};
+    if (!report->file || !report->file->status(status) || status.size == 0) {
+        return trace.result(static_cast<void*>(nullptr));
+    }
+    report->entries = EntryReader::of(*this);
+    report->block = std::make_unique<BackwardBlock>(format().recordLength());
+    report->block->start(status.size);
+    BrevanTime::generateCurrentTimestamp(report->newest);
+    return trace.result(static_cast<void*>(report.release()));
+}
+
+void* FormatLogFile::getNextLogEntry(void* row, void* reportState, void* thresholds) {
+    TraceScope trace(anchor);
+    auto& report = *static_cast<Report*>(reportState);
+    const auto& window = *static_cast<const _RequestThresholds*>(thresholds);
+    auto& columns = *static_cast<zrm_rmlogent_data_t*>(row);
+    constexpr std::size_t stampLength = sizeof columns.entrytime;
+    for (;;) {
+        char* const entry = report.block->next();
+        if (entry == nullptr) {
+            const BackwardBlock::Fill filled = report.block->fill(*report.file);
+            if (filled != BackwardBlock::Fill::more) {
+                ReportOutcome::note(filled == BackwardBlock::Fill::end ? ReportEnd::complete
+                                                                       : ReportEnd::readError);
+                return trace.result(static_cast<void*>(nullptr));
+            }
+            continue;
+        }
+        if (!report.entries->read(entry, report.block->text(), report.newest, columns) ||
+            std::strncmp(columns.entrytime, window.endTime, stampLength) > 0) {
+            continue;
+        }
+        if (std::strncmp(columns.entrytime, window.startTime, stampLength) < 0) {
+            ReportOutcome::note(ReportEnd::complete);
+            return trace.result(static_cast<void*>(nullptr));
+        }
+        std::memcpy(report.newest, columns.entrytime, stampLength);
+        return trace.result(row);
+    }
+}
+
+void FormatLogFile::endReportRequest(void** reportState) {
+    TraceScope trace(anchor);
+    delete static_cast<Report*>(*reportState);
+    *reportState = nullptr;
+}
+
+} // namespace zrm

@@ -1,0 +1,58 @@
+#ifndef ZRM_FORMAT_LOG_FILE_H
+#define ZRM_FORMAT_LOG_FILE_H
+
+#include "logs/EntryFormat.h"
+#include "logs/FollowSettings.h"
+#include "monitor/LogFile.h"
+
+#include <cstddef>
+#include <memory>
+#include <string_view>
+
+namespace zrm {
+
+/// A followed log whose entries are taken apart by a format that the framework brings
+/// (FollowSettings::format). Monitoring starts on construction. Threads as in LogFile.
+class FormatLogFile : public LogFile {
+public:
+    static constexpr char typeLetter = 'F';
+
+    /// The log has follow settings with a format.
+    FormatLogFile(const ValidLog& log, LogFile* chainHead);
+    using LogFile::operator=;
+    ~FormatLogFile() override;
+
+    void endReportRequest(void** reportState) override;
+    /// Reads the file that has the log's name. A line that does not fit the format is passed over.
+    void* getNextLogEntry(void* row, void* reportState, void* thresholds) override;
+    /// Returns null if the log cannot be read.
+    void* startReportRequest(void* thresholds) override;
+    /// Returns 0, or -1 for an entry that does not fit the format. `entry` is a terminated line, of
+    /// which the thread's LogEntry has the whole text if it has any, or a record. Any thread.
+    long formatEntryAsRow(char* entry, void* row, void* context) override;
+    void processLogData() override;
+    bool deliverEntry(char* entry) override;
+    void readFields(std::string_view text, EntryFields& fields) const override;
+    std::string_view rejectionReason() const noexcept override;
+
+    /// Makes a row of an entry's whole text, or of a record. `newest` as in EntryReader; null while
+    /// monitoring. False if the entry does not fit the format. Any thread.
+    bool makeRow(EntryFormat::Reader& reader, std::string_view entry, const char* newest,
+                 zrm_rmlogent_data_t& row);
+    const EntryFormat& format() const noexcept { return *followSettings()->format.value; }
+
+protected:
+    /// Creates a log that is not monitored and starts no thread.
+    struct Unmonitored {};
+    FormatLogFile(const ValidLog& log, Unmonitored);
+
+private:
+    struct Report;
+
+    EntryFormat::Reader& readerOfThread() const;
+    std::string_view wholeEntry(const char* entry) const;
+};
+
+} // namespace zrm
+
+#endif
