@@ -16,6 +16,7 @@
 #include <gmock/gmock.h>
 
 #include <cerrno>
+#include <future>
 #include <memory>
 #include <string>
 #include <vector>
@@ -123,30 +124,48 @@ TEST_F(FormatLogFileTest, AnEntryThatDoesNotFitIsKeptWithItsReason) {
     EXPECT_STREQ(lines[0].reason, "it begins with bad");
 }
 
+/// Remembers what the entry of a row had beside it.
+class SeenEntry {
+public:
+    SeenEntry() {
+        EventRecorder::onRow([this](std::size_t) {
+            m_all = *LogEntry::ofThisThread->fields().find("all");
+            m_text = LogEntry::ofThisThread->text();
+            m_isSeen.set_value();
+        });
+    }
+    ~SeenEntry() { EventRecorder::onRow(nullptr); }
+    SeenEntry(const SeenEntry&) = delete;
+    SeenEntry& operator=(const SeenEntry&) = delete;
+
+    void wait() { m_isSeen.get_future().wait(); }
+    const std::string& all() const { return m_all; }
+    const std::string& text() const { return m_text; }
+
+private:
+    std::promise<void> m_isSeen;
+    std::string m_all;
+    std::string m_text;
+};
+
 TEST_F(FormatLogFileTest, FieldsAreReadFromTheWholeEntry) {
     const std::string entry = "0703 a||||" + std::string(3000, 'd');
-    std::string seen;
-    EventRecorder::onRow(
-        [&](std::size_t) { seen = *LogEntry::ofThisThread->fields().find("all"); });
+    SeenEntry seen;
     rowsOf(entry + "\r\n", 1);
-    EventRecorder::onRow(nullptr);
-    EXPECT_EQ(seen, entry);
+    seen.wait();
+    EXPECT_EQ(seen.all(), entry);
+    EXPECT_EQ(seen.text(), entry);
 }
 
 TEST_F(FormatLogFileTest, ReadsRecordsWhichHaveFieldsButNoText) {
-    std::string seen;
-    std::string text = "unset";
-    EventRecorder::onRow([&](std::size_t) {
-        seen = *LogEntry::ofThisThread->fields().find("all");
-        text = LogEntry::ofThisThread->text();
-    });
+    SeenEntry seen;
     const std::string record = "0703 a|b|||\r";
     const auto rows = rowsOf("bad4567890\r\n" + record + "incomplete", 1, record.size());
-    EventRecorder::onRow(nullptr);
     ASSERT_EQ(rows.size(), 1U);
+    seen.wait();
     EXPECT_EQ(columnText(rows[0].entrysrc), "b");
-    EXPECT_EQ(seen, record);
-    EXPECT_EQ(text, "");
+    EXPECT_EQ(seen.all(), record);
+    EXPECT_EQ(seen.text(), "");
     EXPECT_EQ(m_log->numFormatErrors(), 1);
 }
 
