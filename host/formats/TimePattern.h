@@ -26,12 +26,29 @@ public:
     TimePattern& operator=(const TimePattern&) = delete;
     virtual ~TimePattern() = default;
 
-    /// Sets the time of the columns from a text that is nothing but the time. Returns false, and
-    /// leaves the columns alone, if the text is not such a time.
+    /// Sets the time of the columns from a text that is nothing but the time. A time of day without
+    /// a date leaves them without a time: such an entry was written when it is read. Returns false,
+    /// and leaves the columns alone, if the text is not such a time.
     virtual bool read(std::string_view text, EntryColumns& columns) const noexcept = 0;
 
 protected:
     TimePattern() = default;
+};
+
+/// Reads times by a pattern and remembers the last one, since entries often come in the same
+/// second. One thread.
+class TimeMemo {
+public:
+    explicit TimeMemo(std::shared_ptr<const TimePattern> pattern) noexcept;
+
+    /// As TimePattern::read().
+    bool read(std::string_view text, EntryColumns& columns) noexcept;
+
+private:
+    const std::shared_ptr<const TimePattern> m_pattern;
+    char m_text[48]; ///< longer texts are not remembered
+    std::size_t m_length = 0;
+    EntryColumns m_columns; ///< of which the time counts
 };
 
 } // namespace zrm::host

@@ -1,0 +1,373 @@
+#include "host/formats/CommonTime.h"
+
+#include <cstdint>
+
+namespace zrm::host {
+
+namespace {
+
+/// Where the digits of "YYYY-MM-DD hh:mm:ss" are.
+constexpr std::string_view isoShape = "9999-99-99 99:99:99";
+
+} // namespace
+
+bool TimeParts::give(EntryColumns& columns) const noexcept {
+    if (!civil.isValid() || civil.second == 60) {
+        return false;
+    }
+    if (hasDate) {
+        columns.hasTime = true;
+        columns.hasYear = hasYear;
+        columns.time = civil;
+        columns.offset = offset;
+    }
+    return true;
+}
+
+std::optional<TimeParts> CommonTime::result(bool isRead) noexcept {
+    return isRead ? std::optional(m_parts) : std::nullopt;
+}
+
+std::optional<TimeParts> CommonTime::iso() noexcept {
+    m_text.takeBlanks();
+    return result((takeFixedIso() ? takeFraction(".,") : readIso()) && readTail());
+}
+
+std::optional<TimeParts> CommonTime::epoch() noexcept {
+    m_text.takeBlanks();
+    return result(readEpoch() && readTail());
+}
+
+std::optional<TimeParts> CommonTime::any() noexcept {
+    m_text.takeBlanks();
+    const bool isNumeric = TimeCursor::isDigit(m_text.next());
+    return result((isNumeric ? readNumeric() : readNamed()) && readTail());
+}
+
+/// The commonest form, without looking for anything. Takes nothing if it is another one.
+bool CommonTime::takeFixedIso() noexcept {
+    char digits[isoShape.size()];
+    unsigned wrong = 0;
+    for (std::size_t at = 0; at < isoShape.size(); ++at) {
+        const char character = m_text.next(at);
+        digits[at] = static_cast<char>(character - '0');
+        if (isoShape[at] == '9') {
+            wrong |= static_cast<unsigned char>(digits[at]) > 9U;
+        } else if (isoShape[at] == ' ') {
+            wrong |= character != ' ' && character != 'T';
+        } else {
+            wrong |= character != isoShape[at];
+        }
+    }
+    if (wrong != 0) {
+        return false;
+    }
+    const auto pair = [&digits](std::size_t at) {
+        return static_cast<unsigned>(digits[at] * 10 + digits[at + 1]);
+    };
+    m_parts.setYear(pair(0) * 100 + pair(2));
+    m_parts.civil.month = pair(5);
+    m_parts.civil.day = pair(8);
+    m_parts.civil.hour = pair(11);
+    m_parts.civil.minute = pair(14);
+    m_parts.civil.second = pair(17);
+    m_text.skip(isoShape.size());
+    return true;
+}
+
+bool CommonTime::readIso() noexcept {
+    switch (m_text.digits()) {
+    case 4:
+        return m_text.next(4) == '-' && readYearFirst();
+    case 8:
+        return readCompactDate(true);
+    default:
+        return readStamp();
+    }
+}
+
+/// The number of digits at the beginning says which form it can be.
+bool CommonTime::readNumeric() noexcept {
+    if (takeFixedIso()) {
+        return takeFraction(".,");
+    }
+    switch (m_text.digits()) {
+    case 1:
+    case 2:
+        return readShortFirst();
+    case 4:
+        return TimeCursor::isDigit(m_text.next(5)) && m_text.next(4) == ' ' ? readMonthAndDay()
+                                                                            : readYearFirst();
+    case 6:
+        return readCompactDate(false);
+    case 8:
+        return readCompactDate(true);
+    case 14:
+        return readStamp();
+    case 9:
+    case 10:
+    case 13:
+    case 16:
+    case 19:
+        return readEpoch();
+    default:
+        return false;
+    }
+}
+
+/// "2026-11-19 10:00:00", "2026/11/19 10:00:00", "2026-Nov-19 10:00:00", "2026 Nov 19 10:00:00".
+bool CommonTime::readYearFirst() noexcept {
+    unsigned year = 0;
+    const char separator = m_text.next(4);
+    if (!m_text.takeNumber(4, 4, year) || !m_text.takeOneOf("-/. ")) {
+        return false;
+    }
+    m_parts.setYear(year);
+    return (m_text.takeMonth(m_parts.civil.month) ||
+            m_text.takeNumber(1, 2, m_parts.civil.month)) &&
+           m_text.take(separator) && m_text.takeNumber(1, 2, m_parts.civil.day) && takeBreak() &&
+           readTimeOfDay();
+}
+
+/// "20261119T100000", "20261119 10:00:00", "261119 10:00:00".
+bool CommonTime::readCompactDate(bool hasCentury) noexcept {
+    unsigned year = 0;
+    m_text.takeNumber(hasCentury ? 4 : 2, hasCentury ? 4 : 2, year);
+    if (hasCentury) {
+        m_parts.setYear(year);
+    } else {
+        m_parts.setShortYear(year);
+    }
+    return m_text.takeNumber(2, 2, m_parts.civil.month) &&
+           m_text.takeNumber(2, 2, m_parts.civil.day) && takeBreak() && readTimeOfDay();
+}
+
+/// "20261119100000".
+bool CommonTime::readStamp() noexcept {
+    unsigned year = 0;
+    if (m_text.digits() != 14) {
+        return false;
+    }
+    m_text.takeNumber(4, 4, year);
+    m_parts.setYear(year);
+    return m_text.takeNumber(2, 2, m_parts.civil.month) &&
+           m_text.takeNumber(2, 2, m_parts.civil.day) && readTimeOfDay();
+}
+
+/// "1119 10:00:00".
+bool CommonTime::readMonthAndDay() noexcept {
+    return m_text.takeNumber(2, 2, m_parts.civil.month) &&
+           m_text.takeNumber(2, 2, m_parts.civil.day) && m_text.takeBlanks() && readTimeOfDay();
+}
+
+/// A time that begins with the name of a weekday or a month.
+bool CommonTime::readNamed() noexcept {
+    if (m_text.takeWeekday()) {
+        m_text.take(',');
+        m_text.takeBlanks();
+    }
+    if (TimeCursor::isDigit(m_text.next())) {
+        return readNumeric();
+    }
+    if (!m_text.takeMonth(m_parts.civil.month)) {
+        return false;
+    }
+    m_text.take('.');
+    if (!m_text.takeBlanks() || !m_text.takeNumber(1, 2, m_parts.civil.day) ||
+        m_text.next() == ':' || !takeBreak()) {
+        return false;
+    }
+    unsigned year = 0;
+    if (m_text.digits() == 4) {
+        m_text.takeNumber(4, 4, year);
+        m_parts.setYear(year);
+        if (!takeBreak()) {
+            return false;
+        }
+    }
+    return readTimeOfDay();
+}
+
+/// A time that begins with a number of one or two digits.
+bool CommonTime::readShortFirst() noexcept {
+    if (m_text.next(1) == ':' || m_text.next(2) == ':') {
+        m_parts.hasDate = false;
+        return readTimeOfDay();
+    }
+    unsigned first = 0;
+    unsigned second = 0;
+    const bool hasTwoDigits = m_text.digits() == 2;
+    m_text.takeNumber(1, 2, first);
+    const char separator = m_text.next();
+    if (!m_text.takeOneOf("/-. ")) {
+        return false;
+    }
+    if (TimeCursor::isLetter(m_text.next())) {
+        return readDayAndMonthName(first);
+    }
+    if (!m_text.takeNumber(1, 2, second)) {
+        return false;
+    }
+    if (separator != ' ' && m_text.take(separator)) {
+        return (hasTwoDigits || m_text.digits() == 4) &&
+               readThreeNumbers(first, second, separator) && takeBreak() && readTimeOfDay();
+    }
+    m_parts.civil.month = first;
+    m_parts.civil.day = second;
+    return separator != ' ' && m_text.takeBlanks() && readTimeOfDay();
+}
+
+/// The rest of "19/Nov/2026:10:00:00", "19 Nov 2026 10:00:00", "19-Nov-26 10:00:00" or
+/// "19 Nov 10:00:00".
+bool CommonTime::readDayAndMonthName(unsigned day) noexcept {
+    unsigned year = 0;
+    m_parts.civil.day = day;
+    if (!m_text.takeMonth(m_parts.civil.month) ||
+        (!m_text.takeOneOf("/-.") && !m_text.takeBlanks())) {
+        return false;
+    }
+    if (m_text.digits() == 4) {
+        m_text.takeNumber(4, 4, year);
+        m_parts.setYear(year);
+        return takeBreak() && readTimeOfDay();
+    }
+    if (m_text.digits() == 2 && m_text.next(2) != ':') {
+        m_text.takeNumber(2, 2, year);
+        m_parts.setShortYear(year);
+        return takeBreak() && readTimeOfDay();
+    }
+    return readTimeOfDay();
+}
+
+/// Which number is the year, the month and the day in "11/19/2026", "19-11-2026", "19.11.2026",
+/// "26/11/19", "26-11-19" and "19.11.26". Two numbers and the separators have been taken.
+bool CommonTime::readThreeNumbers(unsigned first, unsigned second, char separator) noexcept {
+    const bool hasCentury = m_text.digits() == 4;
+    unsigned third = 0;
+    if (!m_text.takeNumber(2, 4, third) || (!hasCentury && third > 99)) {
+        return false;
+    }
+    CivilTime& civil = m_parts.civil;
+    if (hasCentury) {
+        m_parts.setYear(third);
+        civil.month = separator == '/' ? first : second;
+        civil.day = separator == '/' ? second : first;
+    } else if (separator == '.') {
+        m_parts.setShortYear(third);
+        civil.month = second;
+        civil.day = first;
+    } else {
+        m_parts.setShortYear(first);
+        civil.month = second;
+        civil.day = third;
+    }
+    return true;
+}
+
+/// The size says whether it is seconds, milliseconds, microseconds or nanoseconds: all of them are
+/// then before the year 5139.
+bool CommonTime::readEpoch() noexcept {
+    constexpr std::size_t mostDigits = 19;
+    constexpr std::uint64_t latest = 100'000'000'000;
+    const std::size_t count = m_text.digits();
+    if (count == 0 || count > mostDigits) {
+        return false;
+    }
+    std::uint64_t number = 0;
+    for (std::size_t at = 0; at < count; ++at) {
+        number = number * 10 + static_cast<unsigned>(m_text.next(at) - '0');
+    }
+    while (number >= latest) {
+        number /= 1000;
+    }
+    m_text.skip(count);
+    m_parts.civil = CivilTime::of(static_cast<std::int64_t>(number));
+    m_parts.hasYear = true;
+    m_parts.offset = 0;
+    m_hasZone = true;
+    return takeFraction(".");
+}
+
+/// A fraction of a second, if one of these marks comes next.
+bool CommonTime::takeFraction(std::string_view marks) noexcept {
+    return !m_text.takeOneOf(marks) || m_text.takeFraction();
+}
+
+/// What stands between a date and a time of day.
+bool CommonTime::takeBreak() noexcept {
+    if (m_text.takeOneOf("Tt_:-")) {
+        return true;
+    }
+    const bool hasComma = m_text.take(',');
+    return m_text.takeBlanks() || hasComma;
+}
+
+/// "10:00", "10:00:00", "10:00:00.123", "10.00.00,123", "10:00:00:123", "100000", "1000".
+bool CommonTime::readTimeOfDay() noexcept {
+    CivilTime& civil = m_parts.civil;
+    const std::size_t digits = m_text.digits();
+    if (digits == 6 || digits == 4) {
+        m_text.takeNumber(2, 2, civil.hour);
+        m_text.takeNumber(2, 2, civil.minute);
+        m_text.takeNumber(2, 2, civil.second);
+        return takeFraction(".,");
+    }
+    if (!m_text.takeNumber(1, 2, civil.hour)) {
+        return false;
+    }
+    const char separator = m_text.next();
+    if (!m_text.takeOneOf(":.") || !m_text.takeNumber(1, 2, civil.minute)) {
+        return false;
+    }
+    if (!m_text.take(separator)) {
+        return true;
+    }
+    if (!m_text.takeNumber(1, 2, civil.second)) {
+        return false;
+    }
+    return takeFraction(".,:");
+}
+
+/// Whether what is behind the time of day is the rest of the time, up to the end.
+bool CommonTime::readTail() noexcept {
+    for (;;) {
+        const bool hasBlanks = m_text.takeBlanks();
+        if (m_text.atEnd()) {
+            return true;
+        }
+        unsigned year = 0;
+        if (hasBlanks && !m_parts.hasYear && m_parts.hasDate && m_text.digits() == 4) {
+            m_text.takeNumber(4, 4, year);
+            m_parts.setYear(year);
+        } else if (!readTailPart()) {
+            return false;
+        }
+    }
+}
+
+bool CommonTime::readTailPart() noexcept {
+    bool isAfternoon = false;
+    if (!m_hasMeridiem && m_text.takeMeridiem(isAfternoon)) {
+        m_hasMeridiem = true;
+        return m_parts.setHour(m_parts.civil.hour, isAfternoon);
+    }
+    if (m_hasZone) {
+        return takeRemark();
+    }
+    m_hasZone = true;
+    return m_text.takeZone(m_parts.offset);
+}
+
+/// The zone's name behind its offset, in "+01:00[Europe/Berlin]" or "+0100 (CET)".
+bool CommonTime::takeRemark() noexcept {
+    if (m_text.next() != '[' && m_text.next() != '(') {
+        return false;
+    }
+    const char end = m_text.next() == '[' ? ']' : ')';
+    while (!m_text.atEnd() && m_text.next() != end) {
+        m_text.skip(1);
+    }
+    return m_text.take(end);
+}
+
+} // namespace zrm::host

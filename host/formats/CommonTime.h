@@ -1,0 +1,79 @@
+#ifndef ZRM_HOST_COMMON_TIME_H
+#define ZRM_HOST_COMMON_TIME_H
+
+#include "host/formats/TimeCursor.h"
+#include "logs/EntryFormat.h"
+
+#include <optional>
+#include <string_view>
+
+namespace zrm::host {
+
+/// What a text says about the time of an entry.
+struct TimeParts {
+    CivilTime civil{.year = yearless};
+    bool hasYear = false;
+    bool hasDate = true; ///< false: the time of day is all there is
+    std::optional<std::int32_t> offset;
+
+    /// Has a 29 February.
+    static constexpr int yearless = 2000;
+
+    void setYear(unsigned year) noexcept {
+        civil.year = static_cast<int>(year);
+        hasYear = true;
+    }
+    /// Of a year of two digits: from 1969 to 2068.
+    void setShortYear(unsigned year) noexcept { setYear(year + (year < 69 ? 2000 : 1900)); }
+    /// The hour of a clock of twelve hours. Returns false if it shows no such hour.
+    bool setHour(unsigned hour, bool isAfternoon) noexcept {
+        civil.hour = hour % 12 + (isAfternoon ? 12 : 0);
+        return hour >= 1 && hour <= 12;
+    }
+    /// Sets the time of the columns, unless there is no such time. A time of day alone is none: it
+    /// leaves the columns without a time.
+    bool give(EntryColumns& columns) const noexcept;
+};
+
+/// Reads a time whose form is not known, from the whole of a text. Looks at each character about
+/// once.
+class CommonTime {
+public:
+    explicit CommonTime(std::string_view text) noexcept : m_text(text) {}
+
+    /// Of each of these, if it is the time: a form of ISO 8601, seconds and so on since 1970, any
+    /// usual form.
+    std::optional<TimeParts> iso() noexcept;
+    std::optional<TimeParts> epoch() noexcept;
+    std::optional<TimeParts> any() noexcept;
+
+private:
+    bool takeFixedIso() noexcept;
+    bool readIso() noexcept;
+    bool readNumeric() noexcept;
+    bool readYearFirst() noexcept;
+    bool readCompactDate(bool hasCentury) noexcept;
+    bool readStamp() noexcept;
+    bool readMonthAndDay() noexcept;
+    bool readNamed() noexcept;
+    bool readShortFirst() noexcept;
+    bool readDayAndMonthName(unsigned day) noexcept;
+    bool readThreeNumbers(unsigned first, unsigned second, char separator) noexcept;
+    bool readEpoch() noexcept;
+    bool takeFraction(std::string_view marks) noexcept;
+    bool takeBreak() noexcept;
+    bool readTimeOfDay() noexcept;
+    bool readTail() noexcept;
+    bool readTailPart() noexcept;
+    bool takeRemark() noexcept;
+    std::optional<TimeParts> result(bool isRead) noexcept;
+
+    TimeCursor m_text;
+    TimeParts m_parts;
+    bool m_hasMeridiem = false;
+    bool m_hasZone = false;
+};
+
+} // namespace zrm::host
+
+#endif

@@ -1,0 +1,91 @@
+#include "host/formats/TimePattern.h"
+
+#include "host/formats/CommonTime.h"
+#include "host/formats/DirectiveTime.h"
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+
+namespace zrm::host {
+
+namespace {
+
+/// Times of a form that has a name.
+class NamedTime final : public TimePattern {
+public:
+    using Form = std::optional<TimeParts> (CommonTime::*)() noexcept;
+
+    explicit NamedTime(Form form) noexcept : m_form(form) {}
+
+    bool read(std::string_view text, EntryColumns& columns) const noexcept override {
+        CommonTime time(text);
+        const std::optional<TimeParts> parts = (time.*m_form)();
+        return parts && parts->give(columns);
+    }
+
+private:
+    const Form m_form;
+};
+
+struct Name {
+    std::string_view name;
+    NamedTime::Form form;
+};
+
+constexpr std::array names = {Name{"auto", &CommonTime::any}, Name{"iso8601", &CommonTime::iso},
+                              Name{"epoch", &CommonTime::epoch}};
+
+constexpr std::size_t longestPattern = 256;
+
+void copyTime(const EntryColumns& from, EntryColumns& to) noexcept {
+    to.hasTime = from.hasTime;
+    to.hasYear = from.hasYear;
+    to.time = from.time;
+    to.offset = from.offset;
+}
+
+} // namespace
+
+Result<std::shared_ptr<const TimePattern>> TimePattern::compile(const std::string& pattern) {
+    const auto name = std::ranges::find(names, pattern, &Name::name);
+    if (name != names.end()) {
+        return std::make_shared<const NamedTime>(name->form);
+    }
+    if (pattern.size() > longestPattern) {
+        return refused("is longer than " + std::to_string(longestPattern) + " bytes",
+                       "describe nothing but the time", "time_format");
+    }
+    if (pattern.find('%') == std::string::npos) {
+        return refused("'" + pattern + "' is not the form of a time",
+                       "write auto, iso8601, epoch, or directives such as %Y-%m-%d %H:%M:%S",
+                       "time_format");
+    }
+    return DirectiveTime::make(pattern);
+}
+
+std::shared_ptr<const TimePattern> TimePattern::common() {
+    static const auto pattern = std::make_shared<const NamedTime>(&CommonTime::any);
+    return pattern;
+}
+
+TimeMemo::TimeMemo(std::shared_ptr<const TimePattern> pattern) noexcept
+    : m_pattern(std::move(pattern)) {}
+
+bool TimeMemo::read(std::string_view text, EntryColumns& columns) noexcept {
+    if (!text.empty() && text.size() == m_length &&
+        std::memcmp(text.data(), m_text, m_length) == 0) {
+        copyTime(m_columns, columns);
+        return true;
+    }
+    if (!m_pattern->read(text, columns)) {
+        return false;
+    }
+    if (text.size() <= sizeof m_text) {
+        m_length = text.copy(m_text, sizeof m_text);
+        copyTime(columns, m_columns);
+    }
+    return true;
+}
+
+} // namespace zrm::host
