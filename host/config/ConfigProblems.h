@@ -18,6 +18,7 @@ public:
     void add(unsigned line, const Problem& problem);
 
     bool none() const noexcept { return m_problems.empty(); }
+    std::size_t count() const noexcept { return m_problems.size() + m_more; }
     /// "FILE:LINE: KEY: WHAT; CURE" for each of the first problems added, in the order of the
     /// lines, and how many more there are.
     std::vector<std::string> texts() const;

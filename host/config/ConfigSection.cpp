@@ -145,6 +145,29 @@ const toml::table* ConfigSection::table(std::string_view key) {
     return node == nullptr ? nullptr : node->as_table();
 }
 
+std::optional<ConfigSection> ConfigSection::section(std::string_view key) {
+    const toml::table* const found = table(key);
+    return found == nullptr ? std::nullopt : std::optional(inner(key, *found));
+}
+
+ConfigSection ConfigSection::inner(std::string_view key, const toml::table& table) const {
+    return {(m_name.empty() ? "" : m_name + '.') + std::string(key), table, m_problems};
+}
+
+void ConfigSection::refuse(std::string_view key, const std::string& what) {
+    if (find(key) != nullptr) {
+        problem(key, what, "leave it out");
+    }
+}
+
+std::vector<std::string> ConfigSection::keys() const {
+    std::vector<std::string> keys;
+    for (const auto& [key, node] : m_table) {
+        keys.emplace_back(key.str());
+    }
+    return keys;
+}
+
 std::optional<std::vector<const toml::table*>> ConfigSection::tables(std::string_view key) {
     const toml::node* const node = find(key);
     if (node == nullptr) {

@@ -36,6 +36,13 @@ public:
     /// The tables of [[key]]; none when it is missing. An empty list is not missing.
     std::optional<std::vector<const toml::table*>> tables(std::string_view key);
 
+    /// The table of a key as a section of its own; none when it is missing or of another type.
+    std::optional<ConfigSection> section(std::string_view key);
+    /// A table of a list of tables as a section.
+    ConfigSection inner(std::string_view key, const toml::table& table) const;
+    /// All keys of the table, in alphabetical order.
+    std::vector<std::string> keys() const;
+
     bool has(std::string_view key) const { return m_table.contains(key); }
     /// The line of a key's value, or of the table when the key is missing.
     unsigned line(std::string_view key) const;
@@ -45,6 +52,10 @@ public:
     void problem(unsigned line, std::string_view key, const std::string& what,
                  const std::string& cure);
 
+    /// Records a problem with a key that may not be given here.
+    void refuse(std::string_view key, const std::string& what);
+    /// How many problems the whole file has so far.
+    std::size_t problemCount() const noexcept { return m_problems.count(); }
     /// Records a problem for every key that has not been read. Call it last.
     void refuseUnknownKeys();
 

@@ -12,14 +12,12 @@ namespace zrm::host {
 struct LogConfig {
     std::vector<std::string> paths;    ///< absolute; each a path or a glob
     std::vector<std::string> excludes; ///< globs of whole paths, or of file names (without a '/')
-    char type = 'S';                   ///< the letter of the log configuration
+    std::string type = "syslog";       ///< its name
+    char letter = 'S';                 ///< the type as FurtherLog has it
     std::string format;                ///< of a text log; the command of an error log
     bool debug = false;
     FollowSettings follow; ///< isNewcomer is not set
     unsigned line = 0;     ///< of the table in the file
-
-    /// The name of the type as the file has it.
-    const char* typeName() const noexcept;
 
     bool operator==(const LogConfig&) const = default;
 };

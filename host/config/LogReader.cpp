@@ -2,10 +2,12 @@
 
 #include "base/EntryFields.h"
 #include "host/base/TimeText.h"
+#include "host/config/FormatReader.h"
 #include "host/config/OwnFiles.h"
 #include "host/config/PathPattern.h"
 #include "host/config/TimeZones.h"
 #include "host/framework/TraceCapture.h"
+#include "logtypes/FormatLogFile.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 
@@ -61,10 +63,7 @@ std::optional<std::size_t> readChoice(ConfigSection& section, std::string_view k
 }
 
 void refuse(ConfigSection& section, std::string_view key, const LogConfig& log) {
-    if (section.has(key)) {
-        section.problem(key, std::string("has no meaning for type \"") + log.typeName() + '"',
-                        "leave it out");
-    }
+    section.refuse(key, "has no meaning for type \"" + log.type + '"');
 }
 
 constexpr const char* openBracketCure =
@@ -98,12 +97,6 @@ std::pair<std::string, std::string> problemOfPath(const std::string& path) {
 }
 
 } // namespace
-
-const char* LogConfig::typeName() const noexcept {
-    return std::find_if(types.begin(), types.end(),
-                        [this](const LogType& one) { return one.letter == type; })
-        ->name;
-}
 
 LogReader::LogReader(const HostConfig& config, ConfigProblems& problems)
     : m_config(config), m_problems(problems), m_ownFiles(ownFilesOf(config)) {}
@@ -158,7 +151,7 @@ void LogReader::readPaths(ConfigSection& section, LogConfig& log) {
                             "name it once");
             continue;
         }
-        if (log.type == 'E' && PathPattern::isPattern(path)) {
+        if (log.letter == 'E' && PathPattern::isPattern(path)) {
             section.problem(line, "path", "'" + path + "' is a glob",
                             "name the one file of the error log");
         }
@@ -211,32 +204,45 @@ void LogReader::readType(ConfigSection& section, LogConfig& log) {
     for (const LogType& type : types) {
         names.push_back(type.name);
     }
+    const std::vector<const char*> formats = formatTypes();
+    names.insert(names.end(), formats.begin(), formats.end());
     if (const auto choice = readChoice(section, "type", names)) {
-        log.type = types[*choice].letter;
+        log.type = names[*choice];
+        log.letter = *choice < types.size() ? types[*choice].letter : FormatLogFile::typeLetter;
     }
-    if (log.type == 'E' && !isErrorLogSystem()) {
+    if (log.letter == 'E' && !isErrorLogSystem()) {
         section.problem("type", "an error log is read only on AIX", "write another type");
     }
 }
 
 void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
-    if (log.type != 'U' && log.type != 'E') {
-        refuse(section, "format", log);
-        static_cast<void>(section.text("format")); // a known key
+    if (log.letter != 'U' && log.letter != 'E') {
+        readEntryFormat(section, log);
         return;
     }
     const std::optional<std::string> format = section.text("format");
     if (!section.has("format")) {
-        section.problem(
-            "format", std::string("is missing, and type \"") + log.typeName() + "\" needs it",
-            log.type == 'U' ? "describe the lines, for example 'A,\"%d-%d-%d %255[^\\n]\" "
+        section.problem("format", "is missing, and type \"" + log.type + "\" needs it",
+                        log.letter == 'U'
+                            ? "describe the lines, for example 'A,\"%d-%d-%d %255[^\\n]\" "
                               ", year month day description'"
                             : "write the command that prints the error log");
         return;
     }
     log.format = format.value_or("");
-    if (format && log.type == 'U') {
+    if (format && log.letter == 'U') {
         checkTextFormat(section, log);
+    }
+}
+
+/// The format of a log that has no kind of its own.
+void LogReader::readEntryFormat(ConfigSection& section, LogConfig& log) {
+    const std::optional<FormatDescription> format = FormatReader::read(section, log.type);
+    const bool isNeeded =
+        log.letter == FormatLogFile::typeLetter || FormatReader::describes(section);
+    if (format && isNeeded) {
+        log.letter = FormatLogFile::typeLetter;
+        log.follow.format.value = FormatReader::make(section, *format);
     }
 }
 
@@ -260,7 +266,7 @@ void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
 void LogReader::readFollowing(ConfigSection& section, LogConfig& log) {
     using std::chrono::seconds;
     constexpr seconds longestWait = std::chrono::hours(1);
-    if (log.type == 'E') {
+    if (log.letter == 'E') {
         for (const char* const key : {"follow", "start", "rotate_wait", "rotated_to"}) {
             refuse(section, key, log);
         }
@@ -298,7 +304,7 @@ void LogReader::readFollowing(ConfigSection& section, LogConfig& log) {
 }
 
 void LogReader::readResumption(ConfigSection& section, LogConfig& log) {
-    if (log.type == 'E') {
+    if (log.letter == 'E') {
         refuse(section, "resume", log);
     }
     const std::optional<bool> resume = section.truth("resume");
@@ -310,7 +316,7 @@ void LogReader::readResumption(ConfigSection& section, LogConfig& log) {
 }
 
 void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
-    if (log.type == 'A' || log.type == 'E') {
+    if (log.letter == 'A' || log.letter == 'E') {
         refuse(section, "timezone", log);
     }
     const std::optional<std::string> zone = section.text("timezone");
@@ -351,10 +357,12 @@ std::vector<std::string> LogReader::namesOfFields(ConfigSection& section,
 
 /// What events have of their entries beside the rows.
 void LogReader::readKeep(ConfigSection& section, LogConfig& log) {
-    if (log.type != 'S') {
+    const bool isFormatted = log.letter == FormatLogFile::typeLetter;
+    if (log.letter != 'S' && !isFormatted) {
         refuse(section, "keep", log);
     }
-    if (log.type != 'S' && log.type != 'U') {
+    const bool isRecords = log.follow.format && log.follow.format->recordLength() != 0;
+    if (isRecords || (log.letter != 'S' && log.letter != 'U' && !isFormatted)) {
         refuse(section, "entry_bytes", log);
     }
     if (const auto names = section.texts("keep")) {

@@ -28,6 +28,7 @@ private:
                        const LogConfig& log);
     void readType(ConfigSection& section, LogConfig& log);
     void readFormat(ConfigSection& section, LogConfig& log);
+    static void readEntryFormat(ConfigSection& section, LogConfig& log);
     void checkTextFormat(ConfigSection& section, const LogConfig& log);
     void readFollowing(ConfigSection& section, LogConfig& log);
     void readResumption(ConfigSection& section, LogConfig& log);

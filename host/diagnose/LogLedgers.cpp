@@ -5,11 +5,13 @@
 #include "host/diagnose/FormatTrial.h"
 #include "host/diagnose/LogWarnings.h"
 #include "logmgr/LogManager.h"
+#include "logs/FollowSettings.h"
 #include "monitor/FollowLedger.h"
 #include "monitor/LogFile.h"
 
 #include <algorithm>
 #include <array>
+#include <cctype>
 #include <memory>
 
 namespace zrm::host {
@@ -70,7 +72,7 @@ void addSamples(LogLedgerView& view, const LogLedger& ledger) {
     for (std::size_t i = 0; i < lineCount; ++i) {
         const LogLedger::RejectedLine& line = (*lines)[i];
         view.rejected.push_back(
-            {milliseconds(line.time), std::string(line.text, line.length), std::string()});
+            {milliseconds(line.time), std::string(line.text, line.length), line.reason});
     }
     std::array<LogLedger::SkippedRange, LogLedger::mostKept> ranges;
     const std::size_t rangeCount = ledger.copySkipped(ranges.data());
@@ -82,9 +84,25 @@ void addSamples(LogLedgerView& view, const LogLedger& ledger) {
     }
 }
 
+/// A clause as a sentence.
+std::string sentence(std::string clause) {
+    if (!clause.empty()) {
+        clause.front() =
+            static_cast<char>(std::toupper(static_cast<unsigned char>(clause.front())));
+        clause += '.';
+    }
+    return clause;
+}
+
 /// Says of each rejected line why it does not fit. A format that is not learned rejects none.
 void addReasons(LogLedgerView& view) {
     if (view.rejected.empty()) {
+        return;
+    }
+    if (view.settings && view.settings->format) {
+        for (LogLedgerView::Rejected& rejected : view.rejected) {
+            rejected.reason = sentence(std::move(rejected.reason));
+        }
         return;
     }
     if (view.type != 'U') {

@@ -49,6 +49,9 @@ struct FormatDescription {
     std::string definition() const;
 };
 
+/// The types for which makeFormat has formats.
+std::vector<const char*> formatTypes();
+
 /// The format; a problem names the part of the description that is wrong in Problem::field, as in
 /// "format" or "columns.time".
 Result<std::shared_ptr<const EntryFormat>> makeFormat(const FormatDescription& description);

@@ -347,7 +347,7 @@ private:
                 shared = std::move(own);
             }
             m_found.logs.push_back(
-                {candidate.name, log.type, log.debug ? 'Y' : 'N', log.format, shared});
+                {candidate.name, log.letter, log.debug ? 'Y' : 'N', log.format, shared});
             m_found.sources[candidate.source].files.push_back(candidate.name);
         }
     }

@@ -13,6 +13,7 @@ using namespace zrm::host;
 namespace {
 
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::IsEmpty;
 
 std::vector<LogConfig> accepted(const std::string& text) {
@@ -91,7 +92,7 @@ type = "accounting"
     const LogConfig& log = logs[0];
     EXPECT_THAT(log.paths, ElementsAre("/srv/a.log", "/srv/*/app-?[0-9].log"));
     EXPECT_THAT(log.excludes, ElementsAre("*.gz", "/srv/old/*"));
-    EXPECT_EQ(log.type, 'U');
+    EXPECT_EQ(log.letter, 'U');
     EXPECT_EQ(log.format, "A,\"%d-%d-%d %255[^\\n]\" , year month day description");
     EXPECT_TRUE(log.debug);
     EXPECT_EQ(log.follow.follow, FollowSettings::Follow::file);
@@ -101,7 +102,8 @@ type = "accounting"
     EXPECT_EQ(log.follow.rotatedTo, "old");
     EXPECT_EQ(log.follow.timezone, "Europe/Berlin");
     EXPECT_GT(log.follow.zone.size(), 50U);
-    EXPECT_EQ(logs[1].type, 'A');
+    EXPECT_EQ(logs[1].type, "accounting");
+    EXPECT_EQ(logs[1].letter, 'A');
 }
 
 TEST(LogReader, WithoutAHistoryNothingIsResumed) {
@@ -174,7 +176,8 @@ TEST(LogReader, RefusesWhatTheAgentWritesItself) {
 }
 
 TEST(LogReader, SaysWhatIsWrongWithTheRest) {
-    EXPECT_THAT(refused(R"([[log]]
+    EXPECT_THAT(
+        refused(R"([[log]]
 path = '/a'
 type = "sylog"
 follow = "inode"
@@ -182,27 +185,27 @@ start = "now"
 rotate_wait = "2 s"
 timezone = "Nowhere/Town"
 exclude = "sub/x"
-entry = 1
+colour = 1
 rotated_to = ""
 )"),
-                ElementsAre("zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
-                            "\"text\", \"accounting\" or \"errorlog\"",
-                            "zrm.toml:4: log.follow: 'inode' is not a choice here; write \"name\" "
-                            "or \"file\"",
-                            "zrm.toml:5: log.start: 'now' is not a choice here; write \"end\" or "
-                            "\"beginning\"",
-                            "zrm.toml:6: log.rotate_wait: '2 s' is not a duration from a second to "
-                            "an hour; write for example \"2s\" or \"5m\"",
-                            "zrm.toml:7: log.timezone: 'Nowhere/Town' is not a time zone of this "
-                            "machine; write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
-                            "list-timezones lists them)",
-                            "zrm.toml:8: log.exclude: 'sub/x' is neither a path nor a file name; "
-                            "begin a path with '/', or write a file name without any '/'",
-                            "zrm.toml:9: log.entry: unknown key; the keys here are type, exclude, "
-                            "path, format, debug, follow, start, rotate_wait, rotated_to, resume, "
-                            "timezone, keep, entry_bytes",
-                            "zrm.toml:10: log.rotated_to: is not a directory; write the directory "
-                            "to which rotation moves older files, for example \"/var/log/old\""));
+        ElementsAre(
+            "zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
+            "\"text\", \"accounting\" or \"errorlog\"",
+            "zrm.toml:4: log.follow: 'inode' is not a choice here; write \"name\" "
+            "or \"file\"",
+            "zrm.toml:5: log.start: 'now' is not a choice here; write \"end\" or "
+            "\"beginning\"",
+            "zrm.toml:6: log.rotate_wait: '2 s' is not a duration from a second to "
+            "an hour; write for example \"2s\" or \"5m\"",
+            "zrm.toml:7: log.timezone: 'Nowhere/Town' is not a time zone of this "
+            "machine; write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
+            "list-timezones lists them)",
+            "zrm.toml:8: log.exclude: 'sub/x' is neither a path nor a file name; "
+            "begin a path with '/', or write a file name without any '/'",
+            HasSubstr(
+                "zrm.toml:9: log.colour: unknown key; the keys here are type, exclude, path, "),
+            "zrm.toml:10: log.rotated_to: is not a directory; write the directory "
+            "to which rotation moves older files, for example \"/var/log/old\""));
 }
 
 TEST(LogReader, RefusesKeysThatHaveNoMeaningForAType) {

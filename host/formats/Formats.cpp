@@ -1,0 +1,38 @@
+#include "host/formats/FormatDescription.h"
+
+#include <algorithm>
+#include <span>
+
+namespace zrm::host {
+
+namespace {
+
+/// A kind of format.
+struct Kind {
+    const char* type;
+    Result<std::shared_ptr<const EntryFormat>> (*make)(const FormatDescription& description);
+};
+
+constexpr std::span<const Kind> kinds{};
+
+} // namespace
+
+std::vector<const char*> formatTypes() {
+    std::vector<const char*> types;
+    for (const Kind& kind : kinds) {
+        types.push_back(kind.type);
+    }
+    return types;
+}
+
+Result<std::shared_ptr<const EntryFormat>> makeFormat(const FormatDescription& description) {
+    const auto kind = std::find_if(kinds.begin(), kinds.end(),
+                                   [&](const Kind& one) { return description.type == one.type; });
+    if (kind == kinds.end()) {
+        return refused("'" + description.type + "' is not a kind of format", "write another type",
+                       "type");
+    }
+    return kind->make(description);
+}
+
+} // namespace zrm::host
