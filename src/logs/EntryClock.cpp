@@ -14,6 +14,9 @@ namespace zrm {
 namespace {
 
 constexpr std::size_t stampLength = 16;
+constexpr std::size_t secondInStamp = 11;
+constexpr std::size_t behindSecond = 13;
+constexpr unsigned lastSecond = 59;
 constexpr std::int64_t quarterHour = 900;
 constexpr std::int64_t minute = 60;
 constexpr std::int64_t mostLate = 600; ///< how much a line may be late, in seconds
@@ -27,6 +30,17 @@ bool isStamp(const char* stamp) noexcept {
                        [](char character) { return character >= '0' && character <= '9'; });
 }
 
+/// The second that a stamp shows. More than 59 if it shows none, or a leap second.
+unsigned secondOf(const char* stamp) noexcept {
+    const unsigned tens = static_cast<unsigned char>(stamp[secondInStamp] - '0');
+    const unsigned units = static_cast<unsigned char>(stamp[secondInStamp + 1] - '0');
+    return units > 9 ? lastSecond + 1 : 10 * tens + units;
+}
+
+std::int64_t withinRange(std::int64_t time) noexcept {
+    return std::clamp(time, -farthest, farthest);
+}
+
 std::int64_t quarterOf(std::int64_t civil) noexcept {
     return (civil - ((civil % quarterHour) + quarterHour) % quarterHour) / quarterHour;
 }
@@ -37,18 +51,41 @@ EntryClock::EntryClock(std::shared_ptr<const FollowSettings> settings, Reading r
     : m_settings(std::move(settings)), m_reading(reading),
       m_quarter(std::numeric_limits<std::int64_t>::min()) {}
 
-/// True if the column is that of the entry before, whose time is certain.
-bool EntryClock::isRepeated(const char* stamp) const noexcept {
-    return std::memcmp(stamp, m_stamp, stampLength) == 0;
+/// True if the stamp shows the remembered minute.
+bool EntryClock::isInMinute(const char* stamp) const noexcept {
+    return std::memcmp(stamp, m_minute, secondInStamp) == 0 &&
+           std::memcmp(stamp + behindSecond, m_minute + behindSecond, stampLength - behindSecond) ==
+               0;
+}
+
+/// Remembers the minute of a stamp that has only this time. A minute is within a quarter of an
+/// hour, so that its other seconds have only one time, too.
+void EntryClock::rememberMinute(const char* stamp, std::int64_t time) noexcept {
+    const unsigned second = secondOf(stamp);
+    if (second <= lastSecond) {
+        std::memcpy(m_minute, stamp, stampLength);
+        m_minuteTime = time - second;
+    }
 }
 
 std::int64_t EntryClock::next(const EntryMoment& moment, char* stamp) noexcept {
-    const bool isColumn = moment.kind == EntryMoment::Kind::column;
     m_hadTime = true;
-    if (isColumn && isRepeated(stamp)) {
-        m_last = m_stampTime;
-        return m_stampTime;
+    if (moment.kind == EntryMoment::Kind::instant) {
+        m_last = withinRange(moment.seconds);
+        return *m_last;
     }
+    if (moment.kind == EntryMoment::Kind::column) {
+        const unsigned second = secondOf(stamp);
+        if (second <= lastSecond && isInMinute(stamp)) {
+            m_last = m_minuteTime + second;
+            return *m_last;
+        }
+    }
+    return find(moment, stamp);
+}
+
+/// The same for a time that has to be looked up. Apart from the function that runs for each entry.
+[[gnu::noinline]] std::int64_t EntryClock::find(const EntryMoment& moment, char* stamp) noexcept {
     const std::optional<Range> range = rangeOf(moment, stamp);
     if (!range) {
         m_hadTime = false;
@@ -58,9 +95,8 @@ std::int64_t EntryClock::next(const EntryMoment& moment, char* stamp) noexcept {
         return *m_last;
     }
     const std::int64_t time = choose(*range);
-    if (isColumn && range->earliest == range->latest) {
-        std::memcpy(m_stamp, stamp, stampLength);
-        m_stampTime = time;
+    if (moment.kind == EntryMoment::Kind::column && range->earliest == range->latest) {
+        rememberMinute(stamp, time);
     }
     if (time != range->earliest && moment.kind == EntryMoment::Kind::zoned) {
         ZoneTime::writeStamp(ZoneTime::toLocal(time), stamp);
@@ -72,7 +108,7 @@ std::int64_t EntryClock::next(const EntryMoment& moment, char* stamp) noexcept {
 std::optional<EntryClock::Range> EntryClock::rangeOf(const EntryMoment& moment,
                                                      const char* stamp) noexcept {
     if (moment.kind == EntryMoment::Kind::instant) {
-        const std::int64_t time = std::clamp(moment.seconds, -farthest, farthest);
+        const std::int64_t time = withinRange(moment.seconds);
         return Range{time, time};
     }
     const bool isZoned = moment.kind == EntryMoment::Kind::zoned;

@@ -70,16 +70,18 @@ public:
     std::optional<Range> rangeOf(const EntryMoment& moment, const char* stamp) noexcept;
 
 private:
-    bool isRepeated(const char* stamp) const noexcept;
+    bool isInMinute(const char* stamp) const noexcept;
+    std::int64_t find(const EntryMoment& moment, char* stamp) noexcept;
+    void rememberMinute(const char* stamp, std::int64_t time) noexcept;
     std::int64_t choose(const Range& range) const noexcept;
 
     const std::shared_ptr<const FollowSettings> m_settings;
     const Reading m_reading;
     std::optional<std::int64_t> m_last; ///< time of the entry before
     bool m_hadTime = true;
-    // What the entry before showed, if that has only one time.
-    char m_stamp[16] = {};
-    std::int64_t m_stampTime = 0;
+    // The minute that an entry's column showed last, if each of its seconds has only one time.
+    char m_minute[16] = {}; ///< as a stamp
+    std::int64_t m_minuteTime = 0;
     // The quarter of an hour in which times were looked up last.
     std::int64_t m_quarter;
     bool m_isZoned = false;

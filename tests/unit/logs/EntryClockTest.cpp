@@ -119,6 +119,44 @@ TEST_F(EntryClockTest, AnEntryWithoutATimeHasThatOfTheOneBefore) {
     EXPECT_FALSE(m_clock.rangeOf({}, invalid.data()));
 }
 
+TEST_F(EntryClockTest, TimesOfOneMinuteAreThoseOfAnyOther) {
+    std::vector<CivilTime> times;
+    for (const unsigned hour : {0U, 1U, 3U, 4U, 23U}) {
+        for (const unsigned second : {9U, 8U, 8U, 59U, 60U, 0U, 30U}) {
+            times.push_back({2006, 10, 29, hour, 14, second});
+            times.push_back({2006, 3, 26, hour, 14, second});
+            times.push_back({2006, 3, 26, hour, 15, second});
+        }
+    }
+    for (std::size_t step : {1U, 3U}) { // alternating and one after the other
+        for (std::size_t first = 0; first < step; ++first) {
+            for (std::size_t at = first; at < times.size(); at += step) {
+                EntryClock alone(nullptr);
+                std::string stamp = stampOf(times[at]);
+                EXPECT_EQ(next(times[at]), alone.next({}, stamp.data())) << stamp;
+            }
+        }
+    }
+}
+
+TEST_F(EntryClockTest, AMinuteThatIsRepeatedIsNotRemembered) {
+    EXPECT_EQ(autumn(2, 30, 10), -1790);
+    EXPECT_EQ(autumn(2, 30, 11), -1789);
+    EXPECT_EQ(autumn(3, 0, 0), 3600);
+    EXPECT_EQ(autumn(2, 59, 50), 3590);
+    EXPECT_EQ(autumn(2, 59, 51), 3591);
+}
+
+TEST_F(EntryClockTest, AStampThatIsNotATimeIsNotOfTheMinuteBefore) {
+    EXPECT_EQ(autumn(3, 0, 0), 3600);
+    std::string other = "10610290300";
+    for (const char* const end : {"x0000", "0x000", ":0000", "0:000", "00 00", "0000 "}) {
+        std::string stamp = other + end;
+        EXPECT_EQ(m_clock.next({}, stamp.data()), fallBack + 3600) << stamp;
+        EXPECT_FALSE(m_clock.hadTime()) << stamp;
+    }
+}
+
 TEST_F(EntryClockTest, RangesHoldBothPasses) {
     const auto range = m_clock.rangeOf({}, stampOf({2006, 10, 29, 2, 30, 0}).data());
     EXPECT_EQ(range->earliest, fallBack - 1800);
