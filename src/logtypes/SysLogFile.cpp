@@ -7,6 +7,7 @@
 #include "framework/locale.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
+#include "logtypes/MonthNames.h"
 
 #include <algorithm>
 #include <array>
@@ -23,28 +24,6 @@ namespace {
 
 TRC1_Anchor anchor{"SysLogFile.cpp"};
 
-constexpr std::string_view monthNames = "JanFebMarAprMayJunJulAugSepOctNovDec";
-
-constexpr std::uint32_t threeLetters(const char* text) {
-    std::uint32_t letters = 0;
-    for (int at = 0; at < 3; ++at) {
-        letters = letters << 8U | static_cast<unsigned char>(text[at]);
-    }
-    return letters;
-}
-
-constexpr std::size_t monthCount = monthNames.size() / 3;
-
-constexpr std::array<std::uint32_t, monthCount> lettersOfMonths() {
-    std::array<std::uint32_t, monthCount> letters{};
-    for (std::size_t month = 0; month < monthCount; ++month) {
-        letters[month] = threeLetters(monthNames.data() + 3 * month);
-    }
-    return letters;
-}
-
-constexpr auto months = lettersOfMonths();
-
 constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::size_t timeLength = 15; // Mmm dd hh:mm:ss
 constexpr std::size_t yearLength = 3;
@@ -58,20 +37,6 @@ constexpr std::ptrdiff_t longestHeader =
 /// Within this many, neither overruns its own column.
 constexpr std::ptrdiff_t shortHeader = timeLength + std::min(sizeof(zrm_rmlogent_data_t::entrysys),
                                                              sizeof(zrm_rmlogent_data_t::entrysrc));
-
-/// The month's number, 1 to 12, or 0 if the text does not begin with a month. Tries `likely` first.
-unsigned monthNumber(const char* text, unsigned likely) {
-    const std::uint32_t letters = threeLetters(text);
-    if (likely - 1 < months.size() && months[likely - 1] == letters) {
-        return likely;
-    }
-    for (unsigned month = 0; month < months.size(); ++month) {
-        if (months[month] == letters) {
-            return month + 1;
-        }
-    }
-    return 0;
-}
 
 unsigned twoDigits(const char* text) {
     return static_cast<unsigned>((text[0] - '0') * 10 + (text[1] - '0'));
@@ -141,7 +106,8 @@ char* copyField(char* out, char* text, unsigned int max, const char* limit, cons
 
 } // namespace
 
-SysLogFile::SysLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, chainHead) {
+SysLogFile::SysLogFile(const ValidLog& log, LogFile* chainHead)
+    : LogFile(log, chainHead), m_lineClock(followSettings()) {
     TraceScope trace(anchor);
     if (trace.isOn(TRC1_DETAIL)) {
         printSelf();
@@ -149,7 +115,8 @@ SysLogFile::SysLogFile(const ValidLog& log, LogFile* chainHead) : LogFile(log, c
     startThread();
 }
 
-SysLogFile::SysLogFile(const ValidLog& log, Unmonitored) : LogFile(log, nullptr) {
+SysLogFile::SysLogFile(const ValidLog& log, Unmonitored)
+    : LogFile(log, nullptr), m_lineClock(followSettings()) {
     const TraceScope trace(anchor);
 }
 
@@ -215,7 +182,7 @@ char* SysLogFile::formatEntryTime(char* out, char* line, void* reportState) {
     // A time cut off by the end of the line is not a time. The newline is not its last digit.
     const bool isWhole =
         std::memchr(line, '\0', timeLength) == nullptr && line[timeLength - 1] != '\n';
-    const unsigned month = isWhole ? monthNumber(line, twoDigits(now + yearLength)) : 0;
+    const unsigned month = isWhole ? MonthNames::number(line, twoDigits(now + yearLength)) : 0;
     if (month == 0) {
         return trace.result(line + std::strlen(line));
     }

@@ -1,13 +1,12 @@
 #ifndef ZRM_SYS_LOG_FILE_H
 #define ZRM_SYS_LOG_FILE_H
 
+#include "logtypes/SyslogClock.h"
 #include "monitor/LogFile.h"
 
 #include <memory>
 
 namespace zrm {
-
-struct SyslogTime;
 
 /// The state of one report on a syslog file.
 struct SyslogBufferInfo : _LogBufferInfo {
@@ -57,12 +56,13 @@ protected:
 private:
     // For a log that is followed.
     char* formatFollowedTime(char* out, char* line, void* reportState) const;
-    void writeFollowedTime(char* out, const SyslogTime& time, void* reportState) const;
     long formatFollowedEntry(char* line, EntryRow& row, void* reportState);
 
     char* previousLine(SyslogBufferInfo& state);
     bool cutLongLine(SyslogBufferInfo& state);
     bool refill(SyslogBufferInfo& state);
+
+    SyslogClock m_lineClock; ///< of a log that is followed; only for the log's own row
 };
 
 } // namespace zrm

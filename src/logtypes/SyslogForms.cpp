@@ -1,15 +1,28 @@
 #include "logtypes/SyslogForms.h"
 
+#include "logtypes/MonthNames.h"
+
 #include <algorithm>
+#include <array>
 
 namespace zrm {
 
 namespace {
 
-constexpr std::string_view monthNames = "JanFebMarAprMayJunJulAugSepOctNovDec";
 constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::string_view byteOrderMark = "\xEF\xBB\xBF";
-constexpr std::string_view blanks = " \t\v\f\r";
+using Characters = std::array<bool, 256>; ///< by code
+
+constexpr Characters setOf(std::string_view members) {
+    Characters characters{};
+    for (const char member : members) {
+        characters[static_cast<unsigned char>(member)] = true;
+    }
+    return characters;
+}
+
+constexpr Characters blanks = setOf(" \t\v\f\r");
+constexpr Characters sourceEnds = setOf(": \t\v\f\r");
 
 bool isDigit(char character) {
     return character >= '0' && character <= '9';
@@ -63,12 +76,41 @@ private:
     bool m_isGood = true;
 };
 
-/// Removes the text up to the next blank, and the blank.
+bool isIn(const Characters& set, char character) {
+    return set[static_cast<unsigned char>(character)];
+}
+
+bool isRepeatNotice(std::string_view text) {
+    return !text.empty() && text[0] == repeatNotice[0] && text.starts_with(repeatNotice);
+}
+
+std::string_view behind(std::string_view text, std::size_t at) {
+    return {text.data() + at, text.size() - at};
+}
+
+/// Removes the text up to the next blank, and the blank. Words are short, so a loop is faster than
+/// a call.
 std::string_view takeWord(std::string_view& text) {
-    const std::size_t end = std::min(text.find(' '), text.size());
-    const std::string_view word = text.substr(0, end);
-    text.remove_prefix(std::min(end + 1, text.size()));
+    std::size_t end = 0;
+    while (end < text.size() && text[end] != ' ') {
+        ++end;
+    }
+    const std::string_view word(text.data(), end);
+    text = behind(text, end < text.size() ? end + 1 : end);
     return word;
+}
+
+/// Removes the source of a line, with the colon and the blank behind it.
+std::string_view takeSource(std::string_view& text) {
+    std::size_t end = 0;
+    while (end < text.size() && !isIn(sourceEnds, text[end])) {
+        ++end;
+    }
+    const std::string_view source(text.data(), end);
+    end += end < text.size() && text[end] == ':' ? 1 : 0;
+    end += end < text.size() && isIn(blanks, text[end]) ? 1 : 0;
+    text = behind(text, end);
+    return source;
 }
 
 /// The same for a field of RFC 5424, where "-" means none.
@@ -79,13 +121,11 @@ std::string_view takeField(std::string_view& text) {
 
 bool readTraditional(std::string_view text, SyslogTime& time) {
     // Mmm dd hh:mm:ss
-    const std::size_t month =
-        text.size() < 4 ? std::string_view::npos : monthNames.find(text.substr(0, 3));
-    if (month == std::string_view::npos || month % 3 != 0 || text[3] != ' ') {
+    time.time.month = text.size() < 4 || text[3] != ' ' ? 0 : MonthNames::number(text.data(), 0);
+    if (time.time.month == 0) {
         return false;
     }
-    time.time.month = static_cast<unsigned>(month / 3) + 1;
-    Reader reader(text.substr(4));
+    Reader reader(behind(text, 4));
     if (reader.rest().starts_with(' ')) {
         reader.literal(' ');
         time.time.day = reader.number(1);
@@ -138,13 +178,15 @@ bool readIso(std::string_view text, SyslogTime& time) {
 
 /// The length of "<PRI>"; 0 if the text does not begin with one.
 std::size_t priorityLength(std::string_view text) {
+    constexpr std::size_t mostDigits = 3;
     if (!text.starts_with('<')) {
         return 0;
     }
-    const std::size_t end = text.find('>');
-    const bool isNumber = end != std::string_view::npos && end >= 2 && end <= 4 &&
-                          std::all_of(text.begin() + 1, text.begin() + end, isDigit);
-    return isNumber ? end + 1 : 0;
+    std::size_t end = 1;
+    while (end < text.size() && end <= mostDigits && isDigit(text[end])) {
+        ++end;
+    }
+    return end > 1 && end < text.size() && text[end] == '>' ? end + 1 : 0;
 }
 
 /// Removes the structured data of RFC 5424 and the blank behind it. All of it, if it has no end.
@@ -190,54 +232,51 @@ SyslogParts splitRfc5424(std::string_view text) {
 
 std::optional<unsigned> SyslogForms::priority(std::string_view line) noexcept {
     constexpr unsigned mostPriority = 191;
+    const std::size_t length = priorityLength(line);
     unsigned number = 0;
-    for (std::size_t at = 1; at + 1 < priorityLength(line); ++at) {
+    for (std::size_t at = 1; at + 1 < length; ++at) {
         number = number * 10 + static_cast<unsigned>(line[at] - '0');
     }
-    return priorityLength(line) > 0 && number <= mostPriority ? std::optional(number)
-                                                              : std::nullopt;
+    return length > 0 && number <= mostPriority ? std::optional(number) : std::nullopt;
+}
+
+SyslogStart SyslogForms::start(std::string_view line) noexcept {
+    const std::size_t priority = priorityLength(line);
+    const bool hasVersion = priority > 0 && behind(line, priority).starts_with("1 ");
+    return {hasVersion ? priority + 2 : priority, hasVersion};
 }
 
 SyslogTime SyslogForms::recognise(std::string_view line) noexcept {
+    const SyslogStart start = SyslogForms::start(line);
+    const std::string_view text = behind(line, start.at);
     SyslogTime time;
-    const std::size_t priority = priorityLength(line);
-    std::string_view text = line.substr(priority);
-    if (priority > 0 && text.starts_with("1 ")) {
-        text.remove_prefix(2);
+    if (start.isRfc5424) {
         if (text.starts_with("- ")) {
             time.end = 2;
         } else if (!readIso(text, time)) {
             return {};
         }
         time.form = SyslogTime::Form::rfc5424;
-        time.end += priority + 2;
+        time.end += start.at;
         return time;
     }
     if (readTraditional(text, time) || readIso(text, time = {})) {
-        time.end += priority;
+        time.end += start.at;
         return time;
     }
     return {};
 }
 
-SyslogParts SyslogForms::split(std::string_view line, const SyslogTime& time) noexcept {
-    std::string_view text = line.substr(time.end);
-    if (time.form == SyslogTime::Form::rfc5424) {
+SyslogParts SyslogForms::split(std::string_view line, const SyslogHead& head) noexcept {
+    std::string_view text = behind(line, head.end);
+    if (head.form == SyslogHead::Form::rfc5424) {
         return splitRfc5424(text);
     }
     SyslogParts parts;
-    if (time.form != SyslogTime::Form::none && !text.starts_with(repeatNotice)) {
+    if (head.form != SyslogHead::Form::none && !isRepeatNotice(text)) {
         parts.host = takeWord(text);
-        if (!text.starts_with(repeatNotice)) {
-            const std::size_t end = std::min(text.find_first_of(": \t\v\f\r"), text.size());
-            parts.source = text.substr(0, end);
-            text.remove_prefix(end);
-            if (text.starts_with(':')) {
-                text.remove_prefix(1);
-            }
-            if (!text.empty() && blanks.find(text[0]) != std::string_view::npos) {
-                text.remove_prefix(1);
-            }
+        if (!isRepeatNotice(text)) {
+            parts.source = takeSource(text);
         }
     }
     parts.description = text;

@@ -10,8 +10,8 @@
 
 namespace zrm {
 
-/// The beginning of a syslog line, up to its time.
-struct SyslogTime {
+/// What a syslog line begins with, up to its time.
+struct SyslogHead {
     enum class Form : unsigned char {
         none,        ///< not recognised
         traditional, ///< "Oct  5 07:03:09 host source: message"
@@ -20,11 +20,21 @@ struct SyslogTime {
     };
 
     Form form = Form::none;
+    std::size_t end = 0; ///< where the rest of the line begins
+};
+
+/// The same with the time.
+struct SyslogTime : SyslogHead {
     bool hasTime = false; ///< false also for "-" in place of the time
     bool hasYear = false;
     CivilTime time;
     std::optional<std::int32_t> offset; ///< of its zone from UTC in seconds, if it says
-    std::size_t end = 0;                ///< where the rest of the line begins
+};
+
+/// Where the time of a syslog line begins: behind its priority and version, if it has them.
+struct SyslogStart {
+    std::size_t at = 0;
+    bool isRfc5424 = false;
 };
 
 /// The rest of a syslog line. Parts that it does not have are empty.
@@ -41,11 +51,13 @@ struct SyslogParts {
 /// priority. Stateless; any thread.
 namespace SyslogForms {
 
-/// `line` is without its newline.
+/// `line` is without its newline, here and below.
+SyslogStart start(std::string_view line) noexcept;
+
 SyslogTime recognise(std::string_view line) noexcept;
 
 /// The rest of a line whose beginning was recognised. A line that was not is all description.
-SyslogParts split(std::string_view line, const SyslogTime& time) noexcept;
+SyslogParts split(std::string_view line, const SyslogHead& head) noexcept;
 
 /// The number in the line's "<PRI>": facility * 8 + severity. None if it has none, or no valid one.
 std::optional<unsigned> priority(std::string_view line) noexcept;

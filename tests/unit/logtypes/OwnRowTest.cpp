@@ -1,5 +1,7 @@
 // After each line, the row that a log keeps equals a row built from scratch.
 
+#include "logs/FollowSettings.h"
+#include "logs/FurtherLogs.h"
 #include "logtypes/AdminLogFile.h"
 
 #include "AccountingRecords.h"
@@ -140,6 +142,23 @@ TEST_F(OwnRowOfAUserLog, EqualsAFreshRow) {
         const std::string day = random.upTo(9) == 0 ? "no day" : std::to_string(random.upTo(40));
         expectSameRow(*m_log, day + " " + random.text(20) + " " + random.text(50) + " " +
                                   random.text(random.upTo(3) == 0 ? 500 : 40) + "\n");
+    }
+}
+
+TEST_F(OwnRowOfASyslog, OfAFollowedLogEqualsAFreshRow) {
+    struct FollowedLog : SysLogFile {
+        explicit FollowedLog(const ValidLog& log) : SysLogFile(log, Unmonitored{}) {}
+    };
+    FollowedLog log(ValidLog(FurtherLog{m_path, 'S', 'N', "",
+                                        std::make_shared<const FollowSettings>(FollowSettings{})}));
+    constexpr std::array<const char*, 3> heads = {"", "2006-10-05T11:59:58.25Z ",
+                                                  "<34>1 2006-10-05T11:59:58Z "};
+    Random random(5);
+    for (int i = 0; i < 4000 && !HasFailure(); ++i) {
+        const std::string line = syslogLine(random);
+        const char* const head = heads[random.upTo(2)];
+        expectSameRow(
+            log, *head == '\0' ? line : head + line.substr(std::min<std::size_t>(16, line.size())));
     }
 }
 
