@@ -1,7 +1,6 @@
 #include "host/events/ContextDemand.h"
 
 #include <algorithm>
-#include <atomic>
 #include <mutex>
 #include <utility>
 #include <vector>
@@ -19,7 +18,6 @@ struct Demand {
 struct Demands {
     std::mutex mutex;
     std::vector<Demand> all;
-    std::atomic<std::uint64_t> generation{1};
 };
 
 /// Never destroyed: log threads may still run while the process exits.
@@ -35,7 +33,7 @@ ContextDemand::Hold::Hold(std::optional<std::string> log, std::size_t entries)
     if (m_entries > 0) {
         const std::lock_guard guard(demands().mutex);
         demands().all.push_back({m_log, m_entries});
-        ++demands().generation;
+        ++m_generation;
     }
 }
 
@@ -44,7 +42,7 @@ ContextDemand::Hold::~Hold() {
         const std::lock_guard guard(demands().mutex);
         std::vector<Demand>& all = demands().all;
         all.erase(std::find(all.begin(), all.end(), Demand{m_log, m_entries}));
-        ++demands().generation;
+        ++m_generation;
     }
 }
 
@@ -55,10 +53,6 @@ std::size_t ContextDemand::of(std::string_view log) {
         most = !demand.log || *demand.log == log ? std::max(most, demand.entries) : most;
     }
     return most;
-}
-
-std::uint64_t ContextDemand::generation() noexcept {
-    return demands().generation.load(std::memory_order_acquire);
 }
 
 } // namespace zrm::host

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_CONTEXT_DEMAND_H
 #define ZRM_HOST_CONTEXT_DEMAND_H
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -29,7 +30,12 @@ public:
     static std::size_t of(std::string_view log);
 
     /// Changes when the demand does. Costs one read of memory that is rarely written.
-    static std::uint64_t generation() noexcept;
+    static std::uint64_t generation() noexcept {
+        return m_generation.load(std::memory_order_acquire);
+    }
+
+private:
+    static inline constinit std::atomic<std::uint64_t> m_generation{1};
 };
 
 } // namespace zrm::host

@@ -68,6 +68,12 @@ std::string contextText(const EntryContext& context, std::size_t entries) {
 
 } // namespace
 
+void EntryEvents::drop() noexcept {
+    m_situations.clear();
+    m_details.clear();
+    m_rows.clear();
+}
+
 void EntryEvents::describe(LogEntry& entry, const EntryContext& context) {
     const EntryKeep& keep = entry.keep();
     const SituationLabel* last = nullptr;

@@ -34,9 +34,9 @@ public:
     /// with the entry.
     void describe(LogEntry& entry, const EntryContext& context);
     void clear() noexcept {
-        m_situations.clear();
-        m_details.clear();
-        m_rows.clear();
+        if (!empty()) {
+            drop();
+        }
     }
 
     bool empty() const noexcept { return m_situations.empty(); }
@@ -51,6 +51,8 @@ public:
     }
 
 private:
+    void drop() noexcept;
+
     std::size_t m_rowSize = 0;
     std::vector<std::shared_ptr<const SituationLabel>> m_situations;
     std::vector<char> m_rows;

@@ -33,12 +33,21 @@ public:
 
     /// Keeps the entry that begins for the events of later ones, if a situation wants that.
     void noteContext() {
-        if (ContextDemand::generation() != demand) {
-            demand = ContextDemand::generation();
-            context.keep(ContextDemand::of(log->name()));
+        if (ContextDemand::generation() != demand) [[unlikely]] {
+            noteDemand();
         }
+        if (context.isKept()) {
+            addContext();
+        }
+    }
+    // Apart from what runs for each entry.
+    [[gnu::noinline]] void noteDemand() {
+        demand = ContextDemand::generation();
+        context.keep(ContextDemand::of(log->name()));
+    }
+    [[gnu::noinline]] void addContext() {
         const LogEntry* const entry = LogEntry::ofThisThread;
-        if (context.isKept() && entry != nullptr) {
+        if (entry != nullptr) {
             context.add(entry->text());
         }
     }
