@@ -17,11 +17,13 @@ class AgentProcess:
     """A running agent on the given logs; ends with the `with` block."""
 
     def __init__(self, program, directory, logs, situations, log_lines=None, **settings):
+        program = [program] if isinstance(program, str) else program
         self.directory = Path(directory)
         self.logs = logs
-        kinds = log_lines or {}  # what the configuration says of a log beside its path
+        kinds = log_lines or {}  # what the configuration says of a log beside its path; None: nothing
+        lines = [(log, kinds.get(log, ";N ;S")) for log in logs]
         (self.directory / "logs.conf").write_text(
-            "".join(f"{log} {kinds.get(log, ';N ;S')}\n" for log in logs)
+            "".join(f"{log} {kind}\n" for log, kind in lines if kind)
         )
         config = self.directory / "zrm.toml"
         config.write_text(self._configuration(situations, **settings))
@@ -29,7 +31,7 @@ class AgentProcess:
         self.last_event_time = None
         self.trace = open(self.directory / "trace", "wb")
         self.process = subprocess.Popen(
-            [program, "--config", str(config)],
+            [*program, "--config", str(config)],
             stdin=subprocess.DEVNULL,
             stdout=subprocess.PIPE,
             stderr=self.trace,
@@ -38,14 +40,14 @@ class AgentProcess:
         self.reader = threading.Thread(target=self._count_events, daemon=True)
         self.reader.start()
 
-    def _configuration(self, situations, http=False, max_rows=None, history=False, sink="-"):
+    def _configuration(self, situations, http=False, max_rows=None, history=False, sink="-", followed=""):
         text = f'state_directory = "{self.directory}/state"\n'
         text += f'[agent]\nlog_config = "{self.directory}/logs.conf"\n'
         if max_rows is not None:
             text += f"max_rows = {max_rows}\n"
         text += f'[http]\nlisten = "{"127.0.0.1:0" if http else ""}"\n'
         text += f"[history]\nenabled = {'true' if history else 'false'}\n"
-        text += f'[[sink]]\ntype = "jsonl"\npath = "{sink}"\n'
+        text += f'[[sink]]\ntype = "jsonl"\npath = "{sink}"\n{followed}'
         for situation in situations:
             keys = {"text": "benchmark", "severity": "info", **situation}
             text += "[[situation]]\n"
