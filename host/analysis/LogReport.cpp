@@ -69,7 +69,7 @@ std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entr
     std::unique_ptr<LogReport> report(new LogReport(std::move(query), entries));
     if (log->followSettings() != nullptr) {
         report->m_path = log->fileNameLocal();
-        report->m_rotatedTo = log->followSettings()->rotatedTo;
+        report->m_settings = log->followSettings();
         report->m_reader = EntryReader::of(*log);
     }
     return report;
@@ -86,8 +86,9 @@ LogReport::Result LogReport::run(Receiver& receiver) {
 
 LogReport::Result LogReport::runFollowed(Receiver& receiver) {
     const TraceSilence silence; // a line that does not fit is counted, not traced
-    FollowedReport report(m_path, *m_reader,
-                          {m_query.from, m_query.to, m_query.limit, m_rotatedTo});
+    FollowedReport report(
+        m_path, *m_reader,
+        {m_query.from, m_query.to, m_query.limit, m_settings->rotatedTo, m_settings->join.value});
     FilteredRows rows(m_filter, receiver);
     report.run(rows);
     return {rows.count,

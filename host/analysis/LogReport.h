@@ -16,6 +16,7 @@ class TableManager;
 
 namespace zrm {
 class EntryReader;
+struct FollowSettings;
 } // namespace zrm
 
 namespace zrm::host {
@@ -78,7 +79,7 @@ private:
     // Of a followed log.
     std::unique_ptr<EntryReader> m_reader; ///< null: the log is not followed
     std::string m_path;                    ///< in the local code page
-    std::string m_rotatedTo;               ///< see FollowSettings
+    std::shared_ptr<const FollowSettings> m_settings;
 };
 
 } // namespace zrm::host

@@ -212,11 +212,15 @@ std::unique_ptr<Generation> FollowedReport::open(File& file) {
 
 /// The time of the first entry in the first block; empty if there is none.
 std::string FollowedReport::firstTime(Generation& generation) {
-    EntryBlock block(m_entries.recordLength());
+    EntryBlock block(m_entries.recordLength(), m_options.join.get());
     block.start(0, {});
     const EntryBlock::Fill filled = block.fill(generation);
-    char* entry = filled == EntryBlock::Fill::more ? block.next() : nullptr;
-    for (; entry != nullptr; entry = block.next()) {
+    const auto next = [&] {
+        char* const entry = block.next();
+        return entry == nullptr && block.isWaiting() ? block.endWaiting() : entry;
+    };
+    char* entry = filled == EntryBlock::Fill::more ? next() : nullptr;
+    for (; entry != nullptr; entry = next()) {
         if (m_entries.read(entry, block.text(), m_newest.data(), m_row)) {
             return std::string(timeOf(m_row));
         }
@@ -261,7 +265,7 @@ void FollowedReport::give(const zrm_rmlogent_data_t& row, Receiver& receiver) {
 }
 
 void FollowedReport::readBackward(Generation& generation, File& file, Receiver& receiver) {
-    BackwardBlock block(m_entries.recordLength());
+    BackwardBlock block(m_entries.recordLength(), m_options.join.get());
     block.start(file.size);
     ReportedEntry judged(m_entries);
     std::string newest = m_newest;
@@ -300,7 +304,7 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
 
 /// Keeps the newest rows, as many as may still be given, and gives them at the end.
 void FollowedReport::readForward(Generation& generation, File& file, Receiver& receiver) {
-    EntryBlock block(m_entries.recordLength());
+    EntryBlock block(m_entries.recordLength(), m_options.join.get());
     block.start(0, {});
     const std::size_t mostRows = m_options.limit - m_given;
     std::deque<zrm_rmlogent_data_t> kept;
@@ -320,7 +324,7 @@ void FollowedReport::readForward(Generation& generation, File& file, Receiver& r
     for (EntryBlock::Fill filled = EntryBlock::Fill::more; !isPast;) {
         filled = block.fill(generation);
         if (filled == EntryBlock::Fill::end) {
-            if (char* const entry = block.rest()) {
+            while (char* const entry = block.rest()) {
                 look(entry);
             }
             break;

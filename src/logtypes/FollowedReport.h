@@ -16,6 +16,7 @@
 namespace zrm {
 
 class EntryReader;
+class LineJoin;
 
 /// Reads a followed log for a report: the file that has its name and its older generations, the
 /// newest entry first. A line that does not fit, or a file that cannot be read, does not end it. A
@@ -41,8 +42,9 @@ public:
     struct Options {
         std::string from; ///< time stamp of 16 characters, as `to`
         std::string to;
-        std::size_t limit = 1;      ///< rows, at least 1
-        std::string rotatedTo = {}; ///< see FollowSettings
+        std::size_t limit = 1;                          ///< rows, at least 1
+        std::string rotatedTo = {};                     ///< see FollowSettings
+        std::shared_ptr<const LineJoin> join = nullptr; ///< which lines make an entry
     };
 
     struct File {

@@ -171,7 +171,8 @@ void* FormatLogFile::startReportRequest(void* /*thresholds*/) {
         return trace.result(static_cast<void*>(nullptr));
     }
     report->entries = EntryReader::of(*this);
-    report->block = std::make_unique<BackwardBlock>(format().recordLength());
+    report->block = std::make_unique<BackwardBlock>(format().recordLength(),
+                                                    followSettings()->join.value.get());
     report->block->start(status.size);
     BrevanTime::generateCurrentTimestamp(report->newest);
     return trace.result(static_cast<void*>(report.release()));

@@ -11,42 +11,41 @@ namespace zrm {
 namespace {
 
 constexpr std::size_t largestBlock = 256 * 1024;
-constexpr std::size_t longestLine = 2046; ///< as it is given, without its newline
 constexpr std::size_t longestText = EntryKeep::longestText;
-
-/// The position behind the last newline among the first `size` bytes; 0 if there is none.
-std::size_t behindLastNewline(const char* text, std::size_t size) noexcept {
-    while (size > 0 && text[size - 1] != '\n') {
-        --size;
-    }
-    return size;
-}
 
 } // namespace
 
-BackwardBlock::BackwardBlock(std::size_t recordLength)
-    : m_recordLength(recordLength),
+BackwardBlock::BackwardBlock(std::size_t recordLength, const LineJoin* join)
+    : m_recordLength(recordLength), m_join(recordLength == 0 ? join : nullptr),
       m_blockSize(recordLength == 0 ? largestBlock : largestBlock - largestBlock % recordLength),
-      m_block(new char[largestBlock + longestText + 2]), m_line(new char[longestLine + 2]) {}
+      m_block(new char[largestBlock + longestText + 2 + (join != nullptr ? roomForRun : 0)]),
+      m_line(new char[longestLine + 2]) {}
 
 void BackwardBlock::start(std::int64_t size) noexcept {
-    m_end = 0;
+    m_end = m_run = 0;
+    m_begins.clear();
     m_isCut = false;
     m_offset = m_recordLength == 0 ? size : size - size % static_cast<std::int64_t>(m_recordLength);
 }
 
-/// Drops all but the beginning of the line that is in memory. Of NUL bytes at its beginning one
-/// stays: if the line began earlier, its text ends there.
-void BackwardBlock::keepBeginning() noexcept {
-    const char* const text = m_block.get();
+/// How many NUL bytes at the beginning of the block need not be kept. One stays: if the line began
+/// earlier, its text ends there.
+std::size_t BackwardBlock::superfluousZeros() const noexcept {
+    const std::size_t end = m_end - m_run;
     std::size_t zeros = 0;
-    while (zeros < m_end && text[zeros] == '\0') {
+    while (zeros < end && m_block[zeros] == '\0') {
         ++zeros;
     }
-    zeros -= zeros > 0 ? 1 : 0;
-    std::memmove(m_block.get(), text + zeros, m_end - zeros);
+    return zeros - (zeros > 0 ? 1 : 0);
+}
+
+/// Drops all but the beginning of the line that is in memory, unless lines behind it may belong to
+/// it.
+void BackwardBlock::keepBeginning() noexcept {
+    const std::size_t zeros = superfluousZeros();
+    std::memmove(m_block.get(), m_block.get() + zeros, m_end - zeros);
     m_end -= zeros;
-    if (m_end > longestText + 1) {
+    if (m_run == 0 && m_end > longestText + 1) {
         m_end = longestText + 1;
         m_isCut = true;
     }
@@ -65,7 +64,7 @@ BackwardBlock::Fill BackwardBlock::fill(Generation& file) noexcept {
         const std::ptrdiff_t count = file.readAt(m_block.get() + done, length - done,
                                                  from + static_cast<std::int64_t>(done));
         if (count <= 0) {
-            m_end = 0;
+            m_end = m_run = 0;
             return count < 0 ? Fill::failed : Fill::changed;
         }
         done += static_cast<std::size_t>(count);
@@ -75,13 +74,16 @@ BackwardBlock::Fill BackwardBlock::fill(Generation& file) noexcept {
     return Fill::more;
 }
 
-char* BackwardBlock::next() noexcept {
+char* BackwardBlock::next() {
     if (m_recordLength != 0) {
         return nextRecord();
     }
+    if (m_join != nullptr) {
+        return nextJoined();
+    }
     while (m_end > 0) {
         // The newline before m_end is the line's own, and does not begin it.
-        const std::size_t begin = behindLastNewline(m_block.get(), m_end - 1);
+        const std::size_t begin = behindNewlineBefore(m_end - 1);
         if (begin == 0 && m_offset > 0) {
             return nullptr;
         }
@@ -92,6 +94,14 @@ char* BackwardBlock::next() noexcept {
         }
     }
     return nullptr;
+}
+
+/// The position behind the last newline before `end`; 0 if there is none.
+std::size_t BackwardBlock::behindNewlineBefore(std::size_t end) const noexcept {
+    while (end > 0 && m_block[end - 1] != '\n') {
+        --end;
+    }
+    return end;
 }
 
 char* BackwardBlock::nextRecord() noexcept {
@@ -122,8 +132,11 @@ char* BackwardBlock::line(std::size_t begin, std::size_t end) noexcept {
         text[end] = '\0'; // the first byte of a line that was given before
         return text + begin;
     }
-    const std::size_t given = std::min(length, longestLine);
-    std::memcpy(m_line.get(), text + begin, given);
+    return copyLine({text + begin, length});
+}
+
+char* BackwardBlock::copyLine(std::string_view line) noexcept {
+    const std::size_t given = line.copy(m_line.get(), longestLine);
     m_line[given] = '\n';
     m_line[given + 1] = '\0';
     return m_line.get();

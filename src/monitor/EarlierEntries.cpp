@@ -17,11 +17,15 @@ constexpr int entriesPerClock = 1024; ///< entries between two looks at the cloc
 /// Gives the whole entries of a file that begin in a range of it.
 class RangeReader {
 public:
-    RangeReader(Generation& file, std::int64_t from, std::int64_t to, std::size_t recordLength)
-        : m_file(file), m_to(to), m_block(recordLength), m_isLines(recordLength == 0),
+    RangeReader(Generation& file, std::int64_t from, std::int64_t to, std::size_t recordLength,
+                const LineJoin* join)
+        : m_file(file), m_to(to), m_block(recordLength, join), m_isLines(recordLength == 0),
           // The reading may begin within a line.
           m_isFirst(m_isLines && from > 0) {
         m_block.start(m_isLines ? from : from - from % static_cast<std::int64_t>(recordLength), {});
+        if (!file.isCompressed()) {
+            m_block.endAt(to); // lines behind that continue those before it were judged apart
+        }
     }
 
     /// Null at the end, and where the file cannot be read.
@@ -143,7 +147,8 @@ std::int64_t EarlierEntries::newestTime(Generation& file, std::int64_t to,
                                         const TimeOf& timeOf) const {
     std::optional<std::int64_t> newest;
     if (!file.isCompressed()) {
-        RangeReader reader(file, std::max<std::int64_t>(to - firstStep, 0), to, m_recordLength);
+        RangeReader reader(file, std::max<std::int64_t>(to - firstStep, 0), to, m_recordLength,
+                           m_join);
         while (char* const entry = reader.next()) {
             if (const auto range = timeOf(entry, reader.text())) {
                 newest = range->earliest;
@@ -159,7 +164,7 @@ std::int64_t EarlierEntries::newestTime(Generation& file, std::int64_t to,
 
 /// True if the entries at this place are older than the period. One alone may be out of order.
 bool EarlierEntries::isBeforePeriod(Generation& file, std::int64_t at, const TimeOf& timeOf) const {
-    RangeReader reader(file, at, INT64_MAX, m_recordLength);
+    RangeReader reader(file, at, INT64_MAX, m_recordLength, m_join);
     bool hasTime = false;
     for (int entries = 0; entries < entriesPerLook; ++entries) {
         char* const entry = reader.next();
@@ -176,7 +181,7 @@ bool EarlierEntries::isBeforePeriod(Generation& file, std::int64_t at, const Tim
 }
 
 bool EarlierEntries::readPart(const Part& part, const Take& take) const {
-    RangeReader reader(*part.file, part.from, part.to, m_recordLength);
+    RangeReader reader(*part.file, part.from, part.to, m_recordLength, m_join);
     while (char* const entry = reader.next()) {
         if (!take(entry, reader.text())) {
             return false;

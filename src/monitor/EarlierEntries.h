@@ -19,6 +19,8 @@
 
 namespace zrm {
 
+class LineJoin;
+
 /// Reads once more the entries of a followed log that lie before a place in one of its files: at
 /// least those of the last `period` before the newest of them, in this file and in older
 /// generations. Reads only what that needs, and never more than a limit. One thread.
@@ -34,11 +36,11 @@ public:
     /// Takes an entry, with its text as of EntryBlock. Returns false to end the reading.
     using Take = std::function<bool(char* entry, std::string_view text)>;
 
-    /// `rotatedTo` as in FollowSettings. `recordLength`: bytes of a record; 0: the entries are
-    /// lines.
-    EarlierEntries(std::string path, std::string rotatedTo, std::size_t recordLength)
-        : m_path(std::move(path)), m_rotatedTo(std::move(rotatedTo)), m_recordLength(recordLength) {
-    }
+    /// `rotatedTo` as in FollowSettings; `recordLength` and `join` as for EntryBlock.
+    EarlierEntries(std::string path, std::string rotatedTo, std::size_t recordLength,
+                   const LineJoin* join = nullptr)
+        : m_path(std::move(path)), m_rotatedTo(std::move(rotatedTo)), m_recordLength(recordLength),
+          m_join(join) {}
 
     /// Gives the entries of `file` before the offset, and those of older generations before them,
     /// oldest first. There may be further entries before the period among them.
@@ -64,6 +66,7 @@ private:
     const std::string m_path;
     const std::string m_rotatedTo;
     const std::size_t m_recordLength;
+    const LineJoin* const m_join;
     std::vector<Part> m_parts; ///< newest first
     std::vector<std::unique_ptr<Generation>> m_older;
     std::optional<std::int64_t> m_periodBegin; ///< the period follows this time

@@ -1,6 +1,7 @@
 #include "monitor/EntryBlock.h"
 
 #include "framework/LogEntry.h"
+#include "logs/LineJoin.h"
 
 #include <algorithm>
 #include <array>
@@ -12,11 +13,7 @@ namespace zrm {
 
 namespace {
 
-constexpr std::size_t blockSize = 256 * 1024;
-constexpr std::size_t longestLine = 2046; ///< as it is given, without its newline
 constexpr std::size_t longestText = EntryKeep::longestText;
-
-static_assert(longestText + 2 * Tail::size < blockSize); // an unfinished line leaves room to read
 
 } // namespace
 
@@ -27,10 +24,14 @@ void EntryBlock::start(std::int64_t offset, const Tail& tail) noexcept {
     m_isTailAside = true;
     m_isInLongLine = false;
     m_isTerminated = false;
+    m_lines = m_length = 0;
+    m_nextLength = unknown;
     setText(nullptr, 0);
 }
 
 bool EntryBlock::allocate() noexcept {
+    // An entry that waits and an unfinished line leave room to read.
+    static_assert(LineJoin::mostBytes + longestText + 2 * Tail::size < blockSize);
     if (!m_block) {
         // Behind the block there is room for a terminator, for a long line and for its text.
         m_block.reset(new (std::nothrow) char[blockSize + 1 + longestLine + 2 + longestText]);
@@ -97,8 +98,10 @@ EntryBlock::Fill EntryBlock::fill(Generation& file) noexcept {
     const std::size_t from = m_end - overlap;
     std::array<char, Tail::size> known;
     std::memcpy(known.data(), m_block.get() + from, overlap);
-    const std::ptrdiff_t count = file.readAt(m_block.get() + from, blockSize - from,
-                                             m_readTo - static_cast<std::int64_t>(overlap));
+    const std::int64_t at = m_readTo - static_cast<std::int64_t>(overlap);
+    const auto room = std::min(static_cast<std::int64_t>(blockSize - from), m_readMost - at);
+    const std::ptrdiff_t count =
+        file.readAt(m_block.get() + from, static_cast<std::size_t>(room), at);
     const bool isSame = count >= static_cast<std::ptrdiff_t>(overlap) &&
                         std::memcmp(known.data(), m_block.get() + from, overlap) == 0;
     if (!isSame) {
@@ -115,8 +118,8 @@ char* EntryBlock::next() noexcept {
     restore();
     m_isCut = false;
     m_given = m_begin;
-    if (m_recordLength != 0) {
-        return nextRecord();
+    if (!m_isPlain) {
+        return m_join != nullptr ? nextJoined() : nextRecord();
     }
     if (m_isInLongLine) {
         return restOfLongLine();
@@ -131,27 +134,24 @@ char* EntryBlock::next() noexcept {
     }
     if (const void* const newline = std::memchr(line, '\n', available)) {
         const auto length = static_cast<std::size_t>(static_cast<const char*>(newline) - line);
-        m_begin += length + 1;
-        setText(line, length);
-        if (length > longestLine) {
-            std::memcpy(longLine(), line, longestLine);
-            return endLong(longestLine, true);
-        }
-        m_behind = m_block[m_begin];
-        m_block[m_begin] = '\0';
-        m_isTerminated = true;
-        return line;
+        return giveLine(line, length);
     }
     if (available > longestText) {
-        m_longLineBegin = offset();
-        m_tail = tail();
-        m_isTailAside = true;
-        std::memcpy(longLine(), line, longestLine);
-        std::memcpy(longText(), line, longestText);
-        m_isInLongLine = true;
-        m_begin = m_end;
+        beginLongLine();
     }
     return nullptr;
+}
+
+/// Keeps the beginning of the unfinished line at m_begin, which is too long to be kept whole.
+void EntryBlock::beginLongLine() noexcept {
+    const char* const line = m_block.get() + m_begin;
+    m_longLineBegin = offset();
+    m_tail = tail();
+    m_isTailAside = true;
+    std::memcpy(longLine(), line, longestLine);
+    std::memcpy(longText(), line, longestText);
+    m_isInLongLine = true;
+    m_begin = m_end;
 }
 
 char* EntryBlock::nextRecord() noexcept {
@@ -193,6 +193,10 @@ char* EntryBlock::endLong(std::size_t length, bool isCut) noexcept {
 char* EntryBlock::rest() noexcept {
     restore();
     m_isCut = false;
+    return m_join != nullptr ? restJoined() : restOfLine();
+}
+
+char* EntryBlock::restOfLine() noexcept {
     const std::size_t length = m_end - m_begin;
     if (m_isInLongLine) {
         m_begin = m_end;
@@ -216,6 +220,8 @@ bool EntryBlock::takeBack() noexcept {
     }
     restore();
     m_begin = m_given;
+    m_lines = m_length = 0;
+    m_nextLength = unknown;
     return true;
 }
 

@@ -27,8 +27,8 @@ FileFollower::Moment FileFollower::Moment::now() noexcept {
 }
 
 FileFollower::FileFollower(std::string path, const Options& options, FollowLedger& ledger)
-    : m_path(std::move(path)), m_options(options), m_ledger(ledger), m_block(options.recordLength) {
-}
+    : m_path(std::move(path)), m_options(options), m_ledger(ledger),
+      m_block(options.recordLength, options.join.get()) {}
 
 void FileFollower::fail(Retry& retry, const char* call, int number) {
     ++retry.failures;
@@ -74,6 +74,7 @@ std::optional<LogPosition> FileFollower::position() const noexcept {
 
 bool FileFollower::look(const Moment& now) {
     m_now = now;
+    m_lookBegan = std::chrono::steady_clock::now();
     if (m_chain.empty()) {
         return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
     }
@@ -177,6 +178,7 @@ void FileFollower::enter() {
     m_known = 0;
     m_isInBlock = false;
     m_isAtEnd = false;
+    m_waitingTo = -1;
     m_hasSeen = false;
     m_active = m_now.steady;
     m_readRetry = Retry{};
@@ -235,88 +237,17 @@ bool FileFollower::checkFile() {
     }
     m_seen = now;
     m_hasSeen = true;
-    if (isSame && m_isAtEnd && m_chain.size() == 1) {
+    if (isSame && m_isAtEnd && m_chain.size() == 1 && !m_block.isWaiting()) {
         m_block.release();
         return false;
     }
     return true;
 }
 
-bool FileFollower::isFinished() const noexcept {
-    if (m_chain.size() < 2) {
-        return false;
-    }
-    const Member& member = m_chain.front();
-    if (member.isComplete || member.file->isCompressed() ||
-        m_now.steady - m_active >= m_options.rotateWait) {
-        return true;
-    }
-    // What was rotated before the start need not be waited for again.
-    Generation::Status now;
-    return m_isTakenUp && member.file->status(now) &&
-           m_now.wall - now.changed >= std::chrono::nanoseconds(m_options.rotateWait).count();
-}
-
-void FileFollower::switchToNext() {
-    Member finished = std::move(m_chain.front());
-    m_chain.pop_front();
-    m_older.clear();
-    Generation::Status status{};
-    const bool hasStatus = finished.file->status(status);
-    if (m_block.readTo() > 0) {
-        noteModified(hasStatus ? status.modified : m_seen.modified);
-        m_position = positionOf(finished.file->identity(), m_block.offset(), m_block.tail());
-        m_position.modified = m_modified;
-        m_hasPosition = true;
-    }
-    if (finished.isRecovery && m_block.offset() > finished.from) {
-        m_ledger.noteRecovered(finished.file->path(), finished.from, m_block.offset());
-    }
-    Member& next = m_chain.front();
-    if (hasStatus && !status.hasName && !finished.file->isCompressed() &&
-        identityOf(m_position) == finished.file->identity()) {
-        continueIn(next);
-    }
-    m_isTakenUp = m_isTakenUp && m_chain.size() > 1;
-    enter();
-    if (m_chain.front().hadName && m_block.readTo() == 0) {
-        insertMissed();
-    }
-}
-
-/// A read has failed. True if reading goes on at once.
-bool FileFollower::handleFailedRead() {
-    const int number = errno;
-    if (number == EINTR) {
-        return true;
-    }
-    Member& member = m_chain.front();
-    const bool isHopeless = member.file->isCompressed() ||
-                            (m_chain.size() > 1 && m_readRetry.failures >= mostReadFailures);
-    fail(m_readRetry, "read", number);
-    if (!isHopeless || m_chain.size() == 1) {
-        // Descriptors of network file systems go stale.
-        std::unique_ptr<Generation> again = Generation::open(member.file->path());
-        if (again && again->identity() == member.file->identity()) {
-            member.file = std::move(again);
-        }
-        return false;
-    }
-    const std::int64_t size = member.file->isCompressed() ? 0 : m_seen.size; // of its contents
-    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), size));
-    succeed(m_readRetry);
-    switchToNext();
-    return true;
-}
-
-/// What a file that is finished has behind its last whole entry: a line, or the lost beginning of a
-/// record.
-char* FileFollower::finish() {
-    const std::int64_t from = m_block.offset();
-    char* const entry = m_block.rest();
-    m_isInBlock = m_isInBlock || entry != nullptr;
-    if (entry == nullptr && m_block.offset() > from) {
-        m_ledger.noteLost(from, m_block.offset());
+char* FileFollower::give(char* entry) noexcept {
+    m_wasInBlock = std::exchange(m_isInBlock, true);
+    if (m_block.isCut()) [[unlikely]] {
+        m_ledger.noteCut();
     }
     return entry;
 }
@@ -328,11 +259,7 @@ char* FileFollower::next() {
     }
     for (int reads = 0;; ++reads) {
         if (char* const entry = m_block.next()) {
-            m_wasInBlock = std::exchange(m_isInBlock, true);
-            if (m_block.isCut()) [[unlikely]] {
-                m_ledger.noteCut();
-            }
-            return entry;
+            return give(entry);
         }
         m_isAtEnd = false;
         if (reads == readsPerPause) {
@@ -350,9 +277,14 @@ char* FileFollower::next() {
             succeed(m_readRetry);
             break;
         case EntryBlock::Fill::changed:
-            recover();
+            if (char* const entry = recover()) {
+                return entry;
+            }
             break;
         case EntryBlock::Fill::failed:
+            if (errno != EINTR && isGivenUp() && m_block.isWaiting()) {
+                return give(m_block.endWaiting());
+            }
             if (!handleFailedRead()) {
                 return nullptr;
             }
@@ -361,7 +293,7 @@ char* FileFollower::next() {
             succeed(m_readRetry);
             m_isAtEnd = true;
             if (!isFinished()) {
-                return nullptr;
+                return hasWaitedEnough() ? give(m_block.endWaiting()) : nullptr;
             }
             if (char* const entry = finish()) {
                 return entry;

@@ -2,6 +2,7 @@
 #define ZRM_FILE_FOLLOWER_H
 
 #include "framework/LogPositions.h"
+#include "logs/LineJoin.h"
 #include "monitor/EntryBlock.h"
 #include "monitor/FollowLedger.h"
 #include "monitor/Generation.h"
@@ -34,8 +35,9 @@ public:
         bool byName = true;         ///< false: the file that was opened, whatever its name
         bool fromBeginning = false; ///< for a log without a position whose file is there already
         std::chrono::milliseconds rotateWait{2000};
-        std::string rotatedTo;        ///< see FollowSettings
-        std::size_t recordLength = 0; ///< 0: the entries are lines
+        std::string rotatedTo;                  ///< see FollowSettings
+        std::size_t recordLength = 0;           ///< 0: the entries are lines
+        std::shared_ptr<const LineJoin> join{}; ///< which lines make an entry; null: each is one
     };
     struct Moment {
         std::chrono::steady_clock::time_point steady;
@@ -53,8 +55,12 @@ public:
     /// two system calls if nothing has changed.
     bool look(const Moment& now);
     /// The next entry as EntryBlock gives it, or null if there is none until the next look, or if
-    /// many megabytes had none: isPaused says so, and the next call goes on.
+    /// many megabytes had none: isPaused says so, and the next call goes on. Lines at the end of
+    /// the file that others may continue wait for these, but not for long (LineJoin::Limits). A
+    /// line that comes later begins an entry.
     char* next();
+    /// Gives such lines at once from now on.
+    void waitNoLonger() noexcept { m_waits = false; }
     /// True if the last call of next has stopped before the end, for the caller's other duties.
     bool isPaused() const noexcept { return m_isPaused; }
     /// Takes back the entry that next has just given, so that the position is before it. False if
@@ -124,7 +130,8 @@ private:
     bool insertMissed();
     void noteHead();
     void dropShortCopy(Found& found, std::int64_t offset) const;
-    void recover();
+    bool hasCopyOfWaiting();
+    char* recover();
     void prepend(Found& found);
     void continueIn(Member& next);
 
@@ -138,6 +145,9 @@ private:
     void noteModified(std::int64_t time) noexcept;
     LogPosition positionInBlock() const noexcept;
     void switchToNext();
+    char* give(char* entry) noexcept;
+    bool hasWaitedEnough() noexcept;
+    bool isGivenUp() const noexcept;
     bool handleFailedRead();
     char* finish();
     void enter();
@@ -171,6 +181,10 @@ private:
     bool m_hasSeen = false;
     std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
+    bool m_waits = true;           ///< for lines that continue those at the end of the file
+    std::int64_t m_waitingTo = -1; ///< how far those went at the last look
+    std::chrono::steady_clock::time_point m_waitingSince{}; ///< when the last of them came
+    std::chrono::steady_clock::time_point m_lookBegan{};    ///< by the clock itself
     std::int64_t m_bytesRead = 0;
     Retry m_nameRetry;
     Retry m_readRetry;

@@ -105,9 +105,20 @@ void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
     }
 }
 
+/// True if a file has all lines of this one that wait, with what may continue them.
+bool FileFollower::hasCopyOfWaiting() {
+    const Found found = find(positionInBlock(), Search::byContents, nullptr);
+    char last;
+    return found.holder && found.holder->file->readAt(&last, 1, m_block.waitingTo() - 1) == 1;
+}
+
 /// The file no longer has what was read of it: it was truncated. The rest of the old contents is
-/// read from a copy, as far as there is one; then the file is read from its beginning.
-void FileFollower::recover() {
+/// read from a copy, as far as there is one; then the file is read from its beginning. Gives lines
+/// that wait and are in no copy.
+char* FileFollower::recover() {
+    if (m_block.isWaiting() && !hasCopyOfWaiting()) {
+        return give(m_block.endWaiting());
+    }
     m_ledger.noteTruncation();
     const LogPosition at = *position();
     const std::int64_t known = std::max(m_known, m_block.readTo());
@@ -137,6 +148,7 @@ void FileFollower::recover() {
     }
     prepend(found);
     enter();
+    return nullptr;
 }
 
 /// The file of the position is gone. If it was replaced by one that begins with all of it, as

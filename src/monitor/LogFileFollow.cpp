@@ -31,6 +31,7 @@ FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t rec
     options.rotateWait = settings.rotateWait;
     options.rotatedTo = settings.rotatedTo;
     options.recordLength = recordLength;
+    options.join = settings.join.value;
     return options;
 }
 
@@ -74,6 +75,9 @@ void LogFile::followLog(std::size_t recordLength) {
     for (bool isLast = false; !isLast;) {
         // What is there when the log is to end is still read.
         isLast = monitorStatus() != MONITOR_RUNNING;
+        if (isLast && !settings.resume) {
+            follower.waitNoLonger(); // otherwise the next run reads what waits
+        }
         m_pulse.work("looks at the log");
         if (follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read

@@ -68,7 +68,8 @@ void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
     const TRC1_Silence silence; // the earlier run has traced it
     EarlierEntry current(*this, recordLength == 0);
     const LogEntry::Offer offer(current);
-    EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength);
+    EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength,
+                           followSettings()->join.value.get());
     earlier.read(
         place->file, place->offset, period,
         [&](char* entry, std::string_view text) {

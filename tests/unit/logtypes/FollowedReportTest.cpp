@@ -3,6 +3,7 @@
 #include "logtypes/FollowedReport.h"
 
 #include "../monitor/FakeCompression.h"
+#include "../monitor/TestJoin.h"
 #include "LogTypeTest.h"
 #include "framework/cancellation.h"
 #include "logs/FollowSettings.h"
@@ -78,8 +79,8 @@ protected:
             entries = entriesOf<SysLogFile>('S');
         }
         rows = {};
-        report = std::make_unique<FollowedReport>(path, *entries,
-                                                  FollowedReport::Options{from, to, limit, ""});
+        report = std::make_unique<FollowedReport>(
+            path, *entries, FollowedReport::Options{from, to, limit, "", join});
         report->run(rows);
         return rows.given;
     }
@@ -111,6 +112,7 @@ protected:
     const FakeCompression compression;
     const std::string path = directory.file("app.log");
     std::unique_ptr<EntryReader> entries;
+    std::shared_ptr<const LineJoin> join;
     std::unique_ptr<FollowedReport> report;
     Rows rows;
 };
@@ -126,6 +128,21 @@ TEST_F(FollowedReportTest, ReadsEveryGenerationNewestFirst) {
     EXPECT_EQ(report->reached(), "1061001120000000");
     EXPECT_FALSE(report->isLimited());
     EXPECT_EQ(rows.done, 7 * line("10-05", "").size() + 27 + 2 * 2) << "all bytes";
+}
+
+TEST_F(FollowedReportTest, EntriesOfSeveralLinesAreOneRow) {
+    join = TestJoin::indented();
+    directory.write("app.log", line("10-05", "six") + " at a\n at b\n" + line("10-05", "seven") +
+                                   " at c\n at d");
+    directory.write("app.log.1", line("10-04", "four") + line("10-04", "five") + " at e\n");
+    directory.write("app.log.2.gz", "GZ" + line("10-03", "two") + " at f\n" +
+                                        line("10-03", "three") + " at g\n at h");
+    EXPECT_THAT(run(), ElementsAre("seven", "six", "five", "four", "three", "two"));
+    EXPECT_EQ(report->skipped(), 0U) << "no line is an entry that does not fit";
+    // The only entry of the first file says when it begins.
+    directory.write("app.log", line("10-05", "six") + " at a\n");
+    EXPECT_THAT(run("1061005000000000"), ElementsAre("six"));
+    EXPECT_THAT(read(), ElementsAre("", ".1"));
 }
 
 TEST_F(FollowedReportTest, ReadsGenerationsWithDates) {

@@ -1,6 +1,7 @@
 #include "monitor/EarlierEntries.h"
 
 #include "FakeCompression.h"
+#include "TestJoin.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -131,6 +132,20 @@ TEST_F(EarlierEntriesTest, WithoutTimesTheFilesTimeOfChangeDecides) {
     write("log", "a\nb\n");
     write("log.1", "1 c\n");
     EXPECT_THAT(read("log", 4, 60), ElementsAre("1 c", "a", "b"));
+}
+
+TEST_F(EarlierEntriesTest, EntriesOfSeveralLinesEndAtThePlace) {
+    // The last line came so late that the lines before it were judged without it.
+    write("log", "1 a\n more\n2 b\n more\n late\n");
+    const auto file = Generation::open(m_directory.file("log"));
+    const auto join = TestJoin::indented();
+    EarlierEntries earlier(m_directory.file("log"), "", 0, join.get());
+    std::vector<std::string> texts;
+    earlier.read(*file, 20, 60, timeOf, [&](char* /*entry*/, std::string_view text) {
+        texts.emplace_back(text);
+        return true;
+    });
+    EXPECT_THAT(texts, ElementsAre("1 a\n more", "2 b\n more"));
 }
 
 TEST_F(EarlierEntriesTest, ReadsRecords) {

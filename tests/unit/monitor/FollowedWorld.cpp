@@ -16,8 +16,9 @@ constexpr int mostGenerations = 6;
 
 } // namespace
 
-FollowedWorld::FollowedWorld(Style style, std::mt19937& random)
-    : m_style(style), m_random(random), m_path(m_directory.file("app.log")) {
+FollowedWorld::FollowedWorld(Style style, unsigned mostLines, std::mt19937& random)
+    : m_style(style), m_mostLines(mostLines), m_random(random),
+      m_path(m_directory.file("app.log")) {
     create();
     reopen();
 }
@@ -28,6 +29,15 @@ FollowedWorld::~FollowedWorld() {
 
 std::string FollowedWorld::random(std::size_t most) {
     return std::string(m_random() % most, static_cast<char>('a' + m_random() % 26));
+}
+
+/// What may follow the first line of an entry.
+std::string FollowedWorld::furtherLines() {
+    std::string lines;
+    for (auto line = m_mostLines > 1 ? m_random() % m_mostLines : 0; line > 0; --line) {
+        lines += "\n " + random(30);
+    }
+    return lines;
 }
 
 void FollowedWorld::touch(const std::string& path) {
@@ -79,13 +89,13 @@ void FollowedWorld::write(int lines) {
     std::string text;
     for (; lines > 0; --lines) {
         if (m_written->isOpenEnded) {
-            const std::string end = random(20);
+            const std::string end = random(20) + furtherLines();
             m_entries[static_cast<std::size_t>(m_written->entries.back())].text += end;
             m_written->isOpenEnded = false;
             text += end + "\n";
         } else {
             const auto number = m_entries.size();
-            m_entries.push_back({std::to_string(number) + ":" + random(80), false});
+            m_entries.push_back({std::to_string(number) + ":" + random(80) + furtherLines()});
             m_written->entries.push_back(static_cast<int>(number));
             text += m_entries.back().text + "\n";
         }
@@ -101,15 +111,15 @@ void FollowedWorld::writeLongLine() {
     std::string text = std::to_string(number) + ":" + std::string(2000 + m_random() % 300'000, 'L');
     append(text.substr(0, 1500));
     append(text.substr(1500) + "\n");
-    text.resize(std::min<std::size_t>(text.size(), 2046));
-    m_entries.push_back({text, false});
+    m_entries.push_back({text});
     m_written->entries.push_back(static_cast<int>(number));
 }
 
 void FollowedWorld::writeHalf() {
     if (!m_written->isOpenEnded) {
         const auto number = m_entries.size();
-        m_entries.push_back({std::to_string(number) + ":" + random(20), false});
+        m_entries.push_back(
+            {std::to_string(number) + ":" + random(20) + furtherLines(), false, true});
         m_written->entries.push_back(static_cast<int>(number));
         m_written->isOpenEnded = true;
         append(m_entries.back().text);

@@ -11,14 +11,15 @@
 #include <vector>
 
 /// A log that one program writes and others rotate, with a plain account of which entries were
-/// written where. Every entry's text begins with its number. Times of modification are set, so that
-/// everything that is done has a time of its own.
+/// written where. Every entry's text begins with its number; further lines begin with a blank.
+/// Times of modification are set, so that everything that is done has a time of its own.
 class FollowedWorld {
 public:
     enum class Style { NUMBERED, DATED, SYMLINK };
     struct Entry {
-        std::string text;     ///< without the newline
-        bool mayMiss = false; ///< it was gone before anyone could read it
+        std::string text;       ///< without the last newline
+        bool mayMiss = false;   ///< it was gone before anyone could read it
+        bool isInParts = false; ///< it was not written at once
     };
     /// A file, whatever its name.
     struct File {
@@ -26,7 +27,8 @@ public:
         bool isOpenEnded = false; ///< the last entry has no newline yet
     };
 
-    FollowedWorld(Style style, std::mt19937& random);
+    /// `mostLines`: of an entry.
+    FollowedWorld(Style style, unsigned mostLines, std::mt19937& random);
     ~FollowedWorld();
 
     const std::string& path() const { return m_path; }
@@ -59,6 +61,7 @@ public:
 
 private:
     std::string random(std::size_t most);
+    std::string furtherLines();
     void append(const std::string& text);
     void touch(const std::string& path);
     void shift();
@@ -68,6 +71,7 @@ private:
     void findMissing();
 
     const Style m_style;
+    const unsigned m_mostLines;
     std::mt19937& m_random;
     TemporaryDirectory m_directory;
     std::string m_path;

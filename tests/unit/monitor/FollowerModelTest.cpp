@@ -1,5 +1,7 @@
 #include "FakeCompression.h"
 #include "FollowedWorld.h"
+#include "TestJoin.h"
+#include "framework/LogEntry.h"
 #include "monitor/FileFollower.h"
 
 #include <gtest/gtest.h>
@@ -16,7 +18,8 @@ constexpr std::chrono::seconds rotateWait{2};
 /// A follower of a world that is started, stopped and killed, and what it delivers.
 class FollowedRun {
 public:
-    FollowedRun(FollowedWorld& world, std::mt19937& random) : m_world(world), m_random(random) {
+    FollowedRun(FollowedWorld& world, std::shared_ptr<const LineJoin> join, std::mt19937& random)
+        : m_world(world), m_join(std::move(join)), m_random(random) {
         start();
     }
 
@@ -26,6 +29,7 @@ public:
         FileFollower::Options options;
         options.fromBeginning = true;
         options.rotateWait = rotateWait;
+        options.join = m_join;
         m_follower = std::make_unique<FileFollower>(m_world.path(), options, m_ledger);
         if (m_stored.position) {
             m_follower->resumeAt(*m_stored.position);
@@ -39,7 +43,7 @@ public:
         m_world.noteLook();
         if (m_follower->look({m_now, 0})) {
             while (const char* const entry = m_follower->next()) {
-                take(entry);
+                take(entry, m_follower->text());
                 m_world.noteDelivered(m_delivered);
                 if (m_random() % 8 == 0) {
                     remember();
@@ -82,12 +86,14 @@ public:
 
 private:
     struct Place {
-        int last = -1; ///< the last entry before it
-        std::optional<LogPosition> position;
+        int last = -1;         ///< the last whole entry before it
+        int begun = -1;        ///< the last of which there is something before it
+        std::size_t given = 0; ///< how much of that, with the newline
+        std::optional<LogPosition> position{};
     };
 
     void remember() {
-        m_places.push_back({m_delivered, m_follower->position()});
+        m_places.push_back({m_delivered, m_begun, m_given, m_follower->position()});
         if (m_places.size() > 50) {
             m_places.erase(m_places.begin(), m_places.begin() + 25);
         }
@@ -97,34 +103,50 @@ private:
         m_follower.reset();
         m_stored = place;
         m_delivered = place.last;
+        m_begun = place.begun;
+        m_given = place.given;
         m_places = {place};
         m_world.noteDelivered(m_delivered);
-        m_world.noteEnd(m_delivered);
+        m_world.noteEnd(m_begun);
     }
 
-    void take(std::string_view entry) {
+    void take(std::string_view judged, std::string_view text) {
         ++delivered;
+        const std::size_t firstLine = std::min<std::size_t>(text.find('\n'), 2046);
+        ASSERT_EQ(judged, std::string(text.substr(0, firstLine)) + '\n');
         const auto& entries = m_world.entries();
-        ASSERT_TRUE(entry.ends_with('\n'));
-        entry.remove_suffix(1);
-        const int number = std::atoi(std::string(entry.substr(0, 10)).c_str());
+        // What comes late continues an entry that was given before.
+        const bool isLate = text.starts_with(' ');
+        const int number = isLate ? m_begun : std::atoi(std::string(text.substr(0, 10)).c_str());
         ASSERT_LT(static_cast<std::size_t>(number), entries.size());
-        ASSERT_EQ(entry, entries[static_cast<std::size_t>(number)].text);
-        ASSERT_GT(number, m_delivered) << "twice: " << entry.substr(0, 40);
+        const FollowedWorld::Entry& entry = entries[static_cast<std::size_t>(number)];
+        const std::size_t from = isLate ? m_given : 0;
+        const std::size_t length = std::min(text.size(), EntryKeep::longestText);
+        ASSERT_LE(from, entry.text.size()) << "late, but all of it was given: " << text;
+        ASSERT_EQ(text, std::string_view(entry.text).substr(from, length));
+        ASSERT_GT(number, isLate ? m_delivered : m_begun) << "twice: " << text.substr(0, 40);
         for (int i = m_delivered + 1; i < number; ++i) {
             ASSERT_TRUE(entries[static_cast<std::size_t>(i)].mayMiss)
                 << "passed over: " << entries[static_cast<std::size_t>(i)].text.substr(0, 40)
                 << " before " << number;
         }
-        m_delivered = number;
+        const bool isWhole = from + length == std::min(entry.text.size(), EntryKeep::longestText);
+        ASSERT_TRUE(isWhole || (entry.isInParts && entry.text[from + length] == '\n'))
+            << "only a part: " << text;
+        m_begun = number;
+        m_given = from + length + 1;
+        m_delivered = isWhole ? number : number - 1;
     }
 
     FollowedWorld& m_world;
+    const std::shared_ptr<const LineJoin> m_join;
     std::mt19937& m_random;
     FollowLedger m_ledger;
     std::unique_ptr<FileFollower> m_follower;
     std::chrono::steady_clock::time_point m_now{std::chrono::hours(1)};
     int m_delivered = -1;
+    int m_begun = -1;
+    std::size_t m_given = 0;
     Place m_stored;
     std::vector<Place> m_places{Place{}};
 };
@@ -215,8 +237,10 @@ protected:
 
     /// Some hundred actions on one log.
     std::size_t live(FollowedWorld::Style style, int actions) {
-        FollowedWorld world(style, m_random);
-        FollowedRun run(world, m_random);
+        const unsigned mostLines = m_random() % 2 == 0 ? 1 : 5;
+        const LineJoin::Limits limits{.wait = std::chrono::milliseconds(m_random() % 4000)};
+        FollowedWorld world(style, mostLines, m_random);
+        FollowedRun run(world, mostLines > 1 ? TestJoin::indented(limits) : nullptr, m_random);
         std::vector<std::string> done;
         for (int i = 0; i < actions && !HasFailure(); ++i) {
             done.emplace_back(act(world, run));
