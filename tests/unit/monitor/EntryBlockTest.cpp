@@ -111,10 +111,10 @@ TEST_F(EntryBlockTest, BytesThatAreNotTextStayInTheText) {
     EXPECT_EQ(seen[0].text, "a\0b\xff"s);
 }
 
-TEST_F(EntryBlockTest, RecordsHaveNoText) {
+TEST_F(EntryBlockTest, ARecordIsItsOwnText) {
     const auto seen = entriesOf("record 1record 2", 8);
     ASSERT_EQ(seen.size(), 2u);
-    EXPECT_EQ(seen[0].text, "");
+    EXPECT_EQ(seen[0].text, "record 1");
     EXPECT_FALSE(seen[0].isCut);
 }
 
