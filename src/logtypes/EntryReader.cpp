@@ -107,15 +107,15 @@ private:
 
 class FormatEntries final : public EntryReader {
 public:
-    explicit FormatEntries(const ValidLog& log) : m_log(log), m_reader(m_log.format().reader()) {}
+    explicit FormatEntries(const ValidLog& log) : m_log(log), m_parser(m_log.followSettings()) {}
 
     std::size_t recordLength() const noexcept override { return m_log.format().recordLength(); }
     bool read(char* /*entry*/, std::string_view text, const char* newest,
               zrm_rmlogent_data_t& row) override {
-        return m_log.makeRow(*m_reader, text, newest, row);
+        return m_log.makeRow(m_parser, text, newest, row);
     }
     void readFields(std::string_view text, EntryFields& fields) override {
-        m_reader->readFields(text, fields);
+        m_parser.reader->readFields(text, fields);
     }
 
 private:
@@ -124,7 +124,7 @@ private:
     };
 
     Log m_log;
-    const std::unique_ptr<EntryFormat::Reader> m_reader;
+    FormatLogFile::Parser m_parser;
 };
 
 } // namespace

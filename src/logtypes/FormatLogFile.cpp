@@ -9,7 +9,6 @@
 #include "logs/RequestThresholds.h"
 #include "logs/ValidLog.h"
 #include "logtypes/EntryReader.h"
-#include "logtypes/EntryStamp.h"
 #include "monitor/BackwardBlock.h"
 #include "monitor/Generation.h"
 #include "monitor/ReportOutcome.h"
@@ -23,13 +22,9 @@ namespace {
 
 TRC1_Anchor anchor{"FormatLogFile.cpp"};
 
-/// The reader of the calling thread. A log's thread has one format all its life; other threads have
-/// one after another. It shares the format, which may outlive the log so.
-struct ThreadReader {
-    std::shared_ptr<const EntryFormat> format;
-    std::unique_ptr<EntryFormat::Reader> reader;
-};
-thread_local ThreadReader threadReader;
+/// The parser of the calling thread. A log's thread has one all its life; other threads have one
+/// after another. It shares the settings, which may outlive the log so.
+thread_local std::unique_ptr<FormatLogFile::Parser> threadParser;
 
 bool isControl(char character) noexcept {
     return character == '\n' || character == '\r';
@@ -75,13 +70,11 @@ void FormatLogFile::processLogData() {
     followLog(format().recordLength());
 }
 
-EntryFormat::Reader& FormatLogFile::readerOfThread() const {
-    const std::shared_ptr<const EntryFormat>& format = followSettings()->format.value;
-    if (threadReader.format != format) {
-        threadReader.reader = format->reader();
-        threadReader.format = format;
+FormatLogFile::Parser& FormatLogFile::parserOfThread() const {
+    if (!threadParser || threadParser->settings != followSettings()) {
+        threadParser = std::make_unique<Parser>(followSettings());
     }
-    return *threadReader.reader;
+    return *threadParser;
 }
 
 /// The whole of an entry of which this is the beginning.
@@ -100,19 +93,18 @@ std::string_view FormatLogFile::wholeEntry(const char* entry) const {
 
 long FormatLogFile::formatEntryAsRow(char* entry, void* row, void* /*context*/) {
     TraceScope trace(anchor);
-    const bool isRow = makeRow(readerOfThread(), wholeEntry(entry), nullptr,
+    const bool isRow = makeRow(parserOfThread(), wholeEntry(entry), nullptr,
                                *static_cast<zrm_rmlogent_data_t*>(row));
     return trace.result(isRow ? 0L : -1L);
 }
 
-bool FormatLogFile::makeRow(EntryFormat::Reader& reader, std::string_view entry, const char* newest,
+bool FormatLogFile::makeRow(Parser& parser, std::string_view entry, const char* newest,
                             zrm_rmlogent_data_t& row) {
     TraceScope trace(anchor);
     EntryRow columns(*this, &row);
     EntryColumns found;
-    if (!reader.read(entry, found) ||
-        (found.hasTime &&
-         !EntryStamp::write(found, followSettings()->zone, newest, columns->entrytime))) {
+    if (!parser.reader->read(entry, found) ||
+        (found.hasTime && !parser.stamp.write(found, newest, columns->entrytime))) {
         columns.reject();
         return trace.result(false);
     }
@@ -155,11 +147,11 @@ bool FormatLogFile::deliverEntry(char* entry) {
 }
 
 void FormatLogFile::readFields(std::string_view text, EntryFields& fields) const {
-    readerOfThread().readFields(text, fields);
+    parserOfThread().reader->readFields(text, fields);
 }
 
 std::string_view FormatLogFile::rejectionReason() const noexcept {
-    return threadReader.reader ? threadReader.reader->reason() : std::string_view();
+    return threadParser ? threadParser->reader->reason() : std::string_view();
 }
 
 void* FormatLogFile::startReportRequest(void* /*thresholds*/) {

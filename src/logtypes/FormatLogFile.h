@@ -3,11 +3,13 @@
 
 #include "logs/EntryFormat.h"
 #include "logs/FollowSettings.h"
+#include "logtypes/EntryStamp.h"
 #include "monitor/LogFile.h"
 
 #include <cstddef>
 #include <memory>
 #include <string_view>
+#include <utility>
 
 namespace zrm {
 
@@ -35,9 +37,18 @@ public:
     void readFields(std::string_view text, EntryFields& fields) const override;
     std::string_view rejectionReason() const noexcept override;
 
+    /// What takes a log's entries apart. One thread.
+    struct Parser {
+        explicit Parser(std::shared_ptr<const FollowSettings> follow)
+            : settings(std::move(follow)), reader(settings->format->reader()), stamp(settings) {}
+
+        const std::shared_ptr<const FollowSettings> settings;
+        const std::unique_ptr<EntryFormat::Reader> reader;
+        EntryStamp stamp;
+    };
     /// Makes a row of an entry's whole text, or of a record. `newest` as in EntryReader; null while
     /// monitoring. False if the entry does not fit the format. Any thread.
-    bool makeRow(EntryFormat::Reader& reader, std::string_view entry, const char* newest,
+    bool makeRow(Parser& parser, std::string_view entry, const char* newest,
                  zrm_rmlogent_data_t& row);
     const EntryFormat& format() const noexcept { return *followSettings()->format.value; }
 
@@ -49,7 +60,7 @@ protected:
 private:
     struct Report;
 
-    EntryFormat::Reader& readerOfThread() const;
+    Parser& parserOfThread() const;
     std::string_view wholeEntry(const char* entry) const;
 };
 

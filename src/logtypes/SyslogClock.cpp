@@ -3,6 +3,7 @@
 #include "base/BrevanTime.h"
 #include "logs/FollowSettings.h"
 #include "logs/ZoneTime.h"
+#include "logtypes/EntryStamp.h"
 
 #include <algorithm>
 #include <cstring>
@@ -19,24 +20,6 @@ constexpr std::size_t isoMinute = 17;         // "YYYY-MM-DDThh:mm:"
 constexpr std::size_t secondInStamp = 11;
 constexpr unsigned lastSecond = 59;
 
-struct Converted {
-    EntryMoment moment;
-    std::int64_t local; ///< seconds as of CivilTime
-};
-
-Converted convert(std::int64_t civil, const std::optional<std::int32_t>& offset,
-                  const std::vector<ZoneOffset>& zone) noexcept {
-    if (offset) {
-        const std::int64_t utc = civil - *offset;
-        return {{EntryMoment::Kind::instant, utc}, ZoneTime::toLocal(utc)};
-    }
-    if (!zone.empty()) {
-        const std::int64_t utc = ZoneTime::toUtc(civil, zone);
-        return {{EntryMoment::Kind::zoned, civil}, ZoneTime::toLocal(utc)};
-    }
-    return {{}, civil};
-}
-
 /// The time that a line shows. If it shows no year, `newest` decides.
 std::int64_t civilSeconds(const SyslogTime& time, const char* newest) noexcept {
     CivilTime civil = time.time;
@@ -49,9 +32,9 @@ std::int64_t civilSeconds(const SyslogTime& time, const char* newest) noexcept {
 /// False if the time has no stamp.
 bool write(std::int64_t civil, const SyslogTime& time, const FollowSettings& settings,
            char* stamp) noexcept {
-    const Converted converted = convert(civil, time.offset, settings.zone);
-    lastEntryMoment = converted.moment;
-    return ZoneTime::writeStamp(converted.local, stamp);
+    const LocalEntryTime local = LocalEntryTime::of(civil, time.offset, settings.zone);
+    lastEntryMoment = local.moment;
+    return ZoneTime::writeStamp(local.seconds, stamp);
 }
 
 /// Where the fraction of a second ends that may begin here.
@@ -154,10 +137,12 @@ void SyslogClock::remember(std::string_view text, const SyslogTime& time, std::i
                            std::time_t now) noexcept {
     m_form = Form::none;
     const std::int64_t begin = civil - time.time.second;
-    const Converted first = convert(begin, time.offset, m_settings->zone);
-    const Converted last = convert(begin + lastSecond, time.offset, m_settings->zone);
-    if (time.time.second > lastSecond || first.local % (lastSecond + 1) != 0 ||
-        last.local - first.local != lastSecond || !ZoneTime::writeStamp(first.local, m_stamp)) {
+    const LocalEntryTime first = LocalEntryTime::of(begin, time.offset, m_settings->zone);
+    const LocalEntryTime last =
+        LocalEntryTime::of(begin + lastSecond, time.offset, m_settings->zone);
+    if (time.time.second > lastSecond || first.seconds % (lastSecond + 1) != 0 ||
+        last.seconds - first.seconds != lastSecond ||
+        !ZoneTime::writeStamp(first.seconds, m_stamp)) {
         return;
     }
     const bool isTraditional = time.form == Form::traditional;
