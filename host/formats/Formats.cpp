@@ -1,7 +1,8 @@
 #include "host/formats/FormatDescription.h"
+#include "host/formats/JsonFormat.h"
 
 #include <algorithm>
-#include <span>
+#include <iterator>
 
 namespace zrm::host {
 
@@ -13,7 +14,9 @@ struct Kind {
     Result<std::shared_ptr<const EntryFormat>> (*make)(const FormatDescription& description);
 };
 
-constexpr std::span<const Kind> kinds{};
+constexpr Kind kinds[] = {
+    {"json", &JsonFormat::make},
+};
 
 } // namespace
 
@@ -26,9 +29,9 @@ std::vector<const char*> formatTypes() {
 }
 
 Result<std::shared_ptr<const EntryFormat>> makeFormat(const FormatDescription& description) {
-    const auto kind = std::find_if(kinds.begin(), kinds.end(),
+    const auto kind = std::find_if(std::begin(kinds), std::end(kinds),
                                    [&](const Kind& one) { return description.type == one.type; });
-    if (kind == kinds.end()) {
+    if (kind == std::end(kinds)) {
         return refused("'" + description.type + "' is not a kind of format", "write another type",
                        "type");
     }

@@ -189,8 +189,8 @@ colour = 1
 rotated_to = ""
 )"),
         ElementsAre(
-            "zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
-            "\"text\", \"accounting\" or \"errorlog\"",
+            HasSubstr("zrm.toml:3: log.type: 'sylog' is not a choice here; write \"syslog\", "
+                      "\"text\", \"accounting\", \"errorlog\""),
             "zrm.toml:4: log.follow: 'inode' is not a choice here; write \"name\" "
             "or \"file\"",
             "zrm.toml:5: log.start: 'now' is not a choice here; write \"end\" or "

@@ -1,0 +1,84 @@
+#ifndef ZRM_HOST_FLAT_JSON_H
+#define ZRM_HOST_FLAT_JSON_H
+
+#include "base/EntryFields.h"
+#include "host/formats/JsonNames.h"
+
+#include <cstddef>
+#include <memory>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+namespace zrm::host {
+
+/// Takes JSON objects apart into flat fields. Reused from one to the next: keeps memory for the
+/// longest text it has seen, and allocates nothing once it has that. One thread.
+///
+/// The members of a nested object have its name before theirs, with a dot, and the elements of an
+/// array their number ("tags.0"). What is nested deeper than `deepest` is one field with the JSON
+/// text. Texts are without their escapes; numbers, true and false are as they are written; a null
+/// is not a field, nor is an empty object or array.
+class FlatJson {
+public:
+    static constexpr unsigned deepest = 16;
+
+    /// The names outlive the object. Throws std::bad_alloc.
+    explicit FlatJson(const JsonNames& names);
+    FlatJson(const FlatJson&) = delete;
+    FlatJson& operator=(const FlatJson&) = delete;
+    ~FlatJson();
+
+    /// Reads an object. False if the text is anything but one complete JSON object: reason() says
+    /// why.
+    bool read(std::string_view text);
+    /// A clause. Valid until the next read.
+    std::string_view reason() const noexcept { return {m_reason, m_reasonLength}; }
+    /// What the object has for the columns. Views into memory of this object, until the next read.
+    const JsonColumns& columns() const noexcept { return m_columns; }
+    /// True if this is the text that was read last.
+    bool isOf(std::string_view text) const noexcept;
+    /// Adds the fields of the object. `text` has the same contents as that which was read; names
+    /// and values are views into it or into memory of `fields`.
+    void addTo(EntryFields& fields, std::string_view text) const noexcept;
+
+private:
+    struct Field {
+        std::string_view name;
+        std::string_view value;
+    };
+    // With the parser's types, whose layout depends on the options of the compiler.
+    struct Parser;
+    class Walk;
+    class Below;
+
+    bool copy(std::string_view text) noexcept;
+    void keep(std::string_view name, std::string_view value, bool isNumber = false) noexcept;
+    bool hasEscapes(std::string_view text) const noexcept;
+    std::string_view fullName(std::string_view name) noexcept;
+    std::string_view lasting(std::string_view name) noexcept;
+    std::optional<std::string_view> handedOver(std::string_view part, std::string_view text,
+                                               EntryFields& fields) const noexcept;
+    bool refuse(std::string_view reason, const char* place = nullptr) noexcept;
+
+    const JsonNames& m_names;
+    const std::unique_ptr<Parser> m_parser;
+    JsonColumns m_columns;
+    std::unique_ptr<char[]> m_text; ///< `m_room` bytes, and those that the parser needs behind them
+    std::size_t m_room = 0;
+    std::size_t m_size = 0; ///< of the text
+    bool m_isRead = false;  ///< the text was an object
+    bool m_hasEscapes = false;
+    std::vector<Field> m_fields; ///< views into m_text, m_built or memory of the parser
+    std::size_t m_leftOut = 0;
+    std::unique_ptr<char[]> m_built; ///< names of nested fields
+    std::size_t m_builtSize = 0;
+    char m_path[EntryFields::longestName]; ///< the name of what is walked, with a dot behind it
+    std::size_t m_pathLength = 0;          ///< more than m_path has: names are too long
+    char m_reason[128];
+    std::size_t m_reasonLength = 0;
+};
+
+} // namespace zrm::host
+
+#endif
