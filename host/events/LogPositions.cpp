@@ -108,4 +108,10 @@ void LogPositions::reached(const LogPosition& position) {
     }
 }
 
+void LogPositions::left(const LogPosition& position, bool isWatched) {
+    if (!m_state->book->isClosed()) {
+        m_state->book->left(*m_state->log, m_state->follower, position, isWatched);
+    }
+}
+
 } // namespace zrm

@@ -2,6 +2,7 @@
 
 #include "host/events/EventQueue.h"
 
+#include <algorithm>
 #include <utility>
 
 namespace zrm::host {
@@ -9,6 +10,7 @@ namespace zrm::host {
 FollowedLog::Follower FollowedLog::begin() {
     const std::lock_guard guard(m_mutex);
     m_follower = ++m_followers;
+    m_isTakenOver = false;
     return m_follower;
 }
 
@@ -17,6 +19,39 @@ void FollowedLog::end(Follower follower) {
     if (m_follower == follower) {
         m_follower = 0;
     }
+}
+
+void FollowedLog::beginAnew(Follower follower, std::int64_t modified) {
+    const std::lock_guard guard(m_mutex);
+    if (follower == m_follower && !m_hasRefused) {
+        LogPosition position;
+        position.modified = modified;
+        m_newest = m_reached = position;
+    }
+}
+
+void FollowedLog::takeOver(const LogPosition& position, std::uint64_t event, bool isWatched) {
+    const std::lock_guard guard(m_mutex);
+    if (m_follower != 0) {
+        return;
+    }
+    m_isTakenOver = true;
+    m_isWatched = isWatched;
+    m_followers = std::max(m_followers, firstFollower); // the next one continues in any case
+    if (position != m_newest) {
+        m_newest = m_reached = position;
+        m_lastEvent = std::max(m_lastEvent, event);
+    }
+}
+
+std::optional<LogPosition> FollowedLog::takenOver() const {
+    const std::lock_guard guard(m_mutex);
+    return m_isTakenOver && !m_isWatched ? m_newest : std::nullopt;
+}
+
+std::uint64_t FollowedLog::lastEvent() const {
+    const std::lock_guard guard(m_mutex);
+    return m_lastEvent;
 }
 
 bool FollowedLog::isFollowed() const {
@@ -146,6 +181,35 @@ bool PositionBook::isStored(std::string_view log) const {
     const std::lock_guard guard(m_mutex);
     const auto found = m_logs.find(log);
     return found != m_logs.end() && found->second->isStored();
+}
+
+void PositionBook::setRenamed(std::map<File, std::string> renamed) {
+    const std::lock_guard guard(m_mutex);
+    m_renamed = std::move(renamed);
+}
+
+void PositionBook::left(FollowedLog& by, FollowedLog::Follower follower,
+                        const LogPosition& position, bool isWatched) {
+    std::string name;
+    {
+        const std::lock_guard guard(m_mutex);
+        const auto renamed = m_renamed.find({position.device, position.inode});
+        if (renamed == m_renamed.end() || renamed->second == by.name()) {
+            return;
+        }
+        name = renamed->second;
+    }
+    log(name)->takeOver(position, by.lastEvent(), isWatched);
+    const std::optional<LogPosition> own = by.newest();
+    if (!isWatched && own && own->device == position.device && own->inode == position.inode) {
+        by.beginAnew(follower, position.modified);
+    }
+}
+
+std::optional<LogPosition> PositionBook::takenOver(std::string_view log) const {
+    const std::lock_guard guard(m_mutex);
+    const auto found = m_logs.find(log);
+    return found == m_logs.end() ? std::nullopt : found->second->takenOver();
 }
 
 std::vector<PositionValue> PositionBook::unsaved(std::uint64_t event) const {

@@ -13,6 +13,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace zrm::host {
@@ -61,6 +62,18 @@ public:
               const std::shared_ptr<FollowedLog>& self, const LogPosition& behind);
     /// True if it is the log's first position, which should be stored at once.
     bool reached(Follower follower, const LogPosition& position);
+    /// Begins anew with what comes after the files that were modified up to this time.
+    void beginAnew(Follower follower, std::int64_t modified);
+
+    // For whoever has read a file that has this log's name now.
+
+    /// The log continues at this position, which stands behind the events up to `event`, unless it
+    /// is followed already. `isWatched`: the file is still read.
+    void takeOver(const LogPosition& position, std::uint64_t event, bool isWatched);
+    /// The position that it has taken over in a file that nobody reads any more.
+    std::optional<LogPosition> takenOver() const;
+    /// The last event in the queue.
+    std::uint64_t lastEvent() const;
 
     // For the writer of the store.
 
@@ -76,6 +89,8 @@ private:
     mutable std::mutex m_mutex; ///< guards what follows
     Follower m_follower = 0;    ///< 0: nobody
     Follower m_followers = 0;   ///< so far
+    bool m_isTakenOver = false; ///< m_newest is a position that another log has left
+    bool m_isWatched = false;   ///< by that log
     bool m_hasRefused = false;  ///< the queue did not take its events: later positions are void
     std::optional<LogPosition> m_newest;
     std::optional<LogPosition> m_reached; ///< without events, behind those up to m_lastEvent
@@ -87,6 +102,9 @@ private:
 /// The positions of all followed logs, between the logs' threads and the writer of the store.
 class PositionBook {
 public:
+    /// A file's device and inode.
+    using File = std::pair<std::uint64_t, std::uint64_t>;
+
     /// `isKept`: what the writer is given survives the process.
     PositionBook(const PositionValues& stored, bool isKept);
 
@@ -106,6 +124,15 @@ public:
     std::map<std::string, LogPosition> positions() const;
     /// True if the store has a position of this log. Any thread.
     bool isStored(std::string_view log) const;
+
+    /// The files that have lost the names of their logs, and the names that they have now: of logs
+    /// of the list, and not as rotation names files. Any thread.
+    void setRenamed(std::map<File, std::string> renamed);
+    /// A log that is followed has left a file at the position (LogPositions::left). Any thread.
+    void left(FollowedLog& log, FollowedLog::Follower follower, const LogPosition& position,
+              bool isWatched);
+    /// FollowedLog::takenOver of the log. Any thread.
+    std::optional<LogPosition> takenOver(std::string_view log) const;
 
     WatchedPaths& paths() noexcept { return m_paths; }
     const WatchedPaths& paths() const noexcept { return m_paths; }
@@ -136,8 +163,9 @@ private:
     WatchedPaths m_paths;
     std::atomic<EventQueue*> m_queue{nullptr};
     std::atomic<bool> m_isClosed{false};
-    mutable std::mutex m_mutex; ///< guards the map
+    mutable std::mutex m_mutex; ///< guards the maps
     std::map<std::string, std::shared_ptr<FollowedLog>, std::less<>> m_logs;
+    std::map<File, std::string> m_renamed;
 };
 
 } // namespace zrm::host

@@ -234,6 +234,38 @@ TEST_F(LogPositionsTest, OnceTheSituationsCloseNothingMoves) {
     EXPECT_THAT(take(), ElementsAre("a /log1"));
 }
 
+TEST_F(LogPositionsTest, AnotherLogContinuesInAFileThatHasItsNameNow) {
+    book->setRenamed({{{1, 2}, "/new"}});
+    LogPosition left = at(20);
+    {
+        LogPositions log("/log");
+        entry(log, {"a"}, 10);
+        log.reached(left);
+        left.modified = 77;
+        log.left({9, 9, 1}, false); // a file without another name
+        log.left(left, true);
+        EXPECT_FALSE(book->takenOver("/new"));
+        EXPECT_EQ(log.stored(), at(20));
+        log.left(left, false);
+        EXPECT_EQ(book->takenOver("/new"), left);
+        LogPosition blank;
+        blank.modified = 77;
+        EXPECT_EQ(log.stored(), blank);
+    }
+    // Both are stored, and not before the event.
+    EXPECT_THAT(book->unsaved(0), IsEmpty());
+    EXPECT_EQ(book->unsaved(1).size(), 2U);
+    {
+        LogPositions log("/new");
+        EXPECT_FALSE(log.isFirstOfRun()); // it continues even without resumption
+        EXPECT_EQ(log.stored(), left);
+        EXPECT_FALSE(book->takenOver("/new"));
+        LogPositions other("/log");
+        other.left(at(5), false);
+        EXPECT_EQ(log.stored(), left); // it is followed already
+    }
+}
+
 TEST_F(LogPositionsTest, WithoutAStoreAPositionLivesAsLongAsTheProcess) {
     PositionBook::makeCurrent(PositionBook::unkept());
     {
