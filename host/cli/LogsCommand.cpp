@@ -130,7 +130,7 @@ std::string rangesText(const Json& follow, const Terminal& terminal) {
                  {"WHAT", Table::FIXED},
                  {"FROM BYTE", Table::NUMBER},
                  {"TO BYTE", Table::NUMBER},
-                 {"READ FROM", Table::PATH}});
+                 {"FILE", Table::PATH}});
     for (const char* const what : {"recovered", "lost"}) {
         for (const Json& range : JsonText::member(follow, what)) {
             table.add({TimeDisplay::local(JsonText::text(range, "time")), std::string(what),

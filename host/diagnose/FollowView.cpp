@@ -38,7 +38,8 @@ FollowView FollowView::of(const FollowLedger& ledger) {
     view.state = followStateText(ledger.state());
     if (const std::optional<FollowLedger::Failure> failure = ledger.failure()) {
         const ErrorText error(failure->number);
-        view.problem = std::string(failure->call) + " failed and is tried again: " + error.text();
+        const std::string file = failure->file.empty() ? "" : " of " + failure->file;
+        view.problem = failure->call + file + " failed and is tried again: " + error.text();
     }
     if (const std::optional<FollowLedger::Generation> generation = ledger.generation()) {
         view.generation = generation->path;
@@ -53,7 +54,7 @@ FollowView FollowView::of(const FollowLedger& ledger) {
         view.recovered.push_back({milliseconds(range.time), range.from, range.to, range.source});
     }
     for (const FollowLedger::Lost& range : ledger.lost()) {
-        view.lost.push_back({milliseconds(range.time), range.from, range.to, ""});
+        view.lost.push_back({milliseconds(range.time), range.from, range.to, range.source});
     }
     return view;
 }
@@ -74,6 +75,7 @@ void FollowView::write(JsonWriter& json, bool withRanges) const {
         json.endArray().key("lost").beginArray();
         for (const Range& range : lost) {
             writeRange(json, range);
+            writeOrNull(json, "source", range.source);
             json.endObject();
         }
         json.endArray();

@@ -16,12 +16,14 @@ class JsonWriter;
 /// A snapshot of how a log of a [[log]] table is followed. Sizes are in bytes, times in
 /// milliseconds since 1970-01-01 UTC.
 struct FollowView {
-    /// Bytes that a truncation removed before they were read, by their place in the file.
+    /// Bytes that were recovered or lost, by their place in the file.
     struct Range {
         std::int64_t time;
         std::int64_t from;
         std::int64_t to;
-        std::string source; ///< of recovered bytes: the copy from which they were read
+        /// The copy from which they were read, or the generation that holds them and cannot be
+        /// read; empty if there is none.
+        std::string source;
     };
 
     /// "waiting", "reading", "finishing", "missing" or "not a file".

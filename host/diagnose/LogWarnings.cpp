@@ -89,6 +89,15 @@ std::optional<LogWarning> ofFollowing(const FollowView& follow) {
                           ". Check the file's permissions and the disk."};
 }
 
+/// A time as the operator's clock shows it, with its difference from UTC.
+std::string localTime(std::int64_t milliseconds) {
+    const std::time_t seconds = milliseconds / 1000;
+    std::tm local{};
+    char text[64];
+    localtime_r(&seconds, &local);
+    return {text, std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S %z", &local)};
+}
+
 /// What was lost lately of a log of a [[log]] table.
 std::optional<LogWarning> ofLosses(const FollowView& follow) {
     constexpr std::int64_t day = 24 * 60 * 60 * 1000;
@@ -105,12 +114,18 @@ std::optional<LogWarning> ofLosses(const FollowView& follow) {
             : "Bytes " + std::to_string(last.from) + " to " + std::to_string(last.to) + " were";
     const std::string losses =
         count == 1 ? "" : ", the latest of " + std::to_string(count) + " losses in 24 hours";
+    const std::string lost = what + " lost at " + localTime(last.time) + losses;
+    if (!last.source.empty()) {
+        return LogWarning{"lost", 0,
+                          lost + ": " + last.source +
+                              " cannot be read. Check the file and its permissions; once it is "
+                              "readable, a report on the log shows its entries."};
+    }
     return LogWarning{
         "lost", 0,
-        what + " lost at " + UtcTime::text(last.time) + losses +
-            ": removed or rotated away before they were read, and not readable in any "
-            "older file. Rotate by renaming, or keep the older files in the log's directory or "
-            "name theirs in rotated_to."};
+        lost + ": removed or rotated away before they were read, and not readable in any "
+               "older file. Rotate by renaming, or keep the older files in the log's directory or "
+               "name theirs in rotated_to."};
 }
 
 /// Whether a log of the log configuration is also in the list of logs to follow.

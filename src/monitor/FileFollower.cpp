@@ -28,13 +28,14 @@ FileFollower::Moment FileFollower::Moment::now() noexcept {
 
 FileFollower::FileFollower(std::string path, const Options& options, FollowLedger& ledger)
     : m_path(std::move(path)), m_options(options), m_ledger(ledger),
-      m_block(options.recordLength, options.join.get()) {}
+      m_block(options.recordLength, options.join.get()),
+      m_late(options.recordLength, options.join, ledger) {}
 
-void FileFollower::fail(Retry& retry, const char* call, int number) {
+void FileFollower::fail(Retry& retry, const char* call, int number, const std::string& file) {
     ++retry.failures;
     retry.pause = retry.pause.count() == 0 ? firstPause : std::min(2 * retry.pause, longestPause);
     retry.at = m_now.steady + retry.pause;
-    m_ledger.noteFailure(call, number);
+    m_ledger.noteFailure(call, number, file);
 }
 
 void FileFollower::succeed(Retry& retry) {
@@ -81,93 +82,8 @@ bool FileFollower::look(const Moment& now) {
     if (m_options.byName && mayTry(m_nameRetry)) {
         checkName();
     }
-    return mayTry(m_readRetry) && checkFile();
-}
-
-/// Finds the first file to read. False while there is none.
-bool FileFollower::begin() {
-    std::unique_ptr<Generation> named = openNamed();
-    if (!named && m_nameRetry.failures > 0) {
-        return false;
-    }
-    if (m_stored) {
-        takeUp(*m_stored, std::move(named));
-    } else if (named) {
-        beginFirst(std::move(named));
-    }
-    if (m_chain.empty()) {
-        return false;
-    }
-    enter();
-    if (m_stored && m_chain.front().hadName && m_block.readTo() == 0) {
-        insertMissed(); // it may have been truncated before anything of it was read
-    }
-    return true;
-}
-
-/// A log without a position.
-void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
-    Member member;
-    Generation::Status status;
-    const bool isFromEnd = !m_options.fromBeginning && !m_wasAbsent;
-    if (!named->status(status) || (isFromEnd && !named->readTail(status.size, member.tail))) {
-        fail(m_nameRetry, "read", errno);
-        return;
-    }
-    member.from = isFromEnd ? status.size : 0;
-    m_modified = status.modified;
-    if (status.size == 0) {
-        noteOlder();
-    }
-    m_position = positionOf(named->identity(), member.from, member.tail);
-    m_position.modified = m_modified;
-    m_hasPosition = true;
-    member.file = std::move(named);
-    member.hadName = true;
-    m_chain.push_back(std::move(member));
-}
-
-/// A writer that still has the file before this one open writes to it later than this one was made.
-void FileFollower::noteOlder() {
-    for (const GenerationFile& file : generations()) {
-        m_older.push_back(file.identity);
-        noteModified(file.modified);
-    }
-}
-
-/// Continues at a position of an earlier run.
-void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
-    m_position = stored;
-    m_hasPosition = true;
-    m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
-    Found found = find(stored, Search::byContents, named.get());
-    noteUnreadable(found);
-    if (found.failed != nullptr && !found.holder && found.younger.empty()) {
-        return;
-    }
-    const bool isHeld = found.holder.has_value() || stored.offset == 0;
-    Member present;
-    if (found.holder && !found.holder->file) {
-        present = std::move(*found.holder);
-        found.holder.reset();
-    } else if (!isHeld && (named || !found.younger.empty())) {
-        m_ledger.noteLost(stored.offset, stored.offset);
-    }
-    // A copy of the present file may be younger than the position.
-    const Generation* const first = found.holder           ? found.holder->file.get()
-                                    : stored.modified == 0 ? named.get()
-                                                           : nullptr;
-    Generation::Status status;
-    if (first != nullptr && first->status(status)) {
-        m_modified = status.modified;
-    }
-    prepend(found);
-    m_isTakenUp = !m_chain.empty();
-    if (named && found.isAll) {
-        present.file = std::move(named);
-        present.hadName = true;
-        m_chain.push_back(std::move(present));
-    }
+    const bool hasLate = m_late.look(now.steady);
+    return (mayTry(m_readRetry) && checkFile()) || hasLate;
 }
 
 /// Begins with the first file of the chain.
@@ -231,8 +147,12 @@ bool FileFollower::checkFile() {
         if (m_hasSeen && m_isInBlock) {
             noteModified(m_seen.modified); // before what is found now was done
         }
-        if (m_chain.front().hadName && m_block.readTo() == 0 && insertMissed()) {
-            return true;
+        if (m_chain.front().hadName && m_block.readTo() == 0) {
+            const bool isPaused = m_isAwaited && !mayTry(m_youngerRetry);
+            const Missed missed = isPaused ? Missed::awaited : insertMissed();
+            if (missed != Missed::nothing) {
+                return missed == Missed::inserted;
+            }
         }
     }
     m_seen = now;
@@ -254,7 +174,31 @@ char* FileFollower::give(char* entry) noexcept {
 
 char* FileFollower::next() {
     m_isPaused = false;
-    if (m_chain.empty() || !mayTry(m_readRetry)) {
+    m_isLate = false;
+    char* const entry = nextInOrder();
+    return entry != nullptr || m_isPaused ? entry : nextLate();
+}
+
+/// While nothing of the present file was judged, the position is in the one before it. It moves
+/// with the late lines of that, which a restart would read again.
+char* FileFollower::nextLate() {
+    char* const entry = m_late.next();
+    if (entry == nullptr) {
+        return nullptr;
+    }
+    m_isLate = true;
+    noteModified(m_late.modified());
+    m_before = m_position;
+    const LogPosition behind = m_late.position();
+    if (!m_isInBlock && (m_late.isNewest() || identityOf(behind) == identityOf(m_position))) {
+        m_position = behind;
+        m_position.modified = m_modified;
+    }
+    return entry;
+}
+
+char* FileFollower::nextInOrder() {
+    if (m_chain.empty() || !mayTry(m_readRetry) || (m_isAwaited && !mayTry(m_youngerRetry))) {
         return nullptr;
     }
     for (int reads = 0;; ++reads) {
@@ -271,6 +215,7 @@ char* FileFollower::next() {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
             m_known = std::max(m_seen.size, m_block.readTo()); // the file is still the same
+            m_isAwaited = false;
             if (m_head.length < Tail::size) {
                 noteHead();
             }
@@ -279,6 +224,9 @@ char* FileFollower::next() {
         case EntryBlock::Fill::changed:
             if (char* const entry = recover()) {
                 return entry;
+            }
+            if (m_isAwaited) {
+                return nullptr;
             }
             break;
         case EntryBlock::Fill::failed:
@@ -298,13 +246,19 @@ char* FileFollower::next() {
             if (char* const entry = finish()) {
                 return entry;
             }
-            switchToNext();
+            if (!switchToNext()) {
+                return nullptr;
+            }
             break;
         }
     }
 }
 
 bool FileFollower::takeBack() noexcept {
+    if (m_isLate) {
+        m_position = m_before;
+        return m_late.takeBack();
+    }
     const bool isTaken = m_block.takeBack();
     m_isInBlock = isTaken ? m_wasInBlock : m_isInBlock;
     return isTaken;

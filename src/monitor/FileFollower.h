@@ -7,6 +7,7 @@
 #include "monitor/FollowLedger.h"
 #include "monitor/Generation.h"
 #include "monitor/GenerationNames.h"
+#include "monitor/LateLines.h"
 
 #include <chrono>
 #include <cstddef>
@@ -25,10 +26,13 @@ namespace zrm {
 /// read, from where, and when the next one takes over.
 ///
 /// A file that has lost the log's name is read to its end and until it has been quiet for a while;
-/// then the generations between it and the present file are read, then that. After a truncation the
-/// rest of the old contents is looked for in the copies beside the log. A position is found again
-/// by the file's identity and the bytes before it, or by the bytes alone. A call that fails is
-/// tried again after growing pauses, without end. Has no thread and traces nothing. One thread.
+/// then the generations between it and the present file are read, then that. What is written to an
+/// older file after that is read between the entries of the present one (LateLines). After a
+/// truncation the rest of the old contents is looked for in the copies beside the log. A position
+/// is found again by the file's identity and the bytes before it, or by the bytes alone. A call
+/// that fails is tried again after growing pauses, without end; a generation that cannot be read is
+/// lost after half a minute. Searching large compressed files obeys Interruption. Has no thread and
+/// traces nothing. One thread.
 class FileFollower {
 public:
     struct Options {
@@ -67,10 +71,15 @@ public:
     /// it cannot.
     bool takeBack() noexcept;
     /// The text of the last entry, and whether the entry is longer, as EntryBlock gives them.
-    std::string_view text() const noexcept { return m_block.text(); }
-    bool isTextCut() const noexcept { return m_block.isTextCut(); }
-    /// Behind the last entry. None before a file has been opened.
+    std::string_view text() const noexcept { return m_isLate ? m_late.text() : m_block.text(); }
+    bool isTextCut() const noexcept { return m_isLate ? m_late.isTextCut() : m_block.isTextCut(); }
+    /// Behind the last entry of the file that is read. None before a file has been opened. Entries
+    /// that come late to an older file do not move it.
     std::optional<LogPosition> position() const noexcept;
+    /// True if the last entry came late to an older file.
+    bool isLate() const noexcept { return m_isLate; }
+    /// How far the older files were read to which late lines may come.
+    std::vector<LateLines::Left> takeLeft() { return m_late.takeLeft(); }
     /// The file that is read, and where in it the next entry begins. None while there is no file.
     struct Place {
         Generation& file;
@@ -78,7 +87,9 @@ public:
     };
     std::optional<Place> place() const noexcept;
     /// How many bytes were read since the last call.
-    std::int64_t takeBytesRead() noexcept { return std::exchange(m_bytesRead, 0); }
+    std::int64_t takeBytesRead() noexcept {
+        return std::exchange(m_bytesRead, 0) + m_late.takeBytesRead();
+    }
     /// Updates the position in the ledger.
     void noteProgress();
     /// The file that is read, if any.
@@ -95,12 +106,19 @@ private:
         bool isRecovery = false; ///< read instead of what a truncation removed
     };
     struct Found {
-        std::optional<Member> holder;     ///< the file that has the position
-        std::vector<Member> younger;      ///< the generations after it, without the present file
-        bool isAll = true;                ///< false: there are more of them
-        const char* failed = nullptr;     ///< what failed for a generation that is waited for
-        int number = 0;                   ///< errno of that
-        std::vector<std::int64_t> lost{}; ///< known sizes of those that are given up
+        /// A generation that cannot be read.
+        struct Unreadable {
+            GenerationFile file;
+            const char* call; ///< that failed
+            int number;       ///< errno
+        };
+
+        std::optional<Member> holder;       ///< the file that has the position
+        std::vector<Member> younger;        ///< the generations after it, without the present file
+        bool isAll = true;                  ///< false: there are more of them
+        std::optional<Unreadable> awaited;  ///< tried again before those after it are read
+        std::vector<GenerationFile> lost{}; ///< given up
+        bool isInterrupted = false;         ///< nothing is known
     };
     /// Counts how long to leave alone what has failed.
     struct Retry {
@@ -109,6 +127,19 @@ private:
         int failures = 0;
     };
     enum class Search : unsigned char { byIdentity, byContents };
+    enum class Missed : unsigned char { nothing, inserted, awaited };
+    /// A file and its first bytes, as far as they were read: inodes are used again.
+    struct Older {
+        FileIdentity identity;
+        Tail head{};
+    };
+    /// A generation that could not be read for so long that it counts as lost.
+    struct GivenUp {
+        FileIdentity identity;
+        std::int64_t modified;
+
+        bool operator==(const GivenUp&) const = default;
+    };
 
     // Which files there are (FileFollowerSearch.cpp).
     std::unique_ptr<Generation> openNamed();
@@ -119,15 +150,17 @@ private:
                                      const std::vector<GenerationFile>& files, bool& vanished);
     bool openYounger(const GenerationReference& reference, const std::vector<GenerationFile>& files,
                      Generation* named, Found& found);
-    bool waitsFor(const GenerationFile& unreadable, const std::vector<GenerationFile>& files,
-                  const Generation* named, Found& found) const;
-    void noteUnreadable(const Found& found);
+    void noteUnreadable(const Found::Unreadable& unreadable,
+                        const std::vector<GenerationFile>& files, Found& found) const;
+    bool isCountedLost(const GenerationFile& file) const noexcept;
+    void takeUnreadable(const Found& found, std::int64_t from = 0, std::int64_t to = 0);
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
     std::vector<GenerationFile> generations(ino_t inode = 0);
 
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
-    bool insertMissed();
+    bool isOlder(Generation& file) const;
+    Missed insertMissed();
     void noteHead();
     void dropShortCopy(Found& found, std::int64_t offset) const;
     bool hasCopyOfWaiting();
@@ -144,7 +177,9 @@ private:
     bool isFinished() const noexcept;
     void noteModified(std::int64_t time) noexcept;
     LogPosition positionInBlock() const noexcept;
-    void switchToNext();
+    bool switchToNext();
+    char* nextInOrder();
+    char* nextLate();
     char* give(char* entry) noexcept;
     bool hasWaitedEnough() noexcept;
     bool isGivenUp() const noexcept;
@@ -153,10 +188,12 @@ private:
     void enter();
     void notePresent();
     bool mayTry(const Retry& retry) const noexcept { return m_now.steady >= retry.at; }
-    void fail(Retry& retry, const char* call, int number);
+    void fail(Retry& retry, const char* call, int number, const std::string& file = {});
+    static std::string sourceOf(const Member& member);
     void succeed(Retry& retry);
 
-    static constexpr int mostReadFailures = 5; ///< of a file that others follow
+    static constexpr int mostReadFailures = 5;      ///< of a file that others follow
+    static constexpr std::size_t mostGivenUp = 256; ///< that are remembered
 
     const std::string m_path;
     const Options m_options;
@@ -166,9 +203,12 @@ private:
     bool m_wasAbsent = false; ///< nothing had the name at an earlier look
     bool m_isTakenUp = false; ///< files rotated before the start are read
     /// What was beside the first file, if that was empty: older, whenever it was written to.
-    std::vector<FileIdentity> m_older;
+    std::vector<Older> m_older;
     std::deque<Member> m_chain; ///< the first is read; the last has the name, unless it lost it
     EntryBlock m_block;
+    LateLines m_late;
+    bool m_isLate = false;  ///< the last entry is of m_late
+    LogPosition m_before;   ///< m_position before that
     LogPosition m_position; ///< if it is not in the block
     bool m_hasPosition = false;
     bool m_wasInBlock = false; ///< m_isInBlock before the last entry
@@ -188,7 +228,9 @@ private:
     std::int64_t m_bytesRead = 0;
     Retry m_nameRetry;
     Retry m_readRetry;
-    Retry m_youngerRetry;   ///< of a generation that cannot be read
+    Retry m_youngerRetry;     ///< of a generation that cannot be read
+    bool m_isAwaited = false; ///< the file that is read comes after that generation
+    std::vector<GivenUp> m_givenUp;
     std::string m_siblings; ///< the log's path without symbolic links, as last known
 };
 

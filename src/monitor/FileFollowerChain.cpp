@@ -33,25 +33,45 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
         reference.modified = std::max(reference.modified, m_modified);
     }
     Found found = findYounger(reference, named.get());
-    noteUnreadable(found);
+    if (found.isInterrupted) {
+        return;
+    }
+    takeUnreadable(found);
     std::move(found.younger.begin(), found.younger.end(), std::back_inserter(m_chain));
     if (found.isAll) {
         Member present;
+        // An older file may have got the name back.
+        const std::optional<LogPosition> left = m_late.remove(named->identity());
+        if (left && named->holds(*left, present.tail)) {
+            present.from = left->offset;
+        }
         present.file = std::move(named);
         present.hadName = true;
         m_chain.push_back(std::move(present));
     }
 }
 
+bool FileFollower::isOlder(Generation& file) const {
+    return std::any_of(m_older.begin(), m_older.end(), [&file](const Older& older) {
+        Tail head;
+        return older.identity == file.identity() && file.readHead(head) >= older.head.length &&
+               std::equal(head.bytes.begin(), head.bytes.begin() + older.head.length,
+                          older.head.bytes.begin());
+    });
+}
+
 /// The present file has nothing that was read, so that a truncation is not seen in it. What was in
-/// it before may be in a copy. True if there is one, which is read first.
-bool FileFollower::insertMissed() {
+/// it before may be in a copy, which is read first.
+FileFollower::Missed FileFollower::insertMissed() {
     Found found = find(m_position, Search::byIdentity, nullptr);
+    takeUnreadable(found);
+    m_isAwaited = found.awaited || found.isInterrupted;
+    if (m_isAwaited) {
+        return Missed::awaited;
+    }
     const bool isHeld = found.holder.has_value();
     found.holder.reset();
-    std::erase_if(found.younger, [this](const Member& member) {
-        return std::find(m_older.begin(), m_older.end(), member.file->identity()) != m_older.end();
-    });
+    std::erase_if(found.younger, [this](const Member& member) { return isOlder(*member.file); });
     if (m_chain.size() > 1) {
         // What was copied after this file had lost its name belongs behind it.
         Generation::Status mine{};
@@ -62,7 +82,7 @@ bool FileFollower::insertMissed() {
         });
     }
     if (found.younger.empty()) {
-        return false;
+        return Missed::nothing;
     }
     if (!isHeld) {
         continueIn(found.younger.front());
@@ -72,7 +92,7 @@ bool FileFollower::insertMissed() {
     }
     prepend(found);
     enter();
-    return true;
+    return Missed::inserted;
 }
 
 /// A copy that was made before a truncation is recognised by its beginning.
@@ -105,23 +125,33 @@ void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
     }
 }
 
-/// True if a file has all lines of this one that wait, with what may continue them.
+/// True if a file has all lines of this one that wait, with what may continue them, or if one that
+/// cannot be read yet may have them.
 bool FileFollower::hasCopyOfWaiting() {
     const Found found = find(positionInBlock(), Search::byContents, nullptr);
+    if (found.awaited || found.isInterrupted) {
+        return true;
+    }
     char last;
     return found.holder && found.holder->file->readAt(&last, 1, m_block.waitingTo() - 1) == 1;
 }
 
 /// The file no longer has what was read of it: it was truncated. The rest of the old contents is
 /// read from a copy, as far as there is one; then the file is read from its beginning. Gives lines
-/// that wait and are in no copy.
+/// that wait and are in no copy. Nothing is changed while a file that may be the copy is awaited.
 char* FileFollower::recover() {
     if (m_block.isWaiting() && !hasCopyOfWaiting()) {
         return give(m_block.endWaiting());
     }
-    m_ledger.noteTruncation();
     const LogPosition at = *position();
     const std::int64_t known = std::max(m_known, m_block.readTo());
+    Found found = find(at, Search::byContents, nullptr);
+    takeUnreadable(found, at.offset, known);
+    m_isAwaited = found.awaited || found.isInterrupted;
+    if (m_isAwaited) {
+        return nullptr;
+    }
+    m_ledger.noteTruncation();
     m_position = at;
     m_hasPosition = true;
     m_isInBlock = false;
@@ -131,11 +161,10 @@ char* FileFollower::recover() {
     // Not if the file was truncated before, and nothing in it was judged since.
     const bool isOwn =
         identityOf(at) == truncated.file->identity() && at.offset == m_block.offset();
-    Found found = find(at, Search::byContents, nullptr);
     if (isOwn && !found.holder) {
         dropShortCopy(found, at.offset);
     }
-    if (isOwn ? !found.holder : found.younger.empty()) {
+    if (found.lost.empty() && (isOwn ? !found.holder : found.younger.empty())) {
         const std::int64_t from = isOwn ? at.offset : 0;
         m_ledger.noteLost(from, std::max(from, known));
     }

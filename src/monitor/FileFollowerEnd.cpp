@@ -36,7 +36,8 @@ bool FileFollower::isFinished() const noexcept {
            m_now.wall - now.changed >= std::chrono::nanoseconds(m_options.rotateWait).count();
 }
 
-void FileFollower::switchToNext() {
+/// False if the next file is not read yet.
+bool FileFollower::switchToNext() {
     Member finished = std::move(m_chain.front());
     m_chain.pop_front();
     m_older.clear();
@@ -56,11 +57,17 @@ void FileFollower::switchToNext() {
         identityOf(m_position) == finished.file->identity()) {
         continueIn(next);
     }
+    if (!finished.isComplete && !finished.isRecovery && !finished.file->isCompressed()) {
+        m_late.add(std::move(finished.file), m_block.offset(), m_block.tail(), m_now.steady);
+    }
     m_isTakenUp = m_isTakenUp && m_chain.size() > 1;
     enter();
-    if (m_chain.front().hadName && m_block.readTo() == 0) {
-        insertMissed();
-    }
+    return !m_chain.front().hadName || m_block.readTo() != 0 || insertMissed() != Missed::awaited;
+}
+
+/// What the ledger calls a file: nothing if it is the one that has the log's name.
+std::string FileFollower::sourceOf(const Member& member) {
+    return member.hadName ? "" : member.file->path();
 }
 
 /// True if the file is not read any further should a read fail now.
@@ -72,12 +79,12 @@ bool FileFollower::isGivenUp() const noexcept {
 /// A read has failed. True if reading goes on at once.
 bool FileFollower::handleFailedRead() {
     const int number = errno;
-    if (number == EINTR) {
-        return true;
+    if (number == EINTR || number == ECANCELED) {
+        return number == EINTR; // interrupted for good
     }
     Member& member = m_chain.front();
     const bool isHopeless = isGivenUp();
-    fail(m_readRetry, "read", number);
+    fail(m_readRetry, "read", number, sourceOf(member));
     if (!isHopeless) {
         // Descriptors of network file systems go stale.
         std::unique_ptr<Generation> again = Generation::open(member.file->path());
@@ -87,10 +94,10 @@ bool FileFollower::handleFailedRead() {
         return false;
     }
     const std::int64_t size = member.file->isCompressed() ? 0 : m_seen.size; // of its contents
-    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), size));
+    m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), size), sourceOf(member));
     succeed(m_readRetry);
-    switchToNext();
-    return true;
+    member.isComplete = true;
+    return switchToNext();
 }
 
 /// What a file that is finished has behind its last whole entry: lines that waited, an unfinished
@@ -101,7 +108,7 @@ char* FileFollower::finish() {
     if (entry != nullptr) {
         m_wasInBlock = std::exchange(m_isInBlock, true);
     } else if (m_block.offset() > from) {
-        m_ledger.noteLost(from, m_block.offset());
+        m_ledger.noteLost(from, m_block.offset(), sourceOf(m_chain.front()));
     }
     return entry;
 }

@@ -1,5 +1,7 @@
 #include "monitor/FileFollower.h"
 
+#include "monitor/Interruption.h"
+
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
@@ -59,6 +61,9 @@ std::unique_ptr<Generation> FileFollower::openNamed() {
                                           : FollowLedger::State::missing);
         succeed(m_nameRetry);
     } else {
+        if (number == EMFILE) {
+            m_late.clear();
+        }
         fail(m_nameRetry, call, number);
     }
     return named;
@@ -74,35 +79,51 @@ std::vector<GenerationFile> FileFollower::generations(ino_t inode) {
     return findGenerations(m_siblings.empty() ? m_path : m_siblings, inode, m_options.rotatedTo);
 }
 
-/// True if a generation that cannot be read is tried again before those after it are read. After
-/// some failures it is lost. Beside a file that is read already, nothing is waited for.
-bool FileFollower::waitsFor(const GenerationFile& unreadable,
-                            const std::vector<GenerationFile>& files, const Generation* named,
-                            Found& found) const {
-    const std::string original = unreadable.path.substr(0, unreadable.path.rfind('.'));
+/// A generation that cannot be read is tried again before those after it are read; after some
+/// failures it is lost.
+void FileFollower::noteUnreadable(const Found::Unreadable& unreadable,
+                                  const std::vector<GenerationFile>& files, Found& found) const {
+    const GenerationFile& file = unreadable.file;
+    const std::string original = file.path.substr(0, file.path.rfind('.'));
     const bool isBeingCompressed =
-        unreadable.isCompressed &&
+        file.isCompressed &&
         (original == m_path || original == m_siblings ||
          std::any_of(files.begin(), files.end(),
-                     [&original](const GenerationFile& file) { return file.path == original; }));
-    if (unreadable.size == 0 || isBeingCompressed) {
-        return false;
-    }
-    if (m_options.byName && (named != nullptr || m_chain.empty()) &&
-        m_youngerRetry.failures < mostReadFailures) {
-        return true;
-    }
-    found.lost.push_back(unreadable.isCompressed ? 0 : unreadable.size); // of its contents
-    return false;
-}
-
-void FileFollower::noteUnreadable(const Found& found) {
-    if (found.failed != nullptr) {
-        fail(m_youngerRetry, found.failed, found.number);
+                     [&original](const GenerationFile& other) { return other.path == original; }));
+    if (file.size == 0 || isBeingCompressed) {
         return;
     }
-    for (const std::int64_t size : found.lost) {
-        m_ledger.noteLost(0, size);
+    if (m_options.byName && m_youngerRetry.failures < mostReadFailures) {
+        found.awaited = unreadable;
+        found.isAll = false;
+    } else {
+        found.lost.push_back(file);
+    }
+}
+
+bool FileFollower::isCountedLost(const GenerationFile& file) const noexcept {
+    return std::find(m_givenUp.begin(), m_givenUp.end(), GivenUp{file.identity, file.modified}) !=
+           m_givenUp.end();
+}
+
+/// Notes what cannot be read, and waits if it is to be tried again. `from`, `to`: what the first of
+/// the lost ones would have been read for, as far as that is known.
+void FileFollower::takeUnreadable(const Found& found, std::int64_t from, std::int64_t to) {
+    if (found.isInterrupted) {
+        return;
+    }
+    if (found.awaited) {
+        fail(m_youngerRetry, found.awaited->call, found.awaited->number, found.awaited->file.path);
+        return;
+    }
+    for (const GenerationFile& file : found.lost) {
+        const std::int64_t size = file.isCompressed ? 0 : file.size; // of its contents
+        m_ledger.noteLost(from, std::max({from, to, size}), file.path);
+        from = to = 0;
+        if (m_givenUp.size() == mostGivenUp) {
+            m_givenUp.erase(m_givenUp.begin());
+        }
+        m_givenUp.push_back({file.identity, file.modified});
     }
     succeed(m_youngerRetry);
 }
@@ -122,6 +143,7 @@ FileFollower::Found FileFollower::find(const LogPosition& position, Search searc
             break;
         }
     }
+    found.isInterrupted = Interruption::isDue();
     return found;
 }
 
@@ -134,6 +156,7 @@ FileFollower::Found FileFollower::findYounger(const GenerationReference& referen
             break;
         }
     }
+    found.isInterrupted = Interruption::isDue();
     return found;
 }
 
@@ -219,7 +242,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
                                Found& found) {
     std::vector<Member> candidates;
     for (const GenerationFile& file : youngerThan(files, reference)) {
-        if (isKnown(file.identity, named)) {
+        if (isKnown(file.identity, named) || m_late.has(file.identity) || isCountedLost(file)) {
             continue;
         }
         if (candidates.size() == mostOpen) {
@@ -245,10 +268,10 @@ bool FileFollower::openYounger(const GenerationReference& reference,
             continue;
         }
         number = count < 0 ? errno : number;
-        if (number != 0 && number != ENOENT && waitsFor(file, files, named, found)) {
-            found.failed = count < 0 ? "read of a rotated file" : "open of a rotated file";
-            found.number = number;
-            found.isAll = false;
+        if (number != 0 && number != ENOENT) {
+            noteUnreadable({file, count < 0 ? "read" : "open", number}, files, found);
+        }
+        if (found.awaited) {
             break;
         }
     }

@@ -7,9 +7,9 @@
 
 namespace zrm {
 
-void FollowLedger::noteFailure(const char* call, int number) {
+void FollowLedger::noteFailure(const char* call, int number, const std::string& file) {
     const LockGuard guard(&m_lock);
-    m_failure = Failure{call, number, m_failure ? m_failure->since : wallTime()};
+    m_failure = Failure{call, number, m_failure ? m_failure->since : wallTime(), file};
 }
 
 void FollowLedger::clearFailure() {
@@ -49,12 +49,12 @@ void FollowLedger::noteRecovered(const std::string& source, std::int64_t from, s
     }
 }
 
-void FollowLedger::noteLost(std::int64_t from, std::int64_t to) {
+void FollowLedger::noteLost(std::int64_t from, std::int64_t to, const std::string& source) {
     m_lostBytes.fetch_add(to - from, std::memory_order_relaxed);
     m_losses.fetch_add(1, std::memory_order_relaxed);
     const LockGuard guard(&m_lock);
     if (Lost* const lost = m_lost.next()) {
-        *lost = {wallTime(), from, to};
+        *lost = {wallTime(), source, from, to};
     }
 }
 

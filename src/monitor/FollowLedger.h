@@ -30,6 +30,7 @@ public:
         const char* call; ///< static text: "open", "read", ...
         int number;       ///< errno
         std::timespec since;
+        std::string file; ///< path of a generation; empty: the file that has the log's name
     };
     /// Bytes that a truncation removed before they were read, read from a copy.
     struct Recovered {
@@ -41,6 +42,7 @@ public:
     /// Bytes that were in a file and could not be read.
     struct Lost {
         std::timespec time;
+        std::string source; ///< path of the generation that has them; empty: unknown, or gone
         std::int64_t from;
         std::int64_t to; ///< one past the last byte known to have been there; there may be more
     };
@@ -58,7 +60,7 @@ public:
     // On the log's thread.
 
     void setState(State state) noexcept { m_state.store(state, std::memory_order_relaxed); }
-    void noteFailure(const char* call, int number);
+    void noteFailure(const char* call, int number, const std::string& file = {});
     /// What had failed works again.
     void clearFailure();
     void noteGeneration(const FileIdentity& identity, const std::string& path);
@@ -66,7 +68,7 @@ public:
     void notePosition(std::int64_t offset, std::int64_t behind) noexcept;
     /// Ranges of one source that follow each other are kept as one.
     void noteRecovered(const std::string& source, std::int64_t from, std::int64_t to);
-    void noteLost(std::int64_t from, std::int64_t to);
+    void noteLost(std::int64_t from, std::int64_t to, const std::string& source = {});
     void noteTruncation() noexcept { m_truncations.fetch_add(1, std::memory_order_relaxed); }
     void noteCut() noexcept { m_cut.fetch_add(1, std::memory_order_relaxed); }
 

@@ -3,6 +3,7 @@
 #include "monitor/DescriptorReserve.h"
 #include "monitor/GenerationNames.h"
 #include "monitor/GenerationReader.h"
+#include "monitor/Interruption.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -22,6 +23,7 @@ constexpr std::size_t comparedBytes = 4096; ///< at either end, to recognise a c
 /// Of contents that are compressed, which have no end to look at. A limit, since they may be very
 /// much longer than their file.
 constexpr std::int64_t mostComparedBytes = 64 * 1024 * 1024;
+constexpr std::int64_t bytesPerCheck = 1024 * 1024; ///< passed over between two interruptions
 
 std::int64_t nanoseconds(const timespec& time) noexcept {
     return static_cast<std::int64_t>(time.tv_sec) * 1'000'000'000 + time.tv_nsec;
@@ -139,9 +141,14 @@ std::ptrdiff_t Generation::readCompressed(char* buffer, std::size_t room,
             errno = EIO;
             return -1;
         }
+        const std::int64_t from = m_readTo;
         m_readTo += count;
         if (count == 0 || before <= 0) {
             return count;
+        }
+        if (from / bytesPerCheck != m_readTo / bytesPerCheck && Interruption::isDue()) {
+            errno = ECANCELED;
+            return -1;
         }
     }
 }
@@ -176,6 +183,12 @@ bool Generation::readTail(std::int64_t offset, Tail& tail) noexcept {
     return tail.length == wanted;
 }
 
+std::size_t Generation::readHead(Tail& head) noexcept {
+    const std::ptrdiff_t count = readWhole(head.bytes.data(), Tail::size, 0);
+    head.length = count > 0 ? static_cast<std::size_t>(count) : 0;
+    return head.length;
+}
+
 bool Generation::holds(const LogPosition& position, Tail& tail) {
     if (position.guardLength > Tail::size || position.offset < position.guardLength) {
         return false;
@@ -206,6 +219,9 @@ bool Generation::isBeginningOf(Generation& other) {
             return false;
         }
         offset += length;
+        if (offset % bytesPerCheck == 0 && Interruption::isDue()) {
+            return false;
+        }
     }
     return true;
 }

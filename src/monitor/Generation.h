@@ -55,7 +55,8 @@ public:
     ~Generation();
 
     /// Reads at most `room` bytes at an offset. 0 at the end; -1 and errno if that fails. Contents
-    /// of a compressed file are read forward; going back begins again.
+    /// of a compressed file are read forward; going back begins again. ECANCELED if passing over
+    /// them was interrupted (Interruption).
     std::ptrdiff_t readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept;
     /// True if the contents have the position's guard before its offset, which then are in `tail`.
     bool holds(const LogPosition& position, Tail& tail);
@@ -64,6 +65,9 @@ public:
     bool isCopyOf(Generation& other);
     /// The bytes before the offset. False and errno if they cannot be read.
     bool readTail(std::int64_t offset, Tail& tail) noexcept;
+
+    /// The first bytes. Returns how many there are, 0 if they cannot be read.
+    std::size_t readHead(Tail& head) noexcept;
 
     /// Moves the descriptor's own position, which nothing here reads, so that the system's tools
     /// show how far a plain file was read.

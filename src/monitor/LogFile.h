@@ -214,6 +214,7 @@ private:
     void recount(FileFollower& follower, std::size_t recordLength);
     bool readEntries(FileFollower& follower, LogPositions& positions, FollowedEntry& current);
     void noteFollowed(FileFollower& follower, LogPositions& positions);
+    void endFollowing(FileFollower& follower, LogPositions& positions);
     void noteFollowFailure();
     void noteTruncated(std::int64_t newEnd, LogLedger::Truncation kind);
     void pushBack(_LogBufferInfo* info);

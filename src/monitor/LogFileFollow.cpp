@@ -6,8 +6,11 @@
 #include "logs/FollowSettings.h"
 #include "monitor/FileFollower.h"
 #include "monitor/FollowedEntry.h"
+#include "monitor/Interruption.h"
 
+#include <algorithm>
 #include <utility>
+#include <vector>
 
 #include <sys/select.h>
 
@@ -42,17 +45,38 @@ std::int64_t traceLosses(const FollowLedger& ledger, const char* file, std::int6
     if (losses == known) {
         return losses;
     }
-    const FollowLedger::Lost lost = ledger.lost().back();
-    if (lost.from < lost.to) {
-        trace.error()("Lines of %s were lost: bytes %lld to %lld were removed before they were "
-                      "read, or cannot be read, and no copy has them.",
-                      file, static_cast<long long>(lost.from), static_cast<long long>(lost.to));
-    } else {
-        trace.error()("Lines of %s may have been lost: the file in which reading stopped at byte "
-                      "%lld is gone or cannot be read, with what was written to it after that.",
-                      file, static_cast<long long>(lost.from));
+    const std::vector<FollowLedger::Lost> kept = ledger.lost();
+    const auto added = std::min<std::size_t>(static_cast<std::size_t>(losses - known), kept.size());
+    for (std::size_t i = kept.size() - added; i < kept.size(); ++i) {
+        const FollowLedger::Lost& lost = kept[i];
+        const auto from = static_cast<long long>(lost.from);
+        const auto to = static_cast<long long>(lost.to);
+        if (!lost.source.empty() && from < to) {
+            trace.error()("Lines of %s were lost: bytes %lld to %lld of %s cannot be read.", file,
+                          from, to, lost.source.c_str());
+        } else if (!lost.source.empty()) {
+            trace.error()("Lines of %s were lost: the contents of %s cannot be read from byte %lld "
+                          "on. If it is damaged, lines read before that may be wrong.",
+                          file, lost.source.c_str(), from);
+        } else if (from < to) {
+            trace.error()("Lines of %s were lost: bytes %lld to %lld were removed before they were "
+                          "read, or cannot be read, and no copy has them.",
+                          file, from, to);
+        } else {
+            trace.error()("Lines of %s may have been lost: the file in which reading stopped at "
+                          "byte %lld is gone or cannot be read, with what was written to it after "
+                          "that.",
+                          file, from);
+        }
     }
     return losses;
+}
+
+/// Records how far the files were read that reading has left.
+void noteLeft(FileFollower& follower, LogPositions& positions) {
+    for (const LateLines::Left& left : follower.takeLeft()) {
+        positions.left(left.position, left.isWatched);
+    }
 }
 
 } // namespace
@@ -70,6 +94,10 @@ void LogFile::followLog(std::size_t recordLength) {
     if (stored) {
         follower.resumeAt(*stored);
     }
+    const Interruption interruption([this] {
+        m_pulse.work("searches a compressed file");
+        return isReadingOver();
+    });
     std::int64_t losses = 0;
     bool isRecountDue = stored.has_value() && positions.isFirstOfRun();
     for (bool isLast = false; !isLast;) {
@@ -101,7 +129,18 @@ void LogFile::followLog(std::size_t recordLength) {
             select(0, nullptr, nullptr, nullptr, &interval);
         }
     }
+    endFollowing(follower, positions);
+}
+
+/// Whoever comes to follow the files under other names continues where this log has left them.
+void LogFile::endFollowing(FileFollower& follower, LogPositions& positions) {
     m_ledger.noteFile(std::nullopt);
+    for (const LateLines::Left& left : follower.takeLeft()) {
+        positions.left(left.position, false);
+    }
+    if (const auto position = follower.position()) {
+        positions.left(*position, false);
+    }
 }
 
 /// Judges what there is to read. False if the log has to end before an entry was judged, which then
@@ -130,6 +169,9 @@ bool LogFile::readEntries(FileFollower& follower, LogPositions& positions, Follo
         }
         if (positions.hasEvents()) {
             positions.endEntry(*follower.position());
+            if (follower.isLate()) {
+                noteLeft(follower, positions);
+            }
         }
         if (entries % entriesPerClock == 0 &&
             std::chrono::steady_clock::now() - noted >= noteInterval) {
@@ -162,6 +204,7 @@ void LogFile::noteFollowed(FileFollower& follower, LogPositions& positions) {
     if (const auto position = follower.position()) {
         positions.reached(*position);
     }
+    noteLeft(follower, positions);
     m_ledger.noteFile(follower.file());
     m_ledger.addBytes(follower.takeBytesRead());
     follower.noteProgress();
@@ -173,8 +216,10 @@ void LogFile::noteFollowFailure() {
     const auto failure = m_followLedger->failure();
     if (failure && !m_isFailureTraced) {
         const ErrorText error(failure->number);
-        trace.error()("Error while following file %s: %s failed and is tried again. errno = %d; %s",
-                      fileNameLocal(), failure->call, error.number(), error.text());
+        trace.error()(
+            "Error while following file %s: %s%s%s failed and is tried again. errno = %d; %s",
+            fileNameLocal(), failure->call, failure->file.empty() ? "" : " of ",
+            failure->file.c_str(), error.number(), error.text());
     } else if (!failure && m_isFailureTraced) {
         trace.error()("File %s is read again.", fileNameLocal());
     }

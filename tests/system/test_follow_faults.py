@@ -213,6 +213,40 @@ def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
     assert agent.stop() == 0
 
 
+@pytest.mark.slow
+def test_a_generation_that_cannot_be_read_is_named_and_waited_for(agent):
+    log = followed(agent)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    assert agent.stop() == 0
+    log.path.rename(agent.directory / "app.log.3")
+    readable, damaged = agent.directory / "app.log.2.gz", agent.directory / "app.log.1.gz"
+    readable.write_bytes(b"\x1f\x8b\x08\x00" + b"not compressed" * 20)
+    damaged.write_bytes(readable.read_bytes())
+    log.path.write_text(syslog_line("four"))
+    agent.start()
+    agent.wait_trace(f"Error while following file {log}: read of {readable} failed and is tried again.")
+    problem = wait_until(lambda: follow_of(agent, log)["problem"], "the problem")
+    assert problem.startswith(f"read of {readable} failed and is tried again: ")
+    readable.write_bytes(gzip.compress(syslog_line("two").encode()))
+    agent.wait_events(2)
+    agent.wait_events(3)
+    assert descriptions(agent.events()) == ["one", "two", "four"]
+    agent.wait_trace(f"Lines of {log} were lost: the contents of {damaged} cannot be read from byte 0 on.")
+    (lost,) = follow_of(agent, log)["lost"]
+    assert lost["source"] == str(damaged) and (lost["from"], lost["to"]) == (0, 0)
+
+    def losses():
+        return [one for one in warnings_of(agent, log) if one["kind"] == "lost"]
+
+    (warning,) = wait_until(losses, "the warning")
+    assert f"{damaged} cannot be read." in warning["text"]
+    assert agent.stop() == 0
+
+
 # ---------------------------------------------------------------------- a file without entries
 
 

@@ -154,7 +154,7 @@ def test_the_client_shows_everything_about_a_followed_log(agent):
         "cut entries": "0",
     }
     heading, recovered, lost = ranges.splitlines()
-    assert heading.split() == "TIME WHAT FROM BYTE TO BYTE READ FROM".split()
+    assert heading.split() == "TIME WHAT FROM BYTE TO BYTE FILE".split()
     assert re.fullmatch(rf"{TIME} +recovered +{before} +{copied} +{re.escape(str(log))}\.1", recovered)
     assert re.fullmatch(rf"{TIME} +lost +{size} +{size + 11} *", lost)
     assert client("logs", "--check")[0] == 1

@@ -16,7 +16,7 @@ const RANGES = [
   { label: "From byte", className: "num" },
   { label: "To byte", className: "num" },
   { label: "Bytes", className: "num" },
-  { label: "Read from", className: "wide break" },
+  { label: "File", className: "wide break" },
 ];
 
 /** The table of the configuration that follows a log, of those that name or match it. */

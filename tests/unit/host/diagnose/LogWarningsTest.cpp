@@ -2,6 +2,7 @@
 
 #include "host/base/TimeText.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TimeZone.h"
 
 #include <cstring>
 #include <ctime>
@@ -71,7 +72,13 @@ TEST_F(LogWarningsTest, ChecksTheNameOfAnOpenFile) {
 
 TEST_F(LogWarningsTest, WarnsAboutWhatWasLostWithinADay) {
     constexpr std::int64_t hour = 60 * 60 * 1000;
+    const TimeZone zone("EST5");
     const std::int64_t now = WallClock::now();
+    const auto local = [](std::int64_t time) {
+        std::string text = UtcTime::text(time - 5 * hour).substr(0, 19);
+        text[10] = ' ';
+        return text + " -0500";
+    };
     LogLedgerView log = opened();
     log.follow.emplace().state = "reading";
     EXPECT_THAT(kindsOf(log), IsEmpty());
@@ -80,14 +87,16 @@ TEST_F(LogWarningsTest, WarnsAboutWhatWasLostWithinADay) {
     log.follow->lost.push_back({now - 23 * hour, 200, 260, ""});
     ASSERT_THAT(kindsOf(log), ElementsAre("lost"));
     EXPECT_THAT(LogWarnings::of(log)[0].text,
-                testing::StartsWith("Bytes 200 to 260 were lost at " +
-                                    UtcTime::text(now - 23 * hour) + ": removed"));
+                testing::StartsWith("Bytes 200 to 260 were lost at " + local(now - 23 * hour) +
+                                    ": removed"));
     log.follow->lost.push_back({now, 300, 300, ""});
     log.follow->problem = "open failed and is tried again: Too many levels of symbolic links";
     EXPECT_THAT(kindsOf(log), ElementsAre("failing", "lost"));
     EXPECT_THAT(LogWarnings::of(log)[1].text,
-                testing::StartsWith("What followed byte 300 was lost at " + UtcTime::text(now) +
+                testing::StartsWith("What followed byte 300 was lost at " + local(now) +
                                     ", the latest of 2 losses in 24 hours: "));
+    log.follow->lost.push_back({now, 0, 50, "/var/log/app.log.1"});
+    EXPECT_THAT(LogWarnings::of(log)[1].text, HasSubstr(": /var/log/app.log.1 cannot be read."));
 }
 
 TEST_F(LogWarningsTest, WarnsAboutASyslogFileWithoutTimes) {

@@ -1,0 +1,100 @@
+#include "monitor/FileFollower.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+namespace zrm {
+
+// Where reading begins: in the file that has the log's name, or at the position of an earlier run.
+
+/// Finds the first file to read. False while there is none.
+bool FileFollower::begin() {
+    std::unique_ptr<Generation> named = openNamed();
+    if (!named && m_nameRetry.failures > 0) {
+        return false;
+    }
+    if (m_stored) {
+        takeUp(*m_stored, std::move(named));
+    } else if (named) {
+        beginFirst(std::move(named));
+    }
+    if (m_chain.empty()) {
+        return false;
+    }
+    enter();
+    // It may have been truncated before anything of it was read.
+    return !m_stored || !m_chain.front().hadName || m_block.readTo() != 0 ||
+           insertMissed() != Missed::awaited;
+}
+
+/// A log without a position.
+void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
+    Member member;
+    Generation::Status status;
+    const bool isFromEnd = !m_options.fromBeginning && !m_wasAbsent;
+    if (!named->status(status) || (isFromEnd && !named->readTail(status.size, member.tail))) {
+        fail(m_nameRetry, "read", errno);
+        return;
+    }
+    member.from = isFromEnd ? status.size : 0;
+    m_modified = status.modified;
+    if (status.size == 0) {
+        noteOlder();
+    }
+    m_position = positionOf(named->identity(), member.from, member.tail);
+    m_position.modified = m_modified;
+    m_hasPosition = true;
+    member.file = std::move(named);
+    member.hadName = true;
+    m_chain.push_back(std::move(member));
+}
+
+/// A writer that still has the file before this one open writes to it later than this one was made.
+void FileFollower::noteOlder() {
+    for (const GenerationFile& file : generations()) {
+        Older older{file.identity};
+        if (const auto opened = file.isCompressed ? nullptr : Generation::open(file.path)) {
+            opened->readHead(older.head);
+        }
+        m_older.push_back(older);
+        noteModified(file.modified);
+    }
+}
+
+/// Continues at a position of an earlier run.
+void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
+    m_position = stored;
+    m_hasPosition = true;
+    m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
+    Found found = find(stored, Search::byContents, named.get());
+    takeUnreadable(found);
+    if (found.isInterrupted || (found.awaited && !found.holder && found.younger.empty())) {
+        return;
+    }
+    const bool isHeld = found.holder.has_value() || stored.offset == 0;
+    Member present;
+    if (found.holder && !found.holder->file) {
+        present = std::move(*found.holder);
+        found.holder.reset();
+    } else if (!isHeld && (named || !found.younger.empty())) {
+        m_ledger.noteLost(stored.offset, stored.offset);
+    }
+    // A copy of the present file may be younger than the position.
+    const Generation* const first = found.holder           ? found.holder->file.get()
+                                    : stored.modified == 0 ? named.get()
+                                                           : nullptr;
+    Generation::Status status;
+    if (first != nullptr && first->status(status)) {
+        m_modified = status.modified;
+    }
+    prepend(found);
+    m_isTakenUp = !m_chain.empty();
+    if (named && found.isAll) {
+        present.file = std::move(named);
+        present.hadName = true;
+        m_chain.push_back(std::move(present));
+    }
+}
+
+} // namespace zrm

@@ -1,0 +1,171 @@
+#include "monitor/LateLines.h"
+
+#include "logs/LineJoin.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+namespace zrm {
+
+namespace {
+
+constexpr int readsPerLook = 64; ///< without an entry, of 256 kB each
+
+} // namespace
+
+void LateLines::add(std::unique_ptr<Generation> file, std::int64_t offset, const Tail& tail,
+                    Time now) {
+    stopReading();
+    File added;
+    if (!file->status(added.seen) || !added.seen.hasName) {
+        return;
+    }
+    added.file = std::move(file);
+    added.offset = offset;
+    added.tail = tail;
+    added.grown = now;
+    added.isDue = added.seen.size > offset;
+    if (m_files.size() == mostFiles) {
+        leave(m_files.front());
+        m_files.pop_front();
+    }
+    m_files.push_back(std::move(added));
+}
+
+bool LateLines::has(const FileIdentity& file) const noexcept {
+    return std::any_of(m_files.begin(), m_files.end(),
+                       [&file](const File& one) { return one.file->identity() == file; });
+}
+
+std::optional<LogPosition> LateLines::remove(const FileIdentity& file) {
+    stopReading();
+    const auto found = std::find_if(m_files.begin(), m_files.end(), [&file](const File& one) {
+        return one.file->identity() == file;
+    });
+    if (found == m_files.end()) {
+        return std::nullopt;
+    }
+    const LogPosition position = positionIn(*found);
+    m_files.erase(found);
+    return position;
+}
+
+void LateLines::clear() {
+    stopReading();
+    for (const File& file : m_files) {
+        leave(file);
+    }
+    m_files.clear();
+}
+
+/// What was not read by now is an unfinished line, or cannot be read.
+void LateLines::leave(const File& file) {
+    m_left.push_back(positionIn(file));
+    if (file.seen.size > file.offset) {
+        m_ledger.noteLost(file.offset, file.seen.size);
+    }
+}
+
+bool LateLines::look(Time now) {
+    stopReading();
+    m_now = now;
+    std::erase_if(m_files, [&](File& file) { return !checkFile(file, now); });
+    return std::any_of(m_files.begin(), m_files.end(), [](const File& file) { return file.isDue; });
+}
+
+/// False if the file is watched no longer.
+bool LateLines::checkFile(File& file, Time now) {
+    Generation::Status status;
+    if (!file.file->status(status) || status.size < file.offset) {
+        m_left.push_back(positionIn(file));
+        return false; // it was truncated: what it has now is not the log's
+    }
+    if (status.size > file.seen.size) {
+        file.grown = now;
+        file.isDue = true;
+    }
+    file.seen = status;
+    // What was written before the last name was removed is still read.
+    if (!file.isDue && (!status.hasName || now - file.grown >= watchedFor)) {
+        leave(file);
+        return false;
+    }
+    return true;
+}
+
+char* LateLines::next() {
+    for (File& file : m_files) {
+        if (file.isDue) {
+            if (char* const entry = nextOf(file)) {
+                return entry;
+            }
+        }
+    }
+    return nullptr;
+}
+
+char* LateLines::nextOf(File& file) {
+    if (m_read != &file) {
+        m_read = &file;
+        m_block.start(file.offset, file.tail);
+    }
+    for (int reads = 0; reads < readsPerLook; ++reads) {
+        if (char* const entry = m_block.next()) {
+            m_modified = std::max(m_modified, file.seen.modified);
+            return entry;
+        }
+        const std::int64_t from = m_block.readTo();
+        switch (m_block.fill(*file.file)) {
+        case EntryBlock::Fill::more:
+            m_bytesRead += m_block.readTo() - from;
+            continue;
+        case EntryBlock::Fill::failed:
+            file.isDue = errno == EINTR; // the rest is read when the file has grown again
+            break;
+        case EntryBlock::Fill::end:
+            if (m_block.isWaiting() && m_now - file.grown >= m_join->limits().wait) {
+                return m_block.endWaiting();
+            }
+            file.isDue = m_block.isWaiting();
+            break;
+        case EntryBlock::Fill::changed: // found to be truncated, or to have grown
+            file.isDue = false;
+            break;
+        }
+        break;
+    }
+    stopReading();
+    return nullptr;
+}
+
+void LateLines::stopReading() {
+    if (m_read != nullptr) {
+        m_read->offset = m_block.offset();
+        m_read->tail = m_block.tail();
+        m_read = nullptr;
+        m_block.release();
+    }
+}
+
+LogPosition LateLines::positionIn(const File& file) const {
+    const bool isRead = &file == m_read;
+    LogPosition position =
+        positionOf(file.file->identity(), isRead ? m_block.offset() : file.offset,
+                   isRead ? m_block.tail() : file.tail);
+    position.modified = file.seen.modified;
+    return position;
+}
+
+std::vector<LateLines::Left> LateLines::takeLeft() {
+    std::vector<Left> left;
+    for (const LogPosition& position : std::exchange(m_left, {})) {
+        left.push_back({position, false});
+    }
+    for (const File& file : m_files) {
+        left.push_back({positionIn(file), true});
+    }
+    return left;
+}
+
+} // namespace zrm

@@ -1,0 +1,95 @@
+#ifndef ZRM_LATE_LINES_H
+#define ZRM_LATE_LINES_H
+
+#include "framework/LogPositions.h"
+#include "monitor/EntryBlock.h"
+#include "monitor/FollowLedger.h"
+#include "monitor/Generation.h"
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <memory>
+#include <optional>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace zrm {
+
+/// The files of a followed log that reading has left for their successors. A writer that was not
+/// told of the rotation still writes to such a file: it stays open, and what comes late is given,
+/// until it has been quiet for `watchedFor` or has lost its last name. One thread.
+class LateLines {
+public:
+    using Time = std::chrono::steady_clock::time_point;
+    static constexpr std::chrono::minutes watchedFor{10};
+    static constexpr std::size_t mostFiles = 4; ///< the latest
+
+    /// The ledger outlives the object. `recordLength`, `join`: as of EntryBlock.
+    LateLines(std::size_t recordLength, std::shared_ptr<const LineJoin> join, FollowLedger& ledger)
+        : m_ledger(ledger), m_join(std::move(join)), m_block(recordLength, m_join.get()) {}
+
+    /// A plain file that was read up to the offset, which has the bytes of `tail` before it.
+    void add(std::unique_ptr<Generation> file, std::int64_t offset, const Tail& tail, Time now);
+    bool has(const FileIdentity& file) const noexcept;
+    /// Ends the watch over a file, if it is one of them. Returns where reading has left it.
+    std::optional<LogPosition> remove(const FileIdentity& file);
+    /// Ends the watch over all files, to free their descriptors.
+    void clear();
+
+    /// Looks at the files. True if there may be entries.
+    bool look(Time now);
+    /// The next entry, as EntryBlock gives it; null if there is none until the next look.
+    char* next();
+    /// Takes back the entry that next has just given. False if it cannot.
+    bool takeBack() noexcept { return m_block.takeBack(); }
+    std::string_view text() const noexcept { return m_block.text(); }
+    bool isTextCut() const noexcept { return m_block.isTextCut(); }
+    /// Behind the entry that next has just given, in its file.
+    LogPosition position() const { return positionIn(*m_read); }
+    /// True if that is the file that was left last.
+    bool isNewest() const noexcept { return m_read == &m_files.back(); }
+    /// How many bytes were read since the last call.
+    std::int64_t takeBytesRead() noexcept { return std::exchange(m_bytesRead, 0); }
+    /// Latest modification of what was read, in ns since the epoch.
+    std::int64_t modified() const noexcept { return m_modified; }
+
+    /// How far the files were read.
+    struct Left {
+        LogPosition position;
+        bool isWatched; ///< false: it was until the last call
+    };
+    std::vector<Left> takeLeft();
+
+private:
+    struct File {
+        std::unique_ptr<Generation> file;
+        std::int64_t offset = 0; ///< where the next entry begins
+        Tail tail{};
+        Generation::Status seen{};
+        Time grown{};       ///< when it was last seen to have grown
+        bool isDue = false; ///< has grown since it was read, or has lines that wait for others
+    };
+
+    bool checkFile(File& file, Time now);
+    void leave(const File& file);
+    LogPosition positionIn(const File& file) const;
+    char* nextOf(File& file);
+    void stopReading();
+
+    FollowLedger& m_ledger;
+    const std::shared_ptr<const LineJoin> m_join;
+    Time m_now{}; ///< of the last look
+    std::deque<File> m_files;
+    EntryBlock m_block;
+    File* m_read = nullptr; ///< the file in the block
+    std::int64_t m_bytesRead = 0;
+    std::int64_t m_modified = 0;
+    std::vector<LogPosition> m_left; ///< of files that are no longer watched
+};
+
+} // namespace zrm
+
+#endif
