@@ -4,9 +4,12 @@
 #include "logs/FurtherLogs.h"
 
 #include <cstddef>
+#include <cstdint>
+#include <map>
 #include <set>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace zrm::host {
@@ -42,6 +45,8 @@ struct FoundLogs {
     /// lines apply, and the tables pass over the files.
     std::vector<Source> sourcesBeside(const std::set<std::string>& configured) const;
 
+    /// Files that were followed under other names, and the names of logs that they have now.
+    std::map<std::pair<std::uint64_t, std::uint64_t>, std::string> renamed; ///< by device and inode
     std::vector<Source> sources; ///< in the order of the configuration
     FurtherLogs::List logs;
 };

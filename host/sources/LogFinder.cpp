@@ -3,7 +3,9 @@
 #include "base/ErrorText.h"
 #include "host/base/Utf8.h"
 #include "host/config/PathPattern.h"
+#include "host/events/PositionBook.h"
 #include "host/sources/PathSearch.h"
+#include "host/sources/RotationOrigins.h"
 #include "monitor/GenerationNames.h"
 
 #include <algorithm>
@@ -24,53 +26,6 @@ bool isCompressed(std::string_view name) {
                        [name](std::string_view end) { return name.ends_with(end); });
 }
 
-bool isDigit(char character) {
-    return character >= '0' && character <= '9';
-}
-
-bool isSeparator(char character) {
-    return character == '.' || character == '-' || character == '_';
-}
-
-/// What a rotation has put into a name: a number at its end ("app.log.1"), or a date
-/// ("app.log-20261122", "app-2026-11-22.log").
-struct RotationMark {
-    std::size_t begin; ///< of its separator
-    std::size_t end;
-};
-
-/// The mark that begins at this separator, if there is one.
-std::optional<RotationMark> markAt(std::string_view name, std::size_t begin) {
-    constexpr std::size_t digitsOfDate = 6;
-    std::size_t digits = 0;
-    std::size_t end = begin + 1;
-    for (; end < name.size(); ++end) {
-        const bool isWithin = isDigit(name[end]);
-        digits += isWithin ? 1 : 0;
-        if (!isWithin && (name[end] == '.' || end == begin + 1 || end + 1 == name.size() ||
-                          !isDigit(name[end + 1]))) {
-            break;
-        }
-    }
-    const bool isNumber = name[begin] == '.' && end == name.size() && digits > 0;
-    const bool isDate = digits >= digitsOfDate && (end == name.size() || name[end] == '.');
-    return isNumber || isDate ? std::optional(RotationMark{begin, end}) : std::nullopt;
-}
-
-/// The names of the file of which a rotation may have made this one.
-std::vector<std::string> originsOf(const std::string& path) {
-    std::vector<std::string> origins;
-    for (std::size_t at = path.rfind('/') + 2; at < path.size(); ++at) {
-        if (!isSeparator(path[at])) {
-            continue;
-        }
-        if (const std::optional<RotationMark> mark = markAt(path, at)) {
-            origins.push_back(path.substr(0, mark->begin) + path.substr(mark->end));
-        }
-    }
-    return origins;
-}
-
 } // namespace
 
 /// A path that is named or matched.
@@ -81,6 +36,7 @@ struct LogFinder::Candidate {
     const std::string* path; ///< of the configuration, that names or matches it
     bool isThere = false;
     Identity identity{};
+    std::int64_t size = 0; ///< bytes
     bool isNewcomer = false;
 };
 
@@ -225,6 +181,7 @@ private:
                 m_finder.m_earlier.isNewSince(*candidate.path, candidate.name, status);
         }
         candidate.identity = {status.st_dev, status.st_ino};
+        candidate.size = status.st_size;
         if (const auto own = m_ownFiles.find(candidate.identity); own != m_ownFiles.end()) {
             m_leftOut.insert(candidate.name);
             return passOver(candidate, "It is " + own->second +
@@ -313,17 +270,25 @@ private:
         if (m_finder.m_known.contains(candidate.name) || candidate.isNamed) {
             return true;
         }
-        if (const std::string former = formerName(candidate); !former.empty()) {
-            m_rotated.emplace(candidate.name, Rotated{candidate.identity, former});
-            // Its log is read to the end of this file, and is kept for a while.
-            return passOver(candidate,
-                            m_names.contains(former)
-                                ? "It was followed under another name before it was rotated"
-                                : "It was followed as " + former +
-                                      " until it was renamed, and what is written to it now is not "
-                                      "read; if it is a log of its own, name it before the glob");
+        const std::string former = formerName(candidate);
+        if (former.empty() || isWrittenOn(candidate)) {
+            return true;
         }
-        return true;
+        m_rotated.emplace(candidate.name, Rotated{candidate.identity, former});
+        m_found.renamed.emplace(candidate.identity, candidate.name);
+        // Its log is read to the end of this file, and is kept for a while.
+        return passOver(candidate, m_names.contains(former)
+                                       ? "It was followed under another name before it was rotated"
+                                       : "It was followed as " + former +
+                                             " until it was renamed, and is followed again once it "
+                                             "is written to");
+    }
+
+    /// True if the file has grown since the log under whose name it was followed has left it.
+    static bool isWrittenOn(const Candidate& candidate) {
+        const auto left = PositionBook::current()->takenOver(candidate.name);
+        return left && Identity{left->device, left->inode} == candidate.identity &&
+               left->offset < candidate.size;
     }
 
     /// Always false.

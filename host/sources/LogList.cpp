@@ -90,6 +90,7 @@ void LogList::begin(const std::vector<LogConfig>& logs, OwnFiles ownFiles,
     m_shared->isAsked = false;
     auto found = std::make_shared<const FoundLogs>(
         m_shared->finder.look(m_shared->logs, m_shared->ownFiles, LogFinder::Clock::now()));
+    PositionBook::current()->setRenamed(found->renamed);
     exchange(found);
     publish(*found);
 }
@@ -143,6 +144,7 @@ void LogList::run(const std::shared_ptr<Shared>& shared) {
             return;
         }
         EarlierRun::noteLook(*PositionBook::current(), logs, *found, time);
+        PositionBook::current()->setRenamed(found->renamed);
         const auto before = exchange(found);
         const bool isPublished = FurtherLogs::published() != nullptr;
         lock.unlock();

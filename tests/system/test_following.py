@@ -223,3 +223,107 @@ def test_a_log_with_changed_settings_is_not_read_again(agent, has_history):
     agent.wait_trace(f"Deleting log object for file {log}.")
     log.append(syslog_line("one"))
     assert descriptions(agent.wait_events(2)) == ["before the start", "one"]
+
+
+@pytest.mark.slow
+def test_a_log_renamed_within_its_glob_is_read_on_under_its_new_name(agent):
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    logs = agent.directory / "logs"
+    logs.mkdir()
+    old, new = Log(logs / "old.log"), Log(logs / "new.log")
+    old.path.write_text("")
+    agent.follow(logs / "*.log")
+    agent.situation()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(old)
+
+    def names():
+        return [event["row"]["LOGNAME"] for event in agent.events()]
+
+    def passed_over():
+        tables = Api(agent).request("GET", "/api/v1/logs")[2]["tables"]
+        return "".join(one["reason"] for table in tables for one in table["passed_over"])
+
+    old.append(syslog_line("one"))
+    agent.wait_events(1)
+    old.path.rename(new.path)
+    new.append(syslog_line("two"))
+    agent.wait_events(2)
+    wait_until(lambda: "once it is written to" in passed_over(), "the old name to be dropped", 120)
+    new.append(syslog_line("three"))
+    agent.wait_events(3)
+    new.append(syslog_line("four"))
+    agent.wait_events(4)
+    old.path.write_text(syslog_line("anew"))
+    agent.wait_events(5)
+    assert agent.stop() == 0
+    new.append(syslog_line("five"))
+    old.append(syslog_line("on"))
+    agent.start()
+    agent.wait_events(7)
+    agent.wait_open(new)
+    assert descriptions(agent.events())[:5] == ["one", "two", "three", "four", "anew"]
+    assert sorted(descriptions(agent.events())[5:]) == ["five", "on"]
+    assert names()[:5] == ["old.log", "old.log", "new.log", "new.log", "old.log"]
+
+
+def test_lines_written_late_to_a_rotated_file_are_read(agent):
+    log = followed(agent)
+    rotated = Log(f"{log}.1")
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    rotate(log)
+    log.append(syslog_line("two"))
+    agent.wait_events(2)
+    rotated.append(syslog_line("late"))
+    agent.wait_events(3)
+    log.append(syslog_line("three"))
+    agent.wait_events(4)
+    assert agent.stop() == 0
+    log.append(syslog_line("four"))
+    agent.start()
+    agent.wait_events(5)
+    rotate(log)
+    log.append(syslog_line("five"))
+    agent.wait_events(6)
+    assert descriptions(agent.events()) == ["one", "two", "late", "three", "four", "five"]
+    assert agent.stop() == 0
+
+
+def test_a_log_whose_old_file_keeps_its_writer_is_read_under_both_names(agent):
+    """A log is moved away under its glob and made anew, and its writer is not told."""
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    logs = agent.directory / "logs"
+    logs.mkdir()
+    log, moved = Log(logs / "app.log"), Log(logs / "moved.log")
+    log.path.write_text("")
+    agent.follow(logs / "*.log", start="beginning", rotate_wait="1s")
+    agent.situation()
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    log.path.rename(moved.path)
+    log.path.write_text(syslog_line("two"))
+    agent.wait_events(2)
+    for number in range(3):
+        moved.append(syslog_line(f"late {number}"))
+        agent.wait_events(3 + number)
+    wait_until(lambda: known_positions(agent).get(str(moved)) == moved.path.stat().st_size, "the position", 60)
+    assert agent.stop() == 0
+    moved.append(syslog_line("stopped"))
+    agent.start()
+    agent.wait_events(6)
+    moved.append(syslog_line("later"))
+    agent.wait_events(7)
+    assert descriptions(agent.events()) == ["one", "two", "late 0", "late 1", "late 2", "stopped", "later"]
+
+
+def known_positions(agent):
+    """The offsets that the history has, by log."""
+    with contextlib.closing(sqlite3.connect(agent.directory / "state/history.db")) as database:
+        return dict(database.execute("SELECT log, offset FROM log_positions"))

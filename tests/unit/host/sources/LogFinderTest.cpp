@@ -1,5 +1,7 @@
 #include "host/sources/LogFinder.h"
 
+#include "host/events/PositionBook.h"
+
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -217,6 +219,45 @@ TEST_F(LogFinderTest, SaysThatARenamedLogWithoutASuccessorIsNotRead) {
     logs[0].paths.insert(logs[0].paths.begin(), file("b.log"));
     look();
     EXPECT_THAT(names(), ElementsAre(file("b.log")));
+}
+
+TEST_F(LogFinderTest, ARenamedLogIsFollowedUnderItsNewNameOnceItIsWrittenTo) {
+    const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
+    PositionBook::makeCurrent(book);
+    create("a.log");
+    logs = {table({file("*.log")})};
+    look();
+    rename("a.log", "b.log");
+    now += LogFinder::keptAbsent;
+    look();
+    book->setRenamed(found.renamed);
+    {
+        LogPositions former(file("a.log").c_str());
+        LogPosition left;
+        struct stat status;
+        ASSERT_EQ(stat(file("b.log").c_str(), &status), 0);
+        left.device = status.st_dev;
+        left.inode = status.st_ino;
+        left.offset = status.st_size;
+        former.reached(left);
+        former.left(left, true);
+        directory.append("b.log", "late\n");
+        look();
+        EXPECT_THAT(names(), IsEmpty()); // still read as a part of a.log
+        left.offset += 5;
+        former.left(left, false);
+    }
+    look();
+    EXPECT_THAT(names(), IsEmpty());
+    EXPECT_THAT(reason(file("b.log")), HasSubstr("is followed again once it is written to"));
+    directory.append("b.log", "on\n");
+    for (int looks = 0; looks < 2; ++looks) {
+        look();
+        EXPECT_THAT(names(), ElementsAre(file("b.log")));
+        EXPECT_THAT(found.renamed, IsEmpty());
+        now += LogFinder::keptAbsent;
+    }
+    PositionBook::makeCurrent(PositionBook::unkept());
 }
 
 TEST_F(LogFinderTest, AFileThatIsGoneStaysForAWhile) {
