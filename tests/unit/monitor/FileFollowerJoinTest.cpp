@@ -174,4 +174,23 @@ TEST_F(FileFollowerJoinTest, AnEntryThatIsTakenBackIsReadAgainAfterARestart) {
     EXPECT_THAT(entries(), ElementsAre("one\n a"));
 }
 
+TEST_F(FileFollowerJoinTest, LateLinesWaitForOthers) {
+    append("one\n");
+    rename("app.log", "app.log.1");
+    append("two\n");
+    entries();
+    EXPECT_THAT(entries(seconds(3)), ElementsAre("one"));
+    EXPECT_THAT(entries(seconds(3)), IsEmpty());
+    EXPECT_THAT(entries(seconds(5)), ElementsAre("two"));
+    m_directory.append("app.log.1", "late\n a\n");
+    EXPECT_THAT(entries(), IsEmpty());
+    m_directory.append("app.log.1", " b\n");
+    EXPECT_THAT(entries(seconds(4)), IsEmpty());
+    EXPECT_THAT(entries(seconds(5)), ElementsAre("late\n a\n b"));
+    m_directory.append("app.log.1", "later\nlatest\n");
+    EXPECT_THAT(entries(), ElementsAre("later"));
+    EXPECT_THAT(entries(seconds(5)), ElementsAre("latest"));
+    EXPECT_THAT(entries(seconds(5)), IsEmpty());
+}
+
 } // namespace
