@@ -316,7 +316,7 @@ void LogReader::readResumption(ConfigSection& section, LogConfig& log) {
 }
 
 void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
-    if (log.letter == 'A' || log.letter == 'E') {
+    if (log.letter == 'A' || log.letter == 'E' || log.type == "wtmp") {
         refuse(section, "timezone", log);
     }
     const std::optional<std::string> zone = section.text("timezone");

@@ -1,5 +1,6 @@
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
+#include "host/formats/WtmpFormat.h"
 
 #include <algorithm>
 #include <iterator>
@@ -16,6 +17,7 @@ struct Kind {
 
 constexpr Kind kinds[] = {
     {"json", &JsonFormat::make},
+    {"wtmp", &WtmpFormat::make},
 };
 
 } // namespace

@@ -27,7 +27,7 @@ TRC1_Anchor anchor{"FormatLogFile.cpp"};
 thread_local std::unique_ptr<FormatLogFile::Parser> threadParser;
 
 bool isControl(char character) noexcept {
-    return character == '\n' || character == '\r';
+    return character == '\n' || character == '\r' || character == '\0';
 }
 
 /// Fills a blank column with as much of the text as it takes, on one line, and returns how much
@@ -141,6 +141,7 @@ bool FormatLogFile::deliverEntry(char* entry) {
         writeToDebugLog(entry, record, row, sizeof *row);
     } else {
         count(NumFormatErrors);
+        m_ledger.noteRejected("", rejectionReason()); // a record is not a text
         writeToDebugLog(entry, record, nullptr, 0);
     }
     return true;
