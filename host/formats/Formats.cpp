@@ -1,5 +1,6 @@
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
+#include "host/formats/UnwrappedFormat.h"
 #include "host/formats/WtmpFormat.h"
 
 #include <algorithm>
@@ -20,6 +21,17 @@ constexpr Kind kinds[] = {
     {"wtmp", &WtmpFormat::make},
 };
 
+/// The format of what the lines hold, whatever is around it.
+Result<std::shared_ptr<const EntryFormat>> makeInner(const FormatDescription& description) {
+    const auto kind = std::find_if(std::begin(kinds), std::end(kinds),
+                                   [&](const Kind& one) { return description.type == one.type; });
+    if (kind == std::end(kinds)) {
+        return refused("'" + description.type + "' is not a kind of format", "write another type",
+                       "type");
+    }
+    return kind->make(description);
+}
+
 } // namespace
 
 std::vector<const char*> formatTypes() {
@@ -31,13 +43,8 @@ std::vector<const char*> formatTypes() {
 }
 
 Result<std::shared_ptr<const EntryFormat>> makeFormat(const FormatDescription& description) {
-    const auto kind = std::find_if(std::begin(kinds), std::end(kinds),
-                                   [&](const Kind& one) { return description.type == one.type; });
-    if (kind == std::end(kinds)) {
-        return refused("'" + description.type + "' is not a kind of format", "write another type",
-                       "type");
-    }
-    return kind->make(description);
+    return description.unwrap.empty() ? makeInner(description)
+                                      : UnwrappedFormat::make(description, &makeInner);
 }
 
 } // namespace zrm::host

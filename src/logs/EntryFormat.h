@@ -46,9 +46,9 @@ public:
         /// false if the entry does not fit the format, or if it has no time where the format needs
         /// one.
         virtual bool read(std::string_view entry, EntryColumns& columns) = 0;
-        /// Adds the fields of an entry; the names and values are views into the entry or into
-        /// memory of `fields`. Called only when somebody asks for them, as a rule for the entry
-        /// that was read last.
+        /// Adds the fields of an entry; the names and values are views into the entry, into memory
+        /// of `fields`, or into that of the reader, where they are valid until its next call.
+        /// Called only when somebody asks for them, as a rule for the entry that was read last.
         virtual void readFields(std::string_view entry, EntryFields& fields) = 0;
         /// Why the last entry was not read: a clause such as "it is not a JSON object". Valid until
         /// the next call.
