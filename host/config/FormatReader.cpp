@@ -1,5 +1,7 @@
 #include "host/config/FormatReader.h"
 
+#include "host/config/EntryLinesReader.h"
+
 #include <algorithm>
 #include <string_view>
 #include <utility>
@@ -29,6 +31,9 @@ constexpr Key keys[] = {
     {"extract", "syslog"},
 };
 
+/// The types whose entries may have several lines.
+constexpr Key entryKey{"entry", "regex json syslog"};
+
 /// The texts of a table, by key.
 std::map<std::string, std::string> readTexts(ConfigSection& section) {
     std::map<std::string, std::string> texts;
@@ -54,7 +59,7 @@ std::vector<std::string> readList(ConfigSection& section, std::string_view key) 
 }
 
 void readPatterns(ConfigSection& section, FormatDescription& format) {
-    if (!section.has("format")) {
+    if (!section.has("format") && !section.has("unwrap")) {
         section.problem("format", "is missing, and type \"regex\" needs it",
                         R"(describe the entries, for example '(?P<time>\S+ \S+) )"
                         R"((?P<type>\w+) (?P<description>.*)')");
@@ -81,6 +86,9 @@ std::optional<FormatDescription> FormatReader::read(ConfigSection& section,
             section.refuse(key.name, "has no meaning for type \"" + type + '"');
         }
     }
+    if (!entryKey.isFor(type)) {
+        section.refuse(entryKey.name, "has no meaning for type \"" + type + '"');
+    }
     if (type == "regex") {
         readPatterns(section, format);
     }
@@ -96,6 +104,7 @@ std::optional<FormatDescription> FormatReader::read(ConfigSection& section,
             {extract.text("source").value_or(""), readList(extract, "patterns")});
         extract.refuseUnknownKeys();
     }
+    format.lines = EntryLinesReader::read(section);
     return section.problemCount() == problems ? std::optional(std::move(format)) : std::nullopt;
 }
 

@@ -2,6 +2,7 @@
 
 #include "base/EntryFields.h"
 #include "host/base/TimeText.h"
+#include "host/config/EntryLinesReader.h"
 #include "host/config/FormatReader.h"
 #include "host/config/OwnFiles.h"
 #include "host/config/PathPattern.h"
@@ -209,6 +210,9 @@ void LogReader::readType(ConfigSection& section, LogConfig& log) {
     if (const auto choice = readChoice(section, "type", names)) {
         log.type = names[*choice];
         log.letter = *choice < types.size() ? types[*choice].letter : FormatLogFile::typeLetter;
+    } else if (section.has("unwrap") && !section.has("type")) {
+        log.type = "regex"; // without an expression: what is in the container's lines is all text
+        log.letter = FormatLogFile::typeLetter;
     }
     if (log.letter == 'E' && !isErrorLogSystem()) {
         section.problem("type", "an error log is read only on AIX", "write another type");
@@ -233,6 +237,11 @@ void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
     if (format && log.letter == 'U') {
         checkTextFormat(section, log);
     }
+    if (log.letter == 'U') {
+        FormatDescription lines;
+        lines.lines = EntryLinesReader::read(section);
+        log.follow.join.value = EntryLinesReader::make(section, lines);
+    }
 }
 
 /// The format of a log that has no kind of its own.
@@ -243,6 +252,9 @@ void LogReader::readEntryFormat(ConfigSection& section, LogConfig& log) {
     if (format && isNeeded) {
         log.letter = FormatLogFile::typeLetter;
         log.follow.format.value = FormatReader::make(section, *format);
+    }
+    if (format && (!isNeeded || log.follow.format)) {
+        log.follow.join.value = EntryLinesReader::make(section, *format);
     }
 }
 

@@ -69,6 +69,67 @@ TEST(LogReader, RefusesWhatEventsCannotKeep) {
               1U);
 }
 
+TEST(LogReader, ReadsWhichLinesMakeAnEntry) {
+    EXPECT_FALSE(accepted("[[log]]\npath = '/a'\n")[0].follow.join);
+    const auto log = accepted("[[log]]\npath = '/a'\nentry = { starts = '^\\d', lines = 9, bytes = "
+                              "99, wait = '3s' }\n")[0];
+    ASSERT_TRUE(log.follow.join);
+    EXPECT_EQ(log.letter, 'S') << "the columns are those of a syslog file";
+    EXPECT_TRUE(log.follow.join->joins("1", "a"));
+    EXPECT_FALSE(log.follow.join->joins("a", "1"));
+    EXPECT_EQ(log.follow.join->limits().lines, 9U);
+    EXPECT_EQ(log.follow.join->limits().bytes, 99U);
+    EXPECT_EQ(log.follow.join->limits().wait, std::chrono::seconds(3));
+    const auto text =
+        accepted("[[log]]\npath = '/a'\ntype = 'text'\nentry.indented = true\nformat = "
+                 "'A,\"%d %255[^\\n]\" , year description'\n")[0];
+    ASSERT_TRUE(text.follow.join);
+    EXPECT_TRUE(text.follow.join->joins("a", " b"));
+}
+
+TEST(LogReader, RefusesLinesThatMakeNoEntry) {
+    const std::string log = "[[log]]\npath = '/a'\n";
+    EXPECT_THAT(
+        refused(log + "entry = { starts = '(' }\n"),
+        ElementsAre("zrm.toml:3: log.entry.starts: '(' is not a regular expression: missing "
+                    "): (; see github.com/google/re2/wiki/Syntax"));
+    EXPECT_THAT(refused(log + "entry = { lines = 5 }\n"),
+                ElementsAre("zrm.toml:3: log.entry: does not say which lines make an entry; write "
+                            "starts, continues or indented = true, for example { starts = "
+                            "'^\\d{4}-' }"));
+    EXPECT_THAT(
+        refused(log +
+                "[log.entry]\nindented = true\nlines = 1\nbytes = 65537\nwait = '2m'\nend = 1\n"),
+        ElementsAre("zrm.toml:5: log.entry.lines: 1 is not between 2 and 10000; write a number in "
+                    "that range",
+                    "zrm.toml:6: log.entry.bytes: 65537 is not between 2 and 65536; write a number "
+                    "in that range",
+                    "zrm.toml:7: log.entry.wait: '2m' is not a duration from a second to a minute; "
+                    "write for example \"2s\"",
+                    HasSubstr("zrm.toml:8: log.entry.end: ")));
+    EXPECT_THAT(refused(log + "entry = { starts = 'a', continues = 'b' }\n"),
+                ElementsAre("zrm.toml:3: log.entry: says in more than one way which lines make an "
+                            "entry; keep one of starts, continues and indented"));
+    EXPECT_THAT(refused(log + "entry = { starts = '' }\n"),
+                ElementsAre("zrm.toml:3: log.entry.starts: is empty; write a regular expression"));
+    EXPECT_THAT(
+        refused(log + "type = 'accounting'\nentry.indented = true\n"),
+        ElementsAre("zrm.toml:4: log.entry: has no meaning for type \"accounting\"; leave it "
+                    "out"));
+}
+
+TEST(LogReader, UnwrapsWhatContainersWrite) {
+    const auto log = accepted("[[log]]\npath = '/a'\nunwrap = 'cri'\nentry.indented = true\n")[0];
+    ASSERT_TRUE(log.follow.format);
+    ASSERT_TRUE(log.follow.join);
+    EXPECT_TRUE(log.follow.join->joins("t stdout F a", "t stdout F  b"));
+    EXPECT_TRUE(log.follow.join->joins("t stdout P a", "t stdout F b"));
+    EXPECT_FALSE(log.follow.join->joins("t stdout F a", "t stdout F b"));
+    EXPECT_THAT(refused("[[log]]\npath = '/a'\nunwrap = 'podman'\n"),
+                ElementsAre("zrm.toml:3: log.unwrap: 'podman' is not a container runtime's "
+                            "format; write \"docker\" or \"cri\""));
+}
+
 TEST(LogReader, ReadsEverythingThatATableMaySay) {
     const std::vector<LogConfig> logs = accepted(R"(
 [[log]]

@@ -1,0 +1,75 @@
+#include "host/formats/LinePattern.h"
+
+#include <utility>
+
+#include <re2/re2.h>
+
+namespace zrm::host {
+
+namespace {
+
+constexpr std::int64_t mostMemory = 1024 * 1024;
+
+re2::RE2::Options options() {
+    re2::RE2::Options options;
+    options.set_encoding(re2::RE2::Options::EncodingLatin1); // logs have bytes of any encoding
+    options.set_log_errors(false);
+    options.set_never_capture(true);
+    options.set_max_mem(mostMemory);
+    return options;
+}
+
+/// Whether all matches are at the beginning of a line, because the expression begins with "^" and
+/// that is not part of one of several alternatives.
+bool isAnchored(std::string_view pattern) {
+    constexpr std::string_view repetitions = "*+?{";
+    if (!pattern.starts_with('^') ||
+        (pattern.size() > 1 && repetitions.find(pattern[1]) != std::string_view::npos)) {
+        return false;
+    }
+    // What looks like one of several alternatives may be in brackets or in a group.
+    return pattern.find('|') == std::string_view::npos;
+}
+
+} // namespace
+
+Result<LinePattern> LinePattern::compile(const std::string& pattern) {
+    if (pattern.empty() || pattern.size() > longest) {
+        return refused("a regular expression has 1 to 4096 bytes, and this one has " +
+                           std::to_string(pattern.size()),
+                       "write another one");
+    }
+    auto expression = std::make_unique<const re2::RE2>(pattern, options());
+    if (!expression->ok()) {
+        return refused("'" + pattern + "' is not a regular expression: " + expression->error(),
+                       "see github.com/google/re2/wiki/Syntax");
+    }
+    return LinePattern(std::move(expression));
+}
+
+LinePattern::LinePattern(std::unique_ptr<const re2::RE2> expression)
+    : m_expression(std::move(expression)), m_isAnchored(isAnchored(m_expression->pattern())) {
+    m_mayBegin.fill(true);
+    std::string least;
+    std::string most;
+    if (m_isAnchored && m_expression->PossibleMatchRange(&least, &most, 1) && !least.empty() &&
+        !most.empty()) {
+        for (std::size_t byte = 0; byte < m_mayBegin.size(); ++byte) {
+            m_mayBegin[byte] = byte >= static_cast<unsigned char>(least.front()) &&
+                               byte <= static_cast<unsigned char>(most.front());
+        }
+    }
+}
+
+LinePattern::LinePattern(LinePattern&&) noexcept = default;
+LinePattern& LinePattern::operator=(LinePattern&&) noexcept = default;
+LinePattern::~LinePattern() = default;
+
+bool LinePattern::matches(std::string_view line) const {
+    if (!line.empty() && !m_mayBegin[static_cast<unsigned char>(line.front())]) {
+        return false;
+    }
+    return m_expression->Match(line, 0, line.size(), re2::RE2::UNANCHORED, nullptr, 0);
+}
+
+} // namespace zrm::host
