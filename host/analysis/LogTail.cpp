@@ -5,6 +5,7 @@
 #include "host/base/JsonWriter.h"
 #include "host/diagnose/MonitoredLogFile.h"
 #include "logs/FollowSettings.h"
+#include "logs/LineJoin.h"
 #include "logs/RequestThresholds.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
@@ -78,6 +79,45 @@ bool seekTail(int fd) {
     return at != -1 && count != -1;
 }
 
+/// The lines of an entry.
+class JoinedLines {
+public:
+    /// Null: each line is an entry. Outlives the object.
+    explicit JoinedLines(const LineJoin* join) : m_join(join) {}
+
+    bool isEmpty() const noexcept { return m_lines == 0; }
+    /// Whether a line belongs to the entry.
+    bool takes(std::string_view line) const {
+        return m_join != nullptr && m_lines < m_join->limits().lines &&
+               m_text.size() + line.size() + 2 <= m_join->limits().bytes &&
+               m_join->joins(std::string_view(m_text).substr(m_last), line);
+    }
+    void add(std::string_view line) {
+        m_text += m_lines > 0 ? "\n" : "";
+        m_last = m_text.size();
+        m_text += line.substr(0, EntryKeep::longestText);
+        ++m_lines;
+    }
+    /// The first line as a log's monitor judges it.
+    std::string first() const {
+        constexpr std::size_t longestLine = 2046;
+        return m_text.substr(0, std::min(m_text.find('\n'), longestLine)) + '\n';
+    }
+    /// The whole entry, after which there is none.
+    std::string take() {
+        m_lines = 0;
+        std::string text = std::exchange(m_text, {});
+        text.resize(text.size() - (text.ends_with('\r') ? 1 : 0));
+        return text;
+    }
+
+private:
+    const LineJoin* const m_join;
+    std::string m_text;
+    std::size_t m_last = 0; ///< where the last line begins
+    std::size_t m_lines = 0;
+};
+
 } // namespace
 
 LogTail::LogTail(LogFile& log) : m_log(log), m_clock(log.followSettings()) {}
@@ -139,35 +179,70 @@ Result<void> LogTail::readLine(std::string_view line, const Entry& entry) {
 }
 
 void LogTail::pieces(int fd, const Entry& entry) {
+    if (m_log.followSettings() != nullptr) {
+        wholeEntries(fd, entry);
+        return;
+    }
     LineReader reader;
     reader.start(fd);
-    zrm_rmlogent_data_t row;
-    std::string line;
     // A busy log that grows meanwhile must not keep this loop from ending.
     std::size_t bytes = 0;
-    bool isLineBegun = false;
     for (char* piece; bytes < 2 * longest && (piece = reader.next()) != nullptr;) {
-        line = piece; // building the row may change it
+        std::string line = piece; // building the row may change it
         bytes += line.size() + 1;
-        const bool isRest = std::exchange(isLineBegun, !line.ends_with('\n'));
-        if (isRest && m_log.followSettings() != nullptr) {
-            continue; // a line of a followed log is one entry
+        judge(piece, line, entry);
+    }
+}
+
+/// The entries of a log that is followed: lines of any length, joined as the log's settings say.
+void LogTail::wholeEntries(int fd, const Entry& entry) {
+    JoinedLines lines(m_log.followSettings()->join.value.get());
+    const auto end = [&] {
+        std::string first = lines.first();
+        judge(first.data(), lines.take(), entry);
+    };
+    LineReader reader;
+    reader.start(fd);
+    std::size_t bytes = 0;
+    std::string line;
+    const auto add = [&] {
+        if (!lines.isEmpty() && !lines.takes(line)) {
+            end();
         }
-        const bool isRow = m_log.formatEntryAsRow(piece, &row, nullptr) == 0;
-        if (isRow && m_reach.reached.empty()) {
-            note(row);
-        }
+        lines.add(line);
+        line.clear();
+    };
+    for (char* piece; bytes < 2 * longest && (piece = reader.next()) != nullptr;) {
+        const std::string_view part(piece);
+        bytes += part.size() + 1;
+        line += part;
         if (line.ends_with('\n')) {
             line.pop_back();
-        }
-        LineEntry read(&m_log, line);
-        const LogEntry::Offer offer(read);
-        if (isRow) {
-            give(entry, line, row, lastEntryMoment);
-        } else {
-            entry(line, nullptr);
+            add();
         }
     }
+    if (!line.empty()) {
+        add();
+    }
+    if (!lines.isEmpty()) {
+        end();
+    }
+}
+
+/// Makes the row of an entry, of which the text begins with the line, and gives both.
+void LogTail::judge(char* line, std::string text, const Entry& entry) {
+    text.resize(text.size() - (text.ends_with('\n') ? 1 : 0));
+    LineEntry read(&m_log, text);
+    const LogEntry::Offer offer(read);
+    zrm_rmlogent_data_t row;
+    if (m_log.formatEntryAsRow(line, &row, nullptr) != 0) {
+        entry(text, nullptr);
+        return;
+    }
+    if (m_reach.reached.empty()) {
+        note(row);
+    }
+    give(entry, text, row, lastEntryMoment);
 }
 
 void LogTail::give(const Entry& entry, std::optional<std::string_view> line,

@@ -30,18 +30,18 @@ struct Reach {
 };
 
 /// Reads the end of a log, and lines that it might contain, as its monitor would: in the same
-/// pieces and with the log's own operation that makes rows. The monitor is not affected: rows are
-/// made in the way of reports, and its counters do not count them. While an entry of a followed log
-/// is given, its EntryInstant exists.
+/// pieces, or the same lines joined to entries, and with the log's own operation that makes rows.
+/// The monitor is not affected: rows are made in the way of reports, and its counters do not count
+/// them. While an entry of a followed log is given, its EntryInstant exists.
 class LogTail {
 public:
     static constexpr std::size_t longest = 4 * 1024 * 1024; ///< bytes of a text log
     static constexpr std::size_t mostEntries = 10000;       ///< of another log
     static constexpr std::size_t longestLine = 16 * 1024;   ///< bytes of a line passed to read
 
-    /// One entry, oldest first. `line` is none if the log has no lines, `row` null if the line
-    /// yields none; both may be changed and are valid until the function returns. The line is the
-    /// entry of the thread (LogEntry) that long.
+    /// One entry, oldest first. `line` is its text; none if the log has no lines, `row` null if the
+    /// line yields none; both may be changed and are valid until the function returns. The line is
+    /// the entry of the thread (LogEntry) that long.
     using Entry =
         std::function<void(std::optional<std::string_view> line, zrm_rmlogent_data_t* row)>;
 
@@ -64,6 +64,8 @@ public:
 private:
     Result<void> readLines(int fd, const Entry& entry);
     void pieces(int fd, const Entry& entry);
+    void wholeEntries(int fd, const Entry& entry);
+    void judge(char* line, std::string text, const Entry& entry);
     void entries(const Entry& entry);
 
     void give(const Entry& entry, std::optional<std::string_view> line, zrm_rmlogent_data_t& row,

@@ -9,6 +9,7 @@ import time
 from signal import SIGKILL, SIGTERM
 
 import pytest
+from analysis import Analysis
 from api import Api
 from conftest import Log, descriptions, wait_until
 
@@ -129,6 +130,15 @@ def test_lines_of_containers_are_joined_and_unwrapped(agent):
     assert rows["cri.log"]["ENTRYDESC"] == "two parts"
     assert rows["cri.log"]["ENTRYSRC"] == "web"
     assert agent.stop() == 0
+
+
+def test_an_explanation_is_about_whole_entries(agent):
+    log = followed(agent)
+    log.append(trace("first") + trace("second"))
+    agent.wait_events(2)
+    explained = Analysis(agent).explain(definition={}, log=str(log), last=2)
+    assert [one["line"] for one in explained] == [trace("first")[:-1], trace("second")[:-1]]
+    assert [one["row"]["ENTRYDESC"] for one in explained] == ["first", "second"]
 
 
 class Writer:
