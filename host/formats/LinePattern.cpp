@@ -19,16 +19,42 @@ re2::RE2::Options options() {
     return options;
 }
 
-/// Whether all matches are at the beginning of a line, because the expression begins with "^" and
-/// that is not part of one of several alternatives.
+/// Whether the expression is one of several alternatives, none of which is in a group. True also
+/// for what is not worth a closer look.
+bool hasAlternatives(std::string_view pattern) {
+    if (pattern.find("[:") != std::string_view::npos ||
+        pattern.find("\\Q") != std::string_view::npos) {
+        return true;
+    }
+    std::size_t depth = 0;
+    bool isInBrackets = false;
+    for (std::size_t at = 0; at < pattern.size(); ++at) {
+        const char character = pattern[at];
+        if (character == '\\') {
+            ++at;
+        } else if (isInBrackets) {
+            isInBrackets = character != ']';
+        } else if (character == '[') {
+            isInBrackets = true;
+            at += pattern.substr(at + 1).starts_with('^') ? 1 : 0;
+            at += pattern.substr(at + 1).starts_with(']') ? 1 : 0; // stands for itself
+        } else if (character == '(') {
+            ++depth;
+        } else if (character == ')') {
+            --depth;
+        } else if (character == '|' && depth == 0) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// Whether all matches are at the beginning of a line.
 bool isAnchored(std::string_view pattern) {
     constexpr std::string_view repetitions = "*+?{";
-    if (!pattern.starts_with('^') ||
-        (pattern.size() > 1 && repetitions.find(pattern[1]) != std::string_view::npos)) {
-        return false;
-    }
-    // What looks like one of several alternatives may be in brackets or in a group.
-    return pattern.find('|') == std::string_view::npos;
+    const bool isRepeated =
+        pattern.size() > 1 && repetitions.find(pattern[1]) != std::string_view::npos;
+    return pattern.starts_with('^') && !isRepeated && !hasAlternatives(pattern);
 }
 
 } // namespace

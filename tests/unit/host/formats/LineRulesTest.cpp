@@ -133,9 +133,11 @@ TEST(LineRules, EqualRulesHaveEqualDefinitions) {
 
 /// What decides most lines agrees with the library.
 TEST(LinePattern, FindsWhatTheLibraryFinds) {
-    const char* const patterns[] = {R"(^\d{4}-)", "^[A-F]x?", "^a|b",    "^*b",       "^",
-                                    "^$",         "b",        "^(a|b)c", R"(^\s+)",   "^(?i)ab",
-                                    "^[^a]",      "^.b",      R"(^\W)",  "^\xc3\xa4", "^a*b"};
+    const char* const patterns[] = {
+        R"(^\d{4}-)", "^[A-F]x?",          "^a|b",    "^*b",          "^",         "^$",
+        "b",          "^(a|b)c",           R"(^\s+)", "^(?i)ab",      "^[^a]",     "^.b",
+        R"(^\W)",     "^\xc3\xa4",         "^a*b",    R"(^(?:a|b)c)", "^[|(]a|b",  "^(a)|b",
+        R"(^\(|b)",   "^[[:alpha:]|b]c|b", "^[]|]|b", R"(^\Q(\E|b)",  "^(?:\\s|b)"};
     std::mt19937 random(7);
     for (const char* const text : patterns) {
         const auto pattern = LinePattern::compile(text);
