@@ -8,8 +8,8 @@
 namespace zrm::host {
 
 /// Reads a generation of a log that was compressed by gzip, bzip2, xz or zstd; for
-/// GenerationReader::setOpen. Memory is bounded by what the compression asks for, whatever the
-/// size.
+/// GenerationReader::setOpen. Takes at most GenerationReader::mostMemory, whatever the size: gzip
+/// and bzip2 need little, and zstd refuses larger windows by itself.
 std::unique_ptr<GenerationReader> openCompressedGeneration(int descriptor);
 
 } // namespace zrm::host

@@ -124,8 +124,9 @@ bool Generation::restart() noexcept {
 
 std::ptrdiff_t Generation::readCompressed(char* buffer, std::size_t room,
                                           std::int64_t offset) noexcept {
+    errno = 0;
     if ((m_reader == nullptr || offset < m_readTo) && !restart()) {
-        errno = EIO;
+        errno = errno == ENOMEM ? ENOMEM : EIO;
         return -1;
     }
     std::array<char, 16384> passedOver;
@@ -137,8 +138,9 @@ std::ptrdiff_t Generation::readCompressed(char* buffer, std::size_t room,
                                  std::min(passedOver.size(), static_cast<std::size_t>(before)))
                 : m_reader->read(buffer, room);
         if (count < 0) {
+            const int number = errno == ENOMEM ? ENOMEM : EIO;
             m_reader.reset();
-            errno = EIO;
+            errno = number;
             return -1;
         }
         const std::int64_t from = m_readTo;

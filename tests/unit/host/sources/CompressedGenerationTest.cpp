@@ -5,7 +5,9 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdint>
+#include <cstring>
 #include <fstream>
 #include <iterator>
 #include <memory>
@@ -16,6 +18,7 @@
 #include <archive.h>
 #include <archive_entry.h>
 #include <fcntl.h>
+#include <lzma.h>
 #include <unistd.h>
 
 using namespace zrm;
@@ -41,9 +44,9 @@ public:
     }
 };
 
-class CompressedGenerationTest : public testing::TestWithParam<int> {
+class CompressedGenerationFixture {
 protected:
-    ~CompressedGenerationTest() override { close(descriptor); }
+    ~CompressedGenerationFixture() { close(descriptor); }
 
     std::unique_ptr<GenerationReader> open() {
         close(descriptor);
@@ -83,6 +86,11 @@ protected:
     std::mt19937 dice{1};
     int descriptor = -1;
 };
+
+class CompressedGenerationTest : public CompressedGenerationFixture,
+                                 public testing::TestWithParam<int> {};
+
+class XzGenerationTest : public CompressedGenerationFixture, public testing::Test {};
 
 TEST_P(CompressedGenerationTest, GivesTheContents) {
     for (const std::size_t count : {std::size_t{1}, std::size_t{10'000}}) {
@@ -194,6 +202,33 @@ TEST_P(CompressedGenerationTest, WhatIsNotCompressedIsRefused) {
         write(contents);
         EXPECT_EQ(open(), nullptr);
     }
+}
+
+/// A file that asks for a dictionary of 1 GiB.
+TEST_F(XzGenerationTest, WhatTakesTooMuchMemoryIsRefused) {
+    CompressedFile(path, ARCHIVE_FILTER_XZ, "a line\n");
+    std::string file = bytes();
+    constexpr std::size_t head = 12; // of the stream; the block's begins there
+    const std::size_t length = (static_cast<unsigned char>(file[head]) + 1U) * 4;
+    const std::size_t filter = file.find(std::string("\x21\x01", 2), head); // LZMA2, one property
+    ASSERT_LT(filter, head + length);
+    file[filter + 2] = 36; // 1 GiB
+    const std::uint32_t sum =
+        lzma_crc32(reinterpret_cast<const std::uint8_t*>(file.data()) + head, length - 4, 0);
+    std::memcpy(file.data() + head + length - 4, &sum, sizeof sum); // little-endian, as xz
+    write(file);
+    errno = 0;
+    EXPECT_EQ(open(), nullptr);
+    EXPECT_EQ(errno, ENOMEM);
+    file[filter + 2] = 26; // 32 MiB
+    const std::uint32_t less =
+        lzma_crc32(reinterpret_cast<const std::uint8_t*>(file.data()) + head, length - 4, 0);
+    std::memcpy(file.data() + head + length - 4, &less, sizeof less);
+    write(file);
+    const auto reader = open();
+    ASSERT_NE(reader, nullptr);
+    std::ptrdiff_t end = 1;
+    EXPECT_EQ(readAll(*reader, end), "a line\n");
 }
 
 INSTANTIATE_TEST_SUITE_P(Filters, CompressedGenerationTest,
