@@ -10,6 +10,7 @@
 #include "monitor/BackwardBlock.h"
 #include "monitor/EntryBlock.h"
 #include "monitor/GenerationNames.h"
+#include "monitor/Interruption.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -33,6 +34,7 @@ constexpr std::int64_t disorder = 3600;
 /// still. A clock that was wrong for some entries does not end a report.
 constexpr unsigned farEntries = 10'000;
 constexpr std::size_t rowsPerProgress = 256;
+constexpr unsigned firstEntries = 100; ///< of a file, by which its age is judged
 constexpr const char* noFile = "there is no such file";
 
 /// The time stamp so many seconds later. A stamp that is not a time stays.
@@ -67,8 +69,12 @@ std::string openProblem(const std::string& path, int error) {
 
 std::string readProblem(const Generation& generation, std::int64_t offset, int error) {
     const std::string place = std::to_string(offset);
+    if (generation.isCompressed() && error == ENOMEM) {
+        return "decompressing it takes more than 128 MiB of memory";
+    }
     return generation.isCompressed()
-               ? "it is damaged: only the first " + place + " bytes of its contents can be read"
+               ? "it is damaged: only the first " + place + " bytes of its contents can be read" +
+                     (offset > 0 ? ", and the last of them may be wrong" : "")
                : "reading it failed before byte " + place + ": " + ErrorText(error).text();
 }
 
@@ -118,6 +124,7 @@ FollowedReport::FollowedReport(std::string path, EntryReader& entries, Options o
       m_newest(presentTime()) {}
 
 void FollowedReport::run(Receiver& receiver) {
+    const Interruption interruption(CTX1_IsCancelled);
     findFiles();
     for (File& file : m_files) {
         if (isEnded() || !readFile(file, receiver)) {
@@ -171,27 +178,26 @@ bool FollowedReport::readFile(File& file, Receiver& receiver) {
         m_done += file.size;
         return true;
     }
-    std::string first;
+    FirstTimes first;
     if (generation) {
-        first = firstTime(*generation);
-        if (first.empty() || first <= m_longAfter) {
+        first = firstTimes(*generation);
+        if (first.earliest.empty() || first.earliest <= m_longAfter) {
             file.isRead = true;
             generation->isCompressed() ? readForward(*generation, file, receiver)
                                        : readBackward(*generation, file, receiver);
         }
-        m_newest = first.empty() ? m_newest : std::min(m_newest, first);
+        m_newest = first.latest.empty() ? m_newest : std::min(m_newest, first.latest);
     }
     if (generation && !generation->isCompressed()) {
         m_younger = std::move(generation);
     }
     m_done += file.size;
-    return first.empty() || first >= m_longBefore;
+    return first.latest.empty() || first.latest >= m_longBefore;
 }
 
 /// Whether the next younger file has all that this one has, as if it was copied and not rotated.
-/// Compressed files are not compared: that would mean to read them.
 bool FollowedReport::isCopy(Generation& older) {
-    return m_younger && !older.isCompressed() && older.isCopyOf(*m_younger);
+    return m_younger && older.isCopyOf(*m_younger);
 }
 
 /// Null, with the file's problem, if it cannot be opened or has become another one.
@@ -210,8 +216,11 @@ std::unique_ptr<Generation> FollowedReport::open(File& file) {
     return generation;
 }
 
-/// The time of the first entry in the first block; empty if there is none.
-std::string FollowedReport::firstTime(Generation& generation) {
+/// The times of the first entries in the first block. A clock that was wrong for some of them, as
+/// after the start of a machine, says nothing about the other generations.
+FollowedReport::FirstTimes FollowedReport::firstTimes(Generation& generation) {
+    FirstTimes times;
+    unsigned entries = 0;
     EntryBlock block(m_entries.recordLength(), m_options.join.get());
     block.start(0, {});
     const EntryBlock::Fill filled = block.fill(generation);
@@ -220,12 +229,16 @@ std::string FollowedReport::firstTime(Generation& generation) {
         return entry == nullptr && block.isWaiting() ? block.endWaiting() : entry;
     };
     char* entry = filled == EntryBlock::Fill::more ? next() : nullptr;
-    for (; entry != nullptr; entry = next()) {
-        if (m_entries.read(entry, block.text(), m_newest.data(), m_row)) {
-            return std::string(timeOf(m_row));
+    for (; entry != nullptr && entries < firstEntries; entry = next()) {
+        if (!m_entries.read(entry, block.text(), m_newest.data(), m_row)) {
+            continue;
         }
+        const std::string_view time = timeOf(m_row);
+        times.earliest = entries == 0 ? time : std::min<std::string_view>(times.earliest, time);
+        times.latest = entries == 0 ? time : std::max<std::string_view>(times.latest, time);
+        ++entries;
     }
-    return {};
+    return times;
 }
 
 /// Reads an entry into the row and compares its time with the report's window.

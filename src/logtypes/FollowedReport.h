@@ -22,7 +22,8 @@ class LineJoin;
 /// newest entry first. A line that does not fit, or a file that cannot be read, does not end it. A
 /// generation of which only the beginning shows that it has nothing between the two times is not
 /// read any further, and none that is older than the first time is opened. Compressed generations
-/// are read once, from their beginning on, and only the rows that may be given are kept. Memory is
+/// are read once, from their beginning on, and only the rows that may be given are kept; one whose
+/// contents a younger file has is a copy, and is not read. Memory is
 /// bounded whatever the files have. One thread; ends when its request does (CTX1_IsCancelled).
 class FollowedReport {
 public:
@@ -77,7 +78,12 @@ private:
     bool readFile(File& file, Receiver& receiver);
     std::unique_ptr<Generation> open(File& file);
     bool isCopy(Generation& older);
-    std::string firstTime(Generation& generation);
+    /// Time stamps; empty if there is no entry.
+    struct FirstTimes {
+        std::string earliest;
+        std::string latest;
+    };
+    FirstTimes firstTimes(Generation& generation);
     void readBackward(Generation& generation, File& file, Receiver& receiver);
     void readForward(Generation& generation, File& file, Receiver& receiver);
     bool isEnded();

@@ -279,7 +279,7 @@ TEST_F(FollowedReportTest, OfADamagedGenerationWhatCanBeReadIsGiven) {
     EXPECT_THAT(run(), ElementsAre("three", "two", "one"));
     EXPECT_THAT(problems(),
                 ElementsAre(".1.gz: it is damaged: only the first 34 bytes of its contents can "
-                            "be read",
+                            "be read, and the last of them may be wrong",
                             ".2.gz: it is damaged: only the first 0 bytes of its contents can be "
                             "read"));
 }
@@ -333,6 +333,25 @@ TEST_F(FollowedReportTest, CopiesOfTheLogAreNotReadAgain) {
     EXPECT_THAT(run(), ElementsAre("three", "two", "one", "one", "another"));
     EXPECT_THAT(read(), ElementsAre("", ".3"));
     EXPECT_THAT(problems(), IsEmpty());
+}
+
+TEST_F(FollowedReportTest, CompressedCopiesOfTheLogAreNotReadAgain) {
+    const std::string oldest = line("10-03", "one");
+    directory.write("app.log", oldest + line("10-04", "two") + line("10-05", "three"));
+    directory.write("app.log.1.gz", "GZ" + oldest + line("10-04", "two"));
+    directory.write("app.log.2.gz", "GZ" + oldest);
+    directory.write("app.log.3.gz", "GZ" + oldest + line("10-03", "another"));
+    EXPECT_THAT(run(), ElementsAre("three", "two", "one", "another", "one"));
+    EXPECT_THAT(read(), ElementsAre("", ".3.gz"));
+    EXPECT_THAT(problems(), IsEmpty());
+}
+
+TEST_F(FollowedReportTest, EntriesWithAWrongTimeAtTheBeginningHideNoGeneration) {
+    const std::string wrong = "1999-01-01T12:00:00 web1 app: boot\n";
+    directory.write("app.log", wrong + wrong + line("10-05", "three"));
+    directory.write("app.log.1", "2027-01-01T12:00:00 web1 app: early\n" + line("10-04", "two"));
+    directory.write("app.log.2", line("10-03", "one"));
+    EXPECT_THAT(run("1061003000000000", "1061006000000000"), ElementsAre("three", "two", "one"));
 }
 
 TEST_F(FollowedReportTest, GenerationsAreWhereRotationMovesThemAndBesideALinksTarget) {
