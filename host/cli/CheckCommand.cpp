@@ -6,6 +6,7 @@
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/FieldWarnings.h"
 #include "host/config/OwnFiles.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/sources/LogFinder.h"
@@ -71,6 +72,9 @@ std::vector<std::string> notesOn(const HostConfig& config, const std::string& co
         if (warning) {
             notes.push_back(*warning);
         }
+    }
+    for (std::string& warning : warningsOfFields(config, path)) {
+        notes.push_back(std::move(warning));
     }
     return notes;
 }

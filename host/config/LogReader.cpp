@@ -67,6 +67,18 @@ void refuse(ConfigSection& section, std::string_view key, const LogConfig& log) 
     section.refuse(key, "has no meaning for type \"" + log.type + '"');
 }
 
+/// The length of a format in which each ${@} is replaced by the log's name.
+std::size_t namedLength(std::string_view format, std::string_view name) {
+    constexpr std::string_view token = "${@}";
+    std::size_t length = format.size();
+    for (std::size_t at = format.find(token); at != std::string_view::npos;
+         at = format.find(token, at + token.size())) {
+        length += name.size();
+        length -= token.size();
+    }
+    return length;
+}
+
 constexpr const char* openBracketCure =
     "close it with ']' in the same name, or write '\\[' for the character itself";
 
@@ -264,6 +276,17 @@ void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
         section.problem("format", "has " + std::to_string(log.format.size()) + " bytes",
                         "write at most " + std::to_string(longest));
         return;
+    }
+    for (const std::string& path : log.paths) {
+        const std::size_t length = namedLength(log.format, path);
+        if (!PathPattern::isPattern(path) && length > longest) {
+            section.problem("format",
+                            "has " + std::to_string(length) +
+                                " characters once each ${@} is replaced by '" + path + "'",
+                            "write at most " + std::to_string(longest) +
+                                ", with ${@} in fewer places");
+            return;
+        }
     }
     TraceCapture errors;
     const StringParser parser(log.format.c_str(), UserLogFile::followedFields());

@@ -36,6 +36,16 @@ bool PathPattern::isPattern(std::string_view text) noexcept {
     return text.find_first_of("*?[\\") != std::string_view::npos;
 }
 
+std::string PathPattern::literal(std::string_view path) {
+    std::string pattern;
+    for (const char character : path) {
+        const char text[] = {character, '\0'};
+        pattern += isPattern(text) ? "\\" : "";
+        pattern += character;
+    }
+    return pattern;
+}
+
 bool PathPattern::hasOpenBracket(std::string_view text) noexcept {
     for (std::size_t at = 0; at < text.size(); ++at) {
         if (text[at] == '\\') {

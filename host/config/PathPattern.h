@@ -13,6 +13,9 @@ namespace PathPattern {
 /// Whether the text holds anything but literal characters.
 bool isPattern(std::string_view text) noexcept;
 
+/// The pattern that matches only this path.
+std::string literal(std::string_view path);
+
 /// Whether a '[' has no ']' in the same name. Such a pattern matches only a literal '['.
 bool hasOpenBracket(std::string_view text) noexcept;
 

@@ -1,5 +1,6 @@
 #include "host/diagnose/TrialLine.h"
 
+#include "host/config/PathPattern.h"
 #include "host/events/RowText.h"
 #include "host/framework/RowLayout.h"
 #include "logs/FollowSettings.h"
@@ -82,7 +83,7 @@ std::vector<std::pair<std::string, std::string>> entryTexts(const zrm_rmlogent_d
 }
 
 std::string tableText(std::string_view log, std::string_view format, std::string_view timezone) {
-    std::string text = "[[log]]\npath = " + tomlString(log) + '\n';
+    std::string text = "[[log]]\npath = " + tomlString(PathPattern::literal(log)) + '\n';
     if (!format.empty()) {
         text += "type = 'text'\nformat = " + tomlString(format) + '\n';
     }

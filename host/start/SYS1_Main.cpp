@@ -2,6 +2,7 @@
 #include "host/base/Say.h"
 #include "host/base/WatchedFile.h"
 #include "host/config/ConfigFile.h"
+#include "host/config/FieldWarnings.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
 #include "host/sources/CompressedGeneration.h"
@@ -58,6 +59,9 @@ HostConfig readConfig(const std::string& path) {
         if (warning) {
             say("%s", warning->c_str());
         }
+    }
+    for (const std::string& warning : warningsOfFields(*config, path)) {
+        say("%s", warning.c_str());
     }
     return std::move(*config);
 }

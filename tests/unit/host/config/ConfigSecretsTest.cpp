@@ -1,7 +1,9 @@
 #include "host/config/ConfigFile.h"
+#include "host/config/FieldWarnings.h"
 
 #include "support/TemporaryDirectory.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstdlib>
@@ -13,6 +15,9 @@
 using namespace zrm::host;
 
 namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
 
 class ConfigSecretsTest : public testing::Test {
 protected:
@@ -26,6 +31,31 @@ protected:
 
     TemporaryDirectory directory;
 };
+
+TEST(ConfigFields, WarnsAboutConditionsOnFieldsOfLogsThatHaveNone) {
+    const auto warnings = [](const std::string& tables, const std::string& log) {
+        const ConfigFile::Result result =
+            ConfigFile::parse(tables + "[[situation]]\nname = 'a'\nseverity = 'info'\n" + log +
+                                  "when = [\"ENTRYSYS = 'h'\", \"field.user = 'root'\"]\n",
+                              "zrm.toml");
+        EXPECT_TRUE(result) << result.error().front();
+        return warningsOfFields(result.value(), "zrm.toml");
+    };
+    const std::string text = "[[log]]\npath = '/t/*'\nexclude = 'no.log'\ntype = 'text'\nformat = "
+                             "'A,\"%s\",description'\n";
+    const std::string syslog = "[[log]]\npath = '/s.log'\n";
+    const std::string begin = "zrm.toml: situation 'a': field.user is in no entry: ";
+    EXPECT_THAT(warnings(text + syslog, ""), IsEmpty());
+    EXPECT_THAT(warnings(text + syslog, "log = '/s.log'\n"), IsEmpty());
+    EXPECT_THAT(warnings(text, ""),
+                ElementsAre(begin + "no [[log]] table has a type whose entries have fields"));
+    EXPECT_THAT(warnings(syslog + text, "log = '/t/a.log'\n"),
+                ElementsAre(begin + "entries of type \"text\", as the [[log]] at line 3 has them, "
+                                    "have no fields"));
+    EXPECT_THAT(warnings(text, "log = '/t/no.log'\n"),
+                ElementsAre(begin + "no [[log]] table names /t/no.log, and entries of other logs "
+                                    "have no fields"));
+}
 
 } // namespace
 

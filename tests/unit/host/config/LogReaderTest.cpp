@@ -291,6 +291,14 @@ TEST(LogReader, ChecksTheFormatOfATextLog) {
         refused("[[log]]\npath = '/a'\ntype = 'text'\nformat = '" + std::string(2000, 'a') + "'\n")
             .size(),
         1U);
+    const std::string named = "A,\"%s ${@}${@}${@}\" , year";
+    const std::string path = '/' + std::string(400, 'p');
+    const std::vector<std::string> tooLong =
+        refused("[[log]]\npath = '" + path + "'\ntype = 'text'\nformat = '" + named + "'\n");
+    ASSERT_EQ(tooLong.size(), 1U);
+    EXPECT_TRUE(tooLong[0].starts_with(
+        "zrm.toml:4: log.format: has 1217 characters once each ${@} is replaced by '/ppp"))
+        << tooLong[0];
 }
 
 } // namespace

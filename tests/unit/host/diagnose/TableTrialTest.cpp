@@ -3,6 +3,7 @@
 #include "host/diagnose/FormatTrial.h"
 
 #include "host/config/ConfigFile.h"
+#include "host/config/PathPattern.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 #include "support/TimeZone.h"
@@ -54,6 +55,12 @@ TEST(TableTrial, ATableKnowsZones) {
     EXPECT_EQ(config->logs[0].format, format);
     EXPECT_EQ(config->logs[0].follow.timezone, "UTC");
     EXPECT_EQ(FormatTrial::settingsOf("Nowhere/Town"), std::nullopt);
+    const std::string odd = "/logs/a*[b]?\\.log";
+    const ConfigFile::Result other =
+        ConfigFile::parse(FormatTrial::run(format, lines, odd, inZone("UTC")).table, "zrm.toml");
+    ASSERT_TRUE(other) << other.error().front();
+    EXPECT_TRUE(PathPattern::matches(other->logs[0].paths[0], odd));
+    EXPECT_FALSE(PathPattern::matches(other->logs[0].paths[0], "/logs/axbx\\.log"));
 }
 
 TEST(TableTrial, OfALongLineATableTakesTheBeginning) {

@@ -118,6 +118,31 @@ TEST_F(HistorySourceTest, CatchesUpFromTheFileAndContinuesInMemory) {
     EXPECT_EQ(ids, idsFrom(11, 1010));
 }
 
+TEST_F(HistorySourceTest, ReadsAtMostSomeMegabytesOfTheFileAtOnce) {
+    constexpr std::uint64_t last = 20;
+    std::vector<EventRecord> events;
+    const std::string json = "\"" + std::string(1024 * 1024, 'x') + "\"";
+    for (std::uint64_t id = 1; id <= last; ++id) {
+        events.push_back(testEvent(id));
+        events.back().json = json;
+    }
+    file.store(*batchOf(events), {});
+    RecentEvents later(plenty, last);
+    HistorySource late("late", later, readers, cursor);
+    std::vector<std::uint64_t> ids;
+    std::vector<std::size_t> reads;
+    while (late.backlog() > 0) {
+        const auto read = late.read(64);
+        reads.push_back(read.size());
+        for (const EventRecord& event : read) {
+            ids.push_back(event.id);
+        }
+        late.release(read.size());
+    }
+    EXPECT_THAT(reads, ElementsAre(8u, 8u, 4u));
+    EXPECT_EQ(ids, idsFrom(1, last));
+}
+
 TEST_F(HistorySourceTest, WaitsForEvents) {
     auto reading = std::async(std::launch::async, [&] { return source.read(10).size(); });
     EXPECT_EQ(reading.wait_for(20ms), std::future_status::timeout);

@@ -1,0 +1,66 @@
+#include "host/config/FieldWarnings.h"
+
+#include "host/config/HostConfig.h"
+#include "host/config/PathPattern.h"
+
+#include <algorithm>
+#include <string_view>
+
+namespace zrm::host {
+
+namespace {
+
+bool hasFields(const LogConfig& log) {
+    return std::string_view("UAE").find(log.letter) == std::string_view::npos;
+}
+
+/// Whether the table names the file or matches it, and does not exclude it.
+bool isOf(const LogConfig& log, const std::string& file) {
+    return std::any_of(log.paths.begin(), log.paths.end(),
+                       [&file](const std::string& path) {
+                           return path == file || PathPattern::matches(path, file);
+                       }) &&
+           std::none_of(log.excludes.begin(), log.excludes.end(),
+                        [&file](const std::string& pattern) {
+                            return PathPattern::excludes(pattern, file);
+                        });
+}
+
+/// Why no entry that the situation judges has fields; empty if some may.
+std::string reason(const HostConfig& config, const SituationConfig& situation) {
+    if (!situation.log) {
+        return std::any_of(config.logs.begin(), config.logs.end(), hasFields)
+                   ? ""
+                   : "no [[log]] table has a type whose entries have fields";
+    }
+    const auto table =
+        std::find_if(config.logs.begin(), config.logs.end(),
+                     [&](const LogConfig& log) { return isOf(log, *situation.log); });
+    if (table == config.logs.end()) {
+        return "no [[log]] table names " + *situation.log +
+               ", and entries of other logs have no fields";
+    }
+    return hasFields(*table) ? ""
+                             : "entries of type \"" + table->type + "\", as the [[log]] at line " +
+                                   std::to_string(table->line) + " has them, have no fields";
+}
+
+} // namespace
+
+std::vector<std::string> warningsOfFields(const HostConfig& config, const std::string& path) {
+    std::vector<std::string> warnings;
+    for (const SituationConfig& situation : config.situations) {
+        const auto condition =
+            std::find_if(situation.conditions.begin(), situation.conditions.end(),
+                         [](const Condition& one) { return one.isOnField(); });
+        const std::string why =
+            condition == situation.conditions.end() ? "" : reason(config, situation);
+        if (!why.empty()) {
+            warnings.push_back(path + ": situation '" + situation.name + "': " + condition->column +
+                               " is in no entry: " + why);
+        }
+    }
+    return warnings;
+}
+
+} // namespace zrm::host
