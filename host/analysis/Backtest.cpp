@@ -1,9 +1,14 @@
 #include "host/analysis/Backtest.h"
 
 #include "base/TraceScope.h"
+#include "host/analysis/LogReport.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "host/framework/RequestLimit.h"
 #include "logs/EntryClock.h"
+#include "logs/FollowSettings.h"
 #include "logs/RequestThresholds.h"
+#include "logtypes/EntryReader.h"
+#include "logtypes/FollowedReport.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
 
@@ -56,14 +61,66 @@ struct Backtest::Limits {
         if (result.entries >= mostEntries || result.matched >= mostMatched) {
             reason = "the backtest has read as many entries as it may";
         } else if (looked++ % entriesPerLook == 0) {
-            if (isCancelled()) {
-                reason = "the backtest was cancelled";
-            } else if (std::chrono::steady_clock::now() >= deadline) {
-                reason = "the backtest has taken as long as it may";
-            }
+            isTimeUp();
         }
         return *reason != '\0';
     }
+    bool isTimeUp() {
+        if (isCancelled()) {
+            reason = "the backtest was cancelled";
+        } else if (std::chrono::steady_clock::now() >= deadline) {
+            reason = "the backtest has taken as long as it may";
+        }
+        return *reason != '\0';
+    }
+};
+
+/// Judges the entries of a followed log as its files are read.
+class Backtest::Entries : public FollowedReport::Receiver {
+public:
+    Entries(Backtest& test, std::shared_ptr<const FollowSettings> settings, Limits& limits,
+            Result& result)
+        : m_test(test), m_settings(std::move(settings)), m_limits(limits), m_result(result),
+          m_first(test.m_matched.size()) {}
+
+    void begin(bool isOldestFirst) override {
+        end();
+        m_isOldestFirst = isOldestFirst;
+        m_clock.emplace(m_settings, isOldestFirst ? EntryClock::Reading::forward
+                                                  : EntryClock::Reading::backward);
+    }
+    bool meets(zrm_rmlogent_data_t& row) override {
+        if (m_limits.areReached(m_result)) {
+            return false;
+        }
+        const std::int64_t instant = m_clock->next(lastEntryMoment, row.entrytime);
+        ++m_result.entries;
+        if (m_test.m_replay.matches(row)) {
+            ++m_result.matched;
+            m_test.add(row.entrytime, instant);
+        }
+        return false; // no row is kept
+    }
+    void give(const zrm_rmlogent_data_t&) override {}
+    void progress(std::int64_t, std::int64_t) override {}
+
+    /// What the last file had is newest first from now on.
+    void end() {
+        auto& matched = m_test.m_matched;
+        if (m_isOldestFirst) {
+            std::reverse(matched.begin() + static_cast<std::ptrdiff_t>(m_first), matched.end());
+        }
+        m_first = matched.size();
+    }
+
+private:
+    Backtest& m_test;
+    const std::shared_ptr<const FollowSettings> m_settings;
+    Limits& m_limits;
+    Result& m_result;
+    std::size_t m_first; ///< match of the file
+    bool m_isOldestFirst = false;
+    std::optional<EntryClock> m_clock;
 };
 
 Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::string& from,
@@ -73,7 +130,12 @@ Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::str
     Limits limits{isCancelled};
     m_matched.clear();
     for (LogFile* const log : logs) {
-        read(*log, from, to, limits, result);
+        const auto entries = log->followSettings() ? EntryReader::of(*log) : nullptr;
+        if (entries) {
+            readFollowed(*log, *entries, from, to, limits, result);
+        } else {
+            read(*log, from, to, limits, result);
+        }
         if (result.isTruncated) {
             break;
         }
@@ -121,10 +183,7 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         reach.reached.assign(row->entrytime, sizeof row->entrytime);
         if (m_replay.matches(*row)) {
             ++result.matched;
-            Matched& matched = m_matched.emplace_back();
-            std::memcpy(matched.time.data(), row->entrytime, matched.time.size());
-            matched.order = matched.time;
-            matched.instant = instant;
+            add(row->entrytime, instant);
         }
     }
     if (isFollowed) {
@@ -133,6 +192,34 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     log.endReportRequest(&report);
     reach.reason = result.isTruncated ? limits.reason : outcome.reason();
     addReach(log, std::move(reach), result);
+}
+
+/// Ends with the request, the limits, or the oldest generation that has entries of these times.
+void Backtest::readFollowed(const LogFile& log, EntryReader& entries, const std::string& from,
+                            const std::string& to, Limits& limits, Result& result) {
+    TraceScope trace(anchor);
+    RequestLimit* const outer = RequestLimit::current();
+    const RequestLimit limit(limits.deadline, [&] {
+        return limits.isTimeUp() || (outer != nullptr && outer->isReached());
+    });
+    const auto& settings = log.followSettings();
+    FollowedReport report(log.fileNameLocal(), entries,
+                          {from, to, 1, settings->rotatedTo, settings->join.value});
+    Entries judged(*this, settings, limits, result);
+    const std::size_t first = m_matched.size();
+    report.run(judged);
+    judged.end();
+    keepOrder(first);
+    result.isTruncated = report.isCancelled() || *limits.reason != '\0';
+    addReach(log, {report.reached(), *limits.reason != '\0' ? limits.reason : reasonOf(report)},
+             result);
+}
+
+void Backtest::add(const char* time, std::optional<std::int64_t> instant) {
+    Matched& matched = m_matched.emplace_back();
+    std::memcpy(matched.time.data(), time, matched.time.size());
+    matched.order = matched.time;
+    matched.instant = instant;
 }
 
 /// The first log that was not read whole decides; how far all were read, the one read least.

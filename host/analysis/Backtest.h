@@ -17,14 +17,16 @@
 class TableManager;
 
 namespace zrm {
+class EntryReader;
 class LogFile;
 } // namespace zrm
 
 namespace zrm::host {
 
-/// Runs a situation over the contents of logs between two times, using the logs' reports without
-/// their row limit. Keeps the times of matching entries but no rows. Used by one thread, which
-/// keeps the logs from changing in the meantime (MonitoredLogs).
+/// Runs a situation over the contents of logs between two times: over all generations of a followed
+/// log (FollowedReport), and with the reports of the others, without their row limit. Keeps the
+/// times of matching entries but no rows. Used by one thread, which keeps the logs from changing in
+/// the meantime (MonitoredLogs).
 class Backtest {
 public:
     static constexpr std::uint64_t mostEntries = 5'000'000; ///< read
@@ -57,6 +59,7 @@ public:
 private:
     using Stamp = std::array<char, 16>;
     struct Limits;
+    class Entries;
     /// An entry that met every condition.
     struct Matched {
         Stamp time;
@@ -66,6 +69,9 @@ private:
 
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
               Result& result);
+    void readFollowed(const LogFile& log, EntryReader& entries, const std::string& from,
+                      const std::string& to, Limits& limits, Result& result);
+    void add(const char* time, std::optional<std::int64_t> instant);
     void keepOrder(std::size_t first);
     Replay::Verdict count(const Matched& matched);
     void replay(Result& result);

@@ -44,7 +44,8 @@ private:
     LogReport::Receiver& m_receiver;
 };
 
-/// Why a followed log was not read completely; empty if it was.
+} // namespace
+
 std::string reasonOf(const FollowedReport& report) {
     if (report.isCancelled()) {
         return wasEnded;
@@ -56,8 +57,6 @@ std::string reasonOf(const FollowedReport& report) {
     }
     return report.isLimited() ? "the report has found as many entries as it may" : "";
 }
-
-} // namespace
 
 std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entries) {
     const TraceSilence silence;

@@ -31,6 +31,9 @@ struct ReportQuery {
     std::size_t limit = 1000;          ///< rows
 };
 
+/// Why a report did not read all that was asked for, as a clause; empty if it did.
+std::string reasonOf(const FollowedReport& report);
+
 /// One report on a monitored log. A followed log is read over all its generations, apart from its
 /// monitor: no refresh waits for that. A log of the log configuration is read by a sample of Log
 /// Entries, as it always is. One thread at a time.

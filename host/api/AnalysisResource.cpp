@@ -21,7 +21,6 @@
 #include "host/http/Router.h"
 #include "monitor/LogFile.h"
 
-#include <algorithm>
 #include <limits>
 #include <optional>
 #include <utility>
@@ -218,12 +217,6 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
     fields.refuseUnknown();
     if (from > to) {
         fields.refuse("to", "is before from");
-    }
-    const auto& conditions = wanted.situation.conditions;
-    if (std::any_of(conditions.begin(), conditions.end(),
-                    [](const Condition& condition) { return condition.isOnField(); })) {
-        fields.refuse("situation", "a backtest cannot judge conditions on fields: explain judges "
-                                   "the newest entries of a log");
     }
     if (!m_room.try_acquire()) {
         throw RequestRefused(503, "two backtests are already running: try again", "");

@@ -183,6 +183,7 @@ bool FollowedReport::readFile(File& file, Receiver& receiver) {
         first = firstTimes(*generation);
         if (first.earliest.empty() || first.earliest <= m_longAfter) {
             file.isRead = true;
+            receiver.begin(generation->isCompressed());
             generation->isCompressed() ? readForward(*generation, file, receiver)
                                        : readBackward(*generation, file, receiver);
         }

@@ -31,6 +31,8 @@ public:
     class Receiver {
     public:
         virtual ~Receiver() = default;
+        /// A file is read next: the newest entry first, or the oldest first.
+        virtual void begin(bool /*isOldestFirst*/) {}
         /// Whether a row between the two times meets the conditions of the report. Its entry is
         /// that of the thread (LogEntry).
         virtual bool meets(zrm_rmlogent_data_t& row) = 0;

@@ -178,10 +178,22 @@ def test_explain_says_what_a_field_was(agent):
     log.path.write_text("")
     (one,) = explained(event=event["id"])
     assert one["raised"] is True, "the event has the entry"
-    status, _, problem = api.request(
-        "POST", "/api/v1/backtest", {"situation": "slow", "from": "2026-11-20", "to": "2026-11-21"}
-    )
-    assert (status, "conditions on fields" in problem["detail"]) == (400, True)
+
+
+def test_a_backtest_judges_fields_over_all_generations(agent):
+    log = file(agent)
+    agent.follow(log, start="beginning")
+    agent.situation(name="wanted", log=log, when=["field.message starts 'wanted'"])
+    agent.listen = "127.0.0.1:0"
+    log.append(syslog_line("wanted one") + syslog_line("other"))
+    log.path.rename(f"{log}.1")
+    log.path.write_text(syslog_line("wanted two"))
+    agent.start()
+    window = {"from": "2000-01-01", "to": "2099-01-01"}
+    status, _, answer = Api(agent).request("POST", "/api/v1/backtest", {"situation": "wanted", **window})
+    assert (status, answer["entries"], answer["matched"], answer["raised"]) == (200, 3, 2, 2)
+    assert answer["complete"] is True
+    assert agent.stop() == 0
 
 
 def test_context_is_the_entries_before(agent):

@@ -1,15 +1,20 @@
 #include "host/analysis/Backtest.h"
 
 #include "host/config/SituationValidator.h"
+#include "logs/FollowSettings.h"
+#include "logs/FurtherLogs.h"
+#include "logtypes/SysLogFile.h"
 #include "support/Faults.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 #include "tables/zrm_rmlogent_manager.h"
 #include "unit/host/analysis/TestLog.h"
+#include "unit/monitor/FakeCompression.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -88,6 +93,78 @@ TEST_F(BacktestTest, ReportsWhyItWouldNotHaveBeenRaised) {
     first.entries = {{0, "x"}, {100, "x"}};
     EXPECT_EQ(run({}, "> 1").decision, "Would not have been raised: 2 of 2 entries meet every "
                                        "condition, but never >= 2 in 60 s.");
+}
+
+/// A followed log that nobody monitors.
+class FollowedBacktestTest : public BacktestTest {
+protected:
+    struct Unmonitored : SysLogFile {
+        explicit Unmonitored(const ValidLog& log) : SysLogFile(log, SysLogFile::Unmonitored{}) {}
+    };
+
+    FollowedBacktestTest() {
+        from = "1061001000000000";
+        to = "1061005120004000";
+        logs = {&log};
+    }
+    static std::string line(const std::string& time, const std::string& text) {
+        return "2006-10-" + time + " web1 app: " + text + '\n';
+    }
+    /// As the trace of raised times shows them: day and time.
+    static std::vector<std::string> moments(const Backtest::Result& result) {
+        std::vector<std::string> moments;
+        for (const std::string& stamp : result.raisedAt) {
+            moments.push_back(stamp.substr(5, 8));
+        }
+        return moments;
+    }
+
+    const FakeCompression compression;
+    const std::string path =
+        directory.write("app.log", line("05T12:00:01", "hit") + line("05T12:00:04", "miss") +
+                                       line("05T12:00:05", "hit"));
+    const ValidLog named{FurtherLog{path, 'S', 'N', "", std::make_shared<const FollowSettings>()}};
+    Unmonitored log{named};
+};
+
+TEST_F(FollowedBacktestTest, ReadsEveryGeneration) {
+    directory.write("app.log.1", line("04T12:00:00", "hit") + line("05T12:00:00", "hit"));
+    directory.write("app.log.2.gz", "GZ" + line("02T12:00:00", "hit") + "no entry\n" +
+                                        line("02T12:00:30", "hit") + line("03T00:00:00", "miss"));
+    directory.write("app.log.3", line("01T00:00:00", "hit"));
+    const Backtest::Result all = run({"ENTRYDESC = 'hit'"});
+    EXPECT_EQ(all.entries, 8u);
+    EXPECT_EQ(all.matched, 6u);
+    EXPECT_THAT(moments(all), ElementsAre("01000000", "02120000", "02120030", "04120000",
+                                          "05120000", "05120001"));
+    EXPECT_TRUE(all.reach.isComplete()) << all.reach.reason;
+    EXPECT_EQ(all.reach.reached, "1061001000000000");
+    EXPECT_FALSE(all.isTruncated);
+    EXPECT_THAT(moments(run({"ENTRYDESC = 'hit'"}, ">= 2")),
+                ElementsAre("02120030", "05120001")); // also across two files
+}
+
+TEST_F(FollowedBacktestTest, JudgesConditionsOnFields) {
+    directory.write("app.log.1.gz", "GZ" + line("04T12:00:00", "hit"));
+    EXPECT_THAT(moments(run({"field.message = 'hit'", "field.host = 'web1'"})),
+                ElementsAre("04120000", "05120001"));
+    EXPECT_EQ(run({"field.pid = 7"}).matched, 0u);
+}
+
+TEST_F(FollowedBacktestTest, SaysWhichFileCannotBeRead) {
+    directory.write("app.log.1.gz", "GZ" + line("04T12:00:00", "hit") + "\1");
+    const Backtest::Result result = run({"ENTRYDESC = 'hit'"});
+    EXPECT_EQ(result.matched, 2u);
+    EXPECT_FALSE(result.isTruncated);
+    EXPECT_THAT(result.reach.reason, testing::HasSubstr("app.log.1.gz was read: it is damaged"));
+}
+
+TEST_F(FollowedBacktestTest, CanBeCancelled) {
+    isCancelled = true;
+    const Backtest::Result result = run({});
+    EXPECT_EQ(result.entries, 0u);
+    EXPECT_TRUE(result.isTruncated);
+    EXPECT_EQ(result.reach.reason, path + ": the backtest was cancelled");
 }
 
 TEST_F(BacktestTest, NamesOnlyTheFirstTimes) {
