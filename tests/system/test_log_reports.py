@@ -136,7 +136,7 @@ def test_a_damaged_generation_and_a_forbidden_one_are_named(agent):
 def test_the_limit_counts_the_entries_that_meet_the_conditions(agent):
     content = "".join(line(1, f"{'hit' if i % 1000 == 0 else 'miss'} {i}") for i in range(5000))
     log, api = watched(agent, content)
-    (agent.directory / "app.log.1.gz").write_bytes(gzip.compress(content.encode()))
+    (agent.directory / "app.log.1.gz").write_bytes(gzip.compress((line(1, "older") + content).encode()))
     where = ["ENTRYDESC starts 'hit'"]
     assert len(texts(report(api, log, where=where))) == 10, "beyond the 1000 that a sample reads"
     answer = report(api, log, where=where, limit=7)
