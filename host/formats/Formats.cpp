@@ -1,5 +1,6 @@
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
+#include "host/formats/RegexFormat.h"
 #include "host/formats/UnwrappedFormat.h"
 #include "host/formats/WtmpFormat.h"
 
@@ -18,6 +19,7 @@ struct Kind {
 
 constexpr Kind kinds[] = {
     {"json", &JsonFormat::make},
+    {"regex", &RegexFormat::make},
     {"wtmp", &WtmpFormat::make},
 };
 
