@@ -79,6 +79,9 @@ bool FileFollower::look(const Moment& now) {
     if (m_chain.empty()) {
         return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
     }
+    if (isUnchanged()) {
+        return m_late.look(now.steady);
+    }
     if (m_options.byName && mayTry(m_nameRetry)) {
         checkName();
     }
@@ -108,12 +111,30 @@ void FileFollower::notePresent() {
                                          : FollowLedger::State::reading);
 }
 
+/// True if the only file was read to its end and is as it was at the last look, when it had the
+/// log's name.
+bool FileFollower::isUnchanged() const noexcept {
+    const bool hasName =
+        !m_options.byName || (m_hadName && m_now.steady - m_nameSeen < nameInterval);
+    Generation::Status now;
+    return hasName && m_chain.size() == 1 && m_isAtEnd && m_hasSeen && !m_block.isWaiting() &&
+           m_nameRetry.failures + m_readRetry.failures + m_youngerRetry.failures == 0 &&
+           m_chain.front().file->status(now) && now == m_seen;
+}
+
 /// Looks whether another file has the log's name.
 void FileFollower::checkName() {
+    m_hadName = false;
     struct stat status;
-    const bool isThere = stat(m_path.c_str(), &status) == 0;
+    bool isThere = lstat(m_path.c_str(), &status) == 0;
+    const bool isLink = isThere && S_ISLNK(status.st_mode);
+    if (isLink) {
+        isThere = stat(m_path.c_str(), &status) == 0;
+    }
     if (isThere && S_ISREG(status.st_mode) &&
         FileIdentity{status.st_dev, status.st_ino} == m_chain.back().file->identity()) {
+        m_hadName = !isLink;
+        m_nameSeen = m_now.steady;
         succeed(m_nameRetry);
         notePresent();
         return;
@@ -155,6 +176,7 @@ bool FileFollower::checkFile() {
             }
         }
     }
+    m_hadName = m_hadName && m_hasSeen && now == m_seen; // else it may have lost it since
     m_seen = now;
     m_hasSeen = true;
     if (isSame && m_isAtEnd && m_chain.size() == 1 && !m_block.isWaiting()) {

@@ -121,7 +121,9 @@ void LogFile::followLog(std::size_t recordLength) {
             }
             noteFollowed(follower, positions);
         }
-        noteFollowFailure();
+        if (m_isFailureTraced || m_followLedger->isFailing()) {
+            noteFollowFailure();
+        }
         losses = traceLosses(*m_followLedger, fileNameLocal(), losses);
         m_pulse.rest();
         if (!isLast) {

@@ -160,6 +160,7 @@ WRAP_ERRNO(struct tm*, localtime_r, nullptr, (const time_t* time, struct tm* res
            (time, result))
 WRAP_ERRNO(DIR*, opendir, nullptr, (const char* path), (path))
 WRAP_ERRNO(off_t, lseek, -1, (int fd, off_t offset, int whence), (fd, offset, whence))
+WRAP_ERRNO(int, lstat, -1, (const char* path, struct stat* status), (path, status))
 WRAP_ERRNO(long, pathconf, -1, (const char* path, int name), (path, name))
 WRAP_ERRNO(int, pipe, -1, (int* fds), (fds))
 WRAP_ERRNO(ssize_t, pread, -1, (int fd, void* data, size_t size, off_t offset),

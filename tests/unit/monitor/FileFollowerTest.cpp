@@ -139,6 +139,66 @@ TEST_F(FileFollowerTest, FollowsASymbolicLinkToItsNewTarget) {
     EXPECT_EQ(looks(2), "1b\n2\n");
 }
 
+TEST_F(FileFollowerTest, TheNameOfAFileThatDoesNotChangeIsLookedAtEveryFiveSeconds) {
+    looks(3);
+    const Fault names("lstat", EIO, {.skip = 100});
+    for (int second = 0; second < 4; ++second) {
+        look();
+    }
+    EXPECT_EQ(names.calls(), 0);
+    look();
+    EXPECT_EQ(names.calls(), 1);
+    EXPECT_EQ(m_ledger.state(), State::reading);
+}
+
+TEST_F(FileFollowerTest, AQuietFileThatIsRenamedIsNoticedAtOnce) {
+    looks(3);
+    waitForTick();
+    rename("app.log", "app.log.1");
+    look();
+    EXPECT_EQ(m_ledger.state(), State::missing);
+    append("new\n");
+    look();
+    EXPECT_EQ(m_ledger.state(), State::finishing);
+    EXPECT_EQ(look(seconds(3)), "new\n");
+}
+
+TEST_F(FileFollowerTest, AQuietFileThatIsRemovedIsNoticedAtOnce) {
+    looks(3);
+    waitForTick();
+    fs::remove(m_path);
+    look();
+    EXPECT_EQ(m_ledger.state(), State::missing);
+}
+
+TEST_F(FileFollowerTest, ALinkToAQuietFileIsLookedAtEverySecond) {
+    m_directory.write("first", "1\n");
+    m_directory.write("second", "2\n");
+    fs::remove(m_path);
+    fs::create_symlink(file("first"), m_path);
+    looks(3);
+    fs::remove(m_path);
+    fs::create_symlink(file("second"), m_path);
+    look();
+    EXPECT_EQ(m_ledger.state(), State::finishing);
+    EXPECT_EQ(look(seconds(3)), "2\n");
+}
+
+TEST_F(FileFollowerTest, AnExchangedDirectoryOfAQuietFileIsNoticedWithinFiveSeconds) {
+    fs::create_directory(file("first"));
+    fs::create_directory(file("second"));
+    m_directory.write("first/log", "1\n");
+    m_directory.write("second/log", "2\n");
+    fs::create_symlink(file("first"), file("current"));
+    m_path = file("current/log");
+    begin();
+    looks(3);
+    fs::remove(file("current"));
+    fs::create_symlink(file("second"), file("current"));
+    look(seconds(5));
+    EXPECT_EQ(look(seconds(3)), "2\n");
+}
+
 TEST_F(FileFollowerTest, ManyEmptyGenerationsDoNotHideTheFilesAfterThem) {
     look();
     append("a\n");

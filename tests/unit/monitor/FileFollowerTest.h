@@ -12,6 +12,7 @@
 #include <cerrno>
 #include <filesystem>
 #include <fstream>
+#include <utility>
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -72,6 +73,19 @@ protected:
             std::ofstream(path) << text;
         }
         fs::last_write_time(path, fs::file_time_type::clock::now() - seconds(secondsAgo));
+    }
+
+    /// Waits until the file system's clock has moved on, so that the next change shows.
+    void waitForTick() const {
+        const auto changedAt = [](const std::string& path) {
+            struct stat status {};
+            EXPECT_EQ(::stat(path.c_str(), &status), 0);
+            return std::pair(status.st_ctim.tv_sec, status.st_ctim.tv_nsec);
+        };
+        const auto before = changedAt(m_path);
+        do {
+            m_directory.write("tick", "");
+        } while (changedAt(file("tick")) <= before);
     }
 
     /// Begins another follower at the position.
