@@ -16,7 +16,8 @@ namespace zrm {
 class LogPositions::State {
 public:
     explicit State(const char* name)
-        : book(PositionBook::current()), log(book->log(name)), follower(log->begin()) {}
+        : book(PositionBook::current()), log(book->log(name)), isFirst(!log->isOfRun()),
+          follower(log->begin()) {}
     State(const State&) = delete;
     State& operator=(const State&) = delete;
     ~State() {
@@ -54,6 +55,7 @@ public:
 
     const std::shared_ptr<PositionBook> book;
     const std::shared_ptr<FollowedLog> log;
+    const bool isFirst;
     const FollowedLog::Follower follower;
     EntryEvents events;
     EntryContext context;
@@ -69,7 +71,7 @@ bool LogPositions::areKept() const noexcept {
 }
 
 bool LogPositions::isFirstOfRun() const noexcept {
-    return m_state->follower == FollowedLog::firstFollower;
+    return m_state->isFirst;
 }
 
 std::optional<LogPosition> LogPositions::stored() const {

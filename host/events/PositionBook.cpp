@@ -27,6 +27,7 @@ void FollowedLog::beginAnew(Follower follower, std::int64_t modified) {
         LogPosition position;
         position.modified = modified;
         m_newest = m_reached = position;
+        m_isOfRun = true;
     }
 }
 
@@ -37,7 +38,7 @@ void FollowedLog::takeOver(const LogPosition& position, std::uint64_t event, boo
     }
     m_isTakenOver = true;
     m_isWatched = isWatched;
-    m_followers = std::max(m_followers, firstFollower); // the next one continues in any case
+    m_isOfRun = true; // whoever follows the log next continues in any case
     if (position != m_newest) {
         m_newest = m_reached = position;
         m_lastEvent = std::max(m_lastEvent, event);
@@ -64,6 +65,11 @@ std::optional<LogPosition> FollowedLog::newest() const {
     return m_newest;
 }
 
+bool FollowedLog::isOfRun() const {
+    const std::lock_guard guard(m_mutex);
+    return m_isOfRun;
+}
+
 bool FollowedLog::isStored() const {
     const std::lock_guard guard(m_mutex);
     return m_isSaved && m_kept;
@@ -82,12 +88,17 @@ void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& 
     }
     m_lastEvent = last;
     m_newest = behind;
+    m_isOfRun = true;
     m_reached.reset();
 }
 
 bool FollowedLog::reached(Follower follower, const LogPosition& position) {
     const std::lock_guard guard(m_mutex);
-    if (follower != m_follower || m_hasRefused || position == m_newest) {
+    if (follower != m_follower || m_hasRefused) {
+        return false;
+    }
+    m_isOfRun = true;
+    if (position == m_newest) {
         return false;
     }
     const bool isFirst = !m_newest;

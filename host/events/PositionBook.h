@@ -49,8 +49,9 @@ public:
 
     /// Identifies who follows the log; what others say of its position is ignored from now on.
     using Follower = std::uint64_t;
-    static constexpr Follower firstFollower = 1; ///< of the process
     Follower begin();
+    /// True if the newest position is one of this run.
+    bool isOfRun() const;
     void end(Follower follower);
     /// The newest position that the queue has or that was reached.
     std::optional<LogPosition> newest() const;
@@ -89,6 +90,7 @@ private:
     mutable std::mutex m_mutex; ///< guards what follows
     Follower m_follower = 0;    ///< 0: nobody
     Follower m_followers = 0;   ///< so far
+    bool m_isOfRun = false;     ///< m_newest was set in this run
     bool m_isTakenOver = false; ///< m_newest is a position that another log has left
     bool m_isWatched = false;   ///< by that log
     bool m_hasRefused = false;  ///< the queue did not take its events: later positions are void

@@ -11,7 +11,7 @@ namespace zrm::host {
 
 /// A path or glob of the configuration, and until when it was watched.
 struct WatchedPath {
-    std::string path;
+    std::string path; ///< with what is excluded from it, each on a line of its own
     /// Each file that it named at this time had a stored position (milliseconds since 1970).
     std::int64_t watched = 0;
 

@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <memory>
 #include <set>
+#include <string_view>
 
 #include <dirent.h>
 #include <fcntl.h>
@@ -37,6 +38,25 @@ bool isReadable(const std::string& path) {
 /// True if the path or glob of a table names or matches the log.
 bool isOf(const std::string& path, const std::string& name) {
     return PathPattern::isPattern(path) ? PathPattern::matches(path, name) : path == name;
+}
+
+/// A path and its exclusions, each on a line, as WatchedPath has them.
+std::string watchedAs(std::string path, const std::vector<std::string>& excludes) {
+    for (const std::string& pattern : excludes) {
+        path += '\n' + pattern;
+    }
+    return path;
+}
+
+/// True if one of the exclusions applies to the file.
+bool isExcluded(std::string_view watched, const std::string& file) {
+    while (watched.find('\n') != std::string_view::npos) {
+        watched.remove_prefix(watched.find('\n') + 1);
+        if (PathPattern::excludes(std::string(watched.substr(0, watched.find('\n'))), file)) {
+            return true;
+        }
+    }
+    return false;
 }
 
 /// The first table that names or matches the log.
@@ -69,15 +89,31 @@ EarlierRun::EarlierRun(const PositionBook& book, std::set<std::string> monitored
     }
 }
 
+void EarlierRun::noteWatched(const PositionBook& book) {
+    for (const auto& [path, time] : book.paths().all()) {
+        std::int64_t& watched = m_watched[path];
+        watched = std::max(watched, time);
+    }
+}
+
 bool EarlierRun::isNewSince(const std::string& path, const std::string& file,
                             const struct stat& status) const {
-    const auto found = m_watched.find(path);
-    if (found == m_watched.end() || m_monitored.contains(file)) {
+    // A path may have been watched with several lists of exclusions.
+    auto latest = m_watched.end();
+    for (auto one = m_watched.lower_bound(path);
+         one != m_watched.end() && one->first.starts_with(path); ++one) {
+        const bool isSame = one->first.size() == path.size() || one->first[path.size()] == '\n';
+        if (isSame && (latest == m_watched.end() || one->second > latest->second)) {
+            latest = one;
+        }
+    }
+    if (latest == m_watched.end() || m_monitored.contains(file) ||
+        isExcluded(latest->first, file)) {
         return false;
     }
     // If the clock was set back, the times of files say nothing: rather too much than too little.
-    return found->second > WallClock::now() ||
-           millisecondsOf(status.st_mtim) >= found->second - exactness;
+    return latest->second > WallClock::now() ||
+           millisecondsOf(status.st_mtim) >= latest->second - exactness;
 }
 
 std::string EarlierRun::logOf(const std::string& file, const Identity& identity) const {
@@ -136,7 +172,7 @@ void EarlierRun::noteLook(PositionBook& book, const std::vector<LogConfig>& logs
         for (const std::string& path : logs[index].paths) {
             if (std::none_of(unknown.begin(), unknown.end(),
                              [&path](const std::string& file) { return isOf(path, file); })) {
-                book.paths().note(path, time);
+                book.paths().note(watchedAs(path, logs[index].excludes), time);
             }
         }
     }

@@ -18,8 +18,8 @@ namespace zrm::host {
 struct FoundLogs;
 class PositionBook;
 
-/// What the history knows of the files that [[log]] tables name, from before this start. Not
-/// changed after it was made.
+/// What the history knows of the files that [[log]] tables name, from before this start, and until
+/// when they were watched.
 class EarlierRun {
 public:
     /// A file's device and inode.
@@ -31,8 +31,11 @@ public:
     /// the log configuration and have no position.
     explicit EarlierRun(const PositionBook& book, std::set<std::string> monitored = {});
 
-    /// True if an earlier run watched the path or glob, and a file of it that has no position was
-    /// written to since: it was not there before, or nobody has read it.
+    /// Takes over until when paths were watched in this run: a table may have been removed and be
+    /// back.
+    void noteWatched(const PositionBook& book);
+    /// True if the path or glob was watched, and a file of it that has no position and was not
+    /// excluded was written to since: it was not there before, or nobody has read it.
     bool isNewSince(const std::string& path, const std::string& file,
                     const struct stat& status) const;
     /// The logs with a stored position, by name.
@@ -51,7 +54,7 @@ public:
                          const FoundLogs& found, std::int64_t time);
 
 private:
-    std::map<std::string, std::int64_t> m_watched; ///< until when, by path or glob
+    std::map<std::string, std::int64_t> m_watched; ///< until when, as WatchedPath has it
     std::map<std::string, LogPosition> m_positions;
     std::set<std::string> m_monitored;
     std::multimap<Identity, std::string> m_logs; ///< by the file of the position

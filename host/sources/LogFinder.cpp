@@ -58,6 +58,8 @@ public:
         m_found.sources.resize(m_logs.size());
         if (!m_finder.m_hasLooked) {
             takeUp();
+        } else if (hasNewPaths()) {
+            m_finder.m_earlier.noteWatched(*PositionBook::current());
         }
         collect();
         std::vector<Candidate> candidates;
@@ -96,6 +98,14 @@ private:
             m_finder.m_known.emplace(
                 log, Known{Identity{position.device, position.inode}, m_now, false});
         }
+    }
+
+    bool hasNewPaths() const {
+        return std::any_of(m_logs.begin(), m_logs.end(), [this](const LogConfig& log) {
+            return std::any_of(log.paths.begin(), log.paths.end(), [this](const auto& path) {
+                return !m_finder.m_searched.contains(path);
+            });
+        });
     }
 
     void collect() {
@@ -305,6 +315,8 @@ private:
             if (known != m_finder.m_known.end()) {
                 candidate.isNewcomer = known->second.isNewcomer;
             }
+            // What was read as a line of the log configuration is not read again.
+            candidate.isNewcomer = candidate.isNewcomer && !FurtherLogs::isLeftOut(candidate.name);
             auto& shared = settings[candidate.source][candidate.isNewcomer ? 1 : 0];
             if (shared == nullptr) {
                 auto own = std::make_shared<FollowSettings>(log.follow);

@@ -37,8 +37,8 @@ public:
     /// for the first time after a start.
     bool areKept() const noexcept;
 
-    /// True for the log's first object of the run: what is before the stored position was judged by
-    /// an earlier run.
+    /// True if this run had no position of the log when the object was created: what is before the
+    /// stored one was judged by an earlier run.
     bool isFirstOfRun() const noexcept;
 
     /// The newest position that this run or an earlier one has stored or is about to store. None

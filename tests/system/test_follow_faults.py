@@ -259,10 +259,31 @@ def test_a_huge_file_without_entries_does_not_hold_up_the_stop(agent):
     assert agent.stop() == 0
 
 
-def read_to(agent, log):
-    """How far the agent's descriptor of the log is moved."""
+def test_the_search_of_a_huge_compressed_file_does_not_hold_up_the_stop(agent):
+    log = followed(agent)
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    assert agent.stop() == 0
+    positions = "SELECT offset FROM log_positions"
+    with closing(sqlite3.connect(history_file(agent))) as database:
+        database.execute("UPDATE log_positions SET inode = 1, offset = 1 << 40, guard = 1")
+        database.commit()
+    packed = agent.directory / "app.log.1.gz"
+    packed.write_bytes(gzip.compress(bytes(1 << 26)) * 2000)  # 125 GiB
+    agent.start(wait=False)
+    wait_until(lambda: read_to(agent, packed) > 1 << 20, "the search to begin")
+    assert agent.stop() == 0
+    with closing(sqlite3.connect(history_file(agent))) as database:
+        assert database.execute(positions).fetchone()[0] == 1 << 40
+    assert not agent.trace("Lines of")
+
+
+def read_to(agent, path):
+    """How far the agent's descriptor of the file is moved."""
     process = Path(f"/proc/{agent.process.pid}")
     for descriptor in (process / "fd").iterdir():
-        if os.path.realpath(descriptor) == str(log.path):
+        if os.path.realpath(descriptor) == str(path):
             return int((process / "fdinfo" / descriptor.name).read_text().split()[1])
     return 0

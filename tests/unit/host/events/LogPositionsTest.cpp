@@ -128,6 +128,17 @@ TEST_F(LogPositionsTest, KnowsThePositionOfAnEarlierRunAndItsOwn) {
     EXPECT_EQ(LogPositions("/new").stored(), std::nullopt);
 }
 
+TEST_F(LogPositionsTest, AnObjectIsOfTheFirstUntilTheRunHasAPosition) {
+    EXPECT_TRUE(LogPositions("/old").isFirstOfRun());
+    {
+        LogPositions waiting("/old"); // for its file, and then with other settings
+        EXPECT_TRUE(waiting.isFirstOfRun());
+        waiting.reached(at(7));
+        EXPECT_TRUE(waiting.isFirstOfRun());
+    }
+    EXPECT_FALSE(LogPositions("/old").isFirstOfRun());
+}
+
 TEST_F(LogPositionsTest, APositionWithoutEventsIsNotAheadOfEarlierEvents) {
     LogPositions log("/log");
     log.reached(at(1));

@@ -115,6 +115,34 @@ TEST_F(EarlierRunTest, APathThatWasNotWatchedObeysTheConfiguration) {
     EXPECT_THAT(newcomers(), IsEmpty());
 }
 
+TEST_F(EarlierRunTest, AFileThatTheEarlierRunExcludedIsNotNew) {
+    create("noisy.log", 10);
+    const std::string young = create("young.log", 10);
+    watched(file("*.log"), 100);
+    watched(file("*.log") + "\nother.log\nnoisy.*", 50);
+    watched(file("*.log2"), 1);
+    table(file("*.log"));
+    begin();
+    EXPECT_THAT(newcomers(), ElementsAre(young));
+}
+
+TEST_F(EarlierRunTest, ATableThatIsBackKnowsUntilWhenItWasWatched) {
+    watched(file("*.log"), 1000);
+    table(file("*.log"));
+    begin();
+    const std::vector<LogConfig> tables = std::exchange(logs, {});
+    look();
+    const auto book = std::make_shared<PositionBook>(PositionValues{}, true);
+    PositionBook::makeCurrent(book);
+    book->paths().note(file("*.log"), WallClock::now() - 50'000);
+    create("old.log", 100); // moved there
+    const std::string young = create("young.log", 10);
+    logs = tables;
+    look();
+    PositionBook::makeCurrent(PositionBook::unkept());
+    EXPECT_THAT(newcomers(), ElementsAre(young));
+}
+
 TEST_F(EarlierRunTest, WithoutResumptionNothingOfTheEarlierRunCounts) {
     create("app.log", 10);
     watched(file("*.log"), 50);
@@ -280,6 +308,15 @@ TEST_F(NoteLookTest, AFileThatTheLogManagerLeavesOutNeedsNoPosition) {
     FurtherLogs::noteLeftOut({});
     note(2);
     EXPECT_EQ(watchedUntil(glob), 1);
+}
+
+TEST_F(NoteLookTest, ExclusionsAreNoted) {
+    table(file("*.log"));
+    logs[0].excludes = {"a.*", "/b"};
+    begin();
+    note(1);
+    EXPECT_EQ(watchedUntil(file("*.log") + "\na.*\n/b"), 1);
+    EXPECT_EQ(watchedUntil(file("*.log")), 0);
 }
 
 TEST_F(NoteLookTest, APathWithoutAFileIsWatched) {

@@ -165,6 +165,21 @@ TEST_F(LogFinderTest, FilesThatWereLeftOutUntilNowAreNoNewcomers) {
     EXPECT_TRUE(isNewcomer(file("c.log")));
 }
 
+TEST_F(LogFinderTest, AFileThatWasALineOfTheLogConfigurationIsNoNewcomer) {
+    logs = {table({file("*.log")})};
+    look();
+    const std::string a = create("a.log");
+    const std::string b = create("b.log");
+    look();
+    EXPECT_TRUE(isNewcomer(a));
+    FurtherLogs::noteLeftOut({a});
+    look();
+    FurtherLogs::noteLeftOut({}); // its line was removed
+    look();
+    EXPECT_FALSE(isNewcomer(a));
+    EXPECT_TRUE(isNewcomer(b));
+}
+
 TEST_F(LogFinderTest, PassesOverOlderGenerations) {
     create("app.log");
     for (const char* const name :
