@@ -4,8 +4,8 @@ namespace zrm::host {
 
 PositionTable::PositionTable(Database& database)
     : m_keep(database, "INSERT OR REPLACE INTO log_positions"
-                       " (log, device, inode, offset, guard, guard_length, noted, modified)"
-                       " VALUES (?, ?, ?, ?, ?, ?, ?, ?)"),
+                       " (log, device, inode, offset, guard, guard_length, noted, modified, cursor)"
+                       " VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?)"),
       m_remove(database, "DELETE FROM log_positions WHERE noted < ? RETURNING log"),
       m_keepPath(database, "INSERT OR REPLACE INTO watched_paths (path, watched) VALUES (?, ?)"),
       m_removePaths(database, "DELETE FROM watched_paths WHERE watched < ?") {}
@@ -20,6 +20,7 @@ void PositionTable::keep(const PositionValue& value, std::int64_t noted) {
         .bind(6, std::int64_t{position.guardLength})
         .bind(7, noted)
         .bind(8, position.modified)
+        .bind(9, std::string_view(position.cursor))
         .run();
 }
 
@@ -40,14 +41,15 @@ std::vector<std::string> PositionTable::removeNotedBefore(std::int64_t time) {
 
 PositionValues PositionTable::read(Database& database) {
     PositionValues values;
-    Statement rows(database, "SELECT log, device, inode, offset, guard, guard_length, modified"
-                             " FROM log_positions");
+    Statement rows(database, "SELECT log, device, inode, offset, guard, guard_length, modified,"
+                             " cursor FROM log_positions");
     while (rows.step()) {
         values.logs.push_back({std::string(rows.text(0)),
                                {static_cast<std::uint64_t>(rows.integer(1)),
                                 static_cast<std::uint64_t>(rows.integer(2)), rows.integer(3),
                                 static_cast<std::uint64_t>(rows.integer(4)),
-                                static_cast<std::uint32_t>(rows.integer(5)), rows.integer(6)}});
+                                static_cast<std::uint32_t>(rows.integer(5)), rows.integer(6),
+                                std::string(rows.text(7))}});
     }
     Statement paths(database, "SELECT path, watched FROM watched_paths");
     while (paths.step()) {

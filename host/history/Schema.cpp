@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 6> steps = {
+constexpr std::array<const char*, 7> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -50,6 +50,8 @@ constexpr std::array<const char*, 6> steps = {
     // configuration all had positions last (milliseconds since 1970).
     "ALTER TABLE log_positions ADD COLUMN modified INTEGER NOT NULL DEFAULT 0;"
     "CREATE TABLE watched_paths (path TEXT PRIMARY KEY, watched INTEGER NOT NULL) WITHOUT ROWID;",
+    // 7: the position of a log that is not a file is a text of its source.
+    "ALTER TABLE log_positions ADD COLUMN cursor TEXT NOT NULL DEFAULT '';",
 };
 
 } // namespace

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string>
 
 namespace zrm {
 
@@ -16,6 +17,9 @@ struct LogPosition {
     std::uint32_t guardLength = 0; ///< bytes; 0 at the beginning of a file
     std::int64_t modified = 0;     ///< latest modification of what was read, ns since the epoch;
                                    ///< 0: unknown
+    /// Of a log that is not a file: what its source calls the position (EntrySource). Nothing else
+    /// is set then.
+    std::string cursor{};
 
     bool operator==(const LogPosition&) const = default;
 };

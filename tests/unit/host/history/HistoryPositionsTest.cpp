@@ -42,7 +42,13 @@ using testing::IsEmpty;
 constexpr std::int64_t day = 24 * 60 * 60'000;
 
 LogPosition at(std::int64_t offset) {
-    return {UINT64_MAX, 2, offset, UINT64_MAX - 7, 256, 1'800'000'000'123'456'789};
+    return {UINT64_MAX,
+            2,
+            offset,
+            UINT64_MAX - 7,
+            256,
+            1'800'000'000'123'456'789,
+            "s=ee01;i=" + std::to_string(offset)};
 }
 
 class HistoryPositionsTest : public testing::Test {

@@ -122,7 +122,7 @@ TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     EXPECT_EQ(database.number("SELECT id FROM events"), 41);
-    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7)");
+    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, 'c')");
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
 }
 
@@ -139,6 +139,23 @@ TEST_F(SchemaTest, BringsAFileOfTheFifthVersionUpToDate) {
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
     EXPECT_EQ(database.number("SELECT modified FROM log_positions"), 0) << "unknown";
     EXPECT_EQ(database.number("SELECT count(*) FROM watched_paths"), 0);
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
+    database.run(firstVersion);
+    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
+                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
+                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
+                 " modified INTEGER NOT NULL DEFAULT 0) WITHOUT ROWID;"
+                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7);"
+                 "PRAGMA user_version = 6");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    Statement position(database, "SELECT offset, cursor FROM log_positions");
+    ASSERT_TRUE(position.step());
+    EXPECT_EQ(position.integer(0), 3);
+    EXPECT_EQ(position.text(1), "") << "it is that of a file";
 }
 
 TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {
