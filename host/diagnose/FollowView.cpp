@@ -39,7 +39,9 @@ FollowView FollowView::of(const FollowLedger& ledger) {
     if (const std::optional<FollowLedger::Failure> failure = ledger.failure()) {
         const ErrorText error(failure->number);
         const std::string file = failure->file.empty() ? "" : " of " + failure->file;
-        view.problem = failure->call + file + " failed and is tried again: " + error.text();
+        view.problem = !failure->text.empty()
+                           ? failure->text
+                           : failure->call + file + " failed and is tried again: " + error.text();
     }
     if (const std::optional<FollowLedger::Generation> generation = ledger.generation()) {
         view.generation = generation->path;
@@ -54,7 +56,8 @@ FollowView FollowView::of(const FollowLedger& ledger) {
         view.recovered.push_back({milliseconds(range.time), range.from, range.to, range.source});
     }
     for (const FollowLedger::Lost& range : ledger.lost()) {
-        view.lost.push_back({milliseconds(range.time), range.from, range.to, range.source});
+        view.lost.push_back(
+            {milliseconds(range.time), range.from, range.to, range.source, range.text});
     }
     return view;
 }
@@ -76,6 +79,7 @@ void FollowView::write(JsonWriter& json, bool withRanges) const {
         for (const Range& range : lost) {
             writeRange(json, range);
             writeOrNull(json, "source", range.source);
+            writeOrNull(json, "text", range.text);
             json.endObject();
         }
         json.endArray();

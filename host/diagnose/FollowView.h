@@ -24,6 +24,7 @@ struct FollowView {
         /// The copy from which they were read, or the generation that holds them and cannot be
         /// read; empty if there is none.
         std::string source;
+        std::string text{}; ///< what a log that is not a file has lost, as a sentence
     };
 
     /// "waiting", "reading", "finishing", "missing" or "not a file".

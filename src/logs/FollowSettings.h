@@ -3,6 +3,7 @@
 
 #include "framework/LogEntry.h"
 #include "logs/EntryFormat.h"
+#include "logs/EntrySource.h"
 #include "logs/LineJoin.h"
 
 #include <chrono>
@@ -65,6 +66,8 @@ struct FollowSettings {
     /// log says it.
     Defined<EntryFormat> format;
     Defined<LineJoin> join; ///< which lines make an entry; none: each is one
+    /// Where the entries come from if the log is not a file. None: from the file of its name.
+    Defined<EntrySource> source;
 
     /// Logs of equal settings need no new monitor.
     bool operator==(const FollowSettings&) const = default;

@@ -13,7 +13,9 @@ struct FollowSettings;
 
 /// A log to follow that the log configuration does not name.
 struct FurtherLog {
-    std::string name; ///< absolute path, UTF-8
+    /// Absolute path, UTF-8. Of a log that is not a file (FollowSettings::source): ASCII without
+    /// any '/'.
+    std::string name;
     char type = 'S';
     char debugMode = 'N';
     std::string procedure; ///< empty: none

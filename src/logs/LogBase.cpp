@@ -2,6 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "base/UTF8Conv.h"
+#include "logs/FollowSettings.h"
 
 #include <cstdlib>
 #include <cstring>
@@ -43,14 +44,16 @@ std::unique_ptr<char[]> newLogFileName(std::size_t& pathLength, const char* name
 
 LogBase::LogBase(const LogBase& other) {
     TraceScope trace(anchor);
-    if (other.LogFileNameUTF8) {
+    LogFollowSettings = other.LogFollowSettings;
+    if (other.isSource()) {
+        setSourceName(other.fileNameUTF8());
+    } else if (other.LogFileNameUTF8) {
         setLogFileName(other.LogFileNameUTF8.get(), 1);
     }
     LogPathNameLengthUTF8 = other.LogPathNameLengthUTF8;
     LogDebugMode.store(other.debugMode(), std::memory_order_relaxed);
     LogType = other.LogType;
     setLogProcedure(other.LogProcedure.get());
-    LogFollowSettings = other.LogFollowSettings;
 }
 
 void LogBase::setLogFileName(const char* name, int isUTF8) {
@@ -70,6 +73,20 @@ void LogBase::setLogFileName(const char* name, int isUTF8) {
         UTF8Conv::Convert_fromUTF8(buffer.get(), length + 1, LogFileNameUTF8.get(), length);
         LogFileNameLocal = newLogFileName(LogPathNameLengthLocal, buffer.get());
     }
+}
+
+void LogBase::setSourceName(const char* name) {
+    TraceScope trace(anchor);
+    const std::size_t size = std::strlen(name) + 1;
+    for (auto* const field : {&LogFileNameUTF8, &LogFileNameLocal}) {
+        *field = newText(trace, size);
+        std::memcpy(field->get(), name, size);
+    }
+    LogPathNameLengthLocal = LogPathNameLengthUTF8 = 0;
+}
+
+bool LogBase::isSource() const noexcept {
+    return LogFollowSettings != nullptr && LogFollowSettings->source;
 }
 
 bool LogBase::isNameKept(int isUTF8) const {

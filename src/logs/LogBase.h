@@ -28,6 +28,8 @@ public:
 
     /// Sets both names from one, which is UTF-8 if `isUTF8` is 1, else in the local code page.
     void setLogFileName(const char* name, int isUTF8);
+    /// Sets the name of a log that is not a file. It is ASCII and has no '/'.
+    void setSourceName(const char* name);
     /// False if a conversion cut the name or replaced characters, so that one name no longer
     /// denotes the same file as the other. `isUTF8` says which name was given. A name that could
     /// not be converted at all (no code page) still counts as kept.
@@ -53,6 +55,8 @@ public:
     const std::shared_ptr<const FollowSettings>& followSettings() const noexcept {
         return LogFollowSettings;
     }
+    /// True if the log is not a file: its settings have a source.
+    bool isSource() const noexcept;
     LogBase* next() const noexcept { return Next; }
     LogBase* prev() const noexcept { return Prev; }
 

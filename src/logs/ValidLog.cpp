@@ -103,6 +103,10 @@ ValidLog::ValidLog(const FurtherLog& log) {
     LogType = log.type;
     LogDebugMode.store(log.debugMode, std::memory_order_relaxed);
     LogFollowSettings = log.settings;
+    if (isSource()) {
+        setSourceName(log.name.c_str());
+        return;
+    }
     setLogFileName(log.name.c_str(), 1);
     Valid = log.name.starts_with('/') && LogPathNameLengthLocal != 0 && isNameUsable(trace, 1);
     if (!log.procedure.empty()) {

@@ -2,18 +2,16 @@
 
 #include "base/BrevanTime.h"
 #include "base/TraceScope.h"
-#include "base/UTF8Conv.h"
 #include "framework/LogEntry.h"
-#include "framework/locale.h"
 #include "logs/FollowSettings.h"
 #include "logs/RequestThresholds.h"
 #include "logs/ValidLog.h"
+#include "logtypes/ColumnsRow.h"
 #include "logtypes/EntryReader.h"
 #include "monitor/BackwardBlock.h"
 #include "monitor/Generation.h"
 #include "monitor/ReportOutcome.h"
 
-#include <algorithm>
 #include <cstring>
 
 namespace zrm {
@@ -25,18 +23,6 @@ TRC1_Anchor anchor{"FormatLogFile.cpp"};
 /// The parser of the calling thread. A log's thread has one all its life; other threads have one
 /// after another. It shares the settings, which may outlive the log so.
 thread_local std::unique_ptr<FormatLogFile::Parser> threadParser;
-
-bool isControl(char character) noexcept {
-    return character == '\n' || character == '\r' || character == '\0';
-}
-
-/// Fills a blank column with as much of the text as it takes, on one line, and returns how much
-/// that is.
-template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::string_view text) {
-    const std::size_t length = text.copy(column, width);
-    std::replace_if(column, column + length, isControl, ' ');
-    return length;
-}
 
 } // namespace
 
@@ -103,28 +89,11 @@ bool FormatLogFile::makeRow(Parser& parser, std::string_view entry, const char* 
     TraceScope trace(anchor);
     EntryRow columns(*this, &row);
     EntryColumns found;
-    if (!parser.reader->read(entry, found) ||
-        (found.hasTime && !parser.stamp.write(found, newest, columns->entrytime))) {
+    if (!parser.reader->read(entry, found)) {
         columns.reject();
         return trace.result(false);
     }
-    if (!found.hasTime && newest == nullptr) {
-        EntryStamp::writePresent(columns->entrytime);
-    } else if (!found.hasTime) {
-        std::memcpy(columns->entrytime, newest, sizeof columns->entrytime);
-    }
-    fillColumn(columns->entrysys, found.system);
-    const std::size_t sourceLength = fillColumn(columns->entrysrc, found.source);
-    fillColumn(columns->entrytype, found.type);
-    fillColumn(columns->entryclass, found.entryClass);
-    const std::size_t length = fillColumn(columns->entrydesc, found.description);
-    UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
-                             sourceLength, LOC2_NO_TERMINATOR);
-    const std::int32_t lengthInUTF8 =
-        UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
-                                 columns->entrydesc, length, LOC2_NO_TERMINATOR);
-    columns.setDescriptionLengths(length, lengthInUTF8);
-    return trace.result(true);
+    return trace.result(ColumnsRow::fill(columns, found, parser.stamp, newest));
 }
 
 bool FormatLogFile::deliverEntry(char* entry) {

@@ -4,6 +4,7 @@
 #include "logtypes/AdminLogFile.h"
 #include "logtypes/ErrLogFile.h"
 #include "logtypes/FormatLogFile.h"
+#include "logtypes/SourceLogFile.h"
 #include "logtypes/SysLogFile.h"
 #include "logtypes/UserLogFile.h"
 
@@ -27,7 +28,10 @@ constexpr LogKind logKinds[] = {
     {'U', create<UserLogFile>},
     {'A', create<AdminLogFile>},
     {'E', create<ErrLogFile>},
-    {FormatLogFile::typeLetter, create<FormatLogFile>}, // no line of the log configuration says it
+    // No line of the log configuration says these.
+    {FormatLogFile::typeLetter, create<FormatLogFile>},
+    {SourceLogFile::journalLetter, create<SourceLogFile>},
+    {SourceLogFile::commandLetter, create<SourceLogFile>},
 };
 
 const LogKind* findKind(char type) noexcept {

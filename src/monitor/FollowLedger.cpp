@@ -4,6 +4,7 @@
 #include "base/WallTime.h"
 
 #include <algorithm>
+#include <utility>
 
 namespace zrm {
 
@@ -11,6 +12,11 @@ void FollowLedger::noteFailure(const char* call, int number, const std::string& 
     const LockGuard guard(&m_lock);
     m_failure = Failure{call, number, m_failure ? m_failure->since : wallTime(), file};
     m_isFailing.store(true, std::memory_order_relaxed);
+}
+
+void FollowLedger::noteProblem(std::string text) {
+    const LockGuard guard(&m_lock);
+    m_failure = Failure{"", 0, m_failure ? m_failure->since : wallTime(), "", std::move(text)};
 }
 
 void FollowLedger::clearFailure() {
@@ -57,6 +63,14 @@ void FollowLedger::noteLost(std::int64_t from, std::int64_t to, const std::strin
     const LockGuard guard(&m_lock);
     if (Lost* const lost = m_lost.next()) {
         *lost = {wallTime(), source, from, to};
+    }
+}
+
+void FollowLedger::noteLost(std::string text) {
+    m_losses.fetch_add(1, std::memory_order_relaxed);
+    const LockGuard guard(&m_lock);
+    if (Lost* const lost = m_lost.next()) {
+        *lost = {wallTime(), "", 0, 0, std::move(text)};
     }
 }
 

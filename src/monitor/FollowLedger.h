@@ -31,6 +31,8 @@ public:
         int number;       ///< errno
         std::timespec since;
         std::string file; ///< path of a generation; empty: the file that has the log's name
+        /// Of a log that is not a file: what is wrong, as a clause. There is no call then.
+        std::string text{};
     };
     /// Bytes that a truncation removed before they were read, read from a copy.
     struct Recovered {
@@ -45,6 +47,8 @@ public:
         std::string source; ///< path of the generation that has them; empty: unknown, or gone
         std::int64_t from;
         std::int64_t to; ///< one past the last byte known to have been there; there may be more
+        /// Of a log that is not a file: what was lost, as a sentence. No bytes are known then.
+        std::string text{};
     };
     /// The file that is read.
     struct Generation {
@@ -61,6 +65,8 @@ public:
 
     void setState(State state) noexcept { m_state.store(state, std::memory_order_relaxed); }
     void noteFailure(const char* call, int number, const std::string& file = {});
+    /// What is wrong with the source of a log that is not a file.
+    void noteProblem(std::string text);
     /// What had failed works again.
     void clearFailure();
     void noteGeneration(const FileIdentity& identity, const std::string& path);
@@ -69,6 +75,8 @@ public:
     /// Ranges of one source that follow each other are kept as one.
     void noteRecovered(const std::string& source, std::int64_t from, std::int64_t to);
     void noteLost(std::int64_t from, std::int64_t to, const std::string& source = {});
+    /// What a log that is not a file has lost, as a sentence.
+    void noteLost(std::string text);
     void noteTruncation() noexcept { m_truncations.fetch_add(1, std::memory_order_relaxed); }
     void noteCut() noexcept { m_cut.fetch_add(1, std::memory_order_relaxed); }
 

@@ -157,6 +157,12 @@ protected:
     /// if the log has to end or the process is ending before there is room. Then nothing was
     /// offered, and the entry counts as skipped.
     bool offer(zrm_rmlogent_data_t* row);
+    /// Counts an entry of a followed log again that an earlier run has judged, so that thresholds
+    /// go on; nothing is raised for it. `row` is the log's own, made just before.
+    void countEarlier(zrm_rmlogent_data_t& row);
+    /// The longest period, in seconds, in which a situation on the log counts entries; 0: none
+    /// does. Waits until the situations are open. Log's thread only.
+    std::int64_t earlierPeriod();
     /// Counts further entries as skipped if the process is ending.
     static void notePassedOver(std::uint64_t entries) noexcept;
     /// True if the log has to end and had a second to read what was left. A log may grow faster

@@ -47,24 +47,35 @@ private:
 
 } // namespace
 
-/// Counts the entries just before the position again, for the thresholds of situations.
-void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
+std::int64_t LogFile::earlierPeriod() {
     TraceScope trace(anchor);
-    const auto place = follower.place();
-    if (!place || m_earlierReceiver.count == nullptr) {
-        return;
+    if (m_earlierReceiver.count == nullptr) {
+        return trace.result(std::int64_t{0});
     }
-    const auto isRunning = [this] { return monitorStatus() == MONITOR_RUNNING; };
     if (EventRoom::now() == EventRoom::State::HELD) {
-        EventRoom::wait(isRunning); // the situations are still being opened
+        // The situations are still being opened.
+        EventRoom::wait([this] { return monitorStatus() == MONITOR_RUNNING; });
     }
     m_pulse.work("counts earlier entries again");
     zrm_rmlogent_data_t* const row = ownRow();
     const EntryRow withoutEntry(*this, row);
-    const std::int64_t period = m_earlierReceiver.period(*row);
+    return trace.result(m_earlierReceiver.period(*row));
+}
+
+void LogFile::countEarlier(zrm_rmlogent_data_t& row) {
+    const EntryInstant instant(m_clock.next(lastEntryMoment, row.entrytime));
+    m_earlierReceiver.count(row);
+}
+
+/// Counts the entries just before the position again, for the thresholds of situations.
+void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
+    TraceScope trace(anchor);
+    const auto place = follower.place();
+    const std::int64_t period = place ? earlierPeriod() : 0;
     if (period == 0) {
         return;
     }
+    zrm_rmlogent_data_t* const row = ownRow();
     const TRC1_Silence silence; // the earlier run has traced it
     EarlierEntry current(*this, recordLength == 0);
     const LogEntry::Offer offer(current);
@@ -81,10 +92,9 @@ void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
         [&](char* entry, std::string_view text) {
             current.begin(text);
             if (formatEntryAsRow(entry, row, nullptr) == 0) {
-                const EntryInstant instant(m_clock.next(lastEntryMoment, row->entrytime));
-                m_earlierReceiver.count(*row);
+                countEarlier(*row);
             }
-            return isRunning();
+            return monitorStatus() == MONITOR_RUNNING;
         });
 }
 

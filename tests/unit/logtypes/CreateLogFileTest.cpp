@@ -32,7 +32,7 @@ protected:
 TEST_F(CreateLogFile, KnowsTheTypesOfLogs) {
     for (int letter = 1; letter < 128; ++letter) {
         const char type = static_cast<char>(letter);
-        const bool isKind = std::string_view("USAEF").find(type) != std::string_view::npos;
+        const bool isKind = std::string_view("USAEFJC").find(type) != std::string_view::npos;
         EXPECT_EQ(isKnownLogType(type), isKind) << type;
     }
 }

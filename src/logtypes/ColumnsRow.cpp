@@ -1,0 +1,57 @@
+#include "logtypes/ColumnsRow.h"
+
+#include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
+#include "logtypes/EntryStamp.h"
+#include "monitor/EntryRow.h"
+
+#include <algorithm>
+#include <cstring>
+
+namespace zrm {
+
+namespace {
+
+TRC1_Anchor anchor{"ColumnsRow.cpp"};
+
+bool breaksLine(char character) noexcept {
+    return character == '\n' || character == '\r' || character == '\0';
+}
+
+/// Fills a blank column with as much of the text as it takes, on one line, and returns how much
+/// that is.
+template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::string_view text) {
+    const std::size_t length = text.copy(column, width);
+    std::replace_if(column, column + length, breaksLine, ' ');
+    return length;
+}
+
+} // namespace
+
+bool ColumnsRow::fill(EntryRow& row, const EntryColumns& entry, EntryStamp& stamp,
+                      const char* newest) {
+    TraceScope trace(anchor);
+    if (entry.hasTime && !stamp.write(entry, newest, row->entrytime)) {
+        row.reject();
+        return trace.result(false);
+    }
+    if (!entry.hasTime && newest == nullptr) {
+        EntryStamp::writePresent(row->entrytime);
+    } else if (!entry.hasTime) {
+        std::memcpy(row->entrytime, newest, sizeof row->entrytime);
+    }
+    fillColumn(row->entrysys, entry.system);
+    const std::size_t sourceLength = fillColumn(row->entrysrc, entry.source);
+    fillColumn(row->entrytype, entry.type);
+    fillColumn(row->entryclass, entry.entryClass);
+    const std::size_t length = fillColumn(row->entrydesc, entry.description);
+    UTF8Conv::Convert_toUTF8(row->uentrysrc, sizeof row->uentrysrc, row->entrysrc, sourceLength,
+                             LOC2_NO_TERMINATOR);
+    const std::int32_t lengthInUTF8 = UTF8Conv::Convert_toUTF8(
+        row->uentrydesc, sizeof row->uentrydesc, row->entrydesc, length, LOC2_NO_TERMINATOR);
+    row.setDescriptionLengths(length, lengthInUTF8);
+    return trace.result(true);
+}
+
+} // namespace zrm
