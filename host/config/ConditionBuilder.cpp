@@ -2,6 +2,7 @@
 
 #include "base/EntryFields.h"
 #include "host/base/TimeText.h"
+#include "host/config/SourceConfig.h"
 
 #include <algorithm>
 #include <array>
@@ -337,13 +338,14 @@ std::string ConditionBuilder::written(std::string_view column) {
 }
 
 Result<std::vector<Condition>> ConditionBuilder::ofLog(std::string_view path) {
-    const std::size_t slash = path.rfind('/');
-    if (path.empty() || path.front() != '/' || slash + 1 == path.size()) {
+    const bool isName = isSourceName(path);
+    const std::size_t begin = isName ? 0 : path.rfind('/') + 1; // of the name
+    if (!isName && (!path.starts_with('/') || begin == path.size())) {
         return badValue(quoted(path) + " is not the absolute path of a file",
                         "write the log's path as in the log configuration, beginning with '/'");
     }
-    const std::string_view directory = path.substr(0, slash + 1);
-    const std::string_view name = path.substr(slash + 1);
+    const std::string_view directory = path.substr(0, begin);
+    const std::string_view name = path.substr(begin);
     const bool isAscii = std::all_of(path.begin(), path.end(),
                                      [](char c) { return static_cast<unsigned char>(c) < 0x80; });
     const std::span<const Column> columns = columnsOf("RMLOGENT");

@@ -38,8 +38,8 @@ public:
     Result<Condition> build(std::string_view column, std::string_view op,
                             const ConditionValue& value, PatternBudget& budget) const;
 
-    /// The conditions that only entries of the log with this path meet: conditions on its directory
-    /// and its name, in the columns that can hold them.
+    /// The conditions that only entries of the log with this path, or this name if it is not a
+    /// file, meet: conditions on its directory and its name, in the columns that can hold them.
     static Result<std::vector<Condition>> ofLog(std::string_view path);
 
     /// The operator as written in conditions; empty for an unknown code.

@@ -164,7 +164,7 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
         }
     }
     if (const auto situations = section.tables("situation")) {
-        SituationReader reader(problems);
+        SituationReader reader(config.logs, problems);
         for (const toml::table* const situation : *situations) {
             config.situations.push_back(reader.read(*situation));
         }

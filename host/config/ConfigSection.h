@@ -44,6 +44,8 @@ public:
     std::vector<std::string> keys() const;
 
     bool has(std::string_view key) const { return m_table.contains(key); }
+    /// Whether the value of a key is one text.
+    bool isText(std::string_view key) const { return m_table[key].is_string(); }
     /// The line of a key's value, or of the table when the key is missing.
     unsigned line(std::string_view key) const;
 

@@ -1,8 +1,10 @@
 #ifndef ZRM_HOST_LOG_CONFIG_H
 #define ZRM_HOST_LOG_CONFIG_H
 
+#include "host/config/SourceConfig.h"
 #include "logs/FollowSettings.h"
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -15,9 +17,15 @@ struct LogConfig {
     std::string type = "syslog";       ///< its name
     char letter = 'S';                 ///< the type as FurtherLog has it
     std::string format;                ///< of a text log; the command of an error log
+    std::string name;                  ///< of a log that is not a file
+    std::optional<JournalConfig> journal;
+    std::optional<CommandConfig> command;
     bool debug = false;
     FollowSettings follow; ///< isNewcomer is not set
     unsigned line = 0;     ///< of the table in the file
+
+    /// True if the entries do not come from files.
+    bool isSource() const noexcept { return journal || command; }
 
     bool operator==(const LogConfig&) const = default;
 };

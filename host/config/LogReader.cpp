@@ -1,14 +1,15 @@
 #include "host/config/LogReader.h"
 
-#include "base/EntryFields.h"
 #include "host/base/TimeText.h"
 #include "host/config/EntryLinesReader.h"
 #include "host/config/FormatReader.h"
 #include "host/config/OwnFiles.h"
 #include "host/config/PathPattern.h"
+#include "host/config/SourceReader.h"
 #include "host/config/TimeZones.h"
 #include "host/framework/TraceCapture.h"
 #include "logtypes/FormatLogFile.h"
+#include "logtypes/SourceLogFile.h"
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 
@@ -119,8 +120,12 @@ LogConfig LogReader::read(const toml::table& table) {
     LogConfig log;
     log.line = static_cast<unsigned>(table.source().begin.line);
     readType(section, log);
-    readExcludes(section, log);
-    readPaths(section, log);
+    if (SourceReader::isSource(log.type)) {
+        readSource(section, log);
+    } else {
+        readExcludes(section, log);
+        readPaths(section, log);
+    }
     readFormat(section, log);
     log.debug = section.truth("debug").value_or(false);
     readFollowing(section, log);
@@ -129,6 +134,17 @@ LogConfig LogReader::read(const toml::table& table) {
     readKeep(section, log);
     section.refuseUnknownKeys();
     return log;
+}
+
+void LogReader::readSource(ConfigSection& section, LogConfig& log) {
+    SourceReader::read(section, log);
+    const auto [first, isNew] = m_paths.emplace(log.name, log.line);
+    if (!isNew) {
+        section.problem("name",
+                        "the [[log]] at line " + std::to_string(first->second) + " is named '" +
+                            log.name + "' already",
+                        R"(give this one another, for example name = ")" + log.name + "-2\"");
+    }
 }
 
 void LogReader::readPaths(ConfigSection& section, LogConfig& log) {
@@ -219,6 +235,7 @@ void LogReader::readType(ConfigSection& section, LogConfig& log) {
     }
     const std::vector<const char*> formats = formatTypes();
     names.insert(names.end(), formats.begin(), formats.end());
+    names.insert(names.end(), {SourceReader::journal, SourceReader::command});
     if (const auto choice = readChoice(section, "type", names)) {
         log.type = names[*choice];
         log.letter = *choice < types.size() ? types[*choice].letter : FormatLogFile::typeLetter;
@@ -226,12 +243,20 @@ void LogReader::readType(ConfigSection& section, LogConfig& log) {
         log.type = "regex"; // without an expression: what is in the container's lines is all text
         log.letter = FormatLogFile::typeLetter;
     }
+    if (SourceReader::isSource(log.type)) {
+        log.letter = log.type == SourceReader::journal ? SourceLogFile::journalLetter
+                                                       : SourceLogFile::commandLetter;
+    }
     if (log.letter == 'E' && !isErrorLogSystem()) {
         section.problem("type", "an error log is read only on AIX", "write another type");
     }
 }
 
 void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
+    if (log.isSource()) {
+        readSourceFormat(section, log);
+        return;
+    }
     if (log.letter != 'U' && log.letter != 'E') {
         readEntryFormat(section, log);
         return;
@@ -267,6 +292,17 @@ void LogReader::readEntryFormat(ConfigSection& section, LogConfig& log) {
     }
     if (format && (!isNeeded || log.follow.format)) {
         log.follow.join.value = EntryLinesReader::make(section, *format);
+    }
+}
+
+/// The lines of a command may be taken apart, by expressions.
+void LogReader::readSourceFormat(ConfigSection& section, LogConfig& log) {
+    refuse(section, "entry", log);
+    const bool isDescribed = log.command && FormatReader::describes(section);
+    const std::optional<FormatDescription> format =
+        FormatReader::read(section, isDescribed ? "regex" : log.type);
+    if (format && isDescribed) {
+        log.follow.format.value = FormatReader::make(section, *format);
     }
 }
 
@@ -364,53 +400,6 @@ void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
         section.problem("timezone", "'" + *zone + "' is not a time zone of this machine",
                         "write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
                         "list-timezones lists them)");
-    }
-}
-
-std::vector<std::string> LogReader::namesOfFields(ConfigSection& section,
-                                                  const std::vector<ConfigSection::Text>& names) {
-    std::vector<std::string> fields;
-    if (names.size() > EntryFields::most) {
-        section.problem("keep", "has " + std::to_string(names.size()) + " items",
-                        "write at most " + std::to_string(EntryFields::most) +
-                            ", or [\"*\"] for all fields");
-        return fields;
-    }
-    for (const auto& [name, line] : names) {
-        if (name.empty() || name.size() > EntryFields::longestName) {
-            section.problem(line, "keep", "'" + name + "' is not the name of a field",
-                            "write 1 to " + std::to_string(EntryFields::longestName) + " bytes");
-        } else if (name.starts_with("field.")) {
-            section.problem(line, "keep", "'" + name + "' begins with 'field.'",
-                            "write '" + name.substr(6) + "'");
-        } else {
-            fields.push_back(name);
-        }
-    }
-    return fields;
-}
-
-/// What events have of their entries beside the rows.
-void LogReader::readKeep(ConfigSection& section, LogConfig& log) {
-    const bool isFormatted = log.letter == FormatLogFile::typeLetter;
-    if (log.letter != 'S' && !isFormatted) {
-        refuse(section, "keep", log);
-    }
-    const bool isRecords = log.follow.format && log.follow.format->recordLength() != 0;
-    if (isRecords || (log.letter != 'S' && log.letter != 'U' && !isFormatted)) {
-        refuse(section, "entry_bytes", log);
-    }
-    if (const auto names = section.texts("keep")) {
-        log.follow.keep.fields = namesOfFields(section, *names);
-    }
-    constexpr std::int64_t most = EntryKeep::longestText;
-    if (const std::optional<std::int64_t> bytes = section.number("entry_bytes")) {
-        if (*bytes < 0 || *bytes > most) {
-            section.problem("entry_bytes", std::to_string(*bytes) + " is out of bounds",
-                            "write a number from 0 to " + std::to_string(most));
-        } else {
-            log.follow.keep.textBytes = static_cast<std::size_t>(*bytes);
-        }
     }
 }
 

@@ -22,6 +22,7 @@ public:
     LogConfig read(const toml::table& table);
 
 private:
+    void readSource(ConfigSection& section, LogConfig& log);
     void readPaths(ConfigSection& section, LogConfig& log);
     void readExcludes(ConfigSection& section, LogConfig& log);
     void checkOwnFiles(ConfigSection& section, const std::string& path, unsigned line,
@@ -29,6 +30,7 @@ private:
     void readType(ConfigSection& section, LogConfig& log);
     void readFormat(ConfigSection& section, LogConfig& log);
     static void readEntryFormat(ConfigSection& section, LogConfig& log);
+    static void readSourceFormat(ConfigSection& section, LogConfig& log);
     void checkTextFormat(ConfigSection& section, const LogConfig& log);
     void readFollowing(ConfigSection& section, LogConfig& log);
     void readResumption(ConfigSection& section, LogConfig& log);
@@ -40,7 +42,7 @@ private:
     const HostConfig& m_config;
     ConfigProblems& m_problems;
     std::map<std::string, std::string> m_ownFiles; ///< what each file that the agent writes is
-    std::map<std::string, unsigned> m_paths;       ///< line number of each path and glob
+    std::map<std::string, unsigned> m_paths;       ///< line number of each path, glob and name
 };
 
 } // namespace zrm::host

@@ -66,12 +66,25 @@ SituationConfig SituationReader::read(const toml::table& table) {
             section.problem(problem.field, problem.what, problem.cure);
         }
     }
+    if (text.log && isSourceName(*text.log)) {
+        checkLog(section, *text.log);
+    }
     m_patterns.spend(situation.patternSize);
     if (isNamed) {
         noteName(section, situation.name);
     }
     section.refuseUnknownKeys();
     return std::move(situation);
+}
+
+/// A name that no log has would be a situation that is never raised.
+void SituationReader::checkLog(ConfigSection& section, const std::string& log) {
+    if (std::none_of(m_logs.begin(), m_logs.end(),
+                     [&log](const LogConfig& one) { return one.name == log; })) {
+        section.problem("log", "'" + log + "' is neither an absolute path nor the name of a log",
+                        "begin a path with '/', or name a [[log]] that is not a file, such as "
+                        "\"journal\"");
+    }
 }
 
 void SituationReader::noteName(ConfigSection& section, const std::string& name) {

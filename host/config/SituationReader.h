@@ -8,21 +8,25 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 namespace zrm::host {
 
 /// Reads the [[situation]] tables of a configuration file.
 class SituationReader {
 public:
-    /// Records what is wrong with the tables in `problems`.
-    explicit SituationReader(ConfigProblems& problems) : m_problems(problems) {}
+    /// `logs`: those of the file. Records what is wrong with the tables in `problems`.
+    SituationReader(const std::vector<LogConfig>& logs, ConfigProblems& problems)
+        : m_logs(logs), m_problems(problems) {}
 
     /// The situation of one table; meaningless when a problem was recorded.
     SituationConfig read(const toml::table& table);
 
 private:
     void noteName(ConfigSection& section, const std::string& name);
+    void checkLog(ConfigSection& section, const std::string& log);
 
+    const std::vector<LogConfig>& m_logs;
     ConfigProblems& m_problems;
     PatternBudget m_patterns{PatternBudget::ofSource};
     std::map<std::string, unsigned> m_names; ///< line number of each situation's name

@@ -4,6 +4,7 @@
 #include "host/base/Utf8.h"
 #include "host/config/PathPattern.h"
 #include "host/events/PositionBook.h"
+#include "host/sources/NamedSources.h"
 #include "host/sources/PathSearch.h"
 #include "host/sources/RotationOrigins.h"
 #include "monitor/GenerationNames.h"
@@ -86,6 +87,7 @@ public:
         });
         list(chosen);
         remember(chosen);
+        addNamedSources(m_logs, m_found);
         return std::move(m_found);
     }
 

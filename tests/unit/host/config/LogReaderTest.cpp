@@ -41,6 +41,87 @@ TEST(LogReader, APathAloneIsASyslogFileFollowedByName) {
     EXPECT_EQ(logs[0].follow.rotateWait, std::chrono::seconds(2));
 }
 
+TEST(LogReader, ReadsAJournal) {
+    const LogConfig everything = accepted("[[log]]\ntype = 'journal'\n")[0];
+    EXPECT_EQ(everything.name, "journal");
+    EXPECT_EQ(everything.letter, 'J');
+    EXPECT_EQ(everything.journal, JournalConfig());
+    EXPECT_THAT(everything.paths, IsEmpty());
+    const LogConfig some = accepted("[[log]]\ntype = 'journal'\nname = 'web'\n"
+                                    "units = ['ssh', 'nginx*', 'a.socket']\n"
+                                    "identifiers = 'sudo'\npriority = 'warning'\n"
+                                    "boot = 'current'\ndirectory = '/j'\nstart = 'beginning'\n"
+                                    "keep = ['_PID']\n")[0];
+    EXPECT_EQ(some.name, "web");
+    ASSERT_TRUE(some.journal);
+    EXPECT_THAT(some.journal->units, ElementsAre("ssh.service", "nginx*", "a.socket"));
+    EXPECT_THAT(some.journal->identifiers, ElementsAre("sudo"));
+    EXPECT_EQ(some.journal->priority, 4);
+    EXPECT_TRUE(some.journal->isCurrentBoot);
+    EXPECT_EQ(some.journal->directory, "/j");
+}
+
+TEST(LogReader, ReadsACommand) {
+    const LogConfig list =
+        accepted("[[log]]\ntype = 'command'\ncommand = ['/bin/dmesg', '-w']\nrestart = '5s'\n")[0];
+    EXPECT_EQ(list.name, "dmesg");
+    EXPECT_EQ(list.letter, 'C');
+    ASSERT_TRUE(list.command);
+    EXPECT_THAT(list.command->arguments, ElementsAre("/bin/dmesg", "-w"));
+    EXPECT_EQ(list.command->pause, std::chrono::seconds(5));
+    EXPECT_TRUE(list.command->restarts);
+    const LogConfig shell = accepted("[[log]]\ntype = 'command'\n"
+                                     "command = 'my.sh a | grep b'\nrestart = 'never'\n")[0];
+    EXPECT_EQ(shell.name, "my-sh");
+    EXPECT_THAT(shell.command->arguments, ElementsAre("/bin/sh", "-c", "my.sh a | grep b"));
+    EXPECT_FALSE(shell.command->restarts);
+}
+
+TEST(LogReader, RefusesWhatAJournalCannotBe) {
+    EXPECT_THAT(
+        refused("[[log]]\ntype = 'journal'\npath = '/a'\nunits = []\npriority = 'loud'\n"
+                "boot = 'last'\ndirectory = 'x'\nname = 'a/b'\nrotate_wait = '1s'\n"),
+        testing::IsSupersetOf(
+            {"zrm.toml:3: log.path: has no meaning for type \"journal\"; leave it out",
+             "zrm.toml:4: log.units: has 0 items; write 1 to 1000, or leave it out",
+             "zrm.toml:5: log.priority: 'loud' is not a priority; write emerg, alert, crit, err, "
+             "warning, notice, info or debug",
+             "zrm.toml:6: log.boot: 'last' is not a choice here; write \"all\" or \"current\"",
+             "zrm.toml:7: log.directory: 'x' is not an absolute path; begin it with '/', or leave "
+             "it out for the journal of this machine",
+             "zrm.toml:8: log.name: 'a/b' is not the name of a log; write 1 to 64 letters, digits "
+             "and characters of -_@:",
+             "zrm.toml:9: log.rotate_wait: has no meaning for type \"journal\"; leave it out"}));
+    EXPECT_THAT(refused("[[log]]\ntype = 'journal'\n[[log]]\ntype = 'journal'\n"),
+                ElementsAre("zrm.toml:3: log.name: the [[log]] at line 1 is named 'journal' "
+                            "already; give this one another, for example name = \"journal-2\""));
+}
+
+TEST(LogReader, RefusesWhatACommandCannotBe) {
+    EXPECT_THAT(refused("[[log]]\ntype = 'command'\n"),
+                ElementsAre("zrm.toml:1: log.command: is missing, and type \"command\" needs it; "
+                            "write the program and its arguments, for example [\"dmesg\", "
+                            "\"-w\"], or one text for the shell"));
+    EXPECT_THAT(refused("[[log]]\ntype = 'command'\ncommand = 'a'\nresume = true\n"
+                        "restart = '2m'\nkeep = ['x']\n"),
+                ElementsAre("zrm.toml:4: log.resume: has no meaning for type \"command\": what a "
+                            "command has printed cannot be read again; leave it out",
+                            "zrm.toml:5: log.restart: '2m' is not a duration from a second to a "
+                            "minute; write for example \"1s\", or \"never\"",
+                            "zrm.toml:6: log.keep: has no meaning for type \"command\"; leave it "
+                            "out"));
+}
+
+TEST(LogReader, ASituationNamesALogThatIsNotAFile) {
+    EXPECT_THAT(refused("[[log]]\ntype = 'journal'\n[[situation]]\nname = 'a'\n"
+                        "log = 'journal'\n"),
+                IsEmpty());
+    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nlog = 'syslog'\n"),
+                ElementsAre("zrm.toml:3: situation.log: 'syslog' is neither an absolute path nor "
+                            "the name of a log; begin a path with '/', or name a [[log]] that is "
+                            "not a file, such as \"journal\""));
+}
+
 TEST(LogReader, ReadsWhatEventsKeepOfTheirEntries) {
     const EntryKeep usual = accepted("[[log]]\npath = '/a'\n")[0].follow.keep;
     EXPECT_EQ(usual.fields, std::nullopt);

@@ -1,0 +1,93 @@
+#include "host/sources/JournalSource.h"
+
+#include "base/ErrorText.h"
+#include "host/base/JsonWriter.h"
+#include "host/sources/Journal.h"
+#include "host/sources/JournalFiles.h"
+#include "host/sources/JournalReading.h"
+
+#include <utility>
+
+namespace zrm::host {
+
+namespace {
+
+/// Reads a journal backwards for a report.
+class JournalPast final : public EntrySource::Past {
+public:
+    explicit JournalPast(const JournalConfig& config)
+        : m_directory(config.directory), m_journal(config) {}
+
+    bool begin(std::int64_t newest) override {
+        m_newest = newest;
+        m_problem = JournalFiles::look(m_directory).problem();
+        if (!m_problem.empty()) {
+            return false;
+        }
+        int outcome = m_journal.open();
+        // Behind the last entry of that time: the library goes on from there.
+        outcome =
+            outcome < 0 ? outcome : m_journal.seekTime(static_cast<std::uint64_t>(newest) + 1);
+        return check(outcome);
+    }
+    char* previous() override {
+        Journal::Step step = m_journal.previous();
+        while (step == Journal::Step::entry && time() > m_newest) {
+            step = m_journal.previous();
+        }
+        if (step == Journal::Step::failed) {
+            check(m_journal.error());
+        } else if (m_journal.damaged() > 0) {
+            m_problem = "some entries of the journal are damaged";
+        }
+        return step == Journal::Step::entry ? m_journal.text() : nullptr;
+    }
+    std::int64_t time() const noexcept override {
+        return static_cast<std::int64_t>(m_journal.time());
+    }
+    const std::string& problem() const noexcept override { return m_problem; }
+
+    bool read(EntryColumns& columns) override {
+        m_journal.read(columns);
+        return true;
+    }
+    std::string_view text() const noexcept override { return m_journal.message(); }
+    bool isTextCut() const noexcept override { return m_journal.isMessageCut(); }
+    void readFields(EntryFields& fields) override { m_journal.readFields(fields); }
+
+private:
+    bool check(int outcome) {
+        if (outcome < 0) {
+            m_problem = std::string("the journal cannot be read: ") + ErrorText(-outcome).text();
+        }
+        return outcome >= 0;
+    }
+
+    const std::string m_directory;
+    Journal m_journal;
+    std::int64_t m_newest = 0;
+    std::string m_problem;
+};
+
+std::string definitionOf(const JournalConfig& config) {
+    return JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject().member("journal", config.directory).member("units", config.units);
+        json.member("identifiers", config.identifiers).member("priority", config.priority);
+        json.member("boot", config.isCurrentBoot).endObject();
+    });
+}
+
+} // namespace
+
+JournalSource::JournalSource(JournalConfig config)
+    : m_config(std::move(config)), m_definition(definitionOf(m_config)) {}
+
+std::unique_ptr<EntrySource::Reading> JournalSource::reading() const {
+    return std::make_unique<JournalReading>(m_config);
+}
+
+std::unique_ptr<EntrySource::Past> JournalSource::past() const {
+    return std::make_unique<JournalPast>(m_config);
+}
+
+} // namespace zrm::host

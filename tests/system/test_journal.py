@@ -1,0 +1,233 @@
+"""Logs of type "journal": each entry once, through rotations, removed files, stops and kills."""
+
+import os
+import random
+import subprocess
+import time
+from signal import SIGKILL
+
+import pytest
+from api import Api
+from conftest import descriptions, syslog_line, wait_until
+from journal import Journal
+from test_ledger import ledger_of
+
+SEED = int(os.environ.get("ZRM_SEED", str(random.randrange(1 << 30))))
+
+
+@pytest.fixture
+def reader(agent):
+    """An agent that reads a journal directory, not yet started."""
+    agent.journal = Journal(agent.directory / "journal")
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    agent.tables.append({"type": "journal", "directory": str(agent.journal.directory)})
+    agent.situation(log="journal")
+    return agent
+
+
+def test_entries_raise_events_with_columns_and_fields(reader):
+    reader.journal.write("before the start")
+    reader.tables[0]["keep"] = ["_PID", "CODE_LINE"]
+    reader.situations[0]["when"] = ["field._SYSTEMD_UNIT = 'ssh.service'", "ENTRYTYPE = 'warning'"]
+    reader.start()
+    unit = {"_SYSTEMD_UNIT": "ssh.service", "SYSLOG_IDENTIFIER": "sshd", "_PID": 412}
+    reader.journal.write("not urgent", **unit)
+    reader.journal.write("another unit", PRIORITY=4, _SYSTEMD_UNIT="nginx.service")
+    reader.journal.write("Failed password for root", PRIORITY=4, CODE_LINE=17, **unit)
+    (event,) = reader.wait_events(1)
+    row = event["row"]
+    assert (row["LOGPATH"], row["LOGNAME"]) == ("", "journal")
+    assert (row["ENTRYSYS"], row["ENTRYSRC"]) == ("web1", "sshd[412]")
+    assert (row["ENTRYTYPE"], row["ENTRYCLASS"]) == ("warning", "ssh")
+    assert row["ENTRYDESC"] == "Failed password for root"
+    written = time.strftime("1%y%m%d%H%M%S000", time.localtime(reader.journal.time // 1_000_000))
+    assert row["ENTRYTIME"] == written
+    assert event["entry"] == "Failed password for root"
+    assert event["fields"] == {"_PID": "412", "CODE_LINE": "17"}
+    assert reader.stop() == 0
+
+
+def test_what_was_written_while_the_agent_was_stopped_is_read_once(reader):
+    reader.journal.write("before the start")
+    reader.start()
+    reader.journal.write("one")
+    reader.wait_events(1)
+    assert reader.stop() == 0
+    reader.journal.write("two")
+    os.rename(reader.journal.directory / "system.journal", reader.journal.directory / "system@1.journal")
+    reader.journal.write("three")
+    reader.start()
+    assert descriptions(reader.wait_events(3)) == ["one", "two", "three"]
+    assert reader.stop() == 0
+    assert descriptions(reader.events()) == ["one", "two", "three"]
+
+
+def test_a_log_whose_settings_change_goes_on_where_it_was(reader):
+    reader.journal.write("before the start")
+    reader.start()
+    reader.journal.write("one")
+    reader.wait_events(1)
+    reader.tables[0]["priority"] = "warning"
+    reader.reload()
+    reader.wait_trace("Deleting log object for file journal")
+    reader.journal.write("not urgent")
+    reader.journal.write("urgent", PRIORITY=3)
+    assert descriptions(reader.wait_events(2)) == ["one", "urgent"]
+
+
+def test_thresholds_count_entries_from_before_a_stop(reader):
+    reader.situations.clear()
+    reader.situation("three", log="journal", frequency=">= 3", period="60s")
+    reader.journal.write("before the start")
+    reader.start()
+    reader.journal.time = int(time.time() * 1_000_000)
+    reader.journal.write("1", "2")
+    reader.listen = ""
+    position = f"SELECT cursor FROM log_positions WHERE log = 'journal'"
+    first = wait_until(lambda: query(reader, position), "a position")
+    wait_until(lambda: query(reader, position) != first or stored_time(reader) >= reader.journal.time, "two entries")
+    assert reader.stop() == 0
+    reader.journal.write("3")
+    reader.start()
+    (event,) = reader.wait_events(1)
+    assert event["row"]["ENTRYDESC"] == "3"
+
+
+def query(agent, sql):
+    import sqlite3
+
+    try:
+        with sqlite3.connect(f"file:{agent.directory}/state/history.db?mode=ro", uri=True) as connection:
+            return connection.execute(sql).fetchall()
+    except sqlite3.OperationalError:
+        return []
+
+
+def stored_time(agent):
+    """When the entry of the stored position was written, in microseconds."""
+    for (cursor,) in query(agent, "SELECT cursor FROM log_positions"):
+        for part in cursor.split(";"):
+            if part.startswith("t="):
+                return int(part[2:], 16)
+    return 0
+
+
+def test_a_position_whose_file_was_removed_is_a_loss_that_is_told(reader):
+    reader.listen = "127.0.0.1:0"
+    reader.journal.write("before the start")
+    reader.start()
+    reader.journal.write("one")
+    reader.wait_events(1)
+    assert reader.stop() == 0
+    reader.journal.write("lost")
+    os.remove(reader.journal.directory / "system.journal")
+    reader.journal.write("two")
+    reader.start()
+    assert descriptions(reader.wait_events(2)) == ["one", "two"]
+    reader.wait_trace("Entries of the journal may have been lost")
+    reader.api = Api(reader)
+    (lost,) = ledger_of(reader, "journal")["follow"]["lost"]
+    assert lost["text"].startswith("Entries of the journal may have been lost: the entry at which reading stopped")
+
+
+def test_without_a_journal_the_state_says_so_and_other_logs_go_on(agent):
+    agent.listen = "127.0.0.1:0"
+    agent.agent_keys["log_config"] = None
+    log = agent.directory / "app.log"
+    log.write_text("")
+    agent.follow(log)
+    agent.tables.append({"type": "journal", "directory": str(agent.directory / "none")})
+    agent.situation()
+    agent.start()
+    agent.wait_open(log)
+    agent.api = Api(agent)
+    follow = ledger_of(agent, "journal")["follow"]
+    assert (follow["state"], follow["problem"]) == ("waiting", "there is no journal")
+    agent.wait_trace("Error while reading log journal: there is no journal.")
+    with open(log, "a", encoding="ascii") as stream:
+        stream.write(syslog_line("works"))
+    assert descriptions(agent.wait_events(1)) == ["works"]
+    Journal(agent.directory / "none").write("appeared")
+    assert descriptions(agent.wait_events(2)) == ["works", "appeared"]
+    wait_until(lambda: ledger_of(agent, "journal")["follow"]["problem"] is None, "no problem")
+    assert len(agent.trace("there is no journal")) == 1
+    assert agent.stop() == 0
+
+
+@pytest.mark.slow
+def test_an_agent_that_is_killed_raises_each_event_once_and_in_order(reader):
+    print(f"seed {SEED}")
+    dice = random.Random(SEED)
+    journal, last, files = reader.journal, 0, 0
+    reader.tables[0]["start"] = "beginning"
+
+    def work(times):
+        nonlocal last, files
+        for _ in range(times):
+            count = dice.choice((1, 3, 40, 300))
+            journal.write(*(str(last + number + 1) for number in range(count)))
+            last += count
+            if dice.random() < 0.2:
+                files += 1
+                os.rename(journal.directory / "system.journal", journal.directory / f"system@{files:04}.journal")
+
+    work(1)
+    for _ in range(int(os.environ.get("ZRM_KILLS", "6"))):
+        reader.start(wait=False)
+        work(dice.randrange(1, 6))
+        reader.send(SIGKILL)
+        reader.wait_end()
+        work(dice.randrange(0, 2))
+    work(1)
+    reader.start(wait=False)
+    events = reader.wait_events(last)
+    assert reader.stop() == 0
+    found = [int(text) for text in descriptions(reader.events())]
+    # The sink may have got the last events before a kill twice; the history has each once.
+    rows = query(reader, "SELECT json FROM events ORDER BY id")
+    assert len(events) >= last and set(found) == set(range(1, last + 1)), f"seed {SEED}"
+    assert len(rows) == last, f"seed {SEED}"
+
+
+JOURNALD = """
+mount -t tmpfs none /run && mkdir -p /run/systemd/journal /run/log && exec 9>&- || exit 77
+/lib/systemd/systemd-journald 2>/dev/null & daemon=$!
+for attempt in $(seq 100); do [ -S /run/systemd/journal/socket ] && break; sleep 0.1; done
+[ -S /run/systemd/journal/socket ] || exit 77
+trap 'kill $daemon' EXIT
+"$@" &
+agent=$!
+trap 'kill $agent; wait $agent; kill $daemon' TERM
+wait $agent
+"""
+
+
+def test_it_reads_what_a_running_journal_daemon_writes(agent):
+    probe = subprocess.run(
+        ["unshare", "-m", "sh", "-c", JOURNALD, "sh", "true"], capture_output=True, check=False, timeout=60
+    )
+    if probe.returncode != 0:
+        pytest.skip(f"no journal daemon can run here: {probe.stderr.decode() or probe.returncode}")
+    agent.agent_keys["log_config"] = None
+    agent.tables.append({"type": "journal", "identifiers": ["zrm-test"]})
+    agent.situation(log="journal")
+    agent.start(wrapper=["unshare", "-m", "sh", "-c", JOURNALD + "\n", "sh"])
+    children = f"/proc/{agent.process.pid}/task/{agent.process.pid}/children"
+
+    def log(text):
+        inside = open(children, encoding="ascii").read().split()[0]
+        subprocess.run(
+            ["nsenter", "-t", inside, "-m", "systemd-cat", "-t", "zrm-test", "echo", text], check=True, timeout=60
+        )
+
+    log("from the daemon")
+    assert descriptions(agent.wait_events(1)) == ["from the daemon"]
+    subprocess.run(
+        ["nsenter", "-t", open(children, encoding="ascii").read().split()[0], "-m", "journalctl", "--rotate"],
+        check=False, capture_output=True, timeout=60,
+    )
+    log("after a rotation")
+    assert descriptions(agent.wait_events(2)) == ["from the daemon", "after a rotation"]
+    agent.send(15)
+    agent.wait_end()
