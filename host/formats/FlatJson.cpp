@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <cstring>
 #include <new>
+#include <span>
 #include <utility>
 
 #include <simdjson.h>
@@ -223,15 +224,16 @@ Error FlatJson::Walk::takeContainer(value& value, std::string_view name, unsigne
     return simdjson::SUCCESS;
 }
 
-FlatJson::FlatJson(const JsonNames& names) : m_names(names), m_parser(std::make_unique<Parser>()) {}
+FlatJson::FlatJson(const JsonNames& names)
+    : m_names(names), m_parser(std::make_unique<Parser>()), m_fields(new Field[EntryFields::most]) {
+}
 
 FlatJson::~FlatJson() = default;
 
 bool FlatJson::read(std::string_view text) {
     m_isRead = false;
     m_columns.clear();
-    m_fields.clear();
-    m_leftOut = m_builtSize = m_pathLength = 0;
+    m_count = m_leftOut = m_builtSize = m_pathLength = 0;
     const auto begin = std::find_if_not(text.begin(), text.end(), JsonToken::isBlank);
     if (begin == text.end() || *begin != '{') {
         return refuse(begin == text.end() ? "it is empty" : "it is not a JSON object");
@@ -252,7 +254,6 @@ bool FlatJson::read(std::string_view text) {
 /// The parser reads a little beyond the end of a text.
 bool FlatJson::copy(std::string_view text) noexcept {
     try {
-        m_fields.reserve(EntryFields::most);
         if (text.size() > m_room) {
             const std::size_t room = std::bit_ceil(std::max(text.size(), leastRoom));
             m_room = 0;
@@ -274,23 +275,17 @@ bool FlatJson::copy(std::string_view text) noexcept {
 
 void FlatJson::keep(std::string_view name, std::string_view value, bool isNumber) noexcept {
     m_names.find(name, [&](const JsonName& known) { m_columns.add(known, value, isNumber); });
-    const std::string_view kept = m_fields.size() < EntryFields::most ? lasting(name) : "";
-    if (kept.empty()) {
+    if (name.data() == m_path) {
+        name = m_count < EntryFields::most ? built(name) : std::string_view();
+    }
+    if (name.empty() || name.size() > EntryFields::longestName || m_count == EntryFields::most) {
         ++m_leftOut;
-    } else {
-        m_fields.push_back({kept, value});
+        return;
     }
+    m_fields[m_count++] = {name, value};
 }
 
-bool FlatJson::hasEscapes(std::string_view text) const noexcept {
-    return m_hasEscapes && text.find('\\') != text.npos;
-}
-
-/// The name with those of what it is in. Without data if that is too long.
-std::string_view FlatJson::fullName(std::string_view name) noexcept {
-    if (m_pathLength == 0) {
-        return name;
-    }
+std::string_view FlatJson::nestedName(std::string_view name) noexcept {
     if (m_pathLength + name.size() > sizeof m_path) {
         return {};
     }
@@ -298,11 +293,8 @@ std::string_view FlatJson::fullName(std::string_view name) noexcept {
     return {m_path, m_pathLength + name.size()};
 }
 
-/// The name in memory that stays until the next read. Empty if there is none.
-std::string_view FlatJson::lasting(std::string_view name) noexcept {
-    if (name.data() != m_path) {
-        return name.size() <= EntryFields::longestName ? name : std::string_view();
-    }
+/// A nested name in memory that stays until the next read. Empty if there is none.
+std::string_view FlatJson::built(std::string_view name) noexcept {
     if (!m_built) {
         m_built.reset(new (std::nothrow) char[builtRoom]);
     }
@@ -319,7 +311,7 @@ bool FlatJson::isOf(std::string_view text) const noexcept {
 }
 
 void FlatJson::addTo(EntryFields& fields, std::string_view text) const noexcept {
-    for (const Field& field : m_fields) {
+    for (const Field& field : std::span(m_fields.get(), m_count)) {
         const auto name = handedOver(field.name, text, fields);
         const auto value = handedOver(field.value, text, fields);
         if (name && value) {

@@ -8,7 +8,6 @@
 #include <memory>
 #include <optional>
 #include <string_view>
-#include <vector>
 
 namespace zrm::host {
 
@@ -54,9 +53,15 @@ private:
 
     bool copy(std::string_view text) noexcept;
     void keep(std::string_view name, std::string_view value, bool isNumber = false) noexcept;
-    bool hasEscapes(std::string_view text) const noexcept;
-    std::string_view fullName(std::string_view name) noexcept;
-    std::string_view lasting(std::string_view name) noexcept;
+    bool hasEscapes(std::string_view text) const noexcept {
+        return m_hasEscapes && text.find('\\') != text.npos;
+    }
+    /// The name with those of what it is in. Without data if that is too long.
+    std::string_view fullName(std::string_view name) noexcept {
+        return m_pathLength == 0 ? name : nestedName(name);
+    }
+    std::string_view nestedName(std::string_view name) noexcept;
+    std::string_view built(std::string_view name) noexcept;
     std::optional<std::string_view> handedOver(std::string_view part, std::string_view text,
                                                EntryFields& fields) const noexcept;
     bool refuse(std::string_view reason, const char* place = nullptr) noexcept;
@@ -69,7 +74,9 @@ private:
     std::size_t m_size = 0; ///< of the text
     bool m_isRead = false;  ///< the text was an object
     bool m_hasEscapes = false;
-    std::vector<Field> m_fields; ///< views into m_text, m_built or memory of the parser
+    /// Views into m_text, m_built or memory of the parser.
+    const std::unique_ptr<Field[]> m_fields;
+    std::size_t m_count = 0;
     std::size_t m_leftOut = 0;
     std::unique_ptr<char[]> m_built; ///< names of nested fields
     std::size_t m_builtSize = 0;

@@ -99,19 +99,6 @@ constexpr std::span<const std::string_view> usualNames(EntryColumn column) {
     return descriptionNames;
 }
 
-/// Lower case for a letter; another character for others, the same for the same.
-constexpr unsigned folded(char character) noexcept {
-    return static_cast<unsigned char>(character) | 0x20U;
-}
-
-constexpr bool isLetter(char character) noexcept {
-    return folded(character) >= 'a' && folded(character) <= 'z';
-}
-
-bool isSameLetters(char left, char right) noexcept {
-    return left == right || (isLetter(left) && folded(left) == folded(right));
-}
-
 } // namespace
 
 JsonNames::JsonNames(const std::map<std::string, std::string>& columns) {
@@ -144,17 +131,14 @@ void JsonNames::add(EntryColumn column, std::string_view name, std::uint8_t rank
     }
 }
 
-std::uint8_t JsonNames::placeOf(std::string_view name) noexcept {
-    return static_cast<std::uint8_t>(name.size() * 41 + folded(name.front()) * 7 +
-                                     folded(name.back()));
+bool JsonNames::isSame(char left, char right) noexcept {
+    const bool isLetter = folded(left) >= 'a' && folded(left) <= 'z';
+    return left == right || (isLetter && folded(left) == folded(right));
 }
 
 bool JsonNames::fits(const JsonName& known, std::string_view name) noexcept {
-    if (!known.isUsual) {
-        return known.text == name;
-    }
-    return std::equal(known.text.begin(), known.text.end(), name.begin(), name.end(),
-                      isSameLetters);
+    return known.text == name || (known.isUsual && std::equal(known.text.begin(), known.text.end(),
+                                                              name.begin(), name.end(), isSame));
 }
 
 void JsonColumns::clear() noexcept {

@@ -40,9 +40,8 @@ public:
         if (name.empty()) {
             return;
         }
-        const std::uint8_t place = placeOf(name);
-        for (std::size_t i = m_starts[place]; i < m_names.size() && m_names[i].place == place;
-             ++i) {
+        const std::size_t place = placeOf(name);
+        for (std::size_t i = m_starts[place]; i < m_starts[place + 1]; ++i) {
             if (fits(m_names[i], name)) {
                 use(m_names[i]);
             }
@@ -50,12 +49,20 @@ public:
     }
 
 private:
-    static std::uint8_t placeOf(std::string_view name) noexcept;
+    static std::uint8_t placeOf(std::string_view name) noexcept {
+        return static_cast<std::uint8_t>(name.size() * 41 + folded(name.front()) * 7 +
+                                         folded(name.back()));
+    }
+    /// Lower case for a letter; another character for others, the same for the same.
+    static unsigned folded(char character) noexcept {
+        return static_cast<unsigned char>(character) | 0x20U;
+    }
+    static bool isSame(char left, char right) noexcept;
     static bool fits(const JsonName& known, std::string_view name) noexcept;
     void add(EntryColumn column, std::string_view name, std::uint8_t rank, bool isUsual);
 
-    std::vector<JsonName> m_names; ///< ordered by place
-    std::array<std::uint16_t, 256> m_starts{};
+    std::vector<JsonName> m_names;             ///< ordered by place
+    std::array<std::uint16_t, 257> m_starts{}; ///< of each place, and the end
 };
 
 /// The fields of one object that can fill columns.

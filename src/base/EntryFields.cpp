@@ -8,6 +8,7 @@ namespace zrm {
 
 void EntryFields::clear() noexcept {
     m_fields.clear();
+    m_marks.reset();
     m_used = m_textBegin = 0;
     m_hasRoom = true;
     m_leftOut = 0;
@@ -27,7 +28,11 @@ void EntryFields::add(std::string_view name, std::string_view value) noexcept {
     if (name.empty() || name.size() > longestName || m_fields.size() == most ||
         (m_fields.capacity() < most && !reserve())) {
         noteLeftOut();
-    } else if (find(name) == nullptr) {
+        return;
+    }
+    const std::size_t mark = markOf(name);
+    if (!m_marks[mark] || search(name) == nullptr) {
+        m_marks.set(mark);
         m_fields.push_back({name, value});
     }
 }
@@ -54,7 +59,18 @@ std::optional<std::string_view> EntryFields::takeText() noexcept {
     return text;
 }
 
+std::size_t EntryFields::markOf(std::string_view name) noexcept {
+    const auto byte = [name](std::size_t at) {
+        return std::size_t{static_cast<unsigned char>(name[at])};
+    };
+    return (name.size() * 41 + byte(0) * 7 + byte(name.size() - 1)) % 256;
+}
+
 const std::string_view* EntryFields::find(std::string_view name) const noexcept {
+    return name.empty() || !m_marks[markOf(name)] ? nullptr : search(name);
+}
+
+const std::string_view* EntryFields::search(std::string_view name) const noexcept {
     const auto found = std::find_if(m_fields.begin(), m_fields.end(),
                                     [name](const Field& field) { return field.name == name; });
     return found == m_fields.end() ? nullptr : &found->value;

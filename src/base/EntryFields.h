@@ -1,6 +1,7 @@
 #ifndef ZRM_ENTRY_FIELDS_H
 #define ZRM_ENTRY_FIELDS_H
 
+#include <bitset>
 #include <cstddef>
 #include <memory>
 #include <optional>
@@ -50,8 +51,12 @@ public:
 
 private:
     bool reserve() noexcept;
+    const std::string_view* search(std::string_view name) const noexcept;
+    /// The bit that stands for names of this length, beginning and end.
+    static std::size_t markOf(std::string_view name) noexcept;
 
     std::vector<Field> m_fields;
+    std::bitset<256> m_marks; ///< those of the fields: most other names are known to be absent
     std::unique_ptr<char[]> m_texts; ///< `room` bytes, once a text was built
     std::size_t m_used = 0;          ///< bytes, also of the text that is being built
     std::size_t m_textBegin = 0;     ///< of the text that is being built
