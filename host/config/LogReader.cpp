@@ -233,8 +233,11 @@ void LogReader::readType(ConfigSection& section, LogConfig& log) {
     for (const LogType& type : types) {
         names.push_back(type.name);
     }
-    const std::vector<const char*> formats = formatTypes();
-    names.insert(names.end(), formats.begin(), formats.end());
+    for (const std::string_view format : formatTypes()) {
+        if (std::find(names.begin(), names.end(), format) == names.end()) {
+            names.push_back(format.data());
+        }
+    }
     names.insert(names.end(), {SourceReader::journal, SourceReader::command});
     if (const auto choice = readChoice(section, "type", names)) {
         log.type = names[*choice];

@@ -17,14 +17,12 @@ re2::StringPiece pieceOf(std::string_view text) {
 
 } // namespace
 
-EntryPattern::EntryPattern(std::unique_ptr<re2::RE2> expression, Where where)
-    : m_expression(std::move(expression)), m_where(where),
-      m_names(static_cast<std::size_t>(m_expression->NumberOfCapturingGroups())) {
+EntryPattern::EntryPattern(std::unique_ptr<re2::RE2> expression)
+    : m_expression(std::move(expression)),
+      m_names(static_cast<std::size_t>(m_expression->NumberOfCapturingGroups())),
+      m_program(PatternProgram::compile(m_expression->pattern())) {
     for (const auto& [number, name] : m_expression->CapturingGroupNames()) {
         m_names[static_cast<std::size_t>(number) - 1] = name;
-    }
-    if (where == Where::beginning) {
-        m_program = PatternProgram::compile(m_expression->pattern());
     }
 }
 
@@ -32,7 +30,7 @@ EntryPattern::EntryPattern(EntryPattern&& other) noexcept = default;
 EntryPattern& EntryPattern::operator=(EntryPattern&& other) noexcept = default;
 EntryPattern::~EntryPattern() = default;
 
-Result<EntryPattern> EntryPattern::compile(const std::string& expression, Where where) {
+Result<EntryPattern> EntryPattern::compile(const std::string& expression) {
     if (expression.size() > longest) {
         return refused("the expression is longer than " + std::to_string(longest) + " bytes",
                        "write several that are tried in order");
@@ -54,7 +52,7 @@ Result<EntryPattern> EntryPattern::compile(const std::string& expression, Where 
         return refused("'" + expression + "' has no named capture",
                        "name what it reads, as in (?P<time>...)");
     }
-    return EntryPattern(std::move(compiled), where);
+    return EntryPattern(std::move(compiled));
 }
 
 bool EntryPattern::match(std::string_view text, Captures& captures, Workspace& workspace) const {
@@ -84,8 +82,7 @@ bool EntryPattern::match(std::string_view text, Captures& captures, Workspace& w
 
 bool EntryPattern::matchByLibrary(std::string_view text, Captures& captures) const {
     std::array<re2::StringPiece, mostCaptures + 1> groups;
-    const auto anchor = m_where == Where::beginning ? re2::RE2::ANCHOR_START : re2::RE2::UNANCHORED;
-    if (!m_expression->Match(pieceOf(text), 0, text.size(), anchor, groups.data(),
+    if (!m_expression->Match(pieceOf(text), 0, text.size(), re2::RE2::ANCHOR_START, groups.data(),
                              static_cast<int>(captures.size()) + 1)) {
         return false;
     }

@@ -20,16 +20,11 @@ namespace zrm::host {
 /// that no text is too broken for it. Not changed after it was made; any thread.
 class EntryPattern {
 public:
-    enum class Where : unsigned char {
-        beginning, ///< what matches begins where the text does
-        anywhere,
-    };
-
     static constexpr std::size_t longest = 4096; ///< bytes of an expression
     static constexpr std::size_t mostCaptures = 64;
 
     /// A problem has no field. Refuses an expression without named captures.
-    static Result<EntryPattern> compile(const std::string& expression, Where where);
+    static Result<EntryPattern> compile(const std::string& expression);
 
     EntryPattern(EntryPattern&& other) noexcept;
     EntryPattern& operator=(EntryPattern&& other) noexcept;
@@ -43,18 +38,18 @@ public:
         std::vector<const char*> places;
     };
 
+    /// Matches the beginning of the text, and maybe no more than that.
     bool match(std::string_view text, Captures& captures, Workspace& workspace) const;
 
     /// Of each capture; empty for those without a name.
     const std::vector<std::string>& names() const noexcept { return m_names; }
 
 private:
-    EntryPattern(std::unique_ptr<re2::RE2> expression, Where where);
+    explicit EntryPattern(std::unique_ptr<re2::RE2> expression);
 
     bool matchByLibrary(std::string_view text, Captures& captures) const;
 
     std::unique_ptr<re2::RE2> m_expression;
-    Where m_where;
     std::vector<std::string> m_names;
     std::optional<PatternProgram> m_program;
 };

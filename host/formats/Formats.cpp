@@ -1,6 +1,7 @@
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
 #include "host/formats/RegexFormat.h"
+#include "host/formats/SyslogFormat.h"
 #include "host/formats/UnwrappedFormat.h"
 #include "host/formats/WtmpFormat.h"
 
@@ -20,6 +21,7 @@ struct Kind {
 constexpr Kind kinds[] = {
     {"json", &JsonFormat::make},
     {"regex", &RegexFormat::make},
+    {"syslog", &SyslogFormat::make},
     {"wtmp", &WtmpFormat::make},
 };
 

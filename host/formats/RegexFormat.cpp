@@ -100,7 +100,7 @@ Result<std::shared_ptr<const EntryFormat>> RegexFormat::make(const FormatDescrip
     std::vector<Pattern> patterns;
     bool hasTime = false;
     for (const std::string& expression : description.patterns) {
-        auto compiled = EntryPattern::compile(expression, EntryPattern::Where::beginning);
+        auto compiled = EntryPattern::compile(expression);
         if (!compiled) {
             compiled.error().field = "format";
             return tl::unexpected(std::move(compiled.error()));
