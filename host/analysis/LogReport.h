@@ -59,7 +59,7 @@ public:
     /// Null if the log is not monitored. May wait for a refresh. The table's manager outlives the
     /// object, which does not need the log any more.
     static std::unique_ptr<LogReport> open(ReportQuery query, TableManager& entries);
-    ~LogReport();
+    virtual ~LogReport();
     LogReport(const LogReport&) = delete;
     LogReport& operator=(const LogReport&) = delete;
 
@@ -69,11 +69,12 @@ public:
 
     /// Reads the log, once. Ends early when the thread's RequestLimit is reached. No row is given
     /// while a refresh would have to wait, so the receiver may wait for its client.
-    Result run(Receiver& receiver);
+    virtual Result run(Receiver& receiver);
 
-private:
+protected:
     LogReport(ReportQuery query, TableManager& entries);
 
+private:
     Result runFollowed(Receiver& receiver);
     Result runSample(Receiver& receiver) const;
 
