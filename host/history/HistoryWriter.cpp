@@ -102,7 +102,9 @@ bool HistoryWriter::store(EntryBatch& batch) {
     const std::vector<PositionValue> positions = batch.positions();
     const auto work = [&] {
         if (events->last() > m_reserved) {
-            reserveIds(events->last() + HistoryDirectory::idsAtOnce);
+            // Counted from what is stored: a crash before this batch is stored is then not taken
+            // for a lost file, after which ids are skipped.
+            reserveIds(std::max(m_recent.newest() + HistoryDirectory::idsAtOnce, events->last()));
         }
         const std::vector<CursorValue> moved = m_cursors.unsaved();
         m_file->store(*events, moved, positions);

@@ -297,7 +297,30 @@ TEST_F(HistoryFaultTest, AfterACrashIdsOfALostFileAreSkippedAndThoseOfAKeptOneCo
         std::filesystem::remove(file() + ending);
     }
     open();
-    EXPECT_EQ(history->newest(), 11 + HistoryDirectory::idsAtOnce);
+    EXPECT_EQ(history->newest(), 10 + HistoryDirectory::idsAtOnce);
+}
+
+TEST_F(HistoryFaultTest, ACrashBeforeABatchIsStoredSkipsNoIds) {
+    open();
+    pushAndWait(10);
+    history->finish(Clock::now() + 10s);
+    sink.reset();
+    history.reset();
+    const std::string directory = std::filesystem::path(file()).parent_path();
+    const std::uint64_t reserved = HistoryDirectory::reservedIdsIn(directory);
+    open();
+    Database other(file(), Database::Use::WRITE);
+    other.run("BEGIN IMMEDIATE");
+    push(3);
+    while (HistoryDirectory::reservedIdsIn(directory) == reserved) {
+        std::this_thread::sleep_for(1ms);
+    }
+    history->finish(Clock::now() + 10ms); // and nothing more
+    sink.reset();
+    history.reset();
+    other.run("ROLLBACK");
+    open();
+    EXPECT_EQ(history->newest(), 10u);
 }
 
 TEST_F(HistoryFaultTest, AFileOfALaterVersionIsLeftAlone) {
