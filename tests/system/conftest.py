@@ -100,10 +100,12 @@ def syslog_line(message, source="app[1]", host="web1", when=None):
 
 
 def toml_value(value):
-    """A text, a number or a table of texts, as TOML."""
+    """A text, a number, or a table or list of such, as TOML."""
     if isinstance(value, dict):
-        inside = ", ".join(f"{json.dumps(k)} = {json.dumps(v)}" for k, v in value.items())
+        inside = ", ".join(f"{json.dumps(k)} = {toml_value(v)}" for k, v in value.items())
         return "{ " + inside + " }"
+    if isinstance(value, list):
+        return "[" + ", ".join(toml_value(v) for v in value) + "]"
     return json.dumps(value)
 
 
