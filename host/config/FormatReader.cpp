@@ -113,7 +113,7 @@ std::shared_ptr<const EntryFormat> FormatReader::make(ConfigSection& section,
     auto format = makeFormat(description);
     if (!format) {
         const Problem& problem = format.error();
-        const std::string_view field = problem.field.empty() ? "format" : problem.field;
+        const std::string field = problem.field.empty() ? "format" : problem.field;
         section.problem(section.line(field.substr(0, field.find('.'))), field, problem.what,
                         problem.cure);
         return nullptr;

@@ -17,7 +17,7 @@ Result<EntryColumn> textColumn(const std::string& name, const std::string& key) 
         return refused("there is no column \"" + name + "\"", std::string(entryColumnChoice),
                        key + "." + name);
     }
-    if (column == EntryColumn::time) {
+    if (*column == EntryColumn::time) {
         return refused("the time of an entry cannot be given here", "name one of the other columns",
                        key + "." + name);
     }

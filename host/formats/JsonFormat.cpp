@@ -101,7 +101,7 @@ private:
     const JsonFormat& m_format;
     FlatJson m_fields;
     bool m_isTimeWrong = false;
-    char m_timeReason[128];
+    char m_timeReason[128]{};
     std::size_t m_timeReasonLength = 0;
 };
 

@@ -14,6 +14,7 @@ public:
     using Op = PatternCode::Op;
     using Instruction = PatternCode::Instruction;
 
+    // cppcheck-suppress uninitMemberVar ; no choice is read before it is made
     Run(const PatternCode& code, std::string_view text, const char** places) noexcept
         : m_sets(code.sets.data()), m_literals(code.literals.data()), m_places(places),
           m_end(text.data() + text.size()), m_mostWork(4 * text.size() + 1024),

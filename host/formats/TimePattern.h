@@ -46,7 +46,7 @@ public:
 
 private:
     const std::shared_ptr<const TimePattern> m_pattern;
-    char m_text[48]; ///< longer texts are not remembered
+    char m_text[48]{}; ///< longer texts are not remembered
     std::size_t m_length = 0;
     EntryColumns m_columns; ///< of which the time counts
 };

@@ -47,7 +47,7 @@ public:
     }
 
 private:
-    char m_text[20];
+    char m_text[20]{};
     const char* const m_end;
 };
 

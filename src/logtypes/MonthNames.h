@@ -21,13 +21,15 @@ constexpr std::uint32_t threeLetters(const char* text) {
     return letters;
 }
 
-inline constexpr auto months = [] {
+constexpr auto lettersOfMonths() {
     std::array<std::uint32_t, names.size() / 3> letters{};
     for (std::size_t month = 0; month < letters.size(); ++month) {
         letters[month] = threeLetters(names.data() + 3 * month);
     }
     return letters;
-}();
+}
+
+inline constexpr auto months = lettersOfMonths();
 
 /// The month's number, 1 to 12, or 0 if the three characters are not a month. Tries `likely` first.
 inline unsigned number(const char* text, unsigned likely) {
