@@ -6,6 +6,7 @@
 #include "logs/FollowSettings.h"
 #include "monitor/FileFollower.h"
 #include "monitor/FollowedEntry.h"
+#include "monitor/GenerationNames.h"
 #include "monitor/Interruption.h"
 
 #include <algorithm>
@@ -51,13 +52,13 @@ std::int64_t traceLosses(const FollowLedger& ledger, const char* file, std::int6
         const FollowLedger::Lost& lost = kept[i];
         const auto from = static_cast<long long>(lost.from);
         const auto to = static_cast<long long>(lost.to);
-        if (!lost.source.empty() && from < to) {
+        if (isCompressedName(lost.source)) {
+            trace.error()("Lines of %s were lost: %s cannot be read from byte %lld of its contents "
+                          "on. If it is damaged, the last lines before that may be wrong.",
+                          file, lost.source.c_str(), from);
+        } else if (!lost.source.empty()) {
             trace.error()("Lines of %s were lost: bytes %lld to %lld of %s cannot be read.", file,
                           from, to, lost.source.c_str());
-        } else if (!lost.source.empty()) {
-            trace.error()("Lines of %s were lost: the contents of %s cannot be read from byte %lld "
-                          "on. If it is damaged, lines read before that may be wrong.",
-                          file, lost.source.c_str(), from);
         } else if (from < to) {
             trace.error()("Lines of %s were lost: bytes %lld to %lld were removed before they were "
                           "read, or cannot be read, and no copy has them.",

@@ -203,6 +203,9 @@ def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
     follow = follow_of(agent, log)
     (lost,) = follow["lost"]
     assert known <= lost["from"] <= lost["to"]
+    copy = agent.directory / "app.log.1.gz"
+    assert lost["source"] == str(copy)
+    agent.wait_trace(f"{copy} cannot be read from byte {lost['from']} of its contents on. If it is damaged,")
     assert follow["state"] == "reading" and follow["problem"] is None
     (warning,) = wait_until(lambda: warnings_of(agent, log), "the warning")
     assert warning["kind"] == "lost"
@@ -210,6 +213,37 @@ def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
     wait_until(lambda: "undisturbed" in descriptions(agent.events()), "the other log")
     log.append(syslog_line("later"))
     wait_until(lambda: descriptions(agent.events())[-1] == "later", "the next entry")
+    assert agent.stop() == 0
+
+
+def without_privileges():
+    """What makes permissions count, for a superuser too."""
+    kinds = "-dac_override,-dac_read_search"
+    sets = ["--bounding-set", kinds, "--inh-caps", kinds, "--ambient-caps", "-all"]
+    return ("setpriv", *sets) if os.geteuid() == 0 else ()
+
+
+def test_a_generation_that_is_forbidden_is_read_once_it_is_allowed(agent):
+    log = followed(agent)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    log.append(syslog_line("one"))
+    agent.wait_events(1)
+    assert agent.stop() == 0
+    log.path.rename(agent.directory / "app.log.2")
+    forbidden = Log(agent.directory / "app.log.1")
+    forbidden.append(syslog_line("two"))
+    forbidden.path.chmod(0)
+    log.path.write_text(syslog_line("three"))
+    agent.start(wrapper=without_privileges())
+    agent.wait_trace(f"Error while following file {log}: open of {forbidden} failed and is tried again.")
+    assert descriptions(agent.events()) == ["one"]
+    forbidden.path.chmod(0o644)
+    agent.wait_trace(f"File {log} is read again.")
+    agent.wait_events(3)
+    assert descriptions(agent.events()) == ["one", "two", "three"]
+    assert follow_of(agent, log)["lost"] == [] and follow_of(agent, log)["problem"] is None
     assert agent.stop() == 0
 
 
@@ -235,7 +269,7 @@ def test_a_generation_that_cannot_be_read_is_named_and_waited_for(agent):
     agent.wait_events(2)
     agent.wait_events(3)
     assert descriptions(agent.events()) == ["one", "two", "four"]
-    agent.wait_trace(f"Lines of {log} were lost: the contents of {damaged} cannot be read from byte 0 on.")
+    agent.wait_trace(f"Lines of {log} were lost: {damaged} cannot be read from byte 0 of its contents on.")
     (lost,) = follow_of(agent, log)["lost"]
     assert lost["source"] == str(damaged) and (lost["from"], lost["to"]) == (0, 0)
 
