@@ -41,7 +41,7 @@ std::string FormatDescription::definition() const {
             write(json, extract.patterns);
             json.endObject();
         }
-        json.endArray().endObject();
+        json.endArray().member("pairs", pairs).endObject();
     });
 }
 

@@ -33,16 +33,17 @@ struct FormatDescription {
             patterns; ///< RE2 with named captures; the first that matches counts
     };
 
-    std::string type; ///< "regex", "json", "syslog" or "wtmp"; empty: the table says none
+    std::string type; ///< "regex", "json", "logfmt", "syslog" or "wtmp"; empty: the table says none
     /// type "regex": RE2 with named captures, tried in this order.
     std::vector<std::string> patterns;
     std::string timeFormat;                      ///< see TimePattern; empty: "auto"
-    std::map<std::string, std::string> columns;  ///< type "json": column to field
+    std::map<std::string, std::string> columns;  ///< types "json", "logfmt": column to field
     std::map<std::string, std::string> defaults; ///< column to its text where the entry has none
     /// Column to what stands in the log to what the column shows instead.
     std::map<std::string, std::map<std::string, std::string>> values;
     std::string unwrap; ///< "docker" or "cri"; empty: entries are the lines themselves
     std::vector<Extract> extracts;
+    bool pairs = false; ///< pairs such as port=8080 in the description are fields
     EntryLines lines;
 
     /// All that decides what is read from an entry, as a text: EntryFormat::definition.

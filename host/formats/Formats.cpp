@@ -1,5 +1,7 @@
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
+#include "host/formats/LogfmtFormat.h"
+#include "host/formats/PairedFormat.h"
 #include "host/formats/RegexFormat.h"
 #include "host/formats/SyslogFormat.h"
 #include "host/formats/UnwrappedFormat.h"
@@ -7,6 +9,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <utility>
 
 namespace zrm::host {
 
@@ -20,6 +23,7 @@ struct Kind {
 
 constexpr Kind kinds[] = {
     {"json", &JsonFormat::make},
+    {"logfmt", &LogfmtFormat::make},
     {"regex", &RegexFormat::make},
     {"syslog", &SyslogFormat::make},
     {"wtmp", &WtmpFormat::make},
@@ -33,7 +37,11 @@ Result<std::shared_ptr<const EntryFormat>> makeInner(const FormatDescription& de
         return refused("'" + description.type + "' is not a kind of format", "write another type",
                        "type");
     }
-    return kind->make(description);
+    auto format = kind->make(description);
+    if (format && description.pairs) {
+        return std::make_shared<const PairedFormat>(std::move(*format));
+    }
+    return format;
 }
 
 } // namespace
