@@ -3,6 +3,7 @@
 #include "host/cli/CliError.h"
 #include "host/cli/Commands.h"
 #include "host/cli/Context.h"
+#include "host/cli/FormatCommands.h"
 #include "host/cli/Terminal.h"
 
 #include <new>
@@ -70,6 +71,7 @@ Program::Program()
     m_commands.push_back(std::make_unique<TraceCommand>(*m_app));
     m_commands.push_back(std::make_unique<CheckCommand>(*m_app));
     m_commands.push_back(std::make_unique<TryCommand>(*m_app));
+    m_commands.push_back(std::make_unique<FormatsCommand>(*m_app));
 }
 
 Program::~Program() = default;

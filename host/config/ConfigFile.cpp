@@ -1,26 +1,22 @@
 #include "host/config/ConfigFile.h"
 
-#include "host/base/WholeFile.h"
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
+#include "host/config/ConfigText.h"
 #include "host/config/LogReader.h"
 #include "host/config/SinkReader.h"
 #include "host/config/SinkTypes.h"
 #include "host/config/SituationReader.h"
-#include "host/config/TomlNesting.h"
 #include "host/framework/TraceLevels.h"
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstdlib>
 #include <limits>
 #include <optional>
 #include <utility>
 
-#include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <toml++/toml.h>
 
@@ -138,6 +134,19 @@ void readHistory(const toml::table& table, ConfigProblems& problems, HostConfig&
     section.refuseUnknownKeys();
 }
 
+void readFormats(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
+    ConfigSection section("formats", table, problems);
+    for (const auto& [directory, line] :
+         section.texts("directory").value_or(std::vector<ConfigSection::Text>())) {
+        if (directory.empty() || directory.front() != '/') {
+            section.problem(line, "directory", "'" + directory + "' is not an absolute path",
+                            "begin it with '/'");
+        }
+        config.formatDirectories.push_back(directory);
+    }
+    section.refuseUnknownKeys();
+}
+
 void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
     ConfigSection section("", file, problems);
     readPath(section, "state_directory", config.stateDirectory);
@@ -149,6 +158,9 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
     }
     if (const toml::table* const history = section.table("history")) {
         readHistory(*history, problems, config);
+    }
+    if (const toml::table* const formats = section.table("formats")) {
+        readFormats(*formats, problems, config);
     }
     if (const auto sinks = section.tables("sink")) {
         SinkReader reader(problems);
@@ -179,35 +191,14 @@ void readAccess(const toml::table& file, ConfigProblems& problems, HostConfig& c
         ConfigSection http("http", *table, problems);
         readHttpAccess(http, config.http);
     }
-}
-
-Problem unreadable(int number) {
-    return {because("cannot be read", number)};
-}
-
-/// The contents of an open file. It must be a regular file: a pipe could block the reader forever.
-Result<std::string> contentOf(int fd) {
-    struct stat status {};
-    if (fstat(fd, &status) != 0) {
-        return tl::unexpected(unreadable(errno));
+    if (const toml::table* const formats = section.table("formats")) {
+        readFormats(*formats, problems, config);
     }
-    if (S_ISDIR(status.st_mode)) {
-        return tl::unexpected(unreadable(EISDIR));
-    }
-    if (!S_ISREG(status.st_mode)) {
-        return refused("is not a regular file");
-    }
-    return WholeFile::read(fd, largestFile).map_error(unreadable);
 }
 
 /// The contents of a file, or its problem as the only text.
 Result<std::string, std::vector<std::string>> contentOf(const std::string& path) {
-    const int fd = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    Result<std::string> content = fd == -1 ? tl::unexpected(unreadable(errno)) : contentOf(fd);
-    if (fd != -1) {
-        close(fd);
-    }
-    return std::move(content).map_error([&](Problem&& problem) {
+    return ConfigText::read(path, largestFile).map_error([&](Problem&& problem) {
         problem.cure = "make it a file that the agent may read, of at most 4 MiB";
         ConfigProblems problems(path);
         problems.add(0, problem);
@@ -230,22 +221,12 @@ using Reading = void(const toml::table& file, ConfigProblems& problems, HostConf
 
 ConfigFile::Result parsed(std::string_view text, const std::string& path, Reading* read) {
     ConfigProblems problems(path);
-    if (const std::optional<unsigned> line = TomlNesting::tooDeepAt(text)) {
-        const std::string most = std::to_string(TomlNesting::deepest);
-        problems.add(*line, {"names or brackets are nested deeper than " + most,
-                             "write at most " + most + " levels"});
-        return tl::unexpected(problems.texts());
-    }
-    try {
-        const toml::table file = toml::parse(text);
+    if (const std::optional<toml::table> file = ConfigText::parse(text, problems)) {
         HostConfig config;
-        read(file, problems, config);
+        read(*file, problems, config);
         if (problems.none()) {
             return config;
         }
-    } catch (const toml::parse_error& error) {
-        problems.add(static_cast<unsigned>(error.source().begin.line),
-                     {std::string(error.description()), "correct the TOML here"});
     }
     return tl::unexpected(problems.texts());
 }

@@ -24,8 +24,9 @@ public:
     /// incomplete, is still being written or was truncated: that counts as a problem here.
     static Result reload(const std::string& path);
 
-    /// Reads only what a client of the agent needs: the state directory and, from [http], the
-    /// address, the certificate and the token file. Other problems of the file are ignored.
+    /// Reads only what a client of the agent needs: the state directory, from [http] the address,
+    /// the certificate and the token file, and the directories of ready formats. Other problems of
+    /// the file are ignored.
     static Result loadAccess(const std::string& path);
 
     /// Parses the text of a file; messages call it `path`.

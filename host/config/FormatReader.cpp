@@ -23,16 +23,17 @@ struct Key {
 
 constexpr Key keys[] = {
     {"format", "regex"},
-    {"time_format", "regex json"},
-    {"columns", "json"},
-    {"defaults", "regex json syslog"},
-    {"values", "regex json syslog"},
-    {"unwrap", "regex json syslog"},
+    {"time_format", "regex json logfmt"},
+    {"columns", "json logfmt"},
+    {"defaults", "regex json logfmt syslog"},
+    {"values", "regex json logfmt syslog"},
+    {"unwrap", "regex json logfmt syslog"},
     {"extract", "syslog"},
+    {"pairs", "regex syslog"},
 };
 
 /// The types whose entries may have several lines.
-constexpr Key entryKey{"entry", "regex json syslog"};
+constexpr Key entryKey{"entry", "regex json logfmt syslog"};
 
 /// The texts of a table, by key.
 std::map<std::string, std::string> readTexts(ConfigSection& section) {
@@ -45,9 +46,14 @@ std::map<std::string, std::string> readTexts(ConfigSection& section) {
     return texts;
 }
 
-std::map<std::string, std::string> readTexts(ConfigSection& outer, std::string_view key) {
-    std::optional<ConfigSection> section = outer.section(key);
-    return section ? readTexts(*section) : std::map<std::string, std::string>();
+/// Those that are there already are replaced.
+void readTexts(ConfigSection& outer, std::string_view key,
+               std::map<std::string, std::string>& texts) {
+    if (std::optional<ConfigSection> section = outer.section(key)) {
+        for (auto& [name, text] : readTexts(*section)) {
+            texts.insert_or_assign(name, std::move(text));
+        }
+    }
 }
 
 std::vector<std::string> readList(ConfigSection& section, std::string_view key) {
@@ -70,7 +76,7 @@ void readPatterns(ConfigSection& section, FormatDescription& format) {
 void readValues(ConfigSection& outer, FormatDescription& format) {
     std::optional<ConfigSection> section = outer.section("values");
     for (const std::string& column : section ? section->keys() : std::vector<std::string>()) {
-        format.values.emplace(column, readTexts(*section, column));
+        readTexts(*section, column, format.values[column]);
     }
 }
 
@@ -81,22 +87,32 @@ std::optional<FormatDescription> FormatReader::read(ConfigSection& section,
     const std::size_t problems = section.problemCount();
     FormatDescription format;
     format.type = type;
-    for (const Key& key : keys) {
-        if (!key.isFor(type)) {
-            section.refuse(key.name, "has no meaning for type \"" + type + '"');
-        }
-    }
-    if (!entryKey.isFor(type)) {
-        section.refuse(entryKey.name, "has no meaning for type \"" + type + '"');
-    }
-    if (type == "regex") {
+    if (type != "regex") {
+        section.refuse("format", "has no meaning for type \"" + type + '"');
+    } else {
         readPatterns(section, format);
     }
-    format.timeFormat = section.text("time_format").value_or("");
-    format.columns = readTexts(section, "columns");
-    format.defaults = readTexts(section, "defaults");
+    std::optional<FormatDescription> whole = readOver(section, std::move(format));
+    return section.problemCount() == problems ? std::move(whole) : std::nullopt;
+}
+
+std::optional<FormatDescription> FormatReader::readOver(ConfigSection& section,
+                                                        FormatDescription format) {
+    const std::size_t problems = section.problemCount();
+    for (const Key& key : keys) {
+        if (key.name != "format" && !key.isFor(format.type)) {
+            section.refuse(key.name, "has no meaning for type \"" + format.type + '"');
+        }
+    }
+    if (!entryKey.isFor(format.type)) {
+        section.refuse(entryKey.name, "has no meaning for type \"" + format.type + '"');
+    }
+    format.timeFormat = section.text("time_format").value_or(format.timeFormat);
+    readTexts(section, "columns", format.columns);
+    readTexts(section, "defaults", format.defaults);
     readValues(section, format);
-    format.unwrap = section.text("unwrap").value_or("");
+    format.unwrap = section.text("unwrap").value_or(format.unwrap);
+    format.pairs = section.truth("pairs").value_or(format.pairs);
     for (const toml::table* const table :
          section.tables("extract").value_or(std::vector<const toml::table*>())) {
         ConfigSection extract = section.inner("extract", *table);
@@ -104,7 +120,9 @@ std::optional<FormatDescription> FormatReader::read(ConfigSection& section,
             {extract.text("source").value_or(""), readList(extract, "patterns")});
         extract.refuseUnknownKeys();
     }
-    format.lines = EntryLinesReader::read(section);
+    if (section.has(entryKey.name)) {
+        format.lines = EntryLinesReader::read(section);
+    }
     return section.problemCount() == problems ? std::optional(std::move(format)) : std::nullopt;
 }
 

@@ -18,6 +18,10 @@ public:
     /// when a problem was recorded.
     static std::optional<FormatDescription> read(ConfigSection& section, const std::string& type);
 
+    /// Reads these keys except `format`, each in place of what the description says already.
+    static std::optional<FormatDescription> readOver(ConfigSection& section,
+                                                     FormatDescription format);
+
     /// Makes the format; null when a problem was recorded.
     static std::shared_ptr<const EntryFormat> make(ConfigSection& section,
                                                    const FormatDescription& description);

@@ -62,6 +62,7 @@ struct HostConfig {
     HttpConfig http;
     HistoryConfig history;
     std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
+    std::vector<std::string> formatDirectories; ///< with ready formats, before the usual ones
     std::vector<LogConfig> logs;
     std::vector<SituationConfig> situations;
 };

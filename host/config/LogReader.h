@@ -4,6 +4,7 @@
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
 #include "host/config/HostConfig.h"
+#include "host/config/ReadyFormats.h"
 
 #include <map>
 #include <string>
@@ -31,6 +32,7 @@ private:
     void readFormat(ConfigSection& section, LogConfig& log);
     static void readEntryFormat(ConfigSection& section, LogConfig& log);
     static void readSourceFormat(ConfigSection& section, LogConfig& log);
+    void readNamed(ConfigSection& section, LogConfig& log);
     void checkTextFormat(ConfigSection& section, const LogConfig& log);
     void readFollowing(ConfigSection& section, LogConfig& log);
     void readResumption(ConfigSection& section, LogConfig& log);
@@ -41,6 +43,7 @@ private:
 
     const HostConfig& m_config;
     ConfigProblems& m_problems;
+    const ReadyFormats m_formats;
     std::map<std::string, std::string> m_ownFiles; ///< what each file that the agent writes is
     std::map<std::string, unsigned> m_paths;       ///< line number of each path, glob and name
 };

@@ -125,6 +125,7 @@ class Agent:
         self.listen = ""
         self.http_keys = {}
         self.history = {}  # keys of [history]
+        self.formats = None  # directory of [formats]
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -166,6 +167,8 @@ class Agent:
         keys.update(self.agent_keys)
         text = f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
+        if self.formats is not None:
+            text += f"[formats]\ndirectory = {json.dumps(str(self.formats))}\n"
         text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         text += "".join(f"{k} = {json.dumps(str(v))}\n" for k, v in self.http_keys.items())
         text += "[history]\n"

@@ -125,7 +125,7 @@ keep_days = 30
 )"),
         ElementsAre(
             "zrm.toml:1: colour: unknown key; the keys here are state_directory, agent, http, "
-            "history, sink, log, situation",
+            "history, formats, sink, log, situation",
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
@@ -134,7 +134,7 @@ keep_days = 30
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period, context",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
-            "http, history, sink, log, situation"));
+            "http, history, formats, sink, log, situation"));
 }
 
 TEST(ConfigFile, RefusesValuesOfAnotherType) {

@@ -1,0 +1,41 @@
+#ifndef ZRM_HOST_FORMAT_COMMANDS_H
+#define ZRM_HOST_FORMAT_COMMANDS_H
+
+#include "host/cli/Commands.h"
+
+#include <string>
+#include <vector>
+
+namespace zrm::host {
+
+class ReadyFormats;
+
+/// Finds the ready formats as the agent does: in the directories of an option, of the agent's
+/// configuration, and in the usual ones.
+ReadyFormats readyFormatsOf(const std::string& config, std::vector<std::string> directories);
+
+/// `zrmctl formats [list|show|test]`: the ready formats. Needs no agent.
+class FormatsCommand : public Command {
+public:
+    explicit FormatsCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    CliStatus run(Context& context) override;
+
+private:
+    CliStatus list(Context& context);
+    CliStatus show(Context& context);
+    CliStatus test(Context& context);
+    ReadyFormats formats(const Context& context) const;
+
+    CLI::App* m_command;
+    CLI::App* m_show;
+    CLI::App* m_test;
+    std::vector<std::string> m_directories;
+    std::string m_name;
+    std::vector<std::string> m_names;
+};
+
+} // namespace zrm::host
+
+#endif

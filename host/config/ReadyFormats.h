@@ -1,0 +1,67 @@
+#ifndef ZRM_HOST_READY_FORMATS_H
+#define ZRM_HOST_READY_FORMATS_H
+
+#include "host/base/Result.h"
+#include "host/formats/FormatDescription.h"
+
+#include <map>
+#include <string>
+#include <vector>
+
+namespace zrm::host {
+
+/// A file that describes the entries of a program's logs, NAME.toml in a directory of formats.
+struct ReadyFormat {
+    /// An entry, and what the format must make of it.
+    struct Sample {
+        std::string entry;
+        std::string time; ///< as the entry has it, in ISO 8601; "--MM-DDThh:mm:ss" without a year
+        std::map<std::string, std::string> columns; ///< those that are not named must be empty
+        std::map<std::string, std::string> fields;  ///< those that are named must be so
+        bool isRejected = false;                    ///< the entry must not fit
+        unsigned line = 0;                          ///< in the file
+    };
+
+    std::string name;
+    std::string path;
+    std::string about;      ///< one line for people
+    bool isGeneric = false; ///< of many programs: suggested only if none of one program is as good
+    std::string text;       ///< the file's
+    FormatDescription format;
+    std::vector<Sample> samples;
+};
+
+/// Finds the ready formats of some directories. Any thread; reads the files anew at each call.
+class ReadyFormats {
+public:
+    static constexpr std::size_t largestFile = 256 * 1024; ///< bytes
+    static constexpr std::size_t mostFormats = 10'000;     ///< that are listed
+
+    /// Where one is found by its name.
+    struct Place {
+        std::string name;
+        std::string path;
+    };
+
+    /// A name is looked for in these directories first, then in the usual ones.
+    explicit ReadyFormats(std::vector<std::string> directories);
+
+    /// Reads the format with this name. The problem names the file where one is at fault.
+    Result<ReadyFormat> find(const std::string& name) const;
+    /// All formats in the order of their names. Of several with one name, the one that counts.
+    std::vector<Place> list() const;
+
+    /// Reads a file. What is wrong with it, as ConfigProblems::texts.
+    static Result<ReadyFormat, std::vector<std::string>> load(const Place& place);
+    /// Small letters, digits and '-', '_' and '.' within, at most 64 of them.
+    static bool isName(const std::string& name);
+
+private:
+    std::string nearTo(const std::string& name) const;
+
+    std::vector<std::string> m_directories;
+};
+
+} // namespace zrm::host
+
+#endif
