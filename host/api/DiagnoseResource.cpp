@@ -1,11 +1,10 @@
 #include "host/api/DiagnoseResource.h"
 
 #include "base/TraceScope.h"
+#include "host/api/TrialLines.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/diagnose/FormatTrial.h"
-#include "host/diagnose/LastLines.h"
 #include "host/diagnose/LogLedgers.h"
-#include "host/diagnose/MonitoredLogFile.h"
 #include "host/diagnose/UnmonitoredLogs.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
@@ -13,7 +12,6 @@
 #include "host/sources/LogList.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -25,42 +23,6 @@ namespace zrm::host {
 namespace {
 
 TRC1_Anchor anchor{"DiagnoseResource.cpp"};
-
-std::vector<std::string> givenLines(JsonFields& fields) {
-    std::vector<std::string> lines = fields.texts("lines", DiagnoseResource::mostLines);
-    for (std::size_t i = 0; i < lines.size(); ++i) {
-        if (lines[i].size() > DiagnoseResource::mostLineBytes) {
-            throw RequestRefused(400, "write lines of at most 16384 bytes",
-                                 fields.place("lines", i));
-        }
-        if (lines[i].find('\n') != std::string::npos) {
-            throw RequestRefused(400, "write each line by itself, without its newline",
-                                 fields.place("lines", i));
-        }
-    }
-    return lines;
-}
-
-/// The last lines of a monitored log; the API shows no other files.
-std::vector<std::string> loggedLines(const JsonFields& fields, const std::string& log,
-                                     std::size_t count) {
-    const std::vector<LogLedgerView> monitored = LogLedgers::read(log);
-    if (log.empty() || monitored.empty()) {
-        fields.refuse("log", "this log is not monitored");
-    }
-    if (monitored[0].type != 'U' && monitored[0].type != 'S') {
-        fields.refuse("log", "this log is not a text file");
-    }
-    const auto file = MonitoredLogFile::open(monitored[0].file, monitored[0].openFile);
-    if (!file) {
-        throw RequestRefused(409, {file.error().what, file.error().cure, fields.place("log")});
-    }
-    std::optional<std::vector<std::string>> lines = LastLines::read(file->descriptor(), count);
-    if (!lines) {
-        throw RequestRefused(409, because("the log cannot be read", errno), fields.place("log"));
-    }
-    return std::move(*lines);
-}
 
 /// How the lines of a trial are judged.
 struct TrialRules {
@@ -151,10 +113,9 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
     const std::optional<std::string> log = fields.optionalText("log");
     const TrialRules rules = rulesOf(fields, log);
     const std::string format = rules.isSyslog ? "" : fields.text("format");
-    const auto last =
-        fields.optionalNumber("last", 1, static_cast<std::int64_t>(DiagnoseResource::mostLines));
+    const auto last = fields.optionalNumber("last", 1, static_cast<std::int64_t>(TrialLines::most));
     const bool hasLines = fields.has("lines");
-    std::vector<std::string> lines = givenLines(fields);
+    std::vector<std::string> lines = TrialLines::given(fields);
     fields.refuseUnknown();
     if (hasLines && last) {
         fields.refuse("last", "write either lines, or log and last");
@@ -163,7 +124,7 @@ HttpAnswer DiagnoseResource::tryFormat(const HttpRequest& request) {
         fields.refuse("log", "is missing: last counts the lines of a log");
     }
     if (last) {
-        lines = loggedLines(fields, *log, static_cast<std::size_t>(*last));
+        lines = TrialLines::ofLog(fields, *log, static_cast<std::size_t>(*last));
     }
     const bool isNamed = log && !log->empty();
     const std::string_view name = isNamed ? std::string_view(*log) : FormatTrial::someLog;

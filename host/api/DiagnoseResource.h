@@ -11,8 +11,6 @@ namespace zrm::host {
 /// `POST /api/v1/try`: tries a format on lines. `POST /api/v1/check`: judges a log configuration.
 class DiagnoseResource : public Resource {
 public:
-    static constexpr std::size_t mostLines = 1000;        ///< that a format is tried on
-    static constexpr std::size_t mostLineBytes = 16384;   ///< of such a line
     static constexpr std::size_t mostValues = 50000;      ///< pieces of lines times directives
     static constexpr std::size_t mostConfigLines = 10000; ///< of a configuration
 

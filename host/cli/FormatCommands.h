@@ -36,6 +36,20 @@ private:
     std::vector<std::string> m_names;
 };
 
+/// `zrmctl suggest FILE`: which ready format fits a file. Needs no agent.
+class SuggestCommand : public Command {
+public:
+    explicit SuggestCommand(CLI::App& program);
+
+    bool isChosen() const override;
+    CliStatus run(Context& context) override;
+
+private:
+    CLI::App* m_command;
+    std::string m_file;
+    std::vector<std::string> m_directories;
+};
+
 } // namespace zrm::host
 
 #endif

@@ -1,16 +1,15 @@
 #include "host/diagnose/TrialLine.h"
 
 #include "host/config/PathPattern.h"
+#include "host/diagnose/TomlText.h"
 #include "host/events/RowText.h"
 #include "host/framework/RowLayout.h"
 #include "logs/FollowSettings.h"
 #include "logs/FurtherLogs.h"
 #include "logs/ValidLog.h"
 
-#include <algorithm>
 #include <array>
 #include <cstddef>
-#include <cstdio>
 
 namespace zrm::host {
 
@@ -30,35 +29,6 @@ const std::array<RowColumn, 8>& entryColumns() {
         {"UENTRYDESC", offsetof(Row, uentrydesc), sizeof Row::uentrydesc, COLUMN_UTF8},
     }};
     return *columns; // never destroyed: threads outlive main
-}
-
-bool isControl(char character) {
-    const auto code = static_cast<unsigned char>(character);
-    return (code < ' ' && character != '\t') || code == 0x7f;
-}
-
-/// A text as a string of TOML: as it is where it can be, else with escapes.
-std::string tomlString(std::string_view text) {
-    const bool isPlain = text.find('\'') == std::string_view::npos &&
-                         std::none_of(text.begin(), text.end(), isControl);
-    if (isPlain) {
-        return '\'' + std::string(text) + '\'';
-    }
-    std::string quoted = "\"";
-    for (const char character : text) {
-        if (isControl(character)) {
-            char escape[7];
-            std::snprintf(escape, sizeof escape, "\\u%04x",
-                          static_cast<unsigned>(static_cast<unsigned char>(character)));
-            quoted += escape;
-            continue;
-        }
-        if (character == '"' || character == '\\') {
-            quoted += '\\';
-        }
-        quoted += character;
-    }
-    return quoted + '"';
 }
 
 } // namespace
@@ -83,12 +53,12 @@ std::vector<std::pair<std::string, std::string>> entryTexts(const zrm_rmlogent_d
 }
 
 std::string tableText(std::string_view log, std::string_view format, std::string_view timezone) {
-    std::string text = "[[log]]\npath = " + tomlString(PathPattern::literal(log)) + '\n';
+    std::string text = "[[log]]\npath = " + TomlText::quoted(PathPattern::literal(log)) + '\n';
     if (!format.empty()) {
-        text += "type = 'text'\nformat = " + tomlString(format) + '\n';
+        text += "type = 'text'\nformat = " + TomlText::quoted(format) + '\n';
     }
     if (!timezone.empty()) {
-        text += "timezone = " + tomlString(timezone) + '\n';
+        text += "timezone = " + TomlText::quoted(timezone) + '\n';
     }
     return text;
 }

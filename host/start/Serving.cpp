@@ -11,6 +11,7 @@
 #include "host/api/ReportResource.h"
 #include "host/api/SampleResource.h"
 #include "host/api/SituationsResource.h"
+#include "host/api/SuggestResource.h"
 #include "host/base/Say.h"
 #include "host/base/TimeText.h"
 #include "host/console/ConsoleResource.h"
@@ -97,7 +98,7 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
     if (History* const history = m_delivery.history()) {
         m_entries.emplace(*history);
     }
-    addResources(entries);
+    addResources(config, entries);
 }
 
 void Serving::apply(const std::vector<SituationConfig>& situations, bool removesMost) {
@@ -128,13 +129,14 @@ void Serving::renewCredentials() {
     }
 }
 
-void Serving::addResources(TableManager& entries) {
+void Serving::addResources(const HostConfig& config, TableManager& entries) {
     addResource(std::make_unique<HealthResource>([this] { return m_watchdog.problem(); }));
     addResource(std::make_unique<ConsoleResource>());
     addResource(std::make_unique<AgentResource>(m_delivery, m_watch));
     addResource(std::make_unique<LogsResource>(m_watch));
     addResource(std::make_unique<SampleResource>(m_sampler));
     addResource(std::make_unique<DiagnoseResource>());
+    addResource(std::make_unique<SuggestResource>(config.formatDirectories));
     auto reports = std::make_unique<ReportResource>(entries);
     m_reports = reports.get();
     addResource(std::move(reports));

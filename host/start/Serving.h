@@ -75,7 +75,7 @@ private:
             const RowLayout& layout, Watchdog& watchdog, OpenedHistory history);
 
     void renewCredentials();
-    void addResources(TableManager& entries);
+    void addResources(const HostConfig& config, TableManager& entries);
     void addMetrics(const EventStream& stream);
     void addResource(std::unique_ptr<Resource> resource);
 

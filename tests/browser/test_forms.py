@@ -1,5 +1,7 @@
 """Forms that take more than fields: a format on lines, and conditions as text."""
 
+from pathlib import Path
+
 import pytest
 from browser.conftest import until
 
@@ -40,6 +42,20 @@ def test_the_last_lines_of_a_log_are_taken(page, agent):
     page.click("Take them")
     until(lambda: page.control("Lines").get_attribute("aria-invalid") == "true" and "no lines yet" not in page.text(), "the problem")
     page.pictures("try-no-file")
+
+
+def test_the_format_that_fits_is_suggested(page, agent):
+    agent.formats = Path(__file__).resolve().parents[2] / "formats"
+    logs_agent(agent)
+    page.on(agent, "try")
+    page.type("Lines", '203.0.113.7 - - [19/Nov/2026:10:00:00 +0100] "GET / HTTP/1.1" 200 5 "-" "curl"\nbroken')
+    page.click("Which format fits?")
+    page.wait_text("50% of the lines fit")
+    assert "format = 'nginx-access'" in page.text() or "format = 'apache-access'" in page.text()
+    page.pictures("try-suggested")
+    page.type("Lines", "Lorem ipsum")
+    page.click("Which format fits?")
+    page.wait_text("No format fits")
 
 
 @pytest.mark.parametrize("permission", ["granted", "denied"])

@@ -2,6 +2,7 @@
 
 import { get, post } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
+import { showSuggestion } from "../suggest.js";
 import { columnsPanel, coverage, fieldNames, linesPanel, markedAt } from "../trial.js";
 
 const START =
@@ -85,6 +86,12 @@ class TryPage {
         h("div", { className: "fields" }, this.rules, this.timezone),
         this.format,
         this.lines,
+        h(
+          "p",
+          { className: "actions" },
+          button("Which format fits?", () => this.#suggest()),
+          h("span", { className: "hint" }, "Tries the ready formats on these lines."),
+        ),
         logs.length > 0 &&
           h(
             "div",
@@ -153,6 +160,13 @@ class TryPage {
       this.isTaking = false;
       if (this.isAsked) this.#try();
     }
+  }
+
+  #suggest() {
+    const lines = this.lines.control.value.split("\n").slice(0, MOST_LINES);
+    this.abort?.abort();
+    this.abort = new AbortController();
+    return showSuggestion(this.result, lines, this.takenFrom || SOME_LOG, this.abort.signal);
   }
 
   async #try() {

@@ -1,0 +1,55 @@
+#ifndef ZRM_HOST_FORMAT_SUGGESTION_H
+#define ZRM_HOST_FORMAT_SUGGESTION_H
+
+#include "host/diagnose/FormatFit.h"
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace zrm::host {
+
+class ReadyFormats;
+struct ReadyFormat;
+
+/// Which ready formats fit some lines of a log, or what a format for them could be.
+class FormatSuggestion {
+public:
+    static constexpr std::size_t mostLines = 1000;    ///< further ones are not looked at
+    static constexpr std::size_t longestLine = 16384; ///< bytes; the rest is not looked at
+    static constexpr std::size_t mostChoices = 3;
+    /// A ready format that reads a smaller share is not suggested alone.
+    static constexpr double leastShare = 0.6;
+
+    struct Choice {
+        std::vector<std::string> names; ///< several of type "syslog"; empty: a proposal
+        std::string about;
+        FormatFit fit;
+        std::string table; ///< the [[log]] table to write
+    };
+
+    /// `log` is the path for the table.
+    static FormatSuggestion of(const ReadyFormats& formats, std::vector<std::string> lines,
+                               std::string_view log);
+
+    std::size_t lines() const noexcept { return m_lines; }
+    /// The best first; those that fit no line are left out.
+    const std::vector<Choice>& ready() const noexcept { return m_ready; }
+    /// A format made for the lines, if no ready one reads enough of them and it reads more.
+    const std::optional<Choice>& proposal() const noexcept { return m_proposal; }
+    /// As the JSON object that the API answers.
+    std::string json() const;
+
+private:
+    class Search;
+
+    std::size_t m_lines = 0;
+    std::vector<Choice> m_ready;
+    std::optional<Choice> m_proposal;
+};
+
+} // namespace zrm::host
+
+#endif

@@ -1,0 +1,85 @@
+#include "host/diagnose/FormatSuggestion.h"
+
+#include "host/config/ReadyFormats.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include <string>
+#include <vector>
+
+using namespace zrm;
+using namespace zrm::host;
+
+namespace {
+
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+FormatSuggestion suggest(const std::vector<std::string>& lines) {
+    return FormatSuggestion::of(ReadyFormats({ZRM_FORMATS}), lines, "/srv/the.log");
+}
+
+TEST(FormatSuggestion, EachFormatIsSuggestedForItsOwnSamples) {
+    for (const ReadyFormats::Place& place : ReadyFormats({ZRM_FORMATS}).list()) {
+        const auto ready = ReadyFormats::load(place);
+        ASSERT_TRUE(ready) << ready.error().front();
+        std::vector<std::string> lines;
+        for (const ReadyFormat::Sample& sample : ready->samples) {
+            for (std::size_t at = 0; !sample.isRejected && at <= sample.entry.size();) {
+                const std::size_t end = std::min(sample.entry.find('\n', at), sample.entry.size());
+                lines.push_back(sample.entry.substr(at, end - at));
+                at = end + 1;
+            }
+        }
+        const FormatSuggestion suggestion = suggest(lines);
+        std::vector<std::string> names;
+        for (const FormatSuggestion::Choice& choice : suggestion.ready()) {
+            names.insert(names.end(), choice.names.begin(), choice.names.end());
+        }
+        EXPECT_THAT(names, testing::Contains(place.name));
+    }
+}
+
+TEST(FormatSuggestion, TheBestComesFirstWithTheTableToWrite) {
+    const FormatSuggestion suggestion = suggest(
+        {R"(203.0.113.7 - - [19/Nov/2026:10:00:00 +0100] "GET / HTTP/1.1" 200 5 "-" "x" 0.1)",
+         "broken"});
+    ASSERT_FALSE(suggestion.ready().empty());
+    const FormatSuggestion::Choice& best = suggestion.ready().front();
+    ASSERT_EQ(best.names.size(), 1U);
+    EXPECT_THAT(best.names.front(), HasSubstr("-access"));
+    EXPECT_EQ(best.fit.fitting, 1U);
+    EXPECT_EQ(best.table,
+              "[[log]]\npath = '/srv/the.log'\nformat = '" + best.names.front() + "'\n");
+}
+
+TEST(FormatSuggestion, AFormatIsMadeWhereNoReadyOneFits) {
+    const FormatSuggestion made = suggest({"WARN 2026-11-19 10:00:00 | no room"});
+    ASSERT_TRUE(made.proposal());
+    EXPECT_THAT(made.proposal()->names, IsEmpty());
+    EXPECT_THAT(made.proposal()->table, HasSubstr("type = 'regex'\nformat = "));
+    EXPECT_DOUBLE_EQ(made.proposal()->fit.share(), 1);
+    EXPECT_THAT(suggest({"Lorem ipsum"}).proposal(), testing::Eq(std::nullopt));
+}
+
+TEST(FormatSuggestion, LooksAtABoundedPartOfWhatItIsGiven) {
+    const FormatSuggestion suggestion =
+        suggest(std::vector<std::string>(3000, "level=info " + std::string(50, 'x')));
+    EXPECT_EQ(suggestion.lines(), FormatSuggestion::mostLines);
+    EXPECT_EQ(suggest({}).lines(), 0U);
+    EXPECT_THAT(suggest({}).ready(), IsEmpty());
+    EXPECT_THAT(suggest({std::string(1000000, '{')}).ready(), IsEmpty());
+}
+
+TEST(FormatSuggestion, IsAnsweredAsJson) {
+    const auto json =
+        nlohmann::json::parse(suggest({"time=2026-11-19T10:00:00Z level=info msg=a"}).json());
+    EXPECT_EQ(json.at("lines"), 1);
+    EXPECT_EQ(json.at("ready").at(0).at("percent"), 100.0);
+    EXPECT_EQ(json.at("ready").at(0).at("percent_time"), 100.0);
+    EXPECT_TRUE(json.at("proposal").is_null());
+}
+
+} // namespace
