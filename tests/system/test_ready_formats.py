@@ -12,8 +12,9 @@ from zrmctl import ZRMCTL, environment, run
 
 FORMATS = Path(__file__).resolve().parents[2] / "formats"
 NAMED = {
-    "nginx-access", "nginx-error", "apache-access", "apache-error", "postgresql", "mysql-error", "redis", "java",
-    "python", "go-slog", "docker", "cri", "klog", "auditd", "dpkg", "apt-history", "fail2ban", "zrmagent",
+    "syslog-iso", "rfc5424", "nginx-access", "nginx-error", "apache-access", "apache-error", "postgresql",
+    "mysql-error", "haproxy", "redis", "java", "python", "go-slog", "docker", "cri", "klog", "auditd", "dpkg",
+    "apt-history", "fail2ban", "postfix", "sshd", "sudo", "kernel", "systemd", "zrmagent",
 }  # fmt: skip
 DIRECTORY = ["--directory", str(FORMATS)]
 
@@ -58,6 +59,19 @@ def test_traces_of_several_lines_are_one_entry(agent, log):
     assert first["row"]["ENTRYSRC"] == "com.example.Cart"
     assert first["fields"] == {"exception": "java.lang.IllegalStateException"}
     assert first["entry"].count("\n") == 41
+
+
+def test_several_syslog_formats_are_joined(agent, log):
+    agent.follow(log, format=["sshd", "sudo"], start="beginning", keep=["*"])
+    agent.situation(log=log)
+    log.append(
+        "Nov 19 10:00:00 web1 sshd[7]: Failed password for root from 203.0.113.7 port 40022 ssh2\n"
+        "Nov 19 10:00:01 web1 sudo: anna : TTY=pts/0 ; PWD=/ ; USER=root ; COMMAND=/bin/ls\n"
+    )
+    agent.start()
+    ssh, sudo = agent.wait_events(2)
+    assert ssh["fields"]["address"] == "203.0.113.7" and ssh["fields"]["user"] == "root"
+    assert sudo["fields"]["command"] == "/bin/ls" and sudo["fields"]["user"] == "anna"
 
 
 def test_a_table_changes_what_the_format_says(agent, log):

@@ -14,6 +14,7 @@ using namespace zrm::host;
 
 namespace {
 
+using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -25,6 +26,9 @@ TEST(FormatSuggestion, EachFormatIsSuggestedForItsOwnSamples) {
     for (const ReadyFormats::Place& place : ReadyFormats({ZRM_FORMATS}).list()) {
         const auto ready = ReadyFormats::load(place);
         ASSERT_TRUE(ready) << ready.error().front();
+        if (ready->format.type == "syslog") {
+            continue; // they read the same lines: see below
+        }
         std::vector<std::string> lines;
         for (const ReadyFormat::Sample& sample : ready->samples) {
             for (std::size_t at = 0; !sample.isRejected && at <= sample.entry.size();) {
@@ -53,6 +57,20 @@ TEST(FormatSuggestion, TheBestComesFirstWithTheTableToWrite) {
     EXPECT_EQ(best.fit.fitting, 1U);
     EXPECT_EQ(best.table,
               "[[log]]\npath = '/srv/the.log'\nformat = '" + best.names.front() + "'\n");
+}
+
+TEST(FormatSuggestion, SyslogFormatsThatFindFieldsAreNamedTogether) {
+    const FormatSuggestion suggestion = suggest(
+        {"Nov 19 10:00:00 web1 sshd[1]: Failed password for root from 203.0.113.7 port 1 ssh2",
+         "Nov 19 10:00:01 web1 sudo: anna : TTY=pts/0 ; PWD=/ ; USER=root ; COMMAND=/bin/ls",
+         "Nov 19 10:00:02 web1 app: text"});
+    ASSERT_FALSE(suggestion.ready().empty());
+    EXPECT_THAT(suggestion.ready().front().names, ElementsAre("sshd", "sudo"));
+    EXPECT_THAT(suggestion.ready().front().table, HasSubstr("format = ['sshd', 'sudo']\n"));
+    const FormatSuggestion plain = suggest({"Nov 19 10:00:02 web1 app: text"});
+    ASSERT_FALSE(plain.ready().empty());
+    EXPECT_THAT(plain.ready().front().names, IsEmpty());
+    EXPECT_THAT(plain.ready().front().table, HasSubstr("type = 'syslog'\n"));
 }
 
 TEST(FormatSuggestion, AFormatIsMadeWhereNoReadyOneFits) {
