@@ -53,6 +53,7 @@ std::string boundOf(const Replay& replay) {
 
 struct Explainer::Seen {
     std::optional<std::string> line;
+    std::string record; ///< if it is not a line
     std::optional<std::uint64_t> event;
     bool isRow = false;
     zrm_rmlogent_data_t row{};
@@ -71,6 +72,10 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
                                  zrm_rmlogent_data_t* row) {
     Seen seen;
     seen.line = line;
+    if (const auto* const entry = dynamic_cast<const LineEntry*>(LogEntry::ofThisThread);
+        entry != nullptr && !line) {
+        seen.record = entry->entry();
+    }
     if (row != nullptr) {
         seen.isRow = true;
         seen.row = *row; // judging modifies the row
@@ -209,7 +214,8 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
 Explanation Explainer::describe(const LogFile* log, Seen& seen) {
     Explanation explanation;
     explanation.line = std::move(seen.line);
-    LineEntry entry(log, explanation.line ? std::string_view(*explanation.line) : "");
+    LineEntry entry = explanation.line ? LineEntry(log, *explanation.line)
+                                       : LineEntry::ofRecord(log, seen.record);
     const LogEntry::Offer offer(entry);
     explanation.event = seen.event;
     if (m_replay.hasThresholds()) {

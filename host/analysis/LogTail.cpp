@@ -125,7 +125,13 @@ LogTail::LogTail(LogFile& log) : m_log(log), m_clock(log.followSettings()) {}
 bool LogTail::hasLines() const noexcept {
     const auto& settings = m_log.followSettings();
     return m_log.type() == 'U' || m_log.type() == 'S' ||
-           (settings && settings->format && settings->format->recordLength() == 0);
+           (settings && settings->format && recordLength() == 0);
+}
+
+/// Of a format of records; 0 for other logs.
+std::size_t LogTail::recordLength() const noexcept {
+    const auto& settings = m_log.followSettings();
+    return settings && settings->format ? settings->format->recordLength() : 0;
 }
 
 Result<void> LogTail::read(const Entry& entry) {
@@ -136,6 +142,10 @@ Result<void> LogTail::read(const Entry& entry) {
         return {};
     }
     const auto file = MonitoredLogFile::open(m_log.fileNameLocal(), m_log.ledger().file());
+    if (file && recordLength() != 0) {
+        readRecords(file->descriptor(), entry);
+        return {};
+    }
     if (file && !hasLines()) {
         entries(entry);
         return {};
@@ -158,6 +168,32 @@ Result<void> LogTail::readLines(int fd, const Entry& entry) {
     m_isCut = lseek(fd, 0, SEEK_CUR) > 0;
     pieces(fd, entry);
     return {};
+}
+
+/// Reads the newest records of a file.
+void LogTail::readRecords(int fd, const Entry& entry) {
+    const auto length = static_cast<off_t>(recordLength());
+    const off_t count = std::max<off_t>(lseek(fd, 0, SEEK_END), 0) / length;
+    const off_t passedOver = std::max<off_t>(count - static_cast<off_t>(mostEntries), 0);
+    std::string record(recordLength(), '\0');
+    for (off_t number = passedOver; number < count; ++number) {
+        if (pread(fd, record.data(), record.size(), number * length) != length) {
+            m_reach.reason = because("the log cannot be read", errno);
+            return;
+        }
+        LineEntry read = LineEntry::ofRecord(&m_log, record);
+        const LogEntry::Offer offer(read);
+        zrm_rmlogent_data_t row;
+        if (m_log.formatEntryAsRow(record.data(), &row, nullptr) == 0) {
+            if (m_reach.reached.empty()) {
+                note(row);
+            }
+            give(entry, std::nullopt, row, lastEntryMoment);
+        }
+    }
+    if (passedOver > 0) {
+        m_reach.reason = "only the newest " + std::to_string(mostEntries) + " records are read";
+    }
 }
 
 Result<void> LogTail::readLine(std::string_view line, const Entry& entry) {

@@ -62,7 +62,9 @@ public:
     const Reach& reach() const noexcept { return m_reach; }
 
 private:
+    std::size_t recordLength() const noexcept;
     Result<void> readLines(int fd, const Entry& entry);
+    void readRecords(int fd, const Entry& entry);
     void pieces(int fd, const Entry& entry);
     void wholeEntries(int fd, const Entry& entry);
     void judge(char* line, std::string text, const Entry& entry);

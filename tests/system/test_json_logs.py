@@ -197,6 +197,21 @@ def test_reports_and_suggestions_have_the_fields(agent, log):
     assert {one["name"] for one in answer["fields"]} == {"time", "msg", "status", "http.path"}
 
 
+def test_long_objects_are_explained_and_suggested_from_whole(agent, log):
+    log.append(entry(msg="x" * 50_000, status=503))
+    agent.follow(log, type="json", start="beginning")
+    agent.situation(name="5xx", log=log, when=["field.status >= 500", "field.msg contains 'xxx'"])
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_events(1)
+    api = Api(agent)
+    status, _, answer = api.request("POST", "/api/v1/explain", {"situation": "5xx", "last": 1})
+    assert status == 200, answer
+    assert answer["explanations"][0]["decision"].endswith("every condition holds.")
+    fields = api.request("GET", f"/api/v1/fields?log={log}")[2]["fields"]
+    assert {one["name"] for one in fields} == {"time", "msg", "status"}
+
+
 def test_a_wrong_table_is_refused_with_its_place(agent, log):
     agent.follow(log, type="json", columns={"level": "lvl"})
     agent.start(wait=False)

@@ -78,9 +78,17 @@ def test_situations_ask_for_addresses(agent, log):
     for user, address in (("root", "2001:db8::1"), ("anna", "203.0.113.7"), ("bert", "2001:db8::2"), ("carl", None)):
         log.append(record(user, "ssh:notty", wtmp.LOGIN_PROCESS, address=address, when=TEN))
     (event,) = agent.wait_events(1)
+    assert event["fields"] == {"address": "2001:db8::2", "user": "bert"}
+    status, _, answer = Api(agent).request("POST", "/api/v1/explain", {"situation": "abroad", "last": 4})
+    assert status == 200, answer
+    assert [one["decision"].split(": ", 1)[1] for one in answer["explanations"]] == [
+        "field.user 'root' is 'root'.",
+        "field.address '203.0.113.7' does not start with '2001:db8:'.",
+        "every condition holds.",
+        "the entry has no field.address.",
+    ]
     assert agent.stop() == 0
     assert len(agent.events()) == 1
-    assert event["fields"] == {"address": "2001:db8::2", "user": "bert"}
 
 
 def test_half_records_wait_and_damaged_ones_are_rejected(agent, log):
@@ -142,6 +150,8 @@ def test_reports_read_generations_backwards(agent, log):
     assert [row["ENTRYSRC"] for row in rows] == ["pts/5", "pts/4", "pts/3", "pts/2"]
     rows = report(agent, log, ["field.address = '192.0.2.1'"])["rows"]
     assert [row["ENTRYSRC"] for row in rows] == ["pts/1"]
+    fields = Api(agent).request("GET", f"/api/v1/fields?log={log}")[2]["fields"]
+    assert {"user", "address", "type"} <= {one["name"] for one in fields}
 
 
 def test_the_system_sees_the_same_records(agent, log):
