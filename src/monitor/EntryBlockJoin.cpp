@@ -20,9 +20,13 @@ void EntryBlock::skipZeros() noexcept {
 
 /// The whole line behind those of the entry. False if there is none.
 bool EntryBlock::findLine(std::string_view& line) noexcept {
+    const std::size_t available = m_end - m_begin - m_length;
+    if (available == 0) {
+        return false;
+    }
     const char* const begin = m_block.get() + m_begin + m_length;
     if (m_nextLength == unknown) {
-        const void* const newline = std::memchr(begin, '\n', m_end - m_begin - m_length);
+        const void* const newline = std::memchr(begin, '\n', available);
         if (newline == nullptr) {
             return false;
         }
