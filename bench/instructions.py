@@ -78,6 +78,7 @@ CASES = [
     ("`[[log]]`: syslog, ISO 8601", iso, 1000, "syslog", None, 'type = "syslog"'),
     ("`[[log]]`: syslog, RFC 5424", rfc5424, 1000, "syslog", None, 'type = "syslog"'),
     ("`[[log]]`: text", text, 1000, "text", None, USER_TABLE),
+    ("`[[log]]`: text, `entry.starts`", text, 1000, "text", None, USER_TABLE + "\nentry.starts = '^\\d{4}-'"),
     ("`[[log]]`: accounting", accounting, 1000, "accounting", None, 'type = "accounting"'),
 ]  # fmt: skip
 

@@ -1,6 +1,7 @@
 #include "host/formats/LinePattern.h"
 
 #include <utility>
+#include <vector>
 
 #include <re2/re2.h>
 
@@ -74,12 +75,16 @@ Result<LinePattern> LinePattern::compile(const std::string& pattern) {
 }
 
 LinePattern::LinePattern(std::unique_ptr<const re2::RE2> expression)
-    : m_expression(std::move(expression)), m_isAnchored(isAnchored(m_expression->pattern())) {
+    : m_expression(std::move(expression)) {
     m_mayBegin.fill(true);
+    const std::string_view pattern = m_expression->pattern();
+    if (!isAnchored(pattern)) {
+        return;
+    }
+    m_program = PatternProgram::compile(pattern.substr(1));
     std::string least;
     std::string most;
-    if (m_isAnchored && m_expression->PossibleMatchRange(&least, &most, 1) && !least.empty() &&
-        !most.empty()) {
+    if (m_expression->PossibleMatchRange(&least, &most, 1) && !least.empty() && !most.empty()) {
         for (std::size_t byte = 0; byte < m_mayBegin.size(); ++byte) {
             m_mayBegin[byte] = byte >= static_cast<unsigned char>(least.front()) &&
                                byte <= static_cast<unsigned char>(most.front());
@@ -94,6 +99,14 @@ LinePattern::~LinePattern() = default;
 bool LinePattern::matches(std::string_view line) const {
     if (!line.empty() && !m_mayBegin[static_cast<unsigned char>(line.front())]) {
         return false;
+    }
+    if (m_program) {
+        thread_local std::vector<const char*> places;
+        places.resize(2 * m_program->groups());
+        const PatternProgram::Outcome outcome = m_program->match(line, places);
+        if (outcome != PatternProgram::Outcome::unknown) {
+            return outcome == PatternProgram::Outcome::match;
+        }
     }
     return m_expression->Match(line, 0, line.size(), re2::RE2::UNANCHORED, nullptr, 0);
 }

@@ -2,9 +2,11 @@
 #define ZRM_HOST_LINE_PATTERN_H
 
 #include "host/base/Result.h"
+#include "host/formats/PatternProgram.h"
 
 #include <array>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -35,9 +37,9 @@ private:
     explicit LinePattern(std::unique_ptr<const re2::RE2> expression);
 
     std::unique_ptr<const re2::RE2> m_expression;
+    std::optional<PatternProgram> m_program; ///< of an expression that begins with "^"
     /// For each byte: whether a line that begins with it may match. Most lines are decided by that.
     std::array<bool, 256> m_mayBegin;
-    bool m_isAnchored;
 };
 
 } // namespace zrm::host
