@@ -99,6 +99,14 @@ bool LineRules::continues(std::string_view before, std::string_view line) const 
     return m_parts.unwrap ? continuesWrapped(before, line) : continuesByRule(line);
 }
 
+bool LineRules::mayBeContinued(std::string_view line) const {
+    if (!m_parts.isOnlyUnwrap()) {
+        return true;
+    }
+    Unwrapper& unwrapper = unwrapperOf(*m_parts.unwrap);
+    return unwrapper.read(line) && unwrapper.isUnfinished();
+}
+
 /// By what a program has written. Lines that are not the runtime's are entries, which the format
 /// rejects.
 bool LineRules::continuesWrapped(std::string_view before, std::string_view line) const {

@@ -26,6 +26,7 @@ public:
 
 protected:
     bool continues(std::string_view before, std::string_view line) const override;
+    bool mayBeContinued(std::string_view line) const override;
 
 private:
     struct Parts {
@@ -33,6 +34,9 @@ private:
         std::optional<LinePattern> continues;
         bool isIndented = false;
         std::optional<Unwrapper::Kind> unwrap;
+
+        /// Each line of a program is an entry.
+        bool isOnlyUnwrap() const noexcept { return !starts && !continues && !isIndented; }
     };
 
     LineRules(const FormatDescription& description, Parts parts);

@@ -36,6 +36,8 @@ public:
     bool joins(std::string_view before, std::string_view line) const {
         return !line.starts_with('\0') && continues(withoutReturn(before), withoutReturn(line));
     }
+    /// Whether a line without its newline may be continued. If not, it need not wait for others.
+    bool isOpen(std::string_view line) const { return mayBeContinued(withoutReturn(line)); }
     const Limits& limits() const noexcept { return m_limits; }
     /// All that decides which lines are joined, as a text: joins with equal texts are the same.
     virtual const std::string& definition() const noexcept = 0;
@@ -44,6 +46,8 @@ protected:
     /// Whether a line continues the one before it. Both without line ends. Any thread. Reports ask
     /// in the reverse order of the lines, so the answer depends on nothing else.
     virtual bool continues(std::string_view before, std::string_view line) const = 0;
+    /// False only if no line continues this one.
+    virtual bool mayBeContinued(std::string_view /*line*/) const { return true; }
 
 private:
     static std::string_view withoutReturn(std::string_view line) noexcept {

@@ -63,6 +63,10 @@ char* EntryBlock::nextJoined() noexcept {
         ++m_lines;
         m_length += line.size() + 1;
         m_lastLength = line.size();
+        if (!m_join->isOpen(line)) {
+            m_nextLength = unknown;
+            return endJoined();
+        }
     }
     const char* const unfinished = m_block.get() + m_begin + m_length;
     const std::size_t available = m_end - m_begin - m_length;

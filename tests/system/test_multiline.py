@@ -114,7 +114,7 @@ def test_lines_of_containers_are_joined_and_unwrapped(agent):
     for log in (docker, cri):
         log.path.write_text("")
     agent.follow(docker, unwrap="docker", entry={"starts": r"^\S"})
-    agent.follow(cri, unwrap="cri", defaults={"source": "web"})
+    agent.follow(cri, unwrap="cri", defaults={"source": "web"}, entry={"wait": "1m"})
     agent.situation(when=["field.stream = 'stderr'"])
     agent.start()
     agent.wait_open(docker)
@@ -123,7 +123,6 @@ def test_lines_of_containers_are_joined_and_unwrapped(agent):
         entry = {"log": text, "stream": "stderr", "time": "2026-11-19T10:00:00.5Z"}
         docker.append(json.dumps(entry) + "\n")
     cri.append("2026-11-19T10:00:00.5Z stderr P two \n2026-11-19T10:00:00.6Z stderr F parts\n")
-    cri.append("2026-11-19T10:00:00.7Z stdout F not this stream\n")
     rows = {event["row"]["LOGNAME"]: event["row"] for event in agent.wait_events(2)[:2]}
     assert rows["docker.log"]["ENTRYDESC"] == 'it "broke" \tat a and b'
     assert rows["docker.log"]["ENTRYTYPE"] == "stderr"

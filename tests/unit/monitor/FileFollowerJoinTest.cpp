@@ -174,6 +174,31 @@ TEST_F(FileFollowerJoinTest, AnEntryThatIsTakenBackIsReadAgainAfterARestart) {
     EXPECT_THAT(entries(), ElementsAre("one\n a"));
 }
 
+/// A line that ends with a backslash is continued by the next one.
+class BackslashJoin final : public LineJoin {
+public:
+    BackslashJoin() : LineJoin({.wait = seconds(5)}) {}
+    const std::string& definition() const noexcept override { return m_definition; }
+
+protected:
+    bool continues(std::string_view before, std::string_view /*line*/) const override {
+        return before.ends_with('\\');
+    }
+    bool mayBeContinued(std::string_view line) const override { return line.ends_with('\\'); }
+
+private:
+    const std::string m_definition = "backslash";
+};
+
+TEST_F(FileFollowerJoinTest, ALineThatNoOtherContinuesDoesNotWait) {
+    m_options.join = std::make_shared<BackslashJoin>();
+    begin();
+    EXPECT_THAT(entries(), IsEmpty());
+    append("one\ntwo\\\nparts\nthree\\\n");
+    EXPECT_THAT(entries(), ElementsAre("one", "two\\\nparts"));
+    EXPECT_THAT(entries(seconds(6)), ElementsAre("three\\"));
+}
+
 TEST_F(FileFollowerJoinTest, LateLinesWaitForOthers) {
     append("one\n");
     rename("app.log", "app.log.1");

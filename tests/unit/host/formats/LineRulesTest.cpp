@@ -86,6 +86,17 @@ TEST(LineRules, WhatARuntimeHasCutIsJoined) {
                 ElementsAre(R"({"log":"a"}/{"log":"b\n"})", R"({"log":"c\n"})"));
 }
 
+TEST(LineRules, AWholeLineOfAContainerNeedNotWait) {
+    FormatDescription description;
+    description.unwrap = "cri";
+    const auto rules = *LineRules::make(description);
+    EXPECT_TRUE(rules->isOpen("2026-11-19T10:00:00Z stdout P a"));
+    EXPECT_FALSE(rules->isOpen("2026-11-19T10:00:00Z stdout F a\r"));
+    EXPECT_FALSE(rules->isOpen("odd"));
+    description.lines.indented = true;
+    EXPECT_TRUE((*LineRules::make(description))->isOpen("2026-11-19T10:00:00Z stdout F a"));
+}
+
 TEST(LineRules, InAContainerTheProgramsLinesAreJudged) {
     FormatDescription description;
     description.unwrap = "docker";
