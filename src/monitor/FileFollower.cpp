@@ -75,12 +75,10 @@ std::optional<LogPosition> FileFollower::position() const noexcept {
 
 bool FileFollower::look(const Moment& now) {
     m_now = now;
+    m_mayLeaveOut = 0;
     m_lookBegan = std::chrono::steady_clock::now();
     if (m_chain.empty()) {
         return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
-    }
-    if (isUnchanged()) {
-        return m_late.look(now.steady);
     }
     if (m_options.byName && mayTry(m_nameRetry)) {
         checkName();
@@ -111,15 +109,13 @@ void FileFollower::notePresent() {
                                          : FollowLedger::State::reading);
 }
 
-/// True if the only file was read to its end and is as it was at the last look, when it had the
-/// log's name.
-bool FileFollower::isUnchanged() const noexcept {
-    const bool hasName =
-        !m_options.byName || (m_hadName && m_now.steady - m_nameSeen < nameInterval);
+bool FileFollower::isQuiet() noexcept {
+    if (m_mayLeaveOut == 0) {
+        return false;
+    }
+    --m_mayLeaveOut;
     Generation::Status now;
-    return hasName && m_chain.size() == 1 && m_isAtEnd && m_hasSeen && !m_block.isWaiting() &&
-           m_nameRetry.failures + m_readRetry.failures + m_youngerRetry.failures == 0 &&
-           m_chain.front().file->status(now) && now == m_seen;
+    return m_chain.front().file->status(now) && now == m_seen;
 }
 
 /// Looks whether another file has the log's name.
@@ -134,7 +130,6 @@ void FileFollower::checkName() {
     if (isThere && S_ISREG(status.st_mode) &&
         FileIdentity{status.st_dev, status.st_ino} == m_chain.back().file->identity()) {
         m_hadName = !isLink;
-        m_nameSeen = m_now.steady;
         succeed(m_nameRetry);
         notePresent();
         return;
@@ -176,11 +171,15 @@ bool FileFollower::checkFile() {
             }
         }
     }
-    m_hadName = m_hadName && m_hasSeen && now == m_seen; // else it may have lost it since
+    const bool isUnchanged = m_hasSeen && now == m_seen; // else it may have lost its name since
     m_seen = now;
     m_hasSeen = true;
     if (isSame && m_isAtEnd && m_chain.size() == 1 && !m_block.isWaiting()) {
         m_block.release();
+        const bool isFailing =
+            m_nameRetry.failures + m_readRetry.failures + m_youngerRetry.failures > 0;
+        const bool hasName = m_hadName || !m_options.byName;
+        m_mayLeaveOut = isUnchanged && hasName && !isFailing && m_late.isEmpty() ? mostLeftOut : 0;
         return false;
     }
     return true;

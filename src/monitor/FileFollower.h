@@ -55,10 +55,12 @@ public:
 
     /// Continues at the position. Call it before the first look.
     void resumeAt(const LogPosition& stored) noexcept { m_stored = stored; }
-    /// Looks at the file and at the name, about once a second. True if there may be entries. Costs
-    /// one system call if the file has not changed: its status shows that it was renamed or
-    /// removed. That one of the path's directories was exchanged is noticed within five seconds.
+    /// Looks at the file and at the name, about once a second. True if there may be entries.
     bool look(const Moment& now);
+    /// True if a look can be left out, because the file is as it was at the last one: its status
+    /// shows that it was renamed or removed. That one of the path's directories was exchanged is
+    /// not seen, so every fifth look is not left out. Costs one system call.
+    bool isQuiet() noexcept;
     /// The next entry as EntryBlock gives it, or null if there is none until the next look, or if
     /// many megabytes had none: isPaused says so, and the next call goes on. Lines at the end of
     /// the file that others may continue wait for these, but not for long (LineJoin::Limits). A
@@ -173,7 +175,6 @@ private:
     void beginFirst(std::unique_ptr<Generation> named);
     void noteOlder();
     void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
-    bool isUnchanged() const noexcept;
     void checkName();
     bool checkFile();
     bool isFinished() const noexcept;
@@ -196,8 +197,7 @@ private:
 
     static constexpr int mostReadFailures = 5;      ///< of a file that others follow
     static constexpr std::size_t mostGivenUp = 256; ///< that are remembered
-    /// The longest time without a look at the name.
-    static constexpr std::chrono::seconds nameInterval{5};
+    static constexpr int mostLeftOut = 4;           ///< looks, one after another
 
     const std::string m_path;
     const Options m_options;
@@ -223,8 +223,8 @@ private:
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
     std::int64_t m_known = 0;    ///< size that its present contents had for certain
     bool m_hasSeen = false;
-    bool m_hadName = false; ///< itself, not by a link, at m_nameSeen and after its last change
-    std::chrono::steady_clock::time_point m_nameSeen{};
+    bool m_hadName = false;              ///< itself, not by a link, at the last look
+    int m_mayLeaveOut = 0;               ///< looks, while the status is m_seen
     std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
     bool m_waits = true;           ///< for lines that continue those at the end of the file

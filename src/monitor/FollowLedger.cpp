@@ -11,7 +11,6 @@ namespace zrm {
 void FollowLedger::noteFailure(const char* call, int number, const std::string& file) {
     const LockGuard guard(&m_lock);
     m_failure = Failure{call, number, m_failure ? m_failure->since : wallTime(), file};
-    m_isFailing.store(true, std::memory_order_relaxed);
 }
 
 void FollowLedger::noteProblem(std::string text) {
@@ -22,7 +21,6 @@ void FollowLedger::noteProblem(std::string text) {
 void FollowLedger::clearFailure() {
     const LockGuard guard(&m_lock);
     m_failure.reset();
-    m_isFailing.store(false, std::memory_order_relaxed);
 }
 
 std::optional<FollowLedger::Failure> FollowLedger::failure() const {

@@ -85,8 +85,6 @@ public:
     State state() const noexcept { return m_state.load(std::memory_order_relaxed); }
     /// What failed last, if it has not succeeded since.
     std::optional<Failure> failure() const;
-    /// Whether there is one.
-    bool isFailing() const noexcept { return m_isFailing.load(std::memory_order_relaxed); }
     std::optional<Generation> generation() const;
     /// Files that were read, the present one included.
     std::int64_t generations() const noexcept { return m_count.load(std::memory_order_relaxed); }
@@ -118,7 +116,6 @@ private:
     std::atomic<std::int64_t> m_losses{0};
     std::atomic<std::int64_t> m_truncations{0};
     std::atomic<std::int64_t> m_cut{0};
-    std::atomic<bool> m_isFailing{false};
     mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<Failure> m_failure;
     std::optional<Generation> m_generation;

@@ -41,6 +41,8 @@ public:
 
     /// Looks at the files. True if there may be entries.
     bool look(Time now);
+    /// True if no file is watched.
+    bool isEmpty() const noexcept { return m_files.empty(); }
     /// The next entry, as EntryBlock gives it; null if there is none until the next look.
     char* next();
     /// Takes back the entry that next has just given. False if it cannot.

@@ -108,7 +108,8 @@ void LogFile::followLog(std::size_t recordLength) {
             follower.waitNoLonger(); // otherwise the next run reads what waits
         }
         m_pulse.work("looks at the log");
-        if (follower.look(FileFollower::Moment::now())) {
+        const bool isQuiet = !isLast && follower.isQuiet();
+        if (!isQuiet && follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read
             if (std::exchange(isRecountDue, false)) {
                 recount(follower, recordLength);
@@ -122,10 +123,10 @@ void LogFile::followLog(std::size_t recordLength) {
             }
             noteFollowed(follower, positions);
         }
-        if (m_isFailureTraced || m_followLedger->isFailing()) {
+        if (!isQuiet) {
             noteFollowFailure();
+            losses = traceLosses(*m_followLedger, fileNameLocal(), losses);
         }
-        losses = traceLosses(*m_followLedger, fileNameLocal(), losses);
         m_pulse.rest();
         if (!isLast) {
             timeval interval = lookInterval;

@@ -139,7 +139,7 @@ TEST_F(FileFollowerTest, FollowsASymbolicLinkToItsNewTarget) {
     EXPECT_EQ(looks(2), "1b\n2\n");
 }
 
-TEST_F(FileFollowerTest, TheNameOfAFileThatDoesNotChangeIsLookedAtEveryFiveSeconds) {
+TEST_F(FileFollowerTest, TheNameOfAFileThatDoesNotChangeIsLookedAtEveryFifthTime) {
     looks(3);
     const Fault names("lstat", EIO, {.skip = 100});
     for (int second = 0; second < 4; ++second) {
@@ -184,7 +184,7 @@ TEST_F(FileFollowerTest, ALinkToAQuietFileIsLookedAtEverySecond) {
     EXPECT_EQ(look(seconds(3)), "2\n");
 }
 
-TEST_F(FileFollowerTest, AnExchangedDirectoryOfAQuietFileIsNoticedWithinFiveSeconds) {
+TEST_F(FileFollowerTest, AnExchangedDirectoryOfAQuietFileIsNoticedWithinFiveLooks) {
     fs::create_directory(file("first"));
     fs::create_directory(file("second"));
     m_directory.write("first/log", "1\n");
@@ -195,8 +195,7 @@ TEST_F(FileFollowerTest, AnExchangedDirectoryOfAQuietFileIsNoticedWithinFiveSeco
     looks(3);
     fs::remove(file("current"));
     fs::create_symlink(file("second"), file("current"));
-    look(seconds(5));
-    EXPECT_EQ(look(seconds(3)), "2\n");
+    EXPECT_EQ(looks(6), "2\n");
 }
 
 TEST_F(FileFollowerTest, ManyEmptyGenerationsDoNotHideTheFilesAfterThem) {

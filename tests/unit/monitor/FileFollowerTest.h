@@ -41,7 +41,7 @@ protected:
     std::string look(seconds passed = seconds(1)) {
         m_now += passed;
         std::string text;
-        if (m_follower->look({m_now, 0})) {
+        if (!m_follower->isQuiet() && m_follower->look({m_now, 0})) {
             while (const char* const entry = m_follower->next()) {
                 text += entry;
             }

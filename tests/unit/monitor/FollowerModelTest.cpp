@@ -41,7 +41,7 @@ public:
     void look(std::chrono::milliseconds passed) {
         m_now += passed;
         m_world.noteLook();
-        if (m_follower->look({m_now, 0})) {
+        if (!m_follower->isQuiet() && m_follower->look({m_now, 0})) {
             while (const char* const entry = m_follower->next()) {
                 take(entry, m_follower->text());
                 m_world.noteDelivered(m_delivered);
