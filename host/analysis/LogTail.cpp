@@ -7,17 +7,22 @@
 #include "logs/FollowSettings.h"
 #include "logs/LineJoin.h"
 #include "logs/RequestThresholds.h"
+#include "monitor/Generation.h"
+#include "monitor/GenerationNames.h"
 #include "monitor/LineReader.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
+#include <memory>
 #include <utility>
 #include <vector>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace zrm::host {
@@ -56,13 +61,12 @@ private:
     int m_fd;
 };
 
-/// Seeks to the first complete line among the file's last bytes; false with errno set.
-bool seekTail(int fd) {
+/// Seeks to the first complete line among the file's last `room` bytes; false with errno set.
+bool seekTail(int fd, off_t room) {
     const off_t end = lseek(fd, 0, SEEK_END);
     if (end == -1) {
         return false;
     }
-    const auto room = static_cast<off_t>(LogTail::longest);
     if (end <= room) {
         return lseek(fd, 0, SEEK_SET) != -1;
     }
@@ -156,16 +160,56 @@ Result<void> LogTail::read(const Entry& entry) {
         m_reach.reason = lines.error().text();
     } else if (m_isCut) {
         m_reach.reason = "only the end of the log is read, 4 MiB";
+    } else if (!m_older.empty()) {
+        m_reach.reason = m_older + " and older generations are not read";
     }
     return lines;
 }
 
+/// Reads the generations before the present file, if that leaves room.
+void LogTail::readOlder(int present, const Entry& entry) {
+    struct stat status {};
+    if (m_log.followSettings() == nullptr || fstat(present, &status) != 0) {
+        return;
+    }
+    const std::string path = m_log.fileNameLocal();
+    const std::unique_ptr<char, void (*)(void*)> real(realpath(path.c_str(), nullptr), std::free);
+    const std::vector<GenerationFile> generations = newestFirst(
+        findGenerations(real ? real.get() : path, 0, m_log.followSettings()->rotatedTo));
+    const std::unique_ptr<Generation> named = Generation::open(path);
+    off_t room = static_cast<off_t>(longest) - status.st_size;
+    std::vector<std::unique_ptr<MonitoredLogFile>> files; // newest first
+    for (const GenerationFile& generation : generations) {
+        const auto opened = generation.isCompressed ? nullptr : Generation::open(generation.path);
+        if (generation.identity == FileIdentity{status.st_dev, status.st_ino} ||
+            (opened && named && opened->isCopyOf(*named))) {
+            continue;
+        }
+        auto file = generation.isCompressed || room <= 0
+                        ? Result<MonitoredLogFile>(refused("it is not read"))
+                        : MonitoredLogFile::open(generation.path, generation.identity);
+        if (!file || !seekTail(file->descriptor(), room)) {
+            m_older = generation.path;
+            break;
+        }
+        room -= generation.size;
+        files.push_back(std::make_unique<MonitoredLogFile>(std::move(*file)));
+    }
+    m_isCut = room < 0;
+    for (auto file = files.rbegin(); file != files.rend(); ++file) {
+        wholeEntries((*file)->descriptor(), entry);
+    }
+}
+
 /// Reads the lines at the end of a file.
 Result<void> LogTail::readLines(int fd, const Entry& entry) {
-    if (!seekTail(fd)) {
+    if (!seekTail(fd, static_cast<off_t>(longest))) {
         return refused(because("the log cannot be read", errno));
     }
     m_isCut = lseek(fd, 0, SEEK_CUR) > 0;
+    if (!m_isCut) {
+        readOlder(fd, entry);
+    }
     pieces(fd, entry);
     return {};
 }

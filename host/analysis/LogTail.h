@@ -29,7 +29,8 @@ struct Reach {
     void write(JsonWriter& json) const;
 };
 
-/// Reads the end of a log, and lines that it might contain, as its monitor would: in the same
+/// Reads the end of a log, and lines that it might contain, as its monitor would: of a followed log
+/// also older generations, as far as they are not compressed; in the same
 /// pieces, or the same lines joined to entries, and with the log's own operation that makes rows.
 /// The monitor is not affected: rows are made in the way of reports, and its counters do not count
 /// them. While an entry of a followed log is given, its EntryInstant exists.
@@ -65,6 +66,7 @@ private:
     std::size_t recordLength() const noexcept;
     Result<void> readLines(int fd, const Entry& entry);
     void readRecords(int fd, const Entry& entry);
+    void readOlder(int present, const Entry& entry);
     void pieces(int fd, const Entry& entry);
     void wholeEntries(int fd, const Entry& entry);
     void judge(char* line, std::string text, const Entry& entry);
@@ -78,6 +80,7 @@ private:
     EntryClock m_clock;
     Reach m_reach;
     bool m_isCut = false; ///< the log begins before what is read
+    std::string m_older;  ///< the newest generation that is not read; empty: unknown, or none
 };
 
 } // namespace zrm::host

@@ -4,6 +4,9 @@
 #include "host/analysis/StoredRow.h"
 #include "host/config/SituationValidator.h"
 #include "host/events/RowJson.h"
+#include "logs/FollowSettings.h"
+#include "logs/FurtherLogs.h"
+#include "logtypes/SysLogFile.h"
 #include "support/ReasonOf.h"
 #include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
@@ -15,6 +18,7 @@
 
 #include <filesystem>
 #include <fstream>
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
@@ -154,6 +158,44 @@ TEST_F(ExplainerTest, ReadsTheLastWholeLinesOfALargeLog) {
     EXPECT_EQ(linesOf(log).front(), std::string(2047, 'y') + " (no row)");
     write("front\n" + std::string(LogTail::longest - 3, 'y') + "\nend");
     EXPECT_THAT(linesOf(log), ElementsAre("end (no row)"));
+}
+
+/// A followed log that nobody monitors.
+struct FollowedSyslog : SysLogFile {
+    explicit FollowedSyslog(const ValidLog& log) : SysLogFile(log, SysLogFile::Unmonitored{}) {}
+};
+
+TEST_F(ExplainerTest, ReadsOlderGenerationsOfAFollowedLog) {
+    const auto line = [](int day, const std::string& text) {
+        return "2006-10-0" + std::to_string(day) + "T12:00:00 web1 app: " + text + '\n';
+    };
+    const ValidLog named(FurtherLog{directory.file("app.log"), 'S', 'N', "",
+                                    std::make_shared<const FollowSettings>()});
+    FollowedSyslog followed(named);
+    const auto read = [&](LogTail& tail) {
+        std::vector<std::string> texts;
+        EXPECT_TRUE(tail.read([&](auto text, zrm_rmlogent_data_t*) {
+            texts.emplace_back(text->substr(text->rfind(' ') + 1));
+        }));
+        return texts;
+    };
+    write(line(5, "four") + line(5, "five"));
+    directory.write("app.log.1", line(5, "four")); // a copy
+    directory.write("app.log.2", line(3, "two") + line(4, "three"));
+    directory.write("app.log.3", line(2, "one"));
+    LogTail whole(followed);
+    EXPECT_THAT(read(whole), ElementsAre("one", "two", "three", "four", "five"));
+    EXPECT_TRUE(whole.reach().isComplete()) << whole.reach().reason;
+    EXPECT_EQ(whole.reach().reached.substr(0, 7), "1061002");
+    std::filesystem::rename(directory.file("app.log.3"), directory.file("app.log.3.gz"));
+    LogTail cut(followed);
+    EXPECT_THAT(read(cut), ElementsAre("two", "three", "four", "five"));
+    EXPECT_EQ(cut.reach().reason,
+              directory.file("app.log.3.gz") + " and older generations are not read");
+    write(line(5, std::string(LogTail::longest - 60, 'x')));
+    LogTail full(followed);
+    EXPECT_EQ(read(full).size(), 1U);
+    EXPECT_FALSE(full.reach().isComplete());
 }
 
 TEST_F(ExplainerTest, ExplainsTheLastEntriesOldestFirst) {
