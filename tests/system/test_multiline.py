@@ -6,6 +6,7 @@ import os
 import random
 import sqlite3
 import time
+from pathlib import Path
 from signal import SIGKILL, SIGTERM
 
 import pytest
@@ -138,6 +139,28 @@ def test_an_explanation_is_about_whole_entries(agent):
     explained = Analysis(agent).explain(definition={}, log=str(log), last=2)
     assert [one["line"] for one in explained] == [trace("first")[:-1], trace("second")[:-1]]
     assert [one["row"]["ENTRYDESC"] for one in explained] == ["first", "second"]
+
+
+def test_a_java_trace_in_a_container_is_one_entry_with_the_exception_as_a_field(agent):
+    log = Log(agent.directory / "pod.log")
+    log.path.write_text("")
+    agent.formats = Path(__file__).resolve().parents[2] / "formats"
+    agent.follow(log, format="java", unwrap="cri")
+    agent.situation(log=log, when=["field.exception contains 'IllegalState'", "field.stream = 'stderr'"])
+    agent.start()
+    agent.wait_open(log)
+    text = (
+        "2026-11-19 10:00:00.123 ERROR 1 --- [main] c.e.Shop : it broke\n"
+        "java.lang.IllegalStateException: no cart\n\tat c.e.Cart.find(Cart.java:42)\n\t... 38 more\n"
+    )
+    wrapped = "".join(f"2026-11-19T09:00:00.2Z stderr F {one}\n" for one in text.splitlines())
+    # The runtime has cut a line.
+    log.append(wrapped.replace("F \tat c.e.", "P \tat c.e.\n2026-11-19T09:00:00.2Z stderr F "))
+    (event,) = agent.wait_events(1)
+    assert event["row"]["ENTRYDESC"] == "it broke"
+    assert event["row"]["ENTRYSRC"] == "c.e.Shop"
+    assert event["fields"] == {"exception": "java.lang.IllegalStateException", "stream": "stderr"}
+    assert agent.stop() == 0
 
 
 class Writer:
