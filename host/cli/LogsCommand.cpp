@@ -83,6 +83,8 @@ void addLedger(FactList& facts, const Json& ledger) {
     for (const Row& row : rows) {
         facts.add(row.name, JsonText::text(ledger, row.key));
     }
+    const std::string parsed = JsonText::text(ledger, "percent_parsed");
+    facts.add("parsed", parsed.empty() ? "" : parsed + " %");
     if (JsonText::member(ledger, "follow")
             .is_null()) { // where a log is followed, nothing is skipped
         facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
@@ -146,6 +148,14 @@ std::string rejectedText(const Json& ledger, const Terminal& terminal) {
     for (const Json& line : JsonText::member(ledger, "rejected")) {
         table.add({TimeDisplay::local(JsonText::text(line, "time")), JsonText::text(line, "line"),
                    JsonText::text(line, "reason")});
+    }
+    return table.empty() ? "" : '\n' + table.text(terminal);
+}
+
+std::string shapesText(const Json& ledger, const Terminal& terminal) {
+    Table table({{"REJECTED", Table::NUMBER}, {"SHAPE"}});
+    for (const Json& shape : JsonText::member(ledger, "shapes")) {
+        table.add({JsonText::text(shape, "count"), JsonText::text(shape, "shape")});
     }
     return table.empty() ? "" : '\n' + table.text(terminal);
 }
@@ -322,7 +332,8 @@ CliStatus LogsCommand::show(Context& context) {
     addLedger(facts, ledger);
     const Json& follow = JsonText::member(ledger, "follow");
     addFollowing(facts, follow);
-    context.print(facts.text(context.terminal()) + rejectedText(ledger, context.terminal()) +
+    context.print(facts.text(context.terminal()) + shapesText(ledger, context.terminal()) +
+                  rejectedText(ledger, context.terminal()) +
                   skippedText(ledger, context.terminal()) + rangesText(follow, context.terminal()));
     return exitStatus;
 }

@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <cmath>
 #include <memory>
 
 namespace zrm::host {
@@ -74,6 +75,11 @@ void addSamples(LogLedgerView& view, const LogLedger& ledger) {
         view.rejected.push_back(
             {milliseconds(line.time), std::string(line.text, line.length), line.reason});
     }
+    std::array<LineShapes::Shape, LineShapes::mostKept> shapes;
+    const std::size_t shapeCount = ledger.copyShapes(shapes.data());
+    for (std::size_t i = 0; i < shapeCount; ++i) {
+        view.shapes.push_back({std::string(shapes[i].view()), shapes[i].count});
+    }
     std::array<LogLedger::SkippedRange, LogLedger::mostKept> ranges;
     const std::size_t rangeCount = ledger.copySkipped(ranges.data());
     for (std::size_t i = 0; i < rangeCount; ++i) {
@@ -117,11 +123,23 @@ void addReasons(LogLedgerView& view) {
     }
 }
 
+/// The share of lines that matched the format, in percent with one decimal. Rounded down, so that
+/// 100 means all.
+double percentParsed(const LogLedgerView& ledger) {
+    return std::floor(1000.0 * static_cast<double>(ledger.rows) /
+                      static_cast<double>(ledger.lines)) /
+           10;
+}
+
 void writeSamples(JsonWriter& json, const LogLedgerView& ledger) {
     json.key("rejected").beginArray();
     for (const LogLedgerView::Rejected& rejected : ledger.rejected) {
         json.beginObject().key("time").time(rejected.time);
         json.member("line", rejected.line).member("reason", rejected.reason).endObject();
+    }
+    json.endArray().key("shapes").beginArray();
+    for (const LogLedgerView::RejectedShape& shape : ledger.shapes) {
+        json.beginObject().member("shape", shape.shape).member("count", shape.count).endObject();
     }
     json.endArray().key("skipped").beginArray();
     for (const LogLedgerView::Skipped& skipped : ledger.skipped) {
@@ -168,7 +186,9 @@ void LogWarning::write(JsonWriter& json) const {
 void LogLedgers::write(JsonWriter& json, const LogLedgerView& ledger, bool withSamples) {
     json.beginObject().member("bytes_read", ledger.bytesRead);
     json.member("lines", ledger.lines).member("rows", ledger.rows);
-    json.member("format_errors", ledger.formatErrors).member("without_time", ledger.withoutTime);
+    json.member("format_errors", ledger.formatErrors).key("percent_parsed");
+    ledger.lines > 0 ? json.value(percentParsed(ledger)) : json.null();
+    json.member("without_time", ledger.withoutTime);
     json.member("truncations", ledger.truncations).member("skipped_bytes", ledger.skippedBytes);
     json.member("restarts", ledger.restarts).key("last_entry");
     ledger.lastEntry ? json.time(*ledger.lastEntry) : json.null();

@@ -40,6 +40,11 @@ struct LogLedgerView {
         std::string line;
         std::string reason; ///< where and why it does not match
     };
+    /// How often lines of the same shape did not match; see LineShapes.
+    struct RejectedShape {
+        std::string shape;
+        std::int64_t count;
+    };
     /// What the monitor missed because of a truncation.
     struct Skipped {
         std::int64_t time;
@@ -70,6 +75,7 @@ struct LogLedgerView {
 
     // The latest ones, oldest first. Only for a log that was requested by name.
     std::vector<Rejected> rejected;
+    std::vector<RejectedShape> shapes; ///< the most frequent first
     std::vector<Skipped> skipped;
 };
 

@@ -22,11 +22,8 @@ struct Kind {
 };
 
 constexpr Kind kinds[] = {
-    {"json", &JsonFormat::make},
-    {"logfmt", &LogfmtFormat::make},
-    {"regex", &RegexFormat::make},
-    {"syslog", &SyslogFormat::make},
-    {"wtmp", &WtmpFormat::make},
+    {"json", &JsonFormat::make},     {"logfmt", &LogfmtFormat::make}, {"regex", &RegexFormat::make},
+    {"syslog", &SyslogFormat::make}, {"wtmp", &WtmpFormat::make},
 };
 
 /// The format of what the lines hold, whatever is around it.

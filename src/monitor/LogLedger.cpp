@@ -41,6 +41,9 @@ void LogLedger::noteRejected(const char* line, std::string_view reason) noexcept
     std::size_t length = strnlen(line, sizeof RejectedLine::text);
     length -= length > 0 && line[length - 1] == '\n' ? 1 : 0;
     const LockGuard guard(&m_lock);
+    if (length > 0) { // records are not texts
+        m_rejectedShapes.note({line, length});
+    }
     if (RejectedLine* const rejected = m_rejectedLines.next()) {
         rejected->time = wallTime();
         rejected->length = length;
@@ -65,6 +68,11 @@ std::int64_t LogLedger::restarts() const noexcept {
 std::size_t LogLedger::copyRejected(RejectedLine* lines) const noexcept {
     const LockGuard guard(&m_lock);
     return m_rejectedLines.copy(lines);
+}
+
+std::size_t LogLedger::copyShapes(LineShapes::Shape* shapes) const noexcept {
+    const LockGuard guard(&m_lock);
+    return m_rejectedShapes.copy(shapes);
 }
 
 std::size_t LogLedger::copySkipped(SkippedRange* ranges) const noexcept {

@@ -4,6 +4,7 @@
 #include "framework/locks.h"
 #include "monitor/FileIdentity.h"
 #include "monitor/Latest.h"
+#include "monitor/LineShapes.h"
 
 #include <atomic>
 #include <cstddef>
@@ -92,6 +93,9 @@ public:
     std::size_t copyRejected(RejectedLine* lines) const noexcept;
     /// Does the same for the ranges.
     std::size_t copySkipped(SkippedRange* ranges) const noexcept;
+    /// Copies the most frequent shapes of the lines that did not match, the most frequent first, to
+    /// an array of LineShapes::mostKept. Returns their number.
+    std::size_t copyShapes(LineShapes::Shape* shapes) const noexcept;
 
 private:
     std::atomic<std::int64_t> m_bytes{0};
@@ -103,6 +107,7 @@ private:
     mutable SYS1_Lock m_lock; ///< guards the members below
     std::optional<FileIdentity> m_file;
     Latest<RejectedLine, mostKept> m_rejectedLines;
+    LineShapes m_rejectedShapes;
     Latest<SkippedRange, mostKept> m_skippedRanges;
 };
 

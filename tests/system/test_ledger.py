@@ -33,6 +33,7 @@ def test_a_new_ledger_is_empty(serving):
         "lines": 0,
         "rows": 0,
         "format_errors": 0,
+        "percent_parsed": None,
         "without_time": 0,
         "truncations": 0,
         "skipped_bytes": 0,
@@ -41,6 +42,7 @@ def test_a_new_ledger_is_empty(serving):
         "follow": None,
         "warnings": [],
         "rejected": [],
+        "shapes": [],
         "skipped": [],
     }
 
@@ -55,6 +57,8 @@ def test_it_counts_what_is_read_and_says_why_lines_do_not_fit(serving):
         ("none", "A number for %d is expected here."),
         ("", "A line without text is skipped."),
     ]
+    assert ledger["percent_parsed"] == 50.0
+    assert ledger["shapes"] == [{"shape": "a", "count": 1}]
     assert ledger["rejected"][0]["time"].endswith("Z")
     assert ledger["last_entry"] >= ledger["rejected"][0]["time"][:19]
 

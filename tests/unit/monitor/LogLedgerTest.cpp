@@ -207,4 +207,19 @@ TEST_F(MonitoredFile, ALedgerSurvivesARefreshThatRestartsTheMonitor) {
     EXPECT_THAT(rejectedBy(log.ledger()), ElementsAre("bad"));
 }
 
+TEST(LogLedger, CountsTheShapesOfRejectedLinesThatAreNotKept) {
+    LogLedger ledger;
+    for (int i = 0; i < 100; ++i) {
+        ledger.noteRejected(("number " + std::to_string(i) + "\n").c_str());
+    }
+    ledger.noteRejected("- other\n");
+    ledger.noteRejected(""); // a record
+    LineShapes::Shape shapes[LineShapes::mostKept];
+    ASSERT_EQ(ledger.copyShapes(shapes), 2U);
+    EXPECT_EQ(shapes[0].view(), "a 9");
+    EXPECT_EQ(shapes[0].count, 100);
+    EXPECT_EQ(shapes[1].view(), "- a");
+    EXPECT_EQ(shapes[1].count, 1);
+}
+
 } // namespace

@@ -156,6 +156,7 @@ function drawState(element, log, configuration, source) {
     ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`],
     ["Entries", number(ledger.rows ?? row.NUMEVENTS)],
     ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
+    typeof ledger.percent_parsed === "number" && ["Parsed", `${ledger.percent_parsed}%`],
     ["Without a time", number(ledger.without_time)],
     ["Truncations", number(ledger.truncations)],
     !follow && ["Skipped", bytes(ledger.skipped_bytes)],
@@ -198,7 +199,7 @@ function drawUnmonitored(element, log, configuration) {
 }
 
 function drawLedger(element, log) {
-  const { rejected = [], skipped = [], follow } = log.ledger || {};
+  const { rejected = [], shapes = [], skipped = [], follow } = log.ledger || {};
   fill(
     element,
     follow && rangesPanel(follow),
@@ -225,6 +226,21 @@ function drawLedger(element, log) {
             { className: "cards" },
           ),
     ),
+    shapes.length > 0 &&
+      h(
+        "section",
+        { className: "panel flush" },
+        h("h2", {}, "Shapes of rejected lines"),
+        table(
+          "Shapes of rejected lines",
+          [
+            { label: "Lines", className: "number" },
+            { label: "Shape", className: "wide" },
+          ],
+          shapes.map((one) => [number(one.count), h("pre", {}, one.shape)]),
+          { className: "cards" },
+        ),
+      ),
     skipped.length > 0 &&
       h(
         "section",
