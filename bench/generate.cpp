@@ -3,6 +3,7 @@
 //
 //     bench_generate syslog LINES        lines of the system logger, about 110 bytes each
 //     bench_generate user LINES          lines of an application, about 112 bytes each
+//     bench_generate access LINES        lines of a web server, about 200 bytes each
 //     bench_generate accounting RECORDS  login records of 40 bytes
 
 #include <array>
@@ -43,6 +44,14 @@ void writeUserLine(long number, const char* stamp) {
                 fails ? "payment refused" : "payment accepted", number % 97 + 100, number % 8);
 }
 
+void writeAccessLine(long number, const char* stamp) {
+    const bool fails = number % perMatch == perMatch - 1;
+    std::printf("192.0.2.%ld - - [%s] \"GET /shop/item/%07ld?from=list HTTP/1.1\" %d %ld "
+                "\"https://www.example.org/shop\" \"Mozilla/5.0 (X11; Linux x86_64; rv:132.0) "
+                "Gecko/20100101 Firefox/132.0\"\n",
+                number % 250, stamp, number, fails ? 503 : 200, number % 40000);
+}
+
 /// The agent's layout: user, id, line, pid, type, termination, exit, time.
 void writeRecord(long number, std::time_t now) {
     struct {
@@ -70,6 +79,7 @@ struct Kind {
 constexpr Kind kinds[] = {
     {"syslog", "%b %e %H:%M:%S", writeSyslogLine},
     {"user", "%Y-%m-%d %H:%M:%S", writeUserLine},
+    {"access", "%d/%b/%Y:%H:%M:%S %z", writeAccessLine},
     {"accounting", nullptr, nullptr},
 };
 
@@ -100,6 +110,6 @@ int main(int argc, char** argv) {
             return std::fflush(stdout) == 0 ? 0 : 1;
         }
     }
-    std::fputs("usage: bench_generate syslog|user|accounting COUNT\n", stderr);
+    std::fputs("usage: bench_generate syslog|user|access|accounting COUNT\n", stderr);
     return 2;
 }

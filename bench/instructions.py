@@ -31,6 +31,7 @@ JUDGES = {
     "syslog": cases.NEVER["when"],
     "text": ["ENTRYTYPE = 'ERROR'", "ENTRYDESC contains 'no such words'"],
     "accounting": cases.ACCOUNTING_NEVER["when"],
+    "status": ["field.status >= 500"],
     "field": ["field.tag = 'sshd'"],
 }
 
@@ -60,6 +61,14 @@ def text(number, seconds):
     return f"{stamp} INFO {numbered(number)}, attempt 1, queue main\n".encode()
 
 
+def access(number, seconds):
+    return (
+        b'192.0.2.%d - - [%s +0100] "GET /shop/item/%07d?from=list HTTP/1.1" 200 %d "https://www.example.org/shop" '
+        b'"Mozilla/5.0 (X11; Linux x86_64; rv:132.0) Gecko/20100101 Firefox/132.0"\n'
+        % (number % 250, time.strftime("%d/%b/%Y:%H:%M:%S", seconds).encode(), number, number % 40000)
+    )
+
+
 def accounting(number, seconds):
     user, line = b"user%d" % (number % 100), b"pts/%d" % (number % 40)
     numbers = 1000 + number % 30000, 7 + number % 2, 0, 0
@@ -79,6 +88,7 @@ CASES = [
     ("`[[log]]`: syslog, RFC 5424", rfc5424, 1000, "syslog", None, 'type = "syslog"'),
     ("`[[log]]`: text", text, 1000, "text", None, USER_TABLE),
     ("`[[log]]`: text, `entry.starts`", text, 1000, "text", None, USER_TABLE + "\nentry.starts = '^\\d{4}-'"),
+    ("`[[log]]`: nginx-access, a condition on a field", access, 1000, "status", None, 'format = "nginx-access"'),
     ("`[[log]]`: accounting", accounting, 1000, "accounting", None, 'type = "accounting"'),
 ]  # fmt: skip
 

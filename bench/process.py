@@ -10,6 +10,7 @@ import threading
 import time
 from pathlib import Path
 
+FORMATS = Path(__file__).resolve().parent.parent / "formats"
 LIMIT = 300  # seconds that any wait may take
 
 
@@ -47,7 +48,7 @@ class AgentProcess:
             text += f"max_rows = {max_rows}\n"
         text += f'[http]\nlisten = "{"127.0.0.1:0" if http else ""}"\n'
         text += f"[history]\nenabled = {'true' if history else 'false'}\n"
-        text += f'[[sink]]\ntype = "jsonl"\npath = "{sink}"\n{followed}'
+        text += f'[[sink]]\ntype = "jsonl"\npath = "{sink}"\n[formats]\ndirectory = "{FORMATS}"\n{followed}'
         for situation in situations:
             keys = {"text": "benchmark", "severity": "info", **situation}
             text += "[[situation]]\n"
