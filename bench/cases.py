@@ -24,7 +24,7 @@ USER_FORMAT = (
 )
 KIND_LINE = {"syslog": ";N ;S", "user": USER_FORMAT, "accounting": ";N ;A"}
 # The keys of the [[log]] table of kinds that have no line in the log configuration.
-KIND_TABLE = {"access": 'format = "nginx-access"'}
+KIND_TABLE = {"access": 'format = "nginx-access"', "json": 'type = "json"'}
 FIELD_ONE_PERCENT = {"when": ["field.status >= 500"]}
 SOURCES = ["app", "cron", "nginx", "kernel", "sshd"]
 
@@ -61,6 +61,7 @@ THROUGHPUT = [
     ("syslog, 100 situations, 20 search each line", "syslog", lambda log, _: searching(log), 0, None),
     ("syslog, 99 of 100 on other logs", "syslog", others, 0, 4e6),
     ("[[log]]: nginx-access, a condition on a field, 1% match", "access", lambda log, _: situations(1, log, FIELD_ONE_PERCENT), 0.01, 1e6),
+    ("[[log]]: JSON, 12 fields, a condition on a field, 1% match", "json", lambda log, _: situations(1, log, FIELD_ONE_PERCENT), 0.01, 1.5e6),
     ("accounting, 1 situation, none match", "accounting", lambda log, _: situations(1, log, ACCOUNTING_NEVER), 0, 8e6),
 ]  # fmt: skip
 

@@ -52,6 +52,8 @@ def initial_line(kind):
         return bytes(40)
     if kind == "access":
         return b'192.0.2.1 - - [01/Jan/2026:00:00:00 +0000] "GET / HTTP/1.1" 200 1 "-" "before the start"\n'
+    if kind == "json":
+        return b'{"msg":"before the start"}\n'
     if kind == "user":
         return b"2026-01-01 00:00:00 INFO before the start\n"
     return b"Jan  1 00:00:00 web1 old: before the start\n"

@@ -4,6 +4,7 @@
 //     bench_generate syslog LINES        lines of the system logger, about 110 bytes each
 //     bench_generate user LINES          lines of an application, about 112 bytes each
 //     bench_generate access LINES        lines of a web server, about 200 bytes each
+//     bench_generate json LINES          JSON objects of 12 fields, about 300 bytes each
 //     bench_generate accounting RECORDS  login records of 40 bytes
 
 #include <array>
@@ -52,6 +53,17 @@ void writeAccessLine(long number, const char* stamp) {
                 number % 250, stamp, number, fails ? 503 : 200, number % 40000);
 }
 
+void writeJsonLine(long number, const char* stamp) {
+    const bool fails = number % perMatch == perMatch - 1;
+    std::printf(
+        "{\"ts\":\"%s.%03ldZ\",\"level\":\"%s\",\"logger\":\"http.server\",\"msg\":\"request "
+        "completed and answer sent\",\"method\":\"GET\",\"path\":\"/api/v1/orders/%07ld/items\","
+        "\"status\":%d,\"bytes\":%ld,\"duration\":0.0%04ld,\"remote\":\"192.0.2.%ld\",\"request\":"
+        "\"5f2a8f4e-9f2b-4a4e-b6c6-%012ld\",\"http\":{\"version\":1.1}}\n",
+        stamp, number % perSecond, fails ? "error" : "info", number, fails ? 503 : 200,
+        number % 40000, number % 9973, number % 250, number);
+}
+
 /// The agent's layout: user, id, line, pid, type, termination, exit, time.
 void writeRecord(long number, std::time_t now) {
     struct {
@@ -80,6 +92,7 @@ constexpr Kind kinds[] = {
     {"syslog", "%b %e %H:%M:%S", writeSyslogLine},
     {"user", "%Y-%m-%d %H:%M:%S", writeUserLine},
     {"access", "%d/%b/%Y:%H:%M:%S %z", writeAccessLine},
+    {"json", "%Y-%m-%dT%H:%M:%S", writeJsonLine},
     {"accounting", nullptr, nullptr},
 };
 
@@ -110,6 +123,6 @@ int main(int argc, char** argv) {
             return std::fflush(stdout) == 0 ? 0 : 1;
         }
     }
-    std::fputs("usage: bench_generate syslog|user|access|accounting COUNT\n", stderr);
+    std::fputs("usage: bench_generate syslog|user|access|json|accounting COUNT\n", stderr);
     return 2;
 }

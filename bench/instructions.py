@@ -33,6 +33,7 @@ JUDGES = {
     "accounting": cases.ACCOUNTING_NEVER["when"],
     "status": ["field.status >= 500"],
     "field": ["field.tag = 'sshd'"],
+    "type": ["ENTRYTYPE = 'error'", "ENTRYDESC contains 'no such words'"],
 }
 
 
@@ -69,6 +70,23 @@ def access(number, seconds):
     )
 
 
+def json_object(number, seconds):
+    return (
+        b'{"ts":"%s.%03dZ","level":"info","logger":"http.server","msg":"request completed and answer sent",'
+        b'"method":"GET","path":"/api/v1/orders/%07d/items","status":200,"bytes":%d,"duration":0.0%04d,'
+        b'"remote":"192.0.2.%d","request":"5f2a8f4e-9f2b-4a4e-b6c6-%012d","http":{"version":1.1}}\n'
+        % (
+            time.strftime("%Y-%m-%dT%H:%M:%S", seconds).encode(),
+            number % 1000,
+            number,
+            number % 40000,
+            number % 9973,
+            number % 250,
+            number,
+        )
+    )
+
+
 def accounting(number, seconds):
     user, line = b"user%d" % (number % 100), b"pts/%d" % (number % 40)
     numbers = 1000 + number % 30000, 7 + number % 2, 0, 0
@@ -90,6 +108,8 @@ CASES = [
     ("`[[log]]`: text, `entry.starts`", text, 1000, "text", None, USER_TABLE + "\nentry.starts = '^\\d{4}-'"),
     ("`[[log]]`: nginx-access, a condition on a field", access, 1000, "status", None, 'format = "nginx-access"'),
     ("`[[log]]`: accounting", accounting, 1000, "accounting", None, 'type = "accounting"'),
+    ("`[[log]]`: JSON", json_object, 1000, "type", None, 'type = "json"'),
+    ("`[[log]]`: JSON, a condition on a field", json_object, 1000, "status", None, 'type = "json"'),
 ]  # fmt: skip
 
 
