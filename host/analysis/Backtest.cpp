@@ -9,6 +9,7 @@
 #include "logs/RequestThresholds.h"
 #include "logtypes/EntryReader.h"
 #include "logtypes/FollowedReport.h"
+#include "logtypes/SourceReport.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
 
@@ -131,7 +132,10 @@ Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::str
     m_matched.clear();
     for (LogFile* const log : logs) {
         const auto entries = log->followSettings() ? EntryReader::of(*log) : nullptr;
-        if (entries) {
+        if (log->isSource()) {
+            SourceReport report(*log, {from, to});
+            judge(*log, report, limits, result);
+        } else if (entries) {
             readFollowed(*log, *entries, from, to, limits, result);
         } else {
             read(*log, from, to, limits, result);
@@ -198,14 +202,19 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
 void Backtest::readFollowed(const LogFile& log, EntryReader& entries, const std::string& from,
                             const std::string& to, Limits& limits, Result& result) {
     TraceScope trace(anchor);
+    const auto& settings = log.followSettings();
+    FollowedReport report(log.fileNameLocal(), entries,
+                          {from, to, 1, settings->rotatedTo, settings->join.value});
+    judge(log, report, limits, result);
+}
+
+template <typename Report>
+void Backtest::judge(const LogFile& log, Report& report, Limits& limits, Result& result) {
     RequestLimit* const outer = RequestLimit::current();
     const RequestLimit limit(limits.deadline, [&] {
         return limits.isTimeUp() || (outer != nullptr && outer->isReached());
     });
-    const auto& settings = log.followSettings();
-    FollowedReport report(log.fileNameLocal(), entries,
-                          {from, to, 1, settings->rotatedTo, settings->join.value});
-    Entries judged(*this, settings, limits, result);
+    Entries judged(*this, log.followSettings(), limits, result);
     const std::size_t first = m_matched.size();
     report.run(judged);
     judged.end();

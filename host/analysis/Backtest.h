@@ -69,6 +69,9 @@ private:
 
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
               Result& result);
+    /// Judges the entries of a report.
+    template <typename Report>
+    void judge(const LogFile& log, Report& report, Limits& limits, Result& result);
     void readFollowed(const LogFile& log, EntryReader& entries, const std::string& from,
                       const std::string& to, Limits& limits, Result& result);
     void add(const char* time, std::optional<std::int64_t> instant);

@@ -7,6 +7,7 @@
 #include "host/framework/TraceCapture.h"
 #include "logs/FollowSettings.h"
 #include "logtypes/EntryReader.h"
+#include "logtypes/SourceReport.h"
 #include "monitor/LogFile.h"
 #include "monitor/ReportOutcome.h"
 
@@ -20,6 +21,7 @@ namespace zrm::host {
 namespace {
 
 constexpr const char* wasEnded = "the report was ended: it took too long, or the agent is stopping";
+constexpr const char* enoughFound = "the report has found as many entries as it may";
 /// A refresh waits for a sample.
 constexpr std::chrono::seconds sampleLimit{32};
 
@@ -55,7 +57,17 @@ std::string reasonOf(const FollowedReport& report) {
             return "not all of " + file.path + " was read: " + file.problem;
         }
     }
-    return report.isLimited() ? "the report has found as many entries as it may" : "";
+    return report.isLimited() ? enoughFound : "";
+}
+
+std::string reasonOf(const SourceReport& report) {
+    if (report.isCancelled()) {
+        return wasEnded;
+    }
+    if (!report.problem().empty()) {
+        return report.problem();
+    }
+    return report.isLimited() ? enoughFound : "";
 }
 
 std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entries) {
@@ -66,7 +78,11 @@ std::unique_ptr<LogReport> LogReport::open(ReportQuery query, TableManager& entr
         return nullptr;
     }
     std::unique_ptr<LogReport> report(new LogReport(std::move(query), entries));
-    if (log->followSettings() != nullptr) {
+    if (log->isSource()) {
+        report->m_source = std::make_unique<SourceReport>(
+            *log, FollowedReport::Options{report->m_query.from, report->m_query.to,
+                                          report->m_query.limit});
+    } else if (log->followSettings() != nullptr) {
         report->m_path = log->fileNameLocal();
         report->m_settings = log->followSettings();
         report->m_reader = EntryReader::of(*log);
@@ -80,7 +96,21 @@ LogReport::LogReport(ReportQuery query, TableManager& entries)
 LogReport::~LogReport() = default;
 
 LogReport::Result LogReport::run(Receiver& receiver) {
+    if (m_source != nullptr) {
+        return runSource(receiver);
+    }
     return m_reader != nullptr ? runFollowed(receiver) : runSample(receiver);
+}
+
+LogReport::Result LogReport::runSource(Receiver& receiver) {
+    const TraceSilence silence; // a line that does not fit is counted, not traced
+    FilteredRows rows(m_filter, receiver);
+    m_source->run(rows);
+    return {rows.count,
+            m_source->isLimited(),
+            {m_source->reached(), reasonOf(*m_source)},
+            m_source->skipped(),
+            {}};
 }
 
 LogReport::Result LogReport::runFollowed(Receiver& receiver) {
@@ -122,7 +152,7 @@ LogReport::Result LogReport::runSample(Receiver& receiver) const {
     } else if (!outcome.isComplete()) {
         result.reach.reason = outcome.reason();
     } else if (result.isTruncated) {
-        result.reach.reason = "the report has found as many entries as it may";
+        result.reach.reason = enoughFound;
     }
     return result;
 }

@@ -16,6 +16,7 @@ class TableManager;
 
 namespace zrm {
 class EntryReader;
+class SourceReport;
 struct FollowSettings;
 } // namespace zrm
 
@@ -33,10 +34,11 @@ struct ReportQuery {
 
 /// Why a report did not read all that was asked for, as a clause; empty if it did.
 std::string reasonOf(const FollowedReport& report);
+std::string reasonOf(const SourceReport& report);
 
-/// One report on a monitored log. A followed log is read over all its generations, apart from its
-/// monitor: no refresh waits for that. A log of the log configuration is read by a sample of Log
-/// Entries, as it always is. One thread at a time.
+/// One report on a monitored log. A followed log is read over all its generations, or backwards
+/// from its source, apart from its monitor: no refresh waits for that. A log of the log
+/// configuration is read by a sample of Log Entries, as it always is. One thread at a time.
 class LogReport {
 public:
     class Receiver {
@@ -76,10 +78,12 @@ protected:
 
 private:
     Result runFollowed(Receiver& receiver);
+    Result runSource(Receiver& receiver);
     Result runSample(Receiver& receiver) const;
 
     const ReportQuery m_query;
     EntryFilter m_filter;
+    std::unique_ptr<SourceReport> m_source; ///< of a log that is not a file
     // Of a followed log.
     std::unique_ptr<EntryReader> m_reader; ///< null: the log is not followed
     std::string m_path;                    ///< in the local code page

@@ -128,6 +128,9 @@ LogTail::LogTail(LogFile& log) : m_log(log), m_clock(log.followSettings()) {}
 
 bool LogTail::hasLines() const noexcept {
     const auto& settings = m_log.followSettings();
+    if (m_log.isSource()) {
+        return false;
+    }
     return m_log.type() == 'U' || m_log.type() == 'S' ||
            (settings && settings->format && recordLength() == 0);
 }
@@ -141,6 +144,13 @@ std::size_t LogTail::recordLength() const noexcept {
 Result<void> LogTail::read(const Entry& entry) {
     TraceScope trace(anchor);
     m_reach = {};
+    if (m_log.isSource()) {
+        const Problem problem{"the entries of a log that is not a file cannot be explained one by "
+                              "one",
+                              "ask for a backtest of the situation, or for a report on the log"};
+        m_reach.reason = problem.what;
+        return tl::unexpected(problem);
+    }
     if (m_log.type() == errorLog) {
         entries(entry);
         return {};

@@ -9,6 +9,7 @@
 #include "host/config/FieldWarnings.h"
 #include "host/config/OwnFiles.h"
 #include "host/diagnose/ConfigCheck.h"
+#include "host/sources/JournalFiles.h"
 #include "host/sources/LogFinder.h"
 
 #include <algorithm>
@@ -114,6 +115,33 @@ Json tablesJson(const std::vector<FoundLogs::Source>& tables) {
     }));
 }
 
+/// What a table of type "journal" finds, or the command of another table without files.
+std::string textOf(const LogConfig& log, const Terminal& terminal) {
+    const std::string name = "  " + DisplayText::visible(log.name);
+    if (!log.journal) {
+        return name + "  runs " + DisplayText::visible(log.command->arguments.front()) + '\n';
+    }
+    const JournalFiles found = JournalFiles::look(log.journal->directory);
+    if (!found.isReadable()) {
+        return name + "  " + terminal.coloured(DisplayText::visible(found.problem()), Colour::BAD) +
+               '\n';
+    }
+    constexpr std::int64_t megabyte = 1024 * 1024;
+    std::int64_t bytes = 0;
+    std::size_t readable = 0;
+    std::string unreadable;
+    for (const JournalFiles::File& file : found.files) {
+        bytes += file.problem.empty() ? file.size : 0;
+        readable += file.problem.empty() ? 1 : 0;
+        if (!file.problem.empty()) {
+            unreadable += "  " + terminal.coloured("cannot be read", Colour::BAD) + "  " +
+                          DisplayText::visible(file.path + ": " + file.problem) + '\n';
+        }
+    }
+    return name + "  " + std::to_string(readable) + " of " + std::to_string(found.files.size()) +
+           " files can be read, " + std::to_string(bytes / megabyte) + " MiB\n" + unreadable;
+}
+
 /// A table of the configuration: its files and what is passed over.
 std::string textOf(const FoundLogs::Source& source, const Terminal& terminal) {
     std::string text = "[[log]] at line " + std::to_string(source.line) + ": " +
@@ -199,8 +227,15 @@ CliStatus CheckCommand::checkHost(Context& context) const {
     }
     if (problems.empty()) {
         std::string text = DisplayText::visible(m_host) + " can be used\n";
-        for (const FoundLogs::Source& source : find(*result)) {
-            text += textOf(source, context.terminal());
+        const std::vector<FoundLogs::Source> sources = find(*result);
+        for (std::size_t index = 0; index < sources.size(); ++index) {
+            const LogConfig& log = result->logs[index];
+            if (log.isSource()) {
+                text += "[[log]] at line " + std::to_string(log.line) + ": " + log.type + '\n' +
+                        textOf(log, context.terminal());
+            } else {
+                text += textOf(sources[index], context.terminal());
+            }
         }
         context.print(text);
     }

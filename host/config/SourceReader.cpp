@@ -127,15 +127,13 @@ CommandConfig readCommand(ConfigSection& section) {
     return config;
 }
 
-/// What the log is called if the table does not say.
-std::string nameOf(const CommandConfig& config) {
+/// What the log is called if the table does not say: the program, or the first word for the shell.
+std::string nameOf(const CommandConfig& config, bool isShell) {
     if (config.arguments.empty()) {
         return command;
     }
-    std::string_view name = config.arguments.size() == 3 && config.arguments[1] == "-c"
-                                ? config.arguments[2]
-                                : config.arguments[0];
-    name = name.substr(0, name.find_first_of(" \t"));
+    std::string_view name = isShell ? config.arguments.back() : config.arguments.front();
+    name = name.substr(0, isShell ? name.find_first_of(" \t") : name.npos);
     name.remove_prefix(name.rfind('/') == name.npos ? 0 : name.rfind('/') + 1);
     std::string usable(name.substr(0, longestSourceName));
     std::replace_if(
@@ -149,7 +147,8 @@ std::string nameOf(const CommandConfig& config) {
 
 void readName(ConfigSection& section, LogConfig& log) {
     const std::optional<std::string> name = section.text("name");
-    log.name = name.value_or(log.command ? nameOf(*log.command) : std::string(journal));
+    log.name = name.value_or(log.command ? nameOf(*log.command, section.isText(command))
+                                         : std::string(journal));
     if (!isSourceName(log.name)) {
         section.problem("name", "'" + log.name + "' is not the name of a log",
                         "write 1 to " + std::to_string(longestSourceName) +

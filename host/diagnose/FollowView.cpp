@@ -39,6 +39,7 @@ FollowView FollowView::of(const FollowLedger& ledger) {
     if (const std::optional<FollowLedger::Failure> failure = ledger.failure()) {
         const ErrorText error(failure->number);
         const std::string file = failure->file.empty() ? "" : " of " + failure->file;
+        view.isSource = !failure->text.empty();
         view.problem = !failure->text.empty()
                            ? failure->text
                            : failure->call + file + " failed and is tried again: " + error.text();

@@ -30,6 +30,7 @@ struct FollowView {
     /// "waiting", "reading", "finishing", "missing" or "not a file".
     std::string state;
     std::string problem;    ///< what fails at present and is tried again; empty if nothing does
+    bool isSource = false;  ///< the log is not a file
     std::string generation; ///< the name that the file had when it was opened; empty: no file
     std::int64_t generations = 0; ///< files that were read, the present one included
     std::int64_t position = 0;    ///< where the next entry begins

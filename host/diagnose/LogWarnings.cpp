@@ -86,7 +86,7 @@ std::optional<LogWarning> ofFollowing(const FollowView& follow) {
     }
     return LogWarning{"failing", 0,
                       "The log cannot be read at present: " + follow.problem +
-                          ". Check the file's permissions and the disk."};
+                          (follow.isSource ? "." : ". Check the file's permissions and the disk.")};
 }
 
 /// A time as the operator's clock shows it, with its difference from UTC.
@@ -108,6 +108,10 @@ std::optional<LogWarning> ofLosses(const FollowView& follow) {
         return std::nullopt;
     }
     const FollowView::Range& last = follow.lost.back();
+    if (!last.text.empty()) {
+        return LogWarning{"lost", 0,
+                          last.text + " This was noticed at " + localTime(last.time) + '.'};
+    }
     const std::string what =
         last.from == last.to
             ? "What followed byte " + std::to_string(last.from) + " was"

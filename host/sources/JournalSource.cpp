@@ -6,6 +6,7 @@
 #include "host/sources/JournalFiles.h"
 #include "host/sources/JournalReading.h"
 
+#include <algorithm>
 #include <utility>
 
 namespace zrm::host {
@@ -19,7 +20,7 @@ public:
         : m_directory(config.directory), m_journal(config) {}
 
     bool begin(std::int64_t newest) override {
-        m_newest = newest;
+        m_newest = std::max<std::int64_t>(newest, 0); // nothing is older
         m_problem = JournalFiles::look(m_directory).problem();
         if (!m_problem.empty()) {
             return false;
@@ -27,7 +28,7 @@ public:
         int outcome = m_journal.open();
         // Behind the last entry of that time: the library goes on from there.
         outcome =
-            outcome < 0 ? outcome : m_journal.seekTime(static_cast<std::uint64_t>(newest) + 1);
+            outcome < 0 ? outcome : m_journal.seekTime(static_cast<std::uint64_t>(m_newest) + 1);
         return check(outcome);
     }
     char* previous() override {

@@ -23,6 +23,8 @@ ZoneTime::UtcTimes utcOf(const char* stamp) {
     return ZoneTime::utcTimes(ZoneTime::ofStamp(stamp).seconds(), {});
 }
 
+const std::string noPast = "what a command has printed cannot be read again";
+
 } // namespace
 
 struct SourceReport::Log : SourceLogFile {
@@ -31,10 +33,6 @@ struct SourceReport::Log : SourceLogFile {
                                             log.followSettings()}),
                         Unmonitored{}) {}
 };
-
-bool SourceReport::isPossible(const LogFile& log) {
-    return log.isSource() && log.followSettings()->source->past() != nullptr;
-}
 
 std::int64_t SourceReport::latestOf(const char* stamp) {
     return (utcOf(stamp).second + 1) * second - 1;
@@ -51,35 +49,32 @@ SourceReport::SourceReport(const LogFile& log, FollowedReport::Options options)
 SourceReport::~SourceReport() = default;
 
 const std::string& SourceReport::problem() const noexcept {
-    return m_past->problem();
+    return m_past ? m_past->problem() : noPast;
 }
 
 void SourceReport::run(FollowedReport::Receiver& receiver) {
     const std::int64_t newest = latestOf(m_options.to.c_str());
     const std::int64_t oldest = earliestOf(m_options.from.c_str());
-    if (!m_past->begin(newest)) {
+    if (!m_past || !m_past->begin(newest)) {
         return;
     }
-    const std::int64_t from = std::min(newest, latestOf(m_options.from.c_str()));
+    receiver.begin(false);
     SourceEntry current(*m_past, m_log->followSettings()->keep);
     const LogEntry::Offer offer(current);
     EntryStamp stamp(m_log->followSettings());
     zrm_rmlogent_data_t row{};
     std::int64_t first = newest; ///< the time of the newest entry
     for (unsigned entries = 0; m_given < m_options.limit; ++entries) {
-        if (entries % entriesPerLook == 0) {
-            if (CTX1_IsCancelled() != 0) {
-                m_isCancelled = true;
-                return;
-            }
-            receiver.progress((first - std::min(m_past->time(), first)) / second,
-                              std::max<std::int64_t>(first - from, second) / second);
+        if (entries % entriesPerLook == 0 && CTX1_IsCancelled()) {
+            m_isCancelled = true;
+            return;
         }
         if (m_past->previous() == nullptr || m_past->time() < oldest) {
             return;
         }
-        if (entries == 0) {
-            first = m_past->time();
+        first = entries == 0 ? m_past->time() : first;
+        if (entries % entriesPerLook == 0) {
+            receiver.progress((first - m_past->time()) / second, 1 + (first - oldest) / second);
         }
         current.begin();
         if (!m_log->makeRow(*m_past, stamp, row)) {

@@ -17,8 +17,6 @@ class LogFile;
 /// thread; ends when its request does (CTX1_IsCancelled).
 class SourceReport {
 public:
-    /// Whether the log has a past that can be read.
-    static bool isPossible(const LogFile& log);
     /// The end of the second of a time stamp, in microseconds since 1970-01-01 UTC; of a time that
     /// occurs twice, the second one.
     static std::int64_t latestOf(const char* stamp);
@@ -45,8 +43,8 @@ public:
 private:
     struct Log;
 
-    const std::unique_ptr<Log> m_log; ///< makes the rows; has no thread
-    const std::unique_ptr<EntrySource::Past> m_past;
+    const std::unique_ptr<Log> m_log;                ///< makes the rows; has no thread
+    const std::unique_ptr<EntrySource::Past> m_past; ///< null: the source has none
     const FollowedReport::Options m_options;
     std::size_t m_given = 0;
     std::uint64_t m_skipped = 0;

@@ -42,6 +42,7 @@ def test_install_run_upgrade_remove_purge(installed, service):
     assert account.pw_shell == "/usr/sbin/nologin"
     assert account.pw_uid < 1000
     assert "zrm" in grp.getgrnam("adm").gr_mem
+    assert "zrm" in grp.getgrnam("systemd-journal").gr_mem
     state = STATE.stat()
     assert (state.st_uid, state.st_gid, stat.S_IMODE(state.st_mode)) == (
         account.pw_uid,

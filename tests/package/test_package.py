@@ -107,7 +107,7 @@ def test_the_unit_is_what_systemd_takes(root, tmp_path):
     for line in (
         "Type=notify",
         "User=zrm",
-        "SupplementaryGroups=adm",
+        "SupplementaryGroups=adm systemd-journal",
         "StateDirectory=zrm",
         "ExecReload=/bin/kill -HUP $MAINPID",
         "Restart=always",

@@ -1,7 +1,9 @@
 """Logs of type "journal": each entry once, through rotations, removed files, stops and kills."""
 
+import json
 import os
 import random
+import sqlite3
 import subprocess
 import time
 from signal import SIGKILL
@@ -11,6 +13,8 @@ from api import Api
 from conftest import descriptions, syslog_line, wait_until
 from journal import Journal
 from test_ledger import ledger_of
+
+import zrmctl
 
 SEED = int(os.environ.get("ZRM_SEED", str(random.randrange(1 << 30))))
 
@@ -83,8 +87,7 @@ def test_thresholds_count_entries_from_before_a_stop(reader):
     reader.start()
     reader.journal.time = int(time.time() * 1_000_000)
     reader.journal.write("1", "2")
-    reader.listen = ""
-    position = f"SELECT cursor FROM log_positions WHERE log = 'journal'"
+    position = "SELECT cursor FROM log_positions WHERE log = 'journal'"
     first = wait_until(lambda: query(reader, position), "a position")
     wait_until(lambda: query(reader, position) != first or stored_time(reader) >= reader.journal.time, "two entries")
     assert reader.stop() == 0
@@ -95,8 +98,6 @@ def test_thresholds_count_entries_from_before_a_stop(reader):
 
 
 def query(agent, sql):
-    import sqlite3
-
     try:
         with sqlite3.connect(f"file:{agent.directory}/state/history.db?mode=ro", uri=True) as connection:
             return connection.execute(sql).fetchall()
@@ -180,7 +181,7 @@ def test_an_agent_that_is_killed_raises_each_event_once_and_in_order(reader):
         reader.wait_end()
         work(dice.randrange(0, 2))
     work(1)
-    reader.start(wait=False)
+    reader.start()
     events = reader.wait_events(last)
     assert reader.stop() == 0
     found = [int(text) for text in descriptions(reader.events())]
@@ -231,3 +232,48 @@ def test_it_reads_what_a_running_journal_daemon_writes(agent):
     assert descriptions(agent.wait_events(2)) == ["from the daemon", "after a rotation"]
     agent.send(15)
     agent.wait_end()
+
+
+@pytest.fixture
+def reporting(reader):
+    """An agent with a journal of forty entries of four seconds."""
+    reader.listen = "127.0.0.1:0"
+    reader.situations[0]["when"] = ["field.NUMBER >= 38"]
+    for number in range(40):
+        reader.journal.write(f"entry {number}", NUMBER=number)
+    reader.start()
+    reader.api = Api(reader)
+    return reader
+
+
+def test_reports_read_the_journal_backwards(reporting):
+    body = {"log": "journal", "from": "2020-01-01", "where": ["field.NUMBER >= 10"], "limit": 5}
+    status, _, answer = reporting.api.request("POST", "/api/v1/reports", body)
+    assert status == 200, answer
+    assert [row["ENTRYDESC"] for row in answer["rows"]] == [f"entry {number}" for number in (39, 38, 37, 36, 35)]
+    assert (answer["truncated"], answer["complete"]) == (True, False)
+    older = {"log": "journal", "from": "2020-01-01", "to": answer["rows"][-1]["ENTRYTIME"], "limit": 1000}
+    status, _, answer = reporting.api.request("POST", "/api/v1/reports", older)
+    numbers = [int(row["ENTRYDESC"].split()[1]) for row in answer["rows"]]
+    assert numbers[-1] == 0 and numbers == sorted(numbers, reverse=True) and 35 <= numbers[0] < 40
+    assert (answer["truncated"], answer["complete"]) == (False, True)
+
+
+def test_a_situation_on_the_journal_is_tested_on_its_past_and_not_explained(reporting):
+    body = {"situation": "every-entry", "from": "2020-01-01", "to": "2090-01-01"}
+    status, _, answer = reporting.api.request("POST", "/api/v1/backtest", body)
+    assert status == 200, answer
+    assert (answer["entries"], answer["matched"]) == (40, 2), answer
+    status, _, answer = reporting.api.request(
+        "POST", "/api/v1/explain", {"situation": "every-entry", "log": "journal", "last": 3}
+    )
+    assert status >= 400 and "cannot be explained one by one" in json.dumps(answer)
+
+
+def test_check_says_how_much_of_a_journal_can_be_read(reader):
+    reader.journal.write("one")
+    (reader.journal.directory / "bad.journal").write_bytes(b"x" * 1000)
+    reader._write_toml()
+    output = zrmctl.run(["check", "--host", str(reader.zrm_toml)])[1]
+    assert "journal  1 of 2 files can be read, 8 MiB\n" in output
+    assert "bad.journal: it is damaged\n" in output
