@@ -1,11 +1,32 @@
 #include "host/api/SituationBody.h"
 
+#include "host/config/SourceConfig.h"
 #include "host/http/JsonFields.h"
 #include "host/http/RequestRefused.h"
+#include "logs/FurtherLogs.h"
 
+#include <algorithm>
 #include <optional>
 
 namespace zrm::host {
+
+namespace {
+
+/// A name that no log has would be a situation that is never raised.
+void checkLog(const JsonFields& fields, const std::string& log) {
+    const auto logs = FurtherLogs::published();
+    const bool isKnown =
+        logs != nullptr && std::any_of(logs->begin(), logs->end(),
+                                       [&log](const FurtherLog& one) { return one.name == log; });
+    if (isSourceName(log) && !isKnown) {
+        throw RequestRefused(
+            400, {"'" + log + "' is not the absolute path of a file, and no log has this name",
+                  "begin a path with '/', or name a log of type journal or command",
+                  fields.place("log")});
+    }
+}
+
+} // namespace
 
 SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
     SituationText text;
@@ -23,6 +44,9 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
         text.context = fields.number("context", 0, SituationValidator::mostContext);
     }
     fields.refuseUnknown();
+    if (text.log) {
+        checkLog(fields, *text.log);
+    }
     return text;
 }
 

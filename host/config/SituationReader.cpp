@@ -81,9 +81,10 @@ SituationConfig SituationReader::read(const toml::table& table) {
 void SituationReader::checkLog(ConfigSection& section, const std::string& log) {
     if (std::none_of(m_logs.begin(), m_logs.end(),
                      [&log](const LogConfig& one) { return one.name == log; })) {
-        section.problem("log", "'" + log + "' is neither an absolute path nor the name of a log",
-                        "begin a path with '/', or name a [[log]] that is not a file, such as "
-                        "\"journal\"");
+        section.problem(
+            "log", "'" + log + "' is not the absolute path of a file, and no log has this name",
+            "begin a path with '/', or name a [[log]] that is not a file, such as "
+            "\"journal\"");
     }
 }
 

@@ -2,6 +2,7 @@
 
 #include "base/EntryFields.h"
 #include "framework/LogEntry.h"
+#include "host/sources/MapFaults.h"
 #include "logs/ZoneTime.h"
 
 #include <algorithm>
@@ -59,11 +60,13 @@ Journal::~Journal() {
 }
 
 void Journal::close() noexcept {
+    const MapFaults tolerated;
     sd_journal_close(m_journal);
     m_journal = nullptr;
 }
 
 int Journal::open() {
+    const MapFaults tolerated;
     close();
     const int outcome = m_config.directory.empty()
                             ? sd_journal_open(&m_journal, SD_JOURNAL_LOCAL_ONLY)
@@ -114,22 +117,27 @@ void Journal::addMatches() {
 }
 
 int Journal::seekHead() {
+    const MapFaults tolerated;
     return sd_journal_seek_head(m_journal);
 }
 
 int Journal::seekTail() {
+    const MapFaults tolerated;
     return sd_journal_seek_tail(m_journal);
 }
 
 int Journal::seekTime(std::uint64_t microseconds) {
+    const MapFaults tolerated;
     return sd_journal_seek_realtime_usec(m_journal, microseconds);
 }
 
 int Journal::seekCursor(const std::string& cursor) {
+    const MapFaults tolerated;
     return sd_journal_seek_cursor(m_journal, cursor.c_str());
 }
 
 Journal::Step Journal::step(Direction direction) {
+    const MapFaults tolerated;
     for (std::size_t steps = 0; steps < mostSteps; ++steps) {
         m_error = direction == Direction::forward ? sd_journal_next(m_journal)
                                                   : sd_journal_previous(m_journal);
@@ -146,14 +154,17 @@ Journal::Step Journal::step(Direction direction) {
 }
 
 bool Journal::stepBack() {
+    const MapFaults tolerated;
     return sd_journal_previous(m_journal) > 0;
 }
 
 bool Journal::isAt(const std::string& cursor) const {
+    const MapFaults tolerated;
     return sd_journal_test_cursor(m_journal, cursor.c_str()) > 0;
 }
 
 std::string Journal::cursor() const {
+    const MapFaults tolerated;
     char* text = nullptr;
     if (m_journal == nullptr || sd_journal_get_cursor(m_journal, &text) < 0) {
         return "";
@@ -165,6 +176,7 @@ std::string Journal::cursor() const {
 bool Journal::holds(const JournalConfig& config, const std::string& cursor) {
     JournalConfig all;
     all.directory = config.directory;
+    const MapFaults tolerated;
     Journal journal(all);
     return journal.open() == 0 && journal.seekCursor(cursor) == 0 &&
            sd_journal_next(journal.m_journal) > 0 && journal.isAt(cursor);
@@ -180,6 +192,7 @@ std::uint64_t Journal::timeOf(std::string_view cursor) noexcept {
 }
 
 bool Journal::wait(std::chrono::milliseconds most) {
+    const MapFaults tolerated;
     const int outcome = sd_journal_wait(m_journal, static_cast<std::uint64_t>(most.count()) * 1000);
     return outcome == SD_JOURNAL_INVALIDATE;
 }
@@ -319,6 +332,7 @@ void Journal::read(EntryColumns& columns) {
 }
 
 void Journal::readFields(EntryFields& fields) {
+    const MapFaults tolerated;
     const void* data = nullptr;
     std::size_t length = 0;
     sd_journal_restart_data(m_journal);

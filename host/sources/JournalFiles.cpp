@@ -1,6 +1,7 @@
 #include "host/sources/JournalFiles.h"
 
 #include "base/ErrorText.h"
+#include "host/sources/MapFaults.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -28,6 +29,7 @@ bool isJournal(const fs::path& path) {
 
 /// Why the library cannot read the file; empty if it can.
 std::string problemOf(const std::string& path) {
+    const MapFaults tolerated;
     const char* paths[] = {path.c_str(), nullptr};
     sd_journal* journal = nullptr;
     const int outcome =

@@ -2,6 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "host/base/TimeText.h"
+#include "host/sources/MapFaults.h"
 
 #include <algorithm>
 #include <thread>
@@ -24,7 +25,8 @@ constexpr const char* beforeAll = "beginning"; ///< the position before the firs
 } // namespace
 
 JournalReading::JournalReading(const JournalConfig& config)
-    : m_config(config), m_journal(config), m_pause(firstPause, longestPause) {}
+    : m_config(config), m_journal(config), m_faults(MapFaults::count()),
+      m_pause(firstPause, longestPause) {}
 
 void JournalReading::startAt(Start start) {
     m_position = start == Start::beginning ? beforeAll : "";
@@ -164,6 +166,11 @@ char* JournalReading::next() {
 }
 
 void JournalReading::noteDamage() {
+    if (const std::uint64_t faults = MapFaults::count(); faults > m_faults) {
+        m_faults = faults;
+        remark({true, "A file of the journal was cut off, or the disk cannot read it: its entries "
+                      "from there on are lost. The other files are read."});
+    }
     constexpr std::uint64_t growth = 10; // from remark to remark
     if (m_journal.damaged() > growth * m_damaged) {
         m_damaged = m_journal.damaged();

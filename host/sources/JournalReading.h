@@ -20,6 +20,7 @@ namespace zrm::host {
 /// Reads a journal as it grows, each entry once, through rotation and the removal of old files.
 class JournalReading final : public EntrySource::Reading {
 public:
+    /// Call it on the thread that reads.
     explicit JournalReading(const JournalConfig& config);
 
     void startAt(Start start) override;
@@ -63,6 +64,7 @@ private:
     std::string m_problem;
     std::deque<EntrySource::Remark> m_remarks;
     std::uint64_t m_damaged = 0;      ///< entries, as remarked last
+    std::uint64_t m_faults;           ///< of the thread, as remarked last
     std::set<std::string> m_files;    ///< those that were examined
     std::vector<ino_t> m_directories; ///< 0: not there
     RetryPause m_pause;

@@ -5,6 +5,7 @@
 #include "host/sources/Journal.h"
 #include "host/sources/JournalFiles.h"
 #include "host/sources/JournalReading.h"
+#include "host/sources/MapFaults.h"
 
 #include <algorithm>
 #include <utility>
@@ -21,6 +22,7 @@ public:
 
     bool begin(std::int64_t newest) override {
         m_newest = std::max<std::int64_t>(newest, 0); // nothing is older
+        m_faults = MapFaults::count();
         m_problem = JournalFiles::look(m_directory).problem();
         if (!m_problem.empty()) {
             return false;
@@ -38,8 +40,8 @@ public:
         }
         if (step == Journal::Step::failed) {
             check(m_journal.error());
-        } else if (m_journal.damaged() > 0) {
-            m_problem = "some entries of the journal are damaged";
+        } else if (m_journal.damaged() > 0 || MapFaults::count() > m_faults) {
+            m_problem = "a file of the journal is damaged";
         }
         return step == Journal::Step::entry ? m_journal.text() : nullptr;
     }
@@ -67,6 +69,7 @@ private:
     const std::string m_directory;
     Journal m_journal;
     std::int64_t m_newest = 0;
+    std::uint64_t m_faults = 0; ///< of the thread, when the reading began
     std::string m_problem;
 };
 

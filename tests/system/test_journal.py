@@ -277,3 +277,13 @@ def test_check_says_how_much_of_a_journal_can_be_read(reader):
     output = zrmctl.run(["check", "--host", str(reader.zrm_toml)])[1]
     assert "journal  1 of 2 files can be read, 8 MiB\n" in output
     assert "bad.journal: it is damaged\n" in output
+
+
+def test_a_situation_of_the_api_names_a_log_that_there_is(reporting):
+    definition = {"name": "by name", "log": "journal", "when": []}
+    status, _, answer = reporting.api.request("POST", "/api/v1/situations", definition)
+    assert status == 201, answer
+    definition = {"name": "by a wrong name", "log": "syslog", "when": []}
+    status, _, answer = reporting.api.request("POST", "/api/v1/situations", definition)
+    assert (status, answer["field"]) == (400, "log")
+    assert answer["detail"].startswith("'syslog' is not the absolute path of a file, and no log has this name")

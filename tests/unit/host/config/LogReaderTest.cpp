@@ -116,10 +116,11 @@ TEST(LogReader, ASituationNamesALogThatIsNotAFile) {
     EXPECT_THAT(refused("[[log]]\ntype = 'journal'\n[[situation]]\nname = 'a'\n"
                         "log = 'journal'\n"),
                 IsEmpty());
-    EXPECT_THAT(refused("[[situation]]\nname = 'a'\nlog = 'syslog'\n"),
-                ElementsAre("zrm.toml:3: situation.log: 'syslog' is neither an absolute path nor "
-                            "the name of a log; begin a path with '/', or name a [[log]] that is "
-                            "not a file, such as \"journal\""));
+    EXPECT_THAT(
+        refused("[[situation]]\nname = 'a'\nlog = 'syslog'\n"),
+        ElementsAre("zrm.toml:3: situation.log: 'syslog' is not the absolute path of a file, "
+                    "and no log has this name; begin a path with '/', or name a [[log]] "
+                    "that is not a file, such as \"journal\""));
 }
 
 TEST(LogReader, ReadsWhatEventsKeepOfTheirEntries) {

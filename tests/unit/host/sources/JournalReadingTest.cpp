@@ -4,17 +4,22 @@
 #include "base/EntryFields.h"
 #include "framework/LogEntry.h"
 #include "host/sources/JournalSource.h"
+#include "host/sources/MapFaults.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <chrono>
+#include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <memory>
 #include <string>
 #include <thread>
 #include <vector>
 
+#include <fcntl.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -266,6 +271,42 @@ TEST_F(JournalReadingTest, ReadsTheOtherFilesWhenOneIsDamaged) {
     ASSERT_EQ(said.size(), 1U);
     EXPECT_THAT(said[0], HasSubstr("2 of 3 files of the journal cannot be read, "));
     EXPECT_THAT(said[0], HasSubstr("b.journal for one: it is damaged. The others are read."));
+}
+
+TEST_F(JournalReadingTest, SurvivesAFileThatIsCutOffWhileItIsRead) {
+    for (int number = 0; number < 2000; ++number) {
+        journal.add("a " + std::to_string(number));
+    }
+    journal.write("a.journal");
+    journal.add("last");
+    journal.write("b.journal");
+    JournalReading reading(config);
+    reading.startAt(Start::beginning);
+    ASSERT_STREQ(reading.next(), "a 0");
+    std::filesystem::resize_file(journal.path("a.journal"), 4096);
+    std::vector<std::string> found = messages(reading);
+    ASSERT_FALSE(found.empty());
+    EXPECT_EQ(found.back(), "last");
+    EXPECT_LT(found.size(), 2000U);
+    const std::vector<std::string> said = remarks(reading);
+    ASSERT_FALSE(said.empty());
+    EXPECT_THAT(said[0], HasSubstr("loss: A file of the journal was cut off"));
+}
+
+TEST(MapFaultsDeathTest, AFaultElsewhereEndsTheProcess) {
+    const TemporaryDirectory directory;
+    const std::string file = directory.write("map", std::string(8192, 'x'));
+    const int fd = open(file.c_str(), O_RDWR);
+    auto* const bytes =
+        static_cast<volatile char*>(mmap(nullptr, 8192, PROT_READ, MAP_SHARED, fd, 0));
+    ASSERT_EQ(ftruncate(fd, 0), 0);
+    const auto tolerated = [bytes] {
+        const MapFaults faults;
+        return bytes[0];
+    };
+    EXPECT_EQ(tolerated(), 0);
+    EXPECT_EXIT(std::exit(bytes[4096]), testing::KilledBySignal(SIGBUS), "");
+    close(fd);
 }
 
 TEST_F(JournalReadingTest, SaysWhenAllFilesAreDamaged) {
