@@ -78,12 +78,11 @@ public:
 private:
     bool takeDirective(char directive) noexcept {
         CivilTime& civil = m_parts.civil;
-        unsigned number = 0;
         switch (directive) {
         case 'Y':
-            return m_text.takeNumber(4, 4, number) && (m_parts.setYear(number), true);
+            return takeYear();
         case 'y':
-            return takePair(number) && (m_parts.setShortYear(number), true);
+            return takeShortYear();
         case 'm':
             return takePair(civil.month);
         case 'd':
@@ -95,7 +94,7 @@ private:
         case 'H':
             return takePair(civil.hour);
         case 'I':
-            return takePair(number) && (m_hour12 = number, true);
+            return takePair(m_hour12.emplace());
         case 'M':
             return takePair(civil.minute);
         case 'S':
@@ -103,7 +102,7 @@ private:
         case 'p':
             return m_text.takeMeridiem(m_isAfternoon);
         case 'j':
-            return m_text.takeNumber(1, 3, number) && (m_dayOfYear = number, true);
+            return m_text.takeNumber(1, 3, m_dayOfYear.emplace());
         case 's':
             return takeEpoch();
         case 'f':
@@ -114,6 +113,18 @@ private:
         default: // 'Z'
             return m_text.takeZone(m_parts.offset) || m_text.takeWord();
         }
+    }
+    bool takeYear() noexcept {
+        unsigned year = 0;
+        const bool isYear = m_text.takeNumber(4, 4, year);
+        m_parts.setYear(year);
+        return isYear;
+    }
+    bool takeShortYear() noexcept {
+        unsigned year = 0;
+        const bool isYear = takePair(year);
+        m_parts.setShortYear(year);
+        return isYear;
     }
     /// A number of one or two digits, which may be padded with a blank.
     bool takePair(unsigned& number) noexcept {
