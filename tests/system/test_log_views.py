@@ -140,6 +140,7 @@ def test_the_client_shows_everything_about_a_followed_log(agent):
         "entries": "3",
         "errors": "0",
         "lines": "3",
+        "parsed": "100.0 %",
         "rows": "3",
         "format errors": "0",
         "without a time": "0",

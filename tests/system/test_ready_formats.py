@@ -87,6 +87,7 @@ def test_an_unknown_name_is_an_error_with_names_like_it(agent, log):
     agent.follow(log, format="nginx-acces")
     agent.start(wait=False)
     assert agent.process.wait(PATIENCE) == 2
+    agent.stderr.finish()
     text = agent.stderr.text()
     assert "log.format: there is no format 'nginx-acces'; names like it are 'nginx-access'" in text
 
