@@ -3,23 +3,17 @@
 #include "TestJournal.h"
 #include "base/EntryFields.h"
 #include "framework/LogEntry.h"
-#include "host/sources/JournalSource.h"
-#include "host/sources/MapFaults.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <csignal>
 #include <cstdlib>
 #include <filesystem>
-#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include <fcntl.h>
-#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -293,22 +287,6 @@ TEST_F(JournalReadingTest, SurvivesAFileThatIsCutOffWhileItIsRead) {
     EXPECT_THAT(said[0], HasSubstr("loss: A file of the journal was cut off"));
 }
 
-TEST(MapFaultsDeathTest, AFaultElsewhereEndsTheProcess) {
-    const TemporaryDirectory directory;
-    const std::string file = directory.write("map", std::string(8192, 'x'));
-    const int fd = open(file.c_str(), O_RDWR);
-    auto* const bytes =
-        static_cast<volatile char*>(mmap(nullptr, 8192, PROT_READ, MAP_SHARED, fd, 0));
-    ASSERT_EQ(ftruncate(fd, 0), 0);
-    const auto tolerated = [bytes] {
-        const MapFaults faults;
-        return bytes[0];
-    };
-    EXPECT_EQ(tolerated(), 0);
-    EXPECT_EXIT(std::exit(bytes[4096]), testing::KilledBySignal(SIGBUS), "");
-    close(fd);
-}
-
 TEST_F(JournalReadingTest, SaysWhenAllFilesAreDamaged) {
     journal.directory.write("b.journal", std::string(4096, 'x').c_str());
     JournalReading reading(config);
@@ -399,28 +377,6 @@ TEST_F(JournalReadingTest, RecallsThePeriodBeforeAPosition) {
     JournalReading recalled(config);
     recalled.recall(reading.position(), std::chrono::seconds(3));
     EXPECT_THAT(messages(recalled), ElementsAre("3", "4", "5", "6"));
-}
-
-TEST_F(JournalReadingTest, ReadsBackwardsFromATime) {
-    for (int number = 0; number < 5; ++number) {
-        journal.add(std::to_string(number));
-    }
-    journal.write();
-    const JournalSource source(config);
-    const std::unique_ptr<EntrySource::Past> past = source.past();
-    ASSERT_TRUE(past->begin(TestJournal::firstTime + 3'000'000));
-    for (const char* const expected : {"3", "2", "1", "0"}) {
-        EXPECT_STREQ(past->previous(), expected);
-    }
-    EXPECT_EQ(past->previous(), nullptr);
-    EXPECT_EQ(past->problem(), "");
-}
-
-TEST_F(JournalReadingTest, HasADefinitionForEachConfiguration) {
-    const std::string one = JournalSource(config).definition();
-    EXPECT_EQ(JournalSource(config).definition(), one);
-    config.priority = 3;
-    EXPECT_NE(JournalSource(config).definition(), one);
 }
 
 } // namespace
