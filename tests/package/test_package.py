@@ -8,10 +8,12 @@ import stat
 import subprocess
 import tarfile
 import time
+from pathlib import Path
 
 import pytest
 from conftest import PACKAGE, quoted, run, wait_until
 
+FORMATS = list((Path(__file__).resolve().parents[2] / "formats").glob("*.toml"))
 FILES = {
     "etc/zrm/zrm.toml",
     "lib/systemd/system/zrmagent.service",
@@ -23,7 +25,7 @@ FILES = {
     "usr/share/man/man1/zrmctl.1.gz",
     "usr/share/man/man5/zrm.toml.5.gz",
     "usr/share/man/man8/zrmagent.8.gz",
-}
+} | {f"usr/share/zrm/formats/{file.name}" for file in FORMATS}
 PROGRAMS = {"usr/bin/zrmctl", "usr/sbin/zrmagent"}
 
 
