@@ -67,7 +67,10 @@ class TryPage {
         spellcheck: false,
         wrap: "off",
         value: log ? "" : SAMPLE,
-        oninput: again,
+        oninput: () => {
+          this.#forgetSuggestion();
+          again();
+        },
       }),
       "One entry per line, as in the log.",
     );
@@ -76,6 +79,7 @@ class TryPage {
       onchange: () => this.#judgeAs(logs.find((one) => one.log === this.log.value)),
     });
     this.count = select(["10", "50", "200"], "50", { "aria-label": "How many lines" });
+    this.suggested = h("div", { className: "stack", role: "region", "aria-label": "Suggestion" });
     this.result = h("div", { className: "stack", role: "region", "aria-label": "Result" });
     fill(
       element,
@@ -103,6 +107,7 @@ class TryPage {
             button("Take them", () => this.#take()),
           ),
       ),
+      this.suggested,
       this.result,
     );
     this.#showRules();
@@ -137,6 +142,7 @@ class TryPage {
   /** A try with the previous lines would be wrong by now; one asked for meanwhile follows. */
   async #take() {
     this.isTaking = true;
+    this.#forgetSuggestion();
     this.abort?.abort();
     this.lines.setProblem("");
     try {
@@ -164,9 +170,16 @@ class TryPage {
 
   #suggest() {
     const lines = this.lines.control.value.split("\n").slice(0, MOST_LINES);
-    this.abort?.abort();
-    this.abort = new AbortController();
-    return showSuggestion(this.result, lines, this.takenFrom || SOME_LOG, this.abort.signal);
+    const log = this.takenFrom || SOME_LOG;
+    this.#forgetSuggestion();
+    this.suggesting = new AbortController();
+    return showSuggestion(this.suggested, lines, log, this.suggesting.signal);
+  }
+
+  /** A suggestion is about the lines as they were. */
+  #forgetSuggestion() {
+    this.suggesting?.abort();
+    fill(this.suggested);
   }
 
   async #try() {
