@@ -132,7 +132,14 @@ double FormatFit::score() const noexcept {
 }
 
 bool FormatFit::fits(const FormatDescription& format, const EntryColumns& columns) noexcept {
-    return format.type != "syslog" || columns.hasTime || !columns.system.empty();
+    if (format.type != "syslog") {
+        return true;
+    }
+    // A word in brackets behind a time is a level, for example.
+    constexpr std::string_view notHosts = "[(<{\"'|";
+    const bool isHost =
+        columns.system.empty() || notHosts.find(columns.system.front()) == std::string_view::npos;
+    return isHost && (columns.hasTime || !columns.system.empty());
 }
 
 Result<FormatFit> FormatFit::of(const FormatDescription& format,

@@ -68,6 +68,15 @@ TEST(FormatFit, EntriesAreAsLongAsTheJoinAllows) {
     EXPECT_EQ(fitOf(format, {"a=b", " 1", " 2", "c=d"}).entries, 2U);
 }
 
+TEST(FormatFit, ALineOfASystemLoggerHasATimeOrAHost) {
+    FormatDescription format;
+    format.type = "syslog";
+    EXPECT_EQ(fitOf(format, {"Nov 19 10:00:00 web1 app: text", "text",
+                             "2026-11-19T10:00:00.123Z [info]: started"})
+                  .fitting,
+              1U);
+}
+
 TEST(FormatFit, SaysWhyAFormatCannotBeMade) {
     FormatDescription format = logfmt();
     format.timeFormat = "never";
