@@ -165,7 +165,7 @@ private:
     bool isOlder(Generation& file) const;
     Missed insertMissed();
     void noteHead();
-    void dropShortCopy(Found& found, std::int64_t offset) const;
+    bool dropShortCopy(Found& found, std::int64_t offset) const;
     bool hasCopyOfWaiting();
     char* recover();
     void prepend(Found& found);

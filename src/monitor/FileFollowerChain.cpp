@@ -111,7 +111,7 @@ void FileFollower::noteHead() {
 
 /// What was written between the copy and the truncation may have been read, so that the copy ends
 /// before the position. All of it was read then, although its time is younger.
-void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
+bool FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
     const auto isShortCopy = [&](const Member& member) {
         std::array<char, Tail::size> bytes;
         const std::ptrdiff_t length = member.file->readAt(bytes.data(), m_head.length, 0);
@@ -120,9 +120,11 @@ void FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
                member.file->readAt(bytes.data(), 1, offset) <= 0;
     };
     const auto copy = std::find_if(found.younger.begin(), found.younger.end(), isShortCopy);
-    if (copy != found.younger.end()) {
+    const bool hasShortCopy = copy != found.younger.end();
+    if (hasShortCopy) {
         found.younger.erase(copy);
     }
+    return hasShortCopy;
 }
 
 /// True if a file has all lines of this one that wait, with what may continue them, or if one that
@@ -161,8 +163,9 @@ char* FileFollower::recover() {
     // Not if the file was truncated before, and nothing in it was judged since.
     const bool isOwn =
         identityOf(at) == truncated.file->identity() && at.offset == m_block.offset();
-    if (isOwn && !found.holder) {
-        dropShortCopy(found, at.offset);
+    if (isOwn && !found.holder && !dropShortCopy(found, at.offset)) {
+        // What the file has now is younger than the position, wherever the next run finds it.
+        m_position.modified = m_modified == INT64_MAX ? 0 : m_modified;
     }
     if (found.lost.empty() && (isOwn ? !found.holder : found.younger.empty())) {
         const std::int64_t from = isOwn ? at.offset : 0;

@@ -364,4 +364,22 @@ TEST_F(FileFollowerTest, TheBeginningOfALongLineIsNotTakenBack) {
     EXPECT_FALSE(m_follower->takeBack());
 }
 
+TEST_F(FileFollowerTest, WhatFollowedATruncationIsFoundUnderAnotherName) {
+    age(m_path, 100);
+    look();
+    append("a\n");
+    age(m_path, 90);
+    EXPECT_EQ(look(), "a\n");
+    fs::resize_file(m_path, 0);
+    append("unfinished");
+    age(m_path, 50);
+    EXPECT_EQ(look(), ""); // the position is still behind what was removed
+    m_directory.write("app.log.1.gz", "GZunfinished");
+    fs::last_write_time(file("app.log.1.gz"), fs::last_write_time(m_path));
+    fs::remove(m_path);
+    append("b\n");
+    restart();
+    EXPECT_EQ(looks(2), "unfinished\nb\n");
+}
+
 } // namespace
