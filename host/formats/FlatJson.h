@@ -81,7 +81,7 @@ private:
     std::unique_ptr<char[]> m_built; ///< names of nested fields
     std::size_t m_builtSize = 0;
     char m_path[EntryFields::longestName]{}; ///< the name of what is walked, with a dot behind it
-    std::size_t m_pathLength = 0;          ///< more than m_path has: names are too long
+    std::size_t m_pathLength = 0;            ///< more than m_path has: names are too long
     char m_reason[128]{};
     std::size_t m_reasonLength = 0;
 };
