@@ -1,6 +1,5 @@
 """Logs of type "command": the lines that a command prints."""
 
-import os
 import time
 
 import pytest

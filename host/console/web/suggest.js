@@ -28,7 +28,10 @@ function draw(element, { ready, proposal }) {
       h(
         "div",
         { className: "panel" },
-        empty("No format fits", "No ready format reads these lines, and they have no common shape."),
+        empty(
+          "No format fits",
+          "No ready format reads these lines, and they have no common shape.",
+        ),
       ),
     );
     return;
