@@ -1,15 +1,10 @@
 #include "host/formats/CommonTime.h"
 
+#include "host/formats/IsoShape.h"
+
 #include <cstdint>
 
 namespace zrm::host {
-
-namespace {
-
-/// Where the digits of "YYYY-MM-DD hh:mm:ss" are.
-constexpr std::string_view isoShape = "9999-99-99 99:99:99";
-
-} // namespace
 
 bool TimeParts::give(EntryColumns& columns) const noexcept {
     if (!civil.isValid() || civil.second == 60) {
@@ -46,24 +41,12 @@ std::optional<TimeParts> CommonTime::any() noexcept {
 
 /// The commonest form, without looking for anything. Takes nothing if it is another one.
 bool CommonTime::takeFixedIso() noexcept {
-    char digits[isoShape.size()];
-    unsigned wrong = 0;
-    for (std::size_t at = 0; at < isoShape.size(); ++at) {
-        const char character = m_text.next(at);
-        digits[at] = static_cast<char>(character - '0');
-        if (isoShape[at] == '9') {
-            wrong |= static_cast<unsigned char>(digits[at]) > 9U;
-        } else if (isoShape[at] == ' ') {
-            wrong |= character != ' ' && character != 'T';
-        } else {
-            wrong |= character != isoShape[at];
-        }
-    }
-    if (wrong != 0) {
+    const char* const text = m_text.rest().data();
+    if (!IsoShape::begins(m_text.rest())) {
         return false;
     }
-    const auto pair = [&digits](std::size_t at) {
-        return static_cast<unsigned>(digits[at] * 10 + digits[at + 1]);
+    const auto pair = [text](std::size_t at) {
+        return static_cast<unsigned>((text[at] - '0') * 10 + (text[at + 1] - '0'));
     };
     m_parts.setYear(pair(0) * 100 + pair(2));
     m_parts.civil.month = pair(5);
@@ -71,7 +54,7 @@ bool CommonTime::takeFixedIso() noexcept {
     m_parts.civil.hour = pair(11);
     m_parts.civil.minute = pair(14);
     m_parts.civil.second = pair(17);
-    m_text.skip(isoShape.size());
+    m_text.skip(IsoShape::length);
     return true;
 }
 

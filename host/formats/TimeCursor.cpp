@@ -166,6 +166,11 @@ bool TimeCursor::takeZone(std::optional<std::int32_t>& offset) noexcept {
     }
     constexpr std::size_t longest = 5;
     const std::size_t length = letters();
+    if (length == 1 && length == m_text.size() && lower(next()) == 'z') {
+        skip(length);
+        offset = 0;
+        return true;
+    }
     if (length == 0 || length > longest) {
         return false;
     }

@@ -3,6 +3,7 @@
 
 #include "logs/EntryFormat.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -33,6 +34,8 @@ public:
         }
         return count;
     }
+    /// What has not been taken.
+    std::string_view rest() const noexcept { return m_text; }
     void skip(std::size_t characters) noexcept { m_text.remove_prefix(characters); }
     bool take(char character) noexcept {
         const bool isNext = m_text.starts_with(character);
@@ -40,7 +43,8 @@ public:
         return isNext;
     }
     bool takeOneOf(std::string_view characters) noexcept {
-        const bool isNext = !atEnd() && characters.find(m_text[0]) != characters.npos;
+        const bool isNext =
+            !atEnd() && std::ranges::find(characters, m_text[0]) != characters.end();
         skip(isNext ? 1 : 0);
         return isNext;
     }

@@ -183,6 +183,27 @@ TEST(TimePattern, RefusesWhatIsNotATime) {
     }
 }
 
+TEST(TimePattern, TakesNothingButADigitWhereADigitBelongs) {
+    const std::string time = "2026-11-19T12:34:56.123Z";
+    for (const std::size_t at : {0, 1, 2, 3, 5, 6, 8, 9, 11, 12, 14, 15, 17, 18}) {
+        for (int byte = 0; byte < 256; ++byte) {
+            std::string changed = time;
+            changed[at] = static_cast<char>(byte);
+            if (byte < '0' || byte > '9') {
+                EXPECT_EQ(common(changed), "not a time") << changed;
+            }
+        }
+        std::string changed = time;
+        changed[at] = time[at] == '1' ? '0' : '1';
+        EXPECT_EQ(common(changed), changed.substr(0, 10) + " " + changed.substr(11, 8) + "+0");
+    }
+    for (std::size_t length = 1; length < time.find('.'); ++length) {
+        EXPECT_EQ(timeOf("iso8601", time.substr(0, length)).find("2026-11-19 12:34:56"),
+                  std::string::npos)
+            << length;
+    }
+}
+
 TEST(TimePattern, GivesZonesThatStandForSeveralOffsetsNone) {
     for (const char* zone : {"CST", "CDT", "IST"}) {
         EXPECT_EQ(common("2026-11-19 10:00:05 " + std::string(zone)), local) << zone;
