@@ -89,8 +89,13 @@ private:
     Error walk(object& object, unsigned depth) noexcept;
     Error walk(array& array, unsigned depth) noexcept;
     Error take(value& value, std::string_view name, std::string_view token,
-               unsigned depth) noexcept;
+               unsigned depth) noexcept {
+        return token.front() == '"' ? takeText(value, name, token)
+                                    : takeOther(value, name, token, depth);
+    }
     Error takeText(value& value, std::string_view name, std::string_view token) noexcept;
+    Error takeOther(value& value, std::string_view name, std::string_view token,
+                    unsigned depth) noexcept;
     template <class Container>
     Error takeContainer(value& value, std::string_view name, unsigned depth) noexcept;
     Error fail(Error error, const char* place) noexcept {
@@ -123,6 +128,20 @@ Error FlatJson::Walk::walkRoot() noexcept {
         return hasPlace ? fail(error, place) : simdjson::INCOMPLETE_ARRAY_OR_OBJECT;
     }
     return hasPlace && !error ? fail(simdjson::TRAILING_CONTENT, place) : error;
+}
+
+inline Error FlatJson::Walk::takeText(value& value, std::string_view name,
+                                      std::string_view token) noexcept {
+    std::string_view text = JsonToken::quoted(token);
+    // A value that is only skipped may be followed by a colon.
+    simdjson::ondemand::raw_json_string raw;
+    const Error error = m_json.hasEscapes(text) ? value.get_string().get(text)
+                                                : value.get_raw_json_string().get(raw);
+    if (error) {
+        return fail(error, token.data());
+    }
+    m_json.keep(name, text);
+    return simdjson::SUCCESS;
 }
 
 Error FlatJson::Walk::walk(object& object, unsigned depth) noexcept {
@@ -168,11 +187,9 @@ Error FlatJson::Walk::walk(array& array, unsigned depth) noexcept {
     return simdjson::SUCCESS;
 }
 
-Error FlatJson::Walk::take(value& value, std::string_view name, std::string_view token,
-                           unsigned depth) noexcept {
+Error FlatJson::Walk::takeOther(value& value, std::string_view name, std::string_view token,
+                                unsigned depth) noexcept {
     switch (token.front()) {
-    case '"':
-        return takeText(value, name, token);
     case '{':
         return takeContainer<object>(value, name, depth);
     case '[':
@@ -181,29 +198,12 @@ Error FlatJson::Walk::take(value& value, std::string_view name, std::string_view
         break;
     }
     const std::string_view word = JsonToken::withoutBlanksBehind(token);
-    if (word == "null") {
+    const bool isNumber = JsonToken::isNumber(word);
+    if (isNumber || word == "true" || word == "false") {
+        m_json.keep(name, word, isNumber);
         return simdjson::SUCCESS;
     }
-    const bool hasDigits = JsonToken::isNumber(word);
-    if (!hasDigits && word != "true" && word != "false") {
-        return fail(simdjson::TAPE_ERROR, token.data());
-    }
-    m_json.keep(name, word, hasDigits);
-    return simdjson::SUCCESS;
-}
-
-Error FlatJson::Walk::takeText(value& value, std::string_view name,
-                               std::string_view token) noexcept {
-    std::string_view text = JsonToken::quoted(token);
-    // A value that is only skipped may be followed by a colon.
-    simdjson::ondemand::raw_json_string raw;
-    const Error error = m_json.hasEscapes(text) ? value.get_string().get(text)
-                                                : value.get_raw_json_string().get(raw);
-    if (error) {
-        return fail(error, token.data());
-    }
-    m_json.keep(name, text);
-    return simdjson::SUCCESS;
+    return word == "null" ? simdjson::SUCCESS : fail(simdjson::TAPE_ERROR, token.data());
 }
 
 template <class Container>
@@ -225,8 +225,8 @@ Error FlatJson::Walk::takeContainer(value& value, std::string_view name, unsigne
 }
 
 FlatJson::FlatJson(const JsonNames& names)
-    : m_names(names), m_parser(std::make_unique<Parser>()), m_fields(new Field[EntryFields::most]) {
-}
+    : m_names(names), m_parser(std::make_unique<Parser>()),
+      m_fields(new EntryFields::Field[EntryFields::most]) {}
 
 FlatJson::~FlatJson() = default;
 
@@ -310,27 +310,11 @@ bool FlatJson::isOf(std::string_view text) const noexcept {
     return m_isRead && text.size() == m_size && std::memcmp(text.data(), m_text.get(), m_size) == 0;
 }
 
-void FlatJson::addTo(EntryFields& fields, std::string_view text) const noexcept {
-    for (const Field& field : std::span(m_fields.get(), m_count)) {
-        const auto name = handedOver(field.name, text, fields);
-        const auto value = handedOver(field.value, text, fields);
-        if (name && value) {
-            fields.add(*name, *value);
-        } else {
-            fields.noteLeftOut();
-        }
-    }
+void FlatJson::addTo(EntryFields& fields) const noexcept {
+    fields.add(std::span(m_fields.get(), m_count));
     for (std::size_t i = 0; i < m_leftOut; ++i) {
         fields.noteLeftOut();
     }
-}
-
-/// A view into the text that the caller keeps, or a copy of what is built.
-std::optional<std::string_view> FlatJson::handedOver(std::string_view part, std::string_view text,
-                                                     EntryFields& fields) const noexcept {
-    const auto offset = reinterpret_cast<std::uintptr_t>(part.data()) -
-                        reinterpret_cast<std::uintptr_t>(m_text.get());
-    return offset < m_size ? text.substr(offset, part.size()) : fields.append(part).takeText();
 }
 
 /// `place`: where the text is wrong; null if that is not known.

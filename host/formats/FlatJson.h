@@ -6,7 +6,6 @@
 
 #include <cstddef>
 #include <memory>
-#include <optional>
 #include <string_view>
 
 namespace zrm::host {
@@ -37,15 +36,11 @@ public:
     const JsonColumns& columns() const noexcept { return m_columns; }
     /// True if this is the text that was read last.
     bool isOf(std::string_view text) const noexcept;
-    /// Adds the fields of the object. `text` has the same contents as that which was read; names
-    /// and values are views into it or into memory of `fields`.
-    void addTo(EntryFields& fields, std::string_view text) const noexcept;
+    /// Adds the fields of the object that was read last. Names and values are views into memory of
+    /// this object, until the next read.
+    void addTo(EntryFields& fields) const noexcept;
 
 private:
-    struct Field {
-        std::string_view name;
-        std::string_view value;
-    };
     // With the parser's types, whose layout depends on the options of the compiler.
     struct Parser;
     class Walk;
@@ -62,8 +57,6 @@ private:
     }
     std::string_view nestedName(std::string_view name) noexcept;
     std::string_view built(std::string_view name) noexcept;
-    std::optional<std::string_view> handedOver(std::string_view part, std::string_view text,
-                                               EntryFields& fields) const noexcept;
     bool refuse(std::string_view reason, const char* place = nullptr) noexcept;
 
     const JsonNames& m_names;
@@ -75,7 +68,7 @@ private:
     bool m_isRead = false;  ///< the text was an object
     bool m_hasEscapes = false;
     /// Views into m_text, m_built or memory of the parser.
-    const std::unique_ptr<Field[]> m_fields;
+    const std::unique_ptr<EntryFields::Field[]> m_fields;
     std::size_t m_count = 0;
     std::size_t m_leftOut = 0;
     std::unique_ptr<char[]> m_built; ///< names of nested fields

@@ -67,7 +67,7 @@ public:
 
     void readFields(std::string_view entry, EntryFields& fields) override {
         if (m_fields.isOf(entry) || m_fields.read(entry)) {
-            m_fields.addTo(fields, entry);
+            m_fields.addTo(fields);
         }
     }
 

@@ -22,38 +22,40 @@ inline std::string_view withoutBlanksBehind(std::string_view text) noexcept {
 
 /// What is between the quotes of a token, behind which there may be blanks.
 inline std::string_view quoted(std::string_view token) noexcept {
-    return token.substr(1, token.rfind('"') - 1);
-}
-
-inline std::size_t takeDigits(std::string_view& text) noexcept {
-    std::size_t count = 0;
-    while (count < text.size() && text[count] >= '0' && text[count] <= '9') {
-        ++count;
+    const char* end = token.data() + token.size() - 1;
+    while (*end != '"') {
+        --end;
     }
-    text.remove_prefix(count);
-    return count;
-}
-
-inline bool take(std::string_view& text, std::string_view characters) noexcept {
-    const bool isThere = !text.empty() && characters.find(text.front()) != characters.npos;
-    text.remove_prefix(isThere ? 1 : 0);
-    return isThere;
+    return {token.data() + 1, static_cast<std::size_t>(end - token.data() - 1)};
 }
 
 /// True for a number as JSON writes it.
 inline bool isNumber(std::string_view text) noexcept {
-    take(text, "-");
-    const bool beginsWithZero = text.starts_with('0');
-    const std::size_t digits = takeDigits(text);
-    if (digits == 0 || (beginsWithZero && digits > 1) ||
-        (take(text, ".") && takeDigits(text) == 0)) {
+    const char* at = text.data();
+    const char* const end = at + text.size();
+    const auto take = [&](char one, char other) {
+        const bool isThere = at != end && (*at == one || *at == other);
+        at += isThere ? 1 : 0;
+        return isThere;
+    };
+    const auto takeDigits = [&] {
+        const char* const first = at;
+        while (at != end && *at >= '0' && *at <= '9') {
+            ++at;
+        }
+        return at - first;
+    };
+    take('-', '-');
+    const bool beginsWithZero = at != end && *at == '0';
+    const auto digits = takeDigits();
+    if (digits == 0 || (beginsWithZero && digits > 1) || (take('.', '.') && takeDigits() == 0)) {
         return false;
     }
-    if (take(text, "eE")) {
-        take(text, "+-");
-        return takeDigits(text) > 0 && text.empty();
+    if (take('e', 'E')) {
+        take('+', '-');
+        return takeDigits() > 0 && at == end;
     }
-    return text.empty();
+    return at == end;
 }
 
 } // namespace JsonToken

@@ -25,15 +25,33 @@ bool EntryFields::reserve() noexcept {
 }
 
 void EntryFields::add(std::string_view name, std::string_view value) noexcept {
-    if (name.empty() || name.size() > longestName || m_fields.size() == most ||
-        (m_fields.capacity() < most && !reserve())) {
+    if (hasPlaces()) {
+        place({name, value});
+    } else {
+        noteLeftOut();
+    }
+}
+
+void EntryFields::add(std::span<const Field> fields) noexcept {
+    if (!hasPlaces()) {
+        m_leftOut += fields.size();
+        return;
+    }
+    for (const Field& field : fields) {
+        place(field);
+    }
+}
+
+/// There is memory for it.
+inline void EntryFields::place(const Field& field) noexcept {
+    if (field.name.empty() || field.name.size() > longestName || m_fields.size() == most) {
         noteLeftOut();
         return;
     }
-    const std::size_t mark = markOf(name);
-    if (!m_marks[mark] || search(name) == nullptr) {
+    const std::size_t mark = markOf(field.name);
+    if (!m_marks[mark] || search(field.name) == nullptr) {
         m_marks.set(mark);
-        m_fields.push_back({name, value});
+        m_fields.push_back(field);
     }
 }
 

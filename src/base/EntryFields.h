@@ -32,6 +32,8 @@ public:
     /// Adds a field. Both texts must stay valid until clear(). Of several fields of one name the
     /// first counts. A field without a name, with too long a name, or beyond the most is left out.
     void add(std::string_view name, std::string_view value) noexcept;
+    /// The same for each of these, in one step.
+    void add(std::span<const Field> fields) noexcept;
 
     /// Appends to a text that is built in the object's memory.
     EntryFields& append(std::string_view part) noexcept;
@@ -50,7 +52,10 @@ public:
     void noteLeftOut() noexcept { ++m_leftOut; }
 
 private:
+    /// False if there is no memory for the fields.
+    bool hasPlaces() noexcept { return m_fields.capacity() >= most || reserve(); }
     bool reserve() noexcept;
+    void place(const Field& field) noexcept;
     const std::string_view* search(std::string_view name) const noexcept;
     /// The bit that stands for names of this length, beginning and end.
     static std::size_t markOf(std::string_view name) noexcept;

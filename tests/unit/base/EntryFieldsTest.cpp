@@ -51,6 +51,40 @@ TEST(EntryFields, LeavesOutWhatIsBeyondItsBounds) {
     EXPECT_EQ(fields.leftOut(), 2u + 10'000u - EntryFields::most);
 }
 
+TEST(EntryFields, AddsManyAsOneByOne) {
+    const std::string longest(EntryFields::longestName, 'n');
+    const std::string tooLong = longest + "n";
+    std::vector<EntryFields::Field> many = {{"first", "1"}, {"", "no name"}, {"second", "2"},
+                                            {"first", "3"}, {longest, "4"},  {tooLong, "5"}};
+    std::vector<std::string> names;
+    for (int number = 0; number < 300; ++number) {
+        names.push_back("f" + std::to_string(number));
+    }
+    for (const std::string& name : names) {
+        many.push_back({name, "x"});
+    }
+    EntryFields together;
+    EntryFields single;
+    together.add("second", "before");
+    single.add("second", "before");
+    together.add(many);
+    for (const auto& [name, value] : many) {
+        single.add(name, value);
+    }
+    ASSERT_EQ(together.all().size(), single.all().size());
+    for (std::size_t i = 0; i < single.all().size(); ++i) {
+        EXPECT_EQ(together.all()[i].name, single.all()[i].name);
+        EXPECT_EQ(together.all()[i].value, single.all()[i].value);
+    }
+    EXPECT_EQ(together.leftOut(), single.leftOut());
+    EXPECT_EQ(*together.find("first"), "1");
+    EXPECT_EQ(*together.find("second"), "before");
+    EXPECT_EQ(*together.find(longest), "4");
+    EXPECT_NE(together.find("f252"), nullptr);
+    EXPECT_EQ(together.find("f253"), nullptr);
+    EXPECT_EQ(together.leftOut(), 2u + 47u);
+}
+
 TEST(EntryFields, BuildsTextsInItsOwnMemory) {
     EntryFields fields;
     const auto first = fields.append("a").append(".").append("b").takeText();
