@@ -24,8 +24,19 @@ struct Kind {
     const char* name;
 };
 
-constexpr std::array<Kind, 4> kinds = {
-    {{"U", "text"}, {"S", "syslog"}, {"A", "logins"}, {"E", "errors"}}};
+constexpr std::array<Kind, 7> kinds = {{{"U", "text"},
+                                        {"S", "syslog"},
+                                        {"A", "logins"},
+                                        {"E", "errors"},
+                                        {"F", "format"},
+                                        {"J", "journal"},
+                                        {"C", "command"}}};
+
+/// False for logs that are read from a command or a library rather than from a file.
+bool isFile(const Json& row) {
+    const std::string letter = JsonText::text(row, "LOGTYPE");
+    return letter != "J" && letter != "C";
+}
 
 std::string kindOf(const Json& row) {
     std::string letter = JsonText::text(row, "LOGTYPE");
@@ -52,7 +63,7 @@ Table::Cell statusCell(const Json& row, const Json& ledger) {
 std::string sizeText(const Json& row) {
     const Json& size = JsonText::member(row, "LOGSIZE");
     const bool isThere = size.is_number() && size.get<std::int64_t>() >= 0;
-    return isThere ? TimeDisplay::bytes(size.get<std::uint64_t>()) : "no file";
+    return isThere ? TimeDisplay::bytes(size.get<std::uint64_t>()) : isFile(row) ? "no file" : "-";
 }
 
 std::string lastEntry(const Json& ledger) {
@@ -95,12 +106,15 @@ void addLedger(FactList& facts, const Json& ledger) {
     }
 }
 
-void addFollowing(FactList& facts, const Json& follow) {
+void addFollowing(FactList& facts, const Json& follow, bool ofFile) {
     if (!follow.is_object()) {
         return;
     }
     facts.add("following", JsonText::text(follow, "state"));
     facts.add("problem", JsonText::text(follow, "problem"), Colour::BAD);
+    if (!ofFile) {
+        return;
+    }
     facts.add("generation", JsonText::text(follow, "generation"));
     facts.add("generations", JsonText::text(follow, "generations"));
     facts.add("position", JsonText::text(follow, "position"));
@@ -331,7 +345,7 @@ CliStatus LogsCommand::show(Context& context) {
     facts.add("errors", JsonText::text(row, "NUMERRORS"));
     addLedger(facts, ledger);
     const Json& follow = JsonText::member(ledger, "follow");
-    addFollowing(facts, follow);
+    addFollowing(facts, follow, isFile(row));
     context.print(facts.text(context.terminal()) + shapesText(ledger, context.terminal()) +
                   rejectedText(ledger, context.terminal()) +
                   skippedText(ledger, context.terminal()) + rangesText(follow, context.terminal()));

@@ -154,3 +154,21 @@ def test_a_report_shows_the_files_that_it_has_read(page, followed):
     page.wait_text(f"{app}.1.gz")
     page.wait_text("not read completely: it is damaged")
     page.pictures("report-files")
+
+
+def test_a_log_that_is_not_a_file_is_not_shown_as_one(page, agent):
+    agent.agent_keys["log_config"] = None
+    agent.tables.append({"type": "command", "command": ["sh", "-c", "echo one; exec sleep 1000"], "name": "kernel"})
+    agent.situation()
+    agent.sink = agent.directory / "events"
+    agent.start()
+    agent.wait_events(1)
+    page.on(agent)
+    page.wait_text("Running")
+    assert "No file" not in page.text() and "follows 1 file" not in page.text()
+    page.open_log("kernel")
+    fact = "//dt[.='{}']/following-sibling::dd"
+    assert page.text_of(fact.format("Kind")) == "Command"
+    assert page.text_of(fact.format("State")) == "reading"
+    for name in ("Size", "Generation", "Position"):
+        assert f"\n{name}\n" not in page.text(), name

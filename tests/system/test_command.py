@@ -6,6 +6,7 @@ import pytest
 from api import Api
 from conftest import descriptions, wait_until
 from test_ledger import ledger_of
+from test_log_warnings import zrmctl
 
 
 @pytest.fixture
@@ -94,3 +95,12 @@ def test_nothing_of_the_agent_is_inherited(runner):
     texts = descriptions(agent.wait_events(2))
     assert texts == ["SigBlk:\t0000000000000000", "0 1 2 3"]
     assert agent.stop() == 0
+
+
+def test_the_client_shows_no_file_of_a_command(runner):
+    agent = runner(["sh", "-c", "echo one; exec sleep 1000"], name="kernel")
+    agent.wait_events(1)
+    (line,) = zrmctl(agent, "logs").stdout.splitlines()[1:]
+    assert line.split()[:3] == ["kernel", "command", "Running"] and "no file" not in line
+    told = zrmctl(agent, "logs", "kernel").stdout
+    assert "following" in told and "generation" not in told and "no file" not in told

@@ -24,8 +24,14 @@ export const tableOf = (log, tables) => tables.find(({ files }) => files.include
 
 export const tableName = ({ line }) => `[[log]] at line ${line}`;
 
-/** The facts as pairs of name and value. */
-export function followPairs(follow) {
+/** The facts as pairs of name and value. `ofFile`: false for a log that is not a file. */
+export function followPairs(follow, ofFile) {
+  if (!ofFile)
+    return [
+      ["State", follow.state === "reading" ? "reading" : "waiting"],
+      follow.problem && ["Problem", follow.problem],
+      follow.cut_entries > 0 && ["Entries judged by their beginning", number(follow.cut_entries)],
+    ].filter(Boolean);
   return [
     ["State", STATES[follow.state] ?? follow.state],
     follow.problem && ["Problem", follow.problem],
@@ -79,6 +85,7 @@ export function tablesPanel(tables) {
 
 function tableItem(one) {
   const files = one.files.length;
+  const ofFiles = one.path.some((path) => path.startsWith("/"));
   return h(
     "li",
     {},
@@ -86,7 +93,9 @@ function tableItem(one) {
       "p",
       {},
       h("b", {}, tableName(one)),
-      files > 0 && h("span", { className: "quiet" }, ` follows ${plural(files, "file")}`),
+      files > 0 &&
+        ofFiles &&
+        h("span", { className: "quiet" }, ` follows ${plural(files, "file")}`),
     ),
     h("p", { className: "mono break" }, one.path.join(", ")),
     files === 0 && h("p", { className: "why warn" }, "No file that can be followed matches now."),

@@ -2,8 +2,19 @@
 
 import { number } from "./format.js";
 
-const KINDS = { U: "Text", S: "Syslog", A: "Accounting", E: "Error log" };
+const KINDS = {
+  U: "Text",
+  S: "Syslog",
+  A: "Accounting",
+  E: "Error log",
+  F: "Format",
+  J: "Journal",
+  C: "Command",
+};
 export const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
+
+/** False for logs that are read from a command or a library rather than from a file. */
+export const isFile = (row) => !"EJC".includes(row.LOGTYPE);
 
 /** What makes the agent take a log up again after its trouble is fixed. */
 export const again = (configuration, isFollowed) =>
@@ -57,7 +68,7 @@ export function judge({ row, ledger }) {
       why: warnings.map(({ text }) => text).join(" "),
     };
   }
-  if (row.LOGSIZE === -1 && row.LOGTYPE !== "E") {
+  if (row.LOGSIZE === -1 && isFile(row)) {
     return {
       level: "warn",
       state: "No file",

@@ -5,7 +5,7 @@ import { drawRates } from "../charts.js";
 import { empty, failure, fill, h, loading, sentence, table } from "../dom.js";
 import { followPairs, rangesPanel, tableName, tableOf } from "../following.js";
 import { bytes, number, plural, stamp, time } from "../format.js";
-import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
+import { again, isFile, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
 const EVERY = 10000;
 const CHART_EVERY = 60000;
@@ -151,14 +151,14 @@ function drawState(element, log, configuration, source) {
     ],
     ["Status", row.MONSTATUS],
     ["Monitored since", stamp(row.MONTIME)],
-    ["File changed", stamp(row.LOGMODDATE)],
-    ["Size", bytes(row.LOGSIZE)],
+    isFile(row) && ["File changed", stamp(row.LOGMODDATE)],
+    isFile(row) && ["Size", bytes(row.LOGSIZE)],
     ["Read", `${bytes(ledger.bytes_read)} in ${plural(ledger.lines ?? 0, "line")}`],
     ["Entries", number(ledger.rows ?? row.NUMEVENTS)],
     ["Rejected lines", number(ledger.format_errors ?? row.NUMERRORS)],
     typeof ledger.percent_parsed === "number" && ["Parsed", `${ledger.percent_parsed}%`],
     ["Without a time", number(ledger.without_time)],
-    ["Truncations", number(ledger.truncations)],
+    isFile(row) && ["Truncations", number(ledger.truncations)],
     !follow && ["Skipped", bytes(ledger.skipped_bytes)],
     ["Restarts of the monitor", number(ledger.restarts)],
     ["Last entry", time(ledger.last_entry)],
@@ -173,7 +173,7 @@ function drawState(element, log, configuration, source) {
     level === "bad" && h("p", { className: "hint" }, again(configuration, Boolean(follow))),
     facts(pairs),
     follow && h("h2", {}, "Following"),
-    follow && facts(followPairs(follow)),
+    follow && facts(followPairs(follow, isFile(row))),
   );
 }
 
