@@ -9,7 +9,9 @@ void RowBytes::blank(char* bytes, std::size_t length) noexcept {
 }
 
 void RowBytes::copy(char* bytes, const char* from, std::size_t length) noexcept {
-    std::memcpy(bytes, from, length);
+    if (length > 0) { // an empty text may have no address
+        std::memcpy(bytes, from, length);
+    }
 }
 
 } // namespace zrm
