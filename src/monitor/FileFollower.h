@@ -163,6 +163,7 @@ private:
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
     bool isOlder(Generation& file) const;
+    void dropYoungerThanFirst(Found& found);
     Missed insertMissed();
     void noteHead();
     bool dropShortCopy(Found& found, std::int64_t offset) const;

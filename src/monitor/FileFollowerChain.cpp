@@ -60,6 +60,21 @@ bool FileFollower::isOlder(Generation& file) const {
     });
 }
 
+/// What was copied after the file that is read had lost its name belongs behind it. A file before
+/// it may have been written to later.
+void FileFollower::dropYoungerThanFirst(Found& found) {
+    const Generation& first = *m_chain.front().file;
+    Generation::Status status{};
+    first.status(status);
+    const std::vector<GenerationFile> younger =
+        youngerThan(generations(), {first.identity(), status.modified});
+    std::erase_if(found.younger, [&younger](const Member& member) {
+        return std::any_of(younger.begin(), younger.end(), [&member](const GenerationFile& file) {
+            return file.identity == member.file->identity();
+        });
+    });
+}
+
 /// The present file has nothing that was read, so that a truncation is not seen in it. What was in
 /// it before may be in a copy, which is read first.
 FileFollower::Missed FileFollower::insertMissed() {
@@ -73,13 +88,7 @@ FileFollower::Missed FileFollower::insertMissed() {
     found.holder.reset();
     std::erase_if(found.younger, [this](const Member& member) { return isOlder(*member.file); });
     if (m_chain.size() > 1) {
-        // What was copied after this file had lost its name belongs behind it.
-        Generation::Status mine{};
-        m_chain.front().file->status(mine);
-        std::erase_if(found.younger, [&mine](const Member& member) {
-            Generation::Status other;
-            return !member.file->status(other) || other.modified > mine.modified;
-        });
+        dropYoungerThanFirst(found);
     }
     if (found.younger.empty()) {
         return Missed::nothing;

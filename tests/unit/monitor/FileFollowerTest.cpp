@@ -210,6 +210,24 @@ TEST_F(FileFollowerTest, ManyEmptyGenerationsDoNotHideTheFilesAfterThem) {
     EXPECT_EQ(looks(3), "a\nb\n");
 }
 
+TEST_F(FileFollowerTest, ReadsAnEmptyGenerationThatIsWrittenLaterThanTheOneAfterIt) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log-20260001");
+    m_directory.write("app.log-20260002", ""); // the writer has it
+    m_directory.write("app.log", "");
+    restart();
+    EXPECT_EQ(look(), "");
+    rename("app.log", "app.log-20260003");
+    age(file("app.log-20260003"), 30);
+    age(file("app.log-20260002"), 20, "b\n");
+    m_directory.write("app.log-20260004", "c\n");
+    append("d\n");
+    EXPECT_EQ(looks(5), "b\nc\nd\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsReadAsFarAsItGoes) {
     look();
     append("a\n");
