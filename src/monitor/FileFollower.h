@@ -163,6 +163,7 @@ private:
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
     bool isOlder(Generation& file) const;
+    bool hasLostName() const noexcept;
     void dropYoungerThanFirst(Found& found);
     Missed insertMissed();
     void noteHead();

@@ -5,6 +5,8 @@
 #include <iterator>
 #include <utility>
 
+#include <sys/stat.h>
+
 namespace zrm {
 
 // Which files are read besides the present one of a followed log: those between two looks, and the
@@ -60,7 +62,13 @@ bool FileFollower::isOlder(Generation& file) const {
     });
 }
 
-/// What was copied after the file that is read had lost its name belongs behind it. A file before
+bool FileFollower::hasLostName() const noexcept {
+    struct stat status;
+    return m_chain.size() > 1 || stat(m_path.c_str(), &status) != 0 ||
+           !(FileIdentity{status.st_dev, status.st_ino} == m_chain.front().file->identity());
+}
+
+/// What was made after the file that is read had lost its name belongs behind it. A file before
 /// it may have been written to later.
 void FileFollower::dropYoungerThanFirst(Found& found) {
     const Generation& first = *m_chain.front().file;
@@ -87,7 +95,7 @@ FileFollower::Missed FileFollower::insertMissed() {
     const bool isHeld = found.holder.has_value();
     found.holder.reset();
     std::erase_if(found.younger, [this](const Member& member) { return isOlder(*member.file); });
-    if (m_chain.size() > 1) {
+    if (hasLostName()) {
         dropYoungerThanFirst(found);
     }
     if (found.younger.empty()) {

@@ -228,6 +228,22 @@ TEST_F(FileFollowerTest, ReadsAnEmptyGenerationThatIsWrittenLaterThanTheOneAfter
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(FileFollowerTest, ReadsAFileBeforeTheGenerationsAfterItWhileNoneHasTheName) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log-20260001");
+    m_directory.write("app.log", "");
+    EXPECT_EQ(looks(3), "");
+    append("b\n");
+    rename("app.log", "app.log-20260002");
+    m_directory.write("app.log-20260003", "c\n");
+    EXPECT_EQ(look(), "b\n");
+    append("d\n");
+    EXPECT_EQ(looks(4), "c\nd\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsReadAsFarAsItGoes) {
     look();
     append("a\n");
