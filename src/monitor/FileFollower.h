@@ -131,9 +131,11 @@ private:
     };
     enum class Search : unsigned char { byIdentity, byContents };
     enum class Missed : unsigned char { nothing, inserted, awaited };
-    /// A file and its first bytes, as far as they were read: inodes are used again.
+    /// A file and what it is recognised by, since inodes are used again: its first bytes, as far as
+    /// they were read. Those of a compressed file are not.
     struct Older {
         FileIdentity identity;
+        bool isCompressed;
         Tail head{};
     };
     /// A generation that could not be read for so long that it counts as lost.
@@ -208,7 +210,8 @@ private:
     Moment m_now{};
     bool m_wasAbsent = false; ///< nothing had the name at an earlier look
     bool m_isTakenUp = false; ///< files rotated before the start are read
-    /// What was beside the first file, if that was empty: older, whenever it was written to.
+    /// What had contents beside the first file, if that was empty: older, whenever it was written
+    /// to.
     std::vector<Older> m_older;
     std::deque<Member> m_chain; ///< the first is read; the last has the name, unless it lost it
     EntryBlock m_block;

@@ -56,7 +56,8 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
 bool FileFollower::isOlder(Generation& file) const {
     return std::any_of(m_older.begin(), m_older.end(), [&file](const Older& older) {
         Tail head;
-        return older.identity == file.identity() && file.readHead(head) >= older.head.length &&
+        return older.identity == file.identity() && older.isCompressed == file.isCompressed() &&
+               file.readHead(head) >= older.head.length &&
                std::equal(head.bytes.begin(), head.bytes.begin() + older.head.length,
                           older.head.bytes.begin());
     });

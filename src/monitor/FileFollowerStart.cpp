@@ -53,12 +53,15 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
 /// A writer that still has the file before this one open writes to it later than this one was made.
 void FileFollower::noteOlder() {
     for (const GenerationFile& file : generations()) {
-        Older older{file.identity};
+        noteModified(file.modified);
+        if (file.size == 0) {
+            continue; // whatever it gets is written from now on
+        }
+        Older older{file.identity, file.isCompressed};
         if (const auto opened = file.isCompressed ? nullptr : Generation::open(file.path)) {
             opened->readHead(older.head);
         }
         m_older.push_back(older);
-        noteModified(file.modified);
     }
 }
 

@@ -34,6 +34,23 @@ TEST_F(FileFollowerTest, RecoversWhatWasTruncatedInALogThatWasEmptyAtTheFirstSta
     EXPECT_EQ(looks(3), "a\nb\n");
 }
 
+TEST_F(FileFollowerTest, RecoversFromACopyWithTheInodeOfAFileThatWasThereAtTheFirstStart) {
+    for (const bool isCompressed : {false, true}) {
+        const std::string older = isCompressed ? "app.log.1.gz" : "app.log.1";
+        fs::resize_file(m_path, 0);
+        age(m_path, 50);
+        m_directory.write(older, isCompressed ? "GZ" : "");
+        age(file(older), 60);
+        begin();
+        EXPECT_EQ(look(), "");
+        rename(older, "app.log.2");
+        m_directory.write("app.log.2", "a\n");
+        append("b\n");
+        EXPECT_EQ(looks(3), "a\nb\n") << older;
+        fs::remove(file("app.log.2"));
+    }
+}
+
 TEST_F(FileFollowerTest, BeginsAtTheBeginningIfItIsToldTo) {
     m_options.fromBeginning = true;
     begin();
