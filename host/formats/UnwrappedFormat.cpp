@@ -30,11 +30,13 @@ public:
         } else if (!m_inner->read(m_unwrapper.text(), columns)) {
             return false;
         }
-        if (!columns.hasTime && !m_times.read(m_unwrapper.time(), columns)) {
-            m_reason = "the container runtime's time is not a time";
-            return false;
+        if (!columns.hasTime) {
+            m_times.read(m_unwrapper.time(), columns);
         }
-        return true;
+        if (!columns.hasTime) { // a time of day is not enough: the runtime writes the date
+            m_reason = "the container runtime's time is not a time";
+        }
+        return columns.hasTime;
     }
 
     void readFields(std::string_view entry, EntryFields& fields) override {

@@ -100,6 +100,8 @@ TEST_F(UnwrappedFormatTest, SaysWhyAnEntryDoesNotFit) {
     EXPECT_THAT(std::string(m_reader->reason()), HasSubstr("JSON")) << "the inner format's reason";
     EXPECT_FALSE(read(R"({"log":"{}\n","stream":"stdout","time":"soon"})"));
     EXPECT_EQ(m_reader->reason(), "the container runtime's time is not a time");
+    EXPECT_FALSE(read(R"({"log":"{}\n","stream":"stdout","time":"10:00:01Z"})"));
+    EXPECT_EQ(m_reader->reason(), "the container runtime's time is not a time") << "without a date";
 }
 
 TEST_F(UnwrappedFormatTest, FieldsOfAnotherEntryThanTheLast) {
