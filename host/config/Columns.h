@@ -12,6 +12,7 @@ struct Column {
     int width;             ///< bytes
     bool isNumber;         ///< an integer column; false: a character column
     bool isTime;           ///< holds a 16-character time stamp
+    bool isUtf8 = false;   ///< UTF-8, whatever the code page of the log
 };
 
 /// The columns of a table ("RMLOGENT", "RMMONLOG") in table order; empty for any other name.

@@ -3,7 +3,6 @@
 #include "base/TraceScope.h"
 #include "framework/ctreq.h"
 #include "framework/filters.h"
-#include "framework/locale.h"
 #include "host/base/Utf8.h"
 #include "host/framework/ColumnText.h"
 #include "host/framework/Condition.h"
@@ -58,14 +57,6 @@ int logRank(std::string_view column) {
 std::string_view cut(std::string_view value, const RowColumn& column) {
     return column.type == COLUMN_UTF8 ? Utf8::prefix(value, column.width)
                                       : value.substr(0, column.width);
-}
-
-/// Columns in a local code page other than UTF-8 are matched byte by byte; the pattern must then be
-/// ASCII.
-bool isByteMatch(const RowColumn& column, std::string_view pattern) {
-    return column.type != COLUMN_UTF8 && Utf8::asciiPrefix(pattern) == pattern.size() &&
-           LOC2_GetLocaleNumInfo(LOC2_GetLocale(0, 0, 0, nullptr), LOC2_CODEPAGE, nullptr) !=
-               LOC2_UTF8;
 }
 
 } // namespace
@@ -139,8 +130,7 @@ void CompiledCondition::compileText(const RowColumn& column) {
 
 void CompiledCondition::compilePattern(const RowColumn& column) {
     TraceScope trace(anchor);
-    m_pattern = compiledPattern(m_value, isByteMatch(column, m_value) ? PatternText::bytes
-                                                                      : PatternText::utf8);
+    m_pattern = compiledPattern(m_value, patternTextOf(column.type == COLUMN_UTF8, m_value));
     if (m_pattern->ok()) {
         m_kind = Kind::MATCHES;
     } else {

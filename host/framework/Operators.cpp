@@ -1,5 +1,8 @@
 #include "host/framework/Operators.h"
 
+#include "framework/locale.h"
+#include "host/base/Utf8.h"
+
 #include <algorithm>
 
 #include <re2/re2.h>
@@ -47,6 +50,13 @@ std::vector<std::string_view> linesOf(std::string_view text) {
     }
     lines.push_back(text);
     return lines;
+}
+
+PatternText patternTextOf(bool isUtf8Column, std::string_view pattern) {
+    const bool isByBytes = !isUtf8Column && Utf8::isAscii(pattern) &&
+                           LOC2_GetLocaleNumInfo(LOC2_GetLocale(0, 0, 0, nullptr), LOC2_CODEPAGE,
+                                                 nullptr) != LOC2_UTF8;
+    return isByBytes ? PatternText::bytes : PatternText::utf8;
 }
 
 std::unique_ptr<re2::RE2> compiledPattern(std::string_view pattern, PatternText text) {

@@ -36,6 +36,10 @@ std::vector<std::string_view> linesOf(std::string_view text);
 
 enum class PatternText : unsigned char { utf8, bytes };
 
+/// How a pattern is matched with a column. Columns in a local code page other than UTF-8 are
+/// matched byte by byte; the pattern must then be ASCII.
+PatternText patternTextOf(bool isUtf8Column, std::string_view pattern);
+
 /// A regular expression, which says whether it is usable.
 std::unique_ptr<re2::RE2> compiledPattern(std::string_view pattern, PatternText text);
 

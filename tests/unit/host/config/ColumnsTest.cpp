@@ -31,6 +31,7 @@ void expectSame(std::span<const Column> columns, const RowLayout& layout) {
         EXPECT_EQ(columns[index].name, known.name);
         EXPECT_EQ(static_cast<std::size_t>(columns[index].width), known.width) << known.name;
         EXPECT_EQ(columns[index].isNumber, known.isInteger()) << known.name;
+        EXPECT_EQ(columns[index].isUtf8, known.type == COLUMN_UTF8) << known.name;
     }
 }
 
