@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <span>
 #include <utility>
 
 namespace zrm {
@@ -19,7 +20,7 @@ std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
     std::int64_t most = 0;
     for (Group& group : m_groups) {
         if (group.takes(time, period)) {
-            most = std::max(most, group.add(time, period));
+            most = std::max(most, group.add(time, period, m_mostSeconds));
             group.used = m_additions;
         }
     }
@@ -33,6 +34,26 @@ std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
         joinAt(time);
     }
     return most;
+}
+
+EntryWindows::Counted EntryWindows::counted(std::int64_t time, std::int64_t period) const noexcept {
+    period = std::min(period, longestPeriod);
+    Counted most{0, time};
+    for (const Group& group : m_groups) {
+        if (group.takes(time, period)) {
+            for (const std::int64_t end : {time, group.newest()}) {
+                const Counted found = group.within(end, period);
+                most = found.entries > most.entries ? found : most;
+            }
+        }
+    }
+    return most;
+}
+
+bool EntryWindows::isOver(std::int64_t time, std::int64_t period) const noexcept {
+    return std::ranges::all_of(m_groups, [time, period](const Group& group) {
+        return time - group.newest() >= std::min(period, longestPeriod);
+    });
 }
 
 /// A group to begin anew: the one that has not been used for longest, if there are enough.
@@ -64,6 +85,7 @@ void EntryWindows::joinAt(std::int64_t newest) {
 void EntryWindows::Group::begin(std::int64_t time) {
     m_seconds.clear();
     m_seconds.push_back({time, 1});
+    m_gone = 0;
     m_begin = 0;
     m_count = 1;
     m_newest = time;
@@ -74,12 +96,33 @@ bool EntryWindows::Group::isSameSecond(std::int64_t left, std::int64_t right) co
     return left >> m_width == right >> m_width;
 }
 
-std::int64_t EntryWindows::Group::add(std::int64_t time, std::int64_t period) {
+std::int64_t EntryWindows::Group::add(std::int64_t time, std::int64_t period,
+                                      std::size_t mostSeconds) {
+    std::int64_t most = 0;
     if (time < m_newest) {
-        return addLate(time, period);
+        most = addLate(time, period);
+    } else {
+        addNewest(time, period);
+        most = m_count;
     }
-    addNewest(time, period);
-    return m_count;
+    if (m_seconds.size() - m_gone > mostSeconds) {
+        widen(mostSeconds);
+        findBegin(period);
+        most = time < m_newest ? most : m_count;
+    }
+    return most;
+}
+
+EntryWindows::Counted EntryWindows::Group::within(std::int64_t time,
+                                                  std::int64_t period) const noexcept {
+    Counted found{0, time};
+    for (std::size_t index = m_seconds.size(); index-- > m_gone;) {
+        const Second& second = m_seconds[index];
+        if (second.time > time - period && second.time <= time) {
+            found = {found.entries + second.entries, second.time};
+        }
+    }
+    return found;
 }
 
 void EntryWindows::Group::addNewest(std::int64_t time, std::int64_t period) {
@@ -95,42 +138,42 @@ void EntryWindows::Group::addNewest(std::int64_t time, std::int64_t period) {
         m_count -= m_seconds[m_begin++].entries;
     }
     // The period before is kept for late entries.
-    while (m_seconds.front().time <= time - 2 * period) {
-        m_seconds.pop_front();
-        --m_begin;
+    forget(time - 2 * period);
+}
+
+/// Forgets what is not younger.
+void EntryWindows::Group::forget(std::int64_t until) {
+    while (m_seconds[m_gone].time <= until) {
+        ++m_gone;
     }
-    if (m_seconds.size() > mostSeconds) {
-        widen();
-        findBegin(period);
+    if (m_gone > m_seconds.size() / 2) { // so that each second is moved once on the average
+        m_seconds.erase(m_seconds.begin(), m_seconds.begin() + static_cast<std::ptrdiff_t>(m_gone));
+        m_begin -= m_gone;
+        m_gone = 0;
     }
 }
 
 /// An entry that is older than the newest one.
 std::int64_t EntryWindows::Group::addLate(std::int64_t time, std::int64_t period) {
     // Usually it is not much older.
+    const auto oldest = m_seconds.begin() + static_cast<std::ptrdiff_t>(m_gone);
     auto at = m_seconds.end();
     std::int64_t newer = 0;
-    while (at != m_seconds.begin() && std::prev(at)->time > time &&
-           !isSameSecond(std::prev(at)->time, time)) {
+    while (at != oldest && std::prev(at)->time > time && !isSameSecond(std::prev(at)->time, time)) {
         --at;
         newer += at->entries;
     }
-    if (at != m_seconds.begin() && isSameSecond(std::prev(at)->time, time)) {
+    if (at != oldest && isSameSecond(std::prev(at)->time, time)) {
         addTo(*std::prev(at), time, period);
     } else {
         m_seconds.insert(at, {time, 1});
         ++m_count;
     }
     std::int64_t own = m_count - newer;
-    for (std::size_t index = m_begin; index-- > 0 && m_seconds[index].time > time - period;) {
+    for (std::size_t index = m_begin; index-- > m_gone && m_seconds[index].time > time - period;) {
         own += m_seconds[index].entries;
     }
-    const std::int64_t most = std::max(own, m_count);
-    if (m_seconds.size() > mostSeconds) {
-        widen();
-        findBegin(period);
-    }
-    return most;
+    return std::max(own, m_count);
 }
 
 void EntryWindows::Group::addTo(Second& second, std::int64_t time, std::int64_t period) {
@@ -142,11 +185,11 @@ void EntryWindows::Group::addTo(Second& second, std::int64_t time, std::int64_t 
 }
 
 /// Joins neighbours until few enough are left.
-void EntryWindows::Group::widen() {
-    while (m_seconds.size() > mostSeconds) {
+void EntryWindows::Group::widen(std::size_t mostSeconds) {
+    while (m_seconds.size() - m_gone > mostSeconds) {
         ++m_width;
         Seconds joined;
-        for (const Second& second : m_seconds) {
+        for (const Second& second : std::span(m_seconds).subspan(m_gone)) {
             if (!joined.empty() && isSameSecond(joined.back().time, second.time)) {
                 joined.back().time = second.time;
                 joined.back().entries += second.entries;
@@ -155,13 +198,14 @@ void EntryWindows::Group::widen() {
             }
         }
         m_seconds = std::move(joined);
+        m_gone = 0;
     }
 }
 
 void EntryWindows::Group::findBegin(std::int64_t period) {
     m_begin = m_seconds.size();
     m_count = 0;
-    while (m_begin > 0 && m_seconds[m_begin - 1].time > m_newest - period) {
+    while (m_begin > m_gone && m_seconds[m_begin - 1].time > m_newest - period) {
         m_count += m_seconds[--m_begin].entries;
     }
 }

@@ -3,7 +3,6 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <deque>
 #include <vector>
 
 namespace zrm {
@@ -21,10 +20,22 @@ public:
     static constexpr std::size_t mostGroups = 8;
     static constexpr std::size_t mostSeconds = 16'384; ///< with entries, per group
 
+    explicit EntryWindows(std::size_t seconds = mostSeconds) noexcept : m_mostSeconds(seconds) {}
+
     /// Adds an entry's time. Returns the number of entries in the period (time - period, time] or
     /// in the one that ends with the newest entry of its group, whichever is larger. Both in
     /// seconds; times are at most 2^40 away from 0.
     std::int64_t add(std::int64_t time, std::int64_t period);
+
+    struct Counted {
+        std::int64_t entries = 0;
+        std::int64_t first = 0; ///< the time of the first of them
+    };
+    /// What add has just counted for this time.
+    Counted counted(std::int64_t time, std::int64_t period) const noexcept;
+
+    /// Whether no entry from this time on would be counted together with one that was added.
+    bool isOver(std::int64_t time, std::int64_t period) const noexcept;
 
 private:
     /// Entries of which each is less than the period away from the newest one, at the time when it
@@ -36,7 +47,9 @@ private:
             return time > m_newest - period && time < m_newest + period;
         }
         /// The same as EntryWindows::add, of a time that it takes.
-        std::int64_t add(std::int64_t time, std::int64_t period);
+        std::int64_t add(std::int64_t time, std::int64_t period, std::size_t mostSeconds);
+        /// How many entries there are in the period that ends with this time, and the first.
+        Counted within(std::int64_t time, std::int64_t period) const noexcept;
         std::int64_t newest() const noexcept { return m_newest; }
         std::int64_t count() const noexcept { return m_count; }
 
@@ -48,16 +61,18 @@ private:
             std::int64_t time; ///< the latest that was added
             std::int64_t entries;
         };
-        using Seconds = std::deque<Second>;
+        using Seconds = std::vector<Second>;
 
         bool isSameSecond(std::int64_t left, std::int64_t right) const noexcept;
         void addTo(Second& second, std::int64_t time, std::int64_t period);
         void addNewest(std::int64_t time, std::int64_t period);
         std::int64_t addLate(std::int64_t time, std::int64_t period);
-        void widen();
+        void forget(std::int64_t until);
+        void widen(std::size_t mostSeconds);
         void findBegin(std::int64_t period);
 
         Seconds m_seconds;         ///< oldest first, twice the period
+        std::size_t m_gone = 0;    ///< at the front: forgotten, and soon removed
         std::size_t m_begin = 0;   ///< the first within the period that ends with the newest
         std::int64_t m_count = 0;  ///< entries from there on
         std::int64_t m_newest = 0; ///< time
@@ -69,6 +84,7 @@ private:
 
     std::vector<Group> m_groups;
     std::uint64_t m_additions = 0;
+    std::size_t m_mostSeconds;
 };
 
 } // namespace zrm

@@ -106,6 +106,40 @@ TEST(EntryWindows, ExtremeTimesAndPeriodsAreCounted) {
     EXPECT_EQ(windows.add(0, INT64_MAX), 3);
 }
 
+TEST(EntryWindows, TheFirstOfTheCountedEntriesIsKnown) {
+    EntryWindows windows;
+    for (const std::int64_t time : {0, 1, 2, 58, 90}) {
+        windows.add(noon + time, 60);
+    }
+    EXPECT_EQ(windows.counted(noon + 90, 60).entries, 2);
+    EXPECT_EQ(windows.counted(noon + 90, 60).first, noon + 58);
+    EXPECT_EQ(windows.add(noon + 59, 60), 5);
+    EXPECT_EQ(windows.counted(noon + 59, 60).entries, 5);
+    EXPECT_EQ(windows.counted(noon + 59, 60).first, noon) << "its own period has more";
+}
+
+TEST(EntryWindows, IsOverWhenNothingWouldBeCountedWithIt) {
+    EntryWindows windows;
+    EXPECT_TRUE(windows.isOver(noon, 60));
+    windows.add(noon, 60);
+    EXPECT_FALSE(windows.isOver(noon + 59, 60));
+    EXPECT_TRUE(windows.isOver(noon + 60, 60));
+    EXPECT_FALSE(windows.isOver(noon - 60, 60)) << "a later entry may still come";
+}
+
+TEST(EntryWindows, FewerSecondsAreKeptOnRequest) {
+    EntryWindows windows(128);
+    for (std::int64_t second = 0; second < 10 * 60; ++second) {
+        EXPECT_EQ(windows.add(noon + second, 60), std::min<std::int64_t>(second + 1, 60));
+    }
+    for (std::int64_t second = 0; second < 2 * hour; ++second) {
+        const std::int64_t found = windows.add(noon + day + second, hour);
+        const std::int64_t exact = std::min<std::int64_t>(second + 1, hour);
+        ASSERT_GE(found, exact);
+        ASSERT_LE(found, exact + hour / 16);
+    }
+}
+
 /// The same by plain lists of times.
 class PlainWindows {
 public:
