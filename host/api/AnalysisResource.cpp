@@ -201,7 +201,10 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     requireOpen(explainer.isOpen());
     Explainer::EventEntry entry{id, isOwn, {}};
     if (!StoredRow::fill(entry.row, explainer.layout(), event->json)) {
-        throw RequestRefused(500, "the event has no row", "event");
+        throw RequestRefused(409,
+                             "no entry raised this event, so there is none to explain: ask for the "
+                             "event that raised the episode",
+                             "event");
     }
     entry.text = StoredRow::entryText(event->json);
     const MonitoredLogs logs;

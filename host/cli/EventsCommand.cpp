@@ -35,19 +35,47 @@ Colour colourOf(const std::string& severity) {
     return severity == "info" ? Colour::NONE : Colour::NOTICE;
 }
 
-std::string logOf(const Json& row) {
+std::string logOf(const Json& event) {
+    if (!event.contains("row")) {
+        return JsonText::text(event, "log");
+    }
+    const Json& row = JsonText::member(event, "row");
     const std::string name = JsonText::text(row, "ULOGNAME");
     return name.empty() ? JsonText::text(row, "LOGPATH") + JsonText::text(row, "LOGNAME")
                         : JsonText::text(row, "ULOGPATH") + name;
 }
 
-std::string entryOf(const Json& row) {
+/// What an event without an entry says of its episode.
+std::string summaryOf(const Json& event) {
+    const Json& episode = JsonText::member(event, "episode");
+    std::string text = JsonText::text(event, "state");
+    if (event.contains("reason")) {
+        text += ": " + JsonText::text(event, "reason");
+    }
+    if (const std::uint64_t count = JsonText::number(episode, "count"); count > 0) {
+        text += "; " + std::to_string(count) + (count == 1 ? " entry" : " entries") + " from " +
+                TimeDisplay::local(JsonText::text(episode, "first")) + " to " +
+                TimeDisplay::local(JsonText::text(episode, "last"));
+    }
+    return text;
+}
+
+/// The values of the event's group before the text of its entry.
+std::string entryOf(const Json& event) {
+    std::string group;
+    for (const auto& [name, value] : JsonText::member(event, "group").items()) {
+        group += name + '=' + JsonText::text(value) + ' ';
+    }
+    if (!event.contains("row")) {
+        return group + summaryOf(event);
+    }
+    const Json& row = JsonText::member(event, "row");
     const auto either = [&](const char* utf8, const char* local) {
         const std::string text = JsonText::text(row, utf8);
         return text.empty() ? JsonText::text(row, local) : text;
     };
     const std::string source = either("UENTRYSRC", "ENTRYSRC");
-    return (source.empty() ? "" : source + ": ") + either("UENTRYDESC", "ENTRYDESC");
+    return group + (source.empty() ? "" : source + ": ") + either("UENTRYDESC", "ENTRYDESC");
 }
 
 std::string padded(const std::string& text, std::size_t columns) {
@@ -77,7 +105,7 @@ std::string lineOf(const Json& event, const Terminal& terminal) {
                              TimeDisplay::local(JsonText::text(event, "raised")) + "  ";
     const std::string tail =
         padded(DisplayText::visible(JsonText::text(event, "situation")), situationColumns) + "  " +
-        DisplayText::visible(entryOf(JsonText::member(event, "row")));
+        DisplayText::visible(entryOf(event));
     const std::size_t before = head.size() + severityColumns + 2;
     const std::size_t room = terminal.width > before ? terminal.width - before : 1;
     return head + terminal.coloured(padded(severity, severityColumns), colourOf(severity)) + "  " +
@@ -94,13 +122,12 @@ std::string tableText(const Json& events, const Terminal& terminal) {
                  {"ENTRY"}});
     for (const Json& event : events) {
         const std::string severity = JsonText::text(event, "severity");
-        const Json& row = JsonText::member(event, "row");
         table.add({JsonText::text(event, "id"),
                    TimeDisplay::local(JsonText::text(event, "raised")),
                    {severity, colourOf(severity)},
                    JsonText::text(event, "situation"),
-                   logOf(row),
-                   entryOf(row)});
+                   logOf(event),
+                   entryOf(event)});
     }
     return table.text(terminal);
 }

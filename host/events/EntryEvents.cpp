@@ -69,20 +69,33 @@ std::string contextText(const EntryContext& context, std::size_t entries) {
 } // namespace
 
 void EntryEvents::drop() noexcept {
-    m_situations.clear();
+    m_events.clear();
     m_details.clear();
     m_rows.clear();
+}
+
+void EntryEvents::add(const std::shared_ptr<const SituationLabel>& situation, const char* row,
+                      std::size_t rowSize, const std::shared_ptr<const EventJudgement>& judgement) {
+    m_events.push_back({situation, judgement, m_rows.size(), row != nullptr});
+    if (row != nullptr) {
+        m_rows.insert(m_rows.end(), row, row + rowSize);
+    }
 }
 
 void EntryEvents::describe(LogEntry& entry, const EntryContext& context) {
     const EntryKeep& keep = entry.keep();
     const SituationLabel* last = nullptr;
+    std::shared_ptr<const EntryDetail> lastDetail;
     m_details.clear();
-    for (const auto& situation : m_situations) {
+    for (const auto& [situation, judgement, at, hasRow] : m_events) {
+        if (!hasRow) { // not an event of this entry: the entry has only shown that it was due
+            m_details.push_back(nullptr);
+            continue;
+        }
         // Situations mostly keep the same.
         if (last != nullptr && last->fields == situation->fields &&
             last->context == situation->context) {
-            m_details.push_back(m_details.back());
+            m_details.push_back(lastDetail);
             continue;
         }
         last = situation.get();
@@ -92,7 +105,8 @@ void EntryEvents::describe(LogEntry& entry, const EntryContext& context) {
         detail->isCut =
             !detail->text.empty() && (entry.isCut() || entry.text().size() > keep.textBytes);
         detail->context = contextText(context, situation->context);
-        m_details.push_back(std::move(detail));
+        lastDetail = std::move(detail);
+        m_details.push_back(lastDetail);
     }
 }
 

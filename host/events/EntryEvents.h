@@ -23,13 +23,9 @@ public:
     /// once.
     static inline constinit thread_local EntryEvents* ofThisThread = nullptr;
 
-    /// Copies the row in. All rows of an entry have the same size.
+    /// Copies the row in; null: the event has none. All rows of an entry have the same size.
     void add(const std::shared_ptr<const SituationLabel>& situation, const char* row,
-             std::size_t rowSize) {
-        m_rowSize = rowSize;
-        m_rows.insert(m_rows.end(), row, row + rowSize);
-        m_situations.push_back(situation);
-    }
+             std::size_t rowSize, const std::shared_ptr<const EventJudgement>& judgement = nullptr);
     /// What the entry has beside the rows: completes the events before they leave. `context` ends
     /// with the entry.
     void describe(LogEntry& entry, const EntryContext& context);
@@ -39,22 +35,34 @@ public:
         }
     }
 
-    bool empty() const noexcept { return m_situations.empty(); }
-    std::size_t size() const noexcept { return m_situations.size(); }
+    bool empty() const noexcept { return m_events.empty(); }
+    std::size_t size() const noexcept { return m_events.size(); }
     const std::shared_ptr<const SituationLabel>& situation(std::size_t index) const noexcept {
-        return m_situations[index];
+        return m_events[index].situation;
     }
-    const char* row(std::size_t index) const noexcept { return m_rows.data() + index * m_rowSize; }
+    const std::shared_ptr<const EventJudgement>& judgement(std::size_t index) const noexcept {
+        return m_events[index].judgement;
+    }
+    /// Null: the event has no row.
+    const char* row(std::size_t index) const noexcept {
+        return m_events[index].hasRow ? m_rows.data() + m_events[index].row : nullptr;
+    }
     /// Null until the entry was described.
     std::shared_ptr<const EntryDetail> detail(std::size_t index) const noexcept {
         return index < m_details.size() ? m_details[index] : nullptr;
     }
 
 private:
+    struct Collected {
+        std::shared_ptr<const SituationLabel> situation;
+        std::shared_ptr<const EventJudgement> judgement;
+        std::size_t row = 0; ///< where its row begins
+        bool hasRow = true;
+    };
+
     void drop() noexcept;
 
-    std::size_t m_rowSize = 0;
-    std::vector<std::shared_ptr<const SituationLabel>> m_situations;
+    std::vector<Collected> m_events;
     std::vector<char> m_rows;
     std::vector<std::shared_ptr<const EntryDetail>> m_details; ///< as many as events, or none
 };

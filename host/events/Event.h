@@ -13,6 +13,8 @@
 namespace zrm::host {
 
 class FollowedLog;
+struct EpisodeShare;
+struct EventJudgement;
 
 /// What a situation adds to its events. Immutable; shared by the situation and its undelivered
 /// events.
@@ -22,6 +24,7 @@ struct SituationLabel {
     std::string text = {};                ///< its description for people; may be empty
     std::vector<std::string> fields = {}; ///< names of the fields that its conditions name
     std::size_t context = 0;              ///< earlier entries that its events have
+    std::int64_t definition = 0; ///< a hash of what decides when its episodes begin and end
 };
 
 /// What an event has of its entry beside the row, as JSON values. Immutable.
@@ -39,11 +42,14 @@ struct Event {
     std::uint64_t id = 0;    ///< counted from 1 in the order of arrival
     std::int64_t raised = 0; ///< milliseconds since 1970-01-01, UTC
     std::shared_ptr<const SituationLabel> situation;
-    const char* row = nullptr;                 ///< the row's bytes, owned by the queue
-    std::shared_ptr<const EntryDetail> detail; ///< null: the row is all there is
-    bool endsEntry = true;                     ///< false: its entry has raised the next event, too
+    const char* row = nullptr; ///< the row's bytes, owned by the queue; null: no entry raised it
+    std::shared_ptr<const EntryDetail> detail;       ///< null: the row is all there is
+    std::shared_ptr<const EventJudgement> judgement; ///< null: the conditions alone decided
+    bool endsEntry = true;            ///< false: its entry has raised the next event, too
     std::shared_ptr<FollowedLog> log; ///< with the last event of an entry of a followed log
     LogPosition behind;               ///< where the log's next entry begins
+    /// With the last event of an entry: what changed in episodes up to there; null: nothing.
+    std::shared_ptr<const std::vector<EpisodeShare>> shares;
 };
 
 /// One event in the form in which it leaves the process. The texts belong to the provider of the

@@ -1,5 +1,6 @@
 #include "host/events/EventJson.h"
 
+#include "host/events/Episode.h"
 #include "host/events/RowText.h"
 
 #include <utility>
@@ -15,8 +16,13 @@ void EventJson::append(std::string& text, const Event& event) const {
         json.key(m_situationKey).value(event.situation->name);
         json.key(m_severityKey).value(event.situation->severity);
         json.key(m_raisedKey).time(event.raised);
-        json.key(m_rowKey);
-        m_row.write(json, event.row);
+        if (event.judgement != nullptr) {
+            writeJudgement(json, event);
+        }
+        if (event.row != nullptr) {
+            json.key(m_rowKey);
+            m_row.write(json, event.row);
+        }
         if (event.detail != nullptr) {
             writeDetail(json, *event.detail);
         }
@@ -39,8 +45,41 @@ void EventJson::writeDetail(JsonWriter& json, const EntryDetail& detail) const {
     }
 }
 
+void EventJson::writeJudgement(JsonWriter& json, const Event& event) {
+    constexpr std::int64_t milliseconds = 1000; // in a second
+    const EventJudgement& judgement = *event.judgement;
+    const bool isResolved = judgement.state == EventJudgement::RESOLVED;
+    if (judgement.episode != nullptr) {
+        json.member("state", isResolved ? "resolved" : "raised");
+        json.key("episode").beginObject().member("id", judgement.episode->value());
+        json.key("raised").time(isResolved ? judgement.raised : event.raised);
+        json.member("count", judgement.count);
+        json.key("first").time(judgement.first * milliseconds);
+        json.key("last").time(judgement.last * milliseconds).endObject();
+    } else if (judgement.count > 0) {
+        json.member("count", judgement.count);
+    }
+    if (!judgement.group.empty()) {
+        json.key("group").beginObject();
+        for (const GroupValue& group : judgement.group) {
+            json.member(group.name, group.value);
+        }
+        json.endObject();
+    }
+    if (!judgement.reason.empty()) {
+        json.member("reason", judgement.reason);
+    }
+    if (event.row == nullptr) {
+        json.member("log", judgement.log).member("node", judgement.node);
+    }
+}
+
 void EventJson::appendLog(std::string& text, const Event& event) const {
-    LogPath::append(text, m_layout, event.row);
+    if (event.row == nullptr) {
+        text += event.judgement->log;
+    } else {
+        LogPath::append(text, m_layout, event.row);
+    }
 }
 
 } // namespace zrm::host

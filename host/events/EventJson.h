@@ -11,7 +11,8 @@ namespace zrm::host {
 
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}, and for the log
 /// of a [[log]] table also {"fields", "entry", "entry_cut", "context"} where there is such a thing.
-/// Immutable, so any thread.
+/// What judges groups and episodes adds {"state", "episode", "count", "group", "reason"}. An event
+/// without a row has {"log", "node"} instead. Immutable, so any thread.
 class EventJson {
 public:
     explicit EventJson(RowLayout layout);
@@ -25,6 +26,7 @@ public:
 
 private:
     void writeDetail(JsonWriter& json, const EntryDetail& detail) const;
+    static void writeJudgement(JsonWriter& json, const Event& event);
 
     RowLayout m_layout;
     RowJson m_row;

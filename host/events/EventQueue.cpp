@@ -1,6 +1,7 @@
 #include "host/events/EventQueue.h"
 
 #include "host/base/TimeText.h"
+#include "host/events/Episode.h"
 #include "host/framework/EventRoomControl.h"
 
 #include <algorithm>
@@ -14,7 +15,13 @@ namespace {
 constexpr std::chrono::milliseconds gatherTime{5};
 
 std::size_t bytesOf(const Event& event) {
-    return event.detail == nullptr ? 0 : event.detail->bytes();
+    std::size_t bytes = event.detail == nullptr ? 0 : event.detail->bytes();
+    if (event.judgement != nullptr) {
+        for (const GroupValue& group : event.judgement->group) {
+            bytes += group.name.size() + group.value.size();
+        }
+    }
+    return bytes;
 }
 
 } // namespace
@@ -22,11 +29,7 @@ std::size_t bytesOf(const Event& event) {
 EventQueue::EventQueue(std::size_t capacity, std::size_t rowSize, std::uint64_t last)
     // The rows are left uninitialised: pages not yet used by an event cost no memory.
     : m_rowSize(rowSize), m_last(last), m_events(capacity),
-      m_rows(std::make_unique_for_overwrite<char[]>(capacity * rowSize)) {
-    for (std::size_t slot = 0; slot < capacity; ++slot) {
-        m_events[slot].row = m_rows.get() + slot * rowSize;
-    }
-}
+      m_rows(std::make_unique_for_overwrite<char[]>(capacity * rowSize)) {}
 
 EventQueue::Reader EventQueue::addReader() {
     const std::lock_guard guard(m_mutex);
@@ -41,9 +44,10 @@ std::uint64_t EventQueue::slowest() const {
     return slowest == m_cursor.end() ? m_next : *slowest;
 }
 
-bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row) {
+bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, const char* row,
+                      const std::shared_ptr<const EventJudgement>& judgement) {
     if (EntryEvents* const entry = EntryEvents::ofThisThread) {
-        entry->add(situation, row, m_rowSize);
+        entry->add(situation, row, m_rowSize, judgement);
         return true;
     }
     std::unique_lock lock(m_mutex);
@@ -53,6 +57,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
     Event event;
     event.raised = WallClock::now();
     event.situation = situation;
+    event.judgement = judgement;
     add(std::move(event), row);
     announce(lock);
     return true;
@@ -71,6 +76,7 @@ std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
         event.raised = raised;
         event.situation = events.situation(index);
         event.detail = events.detail(index);
+        event.judgement = events.judgement(index);
         event.endsEntry = index + 1 == events.size();
         if (event.endsEntry) {
             event.log = log;
@@ -96,12 +102,18 @@ void EventQueue::announce(std::unique_lock<std::mutex>& lock) {
 /// Gives an event its id and its place, behind all others.
 void EventQueue::add(Event event, const char* row) {
     event.id = m_last + m_next + m_aside.size() + 1;
+    if (event.judgement != nullptr && event.judgement->state == EventJudgement::RAISED) {
+        event.judgement->episode->set(event.id);
+    }
     m_detailBytes += bytesOf(event);
     if (m_aside.empty() && hasSlot()) {
         put(event, row);
     } else {
-        auto copy = std::make_unique_for_overwrite<char[]>(m_rowSize);
-        std::memcpy(copy.get(), row, m_rowSize);
+        std::unique_ptr<char[]> copy;
+        if (row != nullptr) {
+            copy = std::make_unique_for_overwrite<char[]>(m_rowSize);
+            std::memcpy(copy.get(), row, m_rowSize);
+        }
         m_aside.push_back({std::move(event), std::move(copy)});
     }
 }
@@ -110,14 +122,13 @@ void EventQueue::add(Event event, const char* row) {
 void EventQueue::put(const Event& event, const char* row) {
     const std::size_t number = m_next % m_events.size();
     Event& slot = m_events[number];
-    slot.id = event.id;
-    slot.raised = event.raised;
-    slot.situation = event.situation;
-    slot.detail = event.detail;
-    slot.endsEntry = event.endsEntry;
-    slot.log = event.log;
-    slot.behind = event.behind;
-    std::memcpy(m_rows.get() + number * m_rowSize, row, m_rowSize);
+    slot = event;
+    slot.row = nullptr;
+    if (row != nullptr) {
+        char* const room = m_rows.get() + number * m_rowSize;
+        std::memcpy(room, row, m_rowSize);
+        slot.row = room;
+    }
     ++m_next;
 }
 
@@ -207,6 +218,8 @@ void EventQueue::dropDetails(std::uint64_t from) {
         Event& event = m_events[from % m_events.size()];
         m_detailBytes -= bytesOf(event);
         event.detail.reset();
+        event.judgement.reset();
+        event.shares.reset();
     }
 }
 

@@ -57,9 +57,11 @@ public:
     /// must not call the queue.
     void onFull(std::function<void(bool isFull)> listener) { m_listener = std::move(listener); }
 
-    /// Copies one row. False when the queue is closed, so that the row was not taken. Where the
-    /// calling thread collects the events of an entry, the row is collected.
-    bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row);
+    /// Copies one row; null for an event without a row, whose judgement has its log. False when the
+    /// queue is closed, so that the event was not taken. Where the calling thread collects the
+    /// events of an entry, the event is collected.
+    bool push(const std::shared_ptr<const SituationLabel>& situation, const char* row,
+              const std::shared_ptr<const EventJudgement>& judgement = nullptr);
 
     /// Copies all events of an entry, which stay together. The last one carries the position behind
     /// the entry. Returns its id; 0 if nothing was taken because the queue is closed.

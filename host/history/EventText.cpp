@@ -108,9 +108,11 @@ bool EventText::isIn(std::string_view log, std::string_view document) const {
     if (entry != event.end() && hasText(*entry)) {
         return true;
     }
-    const auto fields = event.find("fields");
-    if (fields != event.end() && std::any_of(fields->begin(), fields->end(), hasText)) {
-        return true;
+    for (const char* const name : {"fields", "group"}) {
+        const auto values = event.find(name);
+        if (values != event.end() && std::any_of(values->begin(), values->end(), hasText)) {
+            return true;
+        }
     }
     const auto row = event.find("row");
     if (row == event.end()) {

@@ -17,9 +17,9 @@ public:
 
     bool isEmpty() const noexcept { return m_whole.isEmpty(); }
 
-    /// Whether the text occurs in the log's full path, the situation's name, the entry, a field, or
-    /// a character column of the row other than the node and the times. `document` is the event's
-    /// JSON; if it cannot be parsed, its raw bytes are searched.
+    /// Whether the text occurs in the log's full path, the situation's name, the entry, a field, a
+    /// group value, or a character column of the row other than the node and the times. `document`
+    /// is the event's JSON; if it cannot be parsed, its raw bytes are searched.
     bool isIn(std::string_view log, std::string_view document) const;
 
 private:

@@ -14,9 +14,12 @@ namespace zrm::host {
 
 namespace {
 
-/// The name of an annotation has letters, digits and underlines only.
-std::string annotationName(std::string_view field) {
-    std::string name = "field_" + std::string(field);
+/// How long an episode may last before Alertmanager takes it for resolved.
+constexpr std::int64_t longestEpisode = std::int64_t{30} * 24 * 60 * 60 * 1000; // milliseconds
+
+/// Names of labels and annotations have letters, digits and underlines only.
+std::string plainName(const char* prefix, std::string_view field) {
+    std::string name = prefix + std::string(field);
     std::replace_if(
         name.begin(), name.end(),
         [](char c) { return (c < '0' || c > '9') && (c < 'A' || c > 'Z') && (c < 'a' || c > 'z'); },
@@ -24,11 +27,11 @@ std::string annotationName(std::string_view field) {
     return name;
 }
 
-/// Fields whose names become the same give one annotation, of the first.
-void writeFields(JsonWriter& json, const EventRow& row) {
+/// Fields whose names become the same give one member, of the first.
+void writeFields(JsonWriter& json, const char* prefix, std::span<const EventRow::Field> fields) {
     std::set<std::string> names;
-    for (const EventRow::Field& field : row.fields()) {
-        const auto [name, isNew] = names.insert(annotationName(field.name));
+    for (const EventRow::Field& field : fields) {
+        const auto [name, isNew] = names.insert(plainName(prefix, field.name));
         if (isNew) {
             json.member(*name, field.value);
         }
@@ -44,7 +47,12 @@ void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow
     if (!row.entry().empty()) {
         json.member("entry", row.entry());
     }
-    writeFields(json, row);
+    if (row.episode().id > 0) {
+        json.member("episode", std::to_string(row.episode().id));
+        json.member("count", std::to_string(row.episode().count));
+        json.member("first", row.episode().first).member("last", row.episode().last);
+    }
+    writeFields(json, "field_", row.fields());
     json.endObject();
 }
 
@@ -70,19 +78,26 @@ void AlertmanagerSink::writeAlert(JsonWriter& json, const EventRecord& event) co
     writeLabels(json, event, row);
     json.key("annotations");
     writeAnnotations(json, event, row);
-    json.key("startsAt").time(event.raised);
-    json.key("endsAt").time(event.raised + m_resolveAfter.count());
+    if (row.isResolved()) {
+        json.member("startsAt", row.episode().raised).key("endsAt").time(event.raised);
+    } else {
+        const bool hasEnd = row.state().empty(); // an episode's end is another event
+        json.key("startsAt").time(event.raised);
+        json.key("endsAt").time(event.raised + (hasEnd ? m_resolveAfter.count() : longestEpisode));
+    }
     if (!m_generatorUrl.empty()) {
         json.member("generatorURL", m_generatorUrl);
     }
     json.endObject();
 }
 
-/// The event's labels, then the configured ones, which have other names.
+/// The event's labels, then the configured ones, which have other names. Those of a resolved event
+/// are those of the raised one: they identify the alert.
 void AlertmanagerSink::writeLabels(JsonWriter& json, const EventRecord& event,
                                    const EventRow& row) const {
     json.beginObject().member("alertname", event.situation).member("severity", event.severity);
     json.member("log", event.log).member("node", row.node());
+    writeFields(json, "group_", row.group());
     for (const auto& [name, value] : m_labels) {
         json.member(name, value);
     }

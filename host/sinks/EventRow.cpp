@@ -7,22 +7,56 @@
 
 namespace zrm::host {
 
-EventRow::EventRow(const EventRecord& event) {
-    const auto json = nlohmann::ordered_json::parse(event.json, nullptr, false);
-    const auto row = json.is_object() ? json.find("row") : json.end();
-    if (row == json.end() || !row->is_object()) {
-        return;
-    }
-    if (const auto entry = json.find("entry"); entry != json.end() && entry->is_string()) {
-        m_entry = entry->get<std::string>();
-    }
-    if (const auto fields = json.find("fields"); fields != json.end() && fields->is_object()) {
-        for (const auto& [name, value] : fields->items()) {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+/// Null if the object has no such member.
+const Json& member(const Json& object, const char* name) {
+    static const Json nothing;
+    const auto found = object.is_object() ? object.find(name) : object.end();
+    return found == object.end() ? nothing : *found;
+}
+
+std::string textOf(const Json& object, const char* name) {
+    const Json& value = member(object, name);
+    return value.is_string() ? value.get<std::string>() : std::string();
+}
+
+std::uint64_t numberOf(const Json& object, const char* name) {
+    const Json& value = member(object, name);
+    return value.is_number_unsigned() ? value.get<std::uint64_t>() : 0;
+}
+
+std::vector<EventRow::Field> fieldsOf(const Json& object) {
+    std::vector<EventRow::Field> fields;
+    if (object.is_object()) {
+        for (const auto& [name, value] : object.items()) {
             if (value.is_string()) {
-                m_fields.push_back({name, value.get<std::string>()});
+                fields.push_back({name, value.get<std::string>()});
             }
         }
     }
+    return fields;
+}
+
+} // namespace
+
+EventRow::EventRow(const EventRecord& event) {
+    const Json json = Json::parse(event.json, nullptr, false);
+    const Json& episode = member(json, "episode");
+    m_state = textOf(json, "state");
+    m_episode = {numberOf(episode, "id"), numberOf(episode, "count"), textOf(episode, "raised"),
+                 textOf(episode, "first"), textOf(episode, "last")};
+    m_group = fieldsOf(member(json, "group"));
+    const Json* const row = &member(json, "row");
+    if (!row->is_object()) {
+        m_node = textOf(json, "node");
+        describeEpisode(textOf(json, "reason"));
+        return;
+    }
+    m_entry = textOf(json, "entry");
+    m_fields = fieldsOf(member(json, "fields"));
     for (const auto& [name, value] : row->items()) {
         if (value.is_string()) {
             m_columns.push_back({name, value.get<std::string>()});
@@ -40,7 +74,22 @@ std::string_view EventRow::text(std::string_view column) const {
     return text == nullptr ? std::string_view() : *text;
 }
 
+void EventRow::describeEpisode(std::string_view reason) {
+    m_text = m_state;
+    if (!reason.empty()) {
+        (m_text += ": ") += reason;
+    }
+    if (m_episode.count > 0) {
+        m_text += "; " + std::to_string(m_episode.count) +
+                  (m_episode.count == 1 ? " entry" : " entries") + " from " + m_episode.first +
+                  " to " + m_episode.last;
+    }
+}
+
 std::string_view EventRow::description() const {
+    if (m_columns.empty()) {
+        return m_text;
+    }
     const std::string_view utf8 = text("UENTRYDESC");
     return utf8.empty() ? text("ENTRYDESC") : utf8;
 }
@@ -52,7 +101,7 @@ std::string_view EventRow::source() const {
 
 std::string_view EventRow::node() const {
     // The node type follows a colon.
-    const std::string_view node = text("ORIGINNODE");
+    const std::string_view node = m_columns.empty() ? m_node : text("ORIGINNODE");
     return node.substr(0, node.rfind(':'));
 }
 

@@ -37,8 +37,8 @@ constexpr const SeverityCodes& SeverityCodes::of(std::string_view severity) noex
     return found == severityCodes.end() ? severityCodes[2] : *found;
 }
 
-/// The row of an event and what it has of its entry beside the row, parsed from the event's JSON
-/// for sinks that write it in another form. Immutable, so any thread.
+/// The row of an event, what it has of its entry beside the row, and its episode, parsed from the
+/// event's JSON for sinks that write it in another form. Immutable, so any thread.
 class EventRow {
 public:
     struct Column {
@@ -66,7 +66,8 @@ public:
     /// The whole entry, unchanged; empty if the event does not have it.
     const std::string& entry() const noexcept { return m_entry; }
 
-    /// The text of the entry, as far as its column holds it.
+    /// The text of the entry, as far as its column holds it. Of an event without a row, what it
+    /// says of its episode.
     std::string_view description() const;
 
     /// The program, or part of a program, that wrote the entry.
@@ -75,10 +76,34 @@ public:
     /// The name of the system on which the entry was written.
     std::string_view node() const;
 
+    /// "raised" or "resolved"; empty: the situation has no episodes.
+    const std::string& state() const noexcept { return m_state; }
+    bool isResolved() const noexcept { return m_state == "resolved"; }
+
+    /// The episode that the event belongs to; its texts are times. Zero and empty if there is none.
+    struct Episode {
+        std::uint64_t id = 0;
+        std::uint64_t count = 0; ///< entries so far
+        std::string raised;
+        std::string first; ///< time of the first entry
+        std::string last;
+    };
+    const Episode& episode() const noexcept { return m_episode; }
+
+    /// The values of the event's group.
+    std::span<const Field> group() const noexcept { return m_group; }
+
 private:
+    void describeEpisode(std::string_view reason);
+
     std::vector<Column> m_columns;
     std::vector<Field> m_fields;
     std::string m_entry;
+    std::string m_state;
+    Episode m_episode;
+    std::vector<Field> m_group;
+    std::string m_node; ///< as written
+    std::string m_text; ///< of an event without a row
 };
 
 } // namespace zrm::host

@@ -52,6 +52,17 @@ void writeAttributes(JsonWriter& json, const EventRecord& event, const EventRow&
     if (!row.entry().empty()) {
         writeAttribute(json, "zrm.entry", row.entry());
     }
+    for (const EventRow::Field& group : row.group()) {
+        writeAttribute(json, "zrm.group." + group.name, group.value);
+    }
+    if (!row.state().empty()) {
+        const EventRow::Episode& episode = row.episode();
+        writeAttribute(json, "zrm.state", row.state());
+        writeAttribute(json, "zrm.episode.id", static_cast<std::int64_t>(episode.id));
+        writeAttribute(json, "zrm.episode.count", static_cast<std::int64_t>(episode.count));
+        writeAttribute(json, "zrm.episode.first", episode.first);
+        writeAttribute(json, "zrm.episode.last", episode.last);
+    }
     json.endArray();
 }
 

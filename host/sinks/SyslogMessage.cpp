@@ -132,6 +132,11 @@ std::string SyslogMessage::text(const EventRecord& event) const {
     appendParameter(text, "situation", event.situation);
     appendParameter(text, "severity", event.severity);
     appendParameter(text, "log", event.log);
+    if (!row.state().empty()) {
+        appendParameter(text, "state", row.state());
+        appendParameter(text, "episode", std::to_string(row.episode().id));
+        appendParameter(text, "count", std::to_string(row.episode().count));
+    }
     text += ']';
     appendFields(text, row, longest / 2);
     text += ' ';

@@ -115,3 +115,12 @@ export function frequencyText(frequency, period) {
     ? `${words} ${plural(Number(count), "match", "matches")} within ${period}`
     : `${frequency} within ${period}`;
 }
+
+/** What an event says in one line: its group and the text of its entry, or what came of an episode. */
+export function describe(event) {
+  const group = Object.entries(event.group ?? {}).map(([name, value]) => `${name}=${value}`);
+  const text = event.row
+    ? event.row.UENTRYDESC || event.row.ENTRYDESC
+    : [event.state, event.reason, `${event.episode?.count ?? 0} entries`].filter(Boolean).join(", ");
+  return [...group, text].join(" ");
+}

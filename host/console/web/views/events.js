@@ -2,7 +2,7 @@
 
 import { get, post, withQuery } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
-import { briefTime, number, plural, SEVERITIES, time } from "../format.js";
+import { briefTime, describe, number, plural, SEVERITIES, time } from "../format.js";
 import { explained, rowList } from "../explain.js";
 import { EventStream } from "../stream.js";
 import { WindowedList } from "../windowed.js";
@@ -22,10 +22,26 @@ function entryOf({ entry, entry_cut: isCut, fields, context }) {
   ];
 }
 
-const describe = (event) => event.row?.UENTRYDESC || event.row?.ENTRYDESC || "";
 const logOf = (event) =>
+  event.log ??
   (event.row?.ULOGPATH || event.row?.LOGPATH || "") +
-  (event.row?.ULOGNAME || event.row?.LOGNAME || "");
+    (event.row?.ULOGNAME || event.row?.LOGNAME || "");
+
+/** What the event says of its group and its episode, as names and values. */
+function episodeOf({ state, episode, group, reason }) {
+  return [
+    ...Object.entries(group ?? {}),
+    ...(state ? [["State", reason ? `${state}: ${reason}` : state]] : []),
+    ...(episode
+      ? [
+          ["Episode", String(episode.id)],
+          ["Entries", number(episode.count)],
+          ["First entry", time(episode.first, true)],
+          ["Last entry", time(episode.last, true)],
+        ]
+      : []),
+  ];
+}
 
 export async function show(element, query) {
   const page = new EventsPage(element, query);
@@ -382,13 +398,13 @@ class EventsPage {
           ["Severity", h("span", { className: `severity ${event.severity}` }, event.severity)],
           ["Raised", time(event.raised, true)],
           ["Log", logOf(event)],
+          ...episodeOf(event),
         ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)]),
       ),
-      h("p", { className: "actions" }, explain),
+      event.row && h("p", { className: "actions" }, explain),
       why,
       entryOf(event),
-      h("h3", {}, "Columns"),
-      rowList(event.row),
+      event.row && [h("h3", {}, "Columns"), rowList(event.row)],
     );
     this.detail.hidden = false;
     this.split.classList.add("open");

@@ -4,7 +4,7 @@ import { get, post, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
 import { button, debounce, empty, failure, fill, h, loading, say, select, table } from "../dom.js";
 import { tableName, tablesPanel } from "../following.js";
-import { ago, briefTime, bytes, number, rate, rateText } from "../format.js";
+import { ago, briefTime, bytes, describe, number, rate, rateText } from "../format.js";
 import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
 
 const EVERY = 5000;
@@ -273,7 +273,7 @@ class LogsPage {
                 h(
                   "span",
                   { className: "what" },
-                  event.row?.UENTRYDESC || event.row?.ENTRYDESC || "",
+                  describe(event),
                 ),
               ),
             ),

@@ -4,6 +4,7 @@
 #include "host/events/ContextDemand.h"
 #include "host/events/EntryContext.h"
 #include "host/events/EntryEvents.h"
+#include "host/events/Episode.h"
 #include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
 #include "support/AllocationCount.h"
@@ -119,6 +120,17 @@ TEST_F(EntryDetailTest, SituationsThatKeepTheSameShareIt) {
     EXPECT_EQ(events.detail(0), events.detail(1));
     EXPECT_NE(events.detail(1), events.detail(2));
     EXPECT_EQ(events.detail(2)->fields, "");
+}
+
+TEST_F(EntryDetailTest, AnEventWithoutARowHasNone) {
+    EntryEvents events;
+    events.add(naming({"user"}), "row", 3);
+    events.add(naming({"user"}), nullptr, 3, std::make_shared<const EventJudgement>());
+    events.add(naming({"user"}), "row", 3);
+    events.describe(entry, {});
+    EXPECT_EQ(events.detail(1), nullptr);
+    EXPECT_NE(events.detail(0), nullptr);
+    EXPECT_EQ(events.detail(0), events.detail(2));
 }
 
 TEST_F(EntryDetailTest, TheJsonOfAnEventHasIt) {

@@ -38,6 +38,9 @@ TEST(EventText, IsFoundInTheEntryAndItsFields) {
                                  R"("fields":{"user":"Alice"},"entry":"The whole LINE"})";
     EXPECT_TRUE(EventText("whole line").isIn("/log", document));
     EXPECT_TRUE(EventText("alice").isIn("/log", document));
+    EXPECT_TRUE(
+        EventText("10.0.0.1")
+            .isIn("/log", R"({"id":1,"situation":"s","log":"/log","group":{"ip":"10.0.0.1"}})"));
     EXPECT_FALSE(EventText("user").isIn("/log", document));
     EXPECT_FALSE(EventText("bob").isIn("/log", document));
 }

@@ -67,6 +67,24 @@ TEST_F(AlertmanagerSinkTest, AnnotationsHaveTheEntryAndItsFields) {
     EXPECT_EQ(annotations.size(), 7u);
 }
 
+TEST_F(AlertmanagerSinkTest, AnEpisodeIsOneAlertThatEndsWhenItIsResolved) {
+    events.add({.more = EntryEvents::episode("raised")});
+    events.addWithoutRow(EntryEvents::episode("resolved") + EntryEvents::withoutRow);
+    AlertmanagerSink sink(config("labels = { team = 'ops' }\n"));
+    EXPECT_EQ(deliver(sink), 2u);
+    const Json raised = sent().at(0);
+    const Json resolved = sent().at(1);
+    EXPECT_EQ(raised.at("labels").at("group_ip"), "10.0.0.1");
+    EXPECT_EQ(raised.at("labels"), resolved.at("labels")) << "they identify the alert";
+    EXPECT_EQ(raised.at("startsAt"), resolved.at("startsAt"));
+    EXPECT_EQ(raised.at("endsAt"), "2026-12-20T07:03:09.412Z");
+    EXPECT_EQ(resolved.at("endsAt"), "2026-11-20T08:03:09.412Z");
+    EXPECT_EQ(resolved.at("annotations").at("count"), "74");
+    EXPECT_EQ(resolved.at("annotations").at("episode"), "1");
+    EXPECT_EQ(resolved.at("annotations").at("description"),
+              "resolved; 74 entries from 2026-11-20T07:00:00.000Z to 2026-11-20T07:01:00.000Z");
+}
+
 TEST_F(AlertmanagerSinkTest, AddsTheConfiguredLabels) {
     events.add({});
     AlertmanagerSink sink(config("resolve_after = '1d'\nlabels = { team = 'ops', _x1 = 'y' }\n"

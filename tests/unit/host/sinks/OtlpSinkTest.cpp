@@ -53,6 +53,22 @@ TEST_F(OtlpSinkTest, RecordsHaveTheEntryAndItsFields) {
     EXPECT_EQ(texts["zrm.entry"], "the line");
 }
 
+TEST_F(OtlpSinkTest, RecordsCarryTheStateOfAnEpisode) {
+    events.addWithoutRow(EntryEvents::episode("resolved") + EntryEvents::withoutRow);
+    OtlpSink sink(config());
+    ASSERT_EQ(deliver(sink), 2u);
+    const Json sent = Json::parse(server.requests()[0].body);
+    const Json& record = sent["resourceLogs"][0]["scopeLogs"][0]["logRecords"][1];
+    std::map<std::string, std::string> texts;
+    for (const Json& attribute : record["attributes"]) {
+        texts[attribute["key"]] = attribute["value"].begin()->get<std::string>();
+    }
+    EXPECT_EQ(texts["zrm.state"], "resolved");
+    EXPECT_EQ(texts["zrm.episode.id"], "1");
+    EXPECT_EQ(texts["zrm.episode.count"], "74");
+    EXPECT_EQ(texts["zrm.group.ip"], "10.0.0.1");
+}
+
 TEST_F(OtlpSinkTest, SendsLogRecords) {
     events.add({.description = "caf\xc3\xa9", .severity = "minor"});
     OtlpSink sink(

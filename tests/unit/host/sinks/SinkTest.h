@@ -55,6 +55,27 @@ public:
     }
     const std::vector<EventRecord>& records() const { return m_records; }
 
+    /// Adds an event that no entry raised: `members` of its JSON, each behind a comma.
+    void addWithoutRow(const std::string& members) {
+        const std::uint64_t id = m_records.size() + 1;
+        m_texts.push_back(R"({"id":)" + std::to_string(id) + members + "}");
+        m_records.push_back({id,
+                             raisedAt + 3'600'000,
+                             "ssh-bruteforce",
+                             "critical",
+                             "/var/log/auth.log",
+                             m_texts.back(),
+                             {}});
+    }
+    /// Members of an event's JSON for an episode of 74 entries of one address.
+    static std::string episode(const std::string& state) {
+        return R"(,"state":")" + state +
+               R"(","episode":{"id":1,"raised":"2026-11-20T07:03:09.412Z","count":74,)"
+               R"("first":"2026-11-20T07:00:00.000Z","last":"2026-11-20T07:01:00.000Z"},)"
+               R"("group":{"ip":"10.0.0.1"})";
+    }
+    static constexpr const char* withoutRow = R"(,"log":"/var/log/auth.log","node":"web1:ZRM")";
+
 private:
     std::deque<Entry> m_entries;
     std::deque<std::string> m_texts;

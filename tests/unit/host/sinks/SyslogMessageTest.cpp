@@ -36,6 +36,18 @@ TEST(SyslogMessage, HasHeaderDataAndText) {
     EXPECT_EQ(messageOf({}), expected(26, usualData, "Failed password for root"));
 }
 
+TEST(SyslogMessage, OfAnEpisodeHasItsStateIdAndCount) {
+    EntryEvents events;
+    events.addWithoutRow(EntryEvents::episode("resolved") +
+                         R"(,"reason":"the situation was removed")" + EntryEvents::withoutRow);
+    const std::string message = SyslogMessage("daemon").text(events.records().front());
+    EXPECT_NE(message.find(" web1 zrmagent "), std::string::npos) << message;
+    EXPECT_NE(message.find(R"( state="resolved" episode="1" count="74"] )"
+                           "resolved: the situation was removed; 74 entries from "),
+              std::string::npos)
+        << message;
+}
+
 TEST(SyslogMessage, FieldsAreASecondElement) {
     const std::string message =
         messageOf({.more = R"(,"fields":{"user":"root","a b=":"x]\"y"},"entry":"the line")"});

@@ -1,0 +1,67 @@
+#ifndef ZRM_HOST_EPISODE_H
+#define ZRM_HOST_EPISODE_H
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace zrm::host {
+
+/// The id of an episode, which is the id of the event that raised it. The queue sets it when it
+/// takes that event; 0 until then. Shared by all that refer to the episode. Any thread.
+class EpisodeId {
+public:
+    explicit EpisodeId(std::uint64_t value = 0) noexcept : m_value(value) {}
+    std::uint64_t value() const noexcept { return m_value.load(std::memory_order_acquire); }
+    void set(std::uint64_t value) noexcept { m_value.store(value, std::memory_order_release); }
+
+private:
+    std::atomic<std::uint64_t> m_value;
+};
+
+/// What one log has contributed to an episode. Times are the entries' own, in seconds since 1970.
+struct EpisodeShare {
+    std::shared_ptr<const EpisodeId> episode;
+    std::string log; ///< its name
+    std::uint64_t count = 0;
+    std::int64_t first = 0;
+    std::int64_t last = 0;
+};
+
+/// One value of an event's group, in UTF-8.
+struct GroupValue {
+    std::string name;
+    std::string value;
+    bool operator==(const GroupValue&) const = default;
+};
+
+/// What the judgement of groups and episodes adds to an event. Immutable.
+struct EventJudgement {
+    enum class State {
+        SINGLE, ///< the situation has no episodes
+        RAISED,
+        RESOLVED,
+        PAUSED, ///< as SINGLE, and nothing is raised for the group until `pauseEnds`
+    };
+    using enum State;
+
+    State state = SINGLE;
+    std::shared_ptr<EpisodeId> episode; ///< null: no episodes
+    std::uint64_t count = 0;            ///< of the episode, or those that met a threshold; 0: none
+    std::int64_t first = 0;             ///< time of the first of them, in seconds since 1970
+    std::int64_t last = 0;              ///< time of the last
+    std::int64_t pauseEnds = 0;         ///< of PAUSED: an entries' time, in seconds since 1970
+    std::vector<GroupValue> group;      ///< empty: the situation has no groups
+    std::string reason;                 ///< why it is resolved; empty: nothing more has come
+
+    // Of events without a row.
+    std::string log;         ///< full path of the log that raised the episode
+    std::string node;        ///< as the rows have it in ORIGINNODE
+    std::int64_t raised = 0; ///< when it was raised: milliseconds since 1970, UTC
+};
+
+} // namespace zrm::host
+
+#endif
