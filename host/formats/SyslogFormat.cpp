@@ -19,6 +19,10 @@ public:
         columns.time = time.time;
         columns.offset = time.offset;
         const SyslogParts parts = SyslogForms::split(entry, time);
+        if (const auto priority = SyslogForms::priority(entry)) {
+            columns.type = SyslogForms::severityOf(*priority);
+            columns.entryClass = SyslogForms::facilityOf(*priority);
+        }
         columns.system = parts.host;
         columns.source = sourceOf(parts);
         columns.description = parts.description;

@@ -75,6 +75,10 @@ long SysLogFile::formatFollowedEntry(char* line, EntryRow& row, void* reportStat
                                 : SyslogClock::readOnce(text, *followSettings(),
                                                         newestOf(reportState), entry.entrytime);
     const SyslogParts parts = SyslogForms::split(text, head);
+    if (const auto priority = SyslogForms::priority(text)) {
+        fillColumn(entry.entrytype, SyslogForms::severityOf(*priority));
+        fillColumn(entry.entryclass, SyslogForms::facilityOf(*priority));
+    }
     fillColumn(entry.entrysys, parts.host);
     const std::size_t sourceLength = fillSource(entry.entrysrc, parts);
     const std::size_t length = fillColumn(entry.entrydesc, parts.description);

@@ -4,19 +4,12 @@
 #include "logtypes/SyslogForms.h"
 
 #include <algorithm>
-#include <array>
 #include <optional>
 
 namespace zrm {
 
 namespace {
 
-constexpr std::array<std::string_view, 24> facilities = {
-    "kern",   "user",   "mail",     "daemon", "auth",   "syslog", "lpr",    "news",
-    "uucp",   "cron",   "authpriv", "ftp",    "ntp",    "audit",  "alert",  "clock",
-    "local0", "local1", "local2",   "local3", "local4", "local5", "local6", "local7"};
-constexpr std::array<std::string_view, 8> severities = {"emerg",   "alert",  "crit", "err",
-                                                        "warning", "notice", "info", "debug"};
 constexpr std::string_view numbers = "0 1 2 3 4 5 6 7 8 9 1011121314151617181920212223";
 
 /// A number up to 23 as text.
@@ -33,9 +26,9 @@ void addPart(EntryFields& fields, std::string_view name, std::string_view value)
 void addPriority(EntryFields& fields, unsigned priority) {
     const unsigned facility = priority / 8;
     const unsigned severity = priority % 8;
-    fields.add("facility", facilities[facility]);
+    fields.add("facility", SyslogForms::facilityOf(priority));
     fields.add("facility_code", textOf(facility));
-    fields.add("severity", severities[severity]);
+    fields.add("severity", SyslogForms::severityOf(priority));
     fields.add("severity_code", textOf(severity));
 }
 

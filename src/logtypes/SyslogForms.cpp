@@ -11,6 +11,13 @@ namespace {
 
 constexpr std::string_view repeatNotice = "last message repeated ";
 constexpr std::string_view byteOrderMark = "\xEF\xBB\xBF";
+constexpr unsigned mostPriority = 191;
+constexpr std::array<std::string_view, 24> facilities = {
+    "kern",   "user",   "mail",     "daemon", "auth",   "syslog", "lpr",    "news",
+    "uucp",   "cron",   "authpriv", "ftp",    "ntp",    "audit",  "alert",  "clock",
+    "local0", "local1", "local2",   "local3", "local4", "local5", "local6", "local7"};
+constexpr std::array<std::string_view, 8> severities = {"emerg",   "alert",  "crit", "err",
+                                                        "warning", "notice", "info", "debug"};
 using Characters = std::array<bool, 256>; ///< by code
 
 constexpr Characters setOf(std::string_view members) {
@@ -231,13 +238,20 @@ SyslogParts splitRfc5424(std::string_view text) {
 } // namespace
 
 std::optional<unsigned> SyslogForms::priority(std::string_view line) noexcept {
-    constexpr unsigned mostPriority = 191;
     const std::size_t length = priorityLength(line);
     unsigned number = 0;
     for (std::size_t at = 1; at + 1 < length; ++at) {
         number = number * 10 + static_cast<unsigned>(line[at] - '0');
     }
     return length > 0 && number <= mostPriority ? std::optional(number) : std::nullopt;
+}
+
+std::string_view SyslogForms::severityOf(unsigned priority) noexcept {
+    return severities[priority % severities.size()];
+}
+
+std::string_view SyslogForms::facilityOf(unsigned priority) noexcept {
+    return facilities[priority / severities.size() % facilities.size()];
 }
 
 SyslogStart SyslogForms::start(std::string_view line) noexcept {

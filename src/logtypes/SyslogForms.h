@@ -62,6 +62,10 @@ SyslogParts split(std::string_view line, const SyslogHead& head) noexcept;
 /// The number in the line's "<PRI>": facility * 8 + severity. None if it has none, or no valid one.
 std::optional<unsigned> priority(std::string_view line) noexcept;
 
+/// The words for such a number, "warning" and "daemon" for example.
+std::string_view severityOf(unsigned priority) noexcept;
+std::string_view facilityOf(unsigned priority) noexcept;
+
 /// The year of a time without one: the one that brings it nearest to, but at most a day behind,
 /// the reference.
 int yearOf(const CivilTime& time, const CivilTime& reference) noexcept;

@@ -126,6 +126,7 @@ def test_every_form_of_syslog_lines_is_read(agent):
     assert [row["ENTRYDESC"] for row in rows] == ["traditional", "iso", "rfc5424"]
     assert {row["ENTRYTIME"][1:] for row in rows} == {"261120070309000"}
     assert {row["ENTRYSRC"] for row in rows} == {"sshd[412]"}
+    assert [(row["ENTRYTYPE"], row["ENTRYCLASS"]) for row in rows] == [("", ""), ("", ""), ("crit", "auth")]
 
 
 @pytest.mark.slow

@@ -81,6 +81,24 @@ TEST(SyslogFormat, FillsColumnsAsAFollowedSyslogFileDoes) {
     EXPECT_EQ(std::string_view(rowOf(formatted, "something").entrydesc, 11), "something  ");
 }
 
+TEST(SyslogFormat, FillsTypeAndClassFromThePriority) {
+    Syslog syslog(logOf('S', nullptr));
+    Formatted formatted(logOf(FormatLogFile::typeLetter, formatOf(described())));
+    const auto expect = [&](const char* line, std::string_view type, std::string_view name) {
+        for (const zrm_rmlogent_data_t& row : {rowOf(syslog, line), rowOf(formatted, line)}) {
+            EXPECT_EQ(std::string_view(row.entrytype, type.size()), type) << line;
+            EXPECT_EQ(std::string_view(row.entryclass, name.size()), name) << line;
+        }
+    };
+    expect(lines[0], "                ", "                ");
+    expect(lines[1], "crit            ", "auth            ");
+    expect(lines[3], "notice          ", "local4          ");
+    expect("<0>Oct  5 07:03:09 web1 kernel: oops", "emerg ", "kern ");
+    expect("<191>Oct  5 07:03:09 web1 app: last", "debug ", "local7 ");
+    expect("<192>Oct  5 07:03:09 web1 app: none", "                ", "                ");
+    expect(lines[0], "                ", "                ");
+}
+
 std::string fieldsOf(EntryFormat::Reader& reader, std::string_view line) {
     EntryFields fields;
     EntryColumns columns;
