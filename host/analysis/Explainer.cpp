@@ -53,7 +53,8 @@ std::string boundOf(const Replay& replay) {
 
 struct Explainer::Seen {
     std::optional<std::string> line;
-    std::string record; ///< if it is not a line
+    std::string record;              ///< if it is not a line
+    std::unique_ptr<KeptEntry> kept; ///< if it is of a log that is not a file
     std::optional<std::uint64_t> event;
     bool isRow = false;
     zrm_rmlogent_data_t row{};
@@ -72,9 +73,11 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
                                  zrm_rmlogent_data_t* row) {
     Seen seen;
     seen.line = line;
-    if (const auto* const entry = dynamic_cast<const LineEntry*>(LogEntry::ofThisThread);
-        entry != nullptr && !line) {
-        seen.record = entry->entry();
+    LogEntry* const current = LogEntry::ofThisThread;
+    if (const auto* const entry = dynamic_cast<const LineEntry*>(current)) {
+        seen.record = line ? "" : entry->entry();
+    } else if (current != nullptr) {
+        seen.kept = std::make_unique<KeptEntry>(*current, usesFields());
     }
     if (row != nullptr) {
         seen.isRow = true;
@@ -84,24 +87,35 @@ Explainer::Seen Explainer::judge(Replay& replay, std::optional<std::string_view>
     return seen;
 }
 
-Result<void> Explainer::read(LogFile& log,
-                             const std::function<void(std::optional<std::string_view> line,
-                                                      zrm_rmlogent_data_t* row)>& entry) {
+/// Whether a condition is on a field.
+bool Explainer::usesFields() const {
+    return std::any_of(m_situation.conditions.begin(), m_situation.conditions.end(),
+                       [](const Condition& condition) { return condition.isOnField(); });
+}
+
+Result<void> Explainer::read(LogFile& log, const LogTail::Entry& entry, const std::string& until) {
     LogTail tail(log);
-    Result<void> result = tail.read(entry);
+    Result<void> result = tail.read(entry, until);
     m_reach = tail.reach();
     return result;
 }
 
-Result<std::vector<Explanation>> Explainer::last(LogFile& log, std::size_t number) {
+Result<std::vector<Explanation>> Explainer::last(LogFile& log, std::size_t number,
+                                                 const std::string& until) {
     TraceScope trace(anchor);
     std::deque<Seen> seen;
-    const Result<void> whole = read(log, [&](auto line, zrm_rmlogent_data_t* row) {
-        seen.push_back(judge(m_replay, line, row));
+    bool isWanted = true; // a line that yields no entry: as the one before it
+    const auto take = [&](auto line, zrm_rmlogent_data_t* row) {
+        isWanted = row == nullptr ? isWanted : until.empty() || stampOf(*row) <= until;
+        Seen entry = judge(m_replay, line, row);
+        if (isWanted) {
+            seen.push_back(std::move(entry));
+        }
         if (seen.size() > number) {
             seen.pop_front();
         }
-    });
+    };
+    const Result<void> whole = read(log, take, until);
     if (!whole) {
         return tl::unexpected(whole.error());
     }
@@ -176,7 +190,7 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
     std::optional<Seen> found;
     bool isExact = false;
     if (log != nullptr) {
-        read(*log, [&](auto line, zrm_rmlogent_data_t* row) {
+        const auto take = [&](auto line, zrm_rmlogent_data_t* row) {
             const bool isEntry = row != nullptr &&
                                  StoredRow::isSameEntry(layout(), *row, entry.row) &&
                                  (!line || !entry.text || isSameText(*line, *entry.text));
@@ -186,7 +200,8 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
                 isExact = entry.isOwn && seen.verdict.frequency == entry.row.freqthresh;
                 found = std::move(seen);
             }
-        });
+        };
+        read(*log, take, stampOf(entry.row));
     }
     if (log == nullptr) {
         m_reach = {"", "the log is no longer monitored"};
@@ -196,8 +211,11 @@ Explanation Explainer::event(LogFile* log, const EventEntry& entry) {
         found->isRow = true;
         found->row = entry.row;
         found->line = entry.text;
+        if (log == nullptr || log->isSource()) { // the text alone does not have the fields
+            found->kept = std::make_unique<KeptEntry>(entry.text.value_or(""), entry.fields);
+        }
         LineEntry line(log, entry.text ? std::string_view(*entry.text) : "");
-        const LogEntry::Offer offer(line);
+        const LogEntry::Offer offer(found->kept ? static_cast<LogEntry&>(*found->kept) : line);
         zrm_rmlogent_data_t row = entry.row;
         found->verdict.matches = m_replay.matches(row);
         if (!m_replay.hasThresholds()) {
@@ -216,7 +234,7 @@ Explanation Explainer::describe(const LogFile* log, Seen& seen) {
     explanation.line = std::move(seen.line);
     LineEntry entry = explanation.line ? LineEntry(log, *explanation.line)
                                        : LineEntry::ofRecord(log, seen.record);
-    const LogEntry::Offer offer(entry);
+    const LogEntry::Offer offer(seen.kept ? static_cast<LogEntry&>(*seen.kept) : entry);
     explanation.event = seen.event;
     if (m_replay.hasThresholds()) {
         explanation.window = {

@@ -2,6 +2,7 @@
 #define ZRM_HOST_EXPLAINER_H
 
 #include "host/analysis/Explanation.h"
+#include "host/analysis/KeptEntry.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/Replay.h"
 #include "host/base/Result.h"
@@ -38,6 +39,7 @@ public:
         bool isOwn; ///< of this same situation: its row has the number of entries counted
         zrm_rmlogent_data_t row;
         std::optional<std::string> text = std::nullopt; ///< of the entry, if the event has it
+        KeptEntry::Fields fields = {};                  ///< as far as the event has them
     };
 
     /// The table's manager must outlive the object. `isStopped`: the situation is not running.
@@ -51,8 +53,10 @@ public:
     /// next. A line longer than a monitor reads in one piece yields several explanations.
     Result<std::vector<Explanation>> line(LogFile& log, std::string_view line);
 
-    /// The log's last entries, at most `mostEntries`, oldest first.
-    Result<std::vector<Explanation>> last(LogFile& log, std::size_t number);
+    /// The log's last entries, at most `mostEntries`, oldest first; or the last of this time
+    /// (ENTRYTIME) and before, if one is given.
+    Result<std::vector<Explanation>> last(LogFile& log, std::size_t number,
+                                          const std::string& until = "");
 
     /// The entry of an event; the log is null when it is no longer monitored.
     Explanation event(LogFile* log, const EventEntry& entry);
@@ -70,10 +74,10 @@ private:
     };
     using Times = std::vector<Written>;
 
-    Result<void> read(LogFile& log, const std::function<void(std::optional<std::string_view> line,
-                                                             zrm_rmlogent_data_t* row)>& entry);
+    Result<void> read(LogFile& log, const LogTail::Entry& entry, const std::string& until = "");
     Seen judge(Replay& replay, std::optional<std::string_view> line, zrm_rmlogent_data_t* row);
     static void countBefore(Replay& replay, const Times& before, const Written& last);
+    bool usesFields() const;
     Explanation describe(const LogFile* log, Seen& seen);
     void decide(Explanation& explanation, const Seen& seen) const;
     Result<std::vector<Explanation>> nextLine(LogFile& log, std::string_view line,

@@ -141,15 +141,11 @@ std::size_t LogTail::recordLength() const noexcept {
     return settings && settings->format ? settings->format->recordLength() : 0;
 }
 
-Result<void> LogTail::read(const Entry& entry) {
+Result<void> LogTail::read(const Entry& entry, const std::string& until) {
     TraceScope trace(anchor);
     m_reach = {};
     if (m_log.isSource()) {
-        const Problem problem{"the entries of a log that is not a file cannot be explained one by "
-                              "one",
-                              "ask for a backtest of the situation, or for a report on the log"};
-        m_reach.reason = problem.what;
-        return tl::unexpected(problem);
+        return readSource(until, entry);
     }
     if (m_log.type() == errorLog) {
         entries(entry);

@@ -32,6 +32,8 @@ struct Reach {
 /// Reads the end of a log, and lines that it might contain, as its monitor would: of a followed log
 /// also older generations, as far as they are not compressed; in the same
 /// pieces, or the same lines joined to entries, and with the log's own operation that makes rows.
+/// A log that is not a file is read from its source, if that has a past. Ends with the request
+/// (CTX1_IsCancelled) there.
 /// The monitor is not affected: rows are made in the way of reports, and its counters do not count
 /// them. While an entry of a followed log is given, its EntryInstant exists.
 class LogTail {
@@ -53,8 +55,9 @@ public:
     /// can be passed.
     bool hasLines() const noexcept;
 
-    /// Reads the log's end.
-    Result<void> read(const Entry& entry);
+    /// Reads the log's end. Of a log that is not a file, entries younger than `until` (16
+    /// characters; empty: none) are left out.
+    Result<void> read(const Entry& entry, const std::string& until = "");
 
     /// Reads one line, of at most `longestLine` bytes without a newline, in its pieces.
     Result<void> readLine(std::string_view line, const Entry& entry);
@@ -71,6 +74,7 @@ private:
     void wholeEntries(int fd, const Entry& entry);
     void judge(char* line, std::string text, const Entry& entry);
     void entries(const Entry& entry);
+    Result<void> readSource(const std::string& until, const Entry& entry);
 
     void give(const Entry& entry, std::optional<std::string_view> line, zrm_rmlogent_data_t& row,
               const EntryMoment& moment);

@@ -46,6 +46,21 @@ std::optional<std::string> StoredRow::entryText(std::string_view event) {
                                                          : std::nullopt;
 }
 
+KeptEntry::Fields StoredRow::entryFields(std::string_view event) {
+    KeptEntry::Fields fields;
+    const auto document = nlohmann::json::parse(event, nullptr, false);
+    const auto found = document.is_object() ? document.find("fields") : document.end();
+    if (found == document.end() || !found->is_object()) {
+        return fields;
+    }
+    for (const auto& [name, value] : found->items()) {
+        if (value.is_string()) {
+            fields.emplace_back(name, value.get<std::string>());
+        }
+    }
+    return fields;
+}
+
 bool StoredRow::isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,
                             const zrm_rmlogent_data_t& right) {
     const auto* const leftBytes = reinterpret_cast<const char*>(&left);

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_STORED_ROW_H
 #define ZRM_HOST_STORED_ROW_H
 
+#include "host/analysis/KeptEntry.h"
 #include "host/framework/RowLayout.h"
 #include "logs/zrm_rmlogent_data.h"
 
@@ -19,6 +20,9 @@ public:
 
     /// The text of the entry in an event's JSON object; none if it has none.
     static std::optional<std::string> entryText(std::string_view event);
+
+    /// The fields of the entry in an event's JSON object.
+    static KeptEntry::Fields entryFields(std::string_view event);
 
     /// Whether two rows belong to the same entry, judging by the entry's own columns.
     static bool isSameEntry(const RowLayout& layout, const zrm_rmlogent_data_t& left,

@@ -169,13 +169,14 @@ AnalysisResource::Explained AnalysisResource::explainLast(JsonFields& fields) {
     Subject wanted = subject(fields);
     const auto number = static_cast<std::size_t>(
         fields.number("last", 1, static_cast<std::int64_t>(Explainer::mostEntries)));
+    const std::string until = fields.has("to") ? timeOf(fields, "to") : "";
     const TraceSilence silence;
     const MonitoredLogs logs;
     LogFile& log = logOf(logs, fields, wanted.situation);
     fields.refuseUnknown();
     Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
     requireOpen(explainer.isOpen());
-    auto explanations = explainer.last(log, number);
+    auto explanations = explainer.last(log, number, until);
     if (!explanations) {
         throw RequestRefused(409, {explanations.error().what, explanations.error().cure, "log"});
     }
@@ -207,6 +208,7 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
                              "event");
     }
     entry.text = StoredRow::entryText(event->json);
+    entry.fields = StoredRow::entryFields(event->json);
     const MonitoredLogs logs;
     std::vector<Explanation> explanations{explainer.event(logs.find(event->log), entry)};
     return {std::move(explanations), explainer.reach(), event->log};

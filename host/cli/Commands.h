@@ -160,6 +160,7 @@ private:
     std::string m_file;
     std::string m_line;
     std::string m_log;
+    std::string m_to;
     std::uint64_t m_event = 0;
     unsigned m_last = 0;
 };

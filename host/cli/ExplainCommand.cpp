@@ -67,6 +67,8 @@ ExplainCommand::ExplainCommand(CLI::App& program)
     m_command->add_option("--last", m_last, "The last entries of the log (default 5)")
         ->type_name("COUNT")
         ->check(CLI::Range(1, 1000));
+    m_command->add_option("--to", m_to, "The last entries of this time and before")
+        ->type_name("TIME");
 }
 
 bool ExplainCommand::isChosen() const {
@@ -83,6 +85,9 @@ Json ExplainCommand::request() const {
                        "explain one thing: --event ID, or --line TEXT or --last COUNT "
                        "of a log");
     }
+    if (!m_to.empty() && (isEvent || !m_line.empty())) {
+        throw CliError(CliStatus::USAGE, "--to is for the last entries of a log");
+    }
     if (isEvent) {
         body["event"] = m_event;
         return body;
@@ -92,6 +97,9 @@ Json ExplainCommand::request() const {
     }
     if (m_line.empty()) {
         body["last"] = m_last > 0 ? m_last : usualLast;
+        if (!m_to.empty()) {
+            body["to"] = Context::time("--to", m_to);
+        }
     } else {
         body["line"] = m_line;
     }

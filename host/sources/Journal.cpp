@@ -24,7 +24,7 @@ namespace {
 
 constexpr std::size_t longestText = EntryKeep::longestText;
 constexpr std::string_view messageName = "MESSAGE";
-constexpr std::size_t mostSteps = 1'000'000; ///< entries passed over in one call
+constexpr std::size_t mostSteps = 10'000; ///< entries passed over in one call
 
 constexpr std::array<std::string_view, 8> priorityNames = {"emerg",   "alert",  "crit", "err",
                                                            "warning", "notice", "info", "debug"};
@@ -150,7 +150,7 @@ Journal::Step Journal::step(Direction direction) {
             return Step::entry;
         }
     }
-    return Step::none;
+    return Step::passing;
 }
 
 bool Journal::stepBack() {

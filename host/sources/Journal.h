@@ -23,9 +23,16 @@ namespace zrm::host {
 class Journal {
 public:
     /// What a step has found.
-    enum class Step : unsigned char { entry, none, failed };
+    enum class Step : unsigned char {
+        entry,
+        none,
+        passing, ///< so many unwanted entries that the caller should look around; go on
+        failed,
+    };
 
-    explicit Journal(const JournalConfig& config);
+    /// `messages`: what is read from them; null: they are taken as they are.
+    explicit Journal(const JournalConfig& config,
+                     std::shared_ptr<const MessageFormat> messages = nullptr);
     ~Journal();
     Journal(const Journal&) = delete;
     Journal& operator=(const Journal&) = delete;

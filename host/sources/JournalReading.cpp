@@ -149,7 +149,11 @@ char* JournalReading::next() {
     if (m_isRecalled || (!m_journal.isOpen() && (Clock::now() < m_retry || !open()))) {
         return nullptr;
     }
-    const Journal::Step step = m_journal.next();
+    Journal::Step step = m_journal.next();
+    while (m_last && step == Journal::Step::passing) { // null would end the recollection
+        step = m_journal.next();
+    }
+    m_isPassing = step == Journal::Step::passing;
     noteDamage();
     if (step == Journal::Step::failed) {
         position();
@@ -198,6 +202,9 @@ std::string JournalReading::takeBack() {
 }
 
 void JournalReading::wait(std::chrono::milliseconds most) {
+    if (m_isPassing) {
+        return;
+    }
     if (!m_journal.isOpen()) {
         const auto pause = std::chrono::ceil<std::chrono::milliseconds>(m_retry - Clock::now());
         std::this_thread::sleep_for(std::clamp<std::chrono::milliseconds>(pause, 0ms, most));

@@ -60,6 +60,7 @@ private:
     std::optional<std::string> m_last; ///< the entry after which recall ends
     std::uint64_t m_recallFrom = 0;    ///< microseconds since 1970-01-01 UTC
     bool m_isRecalled = false;
+    bool m_isPassing = false; ///< next has returned null although there may be more
 
     std::string m_problem;
     std::deque<EntrySource::Remark> m_remarks;

@@ -1,6 +1,7 @@
 #include "host/sources/JournalSource.h"
 
 #include "base/ErrorText.h"
+#include "framework/cancellation.h"
 #include "host/base/JsonWriter.h"
 #include "host/sources/Journal.h"
 #include "host/sources/JournalFiles.h"
@@ -35,15 +36,22 @@ public:
     }
     char* previous() override {
         Journal::Step step = m_journal.previous();
-        while (step == Journal::Step::entry && time() > m_newest) {
+        while (isPassing(step) || (step == Journal::Step::entry && time() > m_newest)) {
             step = m_journal.previous();
         }
-        if (step == Journal::Step::failed) {
-            check(m_journal.error());
-        } else if (m_journal.damaged() > 0 || MapFaults::count() > m_faults) {
-            m_problem = "a file of the journal is damaged";
+        return give(step);
+    }
+    bool turn() override {
+        // The journal is at that entry, or at an older one that is not wanted.
+        const std::string at = m_journal.cursor();
+        return !at.empty() && check(m_journal.seekCursor(at));
+    }
+    char* next() override {
+        Journal::Step step = m_journal.next();
+        while (isPassing(step)) {
+            step = m_journal.next();
         }
-        return step == Journal::Step::entry ? m_journal.text() : nullptr;
+        return give(step);
     }
     std::int64_t time() const noexcept override {
         return static_cast<std::int64_t>(m_journal.time());
@@ -59,6 +67,17 @@ public:
     void readFields(EntryFields& fields) override { m_journal.readFields(fields); }
 
 private:
+    static bool isPassing(Journal::Step step) noexcept {
+        return step == Journal::Step::passing && !CTX1_IsCancelled();
+    }
+    char* give(Journal::Step step) {
+        if (step == Journal::Step::failed) {
+            check(m_journal.error());
+        } else if (m_journal.damaged() > 0 || MapFaults::count() > m_faults) {
+            m_problem = "a file of the journal is damaged";
+        }
+        return step == Journal::Step::entry ? m_journal.text() : nullptr;
+    }
     bool check(int outcome) {
         if (outcome < 0) {
             m_problem = std::string("the journal cannot be read: ") + ErrorText(-outcome).text();

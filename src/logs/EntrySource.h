@@ -76,8 +76,13 @@ public:
         /// Begins at the newest entry that is not younger than this, in microseconds since
         /// 1970-01-01 UTC. False if the source cannot be read; problem says why.
         virtual bool begin(std::int64_t newest) = 0;
-        /// The next older entry as a terminated text, or null if there is none.
+        /// The next older entry as a terminated text, or null if there is none or the request is
+        /// cancelled (CTX1_IsCancelled).
         virtual char* previous() = 0;
+        /// Turns round after previous has given entries: next gives the last of them once more, and
+        /// then younger ones. False if the source cannot be read; problem says why.
+        virtual bool turn() = 0;
+        virtual char* next() = 0;
         /// When the source wrote the entry, in microseconds since 1970-01-01 UTC.
         virtual std::int64_t time() const noexcept = 0;
         /// Why not all of it can be read, as a clause; empty if all can.

@@ -23,8 +23,6 @@ ZoneTime::UtcTimes utcOf(const char* stamp) {
     return ZoneTime::utcTimes(ZoneTime::ofStamp(stamp).seconds(), {});
 }
 
-const std::string noPast = "what a command has printed cannot be read again";
-
 } // namespace
 
 struct SourceReport::Log : SourceLogFile {
@@ -49,7 +47,8 @@ SourceReport::SourceReport(const LogFile& log, FollowedReport::Options options)
 SourceReport::~SourceReport() = default;
 
 const std::string& SourceReport::problem() const noexcept {
-    return m_past ? m_past->problem() : noPast;
+    static const std::string whyNone = noPast;
+    return m_past ? m_past->problem() : whyNone;
 }
 
 void SourceReport::run(FollowedReport::Receiver& receiver) {
@@ -69,7 +68,11 @@ void SourceReport::run(FollowedReport::Receiver& receiver) {
             m_isCancelled = true;
             return;
         }
-        if (m_past->previous() == nullptr || m_past->time() < oldest) {
+        if (m_past->previous() == nullptr) {
+            m_isCancelled = CTX1_IsCancelled();
+            return;
+        }
+        if (m_past->time() < oldest) {
             return;
         }
         first = entries == 0 ? m_past->time() : first;

@@ -17,6 +17,9 @@ class LogFile;
 /// thread; ends when its request does (CTX1_IsCancelled).
 class SourceReport {
 public:
+    /// Why a source without a past cannot be read, as a clause.
+    static constexpr const char* noPast = "what a command has printed cannot be read again";
+
     /// The end of the second of a time stamp, in microseconds since 1970-01-01 UTC; of a time that
     /// occurs twice, the second one.
     static std::int64_t latestOf(const char* stamp);

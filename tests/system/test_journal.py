@@ -264,10 +264,60 @@ def test_a_situation_on_the_journal_is_tested_on_its_past_and_not_explained(repo
     status, _, answer = reporting.api.request("POST", "/api/v1/backtest", body)
     assert status == 200, answer
     assert (answer["entries"], answer["matched"]) == (40, 2), answer
-    status, _, answer = reporting.api.request(
-        "POST", "/api/v1/explain", {"situation": "every-entry", "log": "journal", "last": 3}
+
+
+def explained(agent, status=200, **body):
+    got, _, answer = agent.api.request("POST", "/api/v1/explain", body)
+    assert got == status, answer
+    return answer
+
+
+def test_the_newest_entries_of_the_journal_are_explained(reporting):
+    answer = explained(reporting, situation="every-entry", log="journal", last=3)
+    found = answer["explanations"]
+    assert [one["line"] for one in found] == ["entry 37", "entry 38", "entry 39"]
+    assert [one["raised"] for one in found] == [False, True, True]
+    assert found[0]["decision"] == "Would not be raised: field.NUMBER '37' is less than 38."
+    assert found[0]["conditions"][-1:] == [{"condition": "field.NUMBER >= 38", "value": "37", "holds": False}]
+    assert (answer["complete"], answer["reason"]) == (True, None)
+    assert found[0]["row"]["ENTRYDESC"] == "entry 37"
+
+
+def test_older_entries_of_the_journal_are_explained_by_their_time(reporting):
+    begin = reporting.journal.time // 1_000_000 - 2
+    answer = explained(
+        reporting, definition={"when": ["field.NUMBER >= 0"], "frequency": ">= 3", "period": "1s"}, log="journal",
+        last=1, to=time.strftime("%Y-%m-%dT%H:%M:%S", time.localtime(begin)),
     )
-    assert status >= 400 and "cannot be explained one by one" in json.dumps(answer)
+    (one,) = answer["explanations"]
+    stamp = time.strftime("1%y%m%d%H%M%S000", time.localtime(begin))
+    assert one["row"]["ENTRYTIME"] == stamp
+    number = int(one["line"].split()[1])
+    assert 15 <= number < 30 and one["window"]["count"] >= 3 and one["raised"]
+
+
+def test_an_event_of_the_journal_is_explained_from_the_journal(reporting):
+    reporting.journal.write("entry 40", NUMBER=40)
+    (event,) = reporting.wait_events(1)
+    for number in range(41, 60):
+        reporting.journal.write(f"entry {number}", NUMBER=number)
+    reporting.wait_events(20)
+    answer = explained(reporting, event=event["id"], definition={"when": ["field.NUMBER < 41", "field._BOOT_ID != ''"]})
+    (one,) = answer["explanations"]
+    assert (one["line"], one["raised"], one["event"]) == ("entry 40", True, event["id"])
+    assert answer["complete"] is True
+    # Once the journal has lost it, the history has what the event kept.
+    os.remove(reporting.journal.directory / "system.journal")
+    reporting.journal.write("another")
+    (one,) = explained(reporting, event=event["id"])["explanations"]
+    assert one["raised"] and one["conditions"][-1]["value"] == "40"
+
+
+def test_the_fields_of_the_journal_are_suggested(reporting):
+    status, _, answer = reporting.api.request("GET", "/api/v1/fields?log=journal")
+    assert status == 200, answer
+    names = {field["name"]: field["entries"] for field in answer["fields"]}
+    assert answer["entries"] == 40 and names["NUMBER"] == names["MESSAGE"] == 40
 
 
 def test_check_says_how_much_of_a_journal_can_be_read(reader):

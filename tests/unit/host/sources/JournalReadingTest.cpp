@@ -379,4 +379,24 @@ TEST_F(JournalReadingTest, RecallsThePeriodBeforeAPosition) {
     EXPECT_THAT(messages(recalled), ElementsAre("3", "4", "5", "6"));
 }
 
+TEST_F(JournalReadingTest, DoesNotWaitBetweenUnwantedEntries) {
+    constexpr int unwanted = 25'000;
+    for (int number = 0; number < unwanted; ++number) {
+        journal.add("noise", {{"_SYSTEMD_UNIT", "busy.service"}});
+    }
+    journal.add("wanted", {{"_SYSTEMD_UNIT", "rare.service"}});
+    journal.write();
+    config.units = {"rare*"};
+    JournalReading reading(config);
+    reading.startAt(Start::beginning);
+    const auto begun = std::chrono::steady_clock::now();
+    char* entry = reading.next();
+    for (int looks = 0; entry == nullptr && looks < 10; ++looks) {
+        reading.wait(std::chrono::hours(1)); // the test would not end
+        entry = reading.next();
+    }
+    EXPECT_STREQ(entry, "wanted");
+    EXPECT_LT(std::chrono::steady_clock::now() - begun, std::chrono::minutes(10));
+}
+
 } // namespace

@@ -16,6 +16,24 @@ class JournalSourceTest : public testing::Test {
 protected:
     JournalSourceTest() { config.directory = journal.directory.path(); }
 
+    /// The messages on the way forward, after at most `most` steps back from a second.
+    std::string messagesAfterTurn(std::uint64_t second, int most) {
+        const std::unique_ptr<EntrySource::Past> past = JournalSource(config).past();
+        EXPECT_TRUE(past->begin(static_cast<std::int64_t>(TestJournal::firstTime) +
+                                static_cast<std::int64_t>(second * 1'000'000)));
+        int steps = 0;
+        while (steps <= most && past->previous() != nullptr) {
+            ++steps;
+        }
+        std::string messages;
+        EXPECT_TRUE(steps == 0 || past->turn());
+        while (const char* const text = steps > 0 ? past->next() : nullptr) {
+            messages += std::string(text) + ' ';
+        }
+        EXPECT_EQ(past->problem(), "");
+        return messages;
+    }
+
     TestJournal journal;
     JournalConfig config;
 };
@@ -33,6 +51,32 @@ TEST_F(JournalSourceTest, ReadsBackwardsFromATime) {
     }
     EXPECT_EQ(past->previous(), nullptr);
     EXPECT_EQ(past->problem(), "");
+}
+
+TEST_F(JournalSourceTest, TurnsRoundAndGivesTheSameEntriesForward) {
+    for (int number = 0; number < 6; ++number) {
+        journal.add(std::to_string(number), {{"SYSLOG_IDENTIFIER", number == 1 ? "other" : "app"}});
+    }
+    journal.write();
+    config.units = {"*"}; // compared here, not by the library: none has a unit
+    EXPECT_EQ(messagesAfterTurn(5, 9), "");
+    config.units.clear();
+    EXPECT_EQ(messagesAfterTurn(4, 2), "2 3 4 5 ");
+    EXPECT_EQ(messagesAfterTurn(4, 9), "0 1 2 3 4 5 ");
+    config.identifiers = {"app"};
+    EXPECT_EQ(messagesAfterTurn(3, 9), "0 2 3 4 5 ");
+}
+
+TEST_F(JournalSourceTest, PassesOverAnyNumberOfUnwantedEntries) {
+    constexpr int unwanted = 25'000;
+    journal.add("first", {{"_SYSTEMD_UNIT", "rare.service"}});
+    for (int number = 0; number < unwanted; ++number) {
+        journal.add("noise", {{"_SYSTEMD_UNIT", "busy.service"}});
+    }
+    journal.add("last", {{"_SYSTEMD_UNIT", "rare.service"}});
+    journal.write();
+    config.units = {"rare*"};
+    EXPECT_EQ(messagesAfterTurn(unwanted + 1, 9), "first last ");
 }
 
 TEST_F(JournalSourceTest, HasADefinitionForEachConfiguration) {
