@@ -107,15 +107,20 @@ bool LineRules::mayBeContinued(std::string_view line) const {
     return unwrapper.read(line) && unwrapper.isUnfinished();
 }
 
-/// By what a program has written. Lines that are not the runtime's are entries, which the format
-/// rejects.
+/// By what a program has written, to one stream. Lines that are not the runtime's are entries,
+/// which the format rejects.
 bool LineRules::continuesWrapped(std::string_view before, std::string_view line) const {
     Unwrapper& unwrapper = unwrapperOf(*m_parts.unwrap);
     if (!unwrapper.read(before)) {
         return false;
     }
     const bool isUnfinished = unwrapper.isUnfinished();
-    return unwrapper.read(line) && (isUnfinished || continuesByRule(unwrapper.text()));
+    constexpr std::size_t enough = 8; // of the name of a stream
+    std::array<char, enough> stream{};
+    const std::size_t length = unwrapper.stream().copy(stream.data(), stream.size());
+    return unwrapper.read(line) &&
+           unwrapper.stream().substr(0, enough) == std::string_view(stream.data(), length) &&
+           (isUnfinished || continuesByRule(unwrapper.text()));
 }
 
 bool LineRules::continuesByRule(std::string_view line) const {

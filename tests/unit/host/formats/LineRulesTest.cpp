@@ -73,6 +73,18 @@ TEST(LineRules, LineEndsOfOtherSystemsDoNotCount) {
     EXPECT_THAT(join(description, {"a\r", "\r", "b\r"}), ElementsAre("a\r/\r", "b\r"));
 }
 
+TEST(LineRules, LinesOfTwoStreamsAreNotJoined) {
+    FormatDescription description;
+    description.unwrap = "cri";
+    const std::string out = "2026-11-19T10:00:00Z stdout ";
+    const std::string err = "2026-11-19T10:00:00Z stderr ";
+    EXPECT_THAT(join(description, {out + "P a", err + "F b", out + "F c"}),
+                ElementsAre(out + "P a", err + "F b", out + "F c"));
+    description.lines.indented = true;
+    EXPECT_THAT(join(description, {out + "F a", err + "F  b", err + "F  c", out + "F  d"}),
+                ElementsAre(out + "F a", err + "F  b/" + err + "F  c", out + "F  d"));
+}
+
 TEST(LineRules, WhatARuntimeHasCutIsJoined) {
     FormatDescription description;
     description.unwrap = "cri";
