@@ -154,9 +154,9 @@ ConfigSection ConfigSection::inner(std::string_view key, const toml::table& tabl
     return {(m_name.empty() ? "" : m_name + '.') + std::string(key), table, m_problems};
 }
 
-void ConfigSection::refuse(std::string_view key, const std::string& what) {
+void ConfigSection::refuse(std::string_view key, const std::string& what, const std::string& cure) {
     if (find(key) != nullptr) {
-        problem(key, what, "leave it out");
+        problem(key, what, cure);
     }
 }
 

@@ -55,7 +55,10 @@ public:
                  const std::string& cure);
 
     /// Records a problem with a key that may not be given here.
-    void refuse(std::string_view key, const std::string& what);
+    void refuse(std::string_view key, const std::string& what,
+                const std::string& cure = "leave it out");
+    /// The key is not unknown, although another problem keeps it from being read.
+    void passOver(std::string_view key) { find(key); }
     /// How many problems the whole file has so far.
     std::size_t problemCount() const noexcept { return m_problems.count(); }
     /// Records a problem for every key that has not been read. Call it last.

@@ -11,11 +11,15 @@ namespace zrm::host {
 namespace {
 
 bool hasFields(const LogConfig& log) {
-    return std::string_view("UAE").find(log.letter) == std::string_view::npos;
+    const bool isLines = log.command && !log.follow.format;
+    return !isLines && std::string_view("UAE").find(log.letter) == std::string_view::npos;
 }
 
-/// Whether the table names the file or matches it, and does not exclude it.
+/// Whether the table has the name, or names the file or matches it, and does not exclude it.
 bool isOf(const LogConfig& log, const std::string& file) {
+    if (log.isSource()) {
+        return log.name == file;
+    }
     return std::any_of(log.paths.begin(), log.paths.end(),
                        [&file](const std::string& path) {
                            return path == file || PathPattern::matches(path, file);

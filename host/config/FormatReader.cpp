@@ -25,11 +25,11 @@ constexpr Key keys[] = {
     {"format", "regex"},
     {"time_format", "regex json logfmt"},
     {"columns", "json logfmt"},
-    {"defaults", "regex json logfmt syslog"},
-    {"values", "regex json logfmt syslog"},
+    {"defaults", "regex json logfmt syslog journal"},
+    {"values", "regex json logfmt syslog journal"},
     {"unwrap", "regex json logfmt syslog"},
-    {"extract", "syslog"},
-    {"pairs", "regex syslog"},
+    {"extract", "syslog journal"},
+    {"pairs", "regex syslog journal"},
 };
 
 /// The types whose entries may have several lines.
@@ -137,6 +137,13 @@ std::shared_ptr<const EntryFormat> FormatReader::make(ConfigSection& section,
         return nullptr;
     }
     return std::move(*format);
+}
+
+void FormatReader::passOver(ConfigSection& section) {
+    for (const Key& key : keys) {
+        section.passOver(key.name);
+    }
+    section.passOver(entryKey.name);
 }
 
 bool FormatReader::describes(const ConfigSection& section) {

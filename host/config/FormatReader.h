@@ -26,6 +26,9 @@ public:
     static std::shared_ptr<const EntryFormat> make(ConfigSection& section,
                                                    const FormatDescription& description);
 
+    /// A problem keeps these keys from being read; they are not unknown.
+    static void passOver(ConfigSection& section);
+
     /// True if the table has a key that describes a format.
     static bool describes(const ConfigSection& section);
 };

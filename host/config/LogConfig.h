@@ -2,6 +2,7 @@
 #define ZRM_HOST_LOG_CONFIG_H
 
 #include "host/config/SourceConfig.h"
+#include "host/formats/MessageFormat.h"
 #include "logs/FollowSettings.h"
 
 #include <optional>
@@ -19,6 +20,7 @@ struct LogConfig {
     std::string format;                ///< of a text log; the command of an error log
     std::string name;                  ///< of a log that is not a file
     std::optional<JournalConfig> journal;
+    Defined<MessageFormat> messages; ///< of the journal; none: they are read as they are
     std::optional<CommandConfig> command;
     bool debug = false;
     FollowSettings follow; ///< isNewcomer is not set

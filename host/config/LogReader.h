@@ -31,7 +31,9 @@ private:
     void readType(ConfigSection& section, LogConfig& log);
     void readFormat(ConfigSection& section, LogConfig& log);
     static void readEntryFormat(ConfigSection& section, LogConfig& log);
-    static void readSourceFormat(ConfigSection& section, LogConfig& log);
+    void readMessages(ConfigSection& section, LogConfig& log);
+    void readOutput(ConfigSection& section, LogConfig& log);
+    static void useFormat(ConfigSection& section, const FormatDescription& format, LogConfig& log);
     void readNamed(ConfigSection& section, LogConfig& log);
     void checkTextFormat(ConfigSection& section, const LogConfig& log);
     void readFollowing(ConfigSection& section, LogConfig& log);

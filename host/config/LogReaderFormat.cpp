@@ -10,8 +10,10 @@
 #include "logtypes/UserLogFile.h"
 #include "parser/StringParser.h"
 
+#include <algorithm>
 #include <optional>
 #include <string>
+#include <utility>
 
 namespace zrm::host {
 
@@ -32,8 +34,12 @@ std::size_t namedLength(std::string_view format, std::string_view name) {
 } // namespace
 
 void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
-    if (log.isSource()) {
-        readSourceFormat(section, log);
+    if (log.journal) {
+        readMessages(section, log);
+        return;
+    }
+    if (log.command) {
+        readOutput(section, log);
         return;
     }
     if (section.has("format") && (!section.has("type") || log.type == "syslog")) {
@@ -54,6 +60,10 @@ void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
         return;
     }
     log.format = format.value_or("");
+    section.refuse("unwrap", "has no meaning for type \"" + log.type + '"',
+                   log.letter == 'U' ? "describe what the program writes by an expression: type = "
+                                       "\"regex\""
+                                     : "leave it out");
     if (format && log.letter == 'U') {
         checkTextFormat(section, log);
     }
@@ -71,21 +81,73 @@ void LogReader::readEntryFormat(ConfigSection& section, LogConfig& log) {
         log.letter == FormatLogFile::typeLetter || FormatReader::describes(section);
     if (format && isNeeded) {
         log.letter = FormatLogFile::typeLetter;
-        log.follow.format.value = FormatReader::make(section, *format);
-    }
-    if (format && (!isNeeded || log.follow.format)) {
+        useFormat(section, *format, log);
+    } else if (format) {
         log.follow.join.value = EntryLinesReader::make(section, *format);
     }
 }
 
-/// The lines of a command may be taken apart, by expressions.
-void LogReader::readSourceFormat(ConfigSection& section, LogConfig& log) {
-    section.refuse("entry", "has no meaning for type \"" + log.type + '"');
-    const bool isDescribed = log.command && FormatReader::describes(section);
+void LogReader::useFormat(ConfigSection& section, const FormatDescription& format, LogConfig& log) {
+    log.follow.format.value = FormatReader::make(section, format);
+    if (log.follow.format) {
+        log.follow.join.value = EntryLinesReader::make(section, format);
+    }
+}
+
+/// What is read from the messages of a journal.
+void LogReader::readMessages(ConfigSection& section, LogConfig& log) {
+    const std::size_t problems = section.problemCount();
+    section.refuse("entry",
+                   "has no meaning for a journal, in which each message is an entry, also one of "
+                   "several lines",
+                   "leave it out; what a program writes line by line is an entry per line");
+    section.refuse("unwrap", "has no meaning for a journal, whose messages are not wrapped");
+    section.refuse("time_format", "has no meaning for a journal, which has each message's time");
+    if (section.problemCount() != problems) {
+        FormatReader::passOver(section);
+        return;
+    }
+    FormatDescription plain;
+    plain.type = log.type;
     const std::optional<FormatDescription> format =
-        FormatReader::read(section, isDescribed ? "regex" : log.type);
-    if (format && isDescribed) {
-        log.follow.format.value = FormatReader::make(section, *format);
+        section.has("format") ? readNamedFormat(section, m_formats)
+                              : FormatReader::readOver(section, std::move(plain));
+    if (!format || !FormatReader::describes(section)) {
+        return;
+    }
+    auto messages = MessageFormat::make(*format);
+    if (!messages) {
+        const Problem& problem = messages.error();
+        section.problem(section.line(problem.field.substr(0, problem.field.find('.'))),
+                        problem.field, problem.what, problem.cure);
+        return;
+    }
+    log.messages.value = std::move(*messages);
+}
+
+/// How the lines of a command are taken apart: by a ready format, or by expressions.
+void LogReader::readOutput(ConfigSection& section, LogConfig& log) {
+    if (!FormatReader::describes(section)) {
+        FormatDescription lines;
+        lines.lines = EntryLinesReader::read(section);
+        log.follow.join.value = EntryLinesReader::make(section, lines);
+        return;
+    }
+    const auto texts = section.texts("format");
+    const bool isNamed =
+        texts && !texts->empty() &&
+        std::all_of(texts->begin(), texts->end(), [](const ConfigSection::Text& text) {
+            return ReadyFormats::isName(text.first);
+        });
+    const bool isSyslog = !section.has("format") && section.has("extract");
+    const std::optional<FormatDescription> format =
+        isNamed ? readNamedFormat(section, m_formats)
+                : FormatReader::read(section, isSyslog ? "syslog" : "regex");
+    if (format && format->type == "wtmp") {
+        section.problem("format", "is one of records, and a command prints lines",
+                        "name a format of lines");
+    } else if (format) {
+        useFormat(section, *format, log);
     }
 }
 
@@ -101,10 +163,7 @@ void LogReader::readNamed(ConfigSection& section, LogConfig& log) {
     }
     log.type = format->type;
     log.letter = FormatLogFile::typeLetter;
-    log.follow.format.value = FormatReader::make(section, *format);
-    if (log.follow.format) {
-        log.follow.join.value = EntryLinesReader::make(section, *format);
-    }
+    useFormat(section, *format, log);
 }
 
 void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {

@@ -52,6 +52,7 @@ std::optional<FormatDescription> readNamedFormat(ConfigSection& section,
         }
     }
     if (section.problemCount() != problems) {
+        FormatReader::passOver(section);
         return std::nullopt;
     }
     return FormatReader::readOver(section, std::move(*format));

@@ -2,19 +2,17 @@
 
 #include "base/EntryFields.h"
 #include "base/ErrorText.h"
-#include "framework/LogEntry.h"
 #include "host/base/JsonWriter.h"
 #include "host/base/RetryPause.h"
 #include "host/base/TimeText.h"
 #include "host/sources/CommandChild.h"
+#include "host/sources/StreamEntries.h"
 #include "logs/ZoneTime.h"
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <thread>
 #include <utility>
-#include <vector>
 
 namespace zrm::host {
 
@@ -25,78 +23,11 @@ using Clock = std::chrono::steady_clock;
 
 /// A command that has run for this long did not fail at once.
 constexpr auto longRun = 60s;
-constexpr std::size_t longestText = EntryKeep::longestText;
-constexpr std::size_t roomForLines = 2 * longestText;
-
-/// The lines of a stream that is read in blocks. Of a longer line only the beginning is given.
-class StreamLines {
-public:
-    StreamLines() : m_room(roomForLines + 1) {}
-
-    void clear() noexcept { m_begin = m_end = 0, m_isSkipping = false; }
-    /// The next whole line, terminated and without its end; null if there is none.
-    char* next() noexcept {
-        for (;;) {
-            char* const begin = m_room.data() + m_begin;
-            const std::size_t length = m_end - m_begin;
-            auto* const end = static_cast<char*>(std::memchr(begin, '\n', length));
-            if (end == nullptr) {
-                return length > longestText ? cut() : nullptr;
-            }
-            m_begin += static_cast<std::size_t>(end - begin) + 1;
-            if (!std::exchange(m_isSkipping, false)) {
-                return give(begin, static_cast<std::size_t>(end - begin));
-            }
-        }
-    }
-    /// The last line, which has no end; null if there is none.
-    char* rest() noexcept {
-        char* const begin = m_room.data() + m_begin;
-        const std::size_t length = m_end - m_begin;
-        const bool isLine = length > 0 && !m_isSkipping;
-        clear();
-        return isLine ? give(begin, length) : nullptr;
-    }
-    /// Room to read into, once there is no further line.
-    std::pair<char*, std::size_t> room() noexcept {
-        std::memmove(m_room.data(), m_room.data() + m_begin, m_end - m_begin);
-        m_end -= std::exchange(m_begin, 0);
-        return {m_room.data() + m_end, roomForLines - m_end};
-    }
-    void add(std::size_t count) noexcept { m_end += count; }
-
-    std::string_view text() const noexcept { return m_text; }
-    bool isCut() const noexcept { return m_isCut; }
-
-private:
-    /// The line is longer than any text: what follows is passed over.
-    char* cut() noexcept {
-        char* const begin = m_room.data() + m_begin;
-        const std::size_t length = m_end - m_begin;
-        m_begin = m_end;
-        return std::exchange(m_isSkipping, true) ? nullptr : give(begin, length);
-    }
-    char* give(char* begin, std::size_t length) noexcept {
-        length -= length > 0 && begin[length - 1] == '\r' ? 1 : 0;
-        m_isCut = length > longestText;
-        length = std::min(length, longestText);
-        begin[length] = '\0';
-        m_text = {begin, length};
-        return begin;
-    }
-
-    std::vector<char> m_room;
-    std::size_t m_begin = 0;
-    std::size_t m_end = 0;
-    bool m_isSkipping = false; ///< until the end of the line
-    bool m_isCut = false;
-    std::string_view m_text;
-};
-
 class CommandReading final : public EntrySource::Reading {
 public:
-    CommandReading(const CommandConfig& config, std::unique_ptr<EntryFormat::Reader> reader)
-        : m_config(config), m_reader(std::move(reader)),
+    CommandReading(const CommandConfig& config, std::unique_ptr<EntryFormat::Reader> reader,
+                   const LineJoin* join)
+        : m_config(config), m_reader(std::move(reader)), m_entries(join),
           m_pause(config.pause, CommandConfig::longestPause) {}
 
     void startAt(Start) override {}
@@ -111,8 +42,8 @@ public:
     std::optional<EntrySource::Remark> takeRemark() override;
 
     bool read(EntryColumns& columns) override;
-    std::string_view text() const noexcept override { return m_lines.text(); }
-    bool isTextCut() const noexcept override { return m_lines.isCut(); }
+    std::string_view text() const noexcept override { return m_entries.text(); }
+    bool isTextCut() const noexcept override { return m_entries.isCut(); }
     void readFields(EntryFields& fields) override {
         if (m_reader) {
             m_reader->readFields(text(), fields);
@@ -121,13 +52,13 @@ public:
 
 private:
     void start();
-    char* finish();
+    void finish();
     void fail(const std::string& why);
 
     const CommandConfig& m_config;
     const std::unique_ptr<EntryFormat::Reader> m_reader; ///< null: lines are descriptions
     CommandChild m_child;
-    StreamLines m_lines;
+    StreamEntries m_entries;
     bool m_isOver = false; ///< it is not started any more
     std::string m_problem;
     std::string m_remarked; ///< what it last said on standard error while it ran
@@ -137,7 +68,7 @@ private:
 };
 
 void CommandReading::start() {
-    m_lines.clear();
+    m_entries.begin();
     m_started = Clock::now();
     if (const int error = m_child.start(m_config.arguments)) {
         fail(std::string("the command cannot be started: ") + ErrorText(error).text());
@@ -147,38 +78,40 @@ void CommandReading::start() {
 }
 
 char* CommandReading::next() {
-    if (!m_child.isRunning()) {
-        if (m_isOver || Clock::now() < m_retry) {
-            return nullptr;
+    for (;;) {
+        if (char* const entry = m_entries.next()) {
+            return entry;
         }
-        start();
-    }
-    while (m_child.isRunning()) {
-        if (char* const line = m_lines.next()) {
-            return line;
+        if (!m_child.isRunning()) {
+            if (m_isOver || Clock::now() < m_retry) {
+                return nullptr;
+            }
+            start();
+            continue;
         }
         // Asked before the output is read: what the process has written is there when it has ended.
         // Its children may keep the output open.
         const bool hasEnded = m_child.hasEnded();
-        const auto [room, size] = m_lines.room();
+        const auto [room, size] = m_entries.room();
         const ssize_t count = m_child.read(room, size);
-        if (count <= 0) {
-            return count == 0 || errno != EAGAIN || hasEnded ? finish() : nullptr;
+        if (count > 0) {
+            m_entries.add(static_cast<std::size_t>(count));
+        } else if (count == 0 || errno != EAGAIN || hasEnded) {
+            finish();
+        } else {
+            return nullptr;
         }
-        m_lines.add(static_cast<std::size_t>(count));
     }
-    return nullptr;
 }
 
-/// Ends the command. Gives the last line, if that has no end.
-char* CommandReading::finish() {
-    char* const rest = m_lines.rest();
+/// Ends the command. What is left of its output can still be read.
+void CommandReading::finish() {
+    m_entries.end();
     if (Clock::now() - m_started >= longRun) {
         m_pause.reset();
     }
     const std::string how = m_child.end();
     fail(how + (m_child.lastError().empty() ? "" : ", after '" + m_child.lastError() + "'"));
-    return rest;
 }
 
 void CommandReading::fail(const std::string& why) {
@@ -190,7 +123,7 @@ void CommandReading::fail(const std::string& why) {
 void CommandReading::wait(std::chrono::milliseconds most) {
     if (m_child.isRunning()) {
         m_child.readErrors();
-        m_child.wait(most);
+        m_child.wait(m_entries.patience(most));
         m_child.readErrors();
         return;
     }
@@ -219,23 +152,27 @@ bool CommandReading::read(EntryColumns& columns) {
     return true;
 }
 
-std::string definitionOf(const CommandConfig& config, const Defined<EntryFormat>& format) {
+std::string definitionOf(const CommandConfig& config, const Defined<EntryFormat>& format,
+                         const Defined<LineJoin>& join) {
     return JsonWriter::text([&](JsonWriter& json) {
         json.beginObject().member("command", config.arguments);
         json.member("pause", std::int64_t{config.pause.count()});
         json.member("restarts", config.restarts);
-        json.member("format", format ? format->definition() : std::string()).endObject();
+        json.member("format", format ? format->definition() : std::string());
+        json.member("join", join ? join->definition() : std::string()).endObject();
     });
 }
 
 } // namespace
 
-CommandSource::CommandSource(CommandConfig config, Defined<EntryFormat> format)
-    : m_config(std::move(config)), m_format(std::move(format)),
-      m_definition(definitionOf(m_config, m_format)) {}
+CommandSource::CommandSource(CommandConfig config, Defined<EntryFormat> format,
+                             Defined<LineJoin> join)
+    : m_config(std::move(config)), m_format(std::move(format)), m_join(std::move(join)),
+      m_definition(definitionOf(m_config, m_format, m_join)) {}
 
 std::unique_ptr<EntrySource::Reading> CommandSource::reading() const {
-    return std::make_unique<CommandReading>(m_config, m_format ? m_format->reader() : nullptr);
+    return std::make_unique<CommandReading>(m_config, m_format ? m_format->reader() : nullptr,
+                                            m_join.value.get());
 }
 
 } // namespace zrm::host

@@ -10,13 +10,14 @@
 
 namespace zrm::host {
 
-/// The lines that a command prints, each an entry. A command that ends is started again after a
-/// pause. What it has printed cannot be read again, so there are no positions.
+/// The lines that a command prints, each an entry, or joined to entries. A command that ends is
+/// started again after a pause. What it has printed cannot be read again, so there are no
+/// positions.
 class CommandSource final : public EntrySource {
 public:
     /// `format`: how lines are taken apart. None: a line is a description, and its time is the
-    /// present.
-    CommandSource(CommandConfig config, Defined<EntryFormat> format);
+    /// present. `join`: which lines make an entry; none: each is one.
+    CommandSource(CommandConfig config, Defined<EntryFormat> format, Defined<LineJoin> join);
 
     std::unique_ptr<Reading> reading() const override;
     std::unique_ptr<Past> past() const override { return nullptr; }
@@ -25,6 +26,7 @@ public:
 private:
     const CommandConfig m_config;
     const Defined<EntryFormat> m_format;
+    const Defined<LineJoin> m_join;
     const std::string m_definition;
 };
 

@@ -13,6 +13,7 @@
 #include <filesystem>
 #include <optional>
 #include <system_error>
+#include <utility>
 
 #include <fnmatch.h>
 #include <systemd/sd-id128.h>
@@ -51,9 +52,14 @@ std::string ownInvocation() {
 
 } // namespace
 
-Journal::Journal(const JournalConfig& config)
-    : m_config(config), m_hasGlobs(std::any_of(config.units.begin(), config.units.end(), isGlob)),
-      m_ownProgram(ownProgram()), m_ownInvocation(ownInvocation()), m_message(longestText + 1) {}
+Journal::Journal(const JournalConfig& config, std::shared_ptr<const MessageFormat> messages)
+    : m_config(config), m_messages(std::move(messages)),
+      m_hasGlobs(std::any_of(config.units.begin(), config.units.end(), isGlob)),
+      m_ownProgram(ownProgram()), m_ownInvocation(ownInvocation()), m_message(longestText + 1) {
+    if (m_messages) {
+        m_messageReader.emplace(*m_messages);
+    }
+}
 
 Journal::~Journal() {
     close();
@@ -329,6 +335,9 @@ void Journal::read(EntryColumns& columns) {
         columns.entryClass.remove_suffix(service.size());
     }
     columns.description = message();
+    if (m_messageReader) {
+        m_messageReader->read(columns);
+    }
 }
 
 void Journal::readFields(EntryFields& fields) {
@@ -351,6 +360,9 @@ void Journal::readFields(EntryFields& fields) {
         } else {
             fields.noteLeftOut();
         }
+    }
+    if (m_messageReader) {
+        m_messageReader->readFields({m_source.data(), m_sourceLength}, message(), fields);
     }
 }
 

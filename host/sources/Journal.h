@@ -2,12 +2,14 @@
 #define ZRM_HOST_JOURNAL_H
 
 #include "host/config/SourceConfig.h"
+#include "host/formats/MessageFormat.h"
 #include "logs/EntrySource.h"
 
 #include <array>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -73,6 +75,7 @@ public:
 
     // The last entry.
 
+    /// Call it before readFields.
     void read(EntryColumns& columns);
     char* text() noexcept { return m_message.data(); }
     std::string_view message() const noexcept { return {m_message.data(), m_messageLength}; }
@@ -105,6 +108,8 @@ private:
     void buildSource();
 
     const JournalConfig m_config;
+    const std::shared_ptr<const MessageFormat> m_messages;
+    std::optional<MessageFormat::Reader> m_messageReader;
     const bool m_hasGlobs;       ///< among the units
     std::string m_ownProgram;    ///< `_EXE` of this process; empty: unknown
     std::string m_ownInvocation; ///< of the service that this process belongs to; empty: none

@@ -24,8 +24,9 @@ constexpr const char* beforeAll = "beginning"; ///< the position before the firs
 
 } // namespace
 
-JournalReading::JournalReading(const JournalConfig& config)
-    : m_config(config), m_journal(config), m_faults(MapFaults::count()),
+JournalReading::JournalReading(const JournalConfig& config,
+                               std::shared_ptr<const MessageFormat> messages)
+    : m_config(config), m_journal(config, std::move(messages)), m_faults(MapFaults::count()),
       m_pause(firstPause, longestPause) {}
 
 void JournalReading::startAt(Start start) {

@@ -20,8 +20,9 @@ namespace zrm::host {
 /// Reads a journal as it grows, each entry once, through rotation and the removal of old files.
 class JournalReading final : public EntrySource::Reading {
 public:
-    /// Call it on the thread that reads.
-    explicit JournalReading(const JournalConfig& config);
+    /// Call it on the thread that reads. `messages` as for Journal.
+    explicit JournalReading(const JournalConfig& config,
+                            std::shared_ptr<const MessageFormat> messages = nullptr);
 
     void startAt(Start start) override;
     void resumeAt(const std::string& position) override;

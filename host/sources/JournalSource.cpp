@@ -18,8 +18,8 @@ namespace {
 /// Reads a journal backwards for a report.
 class JournalPast final : public EntrySource::Past {
 public:
-    explicit JournalPast(const JournalConfig& config)
-        : m_directory(config.directory), m_journal(config) {}
+    JournalPast(const JournalConfig& config, std::shared_ptr<const MessageFormat> messages)
+        : m_directory(config.directory), m_journal(config, std::move(messages)) {}
 
     bool begin(std::int64_t newest) override {
         m_newest = std::max<std::int64_t>(newest, 0); // nothing is older
@@ -92,25 +92,27 @@ private:
     std::string m_problem;
 };
 
-std::string definitionOf(const JournalConfig& config) {
+std::string definitionOf(const JournalConfig& config, const Defined<MessageFormat>& messages) {
     return JsonWriter::text([&](JsonWriter& json) {
         json.beginObject().member("journal", config.directory).member("units", config.units);
         json.member("identifiers", config.identifiers).member("priority", config.priority);
-        json.member("boot", config.isCurrentBoot).endObject();
+        json.member("boot", config.isCurrentBoot);
+        json.member("messages", messages ? messages->definition() : std::string()).endObject();
     });
 }
 
 } // namespace
 
-JournalSource::JournalSource(JournalConfig config)
-    : m_config(std::move(config)), m_definition(definitionOf(m_config)) {}
+JournalSource::JournalSource(JournalConfig config, Defined<MessageFormat> messages)
+    : m_config(std::move(config)), m_messages(std::move(messages)),
+      m_definition(definitionOf(m_config, m_messages)) {}
 
 std::unique_ptr<EntrySource::Reading> JournalSource::reading() const {
-    return std::make_unique<JournalReading>(m_config);
+    return std::make_unique<JournalReading>(m_config, m_messages.value);
 }
 
 std::unique_ptr<EntrySource::Past> JournalSource::past() const {
-    return std::make_unique<JournalPast>(m_config);
+    return std::make_unique<JournalPast>(m_config, m_messages.value);
 }
 
 } // namespace zrm::host

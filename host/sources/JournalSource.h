@@ -2,7 +2,9 @@
 #define ZRM_HOST_JOURNAL_SOURCE_H
 
 #include "host/config/SourceConfig.h"
+#include "host/formats/MessageFormat.h"
 #include "logs/EntrySource.h"
+#include "logs/FollowSettings.h"
 
 #include <memory>
 #include <string>
@@ -12,7 +14,8 @@ namespace zrm::host {
 /// The entries of a journal. A position is the cursor of an entry.
 class JournalSource final : public EntrySource {
 public:
-    explicit JournalSource(JournalConfig config);
+    /// `messages`: what is read from them; none: they are taken as they are.
+    explicit JournalSource(JournalConfig config, Defined<MessageFormat> messages = {});
 
     std::unique_ptr<Reading> reading() const override;
     std::unique_ptr<Past> past() const override;
@@ -20,6 +23,7 @@ public:
 
 private:
     const JournalConfig m_config;
+    const Defined<MessageFormat> m_messages;
     const std::string m_definition;
 };
 

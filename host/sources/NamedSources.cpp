@@ -12,9 +12,9 @@ namespace {
 
 std::shared_ptr<const EntrySource> sourceOf(const LogConfig& log) {
     if (log.journal) {
-        return std::make_shared<const JournalSource>(*log.journal);
+        return std::make_shared<const JournalSource>(*log.journal, log.messages);
     }
-    return std::make_shared<const CommandSource>(*log.command, log.follow.format);
+    return std::make_shared<const CommandSource>(*log.command, log.follow.format, log.follow.join);
 }
 
 } // namespace

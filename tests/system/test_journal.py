@@ -9,7 +9,7 @@ from signal import SIGKILL, SIGTERM
 
 import pytest
 from api import Api
-from conftest import descriptions, syslog_line, wait_until
+from conftest import ROOT, descriptions, syslog_line, wait_until
 from journal import Journal
 from test_ledger import ledger_of
 
@@ -48,6 +48,39 @@ def test_entries_raise_events_with_columns_and_fields(reader):
     assert row["ENTRYTIME"] == written
     assert event["entry"] == "Failed password for root"
     assert event["fields"] == {"_PID": "412", "CODE_LINE": "17"}
+    assert reader.stop() == 0
+
+
+SSHD = {"SYSLOG_IDENTIFIER": "sshd", "_PID": 412, "_SYSTEMD_UNIT": "ssh.service"}
+
+
+def test_expressions_and_ready_formats_read_fields_of_messages(reader):
+    reader.listen = "127.0.0.1:0"
+    reader.formats = ROOT / "formats"
+    reader.tables[0].update(format=["sshd", "sudo"], keep=["user", "address", "port", "_PID"])
+    reader.situations[0]["when"] = ["field.user = 'root'"]
+    reader.journal.write("Failed password for root from 203.0.113.7 port 40021 ssh2", **SSHD)
+    reader.start()
+    reader.journal.write("Failed password for root from 203.0.113.7 port 40022 ssh2", SYSLOG_IDENTIFIER="other")
+    reader.journal.write("Failed password for root from 203.0.113.7 port 40023 ssh2", **SSHD)
+    (event,) = reader.wait_events(1)
+    assert event["fields"] == {"_PID": "412", "user": "root", "address": "203.0.113.7", "port": "40023"}
+    body = {"log": "journal", "from": "2020-01-01", "where": ["field.port < 40023"], "limit": 5}
+    status, _, answer = Api(reader).request("POST", "/api/v1/reports", body)
+    assert status == 200 and [row["ENTRYDESC"][-10:] for row in answer["rows"]] == ["40021 ssh2"], answer
+    assert reader.stop() == 0
+
+
+def test_messages_in_a_format_of_their_own_are_taken_apart(reader):
+    reader.formats = ROOT / "formats"
+    reader.tables[0].update(format="json", columns={"type": "lvl"}, keep=["disk.free"])
+    reader.start()
+    reader.journal.write("Started the service.", '{"lvl":"ERROR","msg":"disk full","disk":{"free":5}}', **SSHD)
+    plain, parsed = reader.wait_events(2)
+    assert (plain["row"]["ENTRYTYPE"], plain["row"]["ENTRYDESC"]) == ("info", "Started the service.")
+    row = parsed["row"]
+    assert (row["ENTRYTYPE"], row["ENTRYDESC"], row["ENTRYSRC"]) == ("ERROR", "disk full", "sshd[412]")
+    assert parsed["fields"] == {"disk.free": "5"} and parsed["entry"].startswith('{"lvl"')
     assert reader.stop() == 0
 
 
@@ -263,7 +296,7 @@ def test_reports_read_the_journal_backwards(reporting):
     assert (answer["truncated"], answer["complete"]) == (False, True)
 
 
-def test_a_situation_on_the_journal_is_tested_on_its_past_and_not_explained(reporting):
+def test_a_situation_on_the_journal_is_tested_on_its_past(reporting):
     body = {"situation": "every-entry", "from": "2020-01-01", "to": "2090-01-01"}
     status, _, answer = reporting.api.request("POST", "/api/v1/backtest", body)
     assert status == 200, answer

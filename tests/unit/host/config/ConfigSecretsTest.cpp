@@ -49,6 +49,13 @@ TEST(ConfigFields, WarnsAboutConditionsOnFieldsOfLogsThatHaveNone) {
     EXPECT_THAT(warnings(text + syslog, "log = '/s.log'\n"), IsEmpty());
     EXPECT_THAT(warnings(text, ""),
                 ElementsAre(begin + "no [[log]] table has a type whose entries have fields"));
+    const std::string command = "[[log]]\ntype = 'command'\ncommand = 'a'\n";
+    EXPECT_THAT(warnings("[[log]]\ntype = 'journal'\n" + text, "log = 'journal'\n"), IsEmpty());
+    EXPECT_THAT(warnings(command + "format = '(?P<user>.*)'\n", "log = 'a'\n"), IsEmpty());
+    EXPECT_THAT(warnings(command, "log = 'a'\n"),
+                ElementsAre(begin +
+                            "entries of type \"command\", as the [[log]] at line 1 has them, "
+                            "have no fields"));
     EXPECT_THAT(warnings(syslog + text, "log = '/t/a.log'\n"),
                 ElementsAre(begin + "entries of type \"text\", as the [[log]] at line 3 has them, "
                                     "have no fields"));

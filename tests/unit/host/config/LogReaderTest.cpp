@@ -97,6 +97,76 @@ TEST(LogReader, RefusesWhatAJournalCannotBe) {
                             "already; give this one another, for example name = \"journal-2\""));
 }
 
+TEST(LogReader, ReadsWhatIsReadFromTheMessagesOfAJournal) {
+    EXPECT_FALSE(accepted("[[log]]\ntype = 'journal'\n")[0].messages);
+    const LogConfig extracts = accepted("[[log]]\ntype = 'journal'\n[[log.extract]]\n"
+                                        "source = 'sshd'\npatterns = ['for (?P<user>a)']\n")[0];
+    ASSERT_TRUE(extracts.messages);
+    EXPECT_THAT(extracts.messages->definition(), HasSubstr("for (?P<user>a)"));
+    const std::string formats = "[formats]\ndirectory = '" ZRM_FORMATS "'\n";
+    const LogConfig named =
+        accepted(formats + "[[log]]\ntype = 'journal'\nformat = ['sshd', 'sudo']\n")[0];
+    ASSERT_TRUE(named.messages);
+    EXPECT_THAT(named.messages->definition(), HasSubstr("authentication failure"));
+    EXPECT_EQ(named.type, "journal");
+    const LogConfig lines = accepted(formats + "[[log]]\ntype = 'journal'\nformat = 'json'\n"
+                                               "columns = { type = 'lvl' }\n")[0];
+    EXPECT_THAT(lines.messages->definition(), HasSubstr("lvl"));
+}
+
+TEST(LogReader, RefusesWhatMessagesOfAJournalCannotBe) {
+    const std::string log = "[[log]]\ntype = 'journal'\n";
+    EXPECT_THAT(
+        refused(log + "entry = { starts = 'a' }\nunwrap = 'cri'\ntime_format = 'auto'\n"),
+        ElementsAre("zrm.toml:3: log.entry: has no meaning for a journal, in which each message is "
+                    "an entry, also one of several lines; leave it out; what a program writes line "
+                    "by line is an entry per line",
+                    "zrm.toml:4: log.unwrap: has no meaning for a journal, whose messages are not "
+                    "wrapped; leave it out",
+                    "zrm.toml:5: log.time_format: has no meaning for a journal, which has each "
+                    "message's time; leave it out"));
+    EXPECT_THAT(
+        refused(log + "columns = { type = 'a' }\n"),
+        ElementsAre("zrm.toml:3: log.columns: has no meaning for type \"journal\"; leave it "
+                    "out"));
+    EXPECT_THAT(refused(log + "format = '(?P<a>b)'\n"),
+                ElementsAre(HasSubstr("zrm.toml:3: log.format: '(?P<a>b)' is not the name of a "
+                                      "ready format; ")));
+    EXPECT_THAT(refused("[formats]\ndirectory = '" ZRM_FORMATS "'\n" + log + "format = 'docker'\n"),
+                ElementsAre("zrm.toml:5: log.format: is not a format of a program's messages; name "
+                            "the format in which the program writes its lines"));
+}
+
+TEST(LogReader, ReadsHowTheOutputOfACommandIsTakenApart) {
+    const std::string log = "[formats]\ndirectory = '" ZRM_FORMATS "'\n"
+                            "[[log]]\ntype = 'command'\ncommand = 'a'\n";
+    const LogConfig plain = accepted(log + "entry = { indented = true }\n")[0];
+    EXPECT_FALSE(plain.follow.format);
+    EXPECT_TRUE(plain.follow.join);
+    const LogConfig named = accepted(log + "format = 'json'\ncolumns = { time = 'at' }\n")[0];
+    ASSERT_TRUE(named.follow.format);
+    EXPECT_THAT(named.follow.format->definition(), HasSubstr("\"at\""));
+    EXPECT_EQ(named.type, "command");
+    const LogConfig joined = accepted(log + "format = 'java'\n")[0];
+    EXPECT_TRUE(joined.follow.format && joined.follow.join) << "the format says which lines";
+    const LogConfig own = accepted(log + "format = '(?P<description>.*)'\n"
+                                         "entry = { continues = '^ ' }\n")[0];
+    EXPECT_TRUE(own.follow.format && own.follow.join);
+    EXPECT_TRUE(accepted(log + "[[log.extract]]\npatterns = ['(?P<a>b)']\n")[0].follow.format);
+    EXPECT_THAT(refused(log + "format = 'jsonn'\ncolumns = { time = 'at' }\n"),
+                ElementsAre(HasSubstr("zrm.toml:6: log.format: there is no format 'jsonn'")));
+    EXPECT_THAT(refused(log + "entry = { }\n"),
+                ElementsAre(HasSubstr("log.entry: does not say which lines make an entry")));
+}
+
+TEST(LogReader, RefusesToUnwrapTheFormatLanguage) {
+    EXPECT_THAT(
+        refused("[[log]]\npath = '/a'\ntype = 'text'\nformat = 'A,\"%255[^\\n]\" , "
+                "description'\nunwrap = 'cri'\n"),
+        ElementsAre("zrm.toml:5: log.unwrap: has no meaning for type \"text\"; describe what "
+                    "the program writes by an expression: type = \"regex\""));
+}
+
 TEST(LogReader, RefusesWhatACommandCannotBe) {
     EXPECT_THAT(refused("[[log]]\ntype = 'command'\n"),
                 ElementsAre("zrm.toml:1: log.command: is missing, and type \"command\" needs it; "

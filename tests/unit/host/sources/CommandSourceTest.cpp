@@ -33,7 +33,8 @@ protected:
         CommandConfig config;
         config.arguments = std::move(arguments);
         config.restarts = restarts;
-        source = std::make_unique<CommandSource>(config, Defined<EntryFormat>());
+        source =
+            std::make_unique<CommandSource>(config, Defined<EntryFormat>(), Defined<LineJoin>());
         reading = source->reading();
         reading->startAt(EntrySource::Reading::Start::end);
     }
