@@ -22,7 +22,7 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-constexpr std::chrono::milliseconds patience{500}; ///< for a group that was asked to end
+constexpr std::chrono::milliseconds patience{500}; ///< for a process that is to end
 constexpr int lookInterval = 5;                    ///< milliseconds
 constexpr int firstOther = 3;                      ///< after the standard descriptors
 
@@ -205,12 +205,17 @@ bool CommandChild::hasEnded() const noexcept {
            info.si_pid == m_pid;
 }
 
-std::string CommandChild::end() {
-    kill(-m_pid, SIGTERM);
+bool CommandChild::waitForEnd() const noexcept {
     const Clock::time_point limit = Clock::now() + patience;
     while (!hasEnded() && Clock::now() < limit) {
         poll(nullptr, 0, lookInterval);
     }
+    return hasEnded();
+}
+
+std::string CommandChild::end() {
+    kill(-m_pid, SIGTERM);
+    waitForEnd();
     readErrors();
     takeErrors("\n");
     kill(-m_pid, SIGKILL);

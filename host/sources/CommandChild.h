@@ -36,6 +36,8 @@ public:
 
     /// Whether the process has ended; others of its group may still run.
     bool hasEnded() const noexcept;
+    /// Waits a moment for the process to end by itself. Returns whether it has.
+    bool waitForEnd() const noexcept;
     /// Ends what is left of the group, SIGTERM first, and says how the process ended, as a clause.
     std::string end();
 

@@ -110,8 +110,10 @@ void CommandReading::finish() {
     if (Clock::now() - m_started >= longRun) {
         m_pause.reset();
     }
+    const bool hasEnded = m_child.waitForEnd(); // what closes its output is usually about to end
     const std::string how = m_child.end();
-    fail(how + (m_child.lastError().empty() ? "" : ", after '" + m_child.lastError() + "'"));
+    fail((hasEnded ? how : "the command has closed its output and gone on, so it was ended") +
+         (m_child.lastError().empty() ? "" : ", after '" + m_child.lastError() + "'"));
 }
 
 void CommandReading::fail(const std::string& why) {

@@ -1,10 +1,12 @@
 """Logs of type "command": the lines that a command prints."""
 
+import os
 import time
+from signal import SIGKILL
 
 import pytest
 from api import Api
-from conftest import descriptions, wait_until
+from conftest import ROOT, descriptions, syslog_line, wait_until
 from test_ledger import ledger_of
 from test_log_warnings import zrmctl
 
@@ -14,6 +16,7 @@ def runner(agent):
     """An agent that runs a command, not yet started."""
     agent.agent_keys["log_config"] = None
     agent.listen = "127.0.0.1:0"
+    agent.formats = ROOT / "formats"
 
     def start(command, **keys):
         agent.tables.append({"type": "command", "command": command, **keys})
@@ -88,6 +91,107 @@ def test_a_flood_disturbs_no_stop(runner):
     agent = runner("yes", name="flood")
     agent.wait_events(1000)
     assert agent.stop() == 0
+
+
+def resident(agent):
+    """Resident memory in MB."""
+    lines = open(f"/proc/{agent.process.pid}/status", encoding="ascii").read().splitlines()
+    return next(int(line.split()[1]) for line in lines if line.startswith("VmRSS")) / 1024
+
+
+@pytest.mark.parametrize("flood", ["yes 'some line of a flood'", "cat /dev/zero", "yes >&2", "yes | tr -d '\\n'"])
+def test_a_flood_costs_no_memory_and_disturbs_no_other_log(runner, flood):
+    agent = runner(f"echo begun; {flood}", name="flood")
+    log = agent.directory / "app.log"
+    log.write_text("")
+    agent.situations[0]["when"] = ["ENTRYDESC starts 'hit'"]
+    agent.follow(log)
+    agent.reload()
+    agent.wait_open(log)
+    before = resident(agent)
+    for number in range(1, 4):
+        time.sleep(0.7)  # of flood
+        with open(log, "a", encoding="ascii") as stream:
+            stream.write(syslog_line(f"hit {number}"))
+        wait_until(lambda: descriptions(agent.events())[-1:] == [f"hit {number}"], "the other log's event")
+    assert resident(agent) < before + 50
+    assert agent.stop() == 0
+
+
+def test_a_command_that_never_writes_is_waited_for(runner):
+    agent = runner(["sleep", "1000"], name="silent")
+    wait_until(lambda: ledger_of(agent, "silent")["follow"]["state"] == "reading", "the log to be read")
+    children = f"/proc/{agent.process.pid}/task"
+    (process,) = {
+        int(child)
+        for task in os.listdir(children)
+        for child in open(f"{children}/{task}/children", encoding="ascii").read().split()
+    }
+    assert is_alive(process) and ledger_of(agent, "silent")["follow"]["problem"] is None
+    assert agent.stop() == 0
+    wait_until(lambda: not is_alive(process), "the end of the command")
+
+
+def test_a_command_that_closes_its_output_is_ended_and_started_again(runner):
+    agent = runner("echo $$; exec >&-; exec sleep 1000", name="closed")
+    first, second = (int(text) for text in descriptions(agent.wait_events(2))[:2])
+    wait_until(lambda: not is_alive(first), "the end of the first run")
+    assert agent.trace("the command has closed its output and gone on, so it was ended, and is started again")
+    assert agent.stop() == 0
+    wait_until(lambda: not is_alive(second), "the end of the second run")
+
+
+def test_what_a_command_has_forked_ends_with_it_and_what_left_it_is_not_waited_for(runner):
+    agent = runner(
+        "for number in $(seq 50); do sleep 1000 & echo $!; done; mark=$(mktemp); "
+        "setsid --fork sh -c \"echo left \\$\\$; rm $mark; exec sleep 1000\"; "
+        "while [ -e $mark ]; do sleep 0.01; done; exit 5",
+        name="forks",
+    )
+    texts = descriptions(agent.wait_events(102))  # of two runs
+    assert agent.trace("the command ended with status 5, and is started again")
+    children = [int(text) for text in texts[:50]]
+    wait_until(lambda: not any(is_alive(child) for child in children), "the end of the children")
+    left = [int(text.split()[1]) for text in texts if text.startswith("left")]
+    assert all(is_alive(process) for process in left), "they have a group of their own"
+    assert agent.stop() == 0
+    for text in descriptions(agent.events()):
+        if text.startswith("left"):
+            os.kill(int(text.split()[1]), SIGKILL)
+
+
+def test_lines_of_a_command_are_joined_to_entries(runner):
+    trace = "java.lang.IllegalStateException: broken\n\tat a.b\n\tat c.d"
+    agent = runner(
+        ["sh", "-c", f"printf '%s\n' \"$1\" next; sleep 0.1; printf ' last\n'; exec sleep 1000", "sh", trace],
+        entry={"indented": True, "wait": "1s"},
+    )
+    events = agent.wait_events(2)
+    assert [event["entry"] for event in events] == [trace, "next\n last"]
+    assert agent.stop() == 0
+
+
+def test_ready_formats_take_the_lines_of_a_command_apart(runner):
+    line = '{"time":"2026-01-02T03:04:05Z","level":"ERROR","msg":"disk full","disk":{"free":5}}'
+    agent = runner(["sh", "-c", 'echo "$1"; echo none; exec sleep 1000', "sh", line], format="json", keep=["disk.free"])
+    (event,) = agent.wait_events(1)
+    assert (event["row"]["ENTRYTYPE"], event["row"]["ENTRYDESC"]) == ("ERROR", "disk full")
+    assert event["fields"] == {"disk.free": "5"}
+    wait_until(lambda: ledger_of(agent, "sh")["format_errors"] == 1, "the line that does not fit")
+    assert agent.stop() == 0
+
+
+def test_an_event_of_a_command_is_explained_by_what_it_kept(runner):
+    agent = runner(["sh", "-c", "echo 'user=anna port=5'; exec sleep 1000"], name="pairs", format=r"(?P<description>.*)",
+                   pairs=True, keep=["port"])
+    (event,) = agent.wait_events(1)
+    body = {"event": event["id"], "definition": {"when": ["field.port = 5"]}}
+    status, _, answer = agent.api.request("POST", "/api/v1/explain", body)
+    (one,) = answer["explanations"]
+    assert status == 200 and one["raised"] and one["line"] == "user=anna port=5"
+    assert answer["reason"] == "what a command has printed cannot be read again"
+    status, _, answer = agent.api.request("POST", "/api/v1/explain", {"situation": "every-entry", "log": "pairs", "last": 1})
+    assert status == 409 and answer["detail"].startswith("what a command has printed cannot be read again")
 
 
 def test_nothing_of_the_agent_is_inherited(runner):

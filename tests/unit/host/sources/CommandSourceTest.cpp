@@ -93,6 +93,17 @@ TEST_F(CommandSourceTest, SaysHowItEndedAndWhatItSaidLast) {
     EXPECT_EQ(waitForProblem(), "the command was ended by SIGKILL, and is not started again");
 }
 
+TEST_F(CommandSourceTest, OneThatClosesItsOutputMayEndByItselfOrIsEnded) {
+    beginShell("echo one; exec >&-; sleep 0.1; exit 4");
+    EXPECT_EQ(waitForProblem(), "the command ended with status 4, and is not started again");
+    beginShell("echo $$; exec >&-; echo 'still here' >&2; exec sleep 1000");
+    const std::vector<std::string> process = lines(1);
+    ASSERT_EQ(process.size(), 1U);
+    EXPECT_EQ(waitForProblem(), "the command has closed its output and gone on, so it was ended, "
+                                "after 'still here', and is not started again");
+    EXPECT_TRUE(isGone(std::stoi(process[0])));
+}
+
 TEST_F(CommandSourceTest, SaysWhyItCannotBeStarted) {
     begin({"/nonexistent/program"}, true);
     EXPECT_EQ(waitForProblem(), "the command cannot be started: No such file or directory, and is "
