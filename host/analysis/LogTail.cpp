@@ -181,7 +181,7 @@ void LogTail::readOlder(int present, const Entry& entry) {
     const std::string path = m_log.fileNameLocal();
     const std::unique_ptr<char, void (*)(void*)> real(realpath(path.c_str(), nullptr), std::free);
     const std::vector<GenerationFile> generations = newestFirst(
-        findGenerations(real ? real.get() : path, 0, m_log.followSettings()->rotatedTo));
+        findGenerations(real ? real.get() : path, {}, m_log.followSettings()->rotatedTo));
     const std::unique_ptr<Generation> named = Generation::open(path);
     off_t room = static_cast<off_t>(longest) - status.st_size;
     std::vector<std::unique_ptr<MonitoredLogFile>> files; // newest first

@@ -210,7 +210,9 @@ void PositionBook::left(FollowedLog& by, FollowedLog::Follower follower,
         }
         name = renamed->second;
     }
-    log(name)->takeOver(position, by.lastEvent(), isWatched);
+    LogPosition taken = position;
+    taken.late = {}; // those files stay this log's
+    log(name)->takeOver(taken, by.lastEvent(), isWatched);
     const std::optional<LogPosition> own = by.newest();
     if (!isWatched && own && own->device == position.device && own->inode == position.inode) {
         by.beginAnew(follower, position.modified);

@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 7> steps = {
+constexpr std::array<const char*, 8> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -52,6 +52,8 @@ constexpr std::array<const char*, 7> steps = {
     "CREATE TABLE watched_paths (path TEXT PRIMARY KEY, watched INTEGER NOT NULL) WITHOUT ROWID;",
     // 7: the position of a log that is not a file is a text of its source.
     "ALTER TABLE log_positions ADD COLUMN cursor TEXT NOT NULL DEFAULT '';",
+    // 8: the older files of a log to which late lines may come, and where these begin (JSON).
+    "ALTER TABLE log_positions ADD COLUMN late TEXT NOT NULL DEFAULT '';",
 };
 
 } // namespace

@@ -5,8 +5,28 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace zrm {
+
+struct LogPosition;
+
+/// Where reading has left files of a log to which a late writer may still write. Values do not
+/// change; copies share them, since one goes with each event.
+class LatePositions {
+public:
+    LatePositions() = default;
+    explicit LatePositions(std::vector<LogPosition> files);
+
+    /// The file that was left first comes first.
+    const std::vector<LogPosition>& files() const noexcept;
+
+    bool operator==(const LatePositions& other) const noexcept;
+
+private:
+    std::shared_ptr<const std::vector<LogPosition>> m_files; ///< null: none
+};
 
 /// Where the next entry of a followed log begins.
 struct LogPosition {
@@ -20,9 +40,23 @@ struct LogPosition {
     /// Of a log that is not a file: what its source calls the position (EntrySource). Nothing else
     /// is set then.
     std::string cursor{};
+    LatePositions late{};
 
     bool operator==(const LogPosition&) const = default;
 };
+
+inline LatePositions::LatePositions(std::vector<LogPosition> files)
+    : m_files(files.empty() ? nullptr
+                            : std::make_shared<const std::vector<LogPosition>>(std::move(files))) {}
+
+inline const std::vector<LogPosition>& LatePositions::files() const noexcept {
+    static const std::vector<LogPosition> none;
+    return m_files ? *m_files : none;
+}
+
+inline bool LatePositions::operator==(const LatePositions& other) const noexcept {
+    return m_files == other.m_files || files() == other.files();
+}
 
 /// The position of one followed log in the framework's store of events. The events of an entry and
 /// the position behind it are stored together or not at all. Created, used and destroyed on the

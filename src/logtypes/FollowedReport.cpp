@@ -153,7 +153,7 @@ void FollowedReport::findFiles() {
     // The generations of a symbolic link are beside the file to which it leads.
     const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
     std::vector<GenerationFile> generations =
-        newestFirst(findGenerations(real ? real.get() : m_path, 0, m_options.rotatedTo));
+        newestFirst(findGenerations(real ? real.get() : m_path, {}, m_options.rotatedTo));
     // A log may be without a file after a rotation, until its next line is written.
     if (m_present || problem != noFile || generations.empty()) {
         Generation::Status status{};

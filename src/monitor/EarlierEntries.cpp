@@ -89,15 +89,23 @@ void EarlierEntries::findParts(Generation& file, std::int64_t offset, std::int64
             std::any_of(m_parts.begin(), m_parts.end(), isCopied)) {
             continue;
         }
-        Generation::Status status{};
-        const bool isPlain = !generation->isCompressed() && generation->status(status);
-        const bool isFound =
-            addPart(*generation, isPlain ? status.size : mostBytes, period, timeOf);
+        const bool isFound = addPart(*generation, endOf(*generation), period, timeOf);
         m_older.push_back(std::move(generation));
         if (isFound) {
             return;
         }
     }
+}
+
+/// How far an older generation is read.
+std::int64_t EarlierEntries::endOf(const Generation& file) const noexcept {
+    for (const LogPosition& late : m_late.files()) {
+        if (identityOf(late) == file.identity()) {
+            return late.offset;
+        }
+    }
+    Generation::Status status;
+    return !file.isCompressed() && file.status(status) ? status.size : mostBytes;
 }
 
 /// Adds as much of the file before `to` as is needed. True if that is enough.
@@ -132,7 +140,7 @@ bool EarlierEntries::addPart(Generation& file, std::int64_t to, std::int64_t per
 std::vector<GenerationFile> EarlierEntries::olderThan(const Generation& file) const {
     const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
     std::vector<GenerationFile> files =
-        newestFirst(findGenerations(real ? real.get() : m_path, 0, m_rotatedTo));
+        newestFirst(findGenerations(real ? real.get() : m_path, {}, m_rotatedTo));
     const auto self = std::find_if(files.begin(), files.end(), [&file](const GenerationFile& one) {
         return one.identity == file.identity();
     });

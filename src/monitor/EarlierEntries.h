@@ -42,6 +42,8 @@ public:
         : m_path(std::move(path)), m_rotatedTo(std::move(rotatedTo)), m_recordLength(recordLength),
           m_join(join) {}
 
+    /// What these files have behind the positions is left out: it was not judged yet.
+    void leaveOutLate(LatePositions late) { m_late = std::move(late); }
     /// Gives the entries of `file` before the offset, and those of older generations before them,
     /// oldest first. There may be further entries before the period among them.
     void read(Generation& file, std::int64_t offset, std::int64_t period, const TimeOf& timeOf,
@@ -58,6 +60,7 @@ private:
     void findParts(Generation& file, std::int64_t offset, std::int64_t period,
                    const TimeOf& timeOf);
     bool addPart(Generation& file, std::int64_t to, std::int64_t period, const TimeOf& timeOf);
+    std::int64_t endOf(const Generation& file) const noexcept;
     std::vector<GenerationFile> olderThan(const Generation& file) const;
     std::int64_t newestTime(Generation& file, std::int64_t to, const TimeOf& timeOf) const;
     bool isBeforePeriod(Generation& file, std::int64_t at, const TimeOf& timeOf) const;
@@ -71,6 +74,7 @@ private:
     std::vector<std::unique_ptr<Generation>> m_older;
     std::optional<std::int64_t> m_periodBegin; ///< the period follows this time
     std::int64_t m_room = mostBytes;           ///< bytes that may still be read
+    LatePositions m_late;
 };
 
 } // namespace zrm

@@ -67,10 +67,12 @@ std::optional<FileFollower::Place> FileFollower::place() const noexcept {
 }
 
 std::optional<LogPosition> FileFollower::position() const noexcept {
-    if (m_isInBlock) {
-        return positionInBlock();
+    if (!m_isInBlock && !m_hasPosition) {
+        return std::nullopt;
     }
-    return m_hasPosition ? std::optional(m_position) : std::nullopt;
+    LogPosition position = m_isInBlock ? positionInBlock() : m_position;
+    position.late = m_late.positions();
+    return position;
 }
 
 bool FileFollower::look(const Moment& now) {
@@ -211,7 +213,7 @@ char* FileFollower::nextLate() {
     noteModified(m_late.modified());
     m_before = m_position;
     const LogPosition behind = m_late.position();
-    if (!m_isInBlock && (m_late.isNewest() || identityOf(behind) == identityOf(m_position))) {
+    if (!m_isInBlock && identityOf(behind) == identityOf(m_position)) {
         m_position = behind;
         m_position.modified = m_modified;
     }

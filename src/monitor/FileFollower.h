@@ -77,7 +77,7 @@ public:
     std::string_view text() const noexcept { return m_isLate ? m_late.text() : m_block.text(); }
     bool isTextCut() const noexcept { return m_isLate ? m_late.isTextCut() : m_block.isTextCut(); }
     /// Behind the last entry of the file that is read. None before a file has been opened. Entries
-    /// that come late to an older file do not move it.
+    /// that come late to an older file move only the position that it has for that file.
     std::optional<LogPosition> position() const noexcept;
     /// True if the last entry came late to an older file.
     bool isLate() const noexcept { return m_isLate; }
@@ -160,7 +160,7 @@ private:
     bool isCountedLost(const GenerationFile& file) const noexcept;
     void takeUnreadable(const Found& found, std::int64_t from = 0, std::int64_t to = 0);
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
-    std::vector<GenerationFile> generations(ino_t inode = 0);
+    std::vector<GenerationFile> generations(const std::vector<ino_t>& inodes = {});
 
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
@@ -179,6 +179,9 @@ private:
     void beginFirst(std::unique_ptr<Generation> named);
     void noteOlder();
     void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
+    void takeUpLate(const LogPosition& stored, const Generation* named);
+    bool takeUpLate(const LogPosition& left, const std::string& path);
+    Member memberOf(std::unique_ptr<Generation> named);
     void checkName();
     bool checkFile();
     bool isFinished() const noexcept;

@@ -41,16 +41,20 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
     takeUnreadable(found);
     std::move(found.younger.begin(), found.younger.end(), std::back_inserter(m_chain));
     if (found.isAll) {
-        Member present;
-        // An older file may have got the name back.
-        const std::optional<LogPosition> left = m_late.remove(named->identity());
-        if (left && named->holds(*left, present.tail)) {
-            present.from = left->offset;
-        }
-        present.file = std::move(named);
-        present.hadName = true;
-        m_chain.push_back(std::move(present));
+        m_chain.push_back(memberOf(std::move(named)));
     }
+}
+
+/// The file that has the name. An older one may have got it back.
+FileFollower::Member FileFollower::memberOf(std::unique_ptr<Generation> named) {
+    Member present;
+    const std::optional<LogPosition> left = m_late.remove(named->identity());
+    if (left && named->holds(*left, present.tail)) {
+        present.from = left->offset;
+    }
+    present.file = std::move(named);
+    present.hadName = true;
+    return present;
 }
 
 bool FileFollower::isOlder(Generation& file) const {

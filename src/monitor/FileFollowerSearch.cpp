@@ -71,12 +71,12 @@ std::unique_ptr<Generation> FileFollower::openNamed() {
 
 /// The files beside the log, or beside the target of a symbolic link, and those that rotation has
 /// moved.
-std::vector<GenerationFile> FileFollower::generations(ino_t inode) {
+std::vector<GenerationFile> FileFollower::generations(const std::vector<ino_t>& inodes) {
     const std::unique_ptr<char, void (*)(void*)> real(realpath(m_path.c_str(), nullptr), std::free);
     if (real) {
         m_siblings = real.get();
     }
-    return findGenerations(m_siblings.empty() ? m_path : m_siblings, inode, m_options.rotatedTo);
+    return findGenerations(m_siblings.empty() ? m_path : m_siblings, inodes, m_options.rotatedTo);
 }
 
 /// A generation that cannot be read is tried again before those after it are read; after some
@@ -171,7 +171,7 @@ bool FileFollower::tryFind(const LogPosition& position, Search search, Generatio
         found.holder = std::move(present);
         return true;
     }
-    const std::vector<GenerationFile> files = generations(static_cast<ino_t>(position.inode));
+    const std::vector<GenerationFile> files = generations({static_cast<ino_t>(position.inode)});
     bool vanished = false;
     found.holder = findHolder(position, search, named, files, vanished);
     if (vanished) {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <utility>
+#include <vector>
 
 namespace zrm {
 
@@ -70,15 +71,16 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
     m_position = stored;
     m_hasPosition = true;
     m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
+    takeUpLate(stored, named.get());
     Found found = find(stored, Search::byContents, named.get());
     takeUnreadable(found);
     if (found.isInterrupted || (found.awaited && !found.holder && found.younger.empty())) {
         return;
     }
     const bool isHeld = found.holder.has_value() || stored.offset == 0;
-    Member present;
+    std::optional<Member> present;
     if (found.holder && !found.holder->file) {
-        present = std::move(*found.holder);
+        present = std::move(found.holder);
         found.holder.reset();
     } else if (!isHeld && (named || !found.younger.empty())) {
         m_ledger.noteLost(stored.offset, stored.offset);
@@ -94,10 +96,63 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
     prepend(found);
     m_isTakenUp = !m_chain.empty();
     if (named && found.isAll) {
-        present.file = std::move(named);
-        present.hadName = true;
-        m_chain.push_back(std::move(present));
+        Member member = memberOf(std::move(named));
+        if (present) {
+            member.from = present->from;
+            member.tail = present->tail;
+        }
+        m_chain.push_back(std::move(member));
     }
+}
+
+/// A writer that was not told of a rotation may have written to older files since the earlier run
+/// has read them.
+void FileFollower::takeUpLate(const LogPosition& stored, const Generation* named) {
+    std::vector<ino_t> inodes;
+    for (const LogPosition& left : stored.late.files()) {
+        inodes.push_back(static_cast<ino_t>(left.inode));
+    }
+    if (inodes.empty()) {
+        return;
+    }
+    const std::vector<GenerationFile> files = generations(inodes);
+    for (const LogPosition& left : stored.late.files()) {
+        const FileIdentity wanted = identityOf(left);
+        if (wanted == identityOf(stored) || m_late.has(wanted)) {
+            continue; // read in its turn
+        }
+        if (named != nullptr && named->identity() == wanted) {
+            takeUpLate(left, m_path); // it has got the name back
+            continue;
+        }
+        const auto isWanted = [&](const GenerationFile& file) { return file.identity == wanted; };
+        const auto plain = std::find_if(files.begin(), files.end(), isWanted);
+        // Without bytes before the position it may be another file that has the same inode.
+        const bool isSure =
+            left.guardLength > 0 || plain == files.end() || plain->modified <= left.modified;
+        if (plain != files.end() && isSure && takeUpLate(left, plain->path)) {
+            continue;
+        }
+        // Compressed since. Some programs store the time of modification in seconds.
+        constexpr std::int64_t second = 1'000'000'000;
+        for (const GenerationFile& file : files) {
+            if (file.isCompressed && left.guardLength > 0 &&
+                file.modified >= left.modified - second && takeUpLate(left, file.path)) {
+                break;
+            }
+        }
+    }
+}
+
+/// False if the file is not that of the position.
+bool FileFollower::takeUpLate(const LogPosition& left, const std::string& path) {
+    std::unique_ptr<Generation> opened = Generation::open(path);
+    Tail tail;
+    if (!opened || !opened->holds(left, tail)) {
+        return false;
+    }
+    m_late.add(std::move(opened), left.offset, tail, m_now.steady);
+    return true;
 }
 
 } // namespace zrm

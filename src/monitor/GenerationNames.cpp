@@ -69,6 +69,11 @@ bool isSameScheme(const GenerationName& a, const GenerationName& b) noexcept {
     return a.scheme == b.scheme && a.digits == b.digits;
 }
 
+bool hasOrder(const GenerationName& name) noexcept {
+    return name.scheme == GenerationName::Scheme::numbered ||
+           name.scheme == GenerationName::Scheme::dated;
+}
+
 /// Grows with youth.
 std::int64_t rank(const GenerationName& name) noexcept {
     const auto number = static_cast<std::int64_t>(name.number);
@@ -104,8 +109,8 @@ std::optional<GenerationName> GenerationName::parse(std::string_view name, std::
 namespace {
 
 /// Adds those of one directory.
-void addGenerations(const std::string& directory, std::string_view log, ino_t inode,
-                    std::vector<GenerationFile>& files) {
+void addGenerations(const std::string& directory, std::string_view log,
+                    const std::vector<ino_t>& inodes, std::vector<GenerationFile>& files) {
     const std::unique_ptr<DIR, int (*)(DIR*)> entries(opendir(directory.c_str()), closedir);
     if (!entries) {
         return;
@@ -117,7 +122,7 @@ void addGenerations(const std::string& directory, std::string_view log, ino_t in
             continue;
         }
         auto name = GenerationName::parse(entry->d_name, log);
-        if (!name && inode != 0 && entry->d_ino == inode) {
+        if (!name && std::find(inodes.begin(), inodes.end(), entry->d_ino) != inodes.end()) {
             name = GenerationName{};
         }
         struct stat status;
@@ -147,7 +152,8 @@ std::string rotationDirectory(const std::string& logPath, const std::string& rot
            '/';
 }
 
-std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode,
+std::vector<GenerationFile> findGenerations(const std::string& logPath,
+                                            const std::vector<ino_t>& inodes,
                                             const std::string& rotatedTo) {
     std::vector<GenerationFile> files;
     const std::size_t slash = logPath.rfind('/');
@@ -155,14 +161,14 @@ std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t in
         return files;
     }
     const std::string_view log = std::string_view(logPath).substr(slash + 1);
-    addGenerations(logPath.substr(0, slash + 1), log, inode, files);
+    addGenerations(logPath.substr(0, slash + 1), log, inodes, files);
     const std::string moved = rotationDirectory(logPath, rotatedTo);
     struct stat mine;
     struct stat other;
     if (!moved.empty() && stat(moved.c_str(), &other) == 0 &&
         stat(logPath.substr(0, slash + 1).c_str(), &mine) == 0 &&
         !(FileIdentity{mine.st_dev, mine.st_ino} == FileIdentity{other.st_dev, other.st_ino})) {
-        addGenerations(moved, log, inode, files);
+        addGenerations(moved, log, inodes, files);
     }
     return files;
 }
@@ -179,8 +185,7 @@ std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files
         }
     }
     const bool isByName =
-        self && self->name.scheme != GenerationName::Scheme::other &&
-        self->name.scheme != GenerationName::Scheme::plain &&
+        self && hasOrder(self->name) &&
         std::all_of(generations.begin(), generations.end(), [&](const GenerationFile& file) {
             return isSameScheme(file.name, self->name);
         });
@@ -191,10 +196,19 @@ std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files
                                : self   ? std::max(self->modified, reference.modified)
                                         : reference.modified;
     std::erase_if(generations, [&](const GenerationFile& file) { return age(file) <= limit; });
+    // A late writer may have written to an older one last.
+    const bool isSortedByName =
+        !generations.empty() && hasOrder(generations.front().name) &&
+        std::all_of(generations.begin(), generations.end(), [&](const GenerationFile& file) {
+            return isSameScheme(file.name, generations.front().name);
+        });
+    const auto place = [isSortedByName](const GenerationFile& file) {
+        return isSortedByName ? rank(file.name) : file.modified;
+    };
     std::sort(generations.begin(), generations.end(),
               [&](const GenerationFile& a, const GenerationFile& b) {
-                  return std::tuple(age(a), !a.isCompressed, std::string_view(a.path)) <
-                         std::tuple(age(b), !b.isCompressed, std::string_view(b.path));
+                  return std::tuple(place(a), !a.isCompressed, std::string_view(a.path)) <
+                         std::tuple(place(b), !b.isCompressed, std::string_view(b.path));
               });
     return generations;
 }

@@ -46,8 +46,9 @@ struct GenerationFile {
 std::string rotationDirectory(const std::string& logPath, const std::string& rotatedTo);
 
 /// The regular files beside the log, and where rotation moves them, whose names begin with the
-/// log's, without the log itself, and the one with the inode, whatever its name; at most 10,000.
-std::vector<GenerationFile> findGenerations(const std::string& logPath, ino_t inode = 0,
+/// log's, without the log itself, and those with the inodes, whatever their names; at most 10,000.
+std::vector<GenerationFile> findGenerations(const std::string& logPath,
+                                            const std::vector<ino_t>& inodes = {},
                                             const std::string& rotatedTo = {});
 
 /// The last generation that was read.
@@ -58,7 +59,8 @@ struct GenerationReference {
 
 /// The generations among the files that are younger than the reference, the oldest first. Their
 /// names decide if the reference has one, and if all names follow the same scheme; else the times
-/// of last modification do. Compressed files come before a plain one of the same name.
+/// of last modification do. Names of one scheme decide the order in any case. Compressed files come
+/// before a plain one of the same name.
 std::vector<GenerationFile> youngerThan(const std::vector<GenerationFile>& files,
                                         const GenerationReference& reference);
 

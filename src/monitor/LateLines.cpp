@@ -21,16 +21,30 @@ void LateLines::add(std::unique_ptr<Generation> file, std::int64_t offset, const
     if (!file->status(added.seen) || !added.seen.hasName) {
         return;
     }
+    m_hasMoved = true;
     added.file = std::move(file);
     added.offset = offset;
     added.tail = tail;
     added.grown = now;
-    added.isDue = added.seen.size > offset;
-    if (m_files.size() == mostFiles) {
-        leave(m_files.front());
-        m_files.pop_front();
-    }
+    added.isDue = added.file->isCompressed() || added.seen.size > offset;
     m_files.push_back(std::move(added));
+    leaveSurplus();
+}
+
+/// Ends the watch over the oldest files. What they have is still read, unless that is too much.
+void LateLines::leaveSurplus() {
+    auto file = m_files.begin();
+    while (m_files.size() > mostFiles && file != m_files.end()) {
+        Generation::Status now;
+        const bool hasMore = file->isDue || (file->file->status(now) && now.size > file->seen.size);
+        if (hasMore && m_files.size() <= mostDue) {
+            ++file;
+        } else {
+            leave(*file);
+            file = m_files.erase(file);
+            m_hasMoved = true;
+        }
+    }
 }
 
 bool LateLines::has(const FileIdentity& file) const noexcept {
@@ -47,6 +61,7 @@ std::optional<LogPosition> LateLines::remove(const FileIdentity& file) {
         return std::nullopt;
     }
     const LogPosition position = positionIn(*found);
+    m_hasMoved = true;
     m_files.erase(found);
     return position;
 }
@@ -56,13 +71,14 @@ void LateLines::clear() {
     for (const File& file : m_files) {
         leave(file);
     }
+    m_hasMoved = true;
     m_files.clear();
 }
 
 /// What was not read by now is an unfinished line, or cannot be read.
 void LateLines::leave(const File& file) {
     m_left.push_back(positionIn(file));
-    if (file.seen.size > file.offset) {
+    if (!file.file->isCompressed() && file.seen.size > file.offset) {
         m_ledger.noteLost(file.offset, file.seen.size);
     }
 }
@@ -70,24 +86,28 @@ void LateLines::leave(const File& file) {
 bool LateLines::look(Time now) {
     stopReading();
     m_now = now;
-    std::erase_if(m_files, [&](File& file) { return !checkFile(file, now); });
+    if (std::erase_if(m_files, [&](File& file) { return !checkFile(file, now); }) > 0) {
+        m_hasMoved = true;
+    }
+    leaveSurplus();
     return std::any_of(m_files.begin(), m_files.end(), [](const File& file) { return file.isDue; });
 }
 
 /// False if the file is watched no longer.
 bool LateLines::checkFile(File& file, Time now) {
     Generation::Status status;
-    if (!file.file->status(status) || status.size < file.offset) {
+    const bool isCompressed = file.file->isCompressed();
+    if (!file.file->status(status) || (!isCompressed && status.size < file.offset)) {
         m_left.push_back(positionIn(file));
         return false; // it was truncated: what it has now is not the log's
     }
-    if (status.size > file.seen.size) {
+    if (!isCompressed && status.size > file.seen.size) {
         file.grown = now;
         file.isDue = true;
     }
     file.seen = status;
     // What was written before the last name was removed is still read.
-    if (!file.isDue && (!status.hasName || now - file.grown >= watchedFor)) {
+    if (!file.isDue && (isCompressed || !status.hasName || now - file.grown >= watchedFor)) {
         leave(file);
         return false;
     }
@@ -112,8 +132,7 @@ char* LateLines::nextOf(File& file) {
     }
     for (int reads = 0; reads < readsPerLook; ++reads) {
         if (char* const entry = m_block.next()) {
-            m_modified = std::max(m_modified, file.seen.modified);
-            return entry;
+            return give(entry, file);
         }
         const std::int64_t from = m_block.readTo();
         switch (m_block.fill(*file.file)) {
@@ -122,10 +141,19 @@ char* LateLines::nextOf(File& file) {
             continue;
         case EntryBlock::Fill::failed:
             file.isDue = errno == EINTR; // the rest is read when the file has grown again
+            if (!file.isDue && file.file->isCompressed()) {
+                m_ledger.noteLost(m_block.offset(), m_block.readTo(), file.file->path());
+            }
             break;
         case EntryBlock::Fill::end:
             if (m_block.isWaiting() && m_now - file.grown >= m_join->limits().wait) {
-                return m_block.endWaiting();
+                return give(m_block.endWaiting(), file);
+            }
+            if (file.file->isCompressed()) {
+                file.isDue = false;
+                if (char* const entry = m_block.rest()) {
+                    return give(entry, file);
+                }
             }
             file.isDue = m_block.isWaiting();
             break;
@@ -137,6 +165,28 @@ char* LateLines::nextOf(File& file) {
     }
     stopReading();
     return nullptr;
+}
+
+char* LateLines::give(char* entry, const File& file) noexcept {
+    m_modified = std::max(m_modified, file.seen.modified);
+    m_hasMoved = true;
+    return entry;
+}
+
+bool LateLines::takeBack() noexcept {
+    m_hasMoved = true;
+    return m_block.takeBack();
+}
+
+const LatePositions& LateLines::positions() const {
+    if (std::exchange(m_hasMoved, false)) {
+        std::vector<LogPosition> positions;
+        for (const File& file : m_files) {
+            positions.push_back(positionIn(file));
+        }
+        m_positions = LatePositions(std::move(positions));
+    }
+    return m_positions;
 }
 
 void LateLines::stopReading() {

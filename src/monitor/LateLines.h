@@ -26,12 +26,14 @@ public:
     using Time = std::chrono::steady_clock::time_point;
     static constexpr std::chrono::minutes watchedFor{10};
     static constexpr std::size_t mostFiles = 4; ///< the latest
+    static constexpr std::size_t mostDue = 16;  ///< of files that have something to read
 
     /// The ledger outlives the object. `recordLength`, `join`: as of EntryBlock.
     LateLines(std::size_t recordLength, std::shared_ptr<const LineJoin> join, FollowLedger& ledger)
         : m_ledger(ledger), m_join(std::move(join)), m_block(recordLength, m_join.get()) {}
 
-    /// A plain file that was read up to the offset, which has the bytes of `tail` before it.
+    /// A file that was read up to the offset, which has the bytes of `tail` before it. Nothing is
+    /// added any more to a compressed one, which is read to its end.
     void add(std::unique_ptr<Generation> file, std::int64_t offset, const Tail& tail, Time now);
     bool has(const FileIdentity& file) const noexcept;
     /// Ends the watch over a file, if it is one of them. Returns where reading has left it.
@@ -46,13 +48,13 @@ public:
     /// The next entry, as EntryBlock gives it; null if there is none until the next look.
     char* next();
     /// Takes back the entry that next has just given. False if it cannot.
-    bool takeBack() noexcept { return m_block.takeBack(); }
+    bool takeBack() noexcept;
     std::string_view text() const noexcept { return m_block.text(); }
     bool isTextCut() const noexcept { return m_block.isTextCut(); }
     /// Behind the entry that next has just given, in its file.
     LogPosition position() const { return positionIn(*m_read); }
-    /// True if that is the file that was left last.
-    bool isNewest() const noexcept { return m_read == &m_files.back(); }
+    /// Where reading has left all of them. Costs nothing unless something was read or has changed.
+    const LatePositions& positions() const;
     /// How many bytes were read since the last call.
     std::int64_t takeBytesRead() noexcept { return std::exchange(m_bytesRead, 0); }
     /// Latest modification of what was read, in ns since the epoch.
@@ -76,9 +78,11 @@ private:
     };
 
     bool checkFile(File& file, Time now);
+    void leaveSurplus();
     void leave(const File& file);
     LogPosition positionIn(const File& file) const;
     char* nextOf(File& file);
+    char* give(char* entry, const File& file) noexcept;
     void stopReading();
 
     FollowLedger& m_ledger;
@@ -90,6 +94,8 @@ private:
     std::int64_t m_bytesRead = 0;
     std::int64_t m_modified = 0;
     std::vector<LogPosition> m_left; ///< of files that are no longer watched
+    mutable LatePositions m_positions;
+    mutable bool m_hasMoved = false; ///< m_positions is older
 };
 
 } // namespace zrm

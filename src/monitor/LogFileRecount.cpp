@@ -81,6 +81,9 @@ void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
     const LogEntry::Offer offer(current);
     EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength,
                            followSettings()->join.value.get());
+    if (const auto position = follower.position()) {
+        earlier.leaveOutLate(position->late);
+    }
     earlier.read(
         place->file, place->offset, period,
         [&](char* entry, std::string_view text) {

@@ -40,6 +40,7 @@ protected:
                                   std::int64_t period) {
         const auto file = Generation::open(m_directory.file(name));
         EarlierEntries earlier(m_directory.file("log"), "", 0);
+        earlier.leaveOutLate(m_late);
         std::vector<std::string> entries;
         earlier.read(*file, offset, period, timeOf, [&](char* entry, std::string_view text) {
             EXPECT_EQ(text, std::string_view(entry, std::strcspn(entry, "\n")));
@@ -65,6 +66,7 @@ protected:
 
     const FakeCompression m_compression;
     TemporaryDirectory m_directory;
+    LatePositions m_late;
     std::size_t m_most = 0;
     std::time_t m_age = 0;
 };
@@ -74,6 +76,15 @@ TEST_F(EarlierEntriesTest, EndsAtThePlace) {
     EXPECT_THAT(read("log", 8, 60), ElementsAre("1 a", "2 b"));
     EXPECT_THAT(read("log", 12, 60), ElementsAre("1 a", "2 b", "3 c"));
     EXPECT_THAT(read("log", 0, 60), IsEmpty());
+}
+
+TEST_F(EarlierEntriesTest, LeavesOutLateLinesThatWereNotJudged) {
+    write("log", "4 d\n");
+    write("log.1", "1 a\n2 b\n3 late\n");
+    EXPECT_THAT(read("log", 4, 60), ElementsAre("1 a", "2 b", "3 late", "4 d"));
+    const auto older = Generation::open(m_directory.file("log.1"));
+    m_late = LatePositions({positionOf(older->identity(), 8, {})});
+    EXPECT_THAT(read("log", 4, 60), ElementsAre("1 a", "2 b", "4 d"));
 }
 
 TEST_F(EarlierEntriesTest, ReadsALargeFileOnlyAsFarBackAsThePeriodGoes) {

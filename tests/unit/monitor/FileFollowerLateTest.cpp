@@ -62,6 +62,66 @@ TEST_F(LateLinesTest, MoveThePositionThatIsStillInTheirFile) {
     EXPECT_EQ(looks(3), "c\n");
 }
 
+TEST_F(LateLinesTest, AreNotReadAgainAfterARestart) {
+    appendLate("late\n");
+    EXPECT_EQ(look(), "late\n");
+    m_directory.append("app.log.1", "later\nunfinished");
+    rename("app.log.1", "app.log.old"); // times decide, and this file is the youngest
+    append("c\n");
+    restart();
+    EXPECT_EQ(looks(3), "c\nlater\n");
+    m_directory.append("app.log.old", " line\n");
+    EXPECT_EQ(look(), "unfinished line\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
+TEST_F(LateLinesTest, AreReadOnceAfterACrash) {
+    appendLate("late\n");
+    EXPECT_EQ(look(), "late\n");
+    const auto stored = m_follower->position();
+    appendLate("later\n");
+    append("c\n");
+    EXPECT_EQ(look(), "c\nlater\n");
+    begin(stored);
+    EXPECT_EQ(looks(3), "c\nlater\n");
+}
+
+TEST_F(LateLinesTest, AreReadOfAFileThatWasCompressedMeanwhile) {
+    appendLate("late\n");
+    EXPECT_EQ(look(), "late\n");
+    const auto stored = m_follower->position();
+    m_directory.write("app.log.1.gz", "GZold\na\nlate\nlater\nlast");
+    fs::remove(file("app.log.1"));
+    append("c\n");
+    begin(stored);
+    EXPECT_EQ(looks(3), "c\nlater\nlast\n");
+    EXPECT_TRUE(m_follower->position()->late.files().empty());
+    restart();
+    EXPECT_EQ(looks(3), "");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
+TEST_F(LateLinesTest, DamageOfAFileThatWasCompressedMeanwhileIsALoss) {
+    const auto stored = m_follower->position();
+    m_directory.write("app.log.1.gz", "GZold\na\nlate\n\x01");
+    fs::remove(file("app.log.1"));
+    begin(stored);
+    EXPECT_EQ(looks(3), "late\n");
+    ASSERT_EQ(m_ledger.lost().size(), 1U);
+    EXPECT_EQ(m_ledger.lost()[0].source, file("app.log.1.gz"));
+}
+
+TEST_F(LateLinesTest, AFileThatGetsItsNameBackWhileStoppedIsReadOn) {
+    appendLate("late\n");
+    EXPECT_EQ(look(), "late\n");
+    const auto stored = m_follower->position();
+    rename("app.log", "app.log.2");
+    rename("app.log.1", "app.log");
+    append("c\n");
+    begin(stored);
+    EXPECT_EQ(looks(3), "c\n");
+}
+
 TEST_F(LateLinesTest, AreTakenBack) {
     const auto position = m_follower->position();
     appendLate("late\n");
@@ -70,8 +130,11 @@ TEST_F(LateLinesTest, AreTakenBack) {
     EXPECT_STREQ(m_follower->next(), "late\n");
     EXPECT_TRUE(m_follower->isLate());
     EXPECT_EQ(m_follower->text(), "late");
+    EXPECT_NE(m_follower->position()->late, position->late);
     EXPECT_TRUE(m_follower->takeBack());
     EXPECT_EQ(m_follower->position()->offset, position->offset);
+    EXPECT_EQ(m_follower->position()->late.files().at(0).offset,
+              position->late.files().at(0).offset);
     EXPECT_STREQ(m_follower->next(), "late\n");
 }
 

@@ -25,6 +25,7 @@ FollowedWorld::FollowedWorld(Style style, unsigned mostLines, std::mt19937& rand
 
 FollowedWorld::~FollowedWorld() {
     close(m_descriptor);
+    endLateWriter();
 }
 
 std::string FollowedWorld::random(std::size_t most) {
@@ -67,22 +68,20 @@ void FollowedWorld::reopen() {
     if (m_files.count(m_target) == 0) {
         create();
     }
-    if (m_descriptor >= 0) {
-        close(m_descriptor);
-    }
+    leaveLateWriter();
     m_descriptor = open(m_target.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC);
     m_written = m_files[m_target];
     m_isReopenDue = false;
 }
 
-void FollowedWorld::append(const std::string& text) {
-    if (::write(m_descriptor, text.data(), text.size()) < 0) {
+void FollowedWorld::append(int descriptor, const std::string& text) {
+    if (::write(descriptor, text.data(), text.size()) < 0) {
         std::perror("write");
     }
     ++m_tick;
     const timespec time{1'700'000'000 + m_tick / 1000, m_tick % 1000 * 1'000'000};
     const timespec times[] = {time, time};
-    futimens(m_descriptor, times);
+    futimens(descriptor, times);
 }
 
 void FollowedWorld::write(int lines) {
@@ -142,6 +141,9 @@ void FollowedWorld::shift() {
                 if (found->second == m_written) {
                     reopen();
                 }
+                if (found->second == m_lateFile) {
+                    endLateWriter();
+                }
                 fs::remove(from);
             } else {
                 const std::string to = m_path + "." + std::to_string(number + 1) + suffix;
@@ -162,6 +164,8 @@ void FollowedWorld::rotateByName(bool creates) {
     if (m_files.count(m_target) == 0) {
         return;
     }
+    endLateWriter();
+    ++m_rotations;
     if (m_style == Style::SYMLINK) {
         create();
     } else {
@@ -182,6 +186,7 @@ void FollowedWorld::copyAndTruncate(bool losesLines) {
     if (m_style == Style::SYMLINK || m_files.count(m_path) == 0) {
         return;
     }
+    endLateWriter();
     shift();
     const std::string to = rotatedName();
     fs::copy_file(m_path, to);
@@ -218,6 +223,9 @@ void FollowedWorld::compress() {
         return;
     }
     const std::string& from = plain[m_random() % plain.size()];
+    if (m_files[from] == m_lateFile) {
+        endLateWriter();
+    }
     struct stat status;
     stat(from.c_str(), &status);
     const std::string name = fs::path(from).filename().string();
@@ -247,6 +255,9 @@ void FollowedWorld::removeGeneration() {
     }
     if (!others.empty()) {
         const std::string& path = others[m_random() % others.size()];
+        if (m_files[path] == m_lateFile) {
+            endLateWriter();
+        }
         fs::remove(path);
         m_files.erase(path);
         findMissing();
@@ -295,6 +306,7 @@ void FollowedWorld::findMissing() {
     for (std::size_t i = static_cast<std::size_t>(m_delivered + 1); i < m_entries.size(); ++i) {
         m_entries[i].mayMiss = m_entries[i].mayMiss || there.count(static_cast<int>(i)) == 0;
     }
+    findMissingLate();
 }
 
 void FollowedWorld::print() const {
@@ -307,47 +319,9 @@ void FollowedWorld::print() const {
         for (const int entry : file->entries) {
             std::fprintf(stderr, " %d", entry);
         }
-        std::fputc('\n', stderr);
-    }
-}
-
-void FollowedWorld::noteLook() {
-    m_isFollowed = true;
-    const auto found = m_files.find(m_target);
-    if (found != m_files.end()) {
-        m_held.insert(found->second);
-    }
-    if (m_style == Style::SYMLINK) {
-        findMissing();
-    }
-}
-
-void FollowedWorld::noteEnd(int last) {
-    m_held.clear();
-    m_isFollowed = false;
-    m_last = last;
-    findMissing();
-}
-
-void FollowedWorld::noteStart(bool hasPosition) {
-    findMissing();
-    // Only generations whose names begin with the log's are looked for by their times.
-    const bool isFound = std::any_of(m_files.begin(), m_files.end(), [this](const auto& file) {
-        return has(*file.second, m_last);
-    });
-    if (isFound) {
-        return;
-    }
-    if (m_isReopenDue) {
-        reopen();
-    }
-    std::set<int> there;
-    for (const auto& [path, file] : m_files) {
-        if ((hasPosition && m_style != Style::SYMLINK) || path == m_target) {
-            there.insert(file->entries.begin(), file->entries.end());
+        for (const int entry : file->lateEntries) {
+            std::fprintf(stderr, " L%d", entry);
         }
-    }
-    for (std::size_t i = static_cast<std::size_t>(m_delivered + 1); i < m_entries.size(); ++i) {
-        m_entries[i].mayMiss = m_entries[i].mayMiss || there.count(static_cast<int>(i)) == 0;
+        std::fputc('\n', stderr);
     }
 }

@@ -257,7 +257,9 @@ TEST_F(LogPositionsTest, AnotherLogContinuesInAFileThatHasItsNameNow) {
         log.left(left, true);
         EXPECT_FALSE(book->takenOver("/new"));
         EXPECT_EQ(log.stored(), at(20));
-        log.left(left, false);
+        LogPosition withOlder = left;
+        withOlder.late = LatePositions({at(5)}); // those files stay this log's
+        log.left(withOlder, false);
         EXPECT_EQ(book->takenOver("/new"), left);
         LogPosition blank;
         blank.modified = 77;

@@ -138,6 +138,31 @@ TEST_F(HistoryPositionsTest, TheNextRunBeginsAtThePositionBehindTheLastStoredEnt
     EXPECT_EQ(LogPositions("/quiet").stored(), at(5));
 }
 
+TEST_F(HistoryPositionsTest, TheOlderFilesOfALogAreStoredWithItsPosition) {
+    LogPosition older = at(7);
+    older.cursor.clear();
+    LogPosition oldest = older;
+    oldest.inode = 3;
+    oldest.guardLength = 0;
+    LogPosition position = at(20);
+    position.late = LatePositions({oldest, older});
+    open();
+    LogPositions("/log").reached(position);
+    close();
+    open();
+    EXPECT_EQ(LogPositions("/log").stored(), position);
+    close();
+    for (const char* const damage : {"[[1,2],[1,2,3,4,5,\"6\"],7]", "[[1,2,3", "{}"}) {
+        run("UPDATE log_positions SET late = '" + std::string(damage) + "'");
+        open();
+        const auto stored = LogPositions("/log").stored();
+        ASSERT_TRUE(stored);
+        EXPECT_EQ(stored->offset, 20);
+        EXPECT_THAT(stored->late.files(), IsEmpty()) << damage;
+        close();
+    }
+}
+
 TEST_F(HistoryPositionsTest, AnEntryIsStoredWithItsPositionOrNotAtAll) {
     // More events per entry than a transaction usually has, and than the queue holds.
     for (const int each : {1, 7, 300, 700}) {

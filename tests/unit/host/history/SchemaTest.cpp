@@ -122,7 +122,7 @@ TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     EXPECT_EQ(database.number("SELECT id FROM events"), 41);
-    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, 'c')");
+    database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, 'c', '')");
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
 }
 
@@ -156,6 +156,24 @@ TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
     ASSERT_TRUE(position.step());
     EXPECT_EQ(position.integer(0), 3);
     EXPECT_EQ(position.text(1), "") << "it is that of a file";
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheSeventhVersionUpToDate) {
+    database.run(firstVersion);
+    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
+                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
+                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
+                 " modified INTEGER NOT NULL DEFAULT 0, cursor TEXT NOT NULL DEFAULT '')"
+                 " WITHOUT ROWID;"
+                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, '');"
+                 "PRAGMA user_version = 7");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    Statement position(database, "SELECT offset, late FROM log_positions");
+    ASSERT_TRUE(position.step());
+    EXPECT_EQ(position.integer(0), 3);
+    EXPECT_EQ(position.text(1), "") << "no older file was watched";
 }
 
 TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {
