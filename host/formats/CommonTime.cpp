@@ -143,7 +143,8 @@ bool CommonTime::readMonthAndDay() noexcept {
            m_text.takeNumber(2, 2, m_parts.civil.day) && m_text.takeBlanks() && readTimeOfDay();
 }
 
-/// A time that begins with the name of a weekday or a month.
+/// A time that begins with the name of a weekday or a month, as "Nov 19 10:00:00 2026" and
+/// "nov/19/2026 10:00:00" do.
 bool CommonTime::readNamed() noexcept {
     if (m_text.takeWeekday()) {
         m_text.take(',');
@@ -156,8 +157,10 @@ bool CommonTime::readNamed() noexcept {
         return false;
     }
     m_text.take('.');
-    if (!m_text.takeBlanks() || !m_text.takeNumber(1, 2, m_parts.civil.day) ||
-        m_text.next() == ':' || !takeBreak()) {
+    const bool isNumeric = m_text.next() == '/';
+    if ((!m_text.take('/') && !m_text.takeBlanks()) ||
+        !m_text.takeNumber(1, 2, m_parts.civil.day) || m_text.next() == ':' ||
+        (isNumeric ? !m_text.take('/') : !takeBreak())) {
         return false;
     }
     unsigned year = 0;
@@ -197,7 +200,7 @@ bool CommonTime::readShortFirst() noexcept {
     }
     m_parts.civil.month = first;
     m_parts.civil.day = second;
-    return separator != ' ' && m_text.takeBlanks() && readTimeOfDay();
+    return separator != ' ' && takeBreak() && readTimeOfDay();
 }
 
 /// The rest of "19/Nov/2026:10:00:00", "19 Nov 2026 10:00:00", "19-Nov-26 10:00:00" or
@@ -278,7 +281,7 @@ bool CommonTime::takeFraction(std::string_view marks) noexcept {
 
 /// What stands between a date and a time of day.
 bool CommonTime::takeBreak() noexcept {
-    if (m_text.takeOneOf("Tt_:-")) {
+    if (m_text.takeOneOf("Tt_:-|")) {
         return true;
     }
     const bool hasComma = m_text.take(',');

@@ -51,7 +51,8 @@ constexpr std::string_view sourceNames[] = {"logger",        "logger_name",
                                             "target",        "category",
                                             "categoryName",  "subsystem",
                                             "channel",       "caller",
-                                            "source",        "source.function"};
+                                            "source",        "source.function",
+                                            "eventSource",   "protoPayload.serviceName"};
 constexpr std::string_view typeNames[] = {
     "level",     "severity",  "log.level",      "lvl",          "loglevel",
     "log_level", "levelname", "level_name",     "severityText", "severity_text",
@@ -79,7 +80,12 @@ constexpr std::string_view descriptionNames[] = {"msg",
                                                  "error.message",
                                                  "err.message",
                                                  "exception.message",
-                                                 "request"};
+                                                 "request",
+                                                 "textPayload",
+                                                 "jsonPayload.message",
+                                                 "protoPayload.methodName",
+                                                 "eventName",
+                                                 "requestURI"};
 
 constexpr std::span<const std::string_view> usualNames(EntryColumn column) {
     switch (column) {
