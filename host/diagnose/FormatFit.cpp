@@ -1,8 +1,10 @@
 #include "host/diagnose/FormatFit.h"
 
 #include "base/EntryFields.h"
+#include "host/diagnose/LineWords.h"
 #include "host/formats/EntryColumn.h"
 
+#include <algorithm>
 #include <memory>
 #include <string_view>
 #include <utility>
@@ -20,12 +22,25 @@ bool isFurther(std::string_view line) noexcept {
     return line.empty() || line.front() == ' ' || line.front() == '\t';
 }
 
+/// Whether a word may be the name of a host: a level or a word in brackets, for example, is none.
+bool isHost(std::string_view word) noexcept {
+    return !isLevelName(word) && !word.ends_with(':') &&
+           std::all_of(word.begin(), word.end(), [](char c) {
+               constexpr std::string_view others = ".-_:%";
+               return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') ||
+                      others.find(c) != std::string_view::npos ||
+                      static_cast<unsigned char>(c) > 0x7f;
+           });
+}
+
 class Fitting {
 public:
     Fitting(const FormatDescription& description, std::shared_ptr<const EntryFormat> format,
             std::shared_ptr<const LineJoin> join)
         : m_description(description), m_format(std::move(format)), m_join(std::move(join)),
-          m_reader(m_format->reader()) {}
+          m_reader(m_format->reader()) {
+        m_fit.namesProgram = description.defaults.contains("source");
+    }
 
     FormatFit run(const std::vector<std::string>& lines) {
         for (const std::string& line : lines) {
@@ -125,7 +140,8 @@ double FormatFit::score() const noexcept {
     constexpr double base = 0.3;
     constexpr double each = 0.2;
     constexpr double detail = 0.1;
-    return share() * (base +
+    constexpr double program = 0.1; ///< less than a source of its own
+    return share() * (base + (namesProgram ? program * partOf(entries - withSource, entries) : 0) +
                       each * (partOf(withTime, entries) + partOf(withType, entries) +
                               partOf(withSource, entries)) +
                       detail * partOf(withDetail, entries));
@@ -135,11 +151,8 @@ bool FormatFit::fits(const FormatDescription& format, const EntryColumns& column
     if (format.type != "syslog") {
         return true;
     }
-    // A word in brackets behind a time is a level, for example.
-    constexpr std::string_view notHosts = "[(<{\"'|";
-    const bool isHost =
-        columns.system.empty() || notHosts.find(columns.system.front()) == std::string_view::npos;
-    return isHost && (columns.hasTime || !columns.system.empty());
+    return isHost(columns.system) && columns.source.find(' ') == std::string_view::npos &&
+           (columns.hasTime || !columns.system.empty());
 }
 
 Result<FormatFit> FormatFit::of(const FormatDescription& format,

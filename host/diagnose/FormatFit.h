@@ -20,6 +20,7 @@ struct FormatFit {
     std::size_t withType = 0;   ///< the log's own, not a default
     std::size_t withSource = 0; ///< the same
     std::size_t withDetail = 0; ///< anything but a time and a description
+    bool namesProgram = false;  ///< entries without a source get the name of the program
 
     /// 0 to 1.
     double share() const noexcept;

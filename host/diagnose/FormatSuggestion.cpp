@@ -84,13 +84,13 @@ public:
         }
         const auto fit = FormatFit::of(ready.format, m_lines);
         if (fit && fit->fitting > 0) {
-            add({{ready.name}, ready.about, *fit, ""}, ready.isGeneric);
+            add({{ready.name}, ready.about, *fit, "", ready.isGeneric});
         }
     }
 
     std::vector<Choice> take() {
         if (m_syslog) {
-            add(std::move(*m_syslog), false);
+            add(std::move(*m_syslog));
         }
         std::stable_sort(m_found.begin(), m_found.end(), [](const auto& one, const auto& other) {
             return one.first > other.first;
@@ -112,14 +112,14 @@ public:
             return std::nullopt;
         }
         return Choice{
-            {}, "made from the shape of the lines", *fit, TomlText::logTable(m_log, *format)};
+            {}, "made from the shape of the lines", *fit, TomlText::logTable(m_log, *format), true};
     }
 
 private:
     /// Of several formats that read the same, the one that is made for a program is better.
-    void add(Choice choice, bool isGeneric) {
+    void add(Choice choice) {
         constexpr double generic = 0.01;
-        const double score = choice.fit.score() - (isGeneric ? generic : 0);
+        const double score = choice.fit.score() - (choice.isGeneric ? generic : 0);
         m_found.emplace_back(score, std::move(choice));
     }
 
@@ -131,7 +131,7 @@ private:
             plain.type = "syslog";
             const auto fit = FormatFit::of(plain, m_lines);
             if (fit && fit->fitting > 0) {
-                m_syslog = Choice{{}, "lines of a system logger", *fit, ""};
+                m_syslog = Choice{{}, "lines of a system logger", *fit, "", true};
             }
         }
         if (m_syslog && !ready.format.extracts.empty() && extracts(ready.format, m_lines)) {
@@ -167,10 +167,11 @@ FormatSuggestion FormatSuggestion::of(const ReadyFormats& formats, std::vector<s
         }
     }
     suggestion.m_ready = search.take();
-    const double best = suggestion.m_ready.empty() ? 0 : suggestion.m_ready.front().fit.share();
-    if (best < leastShare) {
-        suggestion.m_proposal = search.propose();
-        if (suggestion.m_proposal && suggestion.m_proposal->fit.share() <= best) {
+    suggestion.m_proposal = search.propose();
+    if (suggestion.m_proposal && !suggestion.m_ready.empty()) {
+        const Choice& best = suggestion.m_ready.front();
+        const double least = best.fit.score() + (best.isGeneric ? leastGain : leastGainOverOwn);
+        if (suggestion.m_proposal->fit.score() < least) {
             suggestion.m_proposal.reset();
         }
     }

@@ -22,12 +22,17 @@ public:
     static constexpr std::size_t mostChoices = 3;
     /// A ready format that reads a smaller share is not suggested alone.
     static constexpr double leastShare = 0.6;
+    /// By how much the score of a format that is made for the lines must exceed that of the best
+    /// ready one: more if that is of one program, which knows its lines better.
+    static constexpr double leastGain = 0.05;
+    static constexpr double leastGainOverOwn = 0.15;
 
     struct Choice {
         std::vector<std::string> names; ///< several of type "syslog"; empty: a proposal
         std::string about;
         FormatFit fit;
-        std::string table; ///< the [[log]] table to write
+        std::string table;      ///< the [[log]] table to write
+        bool isGeneric = false; ///< of many programs
     };
 
     /// `log` is the path for the table.
@@ -37,7 +42,7 @@ public:
     std::size_t lines() const noexcept { return m_lines; }
     /// The best first; those that fit no line are left out.
     const std::vector<Choice>& ready() const noexcept { return m_ready; }
-    /// A format made for the lines, if no ready one reads enough of them and it reads more.
+    /// A format made for the lines, if it finds more in them than the best of the ready ones.
     const std::optional<Choice>& proposal() const noexcept { return m_proposal; }
     /// As the JSON object that the API answers.
     std::string json() const;

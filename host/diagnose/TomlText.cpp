@@ -62,7 +62,22 @@ std::string TomlText::logTable(std::string_view log, const std::vector<std::stri
 }
 
 std::string TomlText::logTable(std::string_view log, const FormatDescription& format) {
-    return beginning(log) + "type = 'regex'\nformat = " + listed(format.patterns, ",\n    ") + '\n';
+    std::string table =
+        beginning(log) + "type = 'regex'\nformat = " + listed(format.patterns, ",\n    ") + '\n';
+    if (!format.timeFormat.empty()) {
+        table += "time_format = " + quoted(format.timeFormat) + '\n';
+    }
+    for (const auto& [column, texts] : format.values) {
+        std::string pairs;
+        for (const auto& [from, to] : texts) {
+            pairs += (pairs.empty() ? " " : ", ") + quoted(from) + " = " + quoted(to);
+        }
+        table += "values." + column + " = {" + pairs + " }\n";
+    }
+    if (!format.lines.starts.empty()) {
+        table += "entry = { starts = " + quoted(format.lines.starts) + " }\n";
+    }
+    return table + (format.pairs ? "pairs = true\n" : "");
 }
 
 } // namespace zrm::host

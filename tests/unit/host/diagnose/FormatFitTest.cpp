@@ -77,6 +77,28 @@ TEST(FormatFit, ALineOfASystemLoggerHasATimeOrAHost) {
               1U);
 }
 
+TEST(FormatFit, ALevelIsNoHost) {
+    FormatDescription format;
+    format.type = "syslog";
+    EXPECT_EQ(
+        fitOf(format, {"2026-11-19T10:00:00Z INFO shop: text",
+                       "Nov 19 10:00:00 Installed: shop-1.0", "2026-11-19T10:00:00Z E! [shop] text",
+                       "2026-11-19T10:00:00Z fe80::1%eth0 shop: text"})
+            .fitting,
+        1U);
+}
+
+TEST(FormatFit, TheNameOfTheProgramIsWorthLessThanASourceOfItsOwn) {
+    const std::vector<std::string> lines = {"time=2026-11-19T10:00:00Z level=info msg=a"};
+    FormatDescription named = logfmt();
+    named.defaults["source"] = "shop";
+    const double plain = fitOf(logfmt(), lines).score();
+    const double own =
+        fitOf(logfmt(), {"time=2026-11-19T10:00:00Z level=info logger=shop msg=a"}).score();
+    EXPECT_GT(fitOf(named, lines).score(), plain);
+    EXPECT_LT(fitOf(named, lines).score(), own);
+}
+
 TEST(FormatFit, SaysWhyAFormatCannotBeMade) {
     FormatDescription format = logfmt();
     format.timeFormat = "never";

@@ -1,5 +1,6 @@
 #include "host/diagnose/FormatProposal.h"
 
+#include "base/EntryFields.h"
 #include "host/diagnose/FormatFit.h"
 
 #include <gtest/gtest.h>
@@ -70,7 +71,98 @@ TEST(FormatProposal, SeveralShapesGiveSeveralPatterns) {
         lines.push_back("2026-11-19 10:00:0" + std::to_string(i) + " [main] [WARN] slow");
     }
     EXPECT_DOUBLE_EQ(Proposed(lines).share, 1);
-    EXPECT_EQ(proposeFormat(lines)->patterns.size(), 2U);
+    // The two, and one for lines that end behind the time.
+    EXPECT_EQ(proposeFormat(lines)->patterns.size(), 3U);
+}
+
+/// Of one line, as text: level, source and message.
+std::string columnsOf(const std::vector<std::string>& lines) {
+    const Proposed one(lines);
+    return std::string(one.columns.type) + '|' + std::string(one.columns.source) + '|' +
+           std::string(one.columns.description);
+}
+
+TEST(FormatProposal, FindsTheLevelInBracketsBehindTheSource) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 com.example.Cart [WARN] no room"}),
+              "WARN|com.example.Cart|no room");
+    EXPECT_EQ(columnsOf({"Nov 19 10:00:00 phone board(Front)[60] <Notice>: brightness changed"}),
+              "Notice|board(Front)[60]|brightness changed");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 +0100 Puppet (notice): applied"}),
+              "notice|Puppet|applied");
+    EXPECT_EQ(columnsOf({"[2026-11-19 10:00:00 +0100] critical/Listener: no port"}),
+              "critical|Listener|no port");
+    EXPECT_EQ(columnsOf({"[2026-11-19T10:00:00.123+01:00] request.INFO: matched"}),
+              "INFO|request|matched");
+}
+
+TEST(FormatProposal, FindsColumnsBetweenTabsBarsAndSemicolons) {
+    EXPECT_EQ(columnsOf({"2026-11-19T10:00:00.123Z\tINFO\tmain\tio.shop.Cart\tno room"}),
+              "INFO|io.shop.Cart|no room");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 | INFO | shop.cart:reserve:77 - no room"}),
+              "INFO|shop.cart:reserve:77|no room");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00;WARN;4711;shop.cart;no room"}),
+              "WARN|shop.cart|no room");
+}
+
+TEST(FormatProposal, FindsSecondsSince1970InTheMiddleOfALine) {
+    const Proposed one({"[INFO] [1795078801.5] [nav.planner]: started"});
+    EXPECT_TRUE(one.columns.hasTime);
+    EXPECT_EQ(one.columns.time.second, 1U);
+    EXPECT_EQ(one.columns.source, "nav.planner");
+    EXPECT_EQ(one.columns.description, "started");
+    const Proposed event({"4711 node-246 unix.hw state 1795078800 1 WARN fan is slow"});
+    EXPECT_TRUE(event.columns.hasTime);
+    EXPECT_EQ(event.columns.type, "WARN");
+    EXPECT_EQ(event.columns.description, "fan is slow");
+}
+
+TEST(FormatProposal, PairsAndQuotedTextsInFrontOfTheLevelAreFields) {
+    const std::string line = R"(2026-11-19T10:00:00Z pid=17 "shop cart" WARN: no room order=4711)";
+    const auto description = proposeFormat({line});
+    ASSERT_TRUE(description);
+    EXPECT_TRUE(description->pairs);
+    const auto format = makeFormat(*description).value();
+    const auto reader = format->reader();
+    EntryColumns columns;
+    ASSERT_TRUE(reader->read(line, columns));
+    EXPECT_EQ(columns.description, "no room order=4711");
+    EntryFields fields;
+    reader->readFields(line, fields);
+    ASSERT_NE(fields.find("pid"), nullptr);
+    EXPECT_EQ(*fields.find("pid"), "17");
+    ASSERT_NE(fields.find("part1"), nullptr);
+    EXPECT_EQ(*fields.find("part1"), "shop cart");
+    ASSERT_NE(fields.find("order"), nullptr);
+    EXPECT_EQ(*fields.find("order"), "4711");
+}
+
+TEST(FormatProposal, WritesOutLevelsOfOneLetter) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00.123456 W | op-osd: slow"}), "WARNING|op-osd|slow");
+    EXPECT_EQ(columnsOf({"I1119 10:00:00.123456    1234 server.go:415] ready"}),
+              "INFO|server.go:415|ready");
+}
+
+TEST(FormatProposal, WordsOfMessagesAreNoColumns) {
+    const std::vector<std::string> lines = {
+        "[2026-11-19 10:00:00] INFO starting", "[2026-11-19 10:00:01] INFO Config: 2 files",
+        "[2026-11-19 10:00:02] INFO queue is empty", "[2026-11-19 10:00:03] INFO -- end"};
+    EXPECT_EQ(columnsOf(lines), "INFO||-- end");
+    EXPECT_EQ(columnsOf({lines[0], lines[2], lines[3], lines[1]}), "INFO||Config: 2 files");
+    // A thread does not speak, and a number is none.
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 [worker-3] INFO [4711] text"}), "INFO||text");
+}
+
+TEST(FormatProposal, LinesWithoutTheTimeContinueAnEntry) {
+    const std::vector<std::string> lines = {"2026-11-19 10:00:00 | ERROR | shop.Cart - failed",
+                                            "java.lang.IllegalStateException: no cart",
+                                            "\tat shop.Cart.find(Cart.java:42)",
+                                            "2026-11-19 10:00:01 | INFO | shop.Cart - stopped"};
+    const Proposed one(lines);
+    EXPECT_DOUBLE_EQ(one.share, 1);
+    const auto join = makeLineJoin(*proposeFormat(lines)).value();
+    ASSERT_NE(join, nullptr);
+    EXPECT_TRUE(join->joins(lines[1], lines[2]));
+    EXPECT_FALSE(join->joins(lines[2], lines[3]));
 }
 
 TEST(FormatProposal, LinesWithoutTimeAndLevelGiveNone) {
@@ -104,6 +196,12 @@ TEST(FormatProposal, EveryProposalIsAFormat) {
                                             "\xff",
                                             "=",
                                             "\"",
+                                            ";",
+                                            "W",
+                                            "WARN",
+                                            "key=",
+                                            "name:",
+                                            "1795078800",
                                             std::string(1, '\0')};
     for (int round = 0; round < 2000; ++round) {
         std::string line;

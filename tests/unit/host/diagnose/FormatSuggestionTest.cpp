@@ -82,6 +82,33 @@ TEST(FormatSuggestion, AFormatIsMadeWhereNoReadyOneFits) {
     EXPECT_THAT(suggest({"Lorem ipsum"}).proposal(), testing::Eq(std::nullopt));
 }
 
+TEST(FormatSuggestion, AFormatIsMadeWhereItFindsMoreThanAGenericOne) {
+    // A generic one reads the lines and finds no source.
+    const FormatSuggestion made =
+        suggest({"2026-11-19 10:00:00,123 INFO [main] org.shop.Flow Launching",
+                 "2026-11-19 10:00:01,123 WARN [Timer-3] org.shop.Task Yielding"});
+    ASSERT_TRUE(made.proposal());
+    EXPECT_EQ(made.proposal()->fit.withSource, 2U);
+    ASSERT_FALSE(made.ready().empty());
+    EXPECT_LT(made.ready().front().fit.withSource, 2U);
+    // One of the program that wrote the lines knows better what a connection is.
+    const FormatSuggestion own = suggest(
+        {"2026-11-19 10:00:00.123 CET [1234] LOG C-0x55d5c8: shop/anna@10.0.0.1:51234 login",
+         "2026-11-19 10:00:02.123 CET [1234] ERROR S-0x55d5c9: shop/anna@10.0.0.1:51234 gone"});
+    EXPECT_FALSE(own.proposal());
+    ASSERT_FALSE(own.ready().empty());
+    EXPECT_THAT(own.ready().front().names, ElementsAre("pgbouncer"));
+}
+
+TEST(FormatSuggestion, TheTableOfAProposalHasAllThatItNeeds) {
+    const FormatSuggestion made = suggest({"2026-11-19 10:00:00.123456 W | op-osd: slow a=1",
+                                           "  further", "2026-11-19 10:00:01.5 E | op-osd: b=2"});
+    ASSERT_TRUE(made.proposal());
+    EXPECT_THAT(made.proposal()->table, HasSubstr("'W' = 'WARNING'"));
+    EXPECT_THAT(made.proposal()->table, HasSubstr("\nentry = { starts = '^"));
+    EXPECT_THAT(made.proposal()->table, HasSubstr("\npairs = true\n"));
+}
+
 TEST(FormatSuggestion, LooksAtABoundedPartOfWhatItIsGiven) {
     const FormatSuggestion suggestion =
         suggest(std::vector<std::string>(3000, "level=info " + std::string(50, 'x')));
