@@ -163,7 +163,7 @@ def test_what_a_command_has_forked_ends_with_it_and_what_left_it_is_not_waited_f
 def test_lines_of_a_command_are_joined_to_entries(runner):
     trace = "java.lang.IllegalStateException: broken\n\tat a.b\n\tat c.d"
     agent = runner(
-        ["sh", "-c", f"printf '%s\n' \"$1\" next; sleep 0.1; printf ' last\n'; exec sleep 1000", "sh", trace],
+        ["sh", "-c", "printf '%s\n' \"$1\" next; sleep 0.1; printf ' last\n'; exec sleep 1000", "sh", trace],
         entry={"indented": True, "wait": "1s"},
     )
     events = agent.wait_events(2)

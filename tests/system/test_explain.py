@@ -321,3 +321,19 @@ def test_without_a_history_there_is_no_event_to_explain(agent):
     answer = Analysis(agent).post("explain", {"event": 1, "situation": "all"}, 409)
     assert (answer["field"], answer["detail"]) == ("event", "the history is off")
     assert agent.stop() == 0
+
+
+def test_the_last_entries_of_an_earlier_time(started):
+    now = int(time.time())
+    texts = ["a", "b", "c", "d"]
+    started.watched.append("".join(syslog_line(text, when=time.localtime(now - 40 + 10 * number))
+                                   for number, text in enumerate(texts)))
+    definition = {"log": str(started.watched.path), "when": []}
+    until = time.strftime("%Y-%m-%dT%H:%M:%S", time.localtime(now - 15))
+    explained = started.analysis.explain(definition=definition, last=2, to=until)
+    assert [one["row"]["ENTRYDESC"] for one in explained] == ["b", "c"]
+    assert started.analysis.explain(definition=definition, last=2, to="2020-01-01") == []
+    answer = started.analysis.post("explain", {"definition": definition, "last": 2, "to": "soon"}, 400)
+    assert answer["field"] == "to"
+    answer = started.analysis.post("explain", {"definition": definition, "line": "x", "to": until}, 400)
+    assert answer["field"] == "to"

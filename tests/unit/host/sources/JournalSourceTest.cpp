@@ -1,11 +1,16 @@
 #include "host/sources/JournalSource.h"
 
 #include "TestJournal.h"
+#include "base/EntryFields.h"
+#include "framework/LogEntry.h"
+#include "host/formats/FormatDescription.h"
 
 #include <gtest/gtest.h>
 
 #include <memory>
 #include <string>
+#include <string_view>
+#include <vector>
 
 using namespace zrm;
 using namespace zrm::host;
@@ -79,9 +84,55 @@ TEST_F(JournalSourceTest, PassesOverAnyNumberOfUnwantedEntries) {
     EXPECT_EQ(messagesAfterTurn(unwanted + 1, 9), "first last ");
 }
 
+TEST_F(JournalSourceTest, HostileMessagesStayAsTheyAre) {
+    std::string deep;
+    for (int level = 0; level < 10'000; ++level) {
+        deep += R"({"a":)";
+    }
+    const std::vector<std::string> messages = {
+        "\xFF\xFE{}",
+        std::string("{\"msg\":\"a\0b\"}", 13),
+        deep,
+        std::string(EntryKeep::longestText + 100, '['),
+        R"({"msg":"\ud800"})",
+        R"({"msg":"cut)",
+        "",
+        "\n{\n",
+    };
+    for (const std::string& message : messages) {
+        journal.add(message, {{"SYSLOG_IDENTIFIER", "app"}});
+    }
+    journal.add(R"({"msg":"good"})");
+    journal.write();
+    FormatDescription description;
+    description.type = "json";
+    const JournalSource source(config, {*MessageFormat::make(description)});
+    const std::unique_ptr<EntrySource::Past> past = source.past();
+    ASSERT_TRUE(past->begin(TestJournal::firstTime + 3'600'000'000));
+    EntryColumns good;
+    ASSERT_NE(past->previous(), nullptr);
+    ASSERT_TRUE(past->read(good));
+    EXPECT_EQ(good.description, "good");
+    for (std::size_t index = messages.size(); index-- > 0;) {
+        ASSERT_NE(past->previous(), nullptr);
+        EntryColumns columns;
+        ASSERT_TRUE(past->read(columns));
+        EXPECT_EQ(columns.description, messages[index].substr(0, EntryKeep::longestText)) << index;
+        EXPECT_EQ(columns.source, "app") << index;
+        EntryFields fields;
+        past->readFields(fields);
+        const std::string_view* const identifier = fields.find("SYSLOG_IDENTIFIER");
+        ASSERT_NE(identifier, nullptr);
+        EXPECT_EQ(*identifier, "app");
+    }
+}
+
 TEST_F(JournalSourceTest, HasADefinitionForEachConfiguration) {
     const std::string one = JournalSource(config).definition();
     EXPECT_EQ(JournalSource(config).definition(), one);
+    FormatDescription description;
+    description.type = "journal";
+    EXPECT_NE(JournalSource(config, {*MessageFormat::make(description)}).definition(), one);
     config.priority = 3;
     EXPECT_NE(JournalSource(config).definition(), one);
 }

@@ -9,6 +9,7 @@
 #include <chrono>
 #include <cstring>
 #include <optional>
+#include <random>
 #include <string>
 #include <string_view>
 #include <thread>
@@ -114,6 +115,45 @@ TEST_F(StreamEntriesTest, ALineThatIsTooLongIsAnEntryOfItsOwn) {
     const std::string text(EntryKeep::longestText + 5, 'x');
     const std::string kept = "(cut) " + text.substr(0, EntryKeep::longestText);
     EXPECT_THAT(after("a\n" + text + "\n b\nend\n"), ElementsAre("a", kept, " b", "end"));
+}
+
+TEST_F(StreamEntriesTest, AreThoseOfAPlainModelHoweverTheStreamIsCut) {
+    std::mt19937 random{20261122};
+    for (int round = 0; round < 200; ++round) {
+        limits.lines = 2 + random() % 4;
+        limits.bytes = 10 + random() % 60;
+        join();
+        std::string stream;
+        std::vector<std::string> expected;
+        std::string last = "end";
+        std::size_t lines = 0;
+        for (int line = 0; line < 100; ++line) {
+            std::string text(random() % 30, 'x');
+            text = random() % 6 == 0 ? "end" : random() % 3 > 0 ? ' ' + text : text;
+            stream += text + '\n';
+            const bool isJoined = lines > 0 && last != "end" && text.starts_with(' ') &&
+                                  lines < limits.lines &&
+                                  expected.back().size() + text.size() + 2 <= limits.bytes;
+            if (isJoined) {
+                expected.back() += '\n' + text;
+            } else {
+                expected.push_back(text);
+            }
+            lines = isJoined ? lines + 1 : 1;
+            last = text;
+        }
+        std::vector<std::string> read;
+        while (!stream.empty()) {
+            const std::string part = stream.substr(0, 1 + random() % 50);
+            stream.erase(0, part.size());
+            const std::vector<std::string> some = after(part);
+            read.insert(read.end(), some.begin(), some.end());
+        }
+        entries->end();
+        const std::vector<std::string> some = given();
+        read.insert(read.end(), some.begin(), some.end());
+        ASSERT_EQ(read, expected) << "round " << round;
+    }
 }
 
 TEST_F(StreamEntriesTest, TheLastLinesWaitNoLongerThanTheirTime) {
