@@ -1,14 +1,34 @@
 #include "base/EntryFields.h"
 
 #include <algorithm>
+#include <bitset>
+#include <cstdint>
 #include <new>
 #include <utility>
 
 namespace zrm {
 
+namespace {
+
+/// A number that stands for names of this length, beginning and end.
+std::uint8_t markOf(std::string_view name) noexcept {
+    return static_cast<std::uint8_t>(name.size() * 41 +
+                                     static_cast<unsigned char>(name.front()) * 7 +
+                                     static_cast<unsigned char>(name.back()));
+}
+
+const EntryFields::Field* search(std::span<const EntryFields::Field> fields,
+                                 std::string_view name) noexcept {
+    const auto found = std::find_if(fields.begin(), fields.end(),
+                                    [name](const auto& field) { return field.name == name; });
+    return found == fields.end() ? nullptr : &*found;
+}
+
+} // namespace
+
 void EntryFields::clear() noexcept {
     m_fields.clear();
-    m_marks.reset();
+    m_mayRepeat = false;
     m_used = m_textBegin = 0;
     m_hasRoom = true;
     m_leftOut = 0;
@@ -25,34 +45,36 @@ bool EntryFields::reserve() noexcept {
 }
 
 void EntryFields::add(std::string_view name, std::string_view value) noexcept {
-    if (hasPlaces()) {
-        place({name, value});
-    } else {
+    if (name.empty() || name.size() > longestName) {
         noteLeftOut();
+        return;
     }
+    const Field field{name, value};
+    add(std::span(&field, 1));
 }
 
 void EntryFields::add(std::span<const Field> fields) noexcept {
-    if (!hasPlaces()) {
-        m_leftOut += fields.size();
-        return;
-    }
-    for (const Field& field : fields) {
-        place(field);
-    }
+    const std::size_t room = hasPlaces() ? most - m_fields.size() : 0;
+    const auto taken = fields.first(std::min(fields.size(), room));
+    m_fields.insert(m_fields.end(), taken.begin(), taken.end());
+    m_mayRepeat = true;
+    m_leftOut += fields.size() - taken.size();
 }
 
-/// There is memory for it.
-inline void EntryFields::place(const Field& field) noexcept {
-    if (field.name.empty() || field.name.size() > longestName || m_fields.size() == most) {
-        noteLeftOut();
-        return;
+std::span<const EntryFields::Field> EntryFields::all() const noexcept {
+    if (std::exchange(m_mayRepeat, false)) {
+        std::bitset<256> marks; // of a name without one it is known that it has not been
+        std::size_t count = 0;
+        for (const Field& field : m_fields) {
+            const std::uint8_t mark = markOf(field.name);
+            if (!marks[mark] || search({m_fields.data(), count}, field.name) == nullptr) {
+                marks.set(mark);
+                m_fields[count++] = field;
+            }
+        }
+        m_fields.resize(count);
     }
-    const std::size_t mark = markOf(field.name);
-    if (!m_marks[mark] || search(field.name) == nullptr) {
-        m_marks.set(mark);
-        m_fields.push_back(field);
-    }
+    return m_fields;
 }
 
 EntryFields& EntryFields::append(std::string_view part) noexcept {
@@ -77,21 +99,9 @@ std::optional<std::string_view> EntryFields::takeText() noexcept {
     return text;
 }
 
-std::size_t EntryFields::markOf(std::string_view name) noexcept {
-    const auto byte = [name](std::size_t at) {
-        return std::size_t{static_cast<unsigned char>(name[at])};
-    };
-    return (name.size() * 41 + byte(0) * 7 + byte(name.size() - 1)) % 256;
-}
-
 const std::string_view* EntryFields::find(std::string_view name) const noexcept {
-    return name.empty() || !m_marks[markOf(name)] ? nullptr : search(name);
-}
-
-const std::string_view* EntryFields::search(std::string_view name) const noexcept {
-    const auto found = std::find_if(m_fields.begin(), m_fields.end(),
-                                    [name](const Field& field) { return field.name == name; });
-    return found == m_fields.end() ? nullptr : &found->value;
+    const Field* const field = search(m_fields, name);
+    return field == nullptr ? nullptr : &field->value;
 }
 
 } // namespace zrm

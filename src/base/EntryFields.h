@@ -1,7 +1,6 @@
 #ifndef ZRM_ENTRY_FIELDS_H
 #define ZRM_ENTRY_FIELDS_H
 
-#include <bitset>
 #include <cstddef>
 #include <memory>
 #include <optional>
@@ -30,9 +29,10 @@ public:
     void clear() noexcept;
 
     /// Adds a field. Both texts must stay valid until clear(). Of several fields of one name the
-    /// first counts. A field without a name, with too long a name, or beyond the most is left out.
+    /// first counts. A field without a name, with too long a name, or beyond the most, to which all
+    /// that were added count, is left out.
     void add(std::string_view name, std::string_view value) noexcept;
-    /// The same for each of these, in one step.
+    /// The same for each of these, whose names are neither empty nor too long.
     void add(std::span<const Field> fields) noexcept;
 
     /// Appends to a text that is built in the object's memory.
@@ -44,7 +44,7 @@ public:
     const std::string_view* find(std::string_view name) const noexcept;
 
     /// All fields in the order of the entry.
-    std::span<const Field> all() const noexcept { return m_fields; }
+    std::span<const Field> all() const noexcept;
 
     /// How many fields were left out because there was no room for them.
     std::size_t leftOut() const noexcept { return m_leftOut; }
@@ -55,17 +55,15 @@ private:
     /// False if there is no memory for the fields.
     bool hasPlaces() noexcept { return m_fields.capacity() >= most || reserve(); }
     bool reserve() noexcept;
-    void place(const Field& field) noexcept;
-    const std::string_view* search(std::string_view name) const noexcept;
-    /// The bit that stands for names of this length, beginning and end.
-    static std::size_t markOf(std::string_view name) noexcept;
 
-    std::vector<Field> m_fields;
-    std::bitset<256> m_marks; ///< those of the fields: most other names are known to be absent
-    std::unique_ptr<char[]> m_texts; ///< `room` bytes, once a text was built
-    std::size_t m_used = 0;          ///< bytes, also of the text that is being built
-    std::size_t m_textBegin = 0;     ///< of the text that is being built
-    bool m_hasRoom = true;           ///< for the text that is being built
+    // Fields whose name has been are looked for only when all fields are asked for, as for few
+    // entries.
+    mutable std::vector<Field> m_fields;
+    mutable bool m_mayRepeat = false; ///< of several fields of one name all may be here
+    std::unique_ptr<char[]> m_texts;  ///< `room` bytes, once a text was built
+    std::size_t m_used = 0;           ///< bytes, also of the text that is being built
+    std::size_t m_textBegin = 0;      ///< of the text that is being built
+    bool m_hasRoom = true;            ///< for the text that is being built
     std::size_t m_leftOut = 0;
 };
 

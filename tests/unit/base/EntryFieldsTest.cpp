@@ -53,9 +53,8 @@ TEST(EntryFields, LeavesOutWhatIsBeyondItsBounds) {
 
 TEST(EntryFields, AddsManyAsOneByOne) {
     const std::string longest(EntryFields::longestName, 'n');
-    const std::string tooLong = longest + "n";
-    std::vector<EntryFields::Field> many = {{"first", "1"}, {"", "no name"}, {"second", "2"},
-                                            {"first", "3"}, {longest, "4"},  {tooLong, "5"}};
+    std::vector<EntryFields::Field> many = {
+        {"first", "1"}, {"second", "2"}, {"first", "3"}, {longest, "4"}};
     std::vector<std::string> names;
     for (int number = 0; number < 300; ++number) {
         names.push_back("f" + std::to_string(number));
@@ -80,9 +79,24 @@ TEST(EntryFields, AddsManyAsOneByOne) {
     EXPECT_EQ(*together.find("first"), "1");
     EXPECT_EQ(*together.find("second"), "before");
     EXPECT_EQ(*together.find(longest), "4");
-    EXPECT_NE(together.find("f252"), nullptr);
-    EXPECT_EQ(together.find("f253"), nullptr);
-    EXPECT_EQ(together.leftOut(), 2u + 47u);
+    EXPECT_NE(together.find("f250"), nullptr);
+    EXPECT_EQ(together.find("f251"), nullptr) << "repeated ones count among the most";
+    EXPECT_EQ(together.leftOut(), 49u);
+    EXPECT_EQ(together.all().size(), EntryFields::most - 2);
+}
+
+TEST(EntryFields, KeepsTheFirstOfARepeatedNameWhateverIsAskedFirst) {
+    EntryFields fields;
+    const std::vector<EntryFields::Field> pairs = {{"ab", "1"}, {"cb", "2"}, {"ab", "3"}};
+    fields.add(pairs);
+    EXPECT_EQ(*fields.find("ab"), "1");
+    ASSERT_EQ(fields.all().size(), 2u);
+    fields.add("cb", "4");
+    fields.add("d", "5");
+    EXPECT_EQ(*fields.find("cb"), "2");
+    ASSERT_EQ(fields.all().size(), 3u);
+    EXPECT_EQ(fields.all()[1].value, "2");
+    EXPECT_EQ(fields.all()[2].name, "d");
 }
 
 TEST(EntryFields, BuildsTextsInItsOwnMemory) {
