@@ -316,6 +316,10 @@ bool CommonTime::readTimeOfDay() noexcept {
 
 /// Whether what is behind the time of day is the rest of the time, up to the end.
 bool CommonTime::readTail() noexcept {
+    if (m_text.rest() == "Z" && !m_hasZone) { // as most times end
+        m_parts.offset = 0;
+        return true;
+    }
     for (;;) {
         const bool hasBlanks = m_text.takeBlanks();
         if (m_text.atEnd()) {
