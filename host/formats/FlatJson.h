@@ -3,6 +3,7 @@
 
 #include "base/EntryFields.h"
 #include "host/formats/JsonNames.h"
+#include "host/formats/JsonScan.h"
 
 #include <cstddef>
 #include <memory>
@@ -25,11 +26,10 @@ public:
     explicit FlatJson(const JsonNames& names);
     FlatJson(const FlatJson&) = delete;
     FlatJson& operator=(const FlatJson&) = delete;
-    ~FlatJson();
 
     /// Reads an object. False if the text is anything but one complete JSON object: reason() says
     /// why.
-    bool read(std::string_view text);
+    bool read(std::string_view text) noexcept;
     /// A clause. Valid until the next read.
     std::string_view reason() const noexcept { return {m_reason, m_reasonLength}; }
     /// What the object has for the columns. Views into memory of this object, until the next read.
@@ -41,36 +41,28 @@ public:
     void addTo(EntryFields& fields) const noexcept;
 
 private:
-    // With the parser's types, whose layout depends on the options of the compiler.
-    struct Parser;
     class Walk;
     class Below;
 
-    bool copy(std::string_view text) noexcept;
-    void keep(std::string_view name, std::string_view value, bool isNumber = false) noexcept;
-    bool hasEscapes(std::string_view text) const noexcept {
-        return m_hasEscapes && text.find('\\') != text.npos;
-    }
+    void keep(std::string_view name, std::string_view value, bool isNumber) noexcept;
+    void keepSpecial(bool isNumber) noexcept;
     /// The name with those of what it is in. Without data if that is too long.
     std::string_view fullName(std::string_view name) noexcept {
         return m_pathLength == 0 ? name : nestedName(name);
     }
     std::string_view nestedName(std::string_view name) noexcept;
     std::string_view built(std::string_view name) noexcept;
-    bool refuse(std::string_view reason, const char* place = nullptr) noexcept;
+    bool refuse(std::string_view reason) noexcept;
+    bool refuse(std::string_view reason, std::size_t place) noexcept;
 
     const JsonNames& m_names;
-    const std::unique_ptr<Parser> m_parser;
+    JsonScan m_scan;
     JsonColumns m_columns;
-    std::unique_ptr<char[]> m_text; ///< `m_room` bytes, and those that the parser needs behind them
-    std::size_t m_room = 0;
-    std::size_t m_size = 0; ///< of the text
-    bool m_isRead = false;  ///< the text was an object
-    bool m_hasEscapes = false;
-    /// Views into m_text, m_built or memory of the parser.
+    bool m_isRead = false; ///< the text was an object
+    /// Views into memory of m_scan, or into m_built. With room for one more.
     const std::unique_ptr<EntryFields::Field[]> m_fields;
     std::size_t m_count = 0;
-    std::size_t m_leftOut = 0;
+    std::size_t m_members = 0;       ///< more than the fields if some were left out
     std::unique_ptr<char[]> m_built; ///< names of nested fields
     std::size_t m_builtSize = 0;
     char m_path[EntryFields::longestName]{}; ///< the name of what is walked, with a dot behind it

@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdint>
 #include <map>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -16,9 +17,9 @@ namespace zrm::host {
 struct JsonName {
     std::string text;
     EntryColumn column;
-    std::uint8_t rank;  ///< of several fields for a column the one of the lowest rank fills it
-    bool isUsual;       ///< one of the names that loggers use: upper and lower case are the same
-    std::uint8_t place; ///< where it is looked for first
+    std::uint8_t rank;   ///< of several fields for a column the one of the lowest rank fills it
+    bool isUsual;        ///< one of the names that loggers use: upper and lower case are the same
+    std::uint16_t place; ///< where it is looked for first
 };
 
 /// A field that can fill a column.
@@ -35,23 +36,32 @@ public:
     /// names that loggers use are tried in order. Its keys are columns.
     explicit JsonNames(const std::map<std::string, std::string>& columns);
 
+    /// False for most names that find() does not know. The name is not empty.
+    bool mayHave(std::string_view name) const noexcept {
+        const std::size_t place = placeOf(name);
+        return m_starts[place] != m_starts[place + 1];
+    }
     /// Calls `use` with every JsonName that fits.
     template <class Use> void find(std::string_view name, const Use& use) const {
         if (name.empty()) {
             return;
         }
         const std::size_t place = placeOf(name);
-        for (std::size_t i = m_starts[place]; i < m_starts[place + 1]; ++i) {
-            if (fits(m_names[i], name)) {
-                use(m_names[i]);
+        const std::span names(m_names);
+        for (const JsonName& known :
+             names.subspan(m_starts[place], m_starts[place + 1] - m_starts[place])) {
+            if (fits(known, name)) {
+                use(known);
             }
         }
     }
 
 private:
-    static std::uint8_t placeOf(std::string_view name) noexcept {
-        return static_cast<std::uint8_t>(name.size() * 41 + folded(name.front()) * 7 +
-                                         folded(name.back()));
+    static constexpr std::size_t places = 1024; ///< many, so that most have none of the names
+
+    static std::uint16_t placeOf(std::string_view name) noexcept {
+        return static_cast<std::uint16_t>(
+            (name.size() * 211 + folded(name.front()) * 37 + folded(name.back())) % places);
     }
     /// Lower case for a letter; another character for others, the same for the same.
     static unsigned folded(char character) noexcept {
@@ -61,8 +71,8 @@ private:
     static bool fits(const JsonName& known, std::string_view name) noexcept;
     void add(EntryColumn column, std::string_view name, std::uint8_t rank, bool isUsual);
 
-    std::vector<JsonName> m_names;             ///< ordered by place
-    std::array<std::uint16_t, 257> m_starts{}; ///< of each place, and the end
+    std::vector<JsonName> m_names;                    ///< ordered by place
+    std::array<std::uint16_t, places + 1> m_starts{}; ///< of each place, and the end
 };
 
 /// The fields of one object that can fill columns.

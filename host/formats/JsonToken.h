@@ -20,15 +20,6 @@ inline std::string_view withoutBlanksBehind(std::string_view text) noexcept {
     return text;
 }
 
-/// What is between the quotes of a token, behind which there may be blanks.
-inline std::string_view quoted(std::string_view token) noexcept {
-    const char* end = token.data() + token.size() - 1;
-    while (*end != '"') {
-        --end;
-    }
-    return {token.data() + 1, static_cast<std::size_t>(end - token.data() - 1)};
-}
-
 /// True for a number as JSON writes it.
 inline bool isNumber(std::string_view text) noexcept {
     const char* at = text.data();
