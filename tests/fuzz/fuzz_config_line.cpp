@@ -1,8 +1,8 @@
 #include "logs/LogManagerUtil.h"
 #include "logs/ValidLog.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -35,12 +35,6 @@ struct Files {
     std::string log;
     std::string config;
 };
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 /// The records of a text: pieces of at most 1023 characters, of which only those count that are no
 /// comment, end in a newline and are not the last piece of a longer line.

@@ -1,7 +1,7 @@
 #include "host/formats/TimePattern.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <string>
 #include <string_view>
 
@@ -10,16 +10,6 @@ using namespace zrm::host;
 
 // "PATTERN\nTEXT": a text that is a time by a pattern gives a valid one, and the same when it is
 // read again; one that is not leaves the columns alone.
-
-namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const std::string_view input(reinterpret_cast<const char*>(data), size);

@@ -1,8 +1,8 @@
 #include "base/ProcessValues.h"
 #include "host/diagnose/FormatTrial.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <string>
 
 using namespace zrm;
@@ -12,12 +12,6 @@ using namespace zrm::host;
 // lie within what they are places of, and what is said of a line holds together.
 
 namespace {
-
-void require(bool condition) {
-    if (!condition) {
-        std::abort();
-    }
-}
 
 void examine(const FormatTrial::Line& line, const FormatTrial::Result& result) {
     require(!line.matched || !line.failedAt.has_value());

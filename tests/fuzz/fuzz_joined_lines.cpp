@@ -3,10 +3,10 @@
 #include "monitor/BackwardBlock.h"
 #include "monitor/EntryBlock.h"
 #include "monitor/Generation.h"
+#include "require.h"
 
 #include <algorithm>
 #include <cstdint>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <string>
@@ -22,12 +22,6 @@ using namespace zrm::host;
 // says which lines are joined and how many of them.
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 std::shared_ptr<const LineJoin> joinOf(std::uint8_t choice) {
     FormatDescription description;

@@ -1,9 +1,9 @@
 #include "base/EntryFields.h"
 #include "host/formats/FormatDescription.h"
 #include "host/formats/JsonFormat.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string_view>
@@ -15,12 +15,6 @@ using namespace zrm::host;
 // entry read last and those of an entry that is read anew are the same.
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 /// A copy of the exact size, where a step outside is found.
 struct Copy {

@@ -1,8 +1,8 @@
 #include "base/EntryFields.h"
 #include "host/formats/KeyValuePairs.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string>
@@ -12,16 +12,6 @@ using namespace zrm;
 using namespace zrm::host;
 
 // Keys and values of any text lie within it, and an unescaped value is not longer than the value.
-
-namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const std::unique_ptr<char[]> bytes(new char[size]); // a step outside is found

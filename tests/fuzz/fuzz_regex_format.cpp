@@ -1,7 +1,7 @@
 #include "host/formats/PatternProgram.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -15,12 +15,6 @@ using namespace zrm::host;
 // says that it does not know.
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 void compare(const re2::RE2& expression, const PatternProgram& program, std::string_view text) {
     std::vector<const char*> places(2 * program.groups());

@@ -1,10 +1,10 @@
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
+#include "require.h"
 
 #include <cstdint>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -41,12 +41,6 @@ private:
     std::string m_path;
     std::unique_ptr<SysLogFile> m_log;
 };
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 } // namespace
 

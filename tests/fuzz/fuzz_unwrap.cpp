@@ -1,9 +1,9 @@
 #include "base/EntryFields.h"
 #include "framework/LogEntry.h"
 #include "host/formats/FormatDescription.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string_view>
@@ -15,12 +15,6 @@ using namespace zrm::host;
 // What is in it has at most as many bytes.
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
 
 struct Format {
     explicit Format(const char* runtime) {

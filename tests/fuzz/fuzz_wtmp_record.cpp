@@ -1,9 +1,9 @@
 #include "base/EntryFields.h"
 #include "host/formats/FormatDescription.h"
 #include "host/formats/WtmpFormat.h"
+#include "require.h"
 
 #include <cstdint>
-#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string_view>
@@ -13,16 +13,6 @@ using namespace zrm::host;
 
 // Any bytes are read as a record, or refused with a reason. Nothing outside them is read, and all
 // texts are in them or in memory of the reader.
-
-namespace {
-
-void require(bool holds) {
-    if (!holds) {
-        std::abort();
-    }
-}
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     static const auto format = *WtmpFormat::make({});
