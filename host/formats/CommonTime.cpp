@@ -10,12 +10,11 @@ bool TimeParts::give(EntryColumns& columns) const noexcept {
     if (!civil.isValid() || civil.second == 60) {
         return false;
     }
-    if (hasDate) {
-        columns.hasTime = true;
-        columns.hasYear = hasYear;
-        columns.time = civil;
-        columns.offset = offset;
-    }
+    columns.hasTime = hasDate;
+    columns.hasTimeOfDay = !hasDate;
+    columns.hasYear = hasYear;
+    columns.time = civil;
+    columns.offset = offset;
     return true;
 }
 

@@ -30,8 +30,7 @@ struct TimeParts {
         civil.hour = hour % 12 + (isAfternoon ? 12 : 0);
         return hour >= 1 && hour <= 12;
     }
-    /// Sets the time of the columns, unless there is no such time. A time of day alone is none: it
-    /// leaves the columns without a time.
+    /// Sets the time of the columns, or the time of day alone, unless there is no such time.
     bool give(EntryColumns& columns) const noexcept;
 };
 

@@ -40,6 +40,7 @@ constexpr std::size_t longestPattern = 256;
 
 void copyTime(const EntryColumns& from, EntryColumns& to) noexcept {
     to.hasTime = from.hasTime;
+    to.hasTimeOfDay = from.hasTimeOfDay;
     to.hasYear = from.hasYear;
     to.time = from.time;
     to.offset = from.offset;
@@ -48,6 +49,9 @@ void copyTime(const EntryColumns& from, EntryColumns& to) noexcept {
 } // namespace
 
 Result<std::shared_ptr<const TimePattern>> TimePattern::compile(const std::string& pattern) {
+    if (pattern.empty()) {
+        return common();
+    }
     const auto name = std::ranges::find(names, pattern, &Name::name);
     if (name != names.end()) {
         return std::make_shared<const NamedTime>(name->form);

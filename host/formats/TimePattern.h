@@ -17,7 +17,7 @@ public:
     /// A pattern of strftime's directives (with %f for a fraction, %s for seconds since 1970, %z
     /// for any way to write an offset), or the name of a common form: "iso8601", "epoch" (of
     /// seconds, milliseconds, microseconds or nanoseconds, told apart by size), "auto" (whichever
-    /// common form fits).
+    /// common form fits). An empty text stands for "auto".
     static Result<std::shared_ptr<const TimePattern>> compile(const std::string& pattern);
     /// "auto".
     static std::shared_ptr<const TimePattern> common();
@@ -26,9 +26,9 @@ public:
     TimePattern& operator=(const TimePattern&) = delete;
     virtual ~TimePattern() = default;
 
-    /// Sets the time of the columns from a text that is nothing but the time. A time of day without
-    /// a date leaves them without a time: such an entry was written when it is read. Returns false,
-    /// and leaves the columns alone, if the text is not such a time.
+    /// Sets the time of the columns, or the time of day if there is no date, from a text that is
+    /// nothing but the time. Returns false, and leaves the columns alone, if the text is not such a
+    /// time.
     virtual bool read(std::string_view text, EntryColumns& columns) const noexcept = 0;
 
 protected:

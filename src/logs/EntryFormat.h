@@ -17,7 +17,8 @@ class EntryFields;
 /// What a format reads from one entry for its row. Texts are views into the entry or into memory of
 /// the reader, valid until its next call. They are not cut to the columns' widths.
 struct EntryColumns {
-    bool hasTime = false;
+    bool hasTime = false;      ///< a date and a time of day
+    bool hasTimeOfDay = false; ///< without hasTime: `time` is a time of day without a date
     bool hasYear = false;
     CivilTime time;                     ///< of a time without an offset: as the log's zone has it
     std::optional<std::int32_t> offset; ///< of the time's zone from UTC in seconds, if it says

@@ -27,19 +27,30 @@ template <std::size_t width> std::size_t fillColumn(char (&column)[width], std::
     return length;
 }
 
+/// False if ENTRYTIME cannot show the time.
+bool fillTime(EntryRow& row, const EntryColumns& entry, EntryStamp& stamp, const char* newest) {
+    if (entry.hasTime) {
+        return stamp.write(entry, newest, row->entrytime);
+    }
+    if (entry.hasTimeOfDay) {
+        return stamp.writeTimeOfDay(entry, newest, row->entrytime);
+    }
+    if (newest == nullptr) {
+        EntryStamp::writePresent(row->entrytime);
+    } else {
+        std::memcpy(row->entrytime, newest, sizeof row->entrytime);
+    }
+    return true;
+}
+
 } // namespace
 
 bool ColumnsRow::fill(EntryRow& row, const EntryColumns& entry, EntryStamp& stamp,
                       const char* newest) {
     TraceScope trace(anchor);
-    if (entry.hasTime && !stamp.write(entry, newest, row->entrytime)) {
+    if (!fillTime(row, entry, stamp, newest)) {
         row.reject();
         return trace.result(false);
-    }
-    if (!entry.hasTime && newest == nullptr) {
-        EntryStamp::writePresent(row->entrytime);
-    } else if (!entry.hasTime) {
-        std::memcpy(row->entrytime, newest, sizeof row->entrytime);
     }
     fillColumn(row->entrysys, entry.system);
     const std::size_t sourceLength = fillColumn(row->entrysrc, entry.source);

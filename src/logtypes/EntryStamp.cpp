@@ -13,6 +13,16 @@ namespace {
 
 constexpr std::size_t secondInStamp = 11;
 constexpr unsigned lastSecond = 59;
+constexpr std::int64_t secondsOfDay = 86'400;
+constexpr std::int64_t mostAhead =
+    3600; ///< how far an entry's time of day may be ahead, in seconds
+
+/// By how many whole days a time must be earlier so that it is not after `latest`, and no more than
+/// a day before it.
+std::int64_t daysBetween(std::int64_t latest, std::int64_t time) noexcept {
+    const std::int64_t ahead = time - latest;
+    return ahead > 0 ? (ahead + secondsOfDay - 1) / secondsOfDay : ahead / secondsOfDay;
+}
 
 } // namespace
 
@@ -40,12 +50,7 @@ bool EntryStamp::write(const EntryColumns& entry, const char* newest, char* out)
     }
     CivilTime civil = entry.time;
     if (!entry.hasYear) {
-        char now[stampLength];
-        if (newest == nullptr) {
-            BrevanTime::generateCurrentTimestamp(now);
-        }
-        civil.year =
-            SyslogForms::yearOf(civil, ZoneTime::ofStamp(newest == nullptr ? now : newest));
+        civil.year = SyslogForms::yearOf(civil, latestTime(newest));
     }
     const std::int64_t seconds = civil.seconds();
     const LocalEntryTime time = LocalEntryTime::of(seconds, entry.offset, m_settings->zone);
@@ -55,6 +60,38 @@ bool EntryStamp::write(const EntryColumns& entry, const char* newest, char* out)
     lastEntryMoment = time.moment;
     remember(entry, seconds);
     return true;
+}
+
+/// What `newest` of write() stands for, in local time.
+CivilTime EntryStamp::latestTime(const char* newest) noexcept {
+    char now[stampLength];
+    if (newest == nullptr) {
+        BrevanTime::generateCurrentTimestamp(now);
+    }
+    return ZoneTime::ofStamp(newest == nullptr ? now : newest);
+}
+
+bool EntryStamp::writeTimeOfDay(const EntryColumns& entry, const char* newest, char* out) noexcept {
+    const std::int64_t latest = latestTime(newest).seconds() + mostAhead;
+    CivilTime civil = CivilTime::of(latest);
+    civil.hour = entry.time.hour;
+    civil.minute = entry.time.minute;
+    civil.second = entry.time.second;
+    std::int64_t seconds = civil.seconds();
+    LocalEntryTime time = LocalEntryTime::of(seconds, entry.offset, m_settings->zone);
+    const auto moveBack = [&](std::int64_t days) {
+        seconds -= days * secondsOfDay;
+        time = LocalEntryTime::of(seconds, entry.offset, m_settings->zone);
+    };
+    // In another zone the date may be another one.
+    if (const std::int64_t days = daysBetween(latest, time.seconds); days != 0) {
+        moveBack(days);
+    }
+    if (time.seconds > latest) { // a clock was changed in between
+        moveBack(1);
+    }
+    lastEntryMoment = time.moment;
+    return ZoneTime::writeStamp(time.seconds, out);
 }
 
 bool EntryStamp::isRemembered(const EntryColumns& entry) const noexcept {

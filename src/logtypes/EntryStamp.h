@@ -37,6 +37,9 @@ public:
     /// of a time without one; null: the clock does. Returns false, and writes nothing, for a time
     /// that ENTRYTIME cannot show.
     bool write(const EntryColumns& entry, const char* newest, char* out) noexcept;
+    /// The same for a time of day alone: of the latest day on which it is at most an hour after
+    /// `newest`, or after the clock.
+    bool writeTimeOfDay(const EntryColumns& entry, const char* newest, char* out) noexcept;
 
     /// Writes the present time, as that of an entry that says none.
     static void writePresent(char* out) noexcept;
@@ -44,6 +47,7 @@ public:
 private:
     static constexpr std::size_t stampLength = 16;
 
+    static CivilTime latestTime(const char* newest) noexcept;
     bool isRemembered(const EntryColumns& entry) const noexcept;
     void remember(const EntryColumns& entry, std::int64_t civil) noexcept;
 

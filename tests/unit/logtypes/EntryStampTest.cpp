@@ -8,6 +8,7 @@
 
 #include <gtest/gtest.h>
 
+#include <ctime>
 #include <memory>
 #include <random>
 #include <string>
@@ -67,6 +68,51 @@ TEST_F(EntryStampTest, WhatIsRememberedIsWhatAFreshObjectWrites) {
             EntryStamp fresh(follow);
             ASSERT_EQ(writeWith(remembering, columns), writeWith(fresh, columns)) << entry;
         }
+    }
+}
+
+TEST_F(EntryStampTest, ATimeOfDayIsOfTheLatestDayThatItCanBe) {
+    const auto settings = std::make_shared<FollowSettings>();
+    EntryStamp stamp(settings);
+    const auto stampOf = [&](CivilTime time, const char* newest,
+                             std::optional<std::int32_t> offset = std::nullopt) {
+        EntryColumns entry = at(time, offset);
+        entry.hasTime = entry.hasYear = false;
+        entry.hasTimeOfDay = true;
+        char out[17] = "unset           ";
+        return stamp.writeTimeOfDay(entry, newest, out) ? std::string(out, 16) : "";
+    };
+    const CivilTime evening{2000, 1, 1, 23, 59, 59};
+    const CivilTime night{2000, 1, 1, 0, 0, 1};
+    EXPECT_EQ(stampOf(evening, "1261123000000000"), "1261122235959000") << "just before midnight";
+    EXPECT_EQ(stampOf(evening, "1261123235959000"), "1261123235959000");
+    EXPECT_EQ(stampOf(evening, "1261123120000000"), "1261122235959000") << "not in the future";
+    EXPECT_EQ(stampOf(night, "1261123120000000"), "1261123000001000");
+    EXPECT_EQ(stampOf(night, "1261122233000000"), "1261123000001000") << "a little out of order";
+    EXPECT_EQ(stampOf(night, "1261231233000000"), "1270101000001000");
+    EXPECT_EQ(stampOf(evening, "1270101001500000"), "1261231235959000");
+    // In Auckland it is tomorrow, in Honolulu yesterday.
+    EXPECT_EQ(stampOf(night, "1261123120500000", 13 * 3600), "1261123120001000");
+    EXPECT_EQ(stampOf(evening, "1261123120500000", 13 * 3600), "1261123115959000");
+    EXPECT_EQ(stampOf(evening, "1261123120500000", -10 * 3600), "1261123105959000");
+    EXPECT_EQ(stampOf(night, "1261123120500000", -10 * 3600), "1261123110001000");
+    // The night in which the clock is set back.
+    EXPECT_EQ(stampOf({2000, 1, 1, 3, 30, 0}, "1261025024500000"), "1261025033000000");
+    EXPECT_EQ(stampOf({2000, 1, 1, 1, 30, 0}, "1261025024500000", 3600), "1261025023000000");
+}
+
+TEST_F(EntryStampTest, ATimeOfDayIsNearTheClockWhileMonitoring) {
+    EntryStamp stamp(std::make_shared<FollowSettings>());
+    for (const std::int64_t ago : {0, 60, 3600, 80'000}) {
+        const std::int64_t wanted = ZoneTime::toLocal(std::time(nullptr)) - ago;
+        EntryColumns entry = at(CivilTime::of(wanted));
+        entry.hasTime = entry.hasYear = false;
+        entry.hasTimeOfDay = true;
+        entry.time.year = 2000;
+        entry.time.month = entry.time.day = 1;
+        char out[16];
+        ASSERT_TRUE(stamp.writeTimeOfDay(entry, nullptr, out));
+        EXPECT_EQ(ZoneTime::ofStamp(out).seconds(), wanted);
     }
 }
 

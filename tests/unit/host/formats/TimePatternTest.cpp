@@ -20,14 +20,17 @@ std::string timeOf(const std::string& pattern, std::string_view text) {
     }
     EntryColumns columns;
     if (!(*time)->read(text, columns)) {
-        EXPECT_FALSE(columns.hasTime);
+        EXPECT_FALSE(columns.hasTime || columns.hasTimeOfDay);
         return "not a time";
-    }
-    if (!columns.hasTime) {
-        return "no date";
     }
     char buffer[64];
     const CivilTime& civil = columns.time;
+    if (!columns.hasTime) {
+        EXPECT_TRUE(columns.hasTimeOfDay);
+        std::snprintf(buffer, sizeof buffer, "no date %02u:%02u:%02u", civil.hour, civil.minute,
+                      civil.second);
+        return buffer;
+    }
     std::snprintf(buffer, sizeof buffer, "%04d-%02u-%02u %02u:%02u:%02u", civil.year, civil.month,
                   civil.day, civil.hour, civil.minute, civil.second);
     std::string result = columns.hasYear ? buffer : "yyyy" + std::string(buffer + 4);
@@ -127,9 +130,9 @@ INSTANTIATE_TEST_SUITE_P(Epoch, CommonForm,
                                          Form{"1795082405123456789", utc}));
 
 INSTANTIATE_TEST_SUITE_P(TimeOfDay, CommonForm,
-                         testing::Values(Form{"10:00:05", "no date"},
-                                         Form{"10:00:05.123", "no date"},
-                                         Form{"9:00:05 PM", "no date"}));
+                         testing::Values(Form{"10:00:05", "no date 10:00:05"},
+                                         Form{"10:00:05.123", "no date 10:00:05"},
+                                         Form{"9:00:05 PM", "no date 21:00:05"}));
 
 TEST(TimePattern, RefusesWhatIsNotATime) {
     for (const char* text : {"",
@@ -253,7 +256,7 @@ TEST(TimePattern, FollowsDirectives) {
     EXPECT_EQ(timeOf("%m  %d %H", "11 \t 19   10"), "yyyy-11-19 10:00:00");
     EXPECT_EQ(timeOf("%m %d %H", "11-19 10"), "not a time");
     EXPECT_EQ(timeOf("%F", "2026-11-19"), "2026-11-19 00:00:00");
-    EXPECT_EQ(timeOf("%H:%M:%S.%f", "10:00:05.123"), "no date");
+    EXPECT_EQ(timeOf("%H:%M:%S.%f", "10:00:05.123"), "no date 10:00:05");
     EXPECT_EQ(timeOf("%H:%M", "24:00"), "not a time");
     EXPECT_EQ(timeOf("%F %T", "2026-11-19 10:00:60"), "not a time");
     EXPECT_EQ(timeOf("%F %T %%", "2026-11-19 10:00:05 %"), local);
@@ -284,7 +287,8 @@ TEST(TimePattern, RefusesPatternsThatReadNoTime) {
     expectRefused("%Q", "'%Q' is not a directive");
     expectRefused("%H:%", "'%' is not a directive");
     expectRefused("iso", "'iso' is not the form of a time");
-    expectRefused("", "'' is not the form of a time");
+    EXPECT_EQ(timeOf("", "2026-11-19T10:00:05Z"), utc) << "auto";
+    expectRefused(" ", "' ' is not the form of a time");
     expectRefused("%%", "has no directive for a time");
     expectRefused("%Z", "has no directive for a time");
     expectRefused("%Y %T", "the date is not complete");
@@ -312,8 +316,8 @@ TEST(TimeMemo, GivesTheTimeOfTheTextThatItIsAskedFor) {
     EXPECT_EQ(read("2026-11-19 10:00:06"), 6);
     EXPECT_EQ(read("2026-11-19 10:00:06Z"), 106);
     EXPECT_EQ(read("2026-11-19 10:00:06"), 6);
-    EXPECT_EQ(read("10:00:07"), 1000);
-    EXPECT_EQ(read("10:00:07"), 1000);
+    EXPECT_EQ(read("10:00:07"), 1007);
+    EXPECT_EQ(read("10:00:07"), 1007);
     EXPECT_EQ(read("2026-11-19 10:00:08" + std::string(100, ' ')), 8);
     EXPECT_EQ(read("2026-11-19 10:00:09" + std::string(100, ' ')), 9);
 }
