@@ -3,7 +3,6 @@
 #include "host/formats/FormatDescription.h"
 
 #include <algorithm>
-#include <optional>
 #include <string_view>
 
 namespace zrm::host {
@@ -12,16 +11,12 @@ namespace {
 
 /// `key` is the key that names the column: "defaults" or "values".
 Result<EntryColumn> textColumn(const std::string& name, const std::string& key) {
-    const std::optional<EntryColumn> column = entryColumnOf(name);
-    if (!column) {
-        return refused("there is no column \"" + name + "\"", std::string(entryColumnChoice),
-                       key + "." + name);
-    }
-    if (*column == EntryColumn::time) {
+    Result<EntryColumn> column = columnNamed(name, key);
+    if (column == EntryColumn::time) {
         return refused("the time of an entry cannot be given here", "name one of the other columns",
                        key + "." + name);
     }
-    return *column;
+    return column;
 }
 
 } // namespace

@@ -1,10 +1,12 @@
 #ifndef ZRM_HOST_ENTRY_COLUMN_H
 #define ZRM_HOST_ENTRY_COLUMN_H
 
+#include "host/base/Result.h"
 #include "logs/EntryFormat.h"
 
 #include <cstddef>
 #include <optional>
+#include <string>
 #include <string_view>
 
 namespace zrm::host {
@@ -14,10 +16,6 @@ enum class EntryColumn : unsigned char { time, system, source, type, entryClass,
 
 inline constexpr std::string_view entryColumnNames[] = {"time", "system", "source",
                                                         "type", "class",  "description"};
-/// For messages about a name that is not one of them.
-inline constexpr std::string_view entryColumnChoice =
-    "the columns are time, system, source, type, class and description";
-
 /// None if no column has this name.
 inline std::optional<EntryColumn> entryColumnOf(std::string_view name) noexcept {
     for (std::size_t i = 0; i < std::size(entryColumnNames); ++i) {
@@ -26,6 +24,16 @@ inline std::optional<EntryColumn> entryColumnOf(std::string_view name) noexcept 
         }
     }
     return std::nullopt;
+}
+
+/// A column that a description names. `key` is the key under which it does, for the problem.
+inline Result<EntryColumn> columnNamed(const std::string& name, const std::string& key) {
+    if (const std::optional<EntryColumn> column = entryColumnOf(name)) {
+        return *column;
+    }
+    return refused("'" + name + "' is not a column",
+                   "the columns are time, system, source, type, class and description",
+                   key + "." + name);
 }
 
 /// The text of a column; null for the time, which is not a text.

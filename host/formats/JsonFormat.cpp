@@ -2,7 +2,6 @@
 
 #include "host/formats/FlatJson.h"
 #include "host/formats/FormatDescription.h"
-#include "host/formats/TimePattern.h"
 
 #include <cstring>
 #include <string_view>
@@ -39,7 +38,8 @@ std::string_view levelOf(const JsonColumns& columns) noexcept {
 
 class JsonFormat::JsonReader final : public Reader {
 public:
-    explicit JsonReader(const JsonFormat& format) : m_format(format), m_fields(format.m_names) {}
+    explicit JsonReader(const JsonFormat& format)
+        : m_format(format), m_fields(format.m_columns.names()) {}
 
     bool read(std::string_view entry, EntryColumns& columns) override {
         m_isTimeWrong = false;
@@ -47,21 +47,14 @@ public:
             return false;
         }
         const JsonColumns& found = m_fields.columns();
-        if (!readTime(found, columns)) {
-            m_isTimeWrong = true;
+        if (!m_format.m_columns.fill(found, columns)) {
+            nameTime(found.begin()->name->text);
             return false;
         }
-        columns.system = found.of(EntryColumn::system).value;
-        columns.source = found.of(EntryColumn::source).value;
-        columns.type = m_format.m_texts.exchanges(EntryColumn::type)
-                           ? found.of(EntryColumn::type).value
-                           : levelOf(found);
-        columns.entryClass = found.of(EntryColumn::entryClass).value;
-        columns.description = found.of(EntryColumn::description).value;
-        m_format.m_texts.apply(columns);
-        if (columns.description.empty()) {
-            columns.description = entry;
+        if (!m_format.m_columns.exchanges(EntryColumn::type)) {
+            columns.type = levelOf(found);
         }
+        m_format.m_columns.complete(entry, columns);
         return true;
     }
 
@@ -77,21 +70,13 @@ public:
     }
 
 private:
-    /// False if there are fields for the time, but none is one.
-    bool readTime(const JsonColumns& found, EntryColumns& columns) noexcept {
-        for (const JsonCandidate& candidate : found) {
-            if (m_format.m_times->read(candidate.value, columns)) {
-                return true;
-            }
-        }
-        if (found.begin() == found.end()) {
-            return true;
-        }
+    /// The field is not a time.
+    void nameTime(std::string_view field) noexcept {
+        m_isTimeWrong = true;
         m_timeReasonLength = 0;
         appendReason("field ");
-        appendReason(found.begin()->name->text);
+        appendReason(field);
         appendReason(" is not a time");
-        return false;
     }
     void appendReason(std::string_view text) noexcept {
         m_timeReasonLength +=
@@ -110,36 +95,16 @@ Result<std::shared_ptr<const EntryFormat>> JsonFormat::make(const FormatDescript
         return refused("entries of type \"json\" have no pattern",
                        "leave it out, or choose type \"regex\"", "format");
     }
-    for (const auto& [name, field] : description.columns) {
-        if (!entryColumnOf(name)) {
-            return refused("there is no column \"" + name + "\"", std::string(entryColumnChoice),
-                           "columns." + name);
-        }
-        if (field.size() > EntryFields::longestName) {
-            return refused("the name of a field has at most 255 bytes", "", "columns." + name);
-        }
-    }
-    auto texts = ColumnTexts::make(description);
-    if (!texts) {
-        return tl::unexpected(std::move(texts.error()));
-    }
-    std::shared_ptr<const TimePattern> times = TimePattern::common();
-    if (!description.timeFormat.empty()) {
-        auto compiled = TimePattern::compile(description.timeFormat);
-        if (!compiled) {
-            compiled.error().field = "time_format";
-            return tl::unexpected(std::move(compiled.error()));
-        }
-        times = std::move(*compiled);
+    auto columns = FieldColumns::make(description);
+    if (!columns) {
+        return tl::unexpected(std::move(columns.error()));
     }
     return std::shared_ptr<const EntryFormat>(
-        new JsonFormat(description, std::move(*texts), std::move(times)));
+        new JsonFormat(std::move(*columns), description.definition()));
 }
 
-JsonFormat::JsonFormat(const FormatDescription& description, ColumnTexts texts,
-                       std::shared_ptr<const TimePattern> times)
-    : m_names(description.columns), m_texts(std::move(texts)), m_times(std::move(times)),
-      m_definition(description.definition()) {}
+JsonFormat::JsonFormat(FieldColumns columns, std::string definition)
+    : m_columns(std::move(columns)), m_definition(std::move(definition)) {}
 
 std::unique_ptr<EntryFormat::Reader> JsonFormat::reader() const {
     return std::make_unique<JsonReader>(*this);

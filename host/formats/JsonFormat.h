@@ -2,8 +2,7 @@
 #define ZRM_HOST_JSON_FORMAT_H
 
 #include "host/base/Result.h"
-#include "host/formats/ColumnTexts.h"
-#include "host/formats/JsonNames.h"
+#include "host/formats/FieldColumns.h"
 #include "logs/EntryFormat.h"
 
 #include <memory>
@@ -12,7 +11,6 @@
 namespace zrm::host {
 
 struct FormatDescription;
-class TimePattern;
 
 /// Entries that are JSON objects, one each. Their members are the fields, nested ones with dots in
 /// their names. Without a description, that is the whole entry. Of members with the same name the
@@ -31,12 +29,9 @@ public:
 private:
     class JsonReader;
 
-    JsonFormat(const FormatDescription& description, ColumnTexts texts,
-               std::shared_ptr<const TimePattern> times);
+    JsonFormat(FieldColumns columns, std::string definition);
 
-    const JsonNames m_names;
-    const ColumnTexts m_texts;
-    const std::shared_ptr<const TimePattern> m_times;
+    const FieldColumns m_columns;
     const std::string m_definition;
 };
 

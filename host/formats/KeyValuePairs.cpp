@@ -99,19 +99,23 @@ std::string_view KeyValuePairs::escaped(std::string_view value, std::size_t at) 
     }
 }
 
+void KeyValuePairs::addTo(EntryFields& fields, const Pair& pair) noexcept {
+    if (!pair.isQuoted || pair.value.find('\\') == none) {
+        fields.add(pair.key, pair.value);
+        return;
+    }
+    unescape(pair.value, fields);
+    if (const auto value = fields.takeText()) {
+        fields.add(pair.key, *value);
+    } else {
+        fields.noteLeftOut();
+    }
+}
+
 void KeyValuePairs::addTo(EntryFields& fields, std::string_view text) noexcept {
     KeyValuePairs pairs(text);
     for (Pair pair; pairs.next(pair);) {
-        if (!pair.isQuoted || pair.value.find('\\') == none) {
-            fields.add(pair.key, pair.value);
-            continue;
-        }
-        unescape(pair.value, fields);
-        if (const auto value = fields.takeText()) {
-            fields.add(pair.key, *value);
-        } else {
-            fields.noteLeftOut();
-        }
+        addTo(fields, pair);
     }
 }
 

@@ -24,7 +24,8 @@ public:
     /// False if there are no more.
     bool next(Pair& pair) noexcept;
 
-    /// Adds all pairs of a text. The views are into the text or into memory of `fields`.
+    /// Adds a pair, or all pairs of a text. The views are into the text or into memory of `fields`.
+    static void addTo(EntryFields& fields, const Pair& pair) noexcept;
     static void addTo(EntryFields& fields, std::string_view text) noexcept;
     /// Whether a text begins with a pair.
     static bool begin(std::string_view text) noexcept;

@@ -2,8 +2,7 @@
 #define ZRM_HOST_LOGFMT_FORMAT_H
 
 #include "host/base/Result.h"
-#include "host/formats/ColumnTexts.h"
-#include "host/formats/JsonNames.h"
+#include "host/formats/FieldColumns.h"
 #include "logs/EntryFormat.h"
 
 #include <memory>
@@ -12,7 +11,6 @@
 namespace zrm::host {
 
 struct FormatDescription;
-class TimePattern;
 
 /// Entries that are pairs such as `time=2026-11-19T10:00:00Z level=info msg="ready" port=8080`, in
 /// any order. The pairs are the fields; which of them fill columns is as in JSON entries. Without a
@@ -27,12 +25,9 @@ public:
 private:
     class LogfmtReader;
 
-    LogfmtFormat(const FormatDescription& description, ColumnTexts texts,
-                 std::shared_ptr<const TimePattern> times);
+    LogfmtFormat(FieldColumns columns, std::string definition);
 
-    const JsonNames m_names;
-    const ColumnTexts m_texts;
-    const std::shared_ptr<const TimePattern> m_times;
+    const FieldColumns m_columns;
     const std::string m_definition;
 };
 

@@ -115,8 +115,7 @@ Result<std::shared_ptr<const EntryFormat>> RegexFormat::make(const FormatDescrip
     if (!hasTime && !description.timeFormat.empty()) {
         return refused("the format captures no time", "write (?P<time>...) in it", "time_format");
     }
-    auto times =
-        TimePattern::compile(description.timeFormat.empty() ? "auto" : description.timeFormat);
+    auto times = TimePattern::compile(description.timeFormat);
     if (!times) {
         return tl::unexpected(std::move(times.error()));
     }

@@ -217,4 +217,4 @@ def test_a_wrong_table_is_refused_with_its_place(agent, log):
     agent.start(wait=False)
     agent.wait_end()
     message = agent.stderr.text()
-    assert 'log.columns.level: there is no column "level"; the columns are time, system,' in message
+    assert "log.columns.level: 'level' is not a column; the columns are time, system," in message

@@ -89,7 +89,8 @@ TEST(FormatSamples, TheLinesOfASampleMakeOneEntry) {
 TEST(FormatSamples, AFormatThatCannotBeMadeOrHasNoSamplesFails) {
     ReadyFormat ready = logfmt();
     ready.format.columns = {{"when", "ts"}};
-    EXPECT_THAT(failuresOf(ready), ElementsAre(HasSubstr("0: columns.when: there is no column")));
+    EXPECT_THAT(failuresOf(ready),
+                ElementsAre(HasSubstr("0: columns.when: 'when' is not a column")));
     ready = logfmt();
     ready.format.lines.starts = "(";
     EXPECT_THAT(failuresOf(ready), ElementsAre(HasSubstr("0: entry.starts: ")));

@@ -41,7 +41,7 @@ TEST(ColumnTexts, NamesTheKeyThatIsNotAColumn) {
     const auto defaults = ColumnTexts::make(description);
     ASSERT_FALSE(defaults);
     EXPECT_EQ(defaults.error().field, "defaults.sauce");
-    EXPECT_EQ(defaults.error().what, "there is no column \"sauce\"");
+    EXPECT_EQ(defaults.error().what, "'sauce' is not a column");
 
     description.defaults.clear();
     description.values["time"] = {{"a", "b"}};

@@ -195,6 +195,16 @@ TEST(JsonFormat, PrefersEarlierNamesWhereverTheyAre) {
     EXPECT_EQ(timeOf(entry.columns), "1795341600 UTC");
 }
 
+TEST(JsonFormat, PrefersATimeWithADateToATimeOfDay) {
+    Entry entry;
+    ASSERT_TRUE(entry.read(R"({"time":"10:00:05.123","ts":1795341600,"msg":"m"})"));
+    EXPECT_EQ(timeOf(entry.columns), "1795341600 UTC");
+    ASSERT_TRUE(entry.read(R"({"time":"10:00:05.123","ts":"soon","msg":"m"})"));
+    EXPECT_FALSE(entry.columns.hasTime);
+    EXPECT_TRUE(entry.columns.hasTimeOfDay);
+    EXPECT_EQ(entry.columns.time.second, 5u);
+}
+
 TEST(JsonFormat, LeavesColumnsEmptyThatTheObjectDoesNotHave) {
     Entry entry;
     ASSERT_TRUE(entry.read(R"({"n":1})"));

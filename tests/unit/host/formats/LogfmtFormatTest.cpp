@@ -68,6 +68,61 @@ TEST(LogfmtFormat, RefusesWhatDoesNotBeginWithAPairOrHasAWrongTime) {
     EXPECT_EQ(reader->reason(), "the value of its time is not a time");
 }
 
+TEST(LogfmtFormat, ReadsTheFieldsOfAnyEntry) {
+    const auto format = makeFormat(logfmt()).value();
+    const auto reader = format->reader();
+    std::string many = "level=info";
+    for (int i = 0; i < 300; ++i) {
+        many += " f" + std::to_string(i) + "=" + std::to_string(i);
+    }
+    for (const std::string& entry :
+         {std::string(R"(level=info user="a \"b\"" port=1 port=2)"), many}) {
+        EntryColumns columns;
+        ASSERT_TRUE(reader->read(entry, columns));
+        EntryFields after; // the entry that was read last
+        reader->readFields(entry, after);
+        EntryFields anew;
+        const std::string copy = entry;
+        format->reader()->readFields(copy, anew);
+        ASSERT_EQ(after.all().size(), anew.all().size());
+        for (std::size_t i = 0; i < after.all().size(); ++i) {
+            EXPECT_EQ(after.all()[i].name, anew.all()[i].name);
+            EXPECT_EQ(after.all()[i].value, anew.all()[i].value);
+        }
+        EXPECT_EQ(after.leftOut(), anew.leftOut());
+    }
+    EntryColumns columns;
+    EXPECT_FALSE(reader->read("no pair", columns));
+    EntryFields fields;
+    reader->readFields("level=info port=80", fields);
+    EXPECT_EQ(fields.all().size(), 2U);
+}
+
+TEST(LogfmtFormat, OfSeveralPairsWithOneKeyTheFirstCounts) {
+    const auto reader = readerOf(logfmt());
+    EntryColumns columns;
+    ASSERT_TRUE(reader->read("msg=first level=info msg=second n=1 n=2", columns));
+    EXPECT_EQ(columns.description, "first");
+    EntryFields fields;
+    reader->readFields("msg=first level=info msg=second n=1 n=2", fields);
+    EXPECT_EQ(*fields.find("n"), "1");
+    EXPECT_EQ(fields.all().size(), 3U);
+}
+
+TEST(LogfmtFormat, KeepsBytesAndNumbersOfAnyKind) {
+    using namespace std::string_literals;
+    const auto reader = readerOf(logfmt());
+    const std::string entry =
+        "level=info msg=\"a\xff\0b\" n=123456789012345678901234567890 tail=\0x"s;
+    EntryColumns columns;
+    ASSERT_TRUE(reader->read(entry, columns));
+    EXPECT_EQ(columns.description, "a\xff\0b"s);
+    EntryFields fields;
+    reader->readFields(entry, fields);
+    EXPECT_EQ(*fields.find("n"), "123456789012345678901234567890");
+    EXPECT_EQ(*fields.find("msg"), "a\xff\0b"s);
+}
+
 TEST(LogfmtFormat, TakesColumnsAndTimesAsDescribed) {
     FormatDescription description = logfmt();
     description.columns = {{"time", "at"}, {"type", "kind"}};
@@ -81,6 +136,8 @@ TEST(LogfmtFormat, TakesColumnsAndTimesAsDescribed) {
 
     description.columns = {{"when", "at"}};
     EXPECT_EQ(makeFormat(description).error().field, "columns.when");
+    description.columns = {{"type", std::string(256, 'a')}};
+    EXPECT_EQ(makeFormat(description).error().field, "columns.type");
     description.columns.clear();
     description.timeFormat = "never";
     EXPECT_EQ(makeFormat(description).error().field, "time_format");
