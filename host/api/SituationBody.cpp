@@ -43,6 +43,12 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
     if (fields.has("context")) {
         text.context = fields.number("context", 0, SituationValidator::mostContext);
     }
+    text.runbook = fields.optionalText("runbook");
+    if (std::optional<JsonFields> labels = fields.optionalObject("labels")) {
+        for (const std::string& name : labels->keys()) {
+            text.labels[name] = labels->text(name);
+        }
+    }
     fields.refuseUnknown();
     if (text.log) {
         checkLog(fields, *text.log);

@@ -6,8 +6,8 @@
 #include "host/cli/DisplayText.h"
 #include "host/cli/InputFile.h"
 #include "host/config/ConfigFile.h"
-#include "host/config/FieldWarnings.h"
 #include "host/config/OwnFiles.h"
+#include "host/config/SituationWarnings.h"
 #include "host/diagnose/ConfigCheck.h"
 #include "host/sources/JournalFiles.h"
 #include "host/sources/LogFinder.h"
@@ -74,7 +74,7 @@ std::vector<std::string> notesOn(const HostConfig& config, const std::string& co
             notes.push_back(*warning);
         }
     }
-    for (std::string& warning : warningsOfFields(config, path)) {
+    for (std::string& warning : warningsOfSituations(config, path)) {
         notes.push_back(std::move(warning));
     }
     return notes;

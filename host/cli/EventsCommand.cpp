@@ -60,8 +60,11 @@ std::string summaryOf(const Json& event) {
     return text;
 }
 
-/// The values of the event's group before the text of its entry.
+/// The text made for the event; or else the values of its group before the text of its entry.
 std::string entryOf(const Json& event) {
+    if (const std::string text = JsonText::text(event, "text"); !text.empty()) {
+        return text;
+    }
     std::string group;
     for (const auto& [name, value] : JsonText::member(event, "group").items()) {
         group += name + '=' + JsonText::text(value) + ' ';

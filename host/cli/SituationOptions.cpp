@@ -51,6 +51,18 @@ int numberOf(const std::string& text) {
     return number;
 }
 
+Json labelsOf(const std::vector<std::string>& texts) {
+    Json labels = Json::object();
+    for (const std::string& text : texts) {
+        const std::size_t equals = text.find('=');
+        if (equals == std::string::npos) {
+            throw CliError(CliStatus::USAGE, "--label: write NAME=VALUE, not '" + text + "'");
+        }
+        labels[text.substr(0, equals)] = text.substr(equals + 1);
+    }
+    return labels;
+}
+
 } // namespace
 
 Json SituationOptions::subject(const std::string& name, const std::string& file) {
@@ -75,7 +87,7 @@ void SituationOptions::addTo(CLI::App& command) {
             {key, add((std::string("--") + key).c_str(), value, type, help), &value});
     };
     add("--file", m_file, "FILE", "The definition as JSON; - is standard input");
-    addMember("text", m_text, "TEXT", "A description for people");
+    addMember("text", m_text, "TEXT", "What people read, for example \"login from {ENTRYSYS}\"");
     addMember("severity", m_severity, "SEVERITY", "info, minor, warning, major or critical");
     addMember("log", m_log, "LOG", "The full path of a log; without it, every log");
     command
@@ -87,10 +99,14 @@ void SituationOptions::addTo(CLI::App& command) {
               "At least or at most this many entries, for example \">= 5\"");
     addMember("period", m_period, "TIME", "Within this time, for example 60s, 5m, 1h");
     addMember("context", m_context, "COUNT", "How many entries before it an event has, 0 to 100");
+    addMember("runbook", m_runbook, "URL", "A page that says what to do about an event");
+    command.add_option("--label", m_labels, "A label of its events; repeatable")
+        ->type_name("NAME=VALUE")
+        ->allow_extra_args(false);
 }
 
 bool SituationOptions::areGiven() const {
-    return !m_file.empty() || !m_when.empty() ||
+    return !m_file.empty() || !m_when.empty() || !m_labels.empty() ||
            std::any_of(m_members.begin(), m_members.end(),
                        [](const Member& member) { return member.option->count() > 0; });
 }
@@ -107,6 +123,11 @@ Json SituationOptions::definition(const Json& base) const {
     if (const auto context = definition.find("context");
         context != definition.end() && context->is_string()) {
         definition["context"] = numberOf(context->get<std::string>());
+    }
+    if (m_labels == std::vector<std::string>{""}) {
+        definition.erase("labels");
+    } else if (!m_labels.empty()) {
+        definition["labels"] = labelsOf(m_labels);
     }
     if (m_when == std::vector<std::string>{""}) {
         definition.erase("when");

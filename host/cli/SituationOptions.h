@@ -48,6 +48,8 @@ private:
     std::string m_frequency;
     std::string m_period;
     std::string m_context;
+    std::string m_runbook;
+    std::vector<std::string> m_labels; ///< as written
 };
 
 } // namespace zrm::host

@@ -51,6 +51,11 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
                                : frequency + " within " + JsonText::text(situation, "period"));
     const std::string context = JsonText::text(situation, "context");
     facts.add("context", context == "0" ? "" : context);
+    facts.add("runbook", JsonText::text(situation, "runbook"));
+    const Json& labels = JsonText::member(situation, "labels");
+    for (const auto& [name, value] : labels.items()) {
+        facts.add("label", name + '=' + JsonText::text(value));
+    }
     for (const char* const key : {"offered", "matched", "discarded", "raised"}) {
         facts.add(key, count(situation, key));
     }

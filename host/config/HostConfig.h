@@ -8,6 +8,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -50,7 +51,9 @@ struct SituationConfig {
     std::vector<std::string> when = {};
     std::optional<std::string> frequency = std::nullopt;
     std::optional<std::string> period = std::nullopt;
-    std::size_t context = 0;     ///< earlier entries of the log that its events have
+    std::size_t context = 0;  ///< earlier entries of the log that its events have
+    std::string runbook = {}; ///< URL of what to do about its events; empty: none
+    std::map<std::string, std::string> labels = {}; ///< of its events, for their receivers
     std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };

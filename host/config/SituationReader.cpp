@@ -54,6 +54,13 @@ SituationConfig SituationReader::read(const toml::table& table) {
     text.frequency = fields.text("frequency");
     text.period = fields.text("period");
     text.context = section.number("context");
+    text.runbook = fields.text("runbook");
+    if (std::optional<ConfigSection> labels = section.section("labels")) {
+        for (const std::string& name : labels->keys()) {
+            text.labels[name] = labels->text(name).value_or("-"); // a problem is recorded
+        }
+    }
+    text.mayHaveBraces = true; // warningsOfTexts reports them
 
     auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;

@@ -1,6 +1,8 @@
 #include "host/config/SituationValidator.h"
 
 #include "host/config/ConditionParser.h"
+#include "host/config/EventExtras.h"
+#include "host/config/TextTemplate.h"
 #include "host/config/Thresholds.h"
 
 #include <algorithm>
@@ -191,6 +193,28 @@ void addThresholds(const SituationText& text, SituationConfig& situation, Proble
         "not a period", "write a number and s, m, h or d, for example \"60s\"");
 }
 
+/// What the events have for people and receivers. The text may name what the conditions capture.
+void addExtras(const SituationText& text, SituationConfig& situation, Problems& problems) {
+    const auto note = [&](const char* field, const Problem& problem) {
+        problems.push_back({{problem.what, problem.cure, field}});
+    };
+    const auto parsed = TextTemplate::parse(situation.text, situation.conditions);
+    if (!parsed) {
+        note("text", parsed.error());
+    } else if (!parsed->ignored().what.empty() && !text.mayHaveBraces) {
+        note("text", parsed->ignored());
+    }
+    situation.runbook = text.runbook.value_or("");
+    if (const auto checked = EventExtras::checkRunbook(situation.runbook);
+        !situation.runbook.empty() && !checked) {
+        note("runbook", checked.error());
+    }
+    situation.labels = text.labels;
+    if (const auto checked = EventExtras::checkLabels(situation.labels); !checked) {
+        note("labels", checked.error());
+    }
+}
+
 } // namespace
 
 SituationValidator::Verdict SituationValidator::check(const SituationText& text,
@@ -220,6 +244,7 @@ SituationValidator::Verdict SituationValidator::check(const SituationText& text,
               "write a number from 0 to " + std::to_string(mostContext), "context"}});
     }
     situation.context = static_cast<std::size_t>(text.context.value_or(0));
+    addExtras(text, situation, problems);
     return verdict;
 }
 

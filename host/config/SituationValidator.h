@@ -7,6 +7,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -24,6 +25,11 @@ struct SituationText {
     std::optional<std::string> frequency;
     std::optional<std::string> period;
     std::optional<std::int64_t> context;
+    std::optional<std::string> runbook;
+    std::map<std::string, std::string> labels;
+    /// A text may have unknown names in braces, but no known ones beside them, and is then kept as
+    /// it is.
+    bool mayHaveBraces = false;
 };
 
 /// What is wrong with a situation, in a field such as "name" or "when[0]".

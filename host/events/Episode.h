@@ -54,6 +54,7 @@ struct EventJudgement {
     std::int64_t last = 0;              ///< time of the last
     std::int64_t pauseEnds = 0;         ///< of PAUSED: an entries' time, in seconds since 1970
     std::vector<GroupValue> group;      ///< empty: the situation has no groups
+    std::string text;                   ///< rendered for this event; empty: the situation's
     std::string reason;                 ///< why it is resolved; empty: nothing more has come
 
     // Of events without a row.

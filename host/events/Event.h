@@ -25,6 +25,8 @@ struct SituationLabel {
     std::vector<std::string> fields = {}; ///< names of the fields that its conditions name
     std::size_t context = 0;              ///< earlier entries that its events have
     std::int64_t definition = 0; ///< a hash of what decides when its episodes begin and end
+    std::string runbook = {};    ///< URL of what to do about them; empty: none
+    std::string labels = {};     ///< of its events: a JSON object; empty: none
 };
 
 /// What an event has of its entry beside the row, as JSON values. Immutable.

@@ -16,6 +16,7 @@ void EventJson::append(std::string& text, const Event& event) const {
         json.key(m_situationKey).value(event.situation->name);
         json.key(m_severityKey).value(event.situation->severity);
         json.key(m_raisedKey).time(event.raised);
+        writeExtras(json, event);
         if (event.judgement != nullptr) {
             writeJudgement(json, event);
         }
@@ -42,6 +43,19 @@ void EventJson::writeDetail(JsonWriter& json, const EntryDetail& detail) const {
     }
     if (!detail.context.empty()) {
         json.key(m_contextKey).raw(detail.context);
+    }
+}
+
+/// What the situation adds for people and receivers.
+void EventJson::writeExtras(JsonWriter& json, const Event& event) {
+    if (event.judgement != nullptr && !event.judgement->text.empty()) {
+        json.member("text", event.judgement->text);
+    }
+    if (!event.situation->runbook.empty()) {
+        json.member("runbook", event.situation->runbook);
+    }
+    if (!event.situation->labels.empty()) {
+        json.key("labels").raw(event.situation->labels);
     }
 }
 

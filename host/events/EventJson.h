@@ -11,8 +11,9 @@ namespace zrm::host {
 
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}, and for the log
 /// of a [[log]] table also {"fields", "entry", "entry_cut", "context"} where there is such a thing.
-/// What judges groups and episodes adds {"state", "episode", "count", "group", "reason"}. An event
-/// without a row has {"log", "node"} instead. Immutable, so any thread.
+/// What judges groups and episodes adds {"state", "episode", "count", "group", "reason"}, and the
+/// situation {"text", "runbook", "labels"}. An event without a row has {"log", "node"} instead.
+/// Immutable, so any thread.
 class EventJson {
 public:
     explicit EventJson(RowLayout layout);
@@ -25,6 +26,7 @@ public:
     void appendLog(std::string& text, const Event& event) const;
 
 private:
+    static void writeExtras(JsonWriter& json, const Event& event);
     void writeDetail(JsonWriter& json, const EntryDetail& detail) const;
     static void writeJudgement(JsonWriter& json, const Event& event);
 

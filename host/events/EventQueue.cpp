@@ -17,6 +17,7 @@ constexpr std::chrono::milliseconds gatherTime{5};
 std::size_t bytesOf(const Event& event) {
     std::size_t bytes = event.detail == nullptr ? 0 : event.detail->bytes();
     if (event.judgement != nullptr) {
+        bytes += event.judgement->text.size();
         for (const GroupValue& group : event.judgement->group) {
             bytes += group.name.size() + group.value.size();
         }

@@ -100,15 +100,13 @@ bool EventText::isIn(std::string_view log, std::string_view document) const {
     const auto hasText = [&](const json& value) {
         return value.is_string() && m_whole.isIn(value.get_ref<const std::string&>());
     };
-    const auto situation = event.find("situation");
-    if (situation != event.end() && hasText(*situation)) {
-        return true;
+    for (const char* const name : {"situation", "text", "entry"}) {
+        const auto text = event.find(name);
+        if (text != event.end() && hasText(*text)) {
+            return true;
+        }
     }
-    const auto entry = event.find("entry");
-    if (entry != event.end() && hasText(*entry)) {
-        return true;
-    }
-    for (const char* const name : {"fields", "group"}) {
+    for (const char* const name : {"fields", "group", "labels"}) {
         const auto values = event.find(name);
         if (values != event.end() && std::any_of(values->begin(), values->end(), hasText)) {
             return true;

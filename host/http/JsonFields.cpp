@@ -106,6 +106,14 @@ bool JsonFields::has(std::string_view key) const {
     return found != m_object->end() && !found->is_null();
 }
 
+std::vector<std::string> JsonFields::keys() const {
+    std::vector<std::string> keys;
+    for (const auto& [key, value] : m_object->items()) {
+        keys.push_back(key);
+    }
+    return keys;
+}
+
 std::string JsonFields::text(std::string_view key) {
     const json& value = required(key);
     if (!isText(value)) {

@@ -28,6 +28,9 @@ public:
 
     bool has(std::string_view key) const;
 
+    /// All keys of the object, in alphabetical order.
+    std::vector<std::string> keys() const;
+
     /// A text without NUL characters; may be empty.
     std::string text(std::string_view key);
     std::optional<std::string> optionalText(std::string_view key);

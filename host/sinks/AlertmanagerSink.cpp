@@ -38,10 +38,21 @@ void writeFields(JsonWriter& json, const char* prefix, std::span<const EventRow:
     }
 }
 
-void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow& row) {
+/// A text that was made for the event says by itself where it comes from, if it should.
+std::string summaryOf(const EventRecord& event, const EventRow& row) {
+    if (!row.eventText().empty()) {
+        return row.eventText();
+    }
     const std::string_view what = event.text.empty() ? event.situation : event.text;
-    json.beginObject().member("summary", std::string(what) + " in " + std::string(event.log));
+    return std::string(what) + " in " + std::string(event.log);
+}
+
+void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow& row) {
+    json.beginObject().member("summary", summaryOf(event, row));
     json.member("description", row.description());
+    if (!row.runbook().empty()) {
+        json.member("runbook_url", row.runbook());
+    }
     json.member("source", row.source());
     json.member("event", std::to_string(event.id));
     if (!row.entry().empty()) {
@@ -91,15 +102,24 @@ void AlertmanagerSink::writeAlert(JsonWriter& json, const EventRecord& event) co
     json.endObject();
 }
 
-/// The event's labels, then the configured ones, which have other names. Those of a resolved event
-/// are those of the raised one: they identify the alert.
+/// The event's labels, then the situation's and the sink's, which have other names. Where both have
+/// a label, the situation knows better. Those of a resolved event are those of the raised one: they
+/// identify the alert.
 void AlertmanagerSink::writeLabels(JsonWriter& json, const EventRecord& event,
                                    const EventRow& row) const {
     json.beginObject().member("alertname", event.situation).member("severity", event.severity);
     json.member("log", event.log).member("node", row.node());
     writeFields(json, "group_", row.group());
+    for (const EventRow::Field& label : row.labels()) {
+        json.member(label.name, label.value);
+    }
     for (const auto& [name, value] : m_labels) {
-        json.member(name, value);
+        const auto isOfThatName = [&name = name](const EventRow::Field& label) {
+            return label.name == name;
+        };
+        if (std::none_of(row.labels().begin(), row.labels().end(), isOfThatName)) {
+            json.member(name, value);
+        }
     }
     json.endObject();
 }

@@ -49,6 +49,9 @@ EventRow::EventRow(const EventRecord& event) {
     m_episode = {numberOf(episode, "id"), numberOf(episode, "count"), textOf(episode, "raised"),
                  textOf(episode, "first"), textOf(episode, "last")};
     m_group = fieldsOf(member(json, "group"));
+    m_eventText = textOf(json, "text");
+    m_runbook = textOf(json, "runbook");
+    m_labels = fieldsOf(member(json, "labels"));
     const Json* const row = &member(json, "row");
     if (!row->is_object()) {
         m_node = textOf(json, "node");
@@ -92,6 +95,10 @@ std::string_view EventRow::description() const {
     }
     const std::string_view utf8 = text("UENTRYDESC");
     return utf8.empty() ? text("ENTRYDESC") : utf8;
+}
+
+std::string_view EventRow::message() const {
+    return m_eventText.empty() ? description() : m_eventText;
 }
 
 std::string_view EventRow::source() const {

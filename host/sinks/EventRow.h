@@ -70,6 +70,18 @@ public:
     /// says of its episode.
     std::string_view description() const;
 
+    /// The text that the situation has made for this event; empty: its text is the same for all.
+    const std::string& eventText() const noexcept { return m_eventText; }
+
+    /// What people read first: the text made for this event, or else the description.
+    std::string_view message() const;
+
+    /// The URL of what to do about the event; empty: none.
+    const std::string& runbook() const noexcept { return m_runbook; }
+
+    /// The situation's labels.
+    std::span<const Field> labels() const noexcept { return m_labels; }
+
     /// The program, or part of a program, that wrote the entry.
     std::string_view source() const;
 
@@ -102,6 +114,9 @@ private:
     std::string m_state;
     Episode m_episode;
     std::vector<Field> m_group;
+    std::string m_eventText;
+    std::string m_runbook;
+    std::vector<Field> m_labels;
     std::string m_node; ///< as written
     std::string m_text; ///< of an event without a row
 };

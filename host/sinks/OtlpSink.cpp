@@ -52,6 +52,12 @@ void writeAttributes(JsonWriter& json, const EventRecord& event, const EventRow&
     if (!row.entry().empty()) {
         writeAttribute(json, "zrm.entry", row.entry());
     }
+    if (!row.runbook().empty()) {
+        writeAttribute(json, "zrm.runbook", row.runbook());
+    }
+    for (const EventRow::Field& label : row.labels()) {
+        writeAttribute(json, "zrm.label." + label.name, label.value);
+    }
     for (const EventRow::Field& group : row.group()) {
         writeAttribute(json, "zrm.group." + group.name, group.value);
     }
@@ -72,7 +78,7 @@ void writeRecord(JsonWriter& json, const EventRecord& event, const EventRow& row
     json.member("observedTimeUnixNano", nanoseconds);
     json.member("severityNumber", SeverityCodes::of(event.severity).otel);
     json.member("severityText", event.severity);
-    json.key("body").beginObject().member("stringValue", row.description()).endObject();
+    json.key("body").beginObject().member("stringValue", row.message()).endObject();
     json.key("attributes");
     writeAttributes(json, event, row);
     json.endObject();

@@ -92,8 +92,12 @@ void appendFields(std::string& data, const EventRow& row, std::size_t most) {
     }
 }
 
-/// The description, or the whole entry if the column holds only its beginning.
+/// The text made for this event; or else the description, or the whole entry if the column holds
+/// only its beginning.
 std::string_view textOf(const EventRow& row) {
+    if (!row.eventText().empty()) {
+        return row.eventText();
+    }
     constexpr std::size_t width = 256; // of ENTRYDESC
     const bool isCut = row.text("ENTRYDESC").size() >= width - 1;
     return isCut && !row.entry().empty() ? row.entry() : row.description();

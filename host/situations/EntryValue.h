@@ -20,9 +20,9 @@ namespace zrm::host {
 
 class CapturePattern;
 
-/// One entry after the other, from which values are read. A pattern is matched when the first of its
-/// captures is read, and only once per entry. Allocates nothing once it has been used, but what RE2
-/// does for captures. One thread at a time.
+/// One entry after the other, from which values are read. A pattern is matched when the first of
+/// its captures is read, and only once per entry. Allocates nothing once it has been used, but what
+/// RE2 does for captures. One thread at a time.
 class EntryReading {
 public:
     EntryReading();

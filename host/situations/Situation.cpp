@@ -1,12 +1,16 @@
 #include "host/situations/Situation.h"
 
 #include "base/TraceScope.h"
+#include "framework/LogEntry.h"
 #include "framework/ctreq.h"
+#include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
+#include "host/events/RowText.h"
 #include "host/framework/Status.h"
 
 #include <algorithm>
 #include <chrono>
+#include <map>
 #include <string>
 #include <utility>
 #include <vector>
@@ -37,14 +41,31 @@ RequestDetail detailOf(const SituationConfig& config) {
     return detail;
 }
 
+std::string labelsText(const std::map<std::string, std::string>& labels) {
+    return labels.empty() ? std::string() : JsonWriter::text([&](JsonWriter& json) {
+        json.beginObject();
+        for (const auto& [name, value] : labels) {
+            json.member(name, value);
+        }
+        json.endObject();
+    });
+}
+
+std::shared_ptr<const SituationLabel> labelOf(const SituationConfig& config) {
+    SituationLabel label{config.name, config.severity, config.text};
+    label.fields = fieldsOf(config.conditions);
+    label.context = config.context;
+    label.runbook = config.runbook;
+    label.labels = labelsText(config.labels);
+    return std::make_shared<const SituationLabel>(std::move(label));
+}
+
 } // namespace
 
 Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
                      std::shared_ptr<SituationCounts> counts)
-    : m_config(std::move(config)), m_label(std::make_shared<const SituationLabel>(SituationLabel{
-                                       m_config.name, m_config.severity, m_config.text,
-                                       fieldsOf(m_config.conditions), m_config.context})),
-      m_queue(queue), m_counts(std::move(counts)), m_context(m_config.log, m_config.context),
+    : m_config(std::move(config)), m_label(labelOf(m_config)), m_queue(queue),
+      m_counts(std::move(counts)), m_context(m_config.log, m_config.context), m_texts(m_config),
       m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
     TraceScope trace(anchor);
     if (!isOpen()) {
@@ -64,11 +85,43 @@ unsigned Situation::receive(const ctreq& request, const char* rows, unsigned cou
     // Before waiting for room: the events count as raised, whenever they are delivered.
     m_counts->countRaised(count, WallClock::now());
     for (unsigned index = 0; index < count; ++index) {
-        if (!m_queue.push(m_label, rows + std::size_t{index} * request.rowSize)) {
+        const char* const row = rows + std::size_t{index} * request.rowSize;
+        if (!m_queue.push(m_label, row, judgementOf(request, row))) {
             return trace.result(static_cast<unsigned>(Status::end));
         }
     }
     return trace.result(0u);
+}
+
+/// Null where there is nothing to say beyond what the conditions decided.
+std::shared_ptr<const EventJudgement> Situation::judgementOf(const ctreq& request,
+                                                             const char* row) {
+    if (!m_texts.isNeeded()) {
+        return nullptr;
+    }
+    if (!m_layout) {
+        m_layout.emplace(const_cast<ctreq&>(request)); // which only asks for its columns
+    }
+    m_reading.begin(*m_layout, row, LogEntry::ofThisThread);
+    auto judgement = std::make_shared<EventJudgement>();
+    std::string log;
+    judgement->text = m_texts.text(m_reading, factsOf(row, log));
+    return judgement;
+}
+
+/// What a situation without groups and episodes counts: the entries that reached its threshold, up
+/// to this one. `log` has the room for the log's name.
+TextFacts Situation::factsOf(const char* row, std::string& log) const {
+    TextFacts facts;
+    log = LogPath::of(*m_layout, row);
+    facts.log = log;
+    if (const RowColumn* const count = m_layout->find("FREQTHRESH")) {
+        facts.count = static_cast<std::uint64_t>(std::max(count->integer(row), 1));
+    }
+    if (const RowColumn* const time = m_layout->find("ENTRYTIME")) {
+        facts.first = facts.last = TimeText::toMilliseconds(time->text(row)).value_or(0);
+    }
+    return facts;
 }
 
 void Situation::stopped(const ctreq& /*request*/, unsigned reason) {

@@ -5,10 +5,14 @@
 #include "host/events/ContextDemand.h"
 #include "host/events/EventQueue.h"
 #include "host/framework/Request.h"
+#include "host/framework/RowLayout.h"
+#include "host/situations/EntryValue.h"
+#include "host/situations/TextRenderer.h"
 
 #include <atomic>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 class TableManager;
@@ -62,6 +66,8 @@ public:
 private:
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override;
     void stopped(const ctreq& request, unsigned reason) override;
+    std::shared_ptr<const EventJudgement> judgementOf(const ctreq& request, const char* row);
+    TextFacts factsOf(const char* row, std::string& log) const;
 
     const SituationConfig m_config;
     const std::shared_ptr<const SituationLabel> m_label;
@@ -69,7 +75,11 @@ private:
     const std::shared_ptr<SituationCounts> m_counts;
     std::atomic<unsigned> m_stopReason{0};
     const ContextDemand::Hold m_context;
-    Request m_request; ///< last member: rows may arrive during its construction
+    const TextRenderer m_texts;
+    // Used under the table manager's lock.
+    EntryReading m_reading;
+    std::optional<RowLayout> m_layout; ///< known once there was a row to render a text for
+    Request m_request;                 ///< last member: rows may arrive during its construction
 };
 
 } // namespace zrm::host

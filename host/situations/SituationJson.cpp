@@ -30,7 +30,9 @@ Json SituationJson::definition(const SituationConfig& situation) {
             {"when", situation.when},
             {"frequency", orNull(situation.frequency)},
             {"period", orNull(situation.period)},
-            {"context", situation.context}};
+            {"context", situation.context},
+            {"runbook", situation.runbook.empty() ? Json() : Json(situation.runbook)},
+            {"labels", situation.labels}};
 }
 
 Json SituationJson::status(const SituationStatus& status) {

@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
+#include <map>
 #include <optional>
 #include <set>
 #include <utility>
@@ -84,6 +85,9 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     text.frequency = optionalText(object, "frequency");
     text.period = optionalText(object, "period");
     text.context = object.value("context", std::int64_t{0});
+    text.runbook = optionalText(object, "runbook");
+    text.labels = object.value("labels", std::map<std::string, std::string>());
+    text.mayHaveBraces = true; // it may have been made before braces had a meaning
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
     auto [config, problems] = SituationValidator::check(text, patterns.ofNext());

@@ -2,7 +2,7 @@
 #include "host/base/Say.h"
 #include "host/base/WatchedFile.h"
 #include "host/config/ConfigFile.h"
-#include "host/config/FieldWarnings.h"
+#include "host/config/SituationWarnings.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/TraceControl.h"
 #include "host/sources/CompressedGeneration.h"
@@ -60,7 +60,7 @@ HostConfig readConfig(const std::string& path) {
             say("%s", warning->c_str());
         }
     }
-    for (const std::string& warning : warningsOfFields(*config, path)) {
+    for (const std::string& warning : warningsOfSituations(*config, path)) {
         say("%s", warning.c_str());
     }
     return std::move(*config);

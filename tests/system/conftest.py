@@ -183,7 +183,7 @@ class Agent:
             text += "".join(f"{k} = {toml_value(v)}\n" for k, v in table.items())
         for situation in self.situations:
             text += "\n[[situation]]\n"
-            text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in situation.items())
+            text += "".join(f"{k} = {toml_value(v)}\n" for k, v in situation.items())
         self.zrm_toml.write_text(text, encoding="utf-8")
 
     # ------------------------------------------------------------------ process

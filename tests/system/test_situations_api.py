@@ -25,6 +25,8 @@ def test_a_situation_is_created_raises_events_and_is_removed(running):
         "frequency": ">= 2",
         "period": "60s",
         "context": 0,
+        "runbook": None,
+        "labels": {},
         "source": "api",
         "state": "running",
         "problem": None,

@@ -44,6 +44,13 @@ export function say(element, ...children) {
   if (next.textContent !== element.textContent) element.replaceChildren(...next.childNodes);
 }
 
+/** A link to a page elsewhere, which learns nothing of this one. Anything but http(s) stays text. */
+export function link(url) {
+  return /^https?:\/\//.test(url)
+    ? h("a", { href: url, target: "_blank", rel: "noopener noreferrer" }, url)
+    : url;
+}
+
 const SVG = "http://www.w3.org/2000/svg";
 
 export function svg(tag, attributes = {}, ...children) {

@@ -116,8 +116,12 @@ export function frequencyText(frequency, period) {
     : `${frequency} within ${period}`;
 }
 
-/** What an event says in one line: its group and the text of its entry, or what came of an episode. */
+/**
+ * What an event says in one line: the text that its situation makes of it, or else its group and the
+ * text of its entry, or what came of an episode.
+ */
 export function describe(event) {
+  if (event.text) return event.text;
   const group = Object.entries(event.group ?? {}).map(([name, value]) => `${name}=${value}`);
   const text = event.row
     ? event.row.UENTRYDESC || event.row.ENTRYDESC

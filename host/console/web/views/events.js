@@ -1,7 +1,7 @@
 // Events: live, with filter, pause, and the detail of one.
 
 import { get, post, withQuery } from "../api.js";
-import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
+import { button, debounce, empty, failure, field, fill, h, link, select } from "../dom.js";
 import { briefTime, describe, number, plural, SEVERITIES, time } from "../format.js";
 import { explained, rowList } from "../explain.js";
 import { EventStream } from "../stream.js";
@@ -397,6 +397,8 @@ class EventsPage {
           ],
           ["Severity", h("span", { className: `severity ${event.severity}` }, event.severity)],
           ["Raised", time(event.raised, true)],
+          ...(event.runbook ? [["Runbook", link(event.runbook)]] : []),
+          ...Object.entries(event.labels ?? {}),
           ["Log", logOf(event)],
           ...episodeOf(event),
         ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)]),

@@ -16,6 +16,8 @@ const BLANK = {
   frequency: null,
   period: null,
   context: 0,
+  runbook: null,
+  labels: {},
 };
 const ANY = "*"; // no log has this path
 const UNITS = [
@@ -49,6 +51,7 @@ export async function show(element, name, query) {
 class Form {
   constructor(element, name, situation, logs, columns) {
     this.name = name;
+    this.labels = situation.labels; // not edited here, and not to be lost
     const changed = () => this.changed();
     if (situation.log && !logs.includes(situation.log)) logs.unshift(situation.log);
     this.fields = {
@@ -66,7 +69,17 @@ class Form {
       text: field(
         "Text",
         h("input", { value: situation.text, autocomplete: "off", oninput: changed }),
-        "Shown to people when it is raised",
+        "Shown to people when it is raised; {count}, {ENTRYSYS} and the like stand for what it has",
+      ),
+      runbook: field(
+        "Runbook",
+        h("input", {
+          type: "url",
+          value: situation.runbook || "",
+          autocomplete: "off",
+          oninput: changed,
+        }),
+        "The address of a page that says what to do",
       ),
       context: field(
         "Entries before it",
@@ -123,7 +136,7 @@ class Form {
           h("div", { className: "fields" }, this.fields.log, this.fields.severity),
           this.conditions.element,
           this.repeats.element,
-          h("div", { className: "fields" }, this.fields.context),
+          h("div", { className: "fields" }, this.fields.context, this.fields.runbook),
           this.problem,
           h(
             "p",
@@ -202,7 +215,7 @@ class Form {
   }
 
   get definition() {
-    const { name, text, severity, log, context } = this.fields;
+    const { name, text, severity, log, context, runbook } = this.fields;
     return {
       name: name.control.value.trim(),
       text: text.control.value,
@@ -211,6 +224,8 @@ class Form {
       when: this.conditions.texts,
       ...this.repeats.value,
       context: Number(context.control.value),
+      runbook: runbook.control.value.trim() || null,
+      labels: this.labels,
     };
   }
 

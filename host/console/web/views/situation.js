@@ -1,7 +1,7 @@
 // One situation: its definition, its counts, a backtest, and why it matches an entry or not.
 
 import { get, situationPath, withQuery } from "../api.js";
-import { failure, fill, h, loading } from "../dom.js";
+import { failure, fill, h, link, loading } from "../dom.js";
 import { ago, frequencyText, number, time } from "../format.js";
 import { explainPanel, previewPanel } from "../situation-tools.js";
 import { actions, notThere, STATES } from "./situations.js";
@@ -128,6 +128,8 @@ function definition(situation) {
         : "every match is raised",
     ],
     ["Entries before it", situation.context || "none"],
+    ...(situation.runbook ? [["Runbook", link(situation.runbook)]] : []),
+    ...Object.entries(situation.labels ?? {}).map(([name, value]) => [`Label ${name}`, value]),
     [
       "Comes from",
       situation.source === "file"

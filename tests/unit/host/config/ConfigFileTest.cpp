@@ -14,6 +14,7 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::Pair;
 
 TEST(ConfigFile, AnEmptyFileGivesTheDefaults) {
     const HostConfig config = accepted("");
@@ -61,6 +62,8 @@ log       = "/var/log/auth.log"
 when      = ["ENTRYSRC starts 'sshd'", "ENTRYDESC contains 'Failed password'"]
 frequency = ">= 5"
 period    = "60s"
+runbook   = "https://wiki.example.org/ssh"
+labels    = { team = "web", tier = "2" }
 )");
     EXPECT_EQ(config.stateDirectory, "/srv/zrm");
     EXPECT_THAT(config.environment,
@@ -77,6 +80,8 @@ period    = "60s"
     EXPECT_EQ(situation.name, "ssh-bruteforce");
     EXPECT_EQ(situation.text, "Repeated failed SSH logins");
     EXPECT_EQ(situation.severity, "critical");
+    EXPECT_EQ(situation.runbook, "https://wiki.example.org/ssh");
+    EXPECT_THAT(situation.labels, ElementsAre(Pair("team", "web"), Pair("tier", "2")));
     std::vector<std::string> conditions;
     for (const Condition& condition : situation.conditions) {
         conditions.push_back(
@@ -132,7 +137,7 @@ keep_days = 30
             "token_file, key",
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
-            "severity, log, when, frequency, period, context",
+            "severity, log, when, frequency, period, context, runbook, labels",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
             "http, history, formats, sink, log, situation"));
 }

@@ -1,5 +1,5 @@
 #include "host/config/ConfigFile.h"
-#include "host/config/FieldWarnings.h"
+#include "host/config/SituationWarnings.h"
 
 #include "support/TemporaryDirectory.h"
 
@@ -16,8 +16,11 @@ using namespace zrm::host;
 
 namespace {
 
+using testing::AllOf;
 using testing::ElementsAre;
+using testing::EndsWith;
 using testing::IsEmpty;
+using testing::StartsWith;
 
 class ConfigSecretsTest : public testing::Test {
 protected:
@@ -39,7 +42,7 @@ TEST(ConfigFields, WarnsAboutConditionsOnFieldsOfLogsThatHaveNone) {
                                   "when = [\"ENTRYSYS = 'h'\", \"field.user = 'root'\"]\n",
                               "zrm.toml");
         EXPECT_TRUE(result) << result.error().front();
-        return warningsOfFields(result.value(), "zrm.toml");
+        return warningsOfSituations(result.value(), "zrm.toml");
     };
     const std::string text = "[[log]]\npath = '/t/*'\nexclude = 'no.log'\ntype = 'text'\nformat = "
                              "'A,\"%s\",description'\n";
@@ -62,6 +65,30 @@ TEST(ConfigFields, WarnsAboutConditionsOnFieldsOfLogsThatHaveNone) {
     EXPECT_THAT(warnings(text, "log = '/t/no.log'\n"),
                 ElementsAre(begin + "no [[log]] table names /t/no.log, and entries of other logs "
                                     "have no fields"));
+}
+
+TEST(ConfigTexts, WarnsAboutNamesInBracesThatAreNone) {
+    const auto warnings = [](const std::string& text) {
+        const ConfigFile::Result result =
+            ConfigFile::parse("[[situation]]\nname = 'a'\ntext = '" + text + "'\n", "zrm.toml");
+        EXPECT_TRUE(result) << result.error().front();
+        return warningsOfSituations(result.value(), "zrm.toml");
+    };
+    EXPECT_THAT(warnings("{count} failed logins"), IsEmpty());
+    EXPECT_THAT(warnings("see {wiki}"),
+                ElementsAre(AllOf(
+                    StartsWith("zrm.toml: situation 'a': the text is kept as it is written, since "
+                               "it names nothing that its events have: {wiki}: 'wiki' is not a "
+                               "name of this situation; the names are "),
+                    EndsWith("write {{ for a brace"))));
+}
+
+TEST(ConfigTexts, RefusesUnknownNamesBesideKnownOnes) {
+    const ConfigFile::Result result =
+        ConfigFile::parse("[[situation]]\nname = 'a'\ntext = '{count} {wiki}'\n", "zrm.toml");
+    ASSERT_FALSE(result);
+    EXPECT_THAT(result.error(), ElementsAre(StartsWith(
+                                    "zrm.toml:3: situation.text: {wiki}: 'wiki' is not a name")));
 }
 
 } // namespace

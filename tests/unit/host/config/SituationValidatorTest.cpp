@@ -55,6 +55,32 @@ TEST(SituationValidator, KeepsTheTextAndBuildsConditions) {
     EXPECT_EQ(situation.conditions.back().number, 60);
 }
 
+TEST(SituationValidator, ChecksWhatEventsHaveForPeopleAndReceivers) {
+    SituationText text = named("a");
+    text.when = {"ENTRYDESC matches 'from (?P<ip>\\S+)'"};
+    text.text = "{count} from {ip}";
+    text.runbook = "https://wiki.example.org/ssh";
+    text.labels = {{"team", "web"}};
+    const auto [situation, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
+    EXPECT_EQ(situation.runbook, text.runbook);
+    EXPECT_EQ(situation.labels, text.labels);
+    text.text = "{count} from {adress}";
+    text.runbook = "wiki";
+    text.labels = {{"log", "web"}};
+    EXPECT_THAT(fieldsOf(text), ElementsAre("text", "runbook", "labels"));
+}
+
+TEST(SituationValidator, KeepsUnknownNamesInBracesOnlyWhereItMust) {
+    SituationText text = named("a");
+    text.text = "see {wiki}";
+    EXPECT_THAT(fieldsOf(text), ElementsAre("text"));
+    text.mayHaveBraces = true;
+    EXPECT_THAT(fieldsOf(text), IsEmpty());
+    text.text = "see {wiki} {count}";
+    EXPECT_THAT(fieldsOf(text), ElementsAre("text"));
+}
+
 TEST(SituationValidator, OnlyANameIsRequired) {
     const auto [situation, problems] = SituationValidator::check(named("a"));
     EXPECT_THAT(problems, IsEmpty());

@@ -2,6 +2,7 @@
 
 #include "TestEvents.h"
 #include "host/base/TimeText.h"
+#include "host/events/Episode.h"
 #include "host/events/RowText.h"
 #include "support/AllocationCount.h"
 
@@ -80,6 +81,25 @@ TEST(EventJson, WritesWhatPlainMeansGive) {
         EventJson(testLayout()).append(written, event);
         ASSERT_EQ(written, model(event));
     }
+}
+
+TEST(EventJson, WritesWhatTheSituationAdds) {
+    TestEvents events;
+    events.add("");
+    Event event = events.all()[0];
+    SituationLabel label{"a", "info", "{count} \"times\""};
+    label.runbook = "https://wiki/a";
+    label.labels = R"({"team":"web"})";
+    event.situation = std::make_shared<const SituationLabel>(label);
+    auto judgement = std::make_shared<EventJudgement>();
+    judgement->text = "5 \"times\"";
+    event.judgement = judgement;
+    std::string text;
+    EventJson(testLayout()).append(text, event);
+    EXPECT_NE(text.find(R"(412Z","text":"5 \"times\"","runbook":"https://wiki/a",)"
+                        R"("labels":{"team":"web"},"row":{)"),
+              std::string::npos)
+        << text;
 }
 
 TEST(EventJson, AllocatesNothingForAnEvent) {

@@ -45,6 +45,14 @@ TEST(EventText, IsFoundInTheEntryAndItsFields) {
     EXPECT_FALSE(EventText("bob").isIn("/log", document));
 }
 
+TEST(EventText, IsFoundInTheTextAndTheLabels) {
+    const std::string document = R"({"id":1,"situation":"s","text":"5 failed LOGINS",)"
+                                 R"("runbook":"https://wiki/","labels":{"team":"Web"},"row":{}})";
+    EXPECT_TRUE(EventText("failed logins").isIn("/log", document));
+    EXPECT_TRUE(EventText("web").isIn("/log", document));
+    EXPECT_FALSE(EventText("wiki").isIn("/log", document));
+}
+
 TEST(EventText, IsNotFoundInNamesNumbersTimesAndTheNode) {
     for (const char* const text :
          {"UENTRYDESC", "row", "web1", "1261120", "17", "major", "\":\""}) {

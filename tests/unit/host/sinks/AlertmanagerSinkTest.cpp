@@ -98,6 +98,21 @@ TEST_F(AlertmanagerSinkTest, AddsTheConfiguredLabels) {
     EXPECT_EQ(alert.at("endsAt"), "2026-11-21T07:03:09.412Z");
 }
 
+TEST_F(AlertmanagerSinkTest, AlertsHaveTheSituationsTextRunbookAndLabels) {
+    events.add({.text = "{count} logins",
+                .more = R"(,"text":"5 logins","runbook":"https://wiki/a#b",)"
+                        R"("labels":{"team":"web","tier":"2"})"});
+    AlertmanagerSink sink(config("labels = { team = 'ops', site = 'a' }\n"));
+    EXPECT_EQ(deliver(sink), 1u);
+    const Json alert = sent().at(0);
+    EXPECT_EQ(alert.at("labels").dump(),
+              R"({"alertname":"ssh-bruteforce","severity":"critical","log":"/var/log/auth.log",)"
+              R"("node":"web1","team":"web","tier":"2","site":"a"})");
+    EXPECT_EQ(alert.at("annotations").at("summary"), "5 logins");
+    EXPECT_EQ(alert.at("annotations").at("runbook_url"), "https://wiki/a#b");
+    EXPECT_EQ(alert.at("annotations").at("description"), "Failed password for root");
+}
+
 TEST_F(AlertmanagerSinkTest, ARefusalFailsTheWholeDelivery) {
     events.add({});
     events.add({});

@@ -53,6 +53,23 @@ TEST_F(OtlpSinkTest, RecordsHaveTheEntryAndItsFields) {
     EXPECT_EQ(texts["zrm.entry"], "the line");
 }
 
+TEST_F(OtlpSinkTest, RecordsHaveTheSituationsTextRunbookAndLabels) {
+    events.add({.more = R"(,"text":"5 logins","runbook":"https://wiki/","labels":{"team":"web"})"});
+    OtlpSink sink(config());
+    ASSERT_GE(deliver(sink), 1u);
+    const Json sent = Json::parse(server.requests()[0].body);
+    const Json& records = sent["resourceLogs"][0]["scopeLogs"][0]["logRecords"];
+    const Json& record = records[records.size() - 1];
+    EXPECT_EQ(record["body"]["stringValue"], "5 logins");
+    const std::string attributes = record["attributes"].dump();
+    EXPECT_NE(attributes.find(R"({"key":"zrm.runbook","value":{"stringValue":"https://wiki/"}})"),
+              std::string::npos)
+        << attributes;
+    EXPECT_NE(attributes.find(R"({"key":"zrm.label.team","value":{"stringValue":"web"}})"),
+              std::string::npos)
+        << attributes;
+}
+
 TEST_F(OtlpSinkTest, RecordsCarryTheStateOfAnEpisode) {
     events.addWithoutRow(EntryEvents::episode("resolved") + EntryEvents::withoutRow);
     OtlpSink sink(config());

@@ -69,6 +69,12 @@ TEST(SyslogMessage, TheEntryTakesThePlaceOfADescriptionThatIsCut) {
     EXPECT_TRUE(message.ends_with("] the whole line")) << message;
 }
 
+TEST(SyslogMessage, TheTextMadeForTheEventIsTheMessage) {
+    const std::string message =
+        messageOf({.more = R"(,"text":"5 logins","runbook":"https://wiki/","labels":{"a":"b"})"});
+    EXPECT_TRUE(message.ends_with(R"(log="/var/log/auth.log"] 5 logins)")) << message;
+}
+
 TEST(SyslogMessage, ThePriorityCombinesFacilityAndSeverity) {
     const auto priority = [](std::string_view facility, const std::string& severity) {
         const std::string message = messageOf({.severity = severity}, facility);

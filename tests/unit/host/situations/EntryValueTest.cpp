@@ -1,20 +1,12 @@
 #include "host/situations/EntryValue.h"
 
-#include "base/EntryFields.h"
-#include "framework/LogEntry.h"
-#include "host/config/ConditionParser.h"
-#include "host/framework/Request.h"
-#include "logs/zrm_rmlogent_data.h"
 #include "support/AllocationCount.h"
 #include "support/RecordingTrace.h"
-#include "tables/zrm_rmlogent_manager.h"
-#include "unit/host/framework/TestTable.h"
+#include "unit/host/situations/GivenEntry.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <cstring>
-#include <optional>
 #include <string>
 #include <vector>
 
@@ -25,77 +17,39 @@ namespace {
 
 using testing::HasSubstr;
 
-class FieldsOnly : public LogEntry {
-public:
-    std::string_view text() const override { return {}; }
-    bool isCut() const override { return false; }
-    const EntryFields& fields() override { return m_fields; }
-    const EntryKeep& keep() const override { return m_keep; }
-
-    EntryFields m_fields;
-    EntryKeep m_keep;
-};
-
-std::vector<Condition> conditionsOf(const std::vector<std::string>& texts) {
-    std::vector<Condition> conditions;
-    PatternBudget budget;
-    for (const std::string& text : texts) {
-        conditions.push_back(ConditionParser("RMLOGENT").parse(text, budget).value());
-    }
-    return conditions;
-}
-
 class EntryValueTest : public testing::Test {
 protected:
-    EntryValueTest() {
-        std::memset(&row, ' ', sizeof row);
-        RequestDetail detail;
-        detail.name = "layout";
-        detail.sampleType = SAMPLE_REPORT;
-        const Request request(entries, detail, receiver);
-        layout.emplace(*request.get());
-    }
-
-    void describe(std::string_view text) {
-        std::memset(row.entrydesc, ' ', sizeof row.entrydesc);
-        std::memcpy(row.entrydesc, text.data(), text.size());
-    }
-    const char* bytes() const { return reinterpret_cast<const char*>(&row); }
     std::string value(std::string_view name, const std::vector<std::string>& conditions = {}) {
-        const std::vector<Condition> built = conditionsOf(conditions);
+        const std::vector<Condition> built = GivenEntry::conditions(conditions);
         EntryValues values(built);
         const Result<EntryValue> value = values.compile(name);
         if (!value) {
             return value.error().text();
         }
         EntryReading reading;
-        reading.begin(*layout, bytes(), &entry);
+        reading.begin(*entry.layout, entry.bytes(), &entry);
         std::string room;
         return std::string(value->read(reading, room));
     }
 
     RecordingTrace trace{0};
-    zrm_rmlogent_manager entries{"ZRM", "RMLOGENT"};
-    TestReceiver receiver;
-    std::optional<RowLayout> layout;
-    zrm_rmlogent_data_t row;
-    FieldsOnly entry;
+    GivenEntry entry;
 };
 
 const std::string failed =
     "ENTRYDESC matches 'Failed password for (invalid user )?(?P<user>\\S+) from (?P<ip>\\S+)'";
 
 TEST_F(EntryValueTest, IsAColumnInAnyCaseWithoutPadding) {
-    std::memcpy(row.entrysys, "alpha", 5);
+    GivenEntry::fill(entry.row.entrysys, "alpha");
     EXPECT_EQ(value("ENTRYSYS"), "alpha");
     EXPECT_EQ(value("entrySys"), "alpha");
     EXPECT_EQ(value("ENTRYSRC"), "");
-    row.freqthresh = -12;
+    entry.row.freqthresh = -12;
     EXPECT_EQ(value("FREQTHRESH"), "-12");
 }
 
 TEST_F(EntryValueTest, IsAField) {
-    entry.m_fields.add("user", "root");
+    entry.given.add("user", "root");
     EXPECT_EQ(value("field.user"), "root");
     EXPECT_EQ(value("field.other"), "");
     EXPECT_EQ(value("user", {"field.user = 'root'"}), "root");
@@ -105,21 +59,21 @@ TEST_F(EntryValueTest, HasNoFieldsWhereTheRowIsAll) {
     const std::vector<Condition> none;
     EntryValues values(none);
     EntryReading reading;
-    reading.begin(*layout, bytes(), nullptr);
+    reading.begin(*entry.layout, entry.bytes(), nullptr);
     std::string room;
     EXPECT_EQ(values.compile("field.user")->read(reading, room), "");
 }
 
 TEST_F(EntryValueTest, IsWhatAPatternHasCaptured) {
-    describe("Failed password for invalid user eve from 10.0.0.7 port 22");
+    entry.describe("Failed password for invalid user eve from 10.0.0.7 port 22");
     EXPECT_EQ(value("user", {failed}), "eve");
     EXPECT_EQ(value("ip", {failed}), "10.0.0.7");
-    entry.m_fields.add("request", "GET /admin HTTP/1.1");
+    entry.given.add("request", "GET /admin HTTP/1.1");
     EXPECT_EQ(value("path", {"field.request matches '^GET (?P<path>\\S+)'"}), "/admin");
 }
 
 TEST_F(EntryValueTest, IsEmptyForACaptureThatTookNoPart) {
-    describe("logout of eve");
+    entry.describe("logout of eve");
     const std::string either = "ENTRYDESC matches 'login of (?P<in>\\w+)|logout of (?P<out>\\w+)'";
     EXPECT_EQ(value("in", {either}), "");
     EXPECT_EQ(value("out", {either}), "eve");
@@ -128,9 +82,9 @@ TEST_F(EntryValueTest, IsEmptyForACaptureThatTookNoPart) {
 }
 
 TEST_F(EntryValueTest, PrefersCapturesToColumnsAndThoseToFields) {
-    describe("system beta");
-    std::memcpy(row.entrysys, "alpha", 5);
-    entry.m_fields.add("entrysys", "gamma");
+    entry.describe("system beta");
+    GivenEntry::fill(entry.row.entrysys, "alpha");
+    entry.given.add("entrysys", "gamma");
     const std::string onField = "field.entrysys = 'gamma'";
     EXPECT_EQ(value("entrysys", {onField}), "alpha");
     EXPECT_EQ(value("field.entrysys", {onField}), "gamma");
@@ -140,7 +94,7 @@ TEST_F(EntryValueTest, PrefersCapturesToColumnsAndThoseToFields) {
 }
 
 TEST_F(EntryValueTest, IsTheFirstConditionsWhereSeveralCaptureTheName) {
-    describe("from 10.0.0.7 to 10.0.0.9");
+    entry.describe("from 10.0.0.7 to 10.0.0.9");
     EXPECT_EQ(value("ip", {"ENTRYDESC matches 'to (?P<ip>\\S+)'",
                            "ENTRYDESC matches 'from (?P<ip>\\S+)'"}),
               "10.0.0.9");
@@ -159,8 +113,8 @@ TEST_F(EntryValueTest, RefusesUnknownNamesWithThoseThatAreKnown) {
 
 TEST_F(EntryValueTest, GivesLongAndBrokenBytesAsTheyAre) {
     const std::string longest(64 * 1024, 'a');
-    entry.m_fields.add("long", longest);
-    entry.m_fields.add("broken", "a\xff\xfe\x01z");
+    entry.given.add("long", longest);
+    entry.given.add("broken", "a\xff\xfe\x01z");
     EXPECT_EQ(value("field.long"), longest);
     EXPECT_EQ(value("all", {"field.long matches '^(?P<all>a+)$'"}), longest);
     EXPECT_EQ(value("field.broken"), "a\xff\xfe\x01z");
@@ -169,19 +123,19 @@ TEST_F(EntryValueTest, GivesLongAndBrokenBytesAsTheyAre) {
 }
 
 TEST_F(EntryValueTest, MatchesAPatternOncePerEntry) {
-    const std::vector<Condition> conditions = conditionsOf({failed});
+    const std::vector<Condition> conditions = GivenEntry::conditions({failed});
     EntryValues values(conditions);
     const EntryValue user = values.compile("user").value();
     const EntryValue ip = values.compile("ip").value();
     EntryReading reading;
     std::string room;
-    describe("Failed password for bob from 10.0.0.7");
-    reading.begin(*layout, bytes(), nullptr);
+    entry.describe("Failed password for bob from 10.0.0.7");
+    reading.begin(*entry.layout, entry.bytes(), nullptr);
     EXPECT_EQ(user.read(reading, room), "bob");
     // What is matched once is not looked at again, even if the row no longer matches.
-    row.entrydesc[0] = 'f';
+    entry.row.entrydesc[0] = 'f';
     EXPECT_EQ(ip.read(reading, room), "10.0.0.7");
-    reading.begin(*layout, bytes(), nullptr);
+    reading.begin(*entry.layout, entry.bytes(), nullptr);
     EXPECT_EQ(ip.read(reading, room), "");
 }
 
@@ -190,12 +144,12 @@ TEST_F(EntryValueTest, AllocatesNothingPerEntryWithoutCaptures) {
     EntryValues values(none);
     const EntryValue description = values.compile("ENTRYDESC").value();
     const EntryValue user = values.compile("field.user").value();
-    entry.m_fields.add("user", "root");
-    describe("Failed password for bob from 10.0.0.7");
+    entry.given.add("user", "root");
+    entry.describe("Failed password for bob from 10.0.0.7");
     EntryReading reading;
     std::string room;
     const long before = allocationCount();
-    reading.begin(*layout, bytes(), &entry);
+    reading.begin(*entry.layout, entry.bytes(), &entry);
     EXPECT_EQ(description.read(reading, room).size() + user.read(reading, room).size(), 41u);
     EXPECT_EQ(allocationCount(), before);
 }

@@ -35,6 +35,8 @@ SituationConfig situation(const std::string& name) {
     text.when = {"ENTRYSRC = 'it''s'", "ENTRYDESC matches '[\"\\\\]'"};
     text.frequency = ">= 2";
     text.period = "1h";
+    text.runbook = "https://wiki.example.org/a#b";
+    text.labels = {{"team", "web \xe2\x82\xac"}};
     const auto [config, problems] = SituationValidator::check(text);
     EXPECT_THAT(problems, IsEmpty());
     return config;
@@ -121,6 +123,17 @@ TEST_F(SituationStoreTest, TooLargeRegularExpressionsAreKeptAndDoNotRun) {
     ASSERT_EQ(loaded.made.size(), 2u);
     EXPECT_THAT(loaded.made[0].problem, HasSubstr("'\\pL{400}' is too large a regular expression"));
     EXPECT_EQ(loaded.made[0].config.when.at(1), "ENTRYDESC matches '\\pL{400}'");
+}
+
+TEST_F(SituationStoreTest, KeepsTextsWithBracesFromBeforeTheyHadAMeaning) {
+    std::ofstream(file)
+        << R"({"version":1,"situations":[{"name":"a","text":"see {wiki}","when":[],)"
+        << R"("stopped":false}],"stopped":[]})";
+    const SituationStore::Content loaded = load(store);
+    EXPECT_EQ(message, "");
+    ASSERT_EQ(loaded.made.size(), 1u);
+    EXPECT_EQ(loaded.made[0].problem, "");
+    EXPECT_EQ(loaded.made[0].config.text, "see {wiki}");
 }
 
 TEST_F(SituationStoreTest, IsEmptyWithoutAFile) {

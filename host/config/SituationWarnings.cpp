@@ -1,7 +1,8 @@
-#include "host/config/FieldWarnings.h"
+#include "host/config/SituationWarnings.h"
 
 #include "host/config/HostConfig.h"
 #include "host/config/PathPattern.h"
+#include "host/config/TextTemplate.h"
 
 #include <algorithm>
 #include <string_view>
@@ -49,19 +50,32 @@ std::string reason(const HostConfig& config, const SituationConfig& situation) {
                                    std::to_string(table->line) + " has them, have no fields";
 }
 
+/// Why the situation may not do what its author meant, as far as its fields go; empty: it does.
+std::string fieldWarning(const HostConfig& config, const SituationConfig& situation) {
+    const auto condition = std::find_if(situation.conditions.begin(), situation.conditions.end(),
+                                        [](const Condition& one) { return one.isOnField(); });
+    const std::string why =
+        condition == situation.conditions.end() ? "" : reason(config, situation);
+    return why.empty() ? "" : condition->column + " is in no entry: " + why;
+}
+
+std::string textWarning(const SituationConfig& situation) {
+    const auto text = TextTemplate::parse(situation.text, situation.conditions);
+    return !text || text->ignored().what.empty() ? ""
+                                                 : "the text is kept as it is written, since it "
+                                                   "names nothing that its events have: " +
+                                                       text->ignored().text();
+}
+
 } // namespace
 
-std::vector<std::string> warningsOfFields(const HostConfig& config, const std::string& path) {
+std::vector<std::string> warningsOfSituations(const HostConfig& config, const std::string& path) {
     std::vector<std::string> warnings;
     for (const SituationConfig& situation : config.situations) {
-        const auto condition =
-            std::find_if(situation.conditions.begin(), situation.conditions.end(),
-                         [](const Condition& one) { return one.isOnField(); });
-        const std::string why =
-            condition == situation.conditions.end() ? "" : reason(config, situation);
-        if (!why.empty()) {
-            warnings.push_back(path + ": situation '" + situation.name + "': " + condition->column +
-                               " is in no entry: " + why);
+        for (const std::string& why : {fieldWarning(config, situation), textWarning(situation)}) {
+            if (!why.empty()) {
+                warnings.push_back(path + ": situation '" + situation.name + "': " + why);
+            }
         }
     }
     return warnings;
