@@ -192,6 +192,7 @@ def test_an_event_of_a_command_is_explained_by_what_it_kept(runner):
     assert answer["reason"] == "what a command has printed cannot be read again"
     status, _, answer = agent.api.request("POST", "/api/v1/explain", {"situation": "every-entry", "log": "pairs", "last": 1})
     assert status == 409 and answer["detail"].startswith("what a command has printed cannot be read again")
+    assert agent.stop() == 0
 
 
 def test_nothing_of_the_agent_is_inherited(runner):
@@ -208,3 +209,4 @@ def test_the_client_shows_no_file_of_a_command(runner):
     assert line.split()[:3] == ["kernel", "command", "Running"] and "no file" not in line
     told = zrmctl(agent, "logs", "kernel").stdout
     assert "following" in told and "generation" not in told and "no file" not in told
+    assert agent.stop() == 0
