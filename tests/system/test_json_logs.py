@@ -152,6 +152,36 @@ def test_hostile_objects_disturb_nothing(agent, log):
     assert agent.stop() == 0
 
 
+@pytest.mark.parametrize("kind, last", [("json", entry(msg="last")), ("logfmt", "msg=last n=2\n")])
+def test_a_line_of_100_megabytes_costs_little_memory(agent, log, kind, last):
+    agent.follow(log, type=kind, start="beginning")
+    agent.situation(log=log, when=["field.msg = 'last'"])
+    agent.start()
+    before = agent.resident_kilobytes()
+    with open(log.path, "ab") as stream:
+        stream.write(b'{"n":"' if kind == "json" else b"n=")
+        for _ in range(100):
+            stream.write(b"x" * 1_000_000)
+        stream.write(b'"}\n' if kind == "json" else b"\n")
+    log.append(last)
+    (event,) = agent.wait_events(1)
+    assert event["row"]["ENTRYDESC"] == "last"
+    assert agent.resident_kilobytes() < before + 20_000
+    assert agent.stop() == 0
+
+
+def test_numbers_beyond_64_bits_compare(agent, log):
+    agent.follow(log, type="json", start="beginning")
+    agent.situation(log=log, when=["field.n > 18446744073709551616"])
+    agent.start()
+    for number in ("18446744073709551615", "-1e400", "9" * 400, "18446744073709559999", "1e30"):
+        log.append(f'{{"msg":"{number}","n":{number}}}\n')
+    log.append('{"msg":"end","n":1e31}\n')
+    events = agent.wait_events(3)
+    assert [event["row"]["ENTRYDESC"] for event in events] == ["18446744073709559999", "1e30", "end"]
+    assert agent.stop() == 0
+
+
 def test_rotation_and_restart_lose_nothing(agent, log):
     agent.follow(log, type="json", start="beginning", rotate_wait="1s")
     agent.situation(log=log)

@@ -2,6 +2,7 @@
 of syslog messages."""
 
 import gzip
+import time
 
 import pytest
 from api import Api
@@ -126,6 +127,25 @@ def test_times_zones_and_texts_of_columns(agent, log):
         ("1261119090500000", "", "till", "WARNING", "", "low on paper"),
         ("1260719080500000", "", "till", "I", "", "sold"),
     ]
+    assert agent.stop() == 0
+
+
+def test_a_time_of_day_alone_is_of_today_or_yesterday(agent, log):
+    agent.listen = "127.0.0.1:0"
+    agent.follow(
+        log, type="regex", format=r"(?P<time>[\d:.]+) (?P<description>.*)", start="beginning"
+    )
+    agent.situation(log=log)
+    agent.start()
+    times = [time.gmtime(time.time() - ago) for ago in (82_000, 7200, 5)]
+    log.append("".join(time.strftime("%H:%M:%S.123 it\n", one) for one in times))
+    stamps = [time.strftime("1%y%m%d%H%M%S000", one) for one in times]
+    assert [event["row"]["ENTRYTIME"] for event in agent.wait_events(3)] == stamps
+    begin = time.strftime("%Y-%m-%d", time.gmtime(time.time() - 200_000))
+    body = {"log": str(log), "from": begin, "where": ["ENTRYDESC = 'it'"]}
+    status, _, answer = Api(agent).request("POST", "/api/v1/reports", body)
+    assert status == 200, answer
+    assert [row["ENTRYTIME"] for row in answer["rows"]] == stamps[::-1]
     assert agent.stop() == 0
 
 
