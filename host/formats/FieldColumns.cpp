@@ -32,7 +32,7 @@ FieldColumns::FieldColumns(const FormatDescription& description, ColumnTexts tex
                            std::shared_ptr<const TimePattern> times)
     : m_names(description.columns), m_texts(std::move(texts)), m_times(std::move(times)) {}
 
-bool FieldColumns::fill(const JsonColumns& found, EntryColumns& columns) const noexcept {
+bool FieldColumns::fill(const JsonColumns& found, TimeMemo& times, EntryColumns& columns) noexcept {
     columns.system = found.of(EntryColumn::system).value;
     columns.source = found.of(EntryColumn::source).value;
     columns.type = found.of(EntryColumn::type).value;
@@ -40,7 +40,7 @@ bool FieldColumns::fill(const JsonColumns& found, EntryColumns& columns) const n
     columns.description = found.of(EntryColumn::description).value;
     bool isTime = found.begin() == found.end();
     for (const JsonCandidate& candidate : found) {
-        isTime = m_times->read(candidate.value, columns) || isTime;
+        isTime = times.read(candidate.value, columns) || isTime;
         if (columns.hasTime) { // a time of day alone may be a duration
             break;
         }

@@ -12,6 +12,7 @@
 namespace zrm::host {
 
 struct FormatDescription;
+class TimeMemo;
 class TimePattern;
 
 /// How fields that have names fill the columns of an entry. Not changed after it was made; any
@@ -26,9 +27,12 @@ public:
     /// True if the description says what to show instead of texts of this column.
     bool exchanges(EntryColumn column) const noexcept { return m_texts.exchanges(column); }
 
-    /// Fills the columns with what was found. False if there are fields for the time, but none is
-    /// one.
-    bool fill(const JsonColumns& found, EntryColumns& columns) const noexcept;
+    /// What reads the times.
+    const std::shared_ptr<const TimePattern>& times() const noexcept { return m_times; }
+
+    /// Fills the columns with what was found, the time by `times`. False if there are fields for
+    /// the time, but none is one.
+    static bool fill(const JsonColumns& found, TimeMemo& times, EntryColumns& columns) noexcept;
     /// Exchanges texts and fills what is empty, the description with the entry.
     void complete(std::string_view entry, EntryColumns& columns) const noexcept;
 

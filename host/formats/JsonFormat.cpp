@@ -2,6 +2,7 @@
 
 #include "host/formats/FlatJson.h"
 #include "host/formats/FormatDescription.h"
+#include "host/formats/TimePattern.h"
 
 #include <cstring>
 #include <string_view>
@@ -39,7 +40,7 @@ std::string_view levelOf(const JsonColumns& columns) noexcept {
 class JsonFormat::JsonReader final : public Reader {
 public:
     explicit JsonReader(const JsonFormat& format)
-        : m_format(format), m_fields(format.m_columns.names()) {}
+        : m_format(format), m_fields(format.m_columns.names()), m_times(format.m_columns.times()) {}
 
     bool read(std::string_view entry, EntryColumns& columns) override {
         m_isTimeWrong = false;
@@ -47,7 +48,7 @@ public:
             return false;
         }
         const JsonColumns& found = m_fields.columns();
-        if (!m_format.m_columns.fill(found, columns)) {
+        if (!FieldColumns::fill(found, m_times, columns)) {
             nameTime(found.begin()->name->text);
             return false;
         }
@@ -85,6 +86,7 @@ private:
 
     const JsonFormat& m_format;
     FlatJson m_fields;
+    TimeMemo m_times;
     bool m_isTimeWrong = false;
     char m_timeReason[128]{};
     std::size_t m_timeReasonLength = 0;

@@ -2,6 +2,7 @@
 
 #include "host/formats/FormatDescription.h"
 #include "host/formats/KeyValuePairs.h"
+#include "host/formats/TimePattern.h"
 
 #include <string_view>
 #include <utility>
@@ -11,7 +12,8 @@ namespace zrm::host {
 
 class LogfmtFormat::LogfmtReader final : public Reader {
 public:
-    explicit LogfmtReader(const LogfmtFormat& format) : m_format(format) {
+    explicit LogfmtReader(const LogfmtFormat& format)
+        : m_format(format), m_times(format.m_columns.times()) {
         m_pairs.reserve(EntryFields::most);
     }
 
@@ -23,7 +25,7 @@ public:
         }
         JsonColumns found;
         findPairs(entry, found);
-        if (!m_format.m_columns.fill(found, columns)) {
+        if (!FieldColumns::fill(found, m_times, columns)) {
             m_reason = "the value of its time is not a time";
             return false;
         }
@@ -70,6 +72,7 @@ private:
     }
 
     const LogfmtFormat& m_format;
+    TimeMemo m_times;
     std::vector<KeyValuePairs::Pair> m_pairs; ///< those of m_entry
     std::string_view m_entry;  ///< that was read last; without data if its pairs are not all kept
     std::string m_description; ///< with its escapes resolved; grows to the longest one

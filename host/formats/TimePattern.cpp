@@ -2,6 +2,7 @@
 
 #include "host/formats/CommonTime.h"
 #include "host/formats/DirectiveTime.h"
+#include "host/formats/IsoShape.h"
 
 #include <algorithm>
 #include <array>
@@ -18,6 +19,7 @@ public:
 
     explicit NamedTime(Form form) noexcept : m_form(form) {}
 
+    bool readsIso() const noexcept override { return m_form != &CommonTime::epoch; }
     bool read(std::string_view text, EntryColumns& columns) const noexcept override {
         CommonTime time(text);
         const std::optional<TimeParts> parts = (time.*m_form)();
@@ -77,8 +79,7 @@ TimeMemo::TimeMemo(std::shared_ptr<const TimePattern> pattern) noexcept
     : m_pattern(std::move(pattern)) {}
 
 bool TimeMemo::read(std::string_view text, EntryColumns& columns) noexcept {
-    if (!text.empty() && text.size() == m_length &&
-        std::memcmp(text.data(), m_text, m_length) == 0) {
+    if (isRemembered(text)) {
         copyTime(m_columns, columns);
         return true;
     }
@@ -87,9 +88,26 @@ bool TimeMemo::read(std::string_view text, EntryColumns& columns) noexcept {
     }
     if (text.size() <= sizeof m_text) {
         m_length = text.copy(m_text, sizeof m_text);
+        const std::size_t behind = IsoShape::length;
+        const bool hasFraction = m_pattern->readsIso() && IsoShape::begins(text) &&
+                                 m_length > behind && (text[behind] == '.' || text[behind] == ',');
+        m_fraction = hasFraction ? behind + 1 : m_length;
         copyTime(columns, m_columns);
     }
     return true;
+}
+
+/// True if the text is the one that is remembered, but for the digits of its fraction.
+bool TimeMemo::isRemembered(std::string_view text) const noexcept {
+    if (text.empty() || text.size() != m_length ||
+        std::memcmp(text.data(), m_text, m_fraction) != 0) {
+        return false;
+    }
+    std::size_t at = m_fraction;
+    while (at < m_length && TimeCursor::isDigit(text[at]) && TimeCursor::isDigit(m_text[at])) {
+        ++at;
+    }
+    return std::memcmp(text.data() + at, m_text + at, m_length - at) == 0;
 }
 
 } // namespace zrm::host

@@ -31,12 +31,15 @@ public:
     /// time.
     virtual bool read(std::string_view text, EntryColumns& columns) const noexcept = 0;
 
+    /// True if times of the shape of IsoShape, with whatever fraction, are read as such.
+    virtual bool readsIso() const noexcept { return false; }
+
 protected:
     TimePattern() = default;
 };
 
 /// Reads times by a pattern and remembers the last one, since entries often come in the same
-/// second. One thread.
+/// second, of which the fraction does not matter. One thread.
 class TimeMemo {
 public:
     explicit TimeMemo(std::shared_ptr<const TimePattern> pattern) noexcept;
@@ -45,9 +48,13 @@ public:
     bool read(std::string_view text, EntryColumns& columns) noexcept;
 
 private:
+    bool isRemembered(std::string_view text) const noexcept;
+
     const std::shared_ptr<const TimePattern> m_pattern;
     char m_text[48]{}; ///< longer texts are not remembered
     std::size_t m_length = 0;
+    std::size_t m_fraction =
+        0;                  ///< where the digits of the fraction begin; the length if it has none
     EntryColumns m_columns; ///< of which the time counts
 };
 

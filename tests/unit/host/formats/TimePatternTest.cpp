@@ -322,4 +322,34 @@ TEST(TimeMemo, GivesTheTimeOfTheTextThatItIsAskedFor) {
     EXPECT_EQ(read("2026-11-19 10:00:09" + std::string(100, ' ')), 9);
 }
 
+/// What is read after another text must be what is read without it.
+void expectSameAfter(const char* pattern, std::string_view before, std::string_view text) {
+    const auto times = TimePattern::compile(pattern).value();
+    TimeMemo memo(times);
+    EntryColumns columns;
+    EXPECT_TRUE(memo.read(before, columns)) << before;
+    columns = {};
+    EntryColumns fresh;
+    EXPECT_EQ(memo.read(text, columns), times->read(text, fresh)) << text;
+    EXPECT_EQ(columns.hasTime, fresh.hasTime) << text;
+    EXPECT_EQ(columns.time.seconds(), fresh.time.seconds()) << text;
+    EXPECT_EQ(columns.offset, fresh.offset) << text;
+}
+
+TEST(TimeMemo, IgnoresOnlyTheFractionOfATime) {
+    constexpr std::string_view first = "2026-11-19T10:00:05.123Z";
+    for (const char* pattern : {"auto", "iso8601"}) {
+        for (const char* text :
+             {"2026-11-19T10:00:05.987Z", "2026-11-19T10:00:06.123Z", "2026-11-19T10:00:05.1234",
+              "2026-11-19T10:00:05.12+1", "2026-11-19T10:00:05.12xZ", "2026-11-19T10:00:05.987x",
+              "2026-11-19T10:00:05:987Z", "2026-11-19 10:00:05.987Z", "2026-11-19T10:00:05.98"}) {
+            expectSameAfter(pattern, first, text);
+        }
+        expectSameAfter(pattern, "2026-11-19 10:00:05,1 +0100", "2026-11-19 10:00:05,2 +0200");
+        expectSameAfter(pattern, "2026-11-19 10:00:05.1", "2026-11-19 10:00:05.x");
+        expectSameAfter(pattern, "2026-11-19 10:00:05", "2026-11-19 10:00:06");
+    }
+    expectSameAfter("%Y-%m-%d %H:%M:%S.%j", "2026-11-19 10:00:05.123", "2026-11-19 10:00:05.124");
+}
+
 } // namespace
