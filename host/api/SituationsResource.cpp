@@ -28,6 +28,8 @@ int statusOf(SituationRefusal::Reason reason) {
     case SituationRefusal::FROM_FILE:
     case SituationRefusal::TOO_MANY:
         return 409;
+    case SituationRefusal::CHANGED:
+        return 412;
     case SituationRefusal::NOT_SAVED:
     case SituationRefusal::BUSY:
         break;
@@ -111,6 +113,7 @@ HttpAnswer SituationsResource::add(const HttpRequest& request) {
 HttpAnswer SituationsResource::replace(const HttpRequest& request) {
     const std::string& name = request.captures.front();
     JsonFields fields(request.body);
+    const std::optional<std::string> version = fields.optionalText("version");
     const SituationConfig situation = SituationBody::situation(fields, name);
     if (situation.name != name) {
         throw RequestRefused(400,
@@ -118,7 +121,7 @@ HttpAnswer SituationsResource::replace(const HttpRequest& request) {
                              "and remove this one",
                              "name");
     }
-    return answerOf(m_situations.replace(situation));
+    return answerOf(m_situations.replace(situation, version));
 }
 
 HttpAnswer SituationsResource::remove(const HttpRequest& request) {

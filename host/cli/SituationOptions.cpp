@@ -74,6 +74,7 @@ Json SituationOptions::subject(const std::string& name, const std::string& file)
     }
     // Before the list begins: an exception inside one may leak memory.
     Json definition = withoutState(fileContent(file));
+    definition.erase("version");
     return {{"definition", std::move(definition)}};
 }
 

@@ -22,7 +22,8 @@ public:
     void addTo(CLI::App& command);
 
     /// The definition from --file, or else `base`, with the members set by options; an option with
-    /// an empty value removes its member. Throws CliError when the file cannot be used.
+    /// an empty value removes its member. Has the version of where it comes from. Throws CliError
+    /// when the file cannot be used.
     Json definition(const Json& base) const;
 
     /// The subject of a request: a situation by name, or a definition from a file. Throws CliError

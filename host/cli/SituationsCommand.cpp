@@ -158,6 +158,7 @@ CliStatus SituationsCommand::show(Context& context) {
 
 CliStatus SituationsCommand::add(Context& context) {
     Json body = m_options.definition(Json::object());
+    body.erase("version"); // of the situation that a file was made from
     body["name"] = m_name;
     return done(context, context.client().send("POST", route, body), "added");
 }
@@ -186,6 +187,7 @@ CliStatus SituationsCommand::stop(Context& context) {
 
 CliStatus SituationsCommand::validate(Context& context) {
     Json body = m_options.definition(Json::object());
+    body.erase("version");
     body["name"] = m_name;
     const Json answer = context.client().send("POST", route + "/validate", body);
     const Json& problems = JsonText::member(answer, "problems");

@@ -12,7 +12,7 @@ namespace zrm::host {
 
 namespace {
 
-constexpr std::array<std::pair<int, const char*>, 16> titles = {{
+constexpr std::array<std::pair<int, const char*>, 17> titles = {{
     {400, "Bad Request"},
     {401, "Unauthorized"},
     {403, "Forbidden"},
@@ -20,6 +20,7 @@ constexpr std::array<std::pair<int, const char*>, 16> titles = {{
     {405, "Method Not Allowed"},
     {408, "Request Timeout"},
     {409, "Conflict"},
+    {412, "Precondition Failed"},
     {413, "Content Too Large"},
     {414, "URI Too Long"},
     {415, "Unsupported Media Type"},

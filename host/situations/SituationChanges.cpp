@@ -1,6 +1,7 @@
 // The changes of the situations through the API.
 #include "base/TraceScope.h"
 #include "host/config/ConditionBuilder.h"
+#include "host/situations/SituationJson.h"
 #include "host/situations/SituationSet.h"
 
 #include <algorithm>
@@ -26,6 +27,13 @@ tl::unexpected<SituationRefusal> fromFile(const std::string& name) {
                       "' belongs to the configuration file: change it there, which takes effect at "
                       "once, or stop it",
                   "name");
+}
+
+tl::unexpected<SituationRefusal> changedMeanwhile(const std::string& name) {
+    return refuse(SituationRefusal::CHANGED,
+                  "somebody has changed the situation '" + name +
+                      "' since you read it: read it again, and repeat your change",
+                  "version");
 }
 
 tl::unexpected<SituationRefusal> missing(bool isInFile, const std::string& name) {
@@ -97,7 +105,8 @@ SituationSet::Change SituationSet::add(const SituationConfig& config) {
     }));
 }
 
-SituationSet::Change SituationSet::replace(const SituationConfig& config) {
+SituationSet::Change SituationSet::replace(const SituationConfig& config,
+                                           const std::optional<std::string>& version) {
     return statusAfter(change([&](Draft& draft) -> Changed {
         const Key key{apiSource, config.name};
         const auto found = draft.records.find(key);
@@ -105,6 +114,9 @@ SituationSet::Change SituationSet::replace(const SituationConfig& config) {
             return missing(named(draft.records, config.name) != nullptr, config.name);
         }
         Record& record = found->second;
+        if (version && *version != SituationJson::version(record.config)) {
+            return changedMeanwhile(config.name);
+        }
         if (record.config != config || !record.problem.empty()) {
             Record exchanged{config};
             exchanged.isStopped = record.isStopped;

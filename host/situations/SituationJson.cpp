@@ -3,7 +3,12 @@
 #include "host/base/TimeText.h"
 #include "host/situations/SituationSet.h"
 
+#include <cinttypes>
 #include <cstddef>
+#include <cstdint>
+#include <cstdio>
+
+#include <xxhash.h>
 
 #include <nlohmann/json.hpp>
 
@@ -35,8 +40,17 @@ Json SituationJson::definition(const SituationConfig& situation) {
             {"labels", situation.labels}};
 }
 
+std::string SituationJson::version(const SituationConfig& situation) {
+    const std::string content = text(definition(situation));
+    char hash[17];
+    std::snprintf(hash, sizeof hash, "%016" PRIx64,
+                  std::uint64_t{XXH3_64bits(content.data(), content.size())});
+    return hash;
+}
+
 Json SituationJson::status(const SituationStatus& status) {
     Json object = definition(status.config);
+    object["version"] = version(status.config);
     object["source"] = sources[static_cast<std::size_t>(status.source)];
     object["state"] = states[static_cast<std::size_t>(status.state)];
     object["problem"] = status.problem.empty() ? Json() : Json(status.problem);

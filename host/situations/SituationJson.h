@@ -17,7 +17,10 @@ public:
     /// The fields of a situation as written; null for one that was left out.
     static nlohmann::ordered_json definition(const SituationConfig& situation);
 
-    /// The same with the state of the situation.
+    /// Sixteen characters that change with the definition, and that every run gives it.
+    static std::string version(const SituationConfig& situation);
+
+    /// The definition with its version and the state of the situation.
     static nlohmann::ordered_json status(const SituationStatus& status);
 
     /// A value as text; bytes that are not UTF-8 are replaced.

@@ -48,6 +48,7 @@ struct SituationRefusal {
         UNKNOWN,   ///< there is none of this name
         EXISTS,    ///< the name is taken
         FROM_FILE, ///< the situation belongs to the configuration file
+        CHANGED,   ///< the situation is not the one that was to be changed
         TOO_MANY,
         NOT_SAVED, ///< the change could not be saved
         BUSY,      ///< other changes take too long
@@ -97,8 +98,10 @@ public:
     // Changes through the API.
 
     Change add(const SituationConfig& config);
-    /// Replaces the one with this name, which starts over if the definition differs.
-    Change replace(const SituationConfig& config);
+    /// Replaces the one with this name, which starts over if the definition differs. If the caller
+    /// names the version (SituationJson::version) that it knows, it must be the current one.
+    Change replace(const SituationConfig& config,
+                   const std::optional<std::string>& version = std::nullopt);
     Result<void, SituationRefusal> remove(const std::string& name);
     /// For situations of either source. Starting a failed one tries again.
     Change start(const std::string& name);

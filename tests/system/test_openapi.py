@@ -111,6 +111,7 @@ EXAMPLES = [
     ("GET", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", None, 200),
     ("GET", "/api/v1/situations/{name}", "/api/v1/situations/none", None, 404),
     ("PUT", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", DEFINITION, 200),
+    ("PUT", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", {**DEFINITION, "version": "0"}, 412),
     ("POST", "/api/v1/situations/{name}/stop", "/api/v1/situations/made%2Fhere/stop", None, 200),
     ("POST", "/api/v1/situations/{name}/start", "/api/v1/situations/made%2Fhere/start", None, 200),
     ("POST", "/api/v1/explain", None, {"situation": "every-entry", "last": 2}, 200),

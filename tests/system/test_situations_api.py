@@ -27,6 +27,7 @@ def test_a_situation_is_created_raises_events_and_is_removed(running):
         "context": 0,
         "runbook": None,
         "labels": {},
+        "version": made["version"],
         "source": "api",
         "state": "running",
         "problem": None,
@@ -208,3 +209,25 @@ def test_validation_names_every_problem(running):
     good = {"name": "a", "when": ["ENTRYSRC = 'x'"]}
     assert api.send("POST", SITUATIONS + "/validate", good)[1] == {"problems": []}
     assert api.list() == []
+
+
+def test_the_second_of_two_operators_who_change_a_situation_is_told(running):
+    api = running.situations_api
+    made = api.add("disk", log=str(running.watched.path), severity="minor")
+    assert made["version"] == api.get("disk")["version"]
+    change = {"log": made["log"], "version": made["version"]}
+    status, first = api.send("PUT", path("disk"), {**change, "severity": "major"})
+    assert status == 200 and first["version"] != made["version"]
+    status, answer = api.send("PUT", path("disk"), {**change, "severity": "critical"})
+    assert (status, answer["field"]) == (412, "version")
+    assert answer["detail"].startswith("somebody has changed the situation 'disk' since you read it")
+    assert api.get("disk")["severity"] == "major"
+    assert running.stop() == 0
+    running.start()
+    api = Situations(running)
+    assert api.get("disk")["version"] == first["version"], "of every run"
+    status, _ = api.send("PUT", path("disk"), {**change, "version": first["version"], "severity": "info"})
+    assert status == 200
+    status, _ = api.send("PUT", path("disk"), {"log": made["log"], "severity": "major"})
+    assert status == 200, "who names no version replaces whatever is there"
+    assert api.send("POST", SITUATIONS, {**change, "name": "other"})[0] == 400

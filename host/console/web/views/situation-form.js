@@ -52,6 +52,7 @@ class Form {
   constructor(element, name, situation, logs, columns) {
     this.name = name;
     this.labels = situation.labels; // not edited here, and not to be lost
+    this.version = situation.version;
     const changed = () => this.changed();
     if (situation.log && !logs.includes(situation.log)) logs.unshift(situation.log);
     this.fields = {
@@ -297,7 +298,9 @@ class Form {
     }
     this.save.disabled = true;
     try {
-      if (this.name) await request("PUT", situationPath(this.name), this.definition);
+      // Refused if somebody else has changed it since.
+      const change = { ...this.definition, version: this.version };
+      if (this.name) await request("PUT", situationPath(this.name), change);
       else await post("/api/v1/situations", this.definition);
       location.hash = `#/situations?name=${encodeURIComponent(name)}`;
     } catch (error) {

@@ -1,6 +1,7 @@
 // The situations as the API sees and changes them.
 
 #include "host/config/SituationValidator.h"
+#include "host/situations/SituationJson.h"
 #include "host/situations/SituationSet.h"
 
 #include "host/events/EventQueue.h"
@@ -187,6 +188,23 @@ TEST_F(SituationChanges, ARemovedSituationOfTheFileIsForgottenEvenWhenThatCannot
     begin();
     set->apply({situation("filed")});
     EXPECT_EQ(set->find("filed")->state, SituationStatus::RUNNING);
+}
+
+TEST_F(SituationChanges, AReplacementOfAnotherVersionIsRefused) {
+    set->add(situation("a"));
+    const std::string first = SituationJson::version(situation("a"));
+    EXPECT_EQ(refused(set->replace(situation("a", {}, "major"), "0123456789abcdef")),
+              SituationRefusal::CHANGED);
+    EXPECT_EQ(done(set->replace(situation("a", {}, "major"), first)).config.severity, "major");
+    const auto second = set->replace(situation("a", {}, "critical"), first);
+    EXPECT_EQ(refused(second), SituationRefusal::CHANGED);
+    EXPECT_EQ(second.error().problem.field, "version");
+    EXPECT_EQ(set->find("a")->config.severity, "major");
+    begin();
+    set->load();
+    const std::string now = SituationJson::version(situation("a", {}, "major"));
+    EXPECT_NE(now, first);
+    EXPECT_EQ(done(set->replace(situation("a", {}, "info"), now)).config.severity, "info");
 }
 
 TEST_F(SituationChanges, AreRefusedWithTheReason) {
