@@ -1,7 +1,6 @@
 #include "host/api/AgentResource.h"
 
 #include "base/TraceScope.h"
-#include "framework/agent_calls.h"
 #include "host/base/JsonWriter.h"
 #include "host/base/TimeText.h"
 #include "host/config/Columns.h"
@@ -15,6 +14,7 @@
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
+#include "host/silences/AgentNode.h"
 
 #include <chrono>
 #include <string>
@@ -30,12 +30,6 @@ TRC1_Anchor anchor{"AgentResource.cpp"};
 
 constexpr std::size_t longestLevels = 4096; ///< bytes
 constexpr int tracedLevels = 200;           ///< bytes of the levels shown in the trace
-
-std::string node() {
-    char name[128] = "";
-    DetermineLocalHost(name, sizeof name);
-    return name;
-}
 
 void writeHistory(JsonWriter& json, Delivery& delivery) {
     HistoryReader* const reader = delivery.history();
@@ -145,7 +139,7 @@ void AgentResource::addRoutes(Router& router) {
 HttpAnswer AgentResource::status(const HttpRequest& request) {
     QueryFields(request).refuseUnknown();
     return HttpAnswer::json(JsonWriter::text([this](JsonWriter& json) {
-        json.beginObject().member("version", ZRM_VERSION).member("node", node());
+        json.beginObject().member("version", ZRM_VERSION).member("node", AgentNode::name());
         json.key("started").time(m_started).key("time").time(WallClock::now());
         json.key("history");
         writeHistory(json, m_delivery);

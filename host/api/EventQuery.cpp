@@ -31,6 +31,12 @@ void EventQuery::readKinds(QueryFields& query, EventFilter& filter) {
     filter.situations = query.texts("situation");
     filter.logs = query.texts("log");
     filter.severities = query.texts("severity");
+    if (const auto silenced = query.text("silenced")) {
+        if (*silenced != "true" && *silenced != "false") {
+            throw RequestRefused(400, "write true or false", "silenced");
+        }
+        filter.silenced = *silenced == "true";
+    }
     filter.text = query.text("text").value_or("");
     if (filter.text.size() > longestText) {
         throw RequestRefused(400, "write at most 256 bytes", "text");

@@ -25,7 +25,7 @@ public:
     }
 
     /// Reads which events are wanted: situation, log and severity, each any number of times, of
-    /// which one must hold, and the text that they must have.
+    /// which one must hold, whether they are silenced, and the text that they must have.
     static void readKinds(QueryFields& query, EventFilter& filter);
 };
 

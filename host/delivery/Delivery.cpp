@@ -2,7 +2,7 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
-#include "host/events/QueueSource.h"
+#include "host/delivery/QueueSource.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/history/HistoryDirectory.h"
 #include "host/sinks/SinkFactory.h"
@@ -76,7 +76,7 @@ Delivery::~Delivery() {
 
 std::unique_ptr<EventSource> Delivery::source(const SinkConfig& sink) {
     if (m_history == nullptr) {
-        return std::make_unique<QueueSource>(m_queue, m_format);
+        return std::make_unique<QueueSource>(m_queue, m_format, m_unkeptSilences, m_sinks.empty());
     }
     return m_history->source(sink.type + ':' + sink.name, sink.name);
 }

@@ -6,6 +6,7 @@
 #include "host/events/EventQueue.h"
 #include "host/framework/RowLayout.h"
 #include "host/history/History.h"
+#include "host/silences/Silences.h"
 
 #include <memory>
 #include <string>
@@ -54,6 +55,11 @@ public:
     /// Why there is no history although one is configured; otherwise empty.
     const std::string& historyProblem() const noexcept { return m_historyProblem; }
 
+    /// The silences: the history's, or without one those of this run.
+    Silences& silences() noexcept {
+        return m_history == nullptr ? m_unkeptSilences : m_history->silences();
+    }
+
     /// The state of the queue.
     QueueState queueState() const { return m_queue.state(); }
 
@@ -67,6 +73,7 @@ private:
     const EventJson m_format;
     const std::string m_historyProblem;
     const std::unique_ptr<History> m_history; ///< null: off
+    Silences m_unkeptSilences;                ///< while there is no history
     EventQueue m_queue;
     const std::shared_ptr<PositionBook> m_positions;
     std::vector<std::unique_ptr<SinkThread>> m_sinks;

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <exception>
+#include <iterator>
 #include <optional>
 #include <utility>
 
@@ -45,7 +46,7 @@ void SinkThread::run() {
         if (events.empty()) {
             break;
         }
-        const std::size_t delivered = deliver(events);
+        const std::size_t delivered = deliverAudible(events);
         m_source->release(delivered);
         if (delivered < events.size() && !m_giveUp.stop_requested()) {
             pause();
@@ -67,6 +68,24 @@ std::size_t SinkThread::offer(std::span<const EventRecord> events) {
         m_exception = exception.what();
         return 0;
     }
+}
+
+/// Passes over what is silenced. Returns how many of the events are done with.
+std::size_t SinkThread::deliverAudible(std::span<const EventRecord> events) {
+    const auto isSilenced = [](const EventRecord& event) { return event.silence != 0; };
+    if (std::none_of(events.begin(), events.end(), isSilenced)) {
+        return deliver(events);
+    }
+    m_audible.clear();
+    std::remove_copy_if(events.begin(), events.end(), std::back_inserter(m_audible), isSilenced);
+    const std::size_t delivered = m_audible.empty() ? 0 : deliver(m_audible);
+    if (delivered == m_audible.size()) {
+        return events.size();
+    }
+    const std::uint64_t next = m_audible[delivered].id;
+    const auto end = std::find_if(events.begin(), events.end(),
+                                  [next](const EventRecord& event) { return event.id == next; });
+    return static_cast<std::size_t>(end - events.begin());
 }
 
 std::size_t SinkThread::deliver(std::span<const EventRecord> events) {

@@ -17,6 +17,7 @@
 #include <stop_token>
 #include <string>
 #include <thread>
+#include <vector>
 
 namespace zrm::host {
 
@@ -46,8 +47,8 @@ struct SinkState {
 };
 
 /// Delivers events from their source to one sink on its own thread. A failed delivery is retried
-/// after growing pauses and nothing is skipped: while a sink is down, its events stay in the
-/// source.
+/// after growing pauses: while a sink is down, its events stay in the source. Nothing is skipped
+/// but what a silence holds back.
 class SinkThread {
 public:
     using Clock = std::chrono::steady_clock;
@@ -80,6 +81,7 @@ public:
 private:
     void run();
     std::size_t deliver(std::span<const EventRecord> events);
+    std::size_t deliverAudible(std::span<const EventRecord> events);
     std::size_t offer(std::span<const EventRecord> events);
     std::string error() const { return m_exception.empty() ? m_sink->error() : m_exception; }
     void note(std::size_t delivered, bool failed);
@@ -91,7 +93,8 @@ private:
     const std::unique_ptr<Sink> m_sink;
     const std::string m_type;
     RetryPause m_pause;
-    std::string m_exception; ///< what the last delivery threw; empty if nothing
+    std::vector<EventRecord> m_audible; ///< of the last read: those that no silence holds back
+    std::string m_exception;            ///< what the last delivery threw; empty if nothing
 
     mutable std::mutex m_mutex; ///< guards the members below
     std::condition_variable m_changed;

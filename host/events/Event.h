@@ -64,6 +64,7 @@ struct EventRecord {
     std::string_view log;       ///< the monitored log's full path
     std::string_view json;      ///< the event as one JSON object, on one line, without a newline
     std::string_view text = {}; ///< the situation's description for people; may be empty
+    std::uint64_t silence = 0;  ///< the silence that keeps it from the sinks; 0: none
 };
 
 } // namespace zrm::host

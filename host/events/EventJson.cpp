@@ -9,7 +9,7 @@ namespace zrm::host {
 
 EventJson::EventJson(RowLayout layout) : m_layout(std::move(layout)), m_row(m_layout) {}
 
-void EventJson::append(std::string& text, const Event& event) const {
+void EventJson::append(std::string& text, const Event& event, std::uint64_t silence) const {
     JsonWriter::append(text, [&](JsonWriter& json) {
         json.beginObject();
         json.member("id", event.id);
@@ -17,6 +17,9 @@ void EventJson::append(std::string& text, const Event& event) const {
         json.key(m_severityKey).value(event.situation->severity);
         json.key(m_raisedKey).time(event.raised);
         writeExtras(json, event);
+        if (silence != 0) {
+            json.member("silenced", silence);
+        }
         if (event.judgement != nullptr) {
             writeJudgement(json, event);
         }

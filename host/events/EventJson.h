@@ -5,6 +5,7 @@
 #include "host/events/RowJson.h"
 #include "host/framework/RowLayout.h"
 
+#include <cstdint>
 #include <string>
 
 namespace zrm::host {
@@ -12,14 +13,15 @@ namespace zrm::host {
 /// Writes events as JSON objects: {"id", "situation", "severity", "raised", "row"}, and for the log
 /// of a [[log]] table also {"fields", "entry", "entry_cut", "context"} where there is such a thing.
 /// What judges groups and episodes adds {"state", "episode", "count", "group", "reason"}, and the
-/// situation {"text", "runbook", "labels"}. An event without a row has {"log", "node"} instead.
-/// Immutable, so any thread.
+/// situation {"text", "runbook", "labels"}. An event without a row has {"log", "node"} instead. An
+/// event that a silence holds back has its id, {"silenced"}. Immutable, so any thread.
 class EventJson {
 public:
     explicit EventJson(RowLayout layout);
 
-    /// Appends one event's object, without a newline.
-    void append(std::string& text, const Event& event) const;
+    /// Appends one event's object, without a newline. `silence`: the one that holds it back; 0:
+    /// none.
+    void append(std::string& text, const Event& event, std::uint64_t silence = 0) const;
 
     /// Appends the full path of the event's log, directory and name, as UTF-8. If the UTF-8 columns
     /// are empty, uses the ones in the log's own code page.

@@ -21,8 +21,9 @@ public:
     void reserve(std::size_t bytes) { m_events->reserve(bytes); }
 
     /// Adds events from the queue as far as they end an entry, or all of them if none does. Returns
-    /// their number.
-    std::size_t add(std::span<const Event> events, const EventJson& format);
+    /// their number. A null silencer holds nothing back.
+    std::size_t add(std::span<const Event> events, const EventJson& format,
+                    Silencer* silencer = nullptr);
 
     /// Whether the events end an entry, so that they may be stored.
     bool isWhole() const noexcept { return m_isWhole; }

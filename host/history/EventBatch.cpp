@@ -1,5 +1,9 @@
 #include "host/history/EventBatch.h"
 
+#include "host/silences/Silencer.h"
+
+#include <algorithm>
+
 namespace zrm::host {
 
 EventBatch::Piece EventBatch::sameOr(std::string_view text, Piece Places::*which) {
@@ -11,7 +15,7 @@ EventBatch::Piece EventBatch::sameOr(std::string_view text, Piece Places::*which
     return pieceFrom(begin);
 }
 
-void EventBatch::add(const Event& event, const EventJson& format) {
+void EventBatch::add(const Event& event, const EventJson& format, Silencer* silencer) {
     Places places;
     places.situation = sameOr(event.situation->name, &Places::situation);
     places.severity = sameOr(event.situation->severity, &Places::severity);
@@ -23,11 +27,12 @@ void EventBatch::add(const Event& event, const EventJson& format) {
         m_text.resize(log);
         places.log = m_places.back().log;
     }
+    const std::uint64_t silence = silencer == nullptr ? 0 : silencer->of(event, at(places.log));
     const std::size_t json = m_text.size();
-    format.append(m_text, event);
+    format.append(m_text, event, silence);
     places.json = pieceFrom(json);
     m_places.push_back(places);
-    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}});
+    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}, silence});
 }
 
 void EventBatch::add(const EventRecord& event) {
@@ -40,7 +45,25 @@ void EventBatch::add(const EventRecord& event) {
     m_text += event.json;
     places.json = pieceFrom(json);
     m_places.push_back(places);
-    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}});
+    m_records.push_back({event.id, event.raised, {}, {}, {}, {}, {}, event.silence});
+}
+
+std::vector<SilencedEvents> EventBatch::silenced() const {
+    std::vector<SilencedEvents> counts;
+    for (const EventRecord& event : m_records) {
+        if (event.silence == 0) {
+            continue;
+        }
+        auto found = std::find_if(counts.begin(), counts.end(), [&](const SilencedEvents& count) {
+            return count.silence == event.silence;
+        });
+        if (found == counts.end()) {
+            found = counts.insert(found, {event.silence, 0, 0});
+        }
+        ++found->events;
+        found->last = std::max(found->last, event.raised);
+    }
+    return counts;
 }
 
 void EventBatch::seal() {

@@ -3,6 +3,7 @@
 
 #include "host/events/Event.h"
 #include "host/events/EventJson.h"
+#include "host/silences/Silences.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -12,6 +13,8 @@
 #include <vector>
 
 namespace zrm::host {
+
+class Silencer;
 
 /// Consecutive events with their texts in one block of memory. Filled by one thread; once sealed it
 /// no longer changes and any thread may read it.
@@ -24,8 +27,9 @@ public:
     /// Reserves memory for texts of this total size.
     void reserve(std::size_t bytes) { m_text.reserve(bytes); }
 
-    /// Adds one event from the queue, rendered as JSON. Not after seal.
-    void add(const Event& event, const EventJson& format);
+    /// Adds one event from the queue, rendered as JSON. A null silencer holds nothing back. Not
+    /// after seal.
+    void add(const Event& event, const EventJson& format, Silencer* silencer = nullptr);
 
     /// Adds a copy of one event. Not after seal.
     void add(const EventRecord& event);
@@ -35,6 +39,9 @@ public:
 
     /// The events; only after seal. Valid as long as the batch.
     std::span<const EventRecord> records() const noexcept { return m_records; }
+
+    /// How many of the events each silence holds back; only after seal.
+    std::vector<SilencedEvents> silenced() const;
 
     std::size_t size() const noexcept { return m_records.size(); }
     bool empty() const noexcept { return m_records.empty(); }

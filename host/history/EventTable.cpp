@@ -20,7 +20,7 @@ std::int64_t eventChecksum(std::int64_t id, std::int64_t raised, std::int64_t la
 namespace {
 
 /// The columns of StoredEventRow::select.
-enum class Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, LABEL, CHECKSUM };
+enum class Column { ID, RAISED, SITUATION, SEVERITY, LOG, JSON, TEXT, SILENCE, LABEL, CHECKSUM };
 
 std::int64_t integer(const Statement& row, Column column) {
     return row.integer(static_cast<int>(column));
@@ -33,7 +33,8 @@ std::string_view text(const Statement& row, Column column) {
 } // namespace
 
 const char* const StoredEventRow::select =
-    "SELECT events.id, raised, situation, severity, path, json, text, label, checksum FROM events"
+    "SELECT events.id, raised, situation, severity, path, json, text, silence, label,"
+    " checksum FROM events"
     " LEFT JOIN labels ON labels.id = label LEFT JOIN logs ON logs.id = log WHERE ";
 
 EventRecord StoredEventRow::record() const {
@@ -43,7 +44,8 @@ EventRecord StoredEventRow::record() const {
             text(m_row, Column::SEVERITY),
             text(m_row, Column::LOG),
             text(m_row, Column::JSON),
-            text(m_row, Column::TEXT)};
+            text(m_row, Column::TEXT),
+            static_cast<std::uint64_t>(integer(m_row, Column::SILENCE))};
 }
 
 bool StoredEventRow::isIntact() const {

@@ -43,6 +43,16 @@ PositionValues positionsOfCorrupt(const std::string& path) {
     }
 }
 
+/// The silences in a file about to be moved aside, if they can be read.
+std::vector<Silence> silencesOfCorrupt(const std::string& path) {
+    try {
+        Database database(path, Database::Use::READ);
+        return SilenceTable::read(database).silences;
+    } catch (const DatabaseError&) {
+        return {};
+    }
+}
+
 /// The id after which a file with this newest event continues: if the file is new or an older copy,
 /// ids used since then are not reused.
 std::uint64_t newestWith(const HistoryDirectory& directory, std::uint64_t newest) {
@@ -73,11 +83,13 @@ Result<std::unique_ptr<HistoryFile>> openOrReplace(const HistoryDirectory& direc
             }
             const std::uint64_t newest = newestOfCorrupt(directory.file());
             const PositionValues positions = positionsOfCorrupt(directory.file());
+            const std::vector<Silence> silences = silencesOfCorrupt(directory.file());
             if (const Result<void> moved = directory.moveAside(error.what()); !moved) {
                 return tl::unexpected(moved.error());
             }
             auto file = open(newest);
             file->keepPositions(positions);
+            file->keepSilences(silences);
             return file;
         }
     } catch (const SchemaTooNew& error) {
@@ -108,9 +120,12 @@ History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> 
                  std::unique_ptr<HistoryFile> file)
     : m_directory(std::move(directory)), m_recent(bytesInMemory, file->newest()),
       m_readers(m_directory->file()),
-      m_positions(std::make_shared<PositionBook>(file->positions(), true)), m_file(*file),
-      m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors,
-               *m_positions) {}
+      m_positions(std::make_shared<PositionBook>(file->positions(), true)),
+      m_silences(file->silences()), m_file(*file),
+      m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors, *m_positions,
+               m_silences) {
+    m_silences.storeWith([this](const Silence& silence) { return keep(silence); });
+}
 
 History::~History() {
     m_recent.end();
@@ -154,6 +169,11 @@ void History::finish(HistoryWriter::Clock::time_point limit) {
             m_directory->file().c_str(), m_writer.problem().c_str(),
             hasFollowed ? "; entries of [[log]] logs are read again at the next start" : "");
     }
+}
+
+/// The writer may have been told to wait no longer when it makes the change: it needs a copy.
+Result<void> History::keep(const Silence& silence) {
+    return m_writer.change([silence](HistoryFile& file) { file.keepSilences({silence}); });
 }
 
 template <class Work>

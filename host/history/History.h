@@ -11,6 +11,7 @@
 #include "host/history/HistoryWriter.h"
 #include "host/history/ReaderPool.h"
 #include "host/history/RecentEvents.h"
+#include "host/silences/Silences.h"
 
 #include <cstdint>
 #include <memory>
@@ -41,6 +42,9 @@ public:
     /// The positions of followed logs, as they were stored and as they move.
     const std::shared_ptr<PositionBook>& positions() const noexcept { return m_positions; }
 
+    /// The silences, as they were stored and as they change.
+    Silences& silences() noexcept { return m_silences; }
+
     /// The paths of the logs of which it has events or counts of entries. Empty if it cannot be
     /// read.
     std::set<std::string> logs();
@@ -69,6 +73,7 @@ public:
 private:
     History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
             std::unique_ptr<HistoryFile> file);
+    Result<void> keep(const Silence& silence);
     template <class Work>
     auto reading(Work&& work) -> Result<std::invoke_result_t<Work, Database&>>;
     void noteDamage(const std::vector<std::uint64_t>& events);
@@ -78,6 +83,7 @@ private:
     ReaderPool m_readers;
     Cursors m_cursors;
     const std::shared_ptr<PositionBook> m_positions;
+    Silences m_silences;
     HistoryFile& m_file; ///< the writer's, before start
     HistoryWriter m_writer;
     bool m_toldOfRest = false; ///< what could not be stored was said

@@ -51,8 +51,8 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
-      m_cursors(m_database), m_positions(m_database), m_rates(m_database), m_files(path),
-      m_oldest(m_events.oldest()),
+      m_cursors(m_database), m_positions(m_database), m_rates(m_database), m_silences(m_database),
+      m_files(path), m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
@@ -89,6 +89,9 @@ void HistoryFile::putEvents(const EventBatch& batch) {
     m_events.append(batch.records(), m_labelIds);
     for (const auto& [key, count] : counts) {
         m_rates.add(key.first, key.second, 0, count);
+    }
+    for (const SilencedEvents& silenced : batch.silenced()) {
+        m_silences.count(silenced);
     }
 }
 
@@ -138,6 +141,18 @@ std::vector<std::string> HistoryFile::removeOldPositions(std::int64_t time) {
     std::vector<std::string> logs;
     inTransaction([&] { logs = m_positions.removeNotedBefore(time); });
     return logs;
+}
+
+void HistoryFile::keepSilences(const std::vector<Silence>& silences) {
+    inTransaction([&] {
+        for (const Silence& silence : silences) {
+            m_silences.keep(silence);
+        }
+    });
+}
+
+void HistoryFile::removeSilences(const std::vector<std::uint64_t>& ids) {
+    inTransaction([&] { m_silences.remove(ids); });
 }
 
 void HistoryFile::addEntries(const std::vector<MinuteCounts>& minutes) {

@@ -9,6 +9,7 @@
 #include "host/history/OpenFiles.h"
 #include "host/history/PositionTable.h"
 #include "host/history/RateTable.h"
+#include "host/history/SilenceTable.h"
 
 #include <cstdint>
 #include <map>
@@ -39,8 +40,8 @@ public:
     /// Makes the ids of a history without events start after this one.
     void continueAfter(std::uint64_t id);
 
-    /// Stores events, whose ids follow the newest, their part of the rates, cursors, and the
-    /// positions behind the events' entries.
+    /// Stores events, whose ids follow the newest, their part of the rates and of the silences'
+    /// counts, cursors, and the positions behind the events' entries.
     void store(const EventBatch& batch, const std::vector<CursorValue>& cursors,
                const std::vector<PositionValue>& positions = {});
 
@@ -54,6 +55,11 @@ public:
     /// Removes the positions of logs last followed before this time (milliseconds since 1970), and
     /// returns their names. Also removes the paths last watched before it.
     std::vector<std::string> removeOldPositions(std::int64_t time);
+
+    /// Stores silences. One that is there keeps its count of events, which store adds to.
+    void keepSilences(const std::vector<Silence>& silences);
+    void removeSilences(const std::vector<std::uint64_t>& ids);
+    KeptSilences silences() { return SilenceTable::read(m_database); }
 
     /// Adds the entries of minutes that are over.
     void addEntries(const std::vector<MinuteCounts>& minutes);
@@ -91,6 +97,7 @@ private:
     CursorTable m_cursors;
     PositionTable m_positions;
     RateTable m_rates;
+    SilenceTable m_silences;
     const OpenFiles m_files;
     std::uint64_t m_oldest = 0;
     std::uint64_t m_newest = 0;

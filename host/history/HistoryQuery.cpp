@@ -70,7 +70,8 @@ void HistoryQuery::narrowToTime() {
 }
 
 bool HistoryQuery::hasLabelFilter() const noexcept {
-    return !m_filter.situations.empty() || !m_filter.logs.empty() || !m_filter.severities.empty();
+    return !m_filter.situations.empty() || !m_filter.logs.empty() || !m_filter.severities.empty() ||
+           m_filter.silenced.has_value();
 }
 
 std::vector<std::int64_t> HistoryQuery::labels() {
@@ -84,6 +85,9 @@ std::vector<std::int64_t> HistoryQuery::labels() {
         if (!values->empty()) {
             sql += condition(column, values->size());
         }
+    }
+    if (m_filter.silenced) {
+        sql += *m_filter.silenced ? " AND silence <> 0" : " AND silence = 0";
     }
     Statement found(m_database, sql);
     int parameter = 0;

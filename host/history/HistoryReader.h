@@ -23,6 +23,7 @@ struct EventFilter {
     std::vector<std::string> situations = {};      ///< any of these names; empty: all
     std::vector<std::string> logs = {};            ///< any of these full paths; empty: all
     std::vector<std::string> severities = {};      ///< any of these; empty: all
+    std::optional<bool> silenced = std::nullopt;   ///< held back by a silence, or not
     std::string text = {};                         ///< text that EventText must find; empty: all
     std::size_t limit = 100;                       ///< the most events to return
     bool newestFirst = true; ///< true: by descending id; false: by ascending id

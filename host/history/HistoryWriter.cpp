@@ -2,8 +2,8 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
-#include "host/base/TimeText.h"
 #include "host/history/Schema.h"
+#include "host/silences/AgentNode.h"
 
 #include <algorithm>
 #include <cinttypes>
@@ -20,25 +20,18 @@ constexpr std::size_t batchSize = 512; ///< events per transaction, at most
 constexpr std::chrono::seconds givingUpTime{1};
 constexpr std::chrono::milliseconds firstPause{100};
 constexpr std::chrono::milliseconds longestPause{10'000};
-constexpr std::chrono::seconds housekeepingInterval{1};
-constexpr std::int64_t millisecondsPerDay = 24 * 60 * 60'000;
-
-/// How long the place of a sink that is no longer in the configuration is kept.
-constexpr int daysOfUnusedCursors = 30;
-constexpr std::chrono::hours tendingInterval{24};
 /// After the start; until then nobody knows which logs are still followed.
 constexpr std::chrono::minutes timeUntilLogsAreFollowed{1};
-
-/// Minutes of entries that are kept while they cannot be stored.
-constexpr std::size_t mostMinutes = 24 * 60;
 
 } // namespace
 
 HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                              std::unique_ptr<HistoryFile> file, RecentEvents& recent,
-                             ReaderPool& readers, Cursors& cursors, PositionBook& positions)
+                             ReaderPool& readers, Cursors& cursors, PositionBook& positions,
+                             Silences& silences)
     : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
-      m_readers(readers), m_cursors(cursors), m_positions(positions),
+      m_readers(readers), m_cursors(cursors), m_positions(positions), m_silences(silences),
+      m_silencer(silences, AgentNode::name()), m_requested([this] { m_queue->wake(); }),
       m_nextTendingOfPositions(Clock::now() + timeUntilLogsAreFollowed),
       m_pause(firstPause, longestPause), m_oldest(m_file->oldest()) {}
 
@@ -60,6 +53,7 @@ void HistoryWriter::run() {
     TraceScope trace(anchor);
     EntryBatch batch;
     for (;;) {
+        makeRequestedChanges();
         const auto now = Clock::now();
         const auto limit = m_hasMoreToDo ? now : now + housekeepingInterval;
         const std::span<const Event> events = m_queue->read(m_reader, batchSize, limit);
@@ -67,13 +61,13 @@ void HistoryWriter::run() {
             if (m_queue->ended(m_reader)) {
                 break;
             }
-            if (Clock::now() < limit) { // woken: a log has its first position
+            if (Clock::now() < limit) { // woken, perhaps because a log has its first position
                 m_nextHousekeeping = now;
             }
             housekeep(true);
             continue;
         }
-        const std::size_t added = batch.add(events, *m_format);
+        const std::size_t added = batch.add(events, *m_format, &m_silencer);
         if (!batch.isWhole()) {
             // An entry with more events than the queue gives at once: the rest is in the queue.
             m_taken += added;
@@ -87,11 +81,19 @@ void HistoryWriter::run() {
         m_taken = 0;
         housekeep(false);
     }
+    m_requested.end();
     {
         const std::lock_guard guard(m_mutex);
         m_ended = true;
     }
     m_changed.notify_all();
+}
+
+/// Where they cannot be made, whoever has asked for them hears it.
+void HistoryWriter::makeRequestedChanges() {
+    if (m_requested.areWaiting() && !attempt([&] { m_requested.run(*m_file); })) {
+        m_requested.refuseAll(problem());
+    }
 }
 
 /// Stores the batch, makes its events known, and begins the next. False when the end comes before
@@ -117,6 +119,7 @@ bool HistoryWriter::store(EntryBatch& batch) {
             return false;
         }
     }
+    m_silences.count(events->silenced());
     m_recent.publish(events);
     batch = EntryBatch();
     batch.reserve(events->textBytes() + events->textBytes() / 8);
@@ -125,7 +128,7 @@ bool HistoryWriter::store(EntryBatch& batch) {
 
 /// Does work on the file, which is opened or exchanged first where it must be. False when that
 /// failed.
-template <class Work> bool HistoryWriter::attempt(Work&& work) {
+bool HistoryWriter::attempt(const std::function<void()>& work) {
     try {
         if (const Result<void> opened = openFile(); !opened) {
             failed(opened.error().text());
@@ -160,6 +163,7 @@ Result<void> HistoryWriter::openFile() {
         return refused("the history's file was replaced");
     }
     m_file->continueAfter(m_recent.newest());
+    m_file->keepSilences(m_silences.list());
     reserveIds(std::max(m_reserved, m_recent.newest()));
     return {};
 }
@@ -246,98 +250,6 @@ void HistoryWriter::leaveRemovedFiles() {
                : "its files were removed or replaced while the agent ran; a new history follows");
 }
 
-void HistoryWriter::addEntries(MinuteCounts counts) {
-    const std::lock_guard guard(m_mutex);
-    if (m_minutes.size() < mostMinutes) {
-        m_minutes.push_back(std::move(counts));
-    }
-}
-
-void HistoryWriter::storeEntries() {
-    std::unique_lock lock(m_mutex);
-    const std::vector<MinuteCounts> minutes = m_minutes;
-    lock.unlock();
-    if (!minutes.empty()) {
-        m_file->addEntries(minutes);
-        lock.lock();
-        m_minutes.erase(m_minutes.begin(),
-                        m_minutes.begin() + static_cast<std::ptrdiff_t>(minutes.size()));
-    }
-}
-
-HistoryFile::Limits HistoryWriter::limits() {
-    const std::int64_t now = m_clock.now(WallClock::now(), Clock::now());
-    return {m_config.keepEvents, now - m_config.keepDays * millisecondsPerDay, now};
-}
-
-void HistoryWriter::storeCursors() {
-    const std::vector<CursorValue> moved = m_cursors.unsaved();
-    if (!moved.empty()) {
-        m_file->keepCursors(moved);
-        m_cursors.saved(moved);
-    }
-}
-
-/// Marks all running sinks as in use, also those that get no events, and forgets those that have
-/// not been in use for long.
-void HistoryWriter::tendCursors() {
-    m_cursors.forgetSaved();
-    storeCursors();
-    m_file->removeOldCursors(daysOfUnusedCursors);
-    m_nextTending = Clock::now() + tendingInterval;
-}
-
-/// Only what stands behind stored events: an entry whose events are lost is judged again.
-void HistoryWriter::storePositions(bool isLast) {
-    PositionValues moved;
-    moved.logs = m_positions.unsaved(m_recent.newest());
-    const bool isNow = isLast || !moved.logs.empty();
-    moved.paths = m_positions.paths().unsaved(isNow ? 0 : WatchedPaths::storedEvery);
-    if (moved != PositionValues{}) {
-        m_file->keepPositions(moved);
-        m_positions.saved(moved.logs);
-        m_positions.paths().saved(moved.paths);
-    }
-}
-
-/// The positions of logs that are followed stay new; the others expire as events do.
-void HistoryWriter::tendPositions() {
-    m_positions.renewFollowed();
-    storePositions();
-    m_positions.removed(m_file->removeOldPositions(limits().time));
-    m_nextTendingOfPositions = Clock::now() + tendingInterval;
-}
-
-/// What is done beside storing events, a little at a time.
-void HistoryWriter::housekeep(bool idle) {
-    const auto now = Clock::now();
-    const bool isOver = m_recent.newest() - m_oldest.load() >= m_config.keepEvents;
-    if (now < m_nextHousekeeping && !m_hasMoreToDo && !isOver) {
-        return;
-    }
-    m_nextHousekeeping = now + housekeepingInterval;
-    m_hasMoreToDo = false;
-    if (m_readers.takeCorruption()) {
-        replaceFile("a reader found it so");
-    }
-    leaveRemovedFiles();
-    attempt([&] {
-        if (now >= m_nextTending) {
-            tendCursors();
-        } else {
-            storeCursors();
-        }
-        if (now >= m_nextTendingOfPositions) {
-            tendPositions();
-        } else {
-            storePositions();
-        }
-        storeEntries();
-        m_hasMoreToDo = m_file->expire(limits()) || (idle && m_file->shrink());
-        m_oldest.store(m_file->oldest());
-    });
-}
-
 std::uint64_t HistoryWriter::finish(Clock::time_point limit) {
     TraceScope trace(anchor);
     if (m_thread.joinable()) {
@@ -382,6 +294,11 @@ void HistoryWriter::storeRest() {
         storeCursors();
     });
     reserveIds(m_recent.newest());
+}
+
+Result<void> HistoryWriter::change(RequestedChanges::Change change) {
+    return m_queue == nullptr ? refused("the history does not take events yet")
+                              : m_requested.make(std::move(change));
 }
 
 std::string HistoryWriter::problem() const {

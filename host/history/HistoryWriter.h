@@ -13,11 +13,15 @@
 #include "host/history/HistoryFile.h"
 #include "host/history/ReaderPool.h"
 #include "host/history/RecentEvents.h"
+#include "host/history/RequestedChanges.h"
 #include "host/history/RetentionClock.h"
+#include "host/silences/Silencer.h"
+#include "host/silences/Silences.h"
 
 #include <atomic>
 #include <condition_variable>
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -40,7 +44,7 @@ public:
     /// The references outlive the object. `file` is open on the directory's file.
     HistoryWriter(const HistoryConfig& config, HistoryDirectory& directory,
                   std::unique_ptr<HistoryFile> file, RecentEvents& recent, ReaderPool& readers,
-                  Cursors& cursors, PositionBook& positions);
+                  Cursors& cursors, PositionBook& positions, Silences& silences);
     ~HistoryWriter();
     HistoryWriter(const HistoryWriter&) = delete;
     HistoryWriter& operator=(const HistoryWriter&) = delete;
@@ -60,6 +64,10 @@ public:
     /// Adds the entries of a minute. Any thread.
     void addEntries(MinuteCounts counts);
 
+    /// Makes a change of the file on the writer's thread and waits for it. Refused before start and
+    /// after the thread's end. Any thread but the writer's.
+    Result<void> change(RequestedChanges::Change change);
+
     /// Id of the oldest event held; 0 when there is none. Any thread.
     std::uint64_t oldest() const noexcept { return m_oldest.load(); }
 
@@ -69,7 +77,8 @@ public:
 private:
     void run();
     bool store(EntryBatch& batch);
-    template <class Work> bool attempt(Work&& work);
+    bool attempt(const std::function<void()>& work);
+    void makeRequestedChanges();
     void succeeded();
     void failed(const std::string& why);
     bool pause();
@@ -83,6 +92,7 @@ private:
     void storePositions(bool isLast = false);
     void tendPositions();
     void storeEntries();
+    void tendSilences();
     HistoryFile::Limits limits();
 
     const HistoryConfig m_config;
@@ -92,6 +102,9 @@ private:
     ReaderPool& m_readers;
     Cursors& m_cursors;
     PositionBook& m_positions;
+    Silences& m_silences;
+    Silencer m_silencer; ///< used by the thread
+    RequestedChanges m_requested;
     EventQueue* m_queue = nullptr;
     EventQueue::Reader m_reader = 0;
     std::unique_ptr<EventJson> m_format;
@@ -99,6 +112,7 @@ private:
     std::uint64_t m_left = 0;            ///< events that were not stored when the thread ended
     std::atomic<std::size_t> m_taken{0}; ///< events released by the queue before they are stored
     RetentionClock m_clock;
+    static constexpr std::chrono::seconds housekeepingInterval{1};
     Clock::time_point m_nextHousekeeping{};
     Clock::time_point m_nextTending{}; ///< of the cursors
     Clock::time_point m_nextTendingOfPositions;

@@ -8,7 +8,7 @@ namespace zrm::host {
 
 namespace {
 
-/// What makes a label.
+/// What makes a label, besides the silence.
 std::array<std::string_view, 4> partsOf(const EventRecord& event) {
     return {event.situation, event.severity, event.text, event.log};
 }
@@ -20,7 +20,7 @@ bool isKeyOf(std::string_view key, const EventRecord& event) {
         }
         key.remove_prefix(part.size() + 1);
     }
-    return key.empty();
+    return true;
 }
 
 std::int64_t made(Database& database) {
@@ -33,9 +33,9 @@ LabelTable::LabelTable(Database& database)
     : m_database(database), m_findLog(database, "SELECT id FROM logs WHERE path = ?"),
       m_makeLog(database, "INSERT INTO logs (path) VALUES (?)"),
       m_findLabel(database, "SELECT id FROM labels WHERE situation = ? AND severity = ? AND log = ?"
-                            " AND text = ?"),
-      m_makeLabel(database, "INSERT INTO labels (situation, severity, log, text)"
-                            " VALUES (?, ?, ?, ?)") {}
+                            " AND text = ? AND silence = ?"),
+      m_makeLabel(database, "INSERT INTO labels (situation, severity, log, text, silence)"
+                            " VALUES (?, ?, ?, ?, ?)") {}
 
 std::int64_t LabelTable::log(std::string_view path) {
     if (const auto known = m_logs.find(path); known != m_logs.end()) {
@@ -58,7 +58,7 @@ LabelTable::Label LabelTable::findOrMake(const EventRecord& event) {
     label.log = log(event.log);
     for (Statement* const statement : {&m_findLabel, &m_makeLabel}) {
         statement->bind(1, event.situation).bind(2, event.severity);
-        statement->bind(3, label.log).bind(4, event.text);
+        statement->bind(3, label.log).bind(4, event.text).bind(5, event.silence);
     }
     if (m_findLabel.step()) {
         label.id = m_findLabel.integer(0);
@@ -71,7 +71,7 @@ LabelTable::Label LabelTable::findOrMake(const EventRecord& event) {
 }
 
 LabelTable::Label LabelTable::of(const EventRecord& event) {
-    if (m_last.id != 0 && isKeyOf(m_key, event)) {
+    if (m_last.id != 0 && m_lastSilence == event.silence && isKeyOf(m_key, event)) {
         return m_last;
     }
     m_last = {};
@@ -79,6 +79,8 @@ LabelTable::Label LabelTable::of(const EventRecord& event) {
     for (const std::string_view part : partsOf(event)) {
         m_key.append(part).append(1, '\0');
     }
+    m_key += std::to_string(event.silence);
+    m_lastSilence = event.silence;
     const auto known = m_labels.find(m_key);
     m_last = known != m_labels.end() ? known->second
                                      : m_labels.emplace(m_key, findOrMake(event)).first->second;

@@ -11,7 +11,8 @@
 
 namespace zrm::host {
 
-/// Numbers for what many events have in common: a situation's name, severity and text, and a log.
+/// Numbers for what many events have in common: a situation's name, severity and text, a log, and
+/// the silence that holds them back.
 /// Used by the writer's thread. Throws DatabaseError.
 class LabelTable {
 public:
@@ -43,9 +44,11 @@ private:
     Statement m_findLabel;
     Statement m_makeLabel;
     std::map<std::string, std::int64_t, std::less<>> m_logs;
-    std::map<std::string, Label, std::less<>> m_labels; ///< by the four texts, zero bytes between
-    std::string m_key;                                  ///< of the last event
+    /// By the four texts and the silence, zero bytes between.
+    std::map<std::string, Label, std::less<>> m_labels;
+    std::string m_key; ///< of the last event
     Label m_last;
+    std::uint64_t m_lastSilence = 0;
 };
 
 } // namespace zrm::host

@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 8> steps = {
+constexpr std::array<const char*, 9> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -54,6 +54,17 @@ constexpr std::array<const char*, 8> steps = {
     "ALTER TABLE log_positions ADD COLUMN cursor TEXT NOT NULL DEFAULT '';",
     // 8: the older files of a log to which late lines may come, and where these begin (JSON).
     "ALTER TABLE log_positions ADD COLUMN late TEXT NOT NULL DEFAULT '';",
+    // 9: silences, and labels with the id of the silence that holds their events back (0: none).
+    // An id is not given again.
+    "CREATE TABLE silences (id INTEGER PRIMARY KEY AUTOINCREMENT, match TEXT NOT NULL,"
+    " created INTEGER NOT NULL, until INTEGER NOT NULL, who TEXT NOT NULL, why TEXT NOT NULL,"
+    " expired INTEGER, expired_by TEXT NOT NULL, events INTEGER NOT NULL, last INTEGER NOT NULL);"
+    "CREATE TABLE labels_with_silence (id INTEGER PRIMARY KEY, situation TEXT NOT NULL,"
+    " severity TEXT NOT NULL, log INTEGER NOT NULL REFERENCES logs, text TEXT NOT NULL,"
+    " silence INTEGER NOT NULL, UNIQUE (situation, severity, log, text, silence));"
+    "INSERT INTO labels_with_silence SELECT id, situation, severity, log, text, 0 FROM labels;"
+    "DROP TABLE labels;"
+    "ALTER TABLE labels_with_silence RENAME TO labels;",
 };
 
 } // namespace

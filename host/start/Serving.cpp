@@ -10,6 +10,7 @@
 #include "host/api/LogsResource.h"
 #include "host/api/ReportResource.h"
 #include "host/api/SampleResource.h"
+#include "host/api/SilencesResource.h"
 #include "host/api/SituationsResource.h"
 #include "host/api/SuggestResource.h"
 #include "host/base/Say.h"
@@ -142,6 +143,7 @@ void Serving::addResources(const HostConfig& config, TableManager& entries) {
     addResource(std::move(reports));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
+    addResource(std::make_unique<SilencesResource>(m_delivery.silences()));
     auto analysis =
         std::make_unique<AnalysisResource>(m_situations, entries, m_watch, m_delivery.history());
     m_analysis = analysis.get();

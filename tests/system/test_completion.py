@@ -65,11 +65,12 @@ def test_commands_and_options_are_those_of_the_program(complete):
     shared = set(common) - {"--version"}
     for command in commands:
         assert complete(f"zrmctl {command} -") == sorted({*help_names(command)[0], *shared})
-    _, actions = help_names("situations")
-    assert complete("zrmctl situations ") == actions
-    for action in actions:
-        options, _ = help_names("situations", action)
-        assert complete(f"zrmctl situations {action} x -") == sorted({*options, *shared})
+    for command in ("situations", "silence"):
+        _, actions = help_names(command)
+        assert complete(f"zrmctl {command} ") == actions
+        for action in actions:
+            options, _ = help_names(command, action)
+            assert complete(f"zrmctl {command} {action} x -") == sorted({*options, *shared})
 
 
 @pytest.mark.parametrize(

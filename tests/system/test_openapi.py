@@ -76,6 +76,7 @@ DEFINITION = {
     "frequency": ">= 2",
     "period": "60s",
 }
+SILENCE = {"match": {"group": {"ip": "10.*"}, "log": "/a"}, "until": "2h", "who": "anna", "why": "x"}
 FROM = "2026-01-01T00:00:00Z"
 
 # The requests: method, path of the document, path and body of the request, expected status.
@@ -114,6 +115,15 @@ EXAMPLES = [
     ("PUT", "/api/v1/situations/{name}", "/api/v1/situations/made%2Fhere", {**DEFINITION, "version": "0"}, 412),
     ("POST", "/api/v1/situations/{name}/stop", "/api/v1/situations/made%2Fhere/stop", None, 200),
     ("POST", "/api/v1/situations/{name}/start", "/api/v1/situations/made%2Fhere/start", None, 200),
+    ("POST", "/api/v1/silences", None, SILENCE, 201),
+    ("POST", "/api/v1/silences", None, {**SILENCE, "match": {}}, 400),
+    ("GET", "/api/v1/silences", None, None, 200),
+    ("GET", "/api/v1/silences", "/api/v1/silences?state=expired", None, 200),
+    ("GET", "/api/v1/silences/{id}", "/api/v1/silences/1", None, 200),
+    ("GET", "/api/v1/silences/{id}", "/api/v1/silences/2", None, 404),
+    ("DELETE", "/api/v1/silences/{id}", "/api/v1/silences/1", {"who": "ben"}, 200),
+    ("DELETE", "/api/v1/silences/{id}", "/api/v1/silences/1", None, 409),
+    ("DELETE", "/api/v1/silences/{id}", "/api/v1/silences/2", None, 404),
     ("POST", "/api/v1/explain", None, {"situation": "every-entry", "last": 2}, 200),
     ("POST", "/api/v1/explain", None, {"definition": DEFINITION, "log": "{log}", "line": "no entry"}, 200),
     ("POST", "/api/v1/explain", None, {"situation": "none", "log": "{log}", "line": "x"}, None),

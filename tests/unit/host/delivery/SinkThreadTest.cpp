@@ -1,6 +1,8 @@
 #include "host/delivery/SinkThread.h"
 
-#include "host/events/QueueSource.h"
+#include "host/base/TimeText.h"
+#include "host/delivery/QueueSource.h"
+#include "host/silences/Silences.h"
 #include "support/RecordingTrace.h"
 #include "unit/host/events/TestEvents.h"
 
@@ -10,6 +12,7 @@
 #include <algorithm>
 #include <atomic>
 #include <chrono>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -90,7 +93,7 @@ protected:
         }
     }
     std::unique_ptr<EventSource> source() {
-        return std::make_unique<QueueSource>(queue, EventJson(testLayout()));
+        return std::make_unique<QueueSource>(queue, EventJson(testLayout()), silences, true);
     }
     static std::vector<std::uint64_t> upTo(std::uint64_t last) {
         std::vector<std::uint64_t> ids;
@@ -100,7 +103,16 @@ protected:
         return ids;
     }
 
+    static bool eventually(const std::function<bool()>& condition) {
+        const auto limit = Clock::now() + 10s;
+        while (!condition() && Clock::now() < limit) {
+            std::this_thread::sleep_for(1ms);
+        }
+        return condition();
+    }
+
     RecordingTrace trace{TRC1_ERROR};
+    Silences silences;
     TestRow row{"/var/log/", "app.log", "text", 7};
     EventQueue queue{100, sizeof(TestRow)};
     std::shared_ptr<const SituationLabel> label = std::make_shared<const SituationLabel>();
@@ -114,6 +126,55 @@ TEST_F(SinkThreadTest, DeliversEverythingInOrder) {
     EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
     EXPECT_EQ(state->seen(), upTo(250));
     EXPECT_THAT(trace.messages(), ElementsAre());
+}
+
+TEST_F(SinkThreadTest, PassesOverWhatIsSilenced) {
+    push(10);
+    Silence silence;
+    silence.until = WallClock::now() + 3'600'000;
+    ASSERT_TRUE(silences.add(silence));
+    push(10); // judged when the source reads them: a source without a history judges late
+    thread.start();
+    ASSERT_TRUE(eventually([&] { return queue.state().size == 0; }));
+    EXPECT_THAT(state->seen(), ElementsAre());
+    EXPECT_EQ(silences.find(1)->events, 20u);
+    ASSERT_TRUE(silences.expire(1, "", WallClock::now()));
+    push(2);
+    EXPECT_EQ(thread.finish(Clock::now() + 10s), 0u);
+    EXPECT_THAT(state->seen(), ElementsAre(21u, 22u));
+}
+
+/// A source whose events with even ids are silenced.
+class HalfSilenced : public EventSource {
+public:
+    explicit HalfSilenced(std::uint64_t count) {
+        for (std::uint64_t id = 1; id <= count; ++id) {
+            EventRecord& event = m_events.emplace_back();
+            event.id = id;
+            event.silence = id % 2 == 0 ? 1 : 0;
+        }
+    }
+    std::span<const EventRecord> read(std::size_t most) override {
+        const auto rest = std::span<const EventRecord>(m_events).subspan(m_begin);
+        return rest.first(std::min(most, rest.size()));
+    }
+    void release(std::size_t count) override { m_begin += count; }
+    std::uint64_t backlog() const override { return m_events.size() - m_begin; }
+    void end() override {}
+
+private:
+    std::vector<EventRecord> m_events;
+    std::atomic<std::size_t> m_begin{0};
+};
+
+TEST_F(SinkThreadTest, ARetryBeginsWithTheFirstEventThatIsNotSilencedAndWasNotTaken) {
+    state->taken = 3;
+    state->failures = 2;
+    SinkThread half(std::make_unique<HalfSilenced>(21), std::make_unique<TestSink>(state), "jsonl");
+    half.start();
+    EXPECT_EQ(half.finish(Clock::now() + 10s), 0u);
+    EXPECT_THAT(state->seen(), ElementsAre(1u, 3u, 5u, 7u, 9u, 11u, 13u, 15u, 17u, 19u, 21u));
+    EXPECT_EQ(half.state().delivered, 11u);
 }
 
 TEST_F(SinkThreadTest, AReaderThatTakesNothingForSecondsIsAFailure) {

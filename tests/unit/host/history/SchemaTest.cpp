@@ -34,6 +34,9 @@ constexpr const char* firstVersion =
     "INSERT INTO cursors VALUES ('jsonl:out', 40, 1795158189412);"
     "PRAGMA user_version = 1";
 
+/// What the third version added to labels.
+constexpr const char* labelTexts = "ALTER TABLE labels ADD COLUMN text TEXT NOT NULL DEFAULT '';";
+
 class SchemaTest : public testing::Test {
 protected:
     static bool hasTable(Database& database, const std::string& name) {
@@ -52,8 +55,9 @@ protected:
 TEST_F(SchemaTest, CreatesTheTablesOfANewFile) {
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
-    for (const char* const table : {"events", "labels", "logs", "marks", "origin", "cursors",
-                                    "minutes", "rates", "log_positions", "watched_paths"}) {
+    for (const char* const table :
+         {"events", "labels", "logs", "marks", "origin", "cursors", "minutes", "rates",
+          "log_positions", "watched_paths", "silences"}) {
         EXPECT_TRUE(hasTable(database, table)) << table;
     }
     Schema::bringUpToDate(database);
@@ -118,7 +122,8 @@ TEST_F(SchemaTest, UpgradesAFileOfTheThirdVersion) {
 
 TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
     database.run(firstVersion);
-    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER; PRAGMA user_version = 4");
+    database.run(std::string(labelTexts) +
+                 "ALTER TABLE events ADD COLUMN checksum INTEGER; PRAGMA user_version = 4");
     Schema::bringUpToDate(database);
     EXPECT_EQ(versionOf(database), Schema::version);
     EXPECT_EQ(database.number("SELECT id FROM events"), 41);
@@ -128,7 +133,8 @@ TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
 
 TEST_F(SchemaTest, BringsAFileOfTheFifthVersionUpToDate) {
     database.run(firstVersion);
-    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+    database.run(std::string(labelTexts) +
+                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
                  "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
                  " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
                  " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL) WITHOUT ROWID;"
@@ -143,7 +149,8 @@ TEST_F(SchemaTest, BringsAFileOfTheFifthVersionUpToDate) {
 
 TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
     database.run(firstVersion);
-    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+    database.run(std::string(labelTexts) +
+                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
                  "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
                  " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
                  " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
@@ -160,7 +167,8 @@ TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
 
 TEST_F(SchemaTest, BringsAFileOfTheSeventhVersionUpToDate) {
     database.run(firstVersion);
-    database.run("ALTER TABLE events ADD COLUMN checksum INTEGER;"
+    database.run(std::string(labelTexts) +
+                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
                  "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
                  " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
                  " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
@@ -174,6 +182,25 @@ TEST_F(SchemaTest, BringsAFileOfTheSeventhVersionUpToDate) {
     ASSERT_TRUE(position.step());
     EXPECT_EQ(position.integer(0), 3);
     EXPECT_EQ(position.text(1), "") << "no older file was watched";
+}
+
+TEST_F(SchemaTest, BringsAFileOfTheEighthVersionUpToDate) {
+    database.run(firstVersion);
+    database.run(std::string(labelTexts) +
+                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
+                 "INSERT INTO labels VALUES (2, 'other', 'minor', 1, 'a text');"
+                 "INSERT INTO events VALUES (42, 1795158189412, 2, '{}', 7);"
+                 "PRAGMA user_version = 8");
+    Schema::bringUpToDate(database);
+    EXPECT_EQ(versionOf(database), Schema::version);
+    Statement event(database, "SELECT text, silence, checksum FROM events"
+                              " JOIN labels ON labels.id = label WHERE events.id = 42");
+    ASSERT_TRUE(event.step());
+    EXPECT_EQ(event.text(0), "a text");
+    EXPECT_EQ(event.integer(1), 0) << "nothing was silenced";
+    EXPECT_EQ(event.integer(2), 7);
+    EXPECT_EQ(database.number("SELECT count(*) FROM events JOIN labels ON labels.id = label"), 2);
+    EXPECT_EQ(database.number("SELECT count(*) FROM silences"), 0);
 }
 
 TEST_F(SchemaTest, AFailedStepLeavesTheOlderVersionIntact) {
