@@ -83,6 +83,7 @@ private:
     std::vector<std::string> m_situations;
     std::vector<std::string> m_logs;
     std::vector<std::string> m_severities;
+    std::string m_silenced;
     std::string m_text;
     unsigned m_limit = 0; ///< 0: not given
 };

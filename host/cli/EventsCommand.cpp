@@ -61,11 +61,15 @@ std::string summaryOf(const Json& event) {
 }
 
 /// The text made for the event; or else the values of its group before the text of its entry.
+/// Before both, the silence that holds the event back.
 std::string entryOf(const Json& event) {
-    if (const std::string text = JsonText::text(event, "text"); !text.empty()) {
-        return text;
-    }
     std::string group;
+    if (const std::string silence = JsonText::text(event, "silenced"); !silence.empty()) {
+        group = "[silence " + silence + "] ";
+    }
+    if (const std::string text = JsonText::text(event, "text"); !text.empty()) {
+        return group + text;
+    }
     for (const auto& [name, value] : JsonText::member(event, "group").items()) {
         group += name + '=' + JsonText::text(value) + ' ';
     }
@@ -187,6 +191,9 @@ EventsCommand::EventsCommand(CLI::App& program)
     anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
     anyOf("--log", m_logs, "LOG", "Of this log; may be repeated");
     anyOf("--severity", m_severities, "SEVERITY", "Of this severity; may be repeated");
+    m_command->add_option("--silenced", m_silenced, "true: held back by a silence; false: not")
+        ->type_name("true|false")
+        ->check(CLI::IsMember({"true", "false"}));
     m_command->add_option("--text", m_text, "Containing this text, in upper or lower case")
         ->type_name("TEXT");
     m_command
@@ -207,6 +214,9 @@ std::multimap<std::string, std::string> EventsCommand::filters() const {
         for (const std::string& value : *values) {
             query.emplace(name, value);
         }
+    }
+    if (!m_silenced.empty()) {
+        query.emplace("silenced", m_silenced);
     }
     if (!m_text.empty()) {
         query.emplace("text", m_text);

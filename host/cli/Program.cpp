@@ -4,6 +4,7 @@
 #include "host/cli/Commands.h"
 #include "host/cli/Context.h"
 #include "host/cli/FormatCommands.h"
+#include "host/cli/SilenceCommands.h"
 #include "host/cli/Terminal.h"
 
 #include <new>
@@ -65,6 +66,7 @@ Program::Program()
     m_commands.push_back(std::make_unique<EventsCommand>(*m_app));
     m_commands.push_back(std::make_unique<ReportCommand>(*m_app));
     m_commands.push_back(std::make_unique<SituationsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<SilenceCommand>(*m_app));
     m_commands.push_back(std::make_unique<ExplainCommand>(*m_app));
     m_commands.push_back(std::make_unique<BacktestCommand>(*m_app));
     m_commands.push_back(std::make_unique<RefreshCommand>(*m_app));

@@ -9,7 +9,10 @@ from conftest import PATIENCE, PROGRAM, ROOT
 
 CLIENT = os.environ.get("ZRM_CLIENT", os.path.join(os.path.dirname(PROGRAM), "zrmctl"))
 PAGES = ROOT / "docs/man"
-ACTIONS = ("list", "show", "add", "set", "remove", "start", "stop", "validate")
+ACTIONS = {
+    "situations": ("list", "show", "add", "set", "remove", "start", "stop", "validate"),
+    "silence": ("list", "show", "add", "expire"),
+}
 
 
 def run(*command):
@@ -78,13 +81,14 @@ def test_every_command_of_the_client_with_its_options():
         assert items(parts[command]) >= options - {"-h", "--help"}, command
 
 
-def test_every_action_on_situations_with_its_options():
-    _, actions = help_of(CLIENT, "situations")
-    assert actions == set(ACTIONS)
-    part = sections("zrmctl.1")["situations [action]"]
+@pytest.mark.parametrize("command", ACTIONS)
+def test_every_action_with_its_options(command):
+    _, actions = help_of(CLIENT, command)
+    assert actions == set(ACTIONS[command])
+    part = sections("zrmctl.1")[f"{command} [action]"]
     assert items(part) >= actions - {"list"}
     for action in actions:
-        options, _ = help_of(CLIENT, "situations", action)
+        options, _ = help_of(CLIENT, command, action)
         assert items(part) >= options - {"-h", "--help"}, action
 
 
@@ -92,8 +96,9 @@ def test_the_page_names_no_option_that_is_not_there():
     known = help_of(CLIENT)[0]
     for command in help_of(CLIENT)[1]:
         known |= help_of(CLIENT, command)[0]
-    for action in ACTIONS:
-        known |= help_of(CLIENT, "situations", action)[0]
+    for command, actions in ACTIONS.items():
+        for action in actions:
+            known |= help_of(CLIENT, command, action)[0]
     named = {word for part in sections("zrmctl.1").values() for word in items(part)}
     assert {word for word in named if word.startswith("--")} <= known
 
