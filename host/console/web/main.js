@@ -7,6 +7,7 @@ const VIEWS = [
   ["logs", "Logs"],
   ["events", "Events"],
   ["situations", "Situations"],
+  ["silences", "Silences"],
   ["reports", "Reports"],
   ["try", "Try a format"],
 ];

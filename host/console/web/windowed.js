@@ -99,7 +99,7 @@ export class WindowedList {
       "div",
       {
         id: `event-${item.id}`,
-        className: "windowed-row",
+        className: `windowed-row ${this.options.className?.(item) ?? ""}`,
         role: "option",
         "aria-selected": String(item === this.#chosen),
         "aria-posinset": index + 1,

@@ -4,6 +4,7 @@ import { get, post, withQuery } from "../api.js";
 import { button, debounce, empty, failure, field, fill, h, link, select } from "../dom.js";
 import { briefTime, describe, number, plural, SEVERITIES, time } from "../format.js";
 import { explained, rowList } from "../explain.js";
+import { silencedFacts, silenceLink } from "../silenced.js";
 import { EventStream } from "../stream.js";
 import { WindowedList } from "../windowed.js";
 
@@ -89,6 +90,7 @@ class EventsPage {
     this.list = new WindowedList({
       label: "Events, newest first",
       row: (event) => this.#row(event),
+      className: (event) => (event.silenced ? "silenced" : ""),
       end: () => this.#older(),
       choose: (event, isEntered) => this.#open(event, isEntered),
     });
@@ -401,9 +403,10 @@ class EventsPage {
           ...Object.entries(event.labels ?? {}),
           ["Log", logOf(event)],
           ...episodeOf(event),
+          ...silencedFacts(event),
         ].map(([name, value]) => [h("dt", {}, name), h("dd", {}, value)]),
       ),
-      event.row && h("p", { className: "actions" }, explain),
+      h("p", { className: "actions" }, event.row && explain, silenceLink(event, logOf(event))),
       why,
       entryOf(event),
       event.row && [h("h3", {}, "Columns"), rowList(event.row)],
