@@ -91,6 +91,14 @@ std::string nameOf(const FormatSuggestion::Choice& choice) {
     return name.empty() ? choice.about : name + ": " + choice.about;
 }
 
+std::string equalsText(const FormatSuggestion::Choice& choice) {
+    std::string names;
+    for (const std::string& one : choice.equals) {
+        names += (names.empty() ? "" : ", ") + one;
+    }
+    return names.empty() ? "" : "        fits equally: " + DisplayText::visible(names) + '\n';
+}
+
 std::string textOf(const FormatSuggestion::Choice& choice, const Terminal& terminal) {
     const FormatFit& fit = choice.fit;
     const bool isGood = fit.share() >= FormatSuggestion::leastShare;
@@ -99,7 +107,7 @@ std::string textOf(const FormatSuggestion::Choice& choice, const Terminal& termi
                              isGood ? Colour::GOOD : Colour::NOTICE) +
            "  " + DisplayText::visible(nameOf(choice)) + "\n        entries with a time " +
            percent(fit.withTime, fit.entries) + ", a type " + percent(fit.withType, fit.entries) +
-           ", a source " + percent(fit.withSource, fit.entries) + '\n';
+           ", a source " + percent(fit.withSource, fit.entries) + '\n' + equalsText(choice);
 }
 
 /// A table with its line ends.

@@ -66,6 +66,13 @@ bool extracts(const FormatDescription& description, const std::vector<std::strin
     return false;
 }
 
+/// Whether a path such as /var/log/nginx/access.log names the program of a format.
+bool namesProgram(std::string_view log, std::string_view format) {
+    const std::string_view program = format.substr(0, format.find('-'));
+    const bool isApache = program == "apache" && log.find("httpd") != std::string_view::npos;
+    return isApache || log.find(program) != std::string_view::npos;
+}
+
 } // namespace
 
 class FormatSuggestion::Search {
@@ -92,14 +99,16 @@ public:
         if (m_syslog) {
             add(std::move(*m_syslog));
         }
-        std::stable_sort(m_found.begin(), m_found.end(), [](const auto& one, const auto& other) {
-            return one.first > other.first;
+        // Formats of the same score are in the order of their names already.
+        std::stable_sort(m_found.begin(), m_found.end(), [](const Found& one, const Found& other) {
+            return std::pair(one.score, one.isNamed) > std::pair(other.score, other.isNamed);
         });
         std::vector<Choice> choices;
-        for (auto& [score, choice] : m_found) {
+        for (const Found& found : m_found) {
             if (choices.size() < mostChoices) {
-                choice.table = TomlText::logTable(m_log, choice.names);
-                choices.push_back(std::move(choice));
+                choices.push_back(found.choice);
+                choices.back().table = TomlText::logTable(m_log, found.choice.names);
+                choices.back().equals = equalsOf(found);
             }
         }
         return choices;
@@ -116,11 +125,28 @@ public:
     }
 
 private:
+    struct Found {
+        double score;
+        bool isNamed; ///< the path of the log names the program
+        Choice choice;
+    };
+
+    std::vector<std::string> equalsOf(const Found& found) const {
+        std::vector<std::string> names;
+        for (const Found& other : m_found) {
+            if (&other != &found && other.score == found.score) {
+                names.insert(names.end(), other.choice.names.begin(), other.choice.names.end());
+            }
+        }
+        return names;
+    }
+
     /// Of several formats that read the same, the one that is made for a program is better.
     void add(Choice choice) {
         constexpr double generic = 0.01;
         const double score = choice.fit.score() - (choice.isGeneric ? generic : 0);
-        m_found.emplace_back(score, std::move(choice));
+        const bool isNamed = !choice.names.empty() && namesProgram(m_log, choice.names.front());
+        m_found.push_back({score, isNamed, std::move(choice)});
     }
 
     /// All formats of this type read the same lines: those that find fields are named together.
@@ -144,7 +170,7 @@ private:
     const std::string_view m_log;
     bool m_isSyslogKnown = false;
     std::optional<Choice> m_syslog;
-    std::vector<std::pair<double, Choice>> m_found;
+    std::vector<Found> m_found;
 };
 
 FormatSuggestion FormatSuggestion::of(const ReadyFormats& formats, std::vector<std::string> lines,
@@ -186,7 +212,7 @@ void write(JsonWriter& json, const FormatSuggestion::Choice& choice) {
     for (const std::string& name : choice.names) {
         json.value(name);
     }
-    json.endArray().member("description", choice.about);
+    json.endArray().member("fits_equally", choice.equals).member("description", choice.about);
     json.member("percent", percent(fit.share()));
     json.member("percent_time", percent(partOf(fit.withTime, fit.entries)));
     json.member("percent_type", percent(partOf(fit.withType, fit.entries)));

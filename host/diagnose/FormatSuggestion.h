@@ -31,8 +31,9 @@ public:
         std::vector<std::string> names; ///< several of type "syslog"; empty: a proposal
         std::string about;
         FormatFit fit;
-        std::string table;      ///< the [[log]] table to write
-        bool isGeneric = false; ///< of many programs
+        std::string table;                 ///< the [[log]] table to write
+        bool isGeneric = false;            ///< of many programs
+        std::vector<std::string> equals{}; ///< other ready formats that read as much
     };
 
     /// `log` is the path for the table.
@@ -40,7 +41,8 @@ public:
                                std::string_view log);
 
     std::size_t lines() const noexcept { return m_lines; }
-    /// The best first; those that fit no line are left out.
+    /// The best first; those that fit no line are left out. Of several that read as much, the one
+    /// whose program the log's path names comes first, then they are in the order of their names.
     const std::vector<Choice>& ready() const noexcept { return m_ready; }
     /// A format made for the lines, if it finds more in them than the best of the ready ones.
     const std::optional<Choice>& proposal() const noexcept { return m_proposal; }

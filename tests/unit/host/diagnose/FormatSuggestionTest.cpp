@@ -109,6 +109,19 @@ TEST(FormatSuggestion, TheTableOfAProposalHasAllThatItNeeds) {
     EXPECT_THAT(made.proposal()->table, HasSubstr("\npairs = true\n"));
 }
 
+TEST(FormatSuggestion, OfEqualFormatsTheOneThatThePathNamesComesFirst) {
+    const std::vector<std::string> lines = {
+        R"(203.0.113.7 - - [19/Nov/2026:10:00:00 +0100] "GET / HTTP/1.1" 200 5 "-" "x")"};
+    const auto best = [&](std::string_view log) {
+        return FormatSuggestion::of(ReadyFormats({ZRM_FORMATS}), lines, log).ready().front();
+    };
+    EXPECT_THAT(best("/var/log/nginx/access.log").names, ElementsAre("nginx-access"));
+    EXPECT_THAT(best("/var/log/nginx/access.log").equals, testing::Contains("apache-access"));
+    EXPECT_THAT(best("/var/log/httpd/access_log").names, ElementsAre("apache-access"));
+    EXPECT_THAT(best("/srv/access.log").names, ElementsAre("apache-access"));
+    EXPECT_THAT(best("/srv/access.log").equals, testing::Contains("nginx-access"));
+}
+
 TEST(FormatSuggestion, LooksAtABoundedPartOfWhatItIsGiven) {
     const FormatSuggestion suggestion =
         suggest(std::vector<std::string>(3000, "level=info " + std::string(50, 'x')));
@@ -124,6 +137,7 @@ TEST(FormatSuggestion, IsAnsweredAsJson) {
     EXPECT_EQ(json.at("lines"), 1);
     EXPECT_EQ(json.at("ready").at(0).at("percent"), 100.0);
     EXPECT_EQ(json.at("ready").at(0).at("percent_time"), 100.0);
+    EXPECT_TRUE(json.at("ready").at(0).at("fits_equally").is_array());
     EXPECT_TRUE(json.at("proposal").is_null());
 }
 
