@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <array>
+#include <map>
 #include <utility>
 
 #include <CLI/CLI.hpp>
@@ -124,6 +125,23 @@ void addFollowing(FactList& facts, const Json& follow, bool ofFile) {
         facts.add(name, TimeDisplay::bytes(JsonText::number(follow, key)));
     }
     facts.add("cut entries", JsonText::text(follow, "cut_entries"));
+}
+
+/// The formats of the followed logs, as their tables name them.
+std::map<std::string, std::string> formatsOf(const Json& answer) {
+    std::map<std::string, std::string> formats;
+    for (const Json& table : JsonText::member(answer, "tables")) {
+        for (const Json& file : JsonText::member(table, "files")) {
+            formats[file.get<std::string>()] = JsonText::text(table, "format");
+        }
+    }
+    return formats;
+}
+
+/// What takes the entries of a log apart: its format, or the kind of log that it is.
+std::string formatOf(const Json& log, const std::map<std::string, std::string>& formats) {
+    const auto found = formats.find(JsonText::text(log, "log"));
+    return found == formats.end() ? kindOf(JsonText::member(log, "row")) : found->second;
 }
 
 /// The table of the configuration that a followed log comes from.
@@ -291,9 +309,10 @@ CliStatus LogsCommand::list(Context& context) {
                  {"ERRORS", Table::NUMBER},
                  {"SIZE", Table::NUMBER},
                  {"CHANGED", Table::FIXED}});
+    const std::map<std::string, std::string> formats = formatsOf(answer);
     for (const Json& log : JsonText::member(answer, "logs")) {
         const Json& row = JsonText::member(log, "row");
-        table.add({JsonText::text(log, "log"), kindOf(row),
+        table.add({JsonText::text(log, "log"), formatOf(log, formats),
                    statusCell(row, JsonText::member(log, "ledger")),
                    JsonText::text(row, "NUMEVENTS"), countCell(row, "NUMERRORS"), sizeText(row),
                    TimeDisplay::stamp(JsonText::text(row, "LOGMODDATE"))});
@@ -334,7 +353,7 @@ CliStatus LogsCommand::show(Context& context) {
     const Table::Cell status = statusCell(row, ledger);
     FactList facts;
     facts.add("log", JsonText::text(logs.front(), "log"));
-    facts.add("type", kindOf(row));
+    facts.add("type", formatOf(logs.front(), formatsOf(answer)));
     addTable(facts, answer);
     facts.add("status", status.text, status.colour);
     facts.add("since", TimeDisplay::stamp(JsonText::text(row, "MONTIME")));

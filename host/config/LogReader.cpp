@@ -112,6 +112,7 @@ LogConfig LogReader::read(const toml::table& table) {
         readPaths(section, log);
     }
     readFormat(section, log);
+    log.formatName = formatName(section, log);
     log.debug = section.truth("debug").value_or(false);
     readFollowing(section, log);
     readResumption(section, log);

@@ -30,6 +30,7 @@ private:
                        const LogConfig& log);
     void readType(ConfigSection& section, LogConfig& log);
     void readFormat(ConfigSection& section, LogConfig& log);
+    std::string formatName(ConfigSection& section, const LogConfig& log) const;
     static void readEntryFormat(ConfigSection& section, LogConfig& log);
     void readMessages(ConfigSection& section, LogConfig& log);
     void readOutput(ConfigSection& section, LogConfig& log);

@@ -74,6 +74,21 @@ void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
     }
 }
 
+/// LogConfig::formatName.
+std::string LogReader::formatName(ConfigSection& section, const LogConfig& log) const {
+    const bool mayBeNamed = log.letter == FormatLogFile::typeLetter || log.journal || log.command;
+    const bool isGood = mayBeNamed && section.has("format") && m_problems.count() == 0;
+    const auto texts = isGood ? section.texts("format") : std::nullopt;
+    std::string names;
+    if (texts) {
+        for (const ConfigSection::Text& text : *texts) {
+            const bool isName = ReadyFormats::isName(text.first);
+            names += isName ? (names.empty() ? "" : ", ") + text.first : "";
+        }
+    }
+    return names.empty() ? log.type : names;
+}
+
 /// The format of a log that has no kind of its own.
 void LogReader::readEntryFormat(ConfigSection& section, LogConfig& log) {
     const std::optional<FormatDescription> format = FormatReader::read(section, log.type);

@@ -145,9 +145,9 @@ Result<ReadyFormat> ReadyFormats::find(const std::string& name) const {
         });
     }
     const std::string names = nearTo(name);
-    return refused("there is no format '" + name + "'",
-                   names.empty() ? "'zrmctl formats list' shows those there are"
-                                 : "names like it are " + names);
+    return refused("'" + name + "' is not a ready format",
+                   names.empty() ? "write a name that 'zrmctl formats list' shows"
+                                 : "write a name such as " + names);
 }
 
 std::vector<ReadyFormats::Place> ReadyFormats::list() const {

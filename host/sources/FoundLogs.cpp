@@ -21,7 +21,11 @@ bool FoundLogs::Source::mentions(std::string_view file) const {
 }
 
 void FoundLogs::Source::write(JsonWriter& json) const {
-    json.beginObject().member("line", line).member("path", paths).member("files", files);
+    json.beginObject()
+        .member("line", line)
+        .member("format", format)
+        .member("path", paths)
+        .member("files", files);
     json.key("passed_over").beginArray();
     for (const PassedOver& one : passedOver) {
         json.beginObject().member("file", one.file).member("reason", one.reason + '.').endObject();

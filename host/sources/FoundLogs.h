@@ -26,6 +26,7 @@ struct FoundLogs {
     /// One table.
     struct Source {
         unsigned line = 0;                  ///< in the configuration
+        std::string format;                 ///< LogConfig::formatName
         std::vector<std::string> paths;     ///< as configured
         std::vector<std::string> files;     ///< that are followed
         std::vector<PassedOver> passedOver; ///< the first mostPassedOver

@@ -114,6 +114,7 @@ private:
         for (std::size_t index = 0; index < m_logs.size(); ++index) {
             FoundLogs::Source& source = m_found.sources[index];
             source.line = m_logs[index].line;
+            source.format = m_logs[index].formatName;
             source.paths = m_logs[index].paths;
             for (const std::string& path : m_logs[index].paths) {
                 if (!PathPattern::isPattern(path)) {

@@ -59,6 +59,7 @@ def test_the_check_marks_what_belongs_to_the_log_configuration(both):
     (table,) = json.loads(text)["logs"]
     assert table == {
         "line": line,
+        "format": "syslog",
         "path": [f"{both.directory}/*.log*"],
         "files": [str(both.own)],
         "passed_over": [

@@ -2,6 +2,7 @@
 
 import json
 import os
+import re
 import subprocess
 from pathlib import Path
 
@@ -42,6 +43,23 @@ def test_a_table_names_a_format(agent, log):
     assert (row["ENTRYTIME"], row["ENTRYSRC"]) == ("1261119090001000", "203.0.113.7")
     assert (row["ENTRYTYPE"], row["ENTRYDESC"]) == ("503", "GET /cart HTTP/1.1")
     assert event["fields"] == {"status": "503"}
+
+
+def test_the_api_and_the_client_name_the_format_of_a_log(agent, log):
+    agent.follow(log, format="nginx-access")
+    agent.situation(log=log)
+    agent.sink = agent.directory / "events"
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    agent.wait_open(log)
+    api = Api(agent)
+    access = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", api.token_file]
+    (table,) = api.request("GET", "/api/v1/logs")[2]["tables"]
+    assert table["format"] == "nginx-access"
+    _, output, _ = run([*access, "logs"])
+    assert re.search(rf"{re.escape(str(log))} +nginx-access +Running", output), output
+    _, output, _ = run([*access, "logs", str(log)])
+    assert re.search(r"^type +nginx-access$", output, re.MULTILINE), output
 
 
 def test_traces_of_several_lines_are_one_entry(agent, log):
@@ -89,7 +107,7 @@ def test_an_unknown_name_is_an_error_with_names_like_it(agent, log):
     assert agent.process.wait(PATIENCE) == 2
     agent.stderr.finish()
     text = agent.stderr.text()
-    assert "log.format: there is no format 'nginx-acces'; names like it are 'nginx-access'" in text
+    assert "log.format: 'nginx-acces' is not a ready format; write a name such as 'nginx-access'" in text
 
 
 def test_list_has_every_format_with_its_description():
@@ -138,7 +156,7 @@ description = "started"
     status, output, _ = run(["formats", "test", str(file)])
     assert status == 1 and f"{file}:2: x: unknown key" in output
     status, _, error = run(["formats", "test", "no-such"])
-    assert status == 1 and "there is no format 'no-such'" in error
+    assert status == 1 and "'no-such' is not a ready format" in error
 
 
 def test_suggest_names_the_format_and_the_table(tmp_path):
@@ -152,6 +170,12 @@ def test_suggest_names_the_format_and_the_table(tmp_path):
     answer = json.loads(output)
     assert answer["ready"][0]["percent"] == 98.3 and answer["ready"][0]["percent_time"] == 100.0
     assert answer["proposal"] is None
+    named = tmp_path / "nginx" / "access.log"
+    named.parent.mkdir()
+    named.write_bytes(log.read_bytes())
+    _, output, _ = run(["suggest", str(named), *DIRECTORY])
+    assert output.startswith("98.3 % of 61 lines  nginx-access: ")
+    assert "\n        fits equally: apache-access\n" in output
 
 
 def test_suggest_reads_standard_input_and_makes_a_format():

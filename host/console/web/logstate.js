@@ -11,7 +11,13 @@ const KINDS = {
   J: "Journal",
   C: "Command",
 };
-export const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
+const kindOf = (row) => KINDS[row.LOGTYPE] || row.LOGTYPE || "–";
+
+/** What takes a log's entries apart: the format its [[log]] table names, or its kind. */
+export const formatOf = (row, table) => {
+  const kind = kindOf(row);
+  return table && table.format !== kind.toLowerCase() ? table.format : kind;
+};
 
 /** False for logs that are read from a command or a library rather than from a file. */
 export const isFile = (row) => !"EJC".includes(row.LOGTYPE);

@@ -1,7 +1,8 @@
 // Which ready formats read some lines, and the tables to write for them.
 
 import { post } from "./api.js";
-import { button, empty, failure, fill, h } from "./dom.js";
+import { copyable } from "./copyable.js";
+import { empty, failure, fill, h } from "./dom.js";
 
 /** The formats that fit the lines, or that the agent makes for them. */
 export async function showSuggestion(element, lines, log, signal) {
@@ -63,29 +64,8 @@ function choicePanel(choice) {
       `Of the entries ${choice.percent_time}% have a time, ${choice.percent_type}% a type, ` +
         `${choice.percent_source}% a source.`,
     ),
-    copyable(choice.table),
+    choice.fits_equally.length > 0 &&
+      h("p", { className: "quiet" }, `Fits equally: ${choice.fits_equally.join(", ")}.`),
+    copyable(choice.table, "Table", "Put it into zrm.toml. The agent notices the change."),
   );
-}
-
-function copyable(text) {
-  const said = h("span", { role: "status", className: "hint" });
-  const code = h("pre", { className: "copyable", tabIndex: 0, "aria-label": "Table" }, text);
-  return [
-    code,
-    h(
-      "p",
-      { className: "actions" },
-      button("Copy", async () => {
-        try {
-          await navigator.clipboard.writeText(text);
-          said.textContent = "Copied.";
-        } catch {
-          getSelection().selectAllChildren(code);
-          said.textContent = "Selected; copy it with the keyboard.";
-        }
-      }),
-      said,
-      h("span", { className: "hint" }, "Put it into zrm.toml. The agent notices the change."),
-    ),
-  ];
 }

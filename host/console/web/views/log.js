@@ -5,7 +5,7 @@ import { drawRates } from "../charts.js";
 import { empty, failure, fill, h, loading, sentence, table } from "../dom.js";
 import { followPairs, rangesPanel, tableName, tableOf } from "../following.js";
 import { bytes, number, plural, stamp, time } from "../format.js";
-import { again, isFile, judge, judgeUnmonitored, kindOf } from "../logstate.js";
+import { again, formatOf, isFile, judge, judgeUnmonitored } from "../logstate.js";
 
 const EVERY = 10000;
 const CHART_EVERY = 60000;
@@ -144,7 +144,7 @@ function drawState(element, log, configuration, source) {
   const ledger = log.ledger || {};
   const follow = ledger.follow;
   const pairs = [
-    ["Kind", kindOf(row)],
+    ["Kind", formatOf(row, source)],
     [
       "Configured by",
       source ? tableName(source) : follow ? "a [[log]] table" : "log configuration",

@@ -3,9 +3,9 @@
 import { get, post, viewModule, withQuery } from "../api.js";
 import { sparkline } from "../charts.js";
 import { button, debounce, empty, failure, fill, h, loading, say, select, table } from "../dom.js";
-import { tableName, tablesPanel } from "../following.js";
+import { tableName, tableOf, tablesPanel } from "../following.js";
 import { ago, briefTime, bytes, describe, number, rate, rateText } from "../format.js";
-import { again, judge, judgeUnmonitored, kindOf } from "../logstate.js";
+import { again, formatOf, judge, judgeUnmonitored } from "../logstate.js";
 
 const EVERY = 5000;
 const MINUTE = 60000;
@@ -117,7 +117,11 @@ class LogsPage {
 
   #take({ logs, unmonitored, configuration, tables, time }) {
     this.logs = [
-      ...logs.map((log) => ({ ...log, ...judge(log) })),
+      ...logs.map((log) => ({
+        ...log,
+        ...judge(log),
+        format: formatOf(log.row, tableOf(log.log, tables)),
+      })),
       ...unmonitored.map((log) => ({ ...log, ...judgeUnmonitored(log), row: null })),
     ];
     this.at = Date.parse(time);
@@ -361,7 +365,7 @@ class LogsPage {
         h("a", { className: "break", href: withQuery("#/logs", { log: log.log }) }, log.log),
         why,
       ),
-      kindOf(log.row),
+      log.format,
       h("span", { title: "Mean of the last five minutes" }, rateText(perMinute)),
       day ? sparkline(day, `Entries over 24 hours, now ${rateText(perMinute)} per minute`) : "–",
       number(log.ledger?.rows ?? log.row.NUMEVENTS),

@@ -1,6 +1,7 @@
 // Try a format: what a format makes of lines, while it is typed.
 
 import { get, post } from "../api.js";
+import { copyable } from "../copyable.js";
 import { button, debounce, empty, failure, field, fill, h, select } from "../dom.js";
 import { showSuggestion } from "../suggest.js";
 import { columnsPanel, coverage, fieldNames, linesPanel, markedAt } from "../trial.js";
@@ -254,36 +255,11 @@ class TryPage {
     const text = isTable
       ? answer.table.trimEnd().replace(`'${SOME_LOG}'`, () => tomlString(path))
       : answer.configuration_line.replace(/^\S+/, () => path);
-    const said = h("span", { role: "status", className: "hint" });
-    const code = h(
-      "pre",
-      {
-        className: "copyable",
-        tabIndex: 0,
-        "aria-label": isTable ? "Table" : "Configuration line",
-      },
-      text,
-    );
     return h(
       "section",
       { className: "panel" },
       h("h2", {}, isTable ? "Table for zrm.toml" : "Line for the agent's configuration"),
-      code,
-      h(
-        "p",
-        { className: "actions" },
-        button("Copy", async () => {
-          try {
-            await navigator.clipboard.writeText(text);
-            said.textContent = "Copied.";
-          } catch {
-            getSelection().selectAllChildren(code);
-            said.textContent = "Selected; copy it with the keyboard.";
-          }
-        }),
-        said,
-        h("span", { className: "hint" }, this.#advice(isTable)),
-      ),
+      copyable(text, isTable ? "Table" : "Configuration line", this.#advice(isTable)),
     );
   }
 

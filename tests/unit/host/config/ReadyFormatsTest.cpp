@@ -86,7 +86,7 @@ TEST_F(ReadyFormatsTest, AnUnknownNameIsAnsweredWithNamesLikeIt) {
         write(std::string(name) + ".toml", "type = 'json'");
     }
     EXPECT_EQ(problemOf("nginx-acess").text(),
-              "there is no format 'nginx-acess'; names like it are 'nginx-access'");
+              "'nginx-acess' is not a ready format; write a name such as 'nginx-access'");
     EXPECT_EQ(problemOf("nginx").cure, "names like it are 'nginx-access', 'nginx-error'");
     EXPECT_EQ(problemOf("quite-different").cure, "'zrmctl formats list' shows those there are");
 }
@@ -99,7 +99,7 @@ TEST_F(ReadyFormatsTest, NothingButANameIsLookedFor) {
         EXPECT_THAT(problemOf(name).what, HasSubstr("is not the name of a ready format")) << name;
     }
     EXPECT_THAT(problemOf(std::string(65, 'x')).what, HasSubstr("is not the name"));
-    EXPECT_THAT(problemOf("x.toml").what, HasSubstr("there is no format 'x.toml'"));
+    EXPECT_THAT(problemOf("x.toml").what, HasSubstr("'x.toml' is not a ready format"));
 }
 
 TEST_F(ReadyFormatsTest, TheFirstDirectoryWithTheNameCounts) {
@@ -173,13 +173,30 @@ TEST_F(ReadyFormatsTest, ATableNamesAFormatWithOrWithoutItsType) {
     EXPECT_THAT(log.follow.format->definition(), testing::Not(HasSubstr("src")));
 }
 
+TEST_F(ReadyFormatsTest, ATableHasTheNamesOfItsFormatsOrItsType) {
+    write("shop.toml", "type = 'json'");
+    write("cart.toml", "type = 'syslog'");
+    write("desk.toml", "type = 'syslog'");
+    const auto nameOf = [this](const std::string& keys) {
+        const auto config = parse(keys);
+        return config ? config->logs.front().formatName : config.error().front();
+    };
+    EXPECT_EQ(nameOf("path = '/a'\nformat = 'shop'\n"), "shop");
+    EXPECT_EQ(nameOf("path = '/a'\nformat = ['cart', 'desk']\n"), "cart, desk");
+    EXPECT_EQ(nameOf("type = 'command'\ncommand = 'a'\nformat = 'shop'\n"), "shop");
+    EXPECT_EQ(nameOf("type = 'command'\ncommand = 'a'\n"), "command");
+    EXPECT_EQ(nameOf("path = '/a'\n"), "syslog");
+    EXPECT_EQ(nameOf("path = '/a'\ntype = 'regex'\nformat = '(?P<description>.*)'\n"), "regex");
+}
+
 TEST_F(ReadyFormatsTest, SaysWhatIsWrongWithTheNameInATable) {
     write("shop.toml", "type = 'json'");
     write("cart.toml", "type = 'json'");
     write("bad.toml", "type = 'json'\nx = 1");
-    EXPECT_THAT(problemsOf("path = '/a'\nformat = 'shopp'\n"),
-                ElementsAre("zrm.toml:5: log.format: there is no format 'shopp'; names like it are "
-                            "'shop'"));
+    EXPECT_THAT(
+        problemsOf("path = '/a'\nformat = 'shopp'\n"),
+        ElementsAre("zrm.toml:5: log.format: 'shopp' is not a ready format; write a name such as "
+                    "'shop'"));
     EXPECT_THAT(problemsOf("path = '/a'\nformat = 'bad'\n"),
                 ElementsAre(AllOf(HasSubstr("zrm.toml:5: log.format: the format 'bad' cannot be "),
                                   HasSubstr("/bad.toml:2: x: unknown key"))));

@@ -129,7 +129,7 @@ TEST(SourceTables, ReadsHowTheOutputOfACommandIsTakenApart) {
     EXPECT_TRUE(own.follow.format && own.follow.join);
     EXPECT_TRUE(logsOf(log + "[[log.extract]]\npatterns = ['(?P<a>b)']\n")[0].follow.format);
     EXPECT_THAT(problemsOf(log + "format = 'jsonn'\ncolumns = { time = 'at' }\n"),
-                ElementsAre(HasSubstr("zrm.toml:6: log.format: there is no format 'jsonn'")));
+                ElementsAre(HasSubstr("zrm.toml:6: log.format: 'jsonn' is not a ready format")));
     EXPECT_THAT(problemsOf(log + "entry = { }\n"),
                 ElementsAre(HasSubstr("log.entry: does not say which lines make an entry")));
 }

@@ -32,7 +32,7 @@ TEST(FoundLogs, KeepsTheFirstFilesThatArePassedOver) {
 
 TEST(FoundLogs, YieldsTheFilesOfTheLogConfiguration) {
     FoundLogs found;
-    found.sources.push_back({1, {"/*.log"}, {"/a.log", "/b.log"}, {}, 0, ""});
+    found.sources.push_back({1, "syslog", {"/*.log"}, {"/a.log", "/b.log"}, {}, 0, ""});
     const std::vector<FoundLogs::Source> beside = found.sourcesBeside({"/a.log", "/c.log"});
     ASSERT_EQ(beside.size(), 1U);
     EXPECT_THAT(beside[0].files, ElementsAre("/b.log"));
@@ -43,13 +43,14 @@ TEST(FoundLogs, YieldsTheFilesOfTheLogConfiguration) {
 }
 
 TEST(FoundLogs, WritesATable) {
-    FoundLogs::Source source{3, {"/*.log"}, {"/a.log"}, {}, 0, "More match"};
+    FoundLogs::Source source{3, "json", {"/*.log"}, {"/a.log"}, {}, 0, "More match"};
     source.passOver("/\xff.log", "Its name is not UTF-8");
-    EXPECT_EQ(jsonOf(source),
-              R"({"line":3,"path":["/*.log"],"files":["/a.log"],"passed_over":[{"file":")"
-              "/\xef\xbf\xbd.log"
-              R"(","reason":"Its name is not UTF-8."}],"passed_over_count":1,)"
-              R"("problem":"More match."})");
+    EXPECT_EQ(
+        jsonOf(source),
+        R"({"line":3,"format":"json","path":["/*.log"],"files":["/a.log"],"passed_over":[{"file":")"
+        "/\xef\xbf\xbd.log"
+        R"(","reason":"Its name is not UTF-8."}],"passed_over_count":1,)"
+        R"("problem":"More match."})");
     EXPECT_TRUE(jsonOf({}).ends_with(R"("problem":null})"));
 }
 
