@@ -18,7 +18,7 @@ struct LogConfig {
     std::string type = "syslog";       ///< its name
     char letter = 'S';                 ///< the type as FurtherLog has it
     std::string format;                ///< of a text log; the command of an error log
-    std::string formatName;            ///< the ready formats as named, or the type
+    std::string formatName = "syslog"; ///< the ready formats as named, or the type
     std::string name;                  ///< of a log that is not a file
     std::optional<JournalConfig> journal;
     Defined<MessageFormat> messages; ///< of the journal; none: they are read as they are

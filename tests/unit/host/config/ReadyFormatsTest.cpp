@@ -87,8 +87,8 @@ TEST_F(ReadyFormatsTest, AnUnknownNameIsAnsweredWithNamesLikeIt) {
     }
     EXPECT_EQ(problemOf("nginx-acess").text(),
               "'nginx-acess' is not a ready format; write a name such as 'nginx-access'");
-    EXPECT_EQ(problemOf("nginx").cure, "names like it are 'nginx-access', 'nginx-error'");
-    EXPECT_EQ(problemOf("quite-different").cure, "'zrmctl formats list' shows those there are");
+    EXPECT_EQ(problemOf("nginx").cure, "write a name such as 'nginx-access', 'nginx-error'");
+    EXPECT_EQ(problemOf("quite-different").cure, "write a name that 'zrmctl formats list' shows");
 }
 
 TEST_F(ReadyFormatsTest, NothingButANameIsLookedFor) {
