@@ -26,7 +26,7 @@ bool isFurther(std::string_view line) noexcept {
 bool isHost(std::string_view word) noexcept {
     return !isLevelName(word) && !word.ends_with(':') &&
            std::all_of(word.begin(), word.end(), [](char c) {
-               constexpr std::string_view others = ".-_:%";
+               constexpr std::string_view others = ".-_:%,";
                return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') ||
                       others.find(c) != std::string_view::npos ||
                       static_cast<unsigned char>(c) > 0x7f;

@@ -150,6 +150,9 @@ private:
                     ? 10
                     : 0;
         rank += at >= m_head.certain ? 5 : 0;
+        const bool isBeforeDash = at + 1 < m_length && token(at + 1).mark == '-' &&
+                                  token(at + 1).kind == Kind::mark && hasBlanks(at);
+        rank += isBeforeDash ? 20 : 0;
         rank -=
             isForMost(
                 at, [](std::string_view text) { return text.find(' ') != std::string_view::npos; })

@@ -65,14 +65,18 @@ std::size_t levelOf(const Line& line, std::size_t time) {
 }
 
 /// The number of tokens up to a name that a dash follows, as in "com.example.Main - started"; that
-/// many if there is none.
+/// many if there is none. Behind brackets any word is such a name.
 std::size_t withSource(const Line& line, std::size_t count) {
     constexpr std::size_t furthest = 5;
+    bool isBehindBrackets = false;
     for (std::size_t at = count; at + 2 < std::min(line.size(), count + furthest); ++at) {
-        if (line[at].kind == Kind::path && line[at].blanks > 0 && line[at + 1].mark == '-' &&
-            line[at + 1].blanks > 0) {
+        const bool isName =
+            line[at].kind == Kind::path || (line[at].kind == Kind::word && isBehindBrackets);
+        if (isName && line[at].blanks > 0 && line[at + 1].mark == '-' &&
+            line[at + 1].kind == Kind::mark && line[at + 1].blanks > 0) {
             return at + 2;
         }
+        isBehindBrackets = line[at].kind == Kind::bracket;
     }
     return count;
 }
@@ -226,14 +230,16 @@ private:
         std::size_t wide = 0;
         std::size_t marked = 0;
         for (const Line* line : head.lines) {
-            wide += (*line)[at].blanks > 1 ? 1 : 0;
+            // Pairs are often lined up behind a message.
+            const bool isBeforeText = at + 1 < line->size() && (*line)[at + 1].kind != Kind::pair;
+            wide += (*line)[at].blanks > 1 && isBeforeText ? 1 : 0;
             constexpr std::string_view delimiters = "|\t;-";
             marked += at + 1 < line->size() && (*line)[at + 1].kind == Kind::mark &&
                               delimiters.find((*line)[at + 1].mark) != std::string_view::npos
                           ? 1
                           : 0;
         }
-        return wide * 2 >= head.lines.size() || marked * 10 >= head.lines.size() * 9;
+        return wide * 10 >= head.lines.size() * 8 || marked * 10 >= head.lines.size() * 9;
     }
 
     std::map<std::string, LineHead> m_groups;

@@ -341,7 +341,7 @@ private:
     }
 
     static bool isArrow(std::string_view word) {
-        return word == "->" || word == "=>" || word == "::" || word == ">>";
+        return word == "->" || word == "=>" || word == "::" || word == ">>" || word == "--";
     }
 
     static Kind kindOf(std::string_view word, bool hasColon) {

@@ -11,10 +11,10 @@ namespace {
 
 /// That hardly stand for anything else.
 constexpr std::string_view clearLevels[] = {
-    "trace",  "debug",     "verbose", "info",        "notice",   "warn",  "warning",
-    "error",  "err",       "crit",    "fatal",       "critical", "alert", "emerg",
-    "severe", "emergency", "panic",   "dbg",         "wrn",      "inf",   "ftl",
-    "vrb",    "audit",     "ddebug",  "information", "finest",   "finer", "subdebug"};
+    "trace",       "debug",  "verbose", "info",     "notice", "warn",  "warning", "error",
+    "err",         "crit",   "fatal",   "critical", "alert",  "emerg", "severe",  "emergency",
+    "panic",       "dbg",    "wrn",     "inf",      "ftl",    "vrb",   "audit",   "ddebug",
+    "information", "finest", "finer",   "subdebug", "erro",   "debu",  "fata",    "pani"};
 constexpr std::string_view otherLevels[] = {"fine",    "inform",  "log",    "success",
                                             "config",  "note",    "system", "default",
                                             "display", "message", "fail",   "failure"};

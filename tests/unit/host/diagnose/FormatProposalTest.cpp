@@ -142,6 +142,18 @@ TEST(FormatProposal, WritesOutLevelsOfOneLetter) {
               "INFO|server.go:415|ready");
 }
 
+TEST(FormatProposal, ADashSeparatesTheSourceFromTheMessage) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00,123\tINFO worker.py:1528 -- started"}),
+              "INFO|worker.py:1528|started");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00,123 WARN [qtp1-4:/x] [name=a;ip=b;] soap - slow"}),
+              "WARN|soap|slow");
+}
+
+TEST(FormatProposal, PairsBehindAPaddedMessageMakeNoColumnOfIt) {
+    EXPECT_EQ(columnsOf({"ERRO[0013] failed                     error=x"}),
+              "ERRO||failed                     error=x");
+}
+
 TEST(FormatProposal, WordsOfMessagesAreNoColumns) {
     const std::vector<std::string> lines = {
         "[2026-11-19 10:00:00] INFO starting", "[2026-11-19 10:00:01] INFO Config: 2 files",
