@@ -125,7 +125,7 @@ def test_show_prints_the_file():
     assert status == 0
     assert output == f"# {FORMATS}/redis.toml\n" + (FORMATS / "redis.toml").read_text(encoding="utf-8")
     status, _, error = run(["formats", "show", "reddis", *DIRECTORY])
-    assert status == 1 and "names like it are 'redis'" in error
+    assert status == 1 and "write a name such as 'redis'" in error
 
 
 def test_every_format_passes_its_samples():
