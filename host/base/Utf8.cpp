@@ -44,27 +44,6 @@ bool isContinuation(unsigned char byte) {
 
 } // namespace
 
-bool Utf8::isAscii(std::string_view text) noexcept {
-    constexpr std::size_t block = 4 * sizeof highBits;
-    const char* position = text.data();
-    const char* const end = position + text.size();
-    std::uint64_t seen = 0;
-    for (; static_cast<std::size_t>(end - position) >= block; position += block) {
-        seen |= fourWordsAt(position);
-    }
-    for (; static_cast<std::size_t>(end - position) >= sizeof seen; position += sizeof seen) {
-        seen |= wordAt(position);
-    }
-    if (text.size() >= sizeof seen) {
-        seen |= wordAt(end - sizeof seen); // the rest, including some bytes again
-    } else {
-        for (; position != end; ++position) {
-            seen |= static_cast<unsigned char>(*position);
-        }
-    }
-    return (seen & highBits) == 0;
-}
-
 std::size_t Utf8::asciiPrefix(std::string_view text) noexcept {
     std::size_t position = 0;
     constexpr std::size_t block = 4 * sizeof highBits;

@@ -12,9 +12,6 @@ namespace Utf8 {
 /// The replacement character in UTF-8.
 inline constexpr std::string_view replacement = "\xEF\xBF\xBD";
 
-/// Whether all of the text is ASCII. Looks at every byte, so it is for short texts that mostly are.
-bool isAscii(std::string_view text) noexcept;
-
 /// Length of the leading part that is ASCII.
 std::size_t asciiPrefix(std::string_view text) noexcept;
 

@@ -1,7 +1,8 @@
 // The host's implementation of locale.h.
 #include "framework/locale.h"
 
-#include "host/base/Utf8.h"
+#include "base/Ascii.h"
+
 #include "host/framework/CodePages.h"
 #include "host/framework/Converter.h"
 #include "host/framework/Status.h"
@@ -76,7 +77,7 @@ std::int32_t LOC2_TranslateString(std::uint32_t targetCodePage, char* target,
     // The common case: ASCII, which is the same in every known code page, and it fits.
     if (!terminates && sourceLength > 0 && sourceLength <= targetSize &&
         CodePages::isKnown(targetCodePage) && CodePages::isKnown(sourceCodePage) &&
-        Utf8::isAscii({source, sourceLength})) {
+        zrm::isAscii({source, sourceLength})) {
         std::memcpy(target, source, sourceLength);
         report(resultLength, sourceLength);
         report(status, Status::ok);

@@ -1,7 +1,7 @@
 #include "host/framework/Operators.h"
 
+#include "base/Ascii.h"
 #include "framework/locale.h"
-#include "host/base/Utf8.h"
 
 #include <algorithm>
 
@@ -53,7 +53,7 @@ std::vector<std::string_view> linesOf(std::string_view text) {
 }
 
 PatternText patternTextOf(bool isUtf8Column, std::string_view pattern) {
-    const bool isByBytes = !isUtf8Column && Utf8::isAscii(pattern) &&
+    const bool isByBytes = !isUtf8Column && isAscii(pattern) &&
                            LOC2_GetLocaleNumInfo(LOC2_GetLocale(0, 0, 0, nullptr), LOC2_CODEPAGE,
                                                  nullptr) != LOC2_UTF8;
     return isByBytes ? PatternText::bytes : PatternText::utf8;

@@ -49,6 +49,7 @@ public:
         append("; exit status = ");
         append(record.e_exit);
     }
+    std::string_view text() const noexcept { return {m_text, m_length}; }
     /// Writes at most `room` bytes, without a terminator, and returns their number.
     std::int32_t write(char* dest, std::size_t room, bool toUTF8) const {
         if (toUTF8) {
@@ -97,14 +98,12 @@ long AdminLogFile::formatEntryAsRow(char* record, void* row, void* /*context*/) 
     }
     const std::string_view line = fieldText(entry.ut_line);
     std::memcpy(columns.entrysrc, line.data(), line.size());
-    UTF8Conv::Convert_toUTF8(columns.uentrysrc, sizeof columns.uentrysrc, line.data(), line.size(),
-                             LOC2_NO_TERMINATOR);
+    columnToUTF8(columns.uentrysrc, line);
     fillEntryType(columns.entrytype, sizeof columns.entrytype, entry.ut_type);
     const Description description(entry);
     const std::int32_t length =
         description.write(columns.entrydesc, sizeof columns.entrydesc, false);
-    const std::int32_t lengthInUTF8 =
-        description.write(columns.uentrydesc, sizeof columns.uentrydesc, true);
+    const std::int32_t lengthInUTF8 = columnToUTF8(columns.uentrydesc, description.text());
     entryRow.setDescriptionLengths(static_cast<std::size_t>(length), lengthInUTF8);
     return trace.result(0L);
 }

@@ -1,8 +1,6 @@
 #include "logtypes/ColumnsRow.h"
 
 #include "base/TraceScope.h"
-#include "base/UTF8Conv.h"
-#include "framework/locale.h"
 #include "logtypes/EntryStamp.h"
 #include "monitor/EntryRow.h"
 
@@ -57,11 +55,7 @@ bool ColumnsRow::fill(EntryRow& row, const EntryColumns& entry, EntryStamp& stam
     fillColumn(row->entrytype, entry.type);
     fillColumn(row->entryclass, entry.entryClass);
     const std::size_t length = fillColumn(row->entrydesc, entry.description);
-    UTF8Conv::Convert_toUTF8(row->uentrysrc, sizeof row->uentrysrc, row->entrysrc, sourceLength,
-                             LOC2_NO_TERMINATOR);
-    const std::int32_t lengthInUTF8 = UTF8Conv::Convert_toUTF8(
-        row->uentrydesc, sizeof row->uentrydesc, row->entrydesc, length, LOC2_NO_TERMINATOR);
-    row.setDescriptionLengths(length, lengthInUTF8);
+    row.fillInUTF8({row->entrysrc, sourceLength}, {row->entrydesc, length});
     return trace.result(true);
 }
 

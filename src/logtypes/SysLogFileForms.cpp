@@ -2,8 +2,6 @@
 
 #include "base/RowBytes.h"
 #include "base/TraceScope.h"
-#include "base/UTF8Conv.h"
-#include "framework/locale.h"
 #include "logs/FollowSettings.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/SysLogFile.h"
@@ -12,6 +10,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <optional>
 #include <string_view>
 
 namespace zrm {
@@ -75,19 +74,14 @@ long SysLogFile::formatFollowedEntry(char* line, EntryRow& row, void* reportStat
                                 : SyslogClock::readOnce(text, *followSettings(),
                                                         newestOf(reportState), entry.entrytime);
     const SyslogParts parts = SyslogForms::split(text, head);
-    if (const auto priority = SyslogForms::priority(text)) {
+    if (const auto priority = text.starts_with('<') ? SyslogForms::priority(text) : std::nullopt) {
         fillColumn(entry.entrytype, SyslogForms::severityOf(*priority));
         fillColumn(entry.entryclass, SyslogForms::facilityOf(*priority));
     }
     fillColumn(entry.entrysys, parts.host);
     const std::size_t sourceLength = fillSource(entry.entrysrc, parts);
     const std::size_t length = fillColumn(entry.entrydesc, parts.description);
-    UTF8Conv::Convert_toUTF8(entry.uentrysrc, sizeof entry.uentrysrc, entry.entrysrc, sourceLength,
-                             LOC2_NO_TERMINATOR);
-    const std::int32_t lengthInUTF8 =
-        UTF8Conv::Convert_toUTF8(entry.uentrydesc, sizeof entry.uentrydesc,
-                                 parts.description.data(), length, LOC2_NO_TERMINATOR);
-    row.setDescriptionLengths(length, lengthInUTF8);
+    row.fillInUTF8({entry.entrysrc, sourceLength}, {parts.description.data(), length});
     return trace.result(0L);
 }
 

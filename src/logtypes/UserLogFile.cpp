@@ -3,8 +3,6 @@
 #include "base/ErrorText.h"
 #include "base/LockGuard.h"
 #include "base/TraceScope.h"
-#include "base/UTF8Conv.h"
-#include "framework/locale.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
 #include "logtypes/EntryTime.h"
@@ -144,11 +142,8 @@ long UserLogFile::formatEntryAsRow(char* line, void* row, void* reportContext) {
             return trace.result(-1L);
         }
     }
-    UTF8Conv::Convert_toUTF8(columns->uentrysrc, sizeof columns->uentrysrc, columns->entrysrc,
-                             sizeof columns->entrysrc, LOC2_NO_TERMINATOR);
-    const std::int32_t lengthInUTF8 =
-        UTF8Conv::Convert_toUTF8(columns->uentrydesc, sizeof columns->uentrydesc,
-                                 columns->entrydesc, sizeof columns->entrydesc, LOC2_NO_TERMINATOR);
+    columnToUTF8(columns->uentrysrc, columns->entrysrc);
+    const std::int32_t lengthInUTF8 = columnToUTF8(columns->uentrydesc, columns->entrydesc);
     const _FormatBuffer& description = *(std::end(buffers) - 2);
     columns.setDescriptionLengths(
         static_cast<std::size_t>(description.position - columns->entrydesc), lengthInUTF8);

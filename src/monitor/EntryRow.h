@@ -1,11 +1,13 @@
 #ifndef ZRM_ENTRY_ROW_H
 #define ZRM_ENTRY_ROW_H
 
+#include "base/UTF8Conv.h"
 #include "logs/zrm_rmlogent_data.h"
 
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <string_view>
 
 namespace zrm {
 
@@ -54,6 +56,14 @@ public:
             m_own->m_descriptionLengthInUTF8 =
                 std::min(static_cast<std::size_t>(lengthInUTF8), sizeof m_columns.uentrydesc);
         }
+    }
+    /// Fills UENTRYSRC and UENTRYDESC of an entry of a followed log from the texts of ENTRYSRC and
+    /// ENTRYDESC, and states the lengths of the descriptions.
+    void fillInUTF8(std::string_view source, std::string_view description) {
+        UTF8Conv::columnToUTF8(m_columns.uentrysrc, sizeof m_columns.uentrysrc, source);
+        setDescriptionLengths(
+            description.size(),
+            UTF8Conv::columnToUTF8(m_columns.uentrydesc, sizeof m_columns.uentrydesc, description));
     }
     /// Fills the common columns again, because the text of a field has overrun them.
     void restoreCommonColumns();

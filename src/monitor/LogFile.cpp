@@ -4,6 +4,8 @@
 #include "base/ErrorText.h"
 #include "base/ProcessValues.h"
 #include "base/TraceScope.h"
+#include "base/UTF8Conv.h"
+#include "framework/locale.h"
 #include "logs/LogManagerUtil.h"
 #include "logs/ValidLog.h"
 #include "monitor/FollowLedger.h"
@@ -233,6 +235,13 @@ void LogFile::fillChangingColumns(zrm_rmlogent_data_t* row) {
     row->sampleno = 0;
     row->rowno = 0;
     BrevanTime::generateCurrentTimestamp(row->timestamp);
+}
+
+/// What is asked of the framework for a log of the log configuration is part of its contract.
+std::int32_t LogFile::columnToUTF8(char* column, std::size_t room, std::string_view text) const {
+    return isFollowed() ? UTF8Conv::columnToUTF8(column, room, text)
+                        : UTF8Conv::Convert_toUTF8(column, room, text.data(), text.size(),
+                                                   LOC2_NO_TERMINATOR);
 }
 
 void LogFile::printSelf() const {

@@ -13,6 +13,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <cstdio>
 #include <ctime>
@@ -172,6 +173,16 @@ protected:
     static void count(std::atomic<std::int64_t>& counter) noexcept;
     /// Fills the columns common to all kinds of logs, in a row whose common columns are blank.
     void fillCommonColumns(zrm_rmlogent_data_t* row) const;
+    /// Converts a text of an entry, which is in the local code page, for a column in UTF-8. Returns
+    /// the number of bytes written.
+    template <std::size_t width>
+    std::int32_t columnToUTF8(char (&column)[width], std::string_view text) const {
+        return columnToUTF8(column, width, text);
+    }
+    template <std::size_t width, std::size_t localWidth>
+    std::int32_t columnToUTF8(char (&column)[width], const char (&local)[localWidth]) const {
+        return columnToUTF8(column, width, {local, localWidth});
+    }
     /// The row in which the log's thread offers its entries.
     zrm_rmlogent_data_t* ownRow() noexcept { return m_ownRow.columns(); }
 
@@ -212,11 +223,13 @@ private:
     friend class EntryRow;
 
     void initializeLock();
+    std::int32_t columnToUTF8(char* column, std::size_t room, std::string_view text) const;
     static void fillChangingColumns(zrm_rmlogent_data_t* row);
     bool waitAndOffer(zrm_rmlogent_data_t* row);
     bool checkForChange();
     bool readGrowth();
     std::int64_t timeOf(zrm_rmlogent_data_t& row);
+    void noteMissingTime();
     void recount(FileFollower& follower, std::size_t recordLength);
     bool readEntries(FileFollower& follower, LogPositions& positions, FollowedEntry& current);
     void noteFollowed(FileFollower& follower, LogPositions& positions);

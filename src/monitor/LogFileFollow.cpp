@@ -194,13 +194,20 @@ void LogFile::readFields(std::string_view /*text*/, EntryFields& /*fields*/) con
 /// The time of the entry that the row was just made of, in seconds since 1970-01-01 UTC.
 std::int64_t LogFile::timeOf(zrm_rmlogent_data_t& row) {
     const std::int64_t time = m_clock.next(lastEntryMoment, row.entrytime);
-    if (!m_clock.hadTime() && !std::exchange(m_isMissingTimeTraced, true)) {
+    if (!m_clock.hadTime()) [[unlikely]] {
+        noteMissingTime();
+    }
+    return time;
+}
+
+/// Apart from what runs for each entry.
+[[gnu::noinline]] void LogFile::noteMissingTime() {
+    if (!std::exchange(m_isMissingTimeTraced, true)) {
         TraceScope trace(anchor);
         trace.error()("Entry without a time that can be read in file %s. Such entries count with "
                       "the time of the entry before them. Further ones are not traced.",
                       fileNameLocal());
     }
-    return time;
 }
 
 /// Records how far the log was read.

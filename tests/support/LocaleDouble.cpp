@@ -1,5 +1,6 @@
 #include "support/LocaleDouble.h"
 
+#include <algorithm>
 #include <atomic>
 #include <cstring>
 #include <mutex>
@@ -101,10 +102,13 @@ extern "C" std::int32_t __wrap__Z20LOC2_TranslateStringjPcjjPKcjPjiS2_(
     std::uint32_t targetCodePage, char* target, std::uint32_t targetSize,
     std::uint32_t sourceCodePage, const char* source, std::uint32_t sourceLength,
     std::uint32_t* resultLength, int flags, std::uint32_t* status) {
-    const std::string text(source, sourceLength);
+    std::string text(source, sourceLength);
     {
         const std::lock_guard guard(g_mutex);
         recorded().push_back({targetCodePage, targetSize, sourceCodePage, text, flags});
+    }
+    if (sourceCodePage == LocaleDouble::germanPage) {
+        std::replace(text.begin(), text.end(), '{', '\xE4');
     }
     std::string result = targetCodePage == LOC2_UTF8 ? toUTF8(text) : fromUTF8(text);
     const std::size_t terminator = flags == LOC2_NO_TERMINATOR ? 0 : 1;

@@ -8,10 +8,13 @@
 #include <vector>
 
 /// Stands in for the framework's locale services (linked with --wrap): a locale whose code page is
-/// ISO-8859-1 (819) unless a test says otherwise. Translation between 819 and 1208 is real.
+/// ISO-8859-1 (819) unless a test says otherwise. Translation between 819 and 1208 is real, and so
+/// is that of one character of 1011.
 namespace LocaleDouble {
 
 inline constexpr std::uint32_t latin1Page = 819;
+/// ISO 646 as Germany had it: 0x7B is not a brace but an umlaut.
+inline constexpr std::uint32_t germanPage = 1011;
 
 /// One call of LOC2_TranslateString.
 struct Translation {

@@ -8,7 +8,10 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <cstring>
 #include <string>
+#include <string_view>
+#include <vector>
 
 using namespace zrm;
 
@@ -94,6 +97,73 @@ TEST_F(UTF8ConvTest, WithoutACodePageEachCallReportsItAndConvertsNothing) {
                                               "Codepage return was 0; Not a valid codepage.",
                                               "Codepage returned was 0; not a valid codepage.",
                                               "Codepage return was 0; Not a valid codepage."));
+}
+
+class UTF8ConvColumnTest : public UTF8ConvTest {
+protected:
+    /// What was found out about ASCII is valid until a trace level changes.
+    void setCodePage(std::uint32_t codePage) {
+        LocaleDouble::setCodePage(codePage);
+        m_trace.setLevel(0);
+    }
+    std::string column(std::string_view text, std::size_t room = sizeof out) {
+        std::strcpy(out, "untouched");
+        const std::int32_t written = UTF8Conv::columnToUTF8(out, room, text);
+        EXPECT_STREQ(out + written, &"untouched"[written]) << "nothing is written behind the text";
+        return {out, static_cast<std::size_t>(written)};
+    }
+    /// What the framework is asked to translate, apart from all of ASCII.
+    static std::vector<std::string> translated() {
+        std::vector<std::string> texts;
+        for (const LocaleDouble::Translation& translation : LocaleDouble::translations()) {
+            EXPECT_EQ(translation.flags, LOC2_NO_TERMINATOR);
+            if (translation.source.size() < 128) {
+                texts.push_back(translation.source);
+            }
+        }
+        return texts;
+    }
+
+    RecordingTrace m_trace{0};
+};
+
+TEST_F(UTF8ConvColumnTest, AsciiIsNotHandedToTheFramework) {
+    EXPECT_EQ(column("abc{"), "abc{");
+    EXPECT_EQ(column(""), "");
+    EXPECT_THAT(translated(), ElementsAre());
+}
+
+TEST_F(UTF8ConvColumnTest, OtherTextsAreTranslated) {
+    EXPECT_EQ(column("gr\xFC\xDF"), "gr\xC3\xBC\xC3\x9F");
+    EXPECT_THAT(translated(), ElementsAre("gr\xFC\xDF"));
+}
+
+TEST_F(UTF8ConvColumnTest, ATextThatDoesNotFitIsTranslatedAsFarAsItFits) {
+    EXPECT_EQ(column("abcd", 3), "abc");
+    EXPECT_THAT(translated(), ElementsAre("abcd"));
+}
+
+TEST_F(UTF8ConvColumnTest, ACodePageWithOtherAsciiTranslatesAll) {
+    for (int i = 0; i < 2; ++i) {
+        setCodePage(LocaleDouble::germanPage);
+        EXPECT_EQ(column("abc{"), "abc\xC3\xA4");
+        EXPECT_EQ(column("abc"), "abc");
+        setCodePage(LocaleDouble::latin1Page);
+        EXPECT_EQ(column("abc{"), "abc{");
+    }
+    EXPECT_THAT(translated(), ElementsAre("abc{", "abc", "abc{", "abc"));
+}
+
+TEST_F(UTF8ConvColumnTest, WithoutACodePageNothingIsConverted) {
+    setCodePage(0);
+    EXPECT_EQ(column("abc"), "");
+    EXPECT_THAT(m_trace.messages(), ElementsAre("Codepage returned was 0; not a valid codepage."));
+}
+
+TEST_F(UTF8ConvColumnTest, TheDetailClassTracesEachColumn) {
+    m_trace.setLevel(TRC1_DETAIL);
+    EXPECT_EQ(column("abc"), "abc");
+    EXPECT_THAT(m_trace.messages(), ElementsAre("bytesCopied = 3"));
 }
 
 // The locale is looked up once per process and direction, so these cases need a fresh process.
