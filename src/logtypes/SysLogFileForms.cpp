@@ -19,6 +19,20 @@ namespace {
 
 TRC1_Anchor anchor{"SysLogFileForms.cpp"};
 
+/// The line of a log of which the calling thread made the log's own row last. The conditions on its
+/// fields ask for them right after that.
+struct LastLine {
+    std::string_view line = "";
+    SyslogHead::Form form = SyslogHead::Form::none;
+    SyslogParts parts;
+
+    bool is(std::string_view other) const noexcept {
+        return other.data() == line.data() && other.size() == line.size();
+    }
+};
+
+constinit thread_local LastLine lastLine;
+
 /// In a report, the entry read before is newer.
 char* newestOf(void* reportState) {
     return reportState == nullptr ? nullptr
@@ -55,7 +69,11 @@ std::size_t fillSource(char (&column)[width], const SyslogParts& parts) {
 } // namespace
 
 void SysLogFile::readFields(std::string_view text, EntryFields& fields) const {
-    SyslogFields::read(text, fields);
+    if (lastLine.is(text)) {
+        SyslogFields::read(text, lastLine.form, lastLine.parts, fields);
+    } else {
+        SyslogFields::read(text, fields);
+    }
 }
 
 char* SysLogFile::formatFollowedTime(char* out, char* line, void* reportState) const {
@@ -69,11 +87,16 @@ long SysLogFile::formatFollowedEntry(char* line, EntryRow& row, void* reportStat
     TraceScope trace(anchor);
     zrm_rmlogent_data_t& entry = row.columns();
     const std::string_view text = withoutLineEnd(line);
-    const SyslogHead head = row.isOwn() && reportState == nullptr
-                                ? m_lineClock.read(text, entry.entrytime)
-                                : SyslogClock::readOnce(text, *followSettings(),
-                                                        newestOf(reportState), entry.entrytime);
+    const bool isOwn = row.isOwn() && reportState == nullptr;
+    const SyslogHead head = isOwn ? m_lineClock.read(text, entry.entrytime)
+                                  : SyslogClock::readOnce(text, *followSettings(),
+                                                          newestOf(reportState), entry.entrytime);
     const SyslogParts parts = SyslogForms::split(text, head);
+    if (isOwn) {
+        lastLine.line = text;
+        lastLine.form = head.form;
+        lastLine.parts = parts;
+    }
     if (const auto priority = text.starts_with('<') ? SyslogForms::priority(text) : std::nullopt) {
         fillColumn(entry.entrytype, SyslogForms::severityOf(*priority));
         fillColumn(entry.entryclass, SyslogForms::facilityOf(*priority));

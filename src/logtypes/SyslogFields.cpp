@@ -1,7 +1,6 @@
 #include "logtypes/SyslogFields.h"
 
 #include "base/EntryFields.h"
-#include "logtypes/SyslogForms.h"
 
 #include <algorithm>
 #include <optional>
@@ -124,9 +123,13 @@ private:
 
 void SyslogFields::read(std::string_view line, EntryFields& fields) noexcept {
     const SyslogTime time = SyslogForms::recognise(line);
-    const SyslogParts parts = SyslogForms::split(line, time);
+    read(line, time.form, SyslogForms::split(line, time), fields);
+}
+
+void SyslogFields::read(std::string_view line, SyslogHead::Form form, const SyslogParts& parts,
+                        EntryFields& fields) noexcept {
     addPart(fields, "host", parts.host);
-    if (time.form == SyslogTime::Form::rfc5424) {
+    if (form == SyslogHead::Form::rfc5424) {
         addPart(fields, "tag", parts.source);
         addPart(fields, "pid", parts.processId);
         addPart(fields, "app", parts.source);

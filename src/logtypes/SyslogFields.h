@@ -1,6 +1,8 @@
 #ifndef ZRM_SYSLOG_FIELDS_H
 #define ZRM_SYSLOG_FIELDS_H
 
+#include "logtypes/SyslogForms.h"
+
 #include <string_view>
 
 namespace zrm {
@@ -19,6 +21,9 @@ namespace SyslogFields {
 
 /// Adds the fields of a line without its line end. They are views into the line. Any thread.
 void read(std::string_view line, EntryFields& fields) noexcept;
+/// Does the same for a line that SyslogForms has already taken apart.
+void read(std::string_view line, SyslogHead::Form form, const SyslogParts& parts,
+          EntryFields& fields) noexcept;
 
 } // namespace SyslogFields
 

@@ -2,12 +2,14 @@
 
 #include "logtypes/SysLogFile.h"
 
+#include "base/EntryFields.h"
 #include "base/ProcessValues.h"
 #include "logs/FollowSettings.h"
 #include "logs/FurtherLogs.h"
 #include "logs/RequestThresholds.h"
 #include "logs/ValidLog.h"
 #include "logs/zrm_rmlogent_data.h"
+#include "logtypes/SyslogFields.h"
 #include "logtypes/SyslogForms.h"
 #include "support/Faults.h"
 #include "support/LocaleDouble.h"
@@ -19,6 +21,7 @@
 #include <gtest/gtest.h>
 
 #include <cstdio>
+#include <limits>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -41,7 +44,17 @@ template <std::size_t width> std::string column(const char (&bytes)[width]) {
 class FollowedLog : public SysLogFile {
 public:
     explicit FollowedLog(const ValidLog& log) : SysLogFile(log, Unmonitored{}) {}
+    using LogFile::ownRow;
 };
+
+/// As NAME=VALUE.
+std::vector<std::string> textsOf(const EntryFields& fields) {
+    std::vector<std::string> texts;
+    for (const EntryFields::Field& field : fields.all()) {
+        texts.push_back(std::string(field.name) + '=' + std::string(field.value));
+    }
+    return texts;
+}
 
 class SyslogFormsTest : public testing::Test {
 protected:
@@ -157,6 +170,33 @@ TEST_F(SyslogFormsTest, LinesThatAreCutOffAreNotRecognised) {
           "Oct  5 07:03:09x a b: c", "<34>2 2006-10-05T05:03:09Z a b", "<>1 2006-10-05T05:03:09Z a",
           "ctN 12 07:03:09 a b: c"}) {
         EXPECT_EQ(SyslogForms::recognise(line).form, SyslogTime::Form::none) << line;
+    }
+}
+
+TEST_F(SyslogFormsTest, FieldsAreThoseOfTheTextWhateverRowWasMadeBefore) {
+    const std::unique_ptr<FollowedLog> log = make();
+    const auto expectFields = [&log](std::string_view text) {
+        EntryFields expected;
+        SyslogFields::read(text, expected);
+        EntryFields fields;
+        log->readFields(text, fields);
+        EXPECT_EQ(textsOf(fields), textsOf(expected)) << text;
+        EXPECT_FALSE(textsOf(fields).empty()) << text;
+    };
+    for (const char* const line :
+         {"Oct  5 07:03:09 web1 sshd[412]: text\n", "2006-10-05T05:03:10Z web2 cron: short\n",
+          "<34>1 2006-10-05T05:03:11Z web3 c 7 - [a b=\"c\"] d\n", "no syslog line\r\n"}) {
+        std::string entry = line;
+        ASSERT_EQ(log->formatEntryAsRow(entry.data(), log->ownRow(), nullptr), 0);
+        const std::string_view text =
+            std::string_view(entry).substr(0, entry.find_first_of("\r\n"));
+        expectFields(text);
+        expectFields(text.substr(0, text.size() - 1));
+        expectFields("Oct  5 07:03:10 web9 other: another line");
+        zrm_rmlogent_data_t row{};
+        std::string other = "Oct  5 07:03:11 web8 third: a row that is not the log's own\n";
+        ASSERT_EQ(log->formatEntryAsRow(other.data(), &row, nullptr), 0);
+        expectFields(text);
     }
 }
 
