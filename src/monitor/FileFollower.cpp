@@ -77,7 +77,7 @@ std::optional<LogPosition> FileFollower::position() const noexcept {
 
 bool FileFollower::look(const Moment& now) {
     m_now = now;
-    m_mayLeaveOut = 0;
+    m_mayLeaveOut = false;
     m_lookBegan = std::chrono::steady_clock::now();
     if (m_chain.empty()) {
         return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
@@ -112,10 +112,16 @@ void FileFollower::notePresent() {
 }
 
 bool FileFollower::isQuiet() noexcept {
-    if (m_mayLeaveOut == 0) {
+    if (!m_mayLeaveOut) {
         return false;
     }
-    --m_mayLeaveOut;
+    if (m_options.byName && ++m_leftOut == nameInterval) {
+        m_leftOut = 0;
+        struct stat named;
+        return lstat(m_path.c_str(), &named) == 0 &&
+               FileIdentity{named.st_dev, named.st_ino} == m_chain.front().file->identity() &&
+               Generation::Status::of(named) == m_seen;
+    }
     Generation::Status now;
     return m_chain.front().file->status(now) && now == m_seen;
 }
@@ -181,7 +187,8 @@ bool FileFollower::checkFile() {
         const bool isFailing =
             m_nameRetry.failures + m_readRetry.failures + m_youngerRetry.failures > 0;
         const bool hasName = m_hadName || !m_options.byName;
-        m_mayLeaveOut = isUnchanged && hasName && !isFailing && m_late.isEmpty() ? mostLeftOut : 0;
+        m_mayLeaveOut = isUnchanged && hasName && !isFailing && m_late.isEmpty();
+        m_leftOut = 0;
         return false;
     }
     return true;

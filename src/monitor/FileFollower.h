@@ -58,8 +58,9 @@ public:
     /// Looks at the file and at the name, about once a second. True if there may be entries.
     bool look(const Moment& now);
     /// True if a look can be left out, because the file is as it was at the last one: its status
-    /// shows that it was renamed or removed. That one of the path's directories was exchanged is
-    /// not seen, so every fifth look is not left out. Costs one system call.
+    /// shows that it was renamed or removed. It does not show that one of the path's directories
+    /// was exchanged, so every fifth call asks for the status of what has the name. Costs one
+    /// system call.
     bool isQuiet() noexcept;
     /// The next entry as EntryBlock gives it, or null if there is none until the next look, or if
     /// many megabytes had none: isPaused says so, and the next call goes on. Lines at the end of
@@ -204,7 +205,7 @@ private:
 
     static constexpr int mostReadFailures = 5;      ///< of a file that others follow
     static constexpr std::size_t mostGivenUp = 256; ///< that are remembered
-    static constexpr int mostLeftOut = 4;           ///< looks, one after another
+    static constexpr int nameInterval = 5;          ///< looks from one at the name to the next
 
     const std::string m_path;
     const Options m_options;
@@ -232,7 +233,8 @@ private:
     std::int64_t m_known = 0;    ///< size that its present contents had for certain
     bool m_hasSeen = false;
     bool m_hadName = false;              ///< itself, not by a link, at the last look
-    int m_mayLeaveOut = 0;               ///< looks, while the status is m_seen
+    bool m_mayLeaveOut = false;          ///< looks, while the status is m_seen
+    int m_leftOut = 0;                   ///< looks since the last one at the name
     std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
     bool m_waits = true;           ///< for lines that continue those at the end of the file

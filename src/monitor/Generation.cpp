@@ -87,13 +87,17 @@ Generation::~Generation() {
     ::close(m_descriptor);
 }
 
+Generation::Status Generation::Status::of(const struct stat& found) noexcept {
+    return {found.st_size, nanoseconds(found.st_mtim), nanoseconds(found.st_ctim),
+            found.st_nlink > 0};
+}
+
 bool Generation::status(Status& status) const noexcept {
     struct stat found;
     if (fstat(m_descriptor, &found) != 0) {
         return false;
     }
-    status = {found.st_size, nanoseconds(found.st_mtim), nanoseconds(found.st_ctim),
-              found.st_nlink > 0};
+    status = Status::of(found);
     return true;
 }
 

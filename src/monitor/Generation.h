@@ -10,6 +10,8 @@
 #include <memory>
 #include <string>
 
+#include <sys/stat.h>
+
 namespace zrm {
 
 class GenerationReader;
@@ -44,6 +46,7 @@ public:
         std::int64_t changed;  ///< last change of file or name, ns since the epoch
         bool hasName;          ///< false: removed, and gone when it is closed
 
+        static Status of(const struct stat& found) noexcept;
         bool operator==(const Status&) const = default;
     };
 

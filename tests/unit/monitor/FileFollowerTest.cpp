@@ -201,6 +201,19 @@ TEST_F(FileFollowerTest, ALinkToAQuietFileIsLookedAtEverySecond) {
     EXPECT_EQ(look(seconds(3)), "2\n");
 }
 
+TEST_F(FileFollowerTest, EveryLookAtAQuietFileIsLeftOut) {
+    append("a\n");
+    looks(3);
+    ASSERT_TRUE(m_follower->isQuiet());
+    const Fault names("lstat", EIO, {.times = 0});
+    for (int i = 0; i < 20; ++i) {
+        EXPECT_TRUE(m_follower->isQuiet());
+    }
+    EXPECT_EQ(names.calls(), 4);
+    append("b\n");
+    EXPECT_EQ(look(), "b\n");
+}
+
 TEST_F(FileFollowerTest, AnExchangedDirectoryOfAQuietFileIsNoticedWithinFiveLooks) {
     fs::create_directory(file("first"));
     fs::create_directory(file("second"));
