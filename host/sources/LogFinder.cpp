@@ -39,6 +39,7 @@ struct LogFinder::Candidate {
     Identity identity{};
     std::int64_t size = 0; ///< bytes
     bool isNewcomer = false;
+    int rank = 0; ///< the lowest first
 };
 
 /// The work of one look.
@@ -66,13 +67,13 @@ public:
         std::vector<Candidate> candidates;
         for (Candidate& candidate : m_candidates) {
             if (isUsable(candidate)) {
+                candidate.rank = rankOf(candidate);
                 candidates.push_back(std::move(candidate));
             }
         }
         // Who is followed already stays; of new ones, those that are named come first.
-        std::stable_sort(
-            candidates.begin(), candidates.end(),
-            [this](const Candidate& a, const Candidate& b) { return rank(a) < rank(b); });
+        std::stable_sort(candidates.begin(), candidates.end(),
+                         [](const Candidate& a, const Candidate& b) { return a.rank < b.rank; });
         for (Candidate& candidate : candidates) {
             m_names.insert(candidate.name);
         }
@@ -204,7 +205,7 @@ private:
         return true;
     }
 
-    int rank(const Candidate& candidate) const {
+    int rankOf(const Candidate& candidate) const {
         if (m_finder.m_known.contains(candidate.name)) {
             return 0;
         }
