@@ -84,7 +84,9 @@ void setTrace(const std::string& file) {
 void endAtOnceWhenAsked() {
     for (const int number : {SIGTERM, SIGINT}) {
         struct sigaction action {};
-        if (sigaction(number, nullptr, &action) == 0 && action.sa_handler == SIG_DFL) {
+        const bool isKnown = sigaction(number, nullptr, &action) == 0;
+        // A shell has background programs ignore SIGINT; the manager thread takes it all the same.
+        if (isKnown && (action.sa_handler == SIG_DFL || action.sa_handler == SIG_IGN)) {
             action.sa_handler = [](int) { _exit(0); };
             sigaction(number, &action, nullptr);
         }

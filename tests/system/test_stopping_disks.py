@@ -45,12 +45,16 @@ def refresh_onto(agent, log):
     agent.wait_trace("Manager thread waiting for a signal.", 2, seconds=END)
 
 
+IGNORING_SIGINT = ("sh", "-c", 'trap "" INT; exec "$@"', "sh")  # as a shell starts it in the background
+
+
+@pytest.mark.parametrize("wrapper", ((), IGNORING_SIGINT), ids=("", "ignoring SIGINT"))
 @pytest.mark.parametrize("number", (SIGTERM, SIGINT))
-def test_a_stop_while_the_history_opens_is_a_stop(agent, disk, number):
+def test_a_stop_while_the_history_opens_is_a_stop(agent, disk, number, wrapper):
     flag = use_disk(agent, disk, "frozen")
     flag.touch()
     agent.log()
-    agent.start(wait=False)
+    agent.start(wait=False, wrapper=wrapper)
     lock = agent.directory / "state" / "history.lock"
     wait_until(lambda: lock.exists() or not agent.running(), "the history to be opened")
     assert stop(agent, number) == 0
