@@ -4,6 +4,7 @@
 #include "host/base/Say.h"
 #include "host/config/ConfigFile.h"
 #include "host/config/OwnFiles.h"
+#include "host/config/SituationWarnings.h"
 #include "host/framework/EventRoomControl.h"
 #include "host/framework/Tables.h"
 #include "logs/FollowSettings.h"
@@ -12,8 +13,10 @@
 #include <algorithm>
 #include <cstdlib>
 #include <set>
+#include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include <signal.h>
 #include <unistd.h>
@@ -228,6 +231,12 @@ void Host::reload() {
         m_logs.apply(config.logs, ownFiles(config));
         if (const auto warning = warningOfDebug(config, m_file.path())) {
             say("%s", warning->c_str());
+        }
+    }
+    const std::vector<std::string> known = warningsOfSituations(m_config, m_file.path());
+    for (const std::string& warning : warningsOfSituations(config, m_file.path())) {
+        if (std::find(known.begin(), known.end(), warning) == known.end()) {
+            say("%s", warning.c_str());
         }
     }
     if (config.environment != m_config.environment || config.http != m_config.http ||

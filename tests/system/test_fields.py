@@ -32,6 +32,20 @@ def test_conditions_on_fields_raise_events_that_keep_them(agent):
     assert "entry_cut" not in events[0]
 
 
+def test_a_reload_warns_of_fields_that_no_entry_has(agent):
+    log = file(agent)
+    agent.follow(log)
+    agent.situation("first", log=agent.directory / "other.log", when=["field.user = 'root'"])
+    agent.start()
+    agent.wait_trace("situation 'first': field.user is in no entry: no [[log]] table names")
+    agent.situation("second", log=log, when=["field.host = 'web1'"])
+    agent.situation("third", log=agent.directory / "other.log", when=["field.host = 'web1'"])
+    agent.reload()
+    agent.wait_trace("situation 'third': field.host is in no entry: no [[log]] table names")
+    assert agent.stop() == 0
+    assert len(agent.trace("is in no entry")) == 2
+
+
 def test_long_hosts_and_tags_are_whole_in_the_fields(agent):
     host = "ip-10-0-0-17.eu-central-1.compute.internal-" + "x" * 20
     tag = "systemd-networkd-wait-online-" + "y" * 200
