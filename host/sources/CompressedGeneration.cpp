@@ -1,5 +1,6 @@
 #include "host/sources/CompressedGeneration.h"
 
+#include "host/sources/GzipGeneration.h"
 #include "host/sources/XzGeneration.h"
 
 #include <algorithm>
@@ -58,14 +59,17 @@ std::unique_ptr<GenerationReader> openCompressedGeneration(int descriptor) {
     if (isXz(descriptor)) {
         return openXzGeneration(descriptor);
     }
+    if (isGzip(descriptor)) {
+        return openGzipGeneration(descriptor);
+    }
     Archive file(archive_read_new());
     if (file == nullptr) {
         return nullptr;
     }
     // Anything but success means that a program would have to be run for it.
-    for (const auto support : {archive_read_support_filter_gzip, archive_read_support_filter_bzip2,
-                               archive_read_support_filter_zstd, archive_read_support_format_raw,
-                               archive_read_support_format_empty}) {
+    for (const auto support :
+         {archive_read_support_filter_bzip2, archive_read_support_filter_zstd,
+          archive_read_support_format_raw, archive_read_support_format_empty}) {
         if (support(file.get()) != ARCHIVE_OK) {
             return nullptr;
         }

@@ -241,7 +241,9 @@ char* FileFollower::nextInOrder() {
             return nullptr;
         }
         const std::int64_t from = m_block.readTo();
-        switch (m_block.fill(*m_chain.front().file)) {
+        // The end of damaged contents is wrong before the damage shows.
+        switch (m_chain.front().file->verify() ? m_block.fill(*m_chain.front().file)
+                                               : EntryBlock::Fill::failed) {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
             m_known = std::max(m_seen.size, m_block.readTo()); // the file is still the same

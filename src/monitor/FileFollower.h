@@ -159,6 +159,7 @@ private:
     void noteUnreadable(const Found::Unreadable& unreadable,
                         const std::vector<GenerationFile>& files, Found& found) const;
     bool isCountedLost(const GenerationFile& file) const noexcept;
+    void giveUp(const GivenUp& file);
     void takeUnreadable(const Found& found, std::int64_t from = 0, std::int64_t to = 0);
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
     std::vector<GenerationFile> generations(const std::vector<ino_t>& inodes = {});

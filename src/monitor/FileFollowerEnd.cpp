@@ -95,6 +95,10 @@ bool FileFollower::handleFailedRead() {
     }
     const std::int64_t size = member.file->isCompressed() ? 0 : m_seen.size; // of its contents
     m_ledger.noteLost(m_block.offset(), std::max(m_block.readTo(), size), sourceOf(member));
+    Generation::Status status;
+    if (member.file->status(status)) {
+        giveUp({member.file->identity(), status.modified}); // nothing of it may have been read
+    }
     succeed(m_readRetry);
     member.isComplete = true;
     return switchToNext();

@@ -120,12 +120,16 @@ void FileFollower::takeUnreadable(const Found& found, std::int64_t from, std::in
         const std::int64_t size = file.isCompressed ? 0 : file.size; // of its contents
         m_ledger.noteLost(from, std::max({from, to, size}), file.path);
         from = to = 0;
-        if (m_givenUp.size() == mostGivenUp) {
-            m_givenUp.erase(m_givenUp.begin());
-        }
-        m_givenUp.push_back({file.identity, file.modified});
+        giveUp({file.identity, file.modified});
     }
     succeed(m_youngerRetry);
+}
+
+void FileFollower::giveUp(const GivenUp& file) {
+    if (m_givenUp.size() == mostGivenUp) {
+        m_givenUp.erase(m_givenUp.begin());
+    }
+    m_givenUp.push_back(file);
 }
 
 bool FileFollower::isKnown(const FileIdentity& file, const Generation* named) const noexcept {

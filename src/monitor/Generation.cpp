@@ -159,6 +159,22 @@ std::ptrdiff_t Generation::readCompressed(char* buffer, std::size_t room,
     }
 }
 
+bool Generation::verifyCompressed() noexcept {
+    std::array<char, 16384> contents;
+    for (;;) {
+        const std::int64_t from = m_readTo;
+        const std::ptrdiff_t count = readCompressed(contents.data(), contents.size(), from);
+        if (count <= 0) {
+            m_isVerified = count == 0;
+            return m_isVerified;
+        }
+        if (from / bytesPerCheck != m_readTo / bytesPerCheck && Interruption::isDue()) {
+            errno = ECANCELED;
+            return false;
+        }
+    }
+}
+
 /// Reads until `count` bytes or the end are reached.
 std::ptrdiff_t Generation::readWhole(char* buffer, std::size_t count,
                                      std::int64_t offset) noexcept {

@@ -61,6 +61,9 @@ public:
     /// of a compressed file are read forward; going back begins again. ECANCELED if passing over
     /// them was interrupted (Interruption).
     std::ptrdiff_t readAt(char* buffer, std::size_t room, std::int64_t offset) noexcept;
+    /// True if all contents can be read and their checksums fit. Compressed contents are read to
+    /// their end for that, once. False with errno as of readAt.
+    bool verify() noexcept { return !m_isCompressed || m_isVerified || verifyCompressed(); }
     /// True if the contents have the position's guard before its offset, which then are in `tail`.
     bool holds(const LogPosition& position, Tail& tail);
     /// True if the contents of the other file begin with all contents of this one. Of plain files
@@ -90,6 +93,7 @@ private:
     std::ptrdiff_t readWhole(char* buffer, std::size_t count, std::int64_t offset) noexcept;
     std::ptrdiff_t readCompressed(char* buffer, std::size_t room, std::int64_t offset) noexcept;
     bool restart() noexcept;
+    bool verifyCompressed() noexcept;
 
     const int m_descriptor;
     const std::string m_path;
@@ -97,6 +101,7 @@ private:
     const bool m_isCompressed;
     std::unique_ptr<GenerationReader> m_reader; ///< of a compressed file
     std::int64_t m_readTo = 0;                  ///< how much the reader has given
+    bool m_isVerified = false;
 };
 
 } // namespace zrm

@@ -135,7 +135,7 @@ char* LateLines::nextOf(File& file) {
             return give(entry, file);
         }
         const std::int64_t from = m_block.readTo();
-        switch (m_block.fill(*file.file)) {
+        switch (file.file->verify() ? m_block.fill(*file.file) : EntryBlock::Fill::failed) {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
             continue;

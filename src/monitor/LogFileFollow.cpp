@@ -54,7 +54,7 @@ std::int64_t traceLosses(const FollowLedger& ledger, const char* file, std::int6
         const auto to = static_cast<long long>(lost.to);
         if (isCompressedName(lost.source)) {
             trace.error()("Lines of %s were lost: %s cannot be read from byte %lld of its contents "
-                          "on. If it is damaged, the last lines before that may be wrong.",
+                          "on. A damaged file is not read at all.",
                           file, lost.source.c_str(), from);
         } else if (!lost.source.empty()) {
             trace.error()("Lines of %s were lost: bytes %lld to %lld of %s cannot be read.", file,

@@ -195,17 +195,14 @@ def test_a_damaged_copy_costs_what_it_held_and_nothing_else(agent, is_running):
         log.path.write_text(syslog_line("present"))
         agent.start()
     wait_until(lambda: "present" in descriptions(agent.events()), "the present file to be read")
-    got = descriptions(agent.events())
-    recovered = [int(text.split()[1]) for text in got if text.startswith("unread")]
-    assert recovered == list(range(len(recovered))) and 0 < len(recovered) < 4000  # up to the damage
-    assert got == ["known", *[text for text in got if text.startswith("unread")], "present"]
+    assert descriptions(agent.events()) == ["known", "present"]  # damage may make wrong lines before it shows
     wait_until(lambda: follow_of(agent, log)["lost"], "the loss in the ledger")
     follow = follow_of(agent, log)
     (lost,) = follow["lost"]
-    assert known <= lost["from"] <= lost["to"]
+    assert known == lost["from"] <= lost["to"]
     copy = agent.directory / "app.log.1.gz"
     assert lost["source"] == str(copy)
-    agent.wait_trace(f"{copy} cannot be read from byte {lost['from']} of its contents on. If it is damaged,")
+    agent.wait_trace(f"{copy} cannot be read from byte {known} of its contents on. A damaged file")
     assert follow["state"] == "reading" and follow["problem"] is None
     (warning,) = wait_until(lambda: warnings_of(agent, log), "the warning")
     assert warning["kind"] == "lost"
@@ -223,7 +220,8 @@ def without_privileges():
     return ("setpriv", *sets) if os.geteuid() == 0 else ()
 
 
-def test_a_generation_that_is_forbidden_is_read_once_it_is_allowed(agent):
+def stopped_behind_an_entry(agent):
+    """A followed log with a position behind its entry "one", and HTTP for the next run."""
     log = followed(agent)
     agent.listen = "127.0.0.1:0"
     agent.start()
@@ -231,6 +229,11 @@ def test_a_generation_that_is_forbidden_is_read_once_it_is_allowed(agent):
     log.append(syslog_line("one"))
     agent.wait_events(1)
     assert agent.stop() == 0
+    return log
+
+
+def test_a_generation_that_is_forbidden_is_read_once_it_is_allowed(agent):
+    log = stopped_behind_an_entry(agent)
     log.path.rename(agent.directory / "app.log.2")
     forbidden = Log(agent.directory / "app.log.1")
     forbidden.append(syslog_line("two"))
@@ -249,13 +252,7 @@ def test_a_generation_that_is_forbidden_is_read_once_it_is_allowed(agent):
 
 @pytest.mark.slow
 def test_a_generation_that_cannot_be_read_is_named_and_waited_for(agent):
-    log = followed(agent)
-    agent.listen = "127.0.0.1:0"
-    agent.start()
-    agent.wait_open(log)
-    log.append(syslog_line("one"))
-    agent.wait_events(1)
-    assert agent.stop() == 0
+    log = stopped_behind_an_entry(agent)
     log.path.rename(agent.directory / "app.log.3")
     readable, damaged = agent.directory / "app.log.2.gz", agent.directory / "app.log.1.gz"
     readable.write_bytes(b"\x1f\x8b\x08\x00" + b"not compressed" * 20)

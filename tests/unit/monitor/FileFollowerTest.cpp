@@ -274,7 +274,7 @@ TEST_F(FileFollowerTest, ReadsAFileBeforeTheGenerationsAfterItWhileNoneHasTheNam
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
-TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsReadAsFarAsItGoes) {
+TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsPassedOver) {
     look();
     append("a\n");
     EXPECT_EQ(look(), "a\n");
@@ -282,7 +282,8 @@ TEST_F(FileFollowerTest, AGenerationThatIsDamagedIsReadAsFarAsItGoes) {
     m_directory.write("app.log.1.gz", "GZb\nc\n\x01");
     append("d\n");
     restart();
-    EXPECT_EQ(looks(2), "b\nc\nd\n");
+    EXPECT_EQ(looks(2), "d\n");
+    EXPECT_EQ(looks(3), "");
     EXPECT_EQ(m_ledger.losses(), 1);
     EXPECT_EQ(m_ledger.lostBytes(), 0); // the length of compressed contents is not known
 }
@@ -382,6 +383,19 @@ TEST_F(FileFollowerTest, KnowsHowMuchIsLeft) {
     EXPECT_EQ(m_ledger.behind(), 2);
     look();
     EXPECT_EQ(m_ledger.behind(), 0);
+}
+
+TEST_F(FileFollowerTest, ReadsNothingOfADamagedCompressedFile) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    m_directory.write("app.log.1.gz", "GZold\na\nb\nwrong\n\x01");
+    fs::resize_file(m_path, 0);
+    append("c\n");
+    EXPECT_EQ(looks(4), "c\n");
+    ASSERT_EQ(m_ledger.lost().size(), 1U);
+    EXPECT_EQ(m_ledger.lost()[0].source, file("app.log.1.gz"));
+    EXPECT_EQ(m_ledger.lost()[0].from, 6);
 }
 
 } // namespace

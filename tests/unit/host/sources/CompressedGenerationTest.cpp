@@ -90,6 +90,8 @@ protected:
 class CompressedGenerationTest : public CompressedGenerationFixture,
                                  public testing::TestWithParam<int> {};
 
+class GzipGenerationTest : public CompressedGenerationFixture, public testing::Test {};
+
 class XzGenerationTest : public CompressedGenerationFixture, public testing::Test {};
 
 TEST_P(CompressedGenerationTest, GivesTheContents) {
@@ -132,6 +134,32 @@ TEST_P(CompressedGenerationTest, OfAFileThatIsCutOffItGivesTheBeginningAndFails)
             EXPECT_TRUE(contents.starts_with(got));
         }
     }
+}
+
+TEST_F(GzipGenerationTest, DamageShowsByTheEndAtTheLatest) {
+    const std::string contents = lines(2000);
+    CompressedFile(path, ARCHIVE_FILTER_GZIP, contents);
+    const std::string whole = bytes();
+    for (std::size_t at = 10; at < whole.size(); at += 97) {
+        std::string damaged = whole;
+        damaged[at] = static_cast<char>(damaged[at] ^ (1 << dice() % 8));
+        write(damaged);
+        const auto reader = open();
+        ASSERT_NE(reader, nullptr);
+        std::ptrdiff_t end = 1;
+        const std::string got = readAll(*reader, end);
+        EXPECT_TRUE(end == -1 || got == contents) << at;
+    }
+}
+
+TEST_F(GzipGenerationTest, PaddingBehindTheContentsIsNoDamage) {
+    const std::string contents = lines(10);
+    CompressedFile(path, ARCHIVE_FILTER_GZIP, contents);
+    write(bytes() + std::string(512, '\0'));
+    const auto reader = open();
+    std::ptrdiff_t end = 1;
+    EXPECT_EQ(readAll(*reader, end), contents);
+    EXPECT_EQ(end, 0);
 }
 
 TEST_P(CompressedGenerationTest, ALargeReadLosesNothingToTheDamageBehindIt) {
