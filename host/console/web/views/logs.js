@@ -274,11 +274,7 @@ class LogsPage {
                       ` × ${event.count}`,
                     ),
                 ),
-                h(
-                  "span",
-                  { className: "what" },
-                  describe(event),
-                ),
+                h("span", { className: "what" }, describe(event)),
               ),
             ),
           ),
