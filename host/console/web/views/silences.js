@@ -70,7 +70,11 @@ class SilencesPage {
       const state = this.withExpired.checked ? "" : "active";
       this.#draw(await get(withQuery("/api/v1/silences", { state })));
     } catch (error) {
-      if (!this.isDrawn) fill(this.list, failure(error, () => this.load()));
+      if (!this.isDrawn)
+        fill(
+          this.list,
+          failure(error, () => this.load()),
+        );
     }
   }
 
@@ -79,7 +83,8 @@ class SilencesPage {
     const focused = this.list.contains(document.activeElement)
       ? document.activeElement.dataset.key
       : null;
-    const off = !kept && h("p", { className: "note" }, "The history is off: silences end with the agent.");
+    const off =
+      !kept && h("p", { className: "note" }, "The history is off: silences end with the agent.");
     if (silences.length === 0)
       fill(
         this.list,
@@ -159,7 +164,11 @@ class SilencesPage {
   /** The form for a new silence, which begins with what the query names. */
   openForm(query) {
     const text = (label, value, hint, properties = {}) =>
-      field(label, h("input", { value, autocomplete: "off", spellcheck: false, ...properties }), hint);
+      field(
+        label,
+        h("input", { value, autocomplete: "off", spellcheck: false, ...properties }),
+        hint,
+      );
     const rows = Object.fromEntries(
       MATCHERS.map(([key, label]) => [`match.${key}`, text(label, query.get(key) || "")]),
     );
