@@ -151,6 +151,12 @@ void HistoryFile::keepSilences(const std::vector<Silence>& silences) {
     });
 }
 
+std::uint64_t HistoryFile::silenceOf(std::uint64_t event) {
+    Statement label(m_database, "SELECT silence FROM events JOIN labels ON labels.id = label"
+                                " WHERE events.id = ?");
+    return label.bind(1, event).step() ? static_cast<std::uint64_t>(label.integer(0)) : 0;
+}
+
 void HistoryFile::removeSilences(const std::vector<std::uint64_t>& ids) {
     inTransaction([&] { m_silences.remove(ids); });
 }

@@ -58,6 +58,8 @@ public:
 
     /// Stores silences. One that is there keeps its count of events, which store adds to.
     void keepSilences(const std::vector<Silence>& silences);
+    /// The silence of an event; 0: none, or there is no such event.
+    std::uint64_t silenceOf(std::uint64_t event);
     void removeSilences(const std::vector<std::uint64_t>& ids);
     KeptSilences silences() { return SilenceTable::read(m_database); }
 

@@ -31,7 +31,9 @@ HistoryWriter::HistoryWriter(const HistoryConfig& config, HistoryDirectory& dire
                              Silences& silences)
     : m_config(config), m_directory(directory), m_file(std::move(file)), m_recent(recent),
       m_readers(readers), m_cursors(cursors), m_positions(positions), m_silences(silences),
-      m_silencer(silences, AgentNode::name()), m_requested([this] { m_queue->wake(); }),
+      m_silencer(silences, AgentNode::name(),
+                 [this](std::uint64_t event) { return silenceOf(event); }),
+      m_requested([this] { m_queue->wake(); }),
       m_nextTendingOfPositions(Clock::now() + timeUntilLogsAreFollowed),
       m_pause(firstPause, longestPause), m_oldest(m_file->oldest()) {}
 
@@ -94,6 +96,13 @@ void HistoryWriter::makeRequestedChanges() {
     if (m_requested.areWaiting() && !attempt([&] { m_requested.run(*m_file); })) {
         m_requested.refuseAll(problem());
     }
+}
+
+/// The silence of a stored event. One that cannot be read is taken for an event that was delivered.
+std::uint64_t HistoryWriter::silenceOf(std::uint64_t event) {
+    std::uint64_t silence = 0;
+    attempt([&] { silence = m_file->silenceOf(event); });
+    return silence;
 }
 
 /// Stores the batch, makes its events known, and begins the next. False when the end comes before

@@ -79,6 +79,7 @@ private:
     bool store(EntryBatch& batch);
     bool attempt(const std::function<void()>& work);
     void makeRequestedChanges();
+    std::uint64_t silenceOf(std::uint64_t event);
     void succeeded();
     void failed(const std::string& why);
     bool pause();

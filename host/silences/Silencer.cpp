@@ -30,8 +30,8 @@ Silencer::Active::Active(const Silence& silence)
     }
 }
 
-Silencer::Silencer(const Silences& silences, std::string node)
-    : m_silences(silences), m_node(std::move(node)) {}
+Silencer::Silencer(const Silences& silences, std::string node, Stored stored)
+    : m_silences(silences), m_node(std::move(node)), m_stored(std::move(stored)) {}
 
 bool Silencer::isOfThisNode(const Wildcard& pattern) const {
     return isMatch(pattern, m_node) || pattern.matches(m_node.substr(0, m_node.find(':')));
@@ -87,8 +87,7 @@ std::uint64_t Silencer::of(const Event& event, std::string_view log) {
     }
     const EventJudgement& judgement = *event.judgement;
     if (judgement.state == EventJudgement::RESOLVED) {
-        const auto begun = m_episodes.extract(judgement.episode->value());
-        return begun.empty() ? 0 : begun.mapped();
+        return ofBeginning(judgement.episode->value());
     }
     const std::uint64_t silence = find(
         {event.situation->name, event.situation->severity, log, judgement.group, event.raised});
@@ -96,6 +95,15 @@ std::uint64_t Silencer::of(const Event& event, std::string_view log) {
         m_episodes[event.id] = silence;
     }
     return silence;
+}
+
+/// The silence of the event that began an episode, perhaps in an earlier run: its id is that
+/// event's.
+std::uint64_t Silencer::ofBeginning(std::uint64_t episode) {
+    if (const auto begun = m_episodes.extract(episode); !begun.empty()) {
+        return begun.mapped();
+    }
+    return m_stored ? m_stored(episode) : 0;
 }
 
 std::uint64_t Silencer::find(const SilenceSubject& event) {

@@ -6,6 +6,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -31,15 +32,15 @@ struct SilenceSubject {
 /// one thread at a time.
 class Silencer {
 public:
-    /// `silences` must outlive the object. `node` is the agent's.
-    Silencer(const Silences& silences, std::string node);
+    /// The silence of a stored event; 0: none, or the event is not stored.
+    using Stored = std::function<std::uint64_t(std::uint64_t event)>;
+
+    /// `silences` must outlive the object. `node` is the agent's. `stored` may be null.
+    Silencer(const Silences& silences, std::string node, Stored stored = nullptr);
 
     /// The silence of an event of this log; 0: none. The end of an episode is as silent as its
     /// beginning.
     std::uint64_t of(const Event& event, std::string_view log);
-
-    /// An open episode of an earlier run whose beginning was silenced.
-    void remember(std::uint64_t episode, std::uint64_t silence) { m_episodes[episode] = silence; }
 
     /// Of the silences that match, the oldest; 0: none does.
     std::uint64_t find(const SilenceSubject& event);
@@ -60,12 +61,14 @@ private:
     using Candidates = std::vector<const Active*>;
 
     void refresh();
+    std::uint64_t ofBeginning(std::uint64_t episode);
     bool isOfThisNode(const Wildcard& pattern) const;
     const Candidates& candidates(const SilenceSubject& event);
     static bool isOfGroup(const Active& silence, const SilenceSubject& event);
 
     const Silences& m_silences;
     const std::string m_node;
+    const Stored m_stored;
     std::uint64_t m_version = 0;
     std::vector<Active> m_active;
     std::int64_t m_end = 0; ///< of the last one
@@ -73,7 +76,7 @@ private:
     std::unordered_map<std::string, Candidates> m_candidates;
     std::size_t m_remembered = 0; ///< in m_candidates
     std::string m_key;
-    /// The silences of open episodes, by the episode's id.
+    /// The silences of this run's open episodes, by the episode's id.
     std::unordered_map<std::uint64_t, std::uint64_t> m_episodes;
 };
 

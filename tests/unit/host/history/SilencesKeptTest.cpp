@@ -1,5 +1,6 @@
 #include "HistoryFixture.h"
 #include "host/base/TimeText.h"
+#include "host/events/Episode.h"
 
 #include <gmock/gmock.h>
 
@@ -80,6 +81,30 @@ TEST_F(SilencesKept, SurviveARestartWithTheirCounts) {
     pushAndWait(1);
     EXPECT_EQ(number("SELECT events FROM silences WHERE id = 1"), 3);
     EXPECT_EQ(add("third").id, 3u);
+}
+
+TEST_F(SilencesKept, AnEpisodeOfAnEarlierRunEndsAsSilentlyAsItBegan) {
+    const auto pushJudged = [&](EventJudgement::State state, std::uint64_t episode) {
+        const auto judgement = std::make_shared<EventJudgement>();
+        judgement->state = state;
+        judgement->episode = std::make_shared<EpisodeId>(episode);
+        TestRow row("/var/log/", "app.log", "text", 7);
+        const std::uint64_t last = history->newest();
+        ASSERT_TRUE(queue->push(label, row.bytes(), judgement));
+        EXPECT_TRUE(eventually([&] { return history->newest() > last; }));
+    };
+    open();
+    pushJudged(EventJudgement::RAISED, 0);
+    const Silence silence = add("watch");
+    pushJudged(EventJudgement::RAISED, 0);
+    close();
+    open();
+    ASSERT_TRUE(history->silences().expire(silence.id, "ben", WallClock::now()));
+    pushJudged(EventJudgement::RESOLVED, 2);
+    add("watch");
+    pushJudged(EventJudgement::RESOLVED, 1);
+    EXPECT_EQ(idsOf(true), (std::vector<std::uint64_t>{2, 3}));
+    EXPECT_EQ(idsOf(false), (std::vector<std::uint64_t>{1, 4}));
 }
 
 TEST_F(SilencesKept, AnIdIsNotGivenAgain) {
