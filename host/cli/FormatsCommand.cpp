@@ -2,13 +2,12 @@
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
-#include "host/cli/DisplayText.h"
+#include "host/cli/ReadyFilesText.h"
 #include "host/cli/Table.h"
 #include "host/config/ConfigFile.h"
 #include "host/config/ReadyFormats.h"
 #include "host/diagnose/FormatSamples.h"
 
-#include <filesystem>
 #include <utility>
 
 #include <CLI/CLI.hpp>
@@ -20,51 +19,46 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// The outcome of one format's samples.
-struct Outcome {
-    std::string path;
-    std::size_t samples = 0;
-    std::vector<std::string> failures; ///< "PATH:LINE: TEXT"
-};
-
-Outcome testOf(const ReadyFormats::Place& place) {
-    Outcome outcome;
-    outcome.path = place.path;
+SampleOutcome testOf(const ReadyFormats::Place& place) {
+    SampleOutcome outcome{place};
     const auto ready = ReadyFormats::load(place);
     if (!ready) {
         outcome.failures = ready.error();
         return outcome;
     }
     outcome.samples = ready->samples.size();
-    for (const FormatSamples::Failure& failure : FormatSamples::check(*ready)) {
-        outcome.failures.push_back(place.path +
-                                   (failure.line == 0 ? "" : ':' + std::to_string(failure.line)) +
-                                   ": " + failure.text);
-    }
+    outcome.add(FormatSamples::check(*ready));
     return outcome;
 }
 
-/// A name of a format, or a path with a '/' or the ending ".toml".
+/// A name of a format, or the path of a file.
 ReadyFormats::Place placeOf(const ReadyFormats& formats, const std::string& name) {
-    if (name.find('/') != std::string::npos || name.ends_with(".toml")) {
-        return {std::filesystem::path(name).stem().string(), name};
+    ReadyFormats::Place place = placeOfFile(name);
+    if (place.path.empty()) {
+        const Result<ReadyFormat> ready = formats.find(name);
+        if (!ready) {
+            throw CliError(CliStatus::REFUSED, "formats: " + ready.error().text());
+        }
+        place.path = ready->path;
     }
-    Result<ReadyFormat> ready = formats.find(name);
-    if (!ready) {
-        throw CliError(CliStatus::REFUSED, "formats: " + ready.error().text());
-    }
-    return {name, ready->path};
+    return place;
 }
 
 } // namespace
 
+ConfigFile::Result agentAccess(const std::string& config) {
+    ConfigFile::Result agent =
+        ConfigFile::loadAccess(config.empty() ? "/etc/zrm/zrm.toml" : config);
+    if (!agent && !config.empty()) {
+        throw CliError(CliStatus::USAGE, agent.error().front());
+    }
+    return agent;
+}
+
 ReadyFormats readyFormatsOf(const std::string& config, std::vector<std::string> directories) {
-    const std::string path = config.empty() ? "/etc/zrm/zrm.toml" : config;
-    if (const ConfigFile::Result agent = ConfigFile::loadAccess(path)) {
+    if (const ConfigFile::Result agent = agentAccess(config)) {
         directories.insert(directories.end(), agent->formatDirectories.begin(),
                            agent->formatDirectories.end());
-    } else if (!config.empty()) {
-        throw CliError(CliStatus::USAGE, agent.error().front());
     }
     return ReadyFormats(std::move(directories));
 }
@@ -128,17 +122,7 @@ CliStatus FormatsCommand::show(Context& context) {
     if (!ready) {
         throw CliError(CliStatus::REFUSED, "formats: " + ready.error().text());
     }
-    if (context.options().json) {
-        context.printJson({{"name", ready->name}, {"path", ready->path}, {"toml", ready->text}});
-        return CliStatus::DONE;
-    }
-    std::string text = "# " + DisplayText::visible(ready->path) + '\n';
-    for (std::string_view rest = ready->text; !rest.empty();) {
-        const std::size_t end = std::min(rest.find('\n'), rest.size() - 1);
-        text += DisplayText::visible(rest.substr(0, end)) + '\n';
-        rest.remove_prefix(end + 1);
-    }
-    context.print(text);
+    printFile(context, {ready->name, ready->path}, ready->text);
     return CliStatus::DONE;
 }
 
@@ -148,31 +132,11 @@ CliStatus FormatsCommand::test(Context& context) {
     for (const std::string& name : m_names) {
         places.push_back(placeOf(formats, name));
     }
-    std::size_t samples = 0;
-    std::size_t failed = 0;
-    Json all = Json::array();
+    std::vector<SampleOutcome> outcomes;
     for (const ReadyFormats::Place& place : m_names.empty() ? formats.list() : places) {
-        const Outcome outcome = testOf(place);
-        samples += outcome.samples;
-        failed += outcome.failures.empty() ? 0 : 1;
-        all.push_back({{"name", place.name},
-                       {"path", place.path},
-                       {"samples", outcome.samples},
-                       {"failures", outcome.failures}});
-        for (const std::string& failure : outcome.failures) {
-            if (!context.options().json) {
-                context.print(
-                    context.terminal().coloured(DisplayText::visible(failure), Colour::BAD) + '\n');
-            }
-        }
+        outcomes.push_back(testOf(place));
     }
-    if (context.options().json) {
-        context.printJson({{"formats", all}});
-    } else {
-        context.print(std::to_string(all.size()) + " formats, " + std::to_string(samples) +
-                      " samples, " + std::to_string(failed) + " formats failed\n");
-    }
-    return failed > 0 || all.empty() ? CliStatus::REFUSED : CliStatus::DONE;
+    return printOutcomes(context, "formats", outcomes);
 }
 
 } // namespace zrm::host

@@ -74,6 +74,7 @@ Program::Program()
     m_commands.push_back(std::make_unique<CheckCommand>(*m_app));
     m_commands.push_back(std::make_unique<TryCommand>(*m_app));
     m_commands.push_back(std::make_unique<FormatsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<RulesCommand>(*m_app));
     m_commands.push_back(std::make_unique<SuggestCommand>(*m_app));
 }
 

@@ -4,6 +4,7 @@
 #include "host/config/ConfigSection.h"
 #include "host/config/ConfigText.h"
 #include "host/config/LogReader.h"
+#include "host/config/RuleReader.h"
 #include "host/config/SinkReader.h"
 #include "host/config/SinkTypes.h"
 #include "host/config/SituationReader.h"
@@ -134,17 +135,28 @@ void readHistory(const toml::table& table, ConfigProblems& problems, HostConfig&
     section.refuseUnknownKeys();
 }
 
-void readFormats(const toml::table& table, ConfigProblems& problems, HostConfig& config) {
-    ConfigSection section("formats", table, problems);
+/// [formats] and [rules]: directories of ready files.
+void readDirectories(const char* name, const toml::table& table, ConfigProblems& problems,
+                     std::vector<std::string>& directories) {
+    ConfigSection section(name, table, problems);
     for (const auto& [directory, line] :
          section.texts("directory").value_or(std::vector<ConfigSection::Text>())) {
         if (directory.empty() || directory.front() != '/') {
             section.problem(line, "directory", "'" + directory + "' is not an absolute path",
                             "begin it with '/'");
         }
-        config.formatDirectories.push_back(directory);
+        directories.push_back(directory);
     }
     section.refuseUnknownKeys();
+}
+
+void readReady(ConfigSection& section, ConfigProblems& problems, HostConfig& config) {
+    if (const toml::table* const formats = section.table("formats")) {
+        readDirectories("formats", *formats, problems, config.formatDirectories);
+    }
+    if (const toml::table* const rules = section.table("rules")) {
+        readDirectories("rules", *rules, problems, config.ruleDirectories);
+    }
 }
 
 void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& config) {
@@ -159,9 +171,7 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
     if (const toml::table* const history = section.table("history")) {
         readHistory(*history, problems, config);
     }
-    if (const toml::table* const formats = section.table("formats")) {
-        readFormats(*formats, problems, config);
-    }
+    readReady(section, problems, config);
     if (const auto sinks = section.tables("sink")) {
         SinkReader reader(problems);
         config.sinks.clear();
@@ -175,11 +185,15 @@ void readFile(const toml::table& file, ConfigProblems& problems, HostConfig& con
             config.logs.push_back(reader.read(*log));
         }
     }
+    SituationReader reader(config.logs, problems);
     if (const auto situations = section.tables("situation")) {
-        SituationReader reader(config.logs, problems);
         for (const toml::table* const situation : *situations) {
             config.situations.push_back(reader.read(*situation));
         }
+    }
+    for (SituationConfig& used :
+         RuleReader(config.ruleDirectories, reader, problems).read(section)) {
+        config.situations.push_back(std::move(used));
     }
     section.refuseUnknownKeys();
 }
@@ -191,9 +205,7 @@ void readAccess(const toml::table& file, ConfigProblems& problems, HostConfig& c
         ConfigSection http("http", *table, problems);
         readHttpAccess(http, config.http);
     }
-    if (const toml::table* const formats = section.table("formats")) {
-        readFormats(*formats, problems, config);
-    }
+    readReady(section, problems, config);
 }
 
 /// The contents of a file, or its problem as the only text.

@@ -12,6 +12,7 @@ void ConfigProblems::add(unsigned line, const Problem& problem) {
         ++m_more;
         return;
     }
+    line = lineOr(line);
     std::string text = m_file + ':';
     if (line > 0) {
         text += std::to_string(line) + ':';

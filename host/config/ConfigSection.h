@@ -46,6 +46,8 @@ public:
     bool has(std::string_view key) const { return m_table.contains(key); }
     /// Whether the value of a key is one text.
     bool isText(std::string_view key) const { return m_table[key].is_string(); }
+    /// Whether the value of a key is a list of tables that is not empty, as in [[key]].
+    bool isTables(std::string_view key) const { return m_table[key].is_array_of_tables(); }
     /// The line of a key's value, or of the table when the key is missing.
     unsigned line(std::string_view key) const;
 

@@ -54,6 +54,8 @@ struct SituationConfig {
     std::size_t context = 0;  ///< earlier entries of the log that its events have
     std::string runbook = {}; ///< URL of what to do about its events; empty: none
     std::map<std::string, std::string> labels = {}; ///< of its events, for their receivers
+    std::string rule = {}; ///< the ready situation that it is; empty: written by the operator
+    std::vector<std::string> ruleLogs = {}; ///< paths of logs that the rule is for
     std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };
@@ -66,6 +68,7 @@ struct HostConfig {
     HistoryConfig history;
     std::vector<SinkConfig> sinks = {SinkConfig::jsonl("-")};
     std::vector<std::string> formatDirectories; ///< with ready formats, before the usual ones
+    std::vector<std::string> ruleDirectories;   ///< with ready situations, before the usual ones
     std::vector<LogConfig> logs;
     std::vector<SituationConfig> situations;
 };

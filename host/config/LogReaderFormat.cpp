@@ -151,9 +151,8 @@ void LogReader::readOutput(ConfigSection& section, LogConfig& log) {
     const auto texts = section.texts("format");
     const bool isNamed =
         texts && !texts->empty() &&
-        std::all_of(texts->begin(), texts->end(), [](const ConfigSection::Text& text) {
-            return ReadyFormats::isName(text.first);
-        });
+        std::all_of(texts->begin(), texts->end(),
+                    [](const ConfigSection::Text& text) { return ReadyFiles::isName(text.first); });
     const bool isSyslog = !section.has("format") && section.has("extract");
     const std::optional<FormatDescription> format =
         isNamed ? readNamedFormat(section, m_formats)

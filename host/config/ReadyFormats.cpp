@@ -6,9 +6,7 @@
 #include "host/config/FormatReader.h"
 
 #include <algorithm>
-#include <filesystem>
 #include <string_view>
-#include <system_error>
 #include <utility>
 
 namespace zrm::host {
@@ -16,38 +14,11 @@ namespace zrm::host {
 namespace {
 
 constexpr const char* usualDirectories[] = {"/etc/zrm/formats", "/usr/share/zrm/formats"};
-constexpr std::string_view ending = ".toml";
-constexpr std::size_t longestName = 64;
 constexpr std::size_t mostSamples = 200;
 
-bool exists(const std::string& path) {
-    std::error_code error;
-    return std::filesystem::exists(std::filesystem::symlink_status(path, error));
-}
-
-/// How many characters must be changed, added or left out to make one name of the other.
-std::size_t differenceOf(std::string_view one, std::string_view other) {
-    std::vector<std::size_t> row(other.size() + 1);
-    for (std::size_t at = 0; at <= other.size(); ++at) {
-        row[at] = at;
-    }
-    for (std::size_t i = 1; i <= one.size(); ++i) {
-        std::size_t diagonal = std::exchange(row[0], i);
-        for (std::size_t j = 1; j <= other.size(); ++j) {
-            const std::size_t changed = diagonal + (one[i - 1] == other[j - 1] ? 0 : 1);
-            diagonal = row[j];
-            row[j] = std::min({changed, row[j - 1] + 1, row[j] + 1});
-        }
-    }
-    return row.back();
-}
-
-bool isNear(std::string_view wanted, std::string_view name) {
-    constexpr std::size_t mostWrong = 2;
-    constexpr std::size_t leastPart = 3;
-    return differenceOf(wanted, name) <= mostWrong ||
-           (wanted.size() >= leastPart && name.find(wanted) != std::string_view::npos) ||
-           (name.size() >= leastPart && wanted.find(name) != std::string_view::npos);
+std::vector<std::string> withUsual(std::vector<std::string> directories) {
+    directories.insert(directories.end(), std::begin(usualDirectories), std::end(usualDirectories));
+    return directories;
 }
 
 ReadyFormat::Sample readSample(ConfigSection& section) {
@@ -106,69 +77,28 @@ void read(const toml::table& file, ConfigProblems& problems, ReadyFormat& ready)
 } // namespace
 
 ReadyFormats::ReadyFormats(std::vector<std::string> directories)
-    : m_directories(std::move(directories)) {
-    m_directories.insert(m_directories.end(), std::begin(usualDirectories),
-                         std::end(usualDirectories));
-}
+    : m_files(withUsual(std::move(directories))) {}
 
-bool ReadyFormats::isName(const std::string& name) {
-    constexpr std::string_view characters = "abcdefghijklmnopqrstuvwxyz0123456789-_.";
-    return !name.empty() && name.size() <= longestName && name.front() != '.' &&
-           name.find_first_not_of(characters) == std::string::npos;
-}
-
-std::string ReadyFormats::nearTo(const std::string& name) const {
-    constexpr std::size_t mostNames = 5;
-    std::string names;
-    std::size_t count = 0;
-    for (const Place& place : list()) {
-        if (count < mostNames && isNear(name, place.name)) {
-            names += (count++ == 0 ? "'" : ", '") + place.name + "'";
-        }
-    }
-    return names;
+std::vector<ReadyFormats::Place> ReadyFormats::list() const {
+    return m_files.list();
 }
 
 Result<ReadyFormat> ReadyFormats::find(const std::string& name) const {
-    if (!isName(name)) {
-        return refused("'" + name.substr(0, longestName) + "' is not the name of a ready format",
+    if (!ReadyFiles::isName(name)) {
+        return refused("'" + name.substr(0, ReadyFiles::longestName) +
+                           "' is not the name of a ready format",
                        "write a name that 'zrmctl formats list' shows, or say with type = "
                        "\"regex\" or \"text\" that this is a format of your own");
     }
-    for (const std::string& directory : m_directories) {
-        const Place place{name, directory + '/' + name + std::string(ending)};
-        if (!exists(place.path)) {
-            continue;
-        }
-        return load(place).map_error([&](std::vector<std::string>&& texts) {
+    if (const auto place = m_files.find(name)) {
+        return load(*place).map_error([&](std::vector<std::string>&& texts) {
             return Problem{"the format '" + name + "' cannot be used: " + texts.front()};
         });
     }
-    const std::string names = nearTo(name);
+    const std::string names = m_files.nearTo(name);
     return refused("'" + name + "' is not a ready format",
                    names.empty() ? "write a name that 'zrmctl formats list' shows"
                                  : "write a name such as " + names);
-}
-
-std::vector<ReadyFormats::Place> ReadyFormats::list() const {
-    std::map<std::string, std::string> found;
-    for (const std::string& directory : m_directories) {
-        std::error_code error;
-        for (std::filesystem::directory_iterator at(directory, error), end;
-             !error && at != end && found.size() < mostFormats; at.increment(error)) {
-            const std::string file = at->path().filename().string();
-            const std::string name =
-                file.substr(0, file.size() - std::min(file.size(), ending.size()));
-            if (file.ends_with(ending) && isName(name)) {
-                found.emplace(name, at->path().string());
-            }
-        }
-    }
-    std::vector<Place> places;
-    for (auto& [name, path] : found) {
-        places.push_back({name, path});
-    }
-    return places;
 }
 
 Result<ReadyFormat, std::vector<std::string>> ReadyFormats::load(const Place& place) {
@@ -176,7 +106,7 @@ Result<ReadyFormat, std::vector<std::string>> ReadyFormats::load(const Place& pl
     ReadyFormat ready;
     ready.name = place.name;
     ready.path = place.path;
-    Result<std::string> text = ConfigText::read(place.path, largestFile);
+    Result<std::string> text = ConfigText::read(place.path, ReadyFiles::largestFile);
     if (!text) {
         problems.add(0, {text.error().what, "make it a readable file of at most 256 KiB"});
     } else {

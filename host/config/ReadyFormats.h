@@ -2,6 +2,7 @@
 #define ZRM_HOST_READY_FORMATS_H
 
 #include "host/base/Result.h"
+#include "host/config/ReadyFiles.h"
 #include "host/formats/FormatDescription.h"
 
 #include <map>
@@ -34,14 +35,7 @@ struct ReadyFormat {
 /// Finds the ready formats of some directories. Any thread; reads the files anew at each call.
 class ReadyFormats {
 public:
-    static constexpr std::size_t largestFile = 256 * 1024; ///< bytes
-    static constexpr std::size_t mostFormats = 10'000;     ///< that are listed
-
-    /// Where one is found by its name.
-    struct Place {
-        std::string name;
-        std::string path;
-    };
+    using Place = ReadyFiles::Place;
 
     /// A name is looked for in these directories first, then in the usual ones.
     explicit ReadyFormats(std::vector<std::string> directories);
@@ -53,13 +47,9 @@ public:
 
     /// Reads a file. What is wrong with it, as ConfigProblems::texts.
     static Result<ReadyFormat, std::vector<std::string>> load(const Place& place);
-    /// Small letters, digits and '-', '_' and '.' within, at most 64 of them.
-    static bool isName(const std::string& name);
 
 private:
-    std::string nearTo(const std::string& name) const;
-
-    std::vector<std::string> m_directories;
+    ReadyFiles m_files;
 };
 
 } // namespace zrm::host

@@ -38,11 +38,12 @@ private:
 
 } // namespace
 
-SituationConfig SituationReader::read(const toml::table& table) {
-    ConfigSection section("situation", table, m_problems);
+SituationConfig SituationReader::read(const toml::table& table, const std::string& name,
+                                      const char* sectionName) {
+    ConfigSection section(sectionName, table, m_problems);
     Fields fields(section);
     SituationText text;
-    text.name = fields.text("name");
+    text.name = name.empty() ? fields.text("name") : name;
     text.text = fields.text("text");
     text.severity = fields.text("severity");
     text.log = fields.text("log");
@@ -56,11 +57,11 @@ SituationConfig SituationReader::read(const toml::table& table) {
     text.context = section.number("context");
     text.runbook = fields.text("runbook");
     if (std::optional<ConfigSection> labels = section.section("labels")) {
-        for (const std::string& name : labels->keys()) {
-            text.labels[name] = labels->text(name).value_or("-"); // a problem is recorded
+        for (const std::string& label : labels->keys()) {
+            text.labels[label] = labels->text(label).value_or("-"); // a problem is recorded
         }
     }
-    text.mayHaveBraces = true; // warningsOfTexts reports them
+    text.mayHaveBraces = true; // warningsOfSituations reports them
 
     auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;
@@ -96,7 +97,7 @@ void SituationReader::checkLog(ConfigSection& section, const std::string& log) {
 }
 
 void SituationReader::noteName(ConfigSection& section, const std::string& name) {
-    const auto [first, isNew] = m_names.emplace(name, section.line("name"));
+    const auto [first, isNew] = m_names.emplace(name, m_problems.lineOr(section.line("name")));
     if (!isNew) {
         section.problem("name",
                         "'" + name + "' is the name of the situation at line " +

@@ -19,8 +19,10 @@ public:
     SituationReader(const std::vector<LogConfig>& logs, ConfigProblems& problems)
         : m_logs(logs), m_problems(problems) {}
 
-    /// The situation of one table; meaningless when a problem was recorded.
-    SituationConfig read(const toml::table& table);
+    /// The situation of one table; meaningless when a problem was recorded. Problems name the table
+    /// as `section`. A situation that must not have a name of its own is given one.
+    SituationConfig read(const toml::table& table, const std::string& name = {},
+                         const char* section = "situation");
 
 private:
     void noteName(ConfigSection& section, const std::string& name);

@@ -67,12 +67,51 @@ std::string textWarning(const SituationConfig& situation) {
                                                        text->ignored().text();
 }
 
+bool isMonitored(const HostConfig& config, const std::string& log) {
+    return std::any_of(config.logs.begin(), config.logs.end(), [&](const LogConfig& table) {
+        return isOf(table, log) ||
+               (!table.name.empty() && (log == table.name || log == table.type));
+    });
+}
+
+bool hasLogConfig(const HostConfig& config) {
+    return std::any_of(config.environment.begin(), config.environment.end(),
+                       [](const auto& one) { return one.variable == "ZRM_CONFIG_FILE"; });
+}
+
+/// A rule whose log nobody monitors is never raised. Logs of the log configuration are not known
+/// here.
+std::string ruleWarning(const HostConfig& config, const SituationConfig& situation) {
+    if (situation.rule.empty() || hasLogConfig(config)) {
+        return {};
+    }
+    std::vector<std::string> logs = situation.ruleLogs;
+    if (situation.log) {
+        logs = {*situation.log};
+    }
+    std::string names;
+    for (const std::string& log : logs) {
+        if (isMonitored(config, log)) {
+            return {};
+        }
+        names += (names.empty() ? "" : " or ") + log;
+    }
+    return names.empty()
+               ? ""
+               : "no [[log]] table names " + names +
+                     (situation.log
+                          ? "; add one, or name another log"
+                          : "; add one, or name the log that has such entries: [[use]] with "
+                            "rule and log");
+}
+
 } // namespace
 
 std::vector<std::string> warningsOfSituations(const HostConfig& config, const std::string& path) {
     std::vector<std::string> warnings;
     for (const SituationConfig& situation : config.situations) {
-        for (const std::string& why : {fieldWarning(config, situation), textWarning(situation)}) {
+        for (const std::string& why : {fieldWarning(config, situation), textWarning(situation),
+                                       ruleWarning(config, situation)}) {
             if (!why.empty()) {
                 warnings.push_back(path + ": situation '" + situation.name + "': " + why);
             }

@@ -47,7 +47,7 @@ public:
                 const LineJoin* join)
         : m_description(description), m_reader(format.reader()), m_join(join) {}
 
-    std::vector<FormatSamples::Failure> take() { return std::move(m_failures); }
+    std::vector<SampleFailure> take() { return std::move(m_failures); }
 
     void check(const ReadyFormat::Sample& sample) {
         m_line = sample.line;
@@ -112,16 +112,16 @@ private:
     const std::unique_ptr<EntryFormat::Reader> m_reader;
     const LineJoin* const m_join;
     unsigned m_line = 0;
-    std::vector<FormatSamples::Failure> m_failures;
+    std::vector<SampleFailure> m_failures;
 };
 
-std::vector<FormatSamples::Failure> unusable(const Problem& problem) {
+std::vector<SampleFailure> unusable(const Problem& problem) {
     return {{0, (problem.field.empty() ? "" : problem.field + ": ") + problem.text()}};
 }
 
 } // namespace
 
-std::vector<FormatSamples::Failure> FormatSamples::check(const ReadyFormat& ready) {
+std::vector<SampleFailure> FormatSamples::check(const ReadyFormat& ready) {
     const auto format = makeFormat(ready.format);
     if (!format) {
         return unusable(format.error());

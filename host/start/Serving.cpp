@@ -9,6 +9,7 @@
 #include "host/api/EventsResource.h"
 #include "host/api/LogsResource.h"
 #include "host/api/ReportResource.h"
+#include "host/api/RulesResource.h"
 #include "host/api/SampleResource.h"
 #include "host/api/SilencesResource.h"
 #include "host/api/SituationsResource.h"
@@ -144,6 +145,7 @@ void Serving::addResources(const HostConfig& config, TableManager& entries) {
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
     addResource(std::make_unique<SilencesResource>(m_delivery.silences()));
+    addResource(std::make_unique<RulesResource>(config.ruleDirectories, m_situations));
     auto analysis =
         std::make_unique<AnalysisResource>(m_situations, entries, m_watch, m_delivery.history());
     m_analysis = analysis.get();

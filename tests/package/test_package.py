@@ -13,7 +13,8 @@ from pathlib import Path
 import pytest
 from conftest import PACKAGE, quoted, run, wait_until
 
-FORMATS = list((Path(__file__).resolve().parents[2] / "formats").glob("*.toml"))
+ROOT = Path(__file__).resolve().parents[2]
+READY = [file for folder in ("formats", "rules") for file in (ROOT / folder).glob("*.toml")]
 FILES = {
     "etc/zrm/zrm.toml",
     "lib/systemd/system/zrmagent.service",
@@ -25,7 +26,7 @@ FILES = {
     "usr/share/man/man1/zrmctl.1.gz",
     "usr/share/man/man5/zrm.toml.5.gz",
     "usr/share/man/man8/zrmagent.8.gz",
-} | {f"usr/share/zrm/formats/{file.name}" for file in FORMATS}
+} | {f"usr/share/zrm/{file.parent.name}/{file.name}" for file in READY}
 PROGRAMS = {"usr/bin/zrmctl", "usr/sbin/zrmagent"}
 
 

@@ -126,6 +126,8 @@ class Agent:
         self.http_keys = {}
         self.history = {}  # keys of [history]
         self.formats = None  # directory of [formats]
+        self.rules = None  # directory of [rules]
+        self.use = []  # names of ready situations, or the keys of each [[use]]
         self.agent_keys = {}
         self.process = None
         self.stdout = None
@@ -165,10 +167,14 @@ class Agent:
     def _write_toml(self):
         keys = {"log_config": str(self.logs_conf), "syslog_conf": str(self.syslog_conf)}
         keys.update(self.agent_keys)
-        text = f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
+        names = [one for one in self.use if isinstance(one, str)]
+        text = f"use = {json.dumps(names)}\n" if names else ""
+        text += f"state_directory = {json.dumps(str(self.directory / 'state'))}\n[agent]\n"
         text += "".join(f"{k} = {json.dumps(v)}\n" for k, v in keys.items() if v is not None)
         if self.formats is not None:
             text += f"[formats]\ndirectory = {json.dumps(str(self.formats))}\n"
+        if self.rules is not None:
+            text += f"[rules]\ndirectory = {json.dumps(str(self.rules))}\n"
         text += f"[http]\nlisten = {json.dumps(self.listen)}\n"
         text += "".join(f"{k} = {json.dumps(str(v))}\n" for k, v in self.http_keys.items())
         text += "[history]\n"
@@ -181,6 +187,9 @@ class Agent:
         for table in self.tables:
             text += "\n[[log]]\n"
             text += "".join(f"{k} = {toml_value(v)}\n" for k, v in table.items())
+        for use in [one for one in self.use if isinstance(one, dict)]:
+            text += "\n[[use]]\n"
+            text += "".join(f"{k} = {toml_value(v)}\n" for k, v in use.items())
         for situation in self.situations:
             text += "\n[[situation]]\n"
             text += "".join(f"{k} = {toml_value(v)}\n" for k, v in situation.items())

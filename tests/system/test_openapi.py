@@ -105,6 +105,7 @@ EXAMPLES = [
     ("GET", "/api/v1/events/{id}", "/api/v1/events/1", None, None),
     ("GET", "/api/v1/rates", None, None, None),
     ("GET", "/api/v1/rates", "/api/v1/rates?step=3600&log={log}", None, None),
+    ("GET", "/api/v1/rules", None, None, 200),
     ("GET", "/api/v1/situations", None, None, 200),
     ("POST", "/api/v1/situations/validate", None, {"name": "x", "when": ["y"]}, 200),
     ("POST", "/api/v1/situations", None, DEFINITION, 201),

@@ -130,7 +130,7 @@ keep_days = 30
 )"),
         ElementsAre(
             "zrm.toml:1: colour: unknown key; the keys here are state_directory, agent, http, "
-            "history, formats, sink, log, situation",
+            "history, formats, rules, sink, log, situation, use",
             "zrm.toml:3: agent.log_confg: unknown key; the keys here are log_config, "
             "syslog_conf, debug_log, max_rows, trace",
             "zrm.toml:5: http.port: unknown key; the keys here are listen, certificate, "
@@ -139,7 +139,7 @@ keep_days = 30
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period, context, runbook, labels",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
-            "http, history, formats, sink, log, situation"));
+            "http, history, formats, rules, sink, log, situation, use"));
 }
 
 TEST(ConfigFile, RefusesValuesOfAnotherType) {

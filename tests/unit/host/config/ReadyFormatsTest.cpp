@@ -140,7 +140,7 @@ TEST_F(ReadyFormatsTest, RefusesFilesThatAreNoFormats) {
     EXPECT_THAT(problemOf("folder").what, HasSubstr("cannot be read"));
     std::filesystem::create_symlink("circle.toml", m_directory + "/circle.toml");
     EXPECT_THAT(problemOf("circle").what, HasSubstr("cannot be read"));
-    write("large.toml", std::string(ReadyFormats::largestFile + 1, '\n'));
+    write("large.toml", std::string(ReadyFiles::largestFile + 1, '\n'));
     EXPECT_THAT(problemOf("large").what, HasSubstr("make it a readable file of at most 256 KiB"));
     write("deep.toml", "type = " + std::string(100000, '['));
     EXPECT_THAT(problemOf("deep").what, HasSubstr("nested deeper"));

@@ -32,7 +32,7 @@ ReadyFormat logfmt() {
 
 std::vector<std::string> failuresOf(const ReadyFormat& ready) {
     std::vector<std::string> texts;
-    for (const FormatSamples::Failure& failure : FormatSamples::check(ready)) {
+    for (const SampleFailure& failure : FormatSamples::check(ready)) {
         texts.push_back(std::to_string(failure.line) + ": " + failure.text);
     }
     return texts;
@@ -115,7 +115,7 @@ TEST(FormatSamples, EveryReadyFormatGivesWhatItsSamplesSay) {
         }
         EXPECT_FALSE(ready->about.empty()) << place.path;
         EXPECT_GE(ready->samples.size(), 2U) << place.path;
-        for (const FormatSamples::Failure& failure : FormatSamples::check(*ready)) {
+        for (const SampleFailure& failure : FormatSamples::check(*ready)) {
             ADD_FAILURE() << place.path << ':' << failure.line << ": " << failure.text;
         }
     }
