@@ -1,6 +1,7 @@
 #include "host/api/RulesResource.h"
 
 #include "base/TraceScope.h"
+#include "host/http/QueryFields.h"
 #include "host/situations/SituationJson.h"
 #include "host/situations/SituationSet.h"
 
@@ -33,11 +34,13 @@ RulesResource::RulesResource(std::vector<std::string> directories, const Situati
     : m_rules(std::move(directories)), m_situations(situations) {}
 
 void RulesResource::addRoutes(Router& router) {
-    router.add("GET", "/api/v1/rules", [this](const HttpRequest&) { return list(); });
+    router.add("GET", "/api/v1/rules",
+               [this](const HttpRequest& request) { return list(request); });
 }
 
-HttpAnswer RulesResource::list() const {
+HttpAnswer RulesResource::list(const HttpRequest& request) const {
     TraceScope trace(anchor);
+    QueryFields(request).refuseUnknown();
     const std::vector<SituationStatus> situations = m_situations.list();
     Json all = Json::array();
     for (const ReadyRules::Place& place : m_rules.list()) {

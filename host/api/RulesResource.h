@@ -22,7 +22,7 @@ public:
     void addRoutes(Router& router) override;
 
 private:
-    HttpAnswer list() const;
+    HttpAnswer list(const HttpRequest& request) const;
 
     const ReadyRules m_rules;
     const SituationSet& m_situations;

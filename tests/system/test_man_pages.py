@@ -128,6 +128,6 @@ def test_every_key_of_the_configuration():
         assert items(part) >= keys, heading
         seen.add(name)
     assert seen == {
-        "Top level", "[agent]", "[formats]", "[[log]]", "[http]", "[history]", "[[sink]]", "[[situation]]",
+        "Top level", "[agent]", "[formats]", "[rules]", "[[log]]", "[http]", "[history]", "[[sink]]", "[[situation]]",
         "jsonl", "webhook", "alertmanager", "syslog", "otlp",
     }  # fmt: skip
