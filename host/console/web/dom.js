@@ -44,7 +44,7 @@ export function say(element, ...children) {
   if (next.textContent !== element.textContent) element.replaceChildren(...next.childNodes);
 }
 
-/** A link to a page elsewhere, which learns nothing of this one. Anything but http(s) stays text. */
+/** A link to a page elsewhere, which learns nothing of this one; text if it is not http(s). */
 export function link(url) {
   return /^https?:\/\//.test(url)
     ? h("a", { href: url, target: "_blank", rel: "noopener noreferrer" }, url)

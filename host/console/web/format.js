@@ -117,14 +117,16 @@ export function frequencyText(frequency, period) {
 }
 
 /**
- * What an event says in one line: the text that its situation makes of it, or else its group and the
- * text of its entry, or what came of an episode.
+ * What an event says in one line: the text that its situation makes of it, or else its group and
+ * the text of its entry, or what came of an episode.
  */
 export function describe(event) {
   if (event.text) return event.text;
   const group = Object.entries(event.group ?? {}).map(([name, value]) => `${name}=${value}`);
   const text = event.row
     ? event.row.UENTRYDESC || event.row.ENTRYDESC
-    : [event.state, event.reason, `${event.episode?.count ?? 0} entries`].filter(Boolean).join(", ");
+    : [event.state, event.reason, `${event.episode?.count ?? 0} entries`]
+        .filter(Boolean)
+        .join(", ");
   return [...group, text].join(" ");
 }
