@@ -1,0 +1,36 @@
+#ifndef ZRM_HOST_JUDGEMENT_CONFIG_H
+#define ZRM_HOST_JUDGEMENT_CONFIG_H
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace zrm::host {
+
+/// What the host decides about the entries that meet a situation's conditions, where `group_by`,
+/// `distinct`, `resolve_after` or `cooldown` ask for more than the table of entries does. Durations
+/// are in seconds.
+struct JudgementConfig {
+    static constexpr std::size_t usualGroups = 10'000;
+
+    std::vector<std::string> groupBy = {}; ///< names of entry values; empty: all are one group
+    std::size_t maxGroups = usualGroups;   ///< that are kept at a time
+    std::string distinct = {};             ///< counts different values of this name; empty: entries
+    std::int64_t frequency = 0;            ///< of the threshold; 0: none
+    bool isUpperBound = false;             ///< at most `frequency`, not at least
+    std::int64_t period = 0;               ///< of the threshold
+    std::int64_t resolveAfter = 0;         ///< an episode ends this long after its last entry;
+                                           ///< 0: there are no episodes
+    std::int64_t cooldown = 0;             ///< of a group after an event; 0: none
+
+    /// Whether the host judges at all.
+    bool isUsed() const noexcept {
+        return !groupBy.empty() || !distinct.empty() || resolveAfter > 0 || cooldown > 0;
+    }
+    bool operator==(const JudgementConfig&) const = default;
+};
+
+} // namespace zrm::host
+
+#endif
