@@ -49,6 +49,13 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
             text.labels[name] = labels->text(name);
         }
     }
+    text.judgement.groupBy = fields.texts("group_by", JudgementRules::mostNames);
+    if (fields.has("max_groups")) {
+        text.judgement.maxGroups = fields.number("max_groups", 1, JudgementRules::mostGroups);
+    }
+    text.judgement.distinct = fields.optionalText("distinct");
+    text.judgement.resolveAfter = fields.optionalText("resolve_after");
+    text.judgement.cooldown = fields.optionalText("cooldown");
     fields.refuseUnknown();
     if (text.log) {
         checkLog(fields, *text.log);

@@ -41,12 +41,12 @@ Json withoutState(Json definition) {
     return definition;
 }
 
-int numberOf(const std::string& text) {
+int numberOf(const char* option, const std::string& text) {
     int number = 0;
     const char* const end = text.data() + text.size();
     const auto [stop, error] = std::from_chars(text.data(), end, number);
     if (error != std::errc() || stop != end) {
-        throw CliError(CliStatus::USAGE, "--context: '" + text + "' is not a number of entries");
+        throw CliError(CliStatus::USAGE, std::string(option) + ": '" + text + "' is not a number");
     }
     return number;
 }
@@ -104,10 +104,21 @@ void SituationOptions::addTo(CLI::App& command) {
     command.add_option("--label", m_labels, "A label of its events; repeatable")
         ->type_name("NAME=VALUE")
         ->allow_extra_args(false);
+    command
+        .add_option("--group_by", m_groupBy,
+                    "Judge the entries of each value apart: a column, a field or a capture; may be "
+                    "repeated")
+        ->type_name("NAME")
+        ->allow_extra_args(false);
+    addMember("max_groups", m_maxGroups, "COUNT", "How many groups are kept at a time");
+    addMember("distinct", m_distinct, "NAME", "Count different values of this, not entries");
+    addMember("resolve_after", m_resolveAfter, "TIME",
+              "Raise one event per episode, which ends when nothing has come for this long");
+    addMember("cooldown", m_cooldown, "TIME", "Raise at most one event within this time");
 }
 
 bool SituationOptions::areGiven() const {
-    return !m_file.empty() || !m_when.empty() || !m_labels.empty() ||
+    return !m_file.empty() || !m_when.empty() || !m_groupBy.empty() || !m_labels.empty() ||
            std::any_of(m_members.begin(), m_members.end(),
                        [](const Member& member) { return member.option->count() > 0; });
 }
@@ -121,19 +132,25 @@ Json SituationOptions::definition(const Json& base) const {
             definition[member.key] = *member.value;
         }
     }
-    if (const auto context = definition.find("context");
-        context != definition.end() && context->is_string()) {
-        definition["context"] = numberOf(context->get<std::string>());
+    for (const auto& [key, option] :
+         {std::pair("context", "--context"), std::pair("max_groups", "--max_groups")}) {
+        if (const auto number = definition.find(key);
+            number != definition.end() && number->is_string()) {
+            definition[key] = numberOf(option, number->get<std::string>());
+        }
     }
     if (m_labels == std::vector<std::string>{""}) {
         definition.erase("labels");
     } else if (!m_labels.empty()) {
         definition["labels"] = labelsOf(m_labels);
     }
-    if (m_when == std::vector<std::string>{""}) {
-        definition.erase("when");
-    } else if (!m_when.empty()) {
-        definition["when"] = m_when;
+    for (const auto& [key, values] :
+         {std::pair("when", &m_when), std::pair("group_by", &m_groupBy)}) {
+        if (*values == std::vector<std::string>{""}) {
+            definition.erase(key);
+        } else if (!values->empty()) {
+            definition[key] = *values;
+        }
     }
     return definition;
 }

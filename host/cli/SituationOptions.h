@@ -51,6 +51,11 @@ private:
     std::string m_context;
     std::string m_runbook;
     std::vector<std::string> m_labels; ///< as written
+    std::vector<std::string> m_groupBy;
+    std::string m_maxGroups;
+    std::string m_distinct;
+    std::string m_resolveAfter;
+    std::string m_cooldown;
 };
 
 } // namespace zrm::host

@@ -49,6 +49,12 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
     facts.add("frequency", frequency.empty()
                                ? ""
                                : frequency + " within " + JsonText::text(situation, "period"));
+    for (const Json& name : JsonText::member(situation, "group_by")) {
+        facts.add("group by", JsonText::text(name));
+    }
+    facts.add("distinct", JsonText::text(situation, "distinct"));
+    facts.add("resolve after", JsonText::text(situation, "resolve_after"));
+    facts.add("cooldown", JsonText::text(situation, "cooldown"));
     const std::string context = JsonText::text(situation, "context");
     facts.add("context", context == "0" ? "" : context);
     facts.add("runbook", JsonText::text(situation, "runbook"));

@@ -2,6 +2,7 @@
 #define ZRM_HOST_HOST_CONFIG_H
 
 #include "host/base/ListenAddress.h"
+#include "host/config/JudgementConfig.h"
 #include "host/config/LogConfig.h"
 #include "host/config/SinkConfig.h"
 #include "host/framework/Condition.h"
@@ -56,6 +57,7 @@ struct SituationConfig {
     std::map<std::string, std::string> labels = {}; ///< of its events, for their receivers
     std::string rule = {}; ///< the ready situation that it is; empty: written by the operator
     std::vector<std::string> ruleLogs = {}; ///< paths of logs that the rule is for
+    JudgementConfig judgement = {};
     std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)
     bool operator==(const SituationConfig&) const = default;
 };

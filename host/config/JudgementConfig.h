@@ -23,6 +23,8 @@ struct JudgementConfig {
     std::int64_t resolveAfter = 0;         ///< an episode ends this long after its last entry;
                                            ///< 0: there are no episodes
     std::int64_t cooldown = 0;             ///< of a group after an event; 0: none
+    std::string resolveAfterText = {};     ///< as the operator has written it
+    std::string cooldownText = {};
 
     /// Whether the host judges at all.
     bool isUsed() const noexcept {

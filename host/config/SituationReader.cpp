@@ -62,6 +62,14 @@ SituationConfig SituationReader::read(const toml::table& table, const std::strin
         }
     }
     text.mayHaveBraces = true; // warningsOfSituations reports them
+    for (const ConfigSection::Text& name :
+         section.texts("group_by").value_or(std::vector<ConfigSection::Text>())) {
+        text.judgement.groupBy.push_back(name.first);
+    }
+    text.judgement.maxGroups = section.number("max_groups");
+    text.judgement.distinct = fields.text("distinct");
+    text.judgement.resolveAfter = fields.text("resolve_after");
+    text.judgement.cooldown = fields.text("cooldown");
 
     auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;

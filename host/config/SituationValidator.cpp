@@ -245,6 +245,11 @@ SituationValidator::Verdict SituationValidator::check(const SituationText& text,
     }
     situation.context = static_cast<std::size_t>(text.context.value_or(0));
     addExtras(text, situation, problems);
+    std::vector<Problem> ofJudgement;
+    situation.judgement = JudgementRules::check(text.judgement, situation.conditions, ofJudgement);
+    for (Problem& problem : ofJudgement) {
+        problems.push_back({std::move(problem)});
+    }
     return verdict;
 }
 

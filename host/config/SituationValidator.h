@@ -4,6 +4,7 @@
 #include "host/base/Result.h"
 #include "host/config/ConditionBuilder.h"
 #include "host/config/HostConfig.h"
+#include "host/config/JudgementRules.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -30,6 +31,7 @@ struct SituationText {
     /// A text may have unknown names in braces, but no known ones beside them, and is then kept as
     /// it is.
     bool mayHaveBraces = false;
+    JudgementText judgement = {};
 };
 
 /// What is wrong with a situation, in a field such as "name" or "when[0]".

@@ -7,6 +7,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstdio>
+#include <utility>
 
 #include <xxhash.h>
 
@@ -28,16 +29,29 @@ Json orNull(const std::optional<std::string>& text) {
 } // namespace
 
 Json SituationJson::definition(const SituationConfig& situation) {
-    return {{"name", situation.name},
-            {"text", situation.text},
-            {"severity", situation.severity},
-            {"log", orNull(situation.log)},
-            {"when", situation.when},
-            {"frequency", orNull(situation.frequency)},
-            {"period", orNull(situation.period)},
-            {"context", situation.context},
-            {"runbook", situation.runbook.empty() ? Json() : Json(situation.runbook)},
-            {"labels", situation.labels}};
+    Json object = {{"name", situation.name},
+                   {"text", situation.text},
+                   {"severity", situation.severity},
+                   {"log", orNull(situation.log)},
+                   {"when", situation.when},
+                   {"frequency", orNull(situation.frequency)},
+                   {"period", orNull(situation.period)},
+                   {"context", situation.context},
+                   {"runbook", situation.runbook.empty() ? Json() : Json(situation.runbook)},
+                   {"labels", situation.labels}};
+    const JudgementConfig& judgement = situation.judgement;
+    if (!judgement.groupBy.empty()) {
+        object["group_by"] = judgement.groupBy;
+        object["max_groups"] = judgement.maxGroups;
+    }
+    for (const auto& [key, value] : {std::pair("distinct", &judgement.distinct),
+                                     std::pair("resolve_after", &judgement.resolveAfterText),
+                                     std::pair("cooldown", &judgement.cooldownText)}) {
+        if (!value->empty()) {
+            object[key] = *value;
+        }
+    }
+    return object;
 }
 
 std::string SituationJson::version(const SituationConfig& situation) {

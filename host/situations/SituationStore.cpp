@@ -88,6 +88,13 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     text.runbook = optionalText(object, "runbook");
     text.labels = object.value("labels", std::map<std::string, std::string>());
     text.mayHaveBraces = true; // it may have been made before braces had a meaning
+    text.judgement.groupBy = object.value("group_by", std::vector<std::string>());
+    if (object.contains("max_groups")) {
+        text.judgement.maxGroups = object.at("max_groups").get<std::int64_t>();
+    }
+    text.judgement.distinct = optionalText(object, "distinct");
+    text.judgement.resolveAfter = optionalText(object, "resolve_after");
+    text.judgement.cooldown = optionalText(object, "cooldown");
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
     auto [config, problems] = SituationValidator::check(text, patterns.ofNext());
