@@ -82,6 +82,22 @@ void EntryEvents::add(const std::shared_ptr<const SituationLabel>& situation, co
     }
 }
 
+std::vector<EpisodeShare> EntryEvents::shares() const {
+    std::vector<EpisodeShare> shares;
+    shares.reserve(m_shares.size());
+    for (const auto& share : m_shares) {
+        shares.push_back(*share);
+    }
+    return shares;
+}
+
+void EntryEvents::forgetShares() noexcept {
+    for (const auto& share : m_shares) {
+        share->isNoted.store(false, std::memory_order_release);
+    }
+    m_shares.clear();
+}
+
 void EntryEvents::describe(LogEntry& entry, const EntryContext& context) {
     const EntryKeep& keep = entry.keep();
     const SituationLabel* last = nullptr;

@@ -1,10 +1,13 @@
 #ifndef ZRM_HOST_ENTRY_EVENTS_H
 #define ZRM_HOST_ENTRY_EVENTS_H
 
+#include "host/events/Episode.h"
 #include "host/events/Event.h"
 
 #include <cstddef>
 #include <memory>
+#include <string>
+#include <utility>
 #include <vector>
 
 namespace zrm {
@@ -35,6 +38,23 @@ public:
         }
     }
 
+    /// The name of the log; its own thread sets it once.
+    void setLog(std::string name) { m_log = std::move(name); }
+    const std::string& log() const noexcept { return m_log; }
+
+    /// An episode's share of this log has grown: it is handed over with the next position. Costs
+    /// next to nothing until then, however often it grows.
+    void note(const std::shared_ptr<GrowingShare>& share) {
+        if (!share->isNoted.load(std::memory_order_relaxed)) {
+            share->isNoted.store(true, std::memory_order_relaxed);
+            m_shares.push_back(share);
+        }
+    }
+    /// What has been noted, as it is now.
+    std::vector<EpisodeShare> shares() const;
+    /// The shares have been handed over, so that they are stored with the position.
+    void forgetShares() noexcept;
+
     bool empty() const noexcept { return m_events.empty(); }
     std::size_t size() const noexcept { return m_events.size(); }
     const std::shared_ptr<const SituationLabel>& situation(std::size_t index) const noexcept {
@@ -62,6 +82,8 @@ private:
 
     void drop() noexcept;
 
+    std::string m_log;
+    std::vector<std::shared_ptr<GrowingShare>> m_shares; ///< noted; outlast the entry
     std::vector<Collected> m_events;
     std::vector<char> m_rows;
     std::vector<std::shared_ptr<const EntryDetail>> m_details; ///< as many as events, or none

@@ -69,7 +69,7 @@ void EventJson::writeJudgement(JsonWriter& json, const Event& event) {
     if (judgement.episode != nullptr) {
         json.member("state", isResolved ? "resolved" : "raised");
         json.key("episode").beginObject().member("id", judgement.episode->value());
-        json.key("raised").time(isResolved ? judgement.raised : event.raised);
+        json.key("raised").time(isResolved ? judgement.episode->raised() : event.raised);
         json.member("count", judgement.count);
         json.key("first").time(judgement.first * milliseconds);
         json.key("last").time(judgement.last * milliseconds).endObject();
@@ -89,6 +89,15 @@ void EventJson::writeJudgement(JsonWriter& json, const Event& event) {
     if (event.row == nullptr) {
         json.member("log", judgement.log).member("node", judgement.node);
     }
+}
+
+std::string EventJson::node(const Event& event) const {
+    if (event.row == nullptr) {
+        return event.judgement->node;
+    }
+    std::string room;
+    const RowColumn* const column = m_layout.find("ORIGINNODE");
+    return column == nullptr ? std::string() : std::string(RowText::of(*column, event.row, room));
 }
 
 void EventJson::appendLog(std::string& text, const Event& event) const {

@@ -27,6 +27,9 @@ public:
     /// are empty, uses the ones in the log's own code page.
     void appendLog(std::string& text, const Event& event) const;
 
+    /// The event's ORIGINNODE.
+    std::string node(const Event& event) const;
+
 private:
     static void writeExtras(JsonWriter& json, const Event& event);
     void writeDetail(JsonWriter& json, const EntryDetail& detail) const;

@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <utility>
 
 namespace zrm::host {
 
@@ -66,7 +67,7 @@ bool EventQueue::push(const std::shared_ptr<const SituationLabel>& situation, co
 
 std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
                                     const std::shared_ptr<FollowedLog>& log,
-                                    const LogPosition& behind) {
+                                    const LogPosition& behind, std::vector<EpisodeShare> shares) {
     std::unique_lock lock(m_mutex);
     if (m_closed || events.empty()) {
         return 0;
@@ -82,6 +83,9 @@ std::uint64_t EventQueue::pushEntry(const EntryEvents& events,
         if (event.endsEntry) {
             event.log = log;
             event.behind = behind;
+            if (!shares.empty()) {
+                event.shares = std::make_shared<const std::vector<EpisodeShare>>(std::move(shares));
+            }
         }
         add(std::move(event), events.row(index));
     }
@@ -104,7 +108,7 @@ void EventQueue::announce(std::unique_lock<std::mutex>& lock) {
 void EventQueue::add(Event event, const char* row) {
     event.id = m_last + m_next + m_aside.size() + 1;
     if (event.judgement != nullptr && event.judgement->state == EventJudgement::RAISED) {
-        event.judgement->episode->set(event.id);
+        event.judgement->episode->set(event.id, event.raised);
     }
     m_detailBytes += bytesOf(event);
     if (m_aside.empty() && hasSlot()) {

@@ -64,9 +64,10 @@ public:
               const std::shared_ptr<const EventJudgement>& judgement = nullptr);
 
     /// Copies all events of an entry, which stay together. The last one carries the position behind
-    /// the entry. Returns its id; 0 if nothing was taken because the queue is closed.
+    /// the entry and what the log has added to episodes up to there. Returns its id; 0 if nothing
+    /// was taken because the queue is closed.
     std::uint64_t pushEntry(const EntryEvents& events, const std::shared_ptr<FollowedLog>& log,
-                            const LogPosition& behind);
+                            const LogPosition& behind, std::vector<EpisodeShare> shares = {});
 
     /// Waits for events until the limit, and a few milliseconds for more once the first has
     /// arrived. Returns the oldest ones that the reader has not released, at most `most`; they stay

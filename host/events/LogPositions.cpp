@@ -3,6 +3,7 @@
 
 #include "framework/LogEntry.h"
 
+#include "host/base/TimeText.h"
 #include "host/events/ContextDemand.h"
 #include "host/events/EntryContext.h"
 #include "host/events/EntryEvents.h"
@@ -17,7 +18,9 @@ class LogPositions::State {
 public:
     explicit State(const char* name)
         : book(PositionBook::current()), log(book->log(name)), isFirst(!log->isOfRun()),
-          follower(log->begin()) {}
+          follower(log->begin()) {
+        events.setLog(log->name());
+    }
     State(const State&) = delete;
     State& operator=(const State&) = delete;
     ~State() {
@@ -59,6 +62,7 @@ public:
     const FollowedLog::Follower follower;
     EntryEvents events;
     EntryContext context;
+    std::int64_t look = 0;    ///< when the last look at the log began
     std::uint64_t demand = 0; ///< generation of ContextDemand that `context` meets
 };
 
@@ -103,11 +107,19 @@ void LogPositions::reached(const LogPosition& position) {
     if (m_state->book->isClosed()) {
         return;
     }
-    const bool isFirst = m_state->log->reached(m_state->follower, position);
+    const bool isFirst = m_state->log->reached(m_state->follower, position, m_state->events);
     EventQueue* const queue = m_state->book->queue();
     if (isFirst && queue != nullptr && m_state->book->isKept()) {
         queue->wake(); // until it is stored, a crash would lose where the log began
     }
+}
+
+void LogPositions::beginLook() noexcept {
+    m_state->look = WallClock::now();
+}
+
+void LogPositions::endLook() noexcept {
+    m_state->log->caughtUp(m_state->follower, m_state->look);
 }
 
 void LogPositions::left(const LogPosition& position, bool isWatched) {

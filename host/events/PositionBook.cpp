@@ -3,6 +3,8 @@
 #include "host/events/EventQueue.h"
 
 #include <algorithm>
+#include <iterator>
+#include <limits>
 #include <utility>
 
 namespace zrm::host {
@@ -11,6 +13,7 @@ FollowedLog::Follower FollowedLog::begin() {
     const std::lock_guard guard(m_mutex);
     m_follower = ++m_followers;
     m_isTakenOver = false;
+    m_caughtUp = 0;
     return m_follower;
 }
 
@@ -75,16 +78,34 @@ bool FollowedLog::isStored() const {
     return m_isSaved && m_kept;
 }
 
-void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& events,
+void FollowedLog::push(Follower follower, EventQueue* queue, EntryEvents& events,
                        const std::shared_ptr<FollowedLog>& self, const LogPosition& behind) {
     const std::lock_guard guard(m_mutex);
     if (follower != m_follower || m_hasRefused) {
         return;
     }
-    const std::uint64_t last = queue == nullptr ? 0 : queue->pushEntry(events, self, behind);
+    std::optional<PositionValue> before;
+    if (m_reached) {
+        before = reachedValue();
+    }
+    // What is still to be stored up to the position before goes with the event as well.
+    for (EpisodeShare& share : events.shares()) {
+        m_shares.insert_or_assign(share.episode.get(), std::move(share));
+    }
+    std::vector<EpisodeShare> shares;
+    for (const auto& [id, share] : m_shares) {
+        shares.push_back(share);
+    }
+    const std::uint64_t last =
+        queue == nullptr ? 0 : queue->pushEntry(events, self, behind, std::move(shares));
     if (last == 0) {
         m_hasRefused = true;
         return;
+    }
+    events.forgetShares();
+    m_shares.clear();
+    if (before) {
+        m_passed.push_back({m_lastEvent, last, std::move(*before)});
     }
     m_lastEvent = last;
     m_newest = behind;
@@ -92,13 +113,17 @@ void FollowedLog::push(Follower follower, EventQueue* queue, const EntryEvents& 
     m_reached.reset();
 }
 
-bool FollowedLog::reached(Follower follower, const LogPosition& position) {
+bool FollowedLog::reached(Follower follower, const LogPosition& position, EntryEvents& events) {
     const std::lock_guard guard(m_mutex);
     if (follower != m_follower || m_hasRefused) {
         return false;
     }
     m_isOfRun = true;
-    if (position == m_newest) {
+    for (EpisodeShare& share : events.shares()) {
+        m_shares.insert_or_assign(share.episode.get(), std::move(share));
+    }
+    events.forgetShares();
+    if (position == m_newest && m_shares.empty()) {
         return false;
     }
     const bool isFirst = !m_newest;
@@ -106,19 +131,57 @@ bool FollowedLog::reached(Follower follower, const LogPosition& position) {
     return isFirst;
 }
 
-std::optional<LogPosition> FollowedLog::unsaved(std::uint64_t event) const {
+void FollowedLog::caughtUp(Follower follower, std::int64_t time) {
     const std::lock_guard guard(m_mutex);
-    if (m_reached && m_lastEvent <= event) {
-        return m_reached;
+    if (follower == m_follower) {
+        m_caughtUp = time;
     }
-    return m_isSaved ? std::nullopt : m_kept;
 }
 
-void FollowedLog::saved(const LogPosition& position) {
+std::optional<std::int64_t> FollowedLog::judgedUntil() const {
     const std::lock_guard guard(m_mutex);
-    m_kept = position;
+    return m_follower != 0 && !m_hasRefused ? std::optional(m_caughtUp) : std::nullopt;
+}
+
+std::optional<PositionValue> FollowedLog::unsavedReached(std::uint64_t event) {
+    const std::lock_guard guard(m_mutex);
+    std::erase_if(m_passed, [event](const Passed& passed) { return passed.to <= event; });
+    if (m_reached && m_lastEvent <= event) {
+        return reachedValue();
+    }
+    const auto passed = std::find_if(m_passed.rbegin(), m_passed.rend(),
+                                     [event](const Passed& one) { return one.from <= event; });
+    return passed != m_passed.rend() ? std::optional(passed->value) : std::nullopt;
+}
+
+std::optional<PositionValue> FollowedLog::unsaved(std::uint64_t event) {
+    if (std::optional<PositionValue> reached = unsavedReached(event)) {
+        return reached;
+    }
+    const std::lock_guard guard(m_mutex);
+    return m_isSaved || !m_kept ? std::nullopt : std::optional(PositionValue{m_name, *m_kept});
+}
+
+/// What was reached last, with all that is to be stored with it. With m_mutex held.
+PositionValue FollowedLog::reachedValue() const {
+    PositionValue value{m_name, *m_reached};
+    for (const auto& [id, share] : m_shares) {
+        value.shares.push_back(share);
+    }
+    return value;
+}
+
+void FollowedLog::saved(const PositionValue& value) {
+    const std::lock_guard guard(m_mutex);
+    m_kept = value.position;
     m_isSaved = true;
-    if (m_reached == position) {
+    for (const EpisodeShare& share : value.shares) {
+        const auto found = m_shares.find(share.episode.get());
+        if (found != m_shares.end() && found->second == share) { // has not grown meanwhile
+            m_shares.erase(found);
+        }
+    }
+    if (m_reached == value.position && m_shares.empty()) {
         m_reached.reset();
     }
 }
@@ -229,8 +292,8 @@ std::vector<PositionValue> PositionBook::unsaved(std::uint64_t event) const {
     std::vector<PositionValue> values;
     const std::lock_guard guard(m_mutex);
     for (const auto& [name, log] : m_logs) {
-        if (const std::optional<LogPosition> position = log->unsaved(event)) {
-            values.push_back({name, *position});
+        if (std::optional<PositionValue> value = log->unsaved(event)) {
+            values.push_back(std::move(*value));
         }
     }
     return values;
@@ -240,9 +303,64 @@ void PositionBook::saved(const std::vector<PositionValue>& values) {
     const std::lock_guard guard(m_mutex);
     for (const PositionValue& value : values) {
         if (const auto found = m_logs.find(value.log); found != m_logs.end()) {
-            found->second->saved(value.position);
+            found->second->saved(value);
         }
     }
+}
+
+std::vector<PositionValue> PositionBook::unsavedReached(std::uint64_t event) const {
+    std::vector<PositionValue> values;
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, log] : m_logs) {
+        if (std::optional<PositionValue> value = log->unsavedReached(event)) {
+            values.push_back(std::move(*value));
+        }
+    }
+    return values;
+}
+
+std::vector<EpisodeShare> PositionBook::takeShares() {
+    const std::lock_guard guard(m_mutex);
+    return std::exchange(m_shares, {});
+}
+
+void PositionBook::note(std::vector<EpisodeShare> shares) {
+    const std::lock_guard guard(m_mutex);
+    std::move(shares.begin(), shares.end(), std::back_inserter(m_shares));
+}
+
+void PositionBook::setEpisodes(std::vector<StoredEpisode> episodes) {
+    const std::lock_guard guard(m_mutex);
+    m_episodes = std::move(episodes);
+}
+
+std::vector<StoredEpisode> PositionBook::takeEpisodes(const std::optional<std::string>& situation) {
+    std::vector<StoredEpisode> taken;
+    const std::lock_guard guard(m_mutex);
+    std::erase_if(m_episodes, [&](StoredEpisode& episode) {
+        const bool isTaken = !situation || episode.situation == *situation;
+        if (isTaken) {
+            taken.push_back(std::move(episode));
+        }
+        return isTaken;
+    });
+    return taken;
+}
+
+std::int64_t PositionBook::judgedUntil(const std::optional<std::string>& log) const {
+    std::int64_t until = std::numeric_limits<std::int64_t>::max();
+    const std::lock_guard guard(m_mutex);
+    for (const auto& [name, one] : m_logs) {
+        const auto judged = log && name != *log ? std::nullopt : one->judgedUntil();
+        until = std::min(until, judged.value_or(until));
+    }
+    return until;
+}
+
+bool PositionBook::isFollowed(std::string_view log) const {
+    const std::lock_guard guard(m_mutex);
+    const auto found = m_logs.find(log);
+    return found != m_logs.end() && found->second->isFollowed();
 }
 
 void PositionBook::forgetSaved() {

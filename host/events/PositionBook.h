@@ -2,6 +2,7 @@
 #define ZRM_HOST_POSITION_BOOK_H
 
 #include "framework/LogPositions.h"
+#include "host/events/Episode.h"
 #include "host/events/WatchedPaths.h"
 
 #include <atomic>
@@ -25,6 +26,7 @@ class EventQueue;
 struct PositionValue {
     std::string log; ///< its name
     LogPosition position;
+    std::vector<EpisodeShare> shares = {}; ///< what it has added to episodes up to there
     bool operator==(const PositionValue&) const = default;
 };
 
@@ -32,6 +34,7 @@ struct PositionValue {
 struct PositionValues {
     std::vector<PositionValue> logs;
     std::vector<WatchedPath> paths;
+    std::vector<EpisodeShare> shares = {}; ///< of logs without positions
     bool operator==(const PositionValues&) const = default;
 };
 
@@ -59,10 +62,16 @@ public:
     bool isStored() const;
     /// Gives the events to the queue. When it does not take them, because it is closed or null,
     /// later positions are ignored. `self` is this object.
-    void push(Follower follower, EventQueue* queue, const EntryEvents& events,
+    void push(Follower follower, EventQueue* queue, EntryEvents& events,
               const std::shared_ptr<FollowedLog>& self, const LogPosition& behind);
-    /// True if it is the log's first position, which should be stored at once.
-    bool reached(Follower follower, const LogPosition& position);
+    /// True if it is the log's first position, which should be stored at once. Takes what the log
+    /// has added to episodes.
+    bool reached(Follower follower, const LogPosition& position, EntryEvents& events);
+    /// What was in the log at this time (milliseconds since 1970, UTC) has been judged, and given
+    /// to push or reached.
+    void caughtUp(Follower follower, std::int64_t time);
+    /// That time; 0 if nobody has followed the log so far. None while nobody does.
+    std::optional<std::int64_t> judgedUntil() const;
     /// Begins anew with what comes after the files that were modified up to this time.
     void beginAnew(Follower follower, std::int64_t modified);
 
@@ -79,13 +88,18 @@ public:
     // For the writer of the store.
 
     bool isFollowed() const;
-    /// A position that is to be stored and stands behind events up to `event` only.
-    std::optional<LogPosition> unsaved(std::uint64_t event) const;
-    void saved(const LogPosition& position);
+    /// A position without events that is to be stored and stands behind events up to `event` only.
+    /// `event` never decreases.
+    std::optional<PositionValue> unsavedReached(std::uint64_t event);
+    /// The same, or the one stored last if the store has lost it.
+    std::optional<PositionValue> unsaved(std::uint64_t event);
+    void saved(const PositionValue& value);
     /// The store has no longer what it had.
     void forgetSaved();
 
 private:
+    PositionValue reachedValue() const;
+
     const std::string m_name;
     mutable std::mutex m_mutex; ///< guards what follows
     Follower m_follower = 0;    ///< 0: nobody
@@ -96,9 +110,18 @@ private:
     bool m_hasRefused = false;  ///< the queue did not take its events: later positions are void
     std::optional<LogPosition> m_newest;
     std::optional<LogPosition> m_reached; ///< without events, behind those up to m_lastEvent
-    std::uint64_t m_lastEvent = 0;        ///< the log's last event in the queue
-    std::optional<LogPosition> m_kept;    ///< stored last
-    bool m_isSaved = true;                ///< the store still has m_kept
+    std::map<const EpisodeId*, EpisodeShare> m_shares; ///< up to m_reached, still to be stored
+    /// A position without events that was not stored before the log's next event came.
+    struct Passed {
+        std::uint64_t from; ///< the event before it
+        std::uint64_t to;   ///< the event after it
+        PositionValue value;
+    };
+    std::vector<Passed> m_passed; ///< oldest first
+    std::int64_t m_caughtUp = 0;
+    std::uint64_t m_lastEvent = 0;     ///< the log's last event in the queue
+    std::optional<LogPosition> m_kept; ///< stored last
+    bool m_isSaved = true;             ///< the store still has m_kept
 };
 
 /// The positions of all followed logs, between the logs' threads and the writer of the store.
@@ -136,6 +159,21 @@ public:
     /// FollowedLog::takenOver of the log. Any thread.
     std::optional<LogPosition> takenOver(std::string_view log) const;
 
+    /// Until when every log that is followed has been judged, or this one: milliseconds since 1970,
+    /// UTC. The largest number if none is. Any thread.
+    std::int64_t judgedUntil(const std::optional<std::string>& log) const;
+    /// Whether somebody follows the log now. Any thread.
+    bool isFollowed(std::string_view log) const;
+
+    /// What logs without positions have added to episodes: stored within about a second. Any
+    /// thread.
+    void note(std::vector<EpisodeShare> shares);
+
+    /// The episodes that an earlier run has left open, of one situation or all. Once for each. Any
+    /// thread.
+    std::vector<StoredEpisode> takeEpisodes(const std::optional<std::string>& situation);
+    void setEpisodes(std::vector<StoredEpisode> episodes);
+
     WatchedPaths& paths() noexcept { return m_paths; }
     const WatchedPaths& paths() const noexcept { return m_paths; }
 
@@ -152,7 +190,11 @@ public:
 
     /// Positions that are to be stored once the events up to this one are.
     std::vector<PositionValue> unsaved(std::uint64_t event) const;
+    /// Those of them that were reached without events.
+    std::vector<PositionValue> unsavedReached(std::uint64_t event) const;
     void saved(const std::vector<PositionValue>& values);
+    /// What was noted since the last call.
+    std::vector<EpisodeShare> takeShares();
     /// The store has lost what it had: all of it is to be stored again.
     void forgetSaved();
     /// The positions of logs that are followed now are to be stored again, so that they stay new.
@@ -168,6 +210,8 @@ private:
     mutable std::mutex m_mutex; ///< guards the maps
     std::map<std::string, std::shared_ptr<FollowedLog>, std::less<>> m_logs;
     std::map<File, std::string> m_renamed;
+    std::vector<StoredEpisode> m_episodes;
+    std::vector<EpisodeShare> m_shares; ///< of logs without positions
 };
 
 } // namespace zrm::host

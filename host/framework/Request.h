@@ -76,6 +76,10 @@ public:
     /// Takes `count` contiguous rows of request.rowSize bytes each; copies what it keeps. Returns 0
     /// or a status.
     virtual unsigned receive(const ctreq& request, const char* rows, unsigned count) = 0;
+    /// For how many seconds before a log's stored position it counts entries; 0: it counts none.
+    virtual std::int64_t earlierPeriod() const { return 0; }
+    /// Counts a row that meets the conditions and that an earlier run has judged.
+    virtual void receiveEarlier(const ctreq& /*request*/, const char* /*row*/) {}
     /// The agent has marked the request as stopped (reason of ctreq::Stopped).
     virtual void stopped(const ctreq& request, unsigned reason) = 0;
 };

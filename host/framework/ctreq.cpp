@@ -95,6 +95,14 @@ bool ctreq::MeetsConditions(char* row) {
            m_framework->conditionsOf(*this).holds(row);
 }
 
+std::int64_t ctreq::EarlierPeriod() const {
+    return m_framework->receiver.earlierPeriod();
+}
+
+void ctreq::CountEarlier(char* row) {
+    m_framework->receiver.receiveEarlier(*this, row);
+}
+
 unsigned ctreq::ColumnIsException(char* /*row*/, char* /*column*/, _IntfOper /*op*/,
                                   char* /*value*/) {
     return 0;

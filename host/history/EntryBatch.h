@@ -2,6 +2,7 @@
 #define ZRM_HOST_ENTRY_BATCH_H
 
 #include "host/events/PositionBook.h"
+#include "host/history/EpisodeTable.h"
 #include "host/history/EventBatch.h"
 
 #include <cstddef>
@@ -32,10 +33,17 @@ public:
     void seal() { m_events->seal(); }
     std::shared_ptr<const EventBatch> events() const noexcept { return m_events; }
     std::vector<PositionValue> positions() const;
+    /// What the events say of episodes, in their order.
+    const std::vector<EpisodeChange>& episodes() const noexcept { return m_episodes; }
+    /// Whether an event ends an episode without an entry behind which that is stored.
+    bool endsEpisodes() const noexcept { return m_endsEpisodes; }
 
 private:
     std::shared_ptr<EventBatch> m_events = std::make_shared<EventBatch>();
-    std::map<std::string, LogPosition> m_positions; ///< by log
+    std::map<std::string, LogPosition> m_positions;            ///< by log
+    std::map<std::string, std::vector<EpisodeShare>> m_shares; ///< by log, oldest first
+    std::vector<EpisodeChange> m_episodes;
+    bool m_endsEpisodes = false;
     bool m_isWhole = false;
 };
 

@@ -125,6 +125,7 @@ History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> 
       m_writer(config, *m_directory, std::move(file), m_recent, m_readers, m_cursors, *m_positions,
                m_silences) {
     m_silences.storeWith([this](const Silence& silence) { return keep(silence); });
+    m_positions->setEpisodes(m_file.openEpisodes());
 }
 
 History::~History() {
@@ -233,6 +234,10 @@ Result<std::optional<StoredEvent>> History::event(std::uint64_t id) {
 std::uint64_t History::waitBeyond(std::uint64_t id, Clock::time_point limit,
                                   const std::stop_token& stop) {
     return m_recent.waitBeyond(id, limit, stop);
+}
+
+Result<std::vector<EpisodeRecord>> History::episodes(const EpisodeFilter& filter) {
+    return reading([&](Database& database) { return EpisodeReader::read(database, filter); });
 }
 
 HistoryState History::state() {

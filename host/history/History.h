@@ -67,6 +67,7 @@ public:
     std::uint64_t newest() const override { return m_recent.newest(); }
     std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
                              const std::stop_token& stop) override;
+    Result<std::vector<EpisodeRecord>> episodes(const EpisodeFilter& filter) override;
     HistoryState state() override;
     Result<Rates> rates(std::int64_t from, std::int64_t to, std::int64_t step) override;
 

@@ -51,7 +51,7 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
-      m_cursors(m_database), m_positions(m_database), m_rates(m_database), m_silences(m_database),
+      m_cursors(m_database), m_positions(m_database), m_episodes(m_database), m_rates(m_database), m_silences(m_database),
       m_files(path), m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
@@ -96,9 +96,13 @@ void HistoryFile::putEvents(const EventBatch& batch) {
 }
 
 void HistoryFile::store(const EventBatch& batch, const std::vector<CursorValue>& cursors,
-                        const std::vector<PositionValue>& positions) {
+                        const std::vector<PositionValue>& positions,
+                        const std::vector<EpisodeChange>& episodes) {
     inTransaction([&] {
         putEvents(batch);
+        for (const EpisodeChange& change : episodes) {
+            m_episodes.keep(change);
+        }
         putCursors(cursors);
         putPositions(positions);
     });
@@ -125,6 +129,9 @@ void HistoryFile::removeOldCursors(int days) {
 void HistoryFile::putPositions(const std::vector<PositionValue>& positions) {
     for (const PositionValue& position : positions) {
         m_positions.keep(position, WallClock::now());
+        for (const EpisodeShare& share : position.shares) {
+            m_episodes.keep(share);
+        }
     }
 }
 
@@ -133,6 +140,9 @@ void HistoryFile::keepPositions(const PositionValues& positions) {
         putPositions(positions.logs);
         for (const WatchedPath& path : positions.paths) {
             m_positions.keep(path);
+        }
+        for (const EpisodeShare& share : positions.shares) {
+            m_episodes.keep(share);
         }
     });
 }
@@ -195,7 +205,10 @@ bool HistoryFile::expire(const Limits& limits) {
     if (last == 0) {
         return false;
     }
-    inTransaction([&] { m_events.removeUntil(last); });
+    inTransaction([&] {
+        m_events.removeUntil(last);
+        m_episodes.removeUntil(last);
+    });
     m_oldest = last + 1;
     return true;
 }

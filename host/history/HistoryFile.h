@@ -3,6 +3,7 @@
 
 #include "host/history/Cursors.h"
 #include "host/history/Database.h"
+#include "host/history/EpisodeTable.h"
 #include "host/history/EventBatch.h"
 #include "host/history/EventTable.h"
 #include "host/history/LabelTable.h"
@@ -43,7 +44,8 @@ public:
     /// Stores events, whose ids follow the newest, their part of the rates and of the silences'
     /// counts, cursors, and the positions behind the events' entries.
     void store(const EventBatch& batch, const std::vector<CursorValue>& cursors,
-               const std::vector<PositionValue>& positions = {});
+               const std::vector<PositionValue>& positions = {},
+               const std::vector<EpisodeChange>& episodes = {});
 
     void keepCursors(const std::vector<CursorValue>& cursors);
     std::optional<std::uint64_t> cursor(const std::string& sink) { return m_cursors.find(sink); }
@@ -52,6 +54,9 @@ public:
 
     void keepPositions(const PositionValues& positions);
     PositionValues positions() { return PositionTable::read(m_database); }
+
+    /// The episodes that last, as they were stored.
+    std::vector<StoredEpisode> openEpisodes() { return EpisodeTable::open(m_database); }
     /// Removes the positions of logs last followed before this time (milliseconds since 1970), and
     /// returns their names. Also removes the paths last watched before it.
     std::vector<std::string> removeOldPositions(std::int64_t time);
@@ -98,6 +103,7 @@ private:
     EventTable m_events;
     CursorTable m_cursors;
     PositionTable m_positions;
+    EpisodeTable m_episodes;
     RateTable m_rates;
     SilenceTable m_silences;
     const OpenFiles m_files;

@@ -76,6 +76,7 @@ void HistoryWriter::storePositions(bool isLast) {
     moved.logs = m_positions.unsaved(m_recent.newest());
     const bool isNow = isLast || !moved.logs.empty();
     moved.paths = m_positions.paths().unsaved(isNow ? 0 : WatchedPaths::storedEvery);
+    moved.shares = m_positions.takeShares();
     if (moved != PositionValues{}) {
         m_file->keepPositions(moved);
         m_positions.saved(moved.logs);

@@ -2,6 +2,7 @@
 #define ZRM_HOST_HISTORY_READER_H
 
 #include "host/base/Result.h"
+#include "host/history/EpisodeReader.h"
 
 #include <chrono>
 #include <cstddef>
@@ -99,6 +100,9 @@ public:
     /// `id` when there is nothing new.
     virtual std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
                                      const std::stop_token& stop) = 0;
+
+    /// The episodes that pass the filter, the newest first.
+    virtual Result<std::vector<EpisodeRecord>> episodes(const EpisodeFilter& filter) = 0;
 
     virtual HistoryState state() = 0;
 

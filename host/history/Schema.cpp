@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 9> steps = {
+constexpr std::array<const char*, 10> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -65,6 +65,18 @@ constexpr std::array<const char*, 9> steps = {
     "INSERT INTO labels_with_silence SELECT id, situation, severity, log, text, 0 FROM labels;"
     "DROP TABLE labels;"
     "ALTER TABLE labels_with_silence RENAME TO labels;",
+    // 10: episodes, whose id is that of the event that raised them, and what each log has added to
+    // one, in seconds since 1970. The state is open, resolved, or pause: no episode, but a group
+    // that cools down. An open one is counted in episode_logs.
+    "CREATE TABLE episodes (id INTEGER PRIMARY KEY, state TEXT NOT NULL, situation TEXT NOT NULL,"
+    " severity TEXT NOT NULL, definition INTEGER NOT NULL, log TEXT NOT NULL, node TEXT NOT NULL,"
+    " groups TEXT NOT NULL, raised INTEGER NOT NULL, count INTEGER NOT NULL,"
+    " first INTEGER NOT NULL, last INTEGER NOT NULL, resolved INTEGER, resolved_by INTEGER,"
+    " reason TEXT NOT NULL DEFAULT '');"
+    "CREATE INDEX episodes_that_last ON episodes (situation, groups) WHERE state <> 'resolved';"
+    "CREATE TABLE episode_logs (episode INTEGER NOT NULL, log TEXT NOT NULL,"
+    " count INTEGER NOT NULL, first INTEGER NOT NULL, last INTEGER NOT NULL,"
+    " PRIMARY KEY (episode, log)) WITHOUT ROWID;",
 };
 
 } // namespace

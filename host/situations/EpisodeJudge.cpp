@@ -8,12 +8,12 @@ namespace zrm::host {
 namespace {
 
 /// Adds an entry to the share of its log, which is made if there is none.
-std::shared_ptr<EpisodeShare> addTo(Episode& episode, const EpisodeJudge::Entry& entry,
+std::shared_ptr<GrowingShare> addTo(Episode& episode, const EpisodeJudge::Entry& entry,
                                     std::uint64_t entries, std::int64_t first) {
     auto found = std::find_if(episode.shares.begin(), episode.shares.end(),
                               [&](const auto& share) { return share->log == entry.log; });
     if (found == episode.shares.end()) {
-        episode.shares.push_back(std::make_shared<EpisodeShare>(
+        episode.shares.push_back(std::make_shared<GrowingShare>(
             EpisodeShare{episode.id, std::string(entry.log), 0, first, entry.time}));
         found = std::prev(episode.shares.end());
     }
@@ -49,7 +49,7 @@ Group& EpisodeJudge::groupOf(const Entry& entry, std::vector<EndedEpisode>& ende
         Group& oldest = m_groups.oldest();
         m_dropped += isIdle(oldest, entry.time) ? 0 : 1;
         for (Episode& episode : oldest.episodes) {
-            const bool isOver = episode.last + m_rules.resolveAfter < entry.time;
+            const bool isOver = episode.last + m_rules.resolveAfter <= entry.time;
             ended.push_back({std::move(episode), oldest.key, !isOver});
             --m_episodes;
         }
@@ -104,8 +104,8 @@ void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Ve
                                 std::vector<EndedEpisode>& ended) {
     const auto lasting =
         std::find_if(group.episodes.begin(), group.episodes.end(), [&](const Episode& episode) {
-            return entry.time <= episode.last + m_rules.resolveAfter &&
-                   entry.time >= episode.first - m_rules.resolveAfter;
+            return entry.time < episode.last + m_rules.resolveAfter &&
+                   entry.time > episode.first - m_rules.resolveAfter;
         });
     if (lasting != group.episodes.end()) {
         lasting->used = group.entries;
@@ -137,7 +137,7 @@ void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Ve
 /// Ends what has had nothing for long enough, as far as this entry's log can say so.
 void EpisodeJudge::endEarlier(Group& group, const Entry& entry, std::vector<EndedEpisode>& ended) {
     std::erase_if(group.episodes, [&](Episode& episode) {
-        const bool isOver = entry.time > episode.last + m_rules.resolveAfter &&
+        const bool isOver = entry.time >= episode.last + m_rules.resolveAfter &&
                             std::all_of(episode.shares.begin(), episode.shares.end(),
                                         [&](const auto& share) { return share->log == entry.log; });
         if (isOver) {

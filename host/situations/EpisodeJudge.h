@@ -21,10 +21,10 @@ namespace zrm::host {
 /// live monitoring, explanations and backtests find the same. One thread at a time.
 ///
 /// Entries may come in any order. Within a group, thresholds count as EntryWindows does. An entry
-/// belongs to an episode if it is at most `resolveAfter` later than its last entry, or earlier than
-/// its first one; otherwise it may begin another, so that a group has several episodes where logs
-/// are read at different times. An entry of a log ends the earlier episodes of its group that have
-/// entries of this log only; the others end when their caller says so (takeOver).
+/// belongs to an episode if it is less than `resolveAfter` later than its last entry and earlier
+/// than its first one; otherwise it may begin another, so that a group has several episodes where
+/// logs are read at different times. An entry of a log ends the earlier episodes of its group that
+/// have entries of this log only; the others end when their caller says so (takeOver).
 class EpisodeJudge {
 public:
     /// Of one group at a time: what lasts longest without an entry goes first.
@@ -50,7 +50,7 @@ public:
         std::int64_t first = 0;     ///< time of the first of them
         Episode* episode = nullptr; ///< begun or continued; valid until the judge is used again
         /// What the entry has added to; null if nothing.
-        std::shared_ptr<EpisodeShare> share = nullptr;
+        std::shared_ptr<GrowingShare> share = nullptr;
     };
 
     explicit EpisodeJudge(JudgementConfig rules);

@@ -22,14 +22,13 @@ struct Episode {
     std::int64_t first = 0;
     std::int64_t last = 0;
     std::uint64_t count = 0;                                ///< entries
-    std::vector<std::shared_ptr<EpisodeShare>> shares = {}; ///< one per log
+    std::vector<std::shared_ptr<GrowingShare>> shares = {}; ///< one per log
     std::uint64_t used = 0;                                 ///< number of its last entry
 
     // For the caller, who knows the clock and the event; the judge does not look at them.
-    std::int64_t raised = 0; ///< milliseconds since 1970, UTC
-    std::string log = {};    ///< full path of the log that raised it
-    std::string node = {};   ///< as the rows have it in ORIGINNODE
-    std::int64_t cap = 0;    ///< no later time counts as its last entry's; 0: none
+    std::string log = {};  ///< full path of the log that raised it
+    std::string node = {}; ///< as the rows have it in ORIGINNODE
+    std::int64_t cap = 0;  ///< no later time counts as its last entry's; 0: none
 };
 
 /// An episode that has ended.

@@ -57,6 +57,7 @@ std::shared_ptr<const SituationLabel> labelOf(const SituationConfig& config) {
     label.context = config.context;
     label.runbook = config.runbook;
     label.labels = labelsText(config.labels);
+    label.definition = LiveJudge::definitionOf(config);
     return std::make_shared<const SituationLabel>(std::move(label));
 }
 
@@ -66,7 +67,10 @@ Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& 
                      std::shared_ptr<SituationCounts> counts)
     : m_config(std::move(config)), m_label(labelOf(m_config)), m_queue(queue),
       m_counts(std::move(counts)), m_context(m_config.log, m_config.context), m_texts(m_config),
-      m_request(entries, detailOf(m_config), *this, &m_counts->requests) {
+      m_judge(m_config.judgement.isUsed() ? std::make_unique<LiveJudge>(m_config, m_label, queue)
+                                          : nullptr),
+      m_request(std::in_place, entries, detailOf(m_config), static_cast<RowReceiver&>(*this),
+                &m_counts->requests) {
     TraceScope trace(anchor);
     if (!isOpen()) {
         trace.error()("Situation %s could not be opened.", m_config.name.c_str());
@@ -76,12 +80,27 @@ Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& 
 void Situation::silence() {
     TraceScope trace(anchor);
     if (isOpen()) {
-        m_request.get()->Stop();
+        m_request->get()->Stop();
     }
 }
 
 unsigned Situation::receive(const ctreq& request, const char* rows, unsigned count) {
     TraceScope trace(anchor);
+    if (m_judge != nullptr) {
+        unsigned raised = 0;
+        for (unsigned index = 0; index < count; ++index) {
+            const auto events =
+                m_judge->judge(layoutOf(request), rows + std::size_t{index} * request.rowSize);
+            if (!events) {
+                return trace.result(static_cast<unsigned>(Status::end));
+            }
+            raised += *events;
+        }
+        if (raised > 0) {
+            m_counts->countRaised(raised, WallClock::now());
+        }
+        return trace.result(0u);
+    }
     // Before waiting for room: the events count as raised, whenever they are delivered.
     m_counts->countRaised(count, WallClock::now());
     for (unsigned index = 0; index < count; ++index) {
@@ -99,10 +118,7 @@ std::shared_ptr<const EventJudgement> Situation::judgementOf(const ctreq& reques
     if (!m_texts.isNeeded()) {
         return nullptr;
     }
-    if (!m_layout) {
-        m_layout.emplace(const_cast<ctreq&>(request)); // which only asks for its columns
-    }
-    m_reading.begin(*m_layout, row, LogEntry::ofThisThread);
+    m_reading.begin(layoutOf(request), row, LogEntry::ofThisThread);
     auto judgement = std::make_shared<EventJudgement>();
     std::string log;
     judgement->text = m_texts.text(m_reading, factsOf(row, log));
@@ -122,6 +138,34 @@ TextFacts Situation::factsOf(const char* row, std::string& log) const {
         facts.first = facts.last = TimeText::toMilliseconds(time->text(row)).value_or(0);
     }
     return facts;
+}
+
+/// What rows look like is known when the first one comes.
+const RowLayout& Situation::layoutOf(const ctreq& request) {
+    std::call_once(m_isLaidOut, [&] { m_layout.emplace(const_cast<ctreq&>(request)); });
+    return *m_layout;
+}
+
+std::int64_t Situation::earlierPeriod() const {
+    return m_judge == nullptr ? 0 : m_judge->earlierPeriod();
+}
+
+void Situation::receiveEarlier(const ctreq& request, const char* row) {
+    if (m_judge != nullptr) {
+        m_judge->recount(layoutOf(request), row);
+    }
+}
+
+void Situation::tick(std::int64_t now) {
+    if (m_judge != nullptr) {
+        m_judge->tick(now);
+    }
+}
+
+void Situation::resolveAll(const std::string& reason) {
+    if (m_judge != nullptr) {
+        m_judge->resolveAll(reason);
+    }
 }
 
 void Situation::stopped(const ctreq& /*request*/, unsigned reason) {

@@ -7,11 +7,13 @@
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "host/situations/EntryValue.h"
+#include "host/situations/LiveJudge.h"
 #include "host/situations/TextRenderer.h"
 
 #include <atomic>
 #include <cstdint>
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 
@@ -53,7 +55,7 @@ public:
     Situation(const Situation&) = delete;
     Situation& operator=(const Situation&) = delete;
 
-    bool isOpen() const noexcept { return m_request.isOpen(); }
+    bool isOpen() const noexcept { return m_request && m_request->isOpen(); }
     const std::string& name() const noexcept { return m_config.name; }
 
     /// Why the agent has stopped it (a reason of ctreq::Stopped); 0 if it has not. Any thread.
@@ -63,7 +65,21 @@ public:
     /// not wait. Any thread.
     void silence();
 
+    /// No more rows come. Waits until no other thread works on one. By the thread that opened it.
+    void close() { m_request.reset(); }
+
+    /// Resolves the episodes that are over at this time: milliseconds since 1970, UTC. Any thread.
+    void tick(std::int64_t now);
+    /// Resolves every episode. Any thread.
+    void resolveAll(const std::string& reason);
+    /// Whether the situation has groups, episodes or pauses.
+    bool isJudged() const noexcept { return m_judge != nullptr; }
+    JudgeCounts judgeCounts() const { return isJudged() ? m_judge->counts() : JudgeCounts(); }
+
 private:
+    std::int64_t earlierPeriod() const override;
+    void receiveEarlier(const ctreq& request, const char* row) override;
+    const RowLayout& layoutOf(const ctreq& request);
     unsigned receive(const ctreq& request, const char* rows, unsigned count) override;
     void stopped(const ctreq& request, unsigned reason) override;
     std::shared_ptr<const EventJudgement> judgementOf(const ctreq& request, const char* row);
@@ -78,8 +94,10 @@ private:
     const TextRenderer m_texts;
     // Used under the table manager's lock.
     EntryReading m_reading;
-    std::optional<RowLayout> m_layout; ///< known once there was a row to render a text for
-    Request m_request;                 ///< last member: rows may arrive during its construction
+    const std::unique_ptr<LiveJudge> m_judge; ///< null: the table's thresholds decide
+    std::once_flag m_isLaidOut;
+    std::optional<RowLayout> m_layout; ///< of the rows
+    std::optional<Request> m_request;  ///< last member: rows may arrive during its construction
 };
 
 } // namespace zrm::host

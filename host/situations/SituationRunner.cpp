@@ -1,6 +1,8 @@
 #include "host/situations/SituationRunner.h"
 
 #include "base/TraceScope.h"
+#include "host/base/TimeText.h"
+#include "host/events/PositionBook.h"
 
 #include <utility>
 
@@ -10,10 +12,21 @@ namespace {
 
 TRC1_Anchor anchor{"SituationRunner.cpp"};
 
+/// How often episodes are looked at.
+constexpr std::chrono::milliseconds tickInterval{200};
+
+/// After the start; until then situations that continue with their episodes may still be opened.
+constexpr std::int64_t timeUntilOpen = 10'000; // milliseconds
+
+constexpr const char* isStopped = "the situation was stopped or removed";
+constexpr const char* isChanged = "the situation was changed";
+constexpr const char* wasRemoved =
+    "the situation was stopped or removed while the agent was not running";
+
 } // namespace
 
 SituationRunner::SituationRunner(TableManager& entries, EventQueue& queue)
-    : m_entries(entries), m_queue(queue), m_thread([this] { work(); }) {}
+    : m_entries(entries), m_queue(queue), m_begin(WallClock::now()), m_thread([this] { work(); }) {}
 
 SituationRunner::~SituationRunner() {
     close();
@@ -91,9 +104,13 @@ void SituationRunner::work() {
     TraceScope trace(anchor);
     std::unique_lock lock(m_mutex);
     for (;;) {
-        m_changed.wait(lock, [&] { return !m_pending.empty() || m_ends; });
+        m_changed.wait_for(lock, tickInterval, [&] { return !m_pending.empty() || m_ends; });
         if (m_pending.empty()) {
-            return;
+            if (m_ends) {
+                return;
+            }
+            tick();
+            continue;
         }
         const std::string key = std::move(m_pending.front());
         m_pending.pop_front();
@@ -106,6 +123,37 @@ void SituationRunner::work() {
     }
 }
 
+/// Resolves what is over.
+void SituationRunner::tick() {
+    const std::int64_t now = WallClock::now();
+    for (const auto& [key, slot] : m_slots) {
+        if (slot.situation != nullptr) {
+            slot.situation->tick(now);
+        }
+    }
+    if (m_hasLeftEpisodes && now >= m_begin + timeUntilOpen) {
+        for (const StoredEpisode& episode : PositionBook::current()->takeEpisodes(std::nullopt)) {
+            LiveJudge::resolve(m_queue, episode, wasRemoved);
+        }
+        m_hasLeftEpisodes = false;
+    }
+}
+
+JudgeCounts SituationRunner::judgeCounts() const {
+    JudgeCounts all;
+    const std::lock_guard guard(m_mutex);
+    all.droppedGroups = m_droppedGroups;
+    for (const auto& [key, slot] : m_slots) {
+        if (slot.situation != nullptr) {
+            const JudgeCounts one = slot.situation->judgeCounts();
+            all.episodes += one.episodes;
+            all.groups += one.groups;
+            all.droppedGroups += one.droppedGroups;
+        }
+    }
+    return all;
+}
+
 /// Opens or closes with the lock released. Slots are removed only here, so the slot stays valid.
 void SituationRunner::bringToState(std::unique_lock<std::mutex>& lock, const std::string& key) {
     TraceScope trace(anchor);
@@ -116,8 +164,15 @@ void SituationRunner::bringToState(std::unique_lock<std::mutex>& lock, const std
     Slot& slot = found->second;
     if (slot.situation != nullptr && (slot.counts == nullptr || slot.running != slot.asked)) {
         std::unique_ptr<Situation> ending = std::move(slot.situation);
+        const char* const reason = slot.counts == nullptr ? isStopped : isChanged;
+        m_droppedGroups += ending->judgeCounts().droppedGroups;
+        const bool isEnd = m_ends; // the next run continues with the episodes
         lock.unlock();
         trace.detail()("Closing situation %s.", ending->name().c_str());
+        ending->close();
+        if (!isEnd) {
+            ending->resolveAll(reason);
+        }
         ending.reset();
         lock.lock();
     }

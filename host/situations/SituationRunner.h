@@ -52,6 +52,9 @@ public:
 
     State state(const std::string& key) const;
 
+    /// What the situations judge together now.
+    JudgeCounts judgeCounts() const;
+
     /// Stops and closes every situation; nothing can be started afterwards. Any number of times.
     void close();
 
@@ -65,6 +68,7 @@ private:
     };
 
     void work();
+    void tick();
     void bringToState(std::unique_lock<std::mutex>& lock, const std::string& key);
     void enqueue(const std::string& key, Slot& slot);
 
@@ -78,6 +82,9 @@ private:
     std::deque<std::string> m_pending; ///< keys with a pending change, in the order of the requests
     std::uint64_t m_starts = 0;
     bool m_isWorking = false;
+    std::uint64_t m_droppedGroups = 0; ///< of situations that were closed
+    const std::int64_t m_begin;        ///< milliseconds since 1970, UTC
+    bool m_hasLeftEpisodes = true; ///< of an earlier run, of situations that do not run any more
     bool m_ends = false;
 
     std::mutex m_closing; ///< one close at a time

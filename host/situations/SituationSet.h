@@ -112,6 +112,9 @@ public:
 
     std::size_t size() const;
 
+    /// How many groups and episodes all of them have now.
+    JudgeCounts judgeCounts() const { return m_runner.judgeCounts(); }
+
 private:
     using Key = std::pair<SituationStatus::Source, std::string>;
     static constexpr auto fileSource = SituationStatus::FILE;

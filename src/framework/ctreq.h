@@ -59,6 +59,11 @@ public:
     /// True if the row meets the request's conditions. Unlike CheckForException, leaves nothing
     /// behind: it was judged before.
     bool MeetsConditions(char* row);
+    /// For how many seconds before a log's stored position the situation's opener counts entries
+    /// itself, beside the thresholds. 0: it counts none.
+    std::int64_t EarlierPeriod() const;
+    /// Gives the opener a row that meets the conditions and that an earlier run has judged.
+    void CountEarlier(char* row);
     /// Dumps the conditions to the trace.
     void DumpThresholds();
     /// Sends the `count` rows collected so far.

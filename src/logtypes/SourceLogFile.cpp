@@ -59,6 +59,7 @@ void SourceLogFile::processLogData() {
         // What is there when the log is to end is still read.
         isLast = monitorStatus() != MONITOR_RUNNING;
         m_pulse.work("reads the log");
+        positions.beginLook();
         if (!readEntries(positions, current)) {
             // Who follows the log next judges this entry, and none of those before it again.
             reach(positions, reading->takeBack());
@@ -68,6 +69,7 @@ void SourceLogFile::processLogData() {
         noteState();
         m_pulse.rest();
         if (!isLast) {
+            positions.endLook();
             reading->wait(waitInterval);
         }
     }

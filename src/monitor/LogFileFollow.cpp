@@ -108,6 +108,7 @@ void LogFile::followLog(std::size_t recordLength) {
             follower.waitNoLonger(); // otherwise the next run reads what waits
         }
         m_pulse.work("looks at the log");
+        positions.beginLook();
         const bool isQuiet = !isLast && follower.isQuiet();
         if (!isQuiet && follower.look(FileFollower::Moment::now())) {
             noteFollowed(follower, positions); // where a log begins is known before it is read
@@ -129,6 +130,7 @@ void LogFile::followLog(std::size_t recordLength) {
         }
         m_pulse.rest();
         if (!isLast) {
+            positions.endLook();
             timeval interval = lookInterval;
             select(0, nullptr, nullptr, nullptr, &interval);
         }

@@ -172,8 +172,9 @@ long zrm_rmlogent_agent::countEvents(Timestamp& newest, long period) {
 
 std::int64_t zrm_rmlogent_agent::periodOn(zrm_rmlogent_data_t& row) {
     TraceScope trace(anchor);
-    if (!hasThresholds()) {
-        return trace.result(std::int64_t{0});
+    const std::int64_t period = hasThresholds() ? thresholds.periodThreshold : EarlierPeriod();
+    if (period == 0) {
+        return trace.result(period);
     }
     ResetFilterIndex();
     SEL1_FILTERINFO* filter = nullptr;
@@ -184,14 +185,20 @@ std::int64_t zrm_rmlogent_agent::periodOn(zrm_rmlogent_data_t& row) {
             return trace.result(std::int64_t{0});
         }
     }
-    return trace.result(thresholds.periodThreshold);
+    return trace.result(period);
 }
 
 void zrm_rmlogent_agent::countEarlier(zrm_rmlogent_data_t& row) {
     TraceScope trace(anchor);
-    if (hasThresholds() && EntryInstant::ofThisThread() &&
-        MeetsConditions(reinterpret_cast<char*>(&row))) {
+    const bool isCounted = hasThresholds() || EarlierPeriod() > 0;
+    if (!isCounted || !EntryInstant::ofThisThread() ||
+        !MeetsConditions(reinterpret_cast<char*>(&row))) {
+        return;
+    }
+    if (hasThresholds()) {
         countFollowed(*EntryInstant::ofThisThread());
+    } else {
+        CountEarlier(reinterpret_cast<char*>(&row));
     }
 }
 

@@ -69,6 +69,14 @@ public:
         }
         return std::nullopt;
     }
+    Result<std::vector<EpisodeRecord>> episodes(const EpisodeFilter& filter) override {
+        const std::lock_guard guard(m_mutex);
+        if (m_fails) {
+            return refused("disk I/O error");
+        }
+        episodeFilter = filter;
+        return storedEpisodes;
+    }
     std::uint64_t newest() const override {
         const std::lock_guard guard(m_mutex);
         return m_events.empty() ? 0 : m_events.back().id;
@@ -97,7 +105,9 @@ public:
         return Rates{from, step, {{"/a", {1, std::nullopt}, {0, std::nullopt}}, {"/b", {}, {}}}};
     }
 
-    std::vector<std::uint64_t> damaged;   ///< what queries report as damaged
+    std::vector<std::uint64_t> damaged; ///< what queries report as damaged
+    std::vector<EpisodeRecord> storedEpisodes;
+    EpisodeFilter episodeFilter;          ///< of the last query for episodes
     std::optional<std::uint64_t> reached; ///< where queries report that they stopped
     std::int64_t ratesFrom = 0;
     std::int64_t ratesTo = 0;

@@ -64,7 +64,7 @@ TEST(JudgedEvent, OneWithoutARowHasTheLogAndTheNode) {
     judgement.reason = "the situation was removed";
     judgement.log = "/var/log/app.log";
     judgement.node = "web1:ZRM";
-    judgement.raised = 1'795'158'000'000;
+    judgement.episode->set(17, 1'795'158'000'000);
     Event event;
     event.id = 18;
     event.raised = 1'795'158'189'412;

@@ -70,24 +70,24 @@ TEST_F(EpisodeJudgeTest, OneEpisodeForABurst) {
 
 TEST_F(EpisodeJudgeTest, AnyMatchingEntryKeepsItOpen) {
     EpisodeJudge judge(lasting(100, 2));
-    EXPECT_THAT(all(judge, {0, 1, 101, 201, 301}),
+    EXPECT_THAT(all(judge, {0, 1, 100, 199, 298}),
                 ElementsAre(Decision::NONE, Decision::RAISES, Decision::CONTINUES,
                             Decision::CONTINUES, Decision::CONTINUES));
-    EXPECT_EQ(at(judge, 402), Decision::NONE) << "one second too late, and alone";
+    EXPECT_EQ(at(judge, 398), Decision::NONE) << "too late, and alone";
     ASSERT_EQ(ended.size(), 1u);
     EXPECT_EQ(ended[0].episode.count, 5u);
-    EXPECT_EQ(ended[0].episode.last, noon + 301);
+    EXPECT_EQ(ended[0].episode.last, noon + 298);
     EXPECT_FALSE(ended[0].isDropped);
     EXPECT_EQ(judge.episodes(), 0u);
 }
 
 TEST_F(EpisodeJudgeTest, ALateEntryBelongsToTheEpisodeAndMovesItsFirst) {
     EpisodeJudge judge(lasting(100));
-    EXPECT_THAT(all(judge, {0, -100, 50}),
+    EXPECT_THAT(all(judge, {0, -99, 50}),
                 ElementsAre(Decision::RAISES, Decision::CONTINUES, Decision::CONTINUES));
-    EXPECT_EQ(verdict.episode->first, noon - 100);
+    EXPECT_EQ(verdict.episode->first, noon - 99);
     EXPECT_EQ(verdict.episode->last, noon + 50);
-    EXPECT_EQ(at(judge, -201), Decision::RAISES) << "an episode of its own";
+    EXPECT_EQ(at(judge, -199), Decision::RAISES) << "an episode of its own";
     EXPECT_EQ(judge.episodes(), 2u);
     EXPECT_TRUE(ended.empty()) << "earlier entries end nothing";
 }
@@ -242,7 +242,7 @@ TEST_F(EpisodeJudgeTest, EarlierEntriesAddNothingToAnEpisodeOfAnEarlierRun) {
     episode.last = noon + 3;
     episode.count = 4;
     episode.shares.push_back(
-        std::make_shared<EpisodeShare>(EpisodeShare{episode.id, "/log", 4, noon, noon + 3}));
+        std::make_shared<GrowingShare>(EpisodeShare{episode.id, "/log", 4, noon, noon + 3}));
     judge.restore("", std::move(episode), ended);
     judge.recount({noon + 3, "", "", "/log"});
     EXPECT_EQ(at(judge, 5), Decision::CONTINUES);

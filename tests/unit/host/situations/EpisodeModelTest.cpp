@@ -54,8 +54,8 @@ public:
             return isMet && !cools(group, entry.time) ? Decision::RAISES : Decision::NONE;
         }
         for (PlainEpisode& episode : m_open[group]) {
-            if (entry.time <= episode.last + m_rules.resolveAfter &&
-                entry.time >= episode.first - m_rules.resolveAfter) {
+            if (entry.time < episode.last + m_rules.resolveAfter &&
+                entry.time > episode.first - m_rules.resolveAfter) {
                 episode.entries.emplace_back(entry.log, entry.time);
                 episode.first = std::min(episode.first, entry.time);
                 episode.last = std::max(episode.last, entry.time);
@@ -65,7 +65,7 @@ public:
         }
         std::erase_if(m_open[group], [&](const PlainEpisode& episode) {
             const bool isOver =
-                episode.last + m_rules.resolveAfter < entry.time &&
+                episode.last + m_rules.resolveAfter <= entry.time &&
                 std::all_of(episode.entries.begin(), episode.entries.end(),
                             [&](const auto& one) { return one.first == entry.log; });
             if (isOver) {

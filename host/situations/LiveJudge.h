@@ -1,0 +1,96 @@
+#ifndef ZRM_HOST_LIVE_JUDGE_H
+#define ZRM_HOST_LIVE_JUDGE_H
+
+#include "host/config/HostConfig.h"
+#include "host/events/EventQueue.h"
+#include "host/framework/RowLayout.h"
+#include "host/situations/EntryValue.h"
+#include "host/situations/EpisodeJudge.h"
+#include "host/situations/TextRenderer.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace zrm::host {
+
+/// How many groups and episodes a situation has now.
+struct JudgeCounts {
+    std::size_t episodes = 0; ///< that last
+    std::size_t groups = 0;
+    std::uint64_t droppedGroups = 0; ///< that made room for others since the situation was opened
+};
+
+/// Judges the rows of one situation while the agent runs, and raises and resolves its events. Any
+/// thread; rows come on the threads of the logs.
+class LiveJudge {
+public:
+    /// Continues with the episodes that an earlier run has left. The queue outlives the object.
+    LiveJudge(const SituationConfig& config, std::shared_ptr<const SituationLabel> label,
+              EventQueue& queue);
+    LiveJudge(const LiveJudge&) = delete;
+    LiveJudge& operator=(const LiveJudge&) = delete;
+
+    /// Judges a row that meets the conditions. Returns the number of events that it has raised;
+    /// none when the queue is closed.
+    std::optional<unsigned> judge(const RowLayout& layout, const char* row);
+
+    /// Counts a row that an earlier run has judged.
+    void recount(const RowLayout& layout, const char* row);
+    /// For how long before a log's position entries are counted again, in seconds.
+    std::int64_t earlierPeriod() const noexcept { return m_config.judgement.period; }
+
+    /// Resolves the episodes that are over at this time: milliseconds since 1970, UTC.
+    void tick(std::int64_t now);
+
+    /// Resolves every episode, since the situation ends.
+    void resolveAll(const std::string& reason);
+
+    JudgeCounts counts() const;
+
+    /// A hash of what decides when episodes begin and end.
+    static std::int64_t definitionOf(const SituationConfig& config);
+
+    /// Resolves an episode of a situation that does not run any more.
+    static void resolve(EventQueue& queue, const StoredEpisode& episode, const std::string& reason);
+
+private:
+    EpisodeJudge::Entry entryOf(const RowLayout& layout, const char* row);
+    std::string_view valueOf(const EntryValue& value);
+    void continueWith(const StoredEpisode& stored);
+    bool push(const char* row, const EpisodeJudge::Entry& entry,
+              const EpisodeJudge::Verdict& verdict);
+    bool pushResolved(const std::string& reason = "");
+    bool isOver(Episode& episode, std::int64_t now, std::int64_t judgedUntil) const;
+    bool mayBeFollowed(const Episode& episode, std::int64_t now) const;
+    void noteShares();
+
+    const SituationConfig m_config;
+    const std::shared_ptr<const SituationLabel> m_label;
+    EventQueue& m_queue;
+    const TextRenderer m_texts;
+    const std::int64_t m_opened; ///< milliseconds since 1970, UTC
+    std::vector<EntryValue> m_groupValues;
+    std::optional<EntryValue> m_distinctValue;
+
+    mutable std::mutex m_mutex; ///< guards what follows
+    EpisodeJudge m_judge;
+    EntryReading m_reading;
+    std::string m_group; ///< key of the current entry
+    std::string m_distinct;
+    std::string m_log;
+    std::string m_room; ///< of m_distinct and m_group
+    std::string m_utf8;
+    std::vector<EndedEpisode> m_ended;
+    std::vector<std::shared_ptr<GrowingShare>> m_shares; ///< of logs without positions
+    std::int64_t m_nextLook = 0; ///< at every episode, whatever their times say
+};
+
+} // namespace zrm::host
+
+#endif
