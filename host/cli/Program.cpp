@@ -2,6 +2,7 @@
 
 #include "host/cli/CliError.h"
 #include "host/cli/Commands.h"
+#include "host/cli/EpisodesCommand.h"
 #include "host/cli/Context.h"
 #include "host/cli/FormatCommands.h"
 #include "host/cli/SilenceCommands.h"
@@ -64,6 +65,7 @@ Program::Program()
     m_commands.push_back(std::make_unique<StatusCommand>(*m_app));
     m_commands.push_back(std::make_unique<LogsCommand>(*m_app));
     m_commands.push_back(std::make_unique<EventsCommand>(*m_app));
+    m_commands.push_back(std::make_unique<EpisodesCommand>(*m_app));
     m_commands.push_back(std::make_unique<ReportCommand>(*m_app));
     m_commands.push_back(std::make_unique<SituationsCommand>(*m_app));
     m_commands.push_back(std::make_unique<SilenceCommand>(*m_app));

@@ -129,6 +129,14 @@ void SituationMetrics::collect(MetricText& text) {
             text.add(situation.*count.value, labelsOf(situation));
         }
     }
+    const JudgeCounts judged = m_situations.judgeCounts();
+    text.gauge("zrm_episodes_open", "Episodes that last.");
+    text.add(static_cast<double>(judged.episodes));
+    text.gauge("zrm_groups", "Groups of entries that situations judge apart.");
+    text.add(static_cast<double>(judged.groups));
+    text.counter("zrm_groups_dropped_total",
+                 "Groups that made room for others, since their situations were opened.");
+    text.add(judged.droppedGroups);
     constexpr double milliseconds = 1000.0;
     text.gauge("zrm_situation_last_raised_timestamp_seconds",
                "When the situation was last raised, in seconds since 1970.");

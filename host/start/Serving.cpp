@@ -6,6 +6,7 @@
 #include "host/api/AnalysisResource.h"
 #include "host/api/DiagnoseResource.h"
 #include "host/api/EventStream.h"
+#include "host/api/EpisodesResource.h"
 #include "host/api/EventsResource.h"
 #include "host/api/LogsResource.h"
 #include "host/api/ReportResource.h"
@@ -143,6 +144,7 @@ void Serving::addResources(const HostConfig& config, TableManager& entries) {
     m_reports = reports.get();
     addResource(std::move(reports));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
+    addResource(std::make_unique<EpisodesResource>(m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
     addResource(std::make_unique<SilencesResource>(m_delivery.silences()));
     addResource(std::make_unique<RulesResource>(config.ruleDirectories, m_situations));
