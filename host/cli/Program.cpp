@@ -2,8 +2,8 @@
 
 #include "host/cli/CliError.h"
 #include "host/cli/Commands.h"
-#include "host/cli/EpisodesCommand.h"
 #include "host/cli/Context.h"
+#include "host/cli/EpisodesCommand.h"
 #include "host/cli/FormatCommands.h"
 #include "host/cli/SilenceCommands.h"
 #include "host/cli/Terminal.h"

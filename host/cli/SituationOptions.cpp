@@ -84,8 +84,9 @@ void SituationOptions::addTo(CLI::App& command) {
     };
     const auto addMember = [&](const char* key, std::string& value, const char* type,
                                const char* help) {
-        m_members.push_back(
-            {key, add((std::string("--") + key).c_str(), value, type, help), &value});
+        std::string option = std::string("--") + key;
+        std::replace(option.begin(), option.end(), '_', '-');
+        m_members.push_back({key, add(option.c_str(), value, type, help), &value});
     };
     add("--file", m_file, "FILE", "The definition as JSON; - is standard input");
     addMember("text", m_text, "TEXT", "What people read, for example \"login from {ENTRYSYS}\"");
@@ -105,7 +106,7 @@ void SituationOptions::addTo(CLI::App& command) {
         ->type_name("NAME=VALUE")
         ->allow_extra_args(false);
     command
-        .add_option("--group_by", m_groupBy,
+        .add_option("--group-by", m_groupBy,
                     "Judge the entries of each value apart: a column, a field or a capture; may be "
                     "repeated")
         ->type_name("NAME")
@@ -133,7 +134,7 @@ Json SituationOptions::definition(const Json& base) const {
         }
     }
     for (const auto& [key, option] :
-         {std::pair("context", "--context"), std::pair("max_groups", "--max_groups")}) {
+         {std::pair("context", "--context"), std::pair("max_groups", "--max-groups")}) {
         if (const auto number = definition.find(key);
             number != definition.end() && number->is_string()) {
             definition[key] = numberOf(option, number->get<std::string>());

@@ -35,6 +35,14 @@ std::size_t EntryBatch::add(std::span<const Event> events, const EventJson& form
     return count;
 }
 
+void EntryBatch::addReached(const std::vector<PositionValue>& reached) {
+    for (const PositionValue& value : reached) {
+        m_positions.insert_or_assign(value.log, value.position);
+        auto& shares = m_shares[value.log];
+        shares.insert(shares.end(), value.shares.begin(), value.shares.end());
+    }
+}
+
 std::vector<PositionValue> EntryBatch::positions() const {
     std::vector<PositionValue> values;
     for (const auto& [log, position] : m_positions) {

@@ -37,6 +37,10 @@ public:
     const std::vector<EpisodeChange>& episodes() const noexcept { return m_episodes; }
     /// Whether an event ends an episode without an entry behind which that is stored.
     bool endsEpisodes() const noexcept { return m_endsEpisodes; }
+    /// Adds what logs have judged behind their events. The end of an episode is stored with it:
+    /// otherwise entries of the episode would be judged again, and begin another, if the agent was
+    /// killed.
+    void addReached(const std::vector<PositionValue>& reached);
 
 private:
     std::shared_ptr<EventBatch> m_events = std::make_shared<EventBatch>();

@@ -110,10 +110,10 @@ std::uint64_t HistoryWriter::silenceOf(std::uint64_t event) {
 bool HistoryWriter::store(EntryBatch& batch) {
     batch.seal();
     const std::shared_ptr<const EventBatch> events = batch.events();
-    std::vector<PositionValue> positions = batch.positions();
     if (batch.endsEpisodes()) {
-        addReached(positions, events->last());
+        batch.addReached(m_positions.unsavedReached(events->last()));
     }
+    const std::vector<PositionValue> positions = batch.positions();
     const auto work = [&] {
         if (events->last() > m_reserved) {
             // Counted from what is stored: a crash before this batch is stored is then not taken
@@ -136,22 +136,6 @@ bool HistoryWriter::store(EntryBatch& batch) {
     batch = EntryBatch();
     batch.reserve(events->textBytes() + events->textBytes() / 8);
     return true;
-}
-
-/// Adds what logs have judged without an event. The end of an episode is stored with it: otherwise
-/// entries of the episode would be judged again, and begin another, if the agent was killed.
-void HistoryWriter::addReached(std::vector<PositionValue>& positions, std::uint64_t last) {
-    for (PositionValue& reached : m_positions.unsavedReached(last)) {
-        const auto same =
-            std::find_if(positions.begin(), positions.end(),
-                         [&](const PositionValue& value) { return value.log == reached.log; });
-        if (same == positions.end()) {
-            positions.push_back(std::move(reached));
-        } else {
-            same->position = std::move(reached.position); // it stands behind the log's events
-            same->shares.insert(same->shares.end(), reached.shares.begin(), reached.shares.end());
-        }
-    }
 }
 
 /// Does work on the file, which is opened or exchanged first where it must be. False when that

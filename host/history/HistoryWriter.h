@@ -80,7 +80,6 @@ private:
     bool attempt(const std::function<void()>& work);
     void makeRequestedChanges();
     std::uint64_t silenceOf(std::uint64_t event);
-    void addReached(std::vector<PositionValue>& positions, std::uint64_t last);
     void succeeded();
     void failed(const std::string& why);
     bool pause();

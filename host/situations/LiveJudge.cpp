@@ -45,6 +45,17 @@ std::shared_ptr<EventJudgement> resolvedJudgement(Episode episode, std::vector<G
     return judgement;
 }
 
+/// What the text of the event may say. Refers to the judgement.
+TextFacts factsOf(const EventJudgement& judgement) {
+    TextFacts facts;
+    facts.count = judgement.count;
+    facts.first = judgement.first * second;
+    facts.last = judgement.last * second;
+    facts.log = judgement.log;
+    facts.group = judgement.group;
+    return facts;
+}
+
 Episode episodeOf(const StoredEpisode& stored) {
     Episode episode;
     episode.id = std::make_shared<EpisodeId>(stored.id, stored.raised);
@@ -83,8 +94,8 @@ std::int64_t LiveJudge::definitionOf(const SituationConfig& config) {
 
 LiveJudge::LiveJudge(const SituationConfig& config, std::shared_ptr<const SituationLabel> label,
                      EventQueue& queue)
-    : m_config(config), m_label(std::move(label)), m_queue(queue), m_opened(WallClock::now()),
-      m_judge(config.judgement) {
+    : m_config(config), m_label(std::move(label)), m_queue(queue), m_texts(config),
+      m_opened(WallClock::now()), m_judge(config.judgement) {
     TraceScope trace(anchor);
     EntryValues values(m_config.conditions);
     const auto compile = [&](const std::string& name) {
@@ -198,6 +209,12 @@ bool LiveJudge::push(const char* row, const EpisodeJudge::Entry& entry,
     } else if (rules.cooldown > 0) {
         judgement->state = EventJudgement::PAUSED;
     }
+    if (m_texts.isNeeded()) {
+        TextFacts facts = factsOf(*judgement);
+        facts.count = std::max<std::uint64_t>(facts.count, 1);
+        facts.log = entry.log;
+        judgement->text = m_texts.text(m_reading, facts);
+    }
     return m_queue.push(m_label, row, judgement);
 }
 
@@ -208,12 +225,13 @@ bool LiveJudge::pushResolved(const std::string& reason) {
         if (ended.episode.id->value() == 0) {
             continue; // the queue, which is closed, did not take the event that raised it
         }
-        isTaken = m_queue.push(
-                      m_label, nullptr,
-                      resolvedJudgement(std::move(ended.episode),
-                                        GroupKey::values(ended.group, m_config.judgement.groupBy),
-                                        ended.isDropped ? noRoom : reason)) &&
-                  isTaken;
+        const auto judgement = resolvedJudgement(
+            std::move(ended.episode), GroupKey::values(ended.group, m_config.judgement.groupBy),
+            ended.isDropped ? noRoom : reason);
+        if (m_texts.isNeeded()) {
+            judgement->text = m_texts.text(factsOf(*judgement));
+        }
+        isTaken = m_queue.push(m_label, nullptr, judgement) && isTaken;
     }
     m_ended.clear();
     return isTaken;

@@ -97,8 +97,8 @@ public:
     void reached(const LogPosition& position);
     /// The thread begins to look for what is new in the log.
     void beginLook() noexcept;
-    /// What was in the log when the look began has been judged, and the position behind it was given
-    /// to `reached`; or there is no log that can be read.
+    /// What was in the log when the look began has been judged, and the position behind it was
+    /// given to `reached`; or there is no log that can be read.
     void endLook() noexcept;
     /// Reading has left a file at the position. If the file has come to have the name of another
     /// log of the list, that log continues there once it is followed. `isWatched`: this log still

@@ -6,12 +6,15 @@ import random
 import re
 import sqlite3
 import time
+import urllib.request
 from collections import Counter
 from datetime import datetime, timezone
 from signal import SIGKILL
 
 import pytest
-from conftest import Log, syslog_line, wait_until
+import zrmctl
+from api import Api
+from conftest import PATIENCE, Log, syslog_line, wait_until
 
 # How often the agent is killed. More: ZRM_KILLS=200.
 KILLS = int(os.environ.get("ZRM_KILLS", "10"))
@@ -256,6 +259,34 @@ def test_killed_under_load_no_episode_is_lost_none_is_there_twice_and_counts_are
     assert found == bursts, f"seed {SEED}"
 
 
+def test_the_client_and_the_metrics_show_episodes(agent):
+    log = followed(agent)
+    bruteforce(agent, resolve_after="1h")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    log.append("".join(failed("203.0.113.7") for _ in range(7)) + failed("10.0.0.1"))
+    wait_stored(agent, 1)
+    wait_until(lambda: api.request("GET", "/api/v1/episodes")[2]["episodes"][0]["count"] == 7, "the count")
+    access = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", str(agent.directory / "state/api-token")]
+    status, out, _ = zrmctl.run([*access, "episodes", "--state", "open", "--group", "ip=203.0.113.7"])
+    assert status == 0
+    assert re.search(r"open +info +bruteforce .* 7 +ip=203.0.113.7$", out, re.M), out
+    assert zrmctl.run([*access, "episodes", "--group", "ip=10.0.0.1"])[0] == 1
+    (episode,) = json.loads(zrmctl.run([*access, "--json", "episodes"])[1])["episodes"]
+    status, out, _ = zrmctl.run([*access, "episodes", "show", str(episode["id"])])
+    assert status == 0 and re.search(r"entries +7$", out, re.M) and "ip=203.0.113.7" in out
+    status, out, _ = zrmctl.run([*access, "events"])
+    assert "ip=203.0.113.7 sshd[412]: Failed password" in out
+    request = urllib.request.Request(
+        f"http://127.0.0.1:{api.port}/metrics", headers={"Authorization": f"Bearer {api.token}"}
+    )
+    with urllib.request.urlopen(request, timeout=PATIENCE) as answer:
+        metrics = answer.read().decode()
+    assert "\nzrm_episodes_open 1\n" in metrics and "\nzrm_groups 2\n" in metrics
+    assert agent.stop() == 0
+
+
 def test_a_history_from_before_episodes_goes_on(agent):
     log = followed(agent)
     agent.situation("every")
@@ -266,7 +297,7 @@ def test_a_history_from_before_episodes_goes_on(agent):
     with sqlite3.connect(agent.directory / "state" / "history.db") as history:
         history.execute("DROP TABLE episodes")
         history.execute("DROP TABLE episode_logs")
-        history.execute("PRAGMA user_version = 7")
+        history.execute("PRAGMA user_version = 8")
     bruteforce(agent)
     agent.start()
     log.append("".join(failed("203.0.113.7") for _ in range(5)))

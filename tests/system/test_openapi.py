@@ -10,7 +10,7 @@ import pytest
 import yaml
 
 from api import Api
-from conftest import ROOT, syslog_line, wait_until
+from conftest import ROOT, Log, syslog_line, wait_until
 
 DOCUMENT = yaml.safe_load((ROOT / "docs/openapi.yaml").read_text(encoding="utf-8"))
 METHODS = ("get", "put", "post", "delete", "patch")
@@ -103,6 +103,9 @@ EXAMPLES = [
     ("GET", "/api/v1/events", None, None, None),
     ("GET", "/api/v1/events", "/api/v1/events?limit=1&order=asc&severity=info", None, None),
     ("GET", "/api/v1/events/{id}", "/api/v1/events/1", None, None),
+    ("GET", "/api/v1/episodes", None, None, None),
+    ("GET", "/api/v1/episodes", "/api/v1/episodes?state=open&group=ip%3D1&limit=1", None, None),
+    ("GET", "/api/v1/episodes/{id}", "/api/v1/episodes/1", None, None),
     ("GET", "/api/v1/rates", None, None, None),
     ("GET", "/api/v1/rates", "/api/v1/rates?step=3600&log={log}", None, None),
     ("GET", "/api/v1/rules", None, None, 200),
@@ -242,6 +245,34 @@ def test_events_are_as_documented(serving):
         status, kind, data = exchange(api, "GET", f"/api/v1/events/{event['id']}")
         assert status == 200 and json.loads(data) == event
         check("GET", "/api/v1/events/{id}", status, kind, data)
+
+
+def test_episodes_and_their_events_are_as_documented(agent):
+    log = Log(agent.directory / "app.log")
+    log.path.write_text("")
+    agent.agent_keys["log_config"] = None
+    agent.follow(log, start="beginning")
+    agent.situation(log=log, group_by=["ENTRYSYS"], resolve_after="1s")
+    agent.situation("counted", log=log, group_by=["ENTRYSYS"], frequency=">= 1", period="1m", cooldown="1h")
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    api = Api(agent)
+    log.append(syslog_line("line"))
+
+    def resolved():
+        status, kind, data = exchange(api, "GET", "/api/v1/episodes?state=resolved")
+        check("GET", "/api/v1/episodes", status, kind, data)
+        return json.loads(data)["episodes"]
+
+    (episode,) = wait_until(resolved, "the end of the episode")
+    status, kind, data = exchange(api, "GET", f"/api/v1/episodes/{episode['id']}")
+    check("GET", "/api/v1/episodes/{id}", status, kind, data)
+    assert [event["state"] for event in json.loads(data)["events"]] == ["raised", "resolved"]
+    for event in json.loads(exchange(api, "GET", "/api/v1/events")[2])["events"]:
+        validate(DOCUMENT["components"]["schemas"]["Event"], event)
+    status, kind, data = exchange(api, "GET", "/api/v1/situations")
+    check("GET", "/api/v1/situations", status, kind, data)
+    assert json.loads(data)["situations"][1]["resolve_after"] == "1s"
 
 
 def test_a_history_that_cannot_be_read_is_documented(agent, serving):

@@ -81,6 +81,54 @@ TEST(SituationValidator, KeepsUnknownNamesInBracesOnlyWhereItMust) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("text"));
 }
 
+TEST(SituationValidator, WithGroupsOrEpisodesTheHostCounts) {
+    SituationText text = named("ssh");
+    text.when = {"ENTRYDESC matches 'from (?P<ip>[^ ]+) user (?P<user>[^ ]+)'"};
+    text.frequency = "< 5";
+    text.period = "1m";
+    text.judgement.groupBy = {"ip", "entrysys", "field.x"};
+    text.judgement.maxGroups = 7;
+    text.judgement.distinct = "user";
+    text.judgement.resolveAfter = "15m";
+    const auto [situation, problems] = SituationValidator::check(text);
+    EXPECT_THAT(problems, IsEmpty());
+    EXPECT_EQ(situation.conditions.size(), 1u) << "without the threshold";
+    EXPECT_EQ(situation.judgement.frequency, 4);
+    EXPECT_TRUE(situation.judgement.isUpperBound);
+    EXPECT_EQ(situation.judgement.period, 60);
+    EXPECT_EQ(situation.judgement.resolveAfter, 900);
+    EXPECT_EQ(situation.judgement.maxGroups, 7u);
+    text.judgement = {};
+    text.judgement.cooldown = "1h";
+    text.frequency = "> 4";
+    EXPECT_EQ(SituationValidator::check(text).situation.judgement.frequency, 5);
+    text.frequency = text.period = std::nullopt;
+    text.when = {"FREQTHRESH >= 3", "PERIODTHRS = 10"};
+    const SituationConfig inConditions = SituationValidator::check(text).situation;
+    EXPECT_EQ(inConditions.judgement.frequency, 3);
+    EXPECT_EQ(inConditions.judgement.period, 10);
+    EXPECT_THAT(inConditions.conditions, IsEmpty());
+}
+
+TEST(SituationValidator, RefusesRulesOfGroupsAndEpisodesThatHaveNoEffect) {
+    const auto fieldsWith = [](const JudgementText& judgement) {
+        SituationText text = named("a");
+        text.judgement = judgement;
+        return fieldsOf(text);
+    };
+    EXPECT_THAT(fieldsWith({.groupBy = {"nobody"}}), ElementsAre("group_by"));
+    EXPECT_THAT(fieldsWith({.groupBy = {"ENTRYSYS", "ENTRYSYS"}}), ElementsAre("group_by"));
+    EXPECT_THAT(fieldsWith({.groupBy = std::vector<std::string>(9, "ENTRYSYS")}).size(), 9u);
+    EXPECT_THAT(fieldsWith({.maxGroups = 5}), ElementsAre("max_groups"));
+    EXPECT_THAT(fieldsWith({.groupBy = {"ENTRYSYS"}, .maxGroups = 0}), ElementsAre("max_groups"));
+    EXPECT_THAT(fieldsWith({.groupBy = {"ENTRYSYS"}, .maxGroups = 1'000'001}),
+                ElementsAre("max_groups"));
+    EXPECT_THAT(fieldsWith({.distinct = "ENTRYSYS"}), ElementsAre("distinct"));
+    EXPECT_THAT(fieldsWith({.resolveAfter = "0s"}), ElementsAre("resolve_after"));
+    EXPECT_THAT(fieldsWith({.cooldown = "soon"}), ElementsAre("cooldown"));
+    EXPECT_THAT(fieldsWith({.resolveAfter = "1m", .cooldown = "1m"}), ElementsAre("cooldown"));
+}
+
 TEST(SituationValidator, OnlyANameIsRequired) {
     const auto [situation, problems] = SituationValidator::check(named("a"));
     EXPECT_THAT(problems, IsEmpty());

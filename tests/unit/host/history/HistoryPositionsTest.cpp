@@ -198,6 +198,24 @@ TEST_F(HistoryPositionsTest, AnEntryIsStoredWithItsPositionOrNotAtAll) {
     }
 }
 
+TEST_F(HistoryPositionsTest, TheEndOfAnEpisodeIsStoredWithThePositionsReachedBefore) {
+    open();
+    LogPositions log("/log");
+    entry(log, 1, 10);
+    EXPECT_TRUE(eventually([&] { return storedOffset("/log") == 10; }));
+    for (std::int64_t round = 1; round <= 100; ++round) {
+        log.reached(at(10 + round));
+        auto judgement = std::make_shared<EventJudgement>();
+        judgement->state = EventJudgement::RESOLVED;
+        judgement->episode = std::make_shared<EpisodeId>(1);
+        judgement->log = "/log";
+        const auto before = static_cast<std::int64_t>(history->newest());
+        EXPECT_TRUE(queue->push(label, nullptr, judgement));
+        EXPECT_TRUE(eventually([&] { return number("SELECT max(id) FROM events") > before; }));
+        EXPECT_EQ(storedOffset("/log"), 10 + round) << "not a second later";
+    }
+}
+
 TEST_F(HistoryPositionsTest, APositionWithoutEventsIsStoredWithinSecondsButNotBeforeEarlierEvents) {
     open();
     LogPositions log("/log");
