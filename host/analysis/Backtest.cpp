@@ -3,6 +3,7 @@
 #include "base/TraceScope.h"
 #include "host/analysis/LogReport.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "host/base/TimeText.h"
 #include "host/framework/RequestLimit.h"
 #include "logs/EntryClock.h"
 #include "logs/FollowSettings.h"
@@ -58,8 +59,10 @@ struct Backtest::Limits {
     std::uint64_t looked = 0; ///< entries read, including those after the last time
     const char* reason = "";  ///< which limit was reached
 
-    bool areReached(const Result& result) {
-        if (result.entries >= mostEntries || result.matched >= mostMatched) {
+    bool areReached(const Result& result, const TextPool& texts) {
+        if (texts.bytes() > mostValues) {
+            reason = "the entries have too many different values to group by";
+        } else if (result.entries >= mostEntries || result.matched >= mostMatched) {
             reason = "the backtest has read as many entries as it may";
         } else if (looked++ % entriesPerLook == 0) {
             isTimeUp();
@@ -91,14 +94,14 @@ public:
                                                   : EntryClock::Reading::backward);
     }
     bool meets(zrm_rmlogent_data_t& row) override {
-        if (m_limits.areReached(m_result)) {
+        if (m_limits.areReached(m_result, m_test.m_texts)) {
             return false;
         }
         const std::int64_t instant = m_clock->next(lastEntryMoment, row.entrytime);
         ++m_result.entries;
         if (m_test.m_replay.matches(row)) {
             ++m_result.matched;
-            m_test.add(row.entrytime, instant);
+            m_test.add(row, instant);
         }
         return false; // no row is kept
     }
@@ -130,6 +133,7 @@ Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::str
     Result result;
     Limits limits{isCancelled};
     m_matched.clear();
+    m_texts = {};
     for (LogFile* const log : logs) {
         const auto entries = log->followSettings() ? EntryReader::of(*log) : nullptr;
         if (log->isSource()) {
@@ -172,7 +176,7 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
     EntryClock clock(log.followSettings(), EntryClock::Reading::backward);
     const std::size_t first = m_matched.size();
     while (log.getNextLogEntry(row.get(), report, &window) != nullptr) {
-        if (limits.areReached(result)) {
+        if (limits.areReached(result, m_texts)) {
             result.isTruncated = true;
             break;
         }
@@ -187,7 +191,7 @@ void Backtest::read(LogFile& log, const std::string& from, const std::string& to
         reach.reached.assign(row->entrytime, sizeof row->entrytime);
         if (m_replay.matches(*row)) {
             ++result.matched;
-            add(row->entrytime, instant);
+            add(*row, instant);
         }
     }
     if (isFollowed) {
@@ -224,11 +228,17 @@ void Backtest::judge(const LogFile& log, Report& report, Limits& limits, Result&
              result);
 }
 
-void Backtest::add(const char* time, std::optional<std::int64_t> instant) {
+void Backtest::add(const zrm_rmlogent_data_t& row, std::optional<std::int64_t> instant) {
     Matched& matched = m_matched.emplace_back();
-    std::memcpy(matched.time.data(), time, matched.time.size());
+    std::memcpy(matched.time.data(), row.entrytime, matched.time.size());
     matched.order = matched.time;
     matched.instant = instant;
+    if (m_replay.isJudged()) {
+        const Replay::Values values = m_replay.valuesOf(row);
+        matched.group = m_texts.add(values.group);
+        matched.distinct = m_texts.add(values.distinct);
+        matched.log = m_texts.add(values.log);
+    }
 }
 
 /// The first log that was not read whole decides; how far all were read, the one read least.
@@ -260,11 +270,16 @@ void Backtest::keepOrder(std::size_t first) {
 }
 
 Replay::Verdict Backtest::count(const Matched& matched) {
+    Replay::Values values;
+    if (m_replay.isJudged()) {
+        values = {m_texts.text(matched.group), m_texts.text(matched.distinct),
+                  m_texts.text(matched.log)};
+    }
     if (!matched.instant) {
-        return m_replay.count(matched.time.data());
+        return m_replay.count(matched.time.data(), values);
     }
     const EntryInstant instant(*matched.instant);
-    return m_replay.count(matched.time.data());
+    return m_replay.count(matched.time.data(), values);
 }
 
 void Backtest::replay(Result& result) {
@@ -281,6 +296,42 @@ void Backtest::replay(Result& result) {
                 result.raisedAt.emplace_back(matched.time.data(), matched.time.size());
             }
         }
+        if (m_replay.isJudged()) {
+            addEpisodes(m_replay.takeEnded(), true, result);
+        }
+    }
+    if (m_replay.isJudged()) {
+        addEpisodes(m_replay.takeLasting(), false, result);
+        result.droppedGroups = m_replay.droppedGroups();
+        std::sort(result.found.begin(), result.found.end(),
+                  [](const FoundEpisode& left, const FoundEpisode& right) {
+                      return left.first < right.first;
+                  });
+        if (result.found.size() > mostEpisodes) {
+            result.found.resize(mostEpisodes);
+        }
+    }
+}
+
+/// Those that have not ended by later entries are over if nothing more has come until now.
+void Backtest::addEpisodes(const std::vector<EndedEpisode>& episodes, bool areOver,
+                           Result& result) {
+    const std::int64_t now = WallClock::seconds();
+    for (const EndedEpisode& ended : episodes) {
+        const Episode& episode = ended.episode;
+        ++result.episodes;
+        result.found.push_back({episode.first, episode.last, episode.count,
+                                m_replay.groupValues(ended.group),
+                                areOver || episode.last + m_resolveAfter <= now});
+    }
+    if (result.found.size() > 2 * mostEpisodes) {
+        // The order of their ends is nearly that of their beginnings.
+        std::nth_element(
+            result.found.begin(), result.found.begin() + static_cast<std::ptrdiff_t>(mostEpisodes),
+            result.found.end(), [](const FoundEpisode& left, const FoundEpisode& right) {
+                return left.first < right.first;
+            });
+        result.found.resize(mostEpisodes);
     }
 }
 

@@ -3,6 +3,7 @@
 
 #include "host/analysis/LogTail.h"
 #include "host/analysis/Replay.h"
+#include "host/analysis/TextPool.h"
 #include "host/config/HostConfig.h"
 
 #include <array>
@@ -31,8 +32,20 @@ class Backtest {
 public:
     static constexpr std::uint64_t mostEntries = 5'000'000; ///< read
     static constexpr std::size_t mostMatched = 1'000'000;
-    static constexpr std::size_t mostTimes = 1000; ///< listed in the result
+    static constexpr std::size_t mostTimes = 1000;    ///< listed in the result
+    static constexpr std::size_t mostEpisodes = 1000; ///< listed in the result
+    /// Bytes of the values by which groups are told apart.
+    static constexpr std::size_t mostValues = std::size_t{128} * 1024 * 1024;
     static constexpr std::chrono::seconds patience{30};
+
+    /// An episode that would have been. Times are entries' own, in seconds since 1970.
+    struct FoundEpisode {
+        std::int64_t first = 0;
+        std::int64_t last = 0;
+        std::uint64_t count = 0;
+        std::vector<GroupValue> group; ///< empty: the situation has no groups
+        bool isOver = true;            ///< false: it would last now
+    };
 
     struct Result {
         std::uint64_t entries = 0; ///< between the two times
@@ -41,12 +54,15 @@ public:
         bool isTruncated = false;          ///< there are older entries that were not read
         Reach reach;                       ///< over all logs: each was read back to `reached`
         std::vector<std::string> raisedAt; ///< the first times, 16 characters each
-        std::string decision;              ///< one sentence
+        std::uint64_t episodes = 0;
+        std::vector<FoundEpisode> found; ///< those that began first
+        std::uint64_t droppedGroups = 0; ///< that made room for others while they counted
+        std::string decision;            ///< one sentence
     };
 
     /// The table's manager must outlive the object.
     Backtest(const SituationConfig& situation, TableManager& entries)
-        : m_replay(situation, entries) {}
+        : m_replay(situation, entries), m_resolveAfter(situation.judgement.resolveAfter) {}
 
     /// Whether the table opened a request; if not, nothing else may be called.
     bool isOpen() const noexcept { return m_replay.isOpen(); }
@@ -65,6 +81,10 @@ private:
         Stamp time;
         Stamp order;                         ///< time by which entries of all logs are ordered
         std::optional<std::int64_t> instant; ///< of a followed log
+        // Of m_texts, if the host judges.
+        TextPool::Number group = 0;
+        TextPool::Number distinct = 0;
+        TextPool::Number log = 0;
     };
 
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
@@ -74,7 +94,8 @@ private:
     void judge(const LogFile& log, Report& report, Limits& limits, Result& result);
     void readFollowed(const LogFile& log, EntryReader& entries, const std::string& from,
                       const std::string& to, Limits& limits, Result& result);
-    void add(const char* time, std::optional<std::int64_t> instant);
+    void add(const zrm_rmlogent_data_t& row, std::optional<std::int64_t> instant);
+    void addEpisodes(const std::vector<EndedEpisode>& episodes, bool areOver, Result& result);
     void keepOrder(std::size_t first);
     Replay::Verdict count(const Matched& matched);
     void replay(Result& result);
@@ -82,6 +103,8 @@ private:
     std::string decisionOf(const Result& result) const;
 
     Replay m_replay;
+    TextPool m_texts;
+    std::int64_t m_resolveAfter;
     std::vector<Matched> m_matched; ///< newest first within a log, one log after another
 };
 

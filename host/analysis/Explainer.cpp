@@ -4,6 +4,7 @@
 #include "host/analysis/LineEntry.h"
 #include "host/analysis/LogTail.h"
 #include "host/analysis/StoredRow.h"
+#include "host/base/TimeText.h"
 #include "host/events/RowJson.h"
 #include "host/events/RowText.h"
 #include "logs/EntryClock.h"
@@ -43,6 +44,17 @@ bool isSameText(std::string_view line, std::string_view text) {
     const std::string_view shown = RowText::ofLocal(line, room);
     const std::size_t length = std::min(shown.size(), text.size());
     return shown.substr(0, length) == text.substr(0, length);
+}
+
+constexpr std::int64_t millisecondsPerSecond = 1000;
+
+/// " of ip=10.0.0.1, user=root"; empty without groups.
+std::string groupText(const std::vector<GroupValue>& group) {
+    std::string text;
+    for (const GroupValue& one : group) {
+        text += (text.empty() ? " of " : ", ") + one.name + '=' + one.value;
+    }
+    return text;
 }
 
 std::string boundOf(const Replay& replay) {
@@ -134,7 +146,10 @@ Result<std::vector<Explanation>> Explainer::line(LogFile& log, std::string_view 
     // If the log cannot be read, no entries precede the line.
     read(log, [&](auto text, zrm_rmlogent_data_t* row) {
         Seen seen = judge(m_replay, text, row);
-        if (seen.verdict.matches && m_replay.hasThresholds()) {
+        if (seen.verdict.matches && m_replay.isJudged()) {
+            matched.push_back(
+                {stampOf(seen.row), EntryInstant::ofThisThread(), m_replay.valuesOf(seen.row)});
+        } else if (seen.verdict.matches && m_replay.hasThresholds()) {
             matched.push_back({stampOf(seen.row), EntryInstant::ofThisThread()});
         }
         if (text == line) {
@@ -153,10 +168,10 @@ void Explainer::countBefore(Replay& replay, const Times& before, const Written& 
         if (written.instant) {
             const EntryInstant instant(*written.instant);
             if (*written.instant <= last.instant) {
-                replay.count(written.stamp.data());
+                replay.count(written.stamp.data(), written.values);
             }
         } else if (written.stamp <= last.stamp) {
-            replay.count(written.stamp.data());
+            replay.count(written.stamp.data(), written.values);
         }
     }
 }
@@ -242,6 +257,12 @@ Explanation Explainer::describe(const LogFile* log, Seen& seen) {
             m_situation.period.value_or(std::to_string(m_replay.periodSeconds()) + "s"),
             seen.verdict.frequency};
     }
+    if (const auto& judged = seen.verdict.judged) {
+        explanation.group = judged->group;
+        if (judged->hasEpisode) {
+            explanation.episode = {judged->first, judged->count};
+        }
+    }
     if (!seen.isRow) {
         explanation.reason =
             "the line does not match the log's format, or its time cannot be determined";
@@ -258,6 +279,36 @@ Explanation Explainer::describe(const LogFile* log, Seen& seen) {
     return explanation;
 }
 
+/// Why groups, episodes and pauses make of an entry what they do.
+std::string Explainer::reasonOf(const Replay::Verdict& verdict) const {
+    using enum EpisodeJudge::Decision;
+    const Replay::Judged& judged = *verdict.judged;
+    const std::string group = groupText(judged.group);
+    if (judged.decision == CONTINUES) {
+        return "it belongs to the episode" + group + " that began at " +
+               UtcTime::text(judged.first * millisecondsPerSecond) + " and has " +
+               numberOf(static_cast<long>(judged.count), "entry", "entries") + " so far";
+    }
+    const JudgementConfig& rules = m_situation.judgement;
+    std::string reason = "every condition holds" + group;
+    bool isMet = true;
+    if (verdict.frequency) {
+        const bool isDistinct = !rules.distinct.empty();
+        reason = numberOf(*verdict.frequency, isDistinct ? "value" : "entry",
+                          isDistinct ? "different values" : "entries") +
+                 (isDistinct ? " of " + rules.distinct : "") + group + " in " +
+                 std::to_string(m_replay.periodSeconds()) + " s, the threshold is " +
+                 boundOf(m_replay);
+        isMet = rules.isUpperBound ? *verdict.frequency <= rules.frequency
+                                   : *verdict.frequency >= rules.frequency;
+    }
+    if (judged.decision == RAISES) {
+        return reason + (judged.hasEpisode ? ", and an episode begins" : "");
+    }
+    return isMet ? "an event" + group + " was raised less than " + rules.cooldownText + " before"
+                 : reason;
+}
+
 void Explainer::decide(Explanation& explanation, const Seen& seen) const {
     const std::string would = explanation.isRaised ? "Would be raised" : "Would not be raised";
     std::string because;
@@ -271,6 +322,8 @@ void Explainer::decide(Explanation& explanation, const Seen& seen) const {
                 break;
             }
         }
+    } else if (seen.verdict.judged) {
+        because = reasonOf(seen.verdict);
     } else if (!explanation.window) {
         because = explanation.conditions.empty() ? "the situation has no conditions"
                                                  : "every condition holds";

@@ -71,6 +71,7 @@ private:
     struct Written {
         std::string stamp;
         std::optional<std::int64_t> instant; ///< of a followed log
+        Replay::Values values = {};          ///< if the host judges
     };
     using Times = std::vector<Written>;
 
@@ -79,6 +80,7 @@ private:
     static void countBefore(Replay& replay, const Times& before, const Written& last);
     bool usesFields() const;
     Explanation describe(const LogFile* log, Seen& seen);
+    std::string reasonOf(const Replay::Verdict& verdict) const;
     void decide(Explanation& explanation, const Seen& seen) const;
     Result<std::vector<Explanation>> nextLine(LogFile& log, std::string_view line,
                                               const Times& before);

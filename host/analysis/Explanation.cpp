@@ -29,7 +29,17 @@ void write(JsonWriter& json, const Explanation::Window& window) {
     json.member("count", window.count).endObject();
 }
 
+constexpr std::int64_t milliseconds = 1000; // in a second
+
 } // namespace
+
+void writeGroup(JsonWriter& json, const std::vector<GroupValue>& group) {
+    json.beginObject();
+    for (const GroupValue& one : group) {
+        json.member(one.name, one.value);
+    }
+    json.endObject();
+}
 
 void Explanation::write(JsonWriter& json) const {
     json.beginObject().member("line", line).member("event", event).key("row");
@@ -41,6 +51,14 @@ void Explanation::write(JsonWriter& json) const {
     }
     json.endArray().member("matches", matches).key("window");
     window ? host::write(json, *window) : void(json.null());
+    if (!group.empty()) {
+        json.key("group");
+        writeGroup(json, group);
+    }
+    if (episode) {
+        json.key("episode").beginObject().key("first").time(episode->first * milliseconds);
+        json.member("count", episode->count).endObject();
+    }
     json.member("raised", isRaised).member("decision", decision).endObject();
 }
 

@@ -1,11 +1,17 @@
 #include "host/analysis/Replay.h"
 
 #include "base/TraceScope.h"
+#include "framework/LogEntry.h"
+#include "host/events/RowText.h"
 #include "host/framework/Request.h"
+#include "host/situations/GroupKey.h"
+#include "logs/EntryClock.h"
+#include "tables/Timestamp.h"
 #include "tables/zrm_rmlogent_agent.h"
 
 #include <cstring>
 #include <new>
+#include <utility>
 
 namespace zrm::host {
 
@@ -19,6 +25,13 @@ public:
     unsigned receive(const ctreq&, const char*, unsigned) override { return 0; }
     void stopped(const ctreq&, unsigned) override {}
 };
+
+/// A 16-character local time in seconds since 1970; none if it is not a time.
+std::optional<std::int64_t> localTime(const char* entryTime) {
+    Timestamp* chain = nullptr;
+    const Timestamp time(&chain, entryTime);
+    return time.eventTime() < 0 ? std::nullopt : std::optional(time.eventTime());
+}
 
 } // namespace
 
@@ -60,8 +73,12 @@ protected:
 };
 
 Replay::Replay(const SituationConfig& situation, TableManager& entries)
-    : m_surroundings(std::make_unique<Surroundings>(situation)) {
+    : m_rules(situation.judgement), m_surroundings(std::make_unique<Surroundings>(situation)) {
     TraceScope trace(anchor);
+    if (m_rules.isUsed()) {
+        m_values.emplace(situation);
+        m_judge.emplace(m_rules);
+    }
     m_request.reset(new (std::nothrow)
                         Request(&m_surroundings->detail, &m_surroundings->context, &entries));
     if (m_request != nullptr && m_request->handle() == 0) {
@@ -80,11 +97,12 @@ bool Replay::hasThresholds() const noexcept {
 }
 
 std::int64_t Replay::frequency() const noexcept {
-    return m_request->inForce().freqThreshold;
+    return isJudged() ? (m_rules.isUpperBound ? -m_rules.frequency : m_rules.frequency)
+                      : m_request->inForce().freqThreshold;
 }
 
 std::int64_t Replay::periodSeconds() const noexcept {
-    return m_request->inForce().periodThreshold;
+    return isJudged() ? m_rules.period : m_request->inForce().periodThreshold;
 }
 
 bool Replay::matches(zrm_rmlogent_data_t& row) {
@@ -95,6 +113,9 @@ bool Replay::matches(zrm_rmlogent_data_t& row) {
 }
 
 Replay::Verdict Replay::judge(zrm_rmlogent_data_t& row) {
+    if (isJudged()) {
+        return matches(row) ? count(row.entrytime, valuesOf(row)) : Verdict();
+    }
     m_request->isCounting = true;
     m_request->matched = false;
     m_request->frequency.reset();
@@ -102,7 +123,15 @@ Replay::Verdict Replay::judge(zrm_rmlogent_data_t& row) {
     return take();
 }
 
-Replay::Verdict Replay::count(const char* entryTime) {
+Replay::Verdict Replay::count(const char* entryTime, const Values& values) {
+    if (isJudged()) {
+        Verdict verdict{true, false, std::nullopt};
+        const auto& instant = EntryInstant::ofThisThread();
+        if (const auto time = instant ? instant : localTime(entryTime)) {
+            judgeGroup(*time, values, verdict);
+        }
+        return verdict;
+    }
     zrm_rmlogent_data_t row{};
     std::memcpy(row.entrytime, entryTime, sizeof row.entrytime);
     m_request->isCounting = true;
@@ -115,6 +144,43 @@ Replay::Verdict Replay::take() {
     const Verdict verdict{m_request->matched, m_request->count > 0, m_request->frequency};
     m_request->count = 0;
     return verdict;
+}
+
+void Replay::judgeGroup(std::int64_t time, const Values& values, Verdict& verdict) {
+    using enum EpisodeJudge::Decision;
+    const EpisodeJudge::Verdict found =
+        m_judge->judge({time, values.group, values.distinct, values.log}, m_ended);
+    verdict.isRaised = found.decision == RAISES;
+    if (hasThresholds()) {
+        verdict.frequency = static_cast<long>(found.count);
+    }
+    Judged& judged = verdict.judged.emplace();
+    judged.decision = found.decision;
+    judged.group = groupValues(values.group);
+    if (found.episode != nullptr) {
+        judged.hasEpisode = true;
+        judged.first = found.episode->first;
+        judged.count = found.episode->count;
+    }
+}
+
+Replay::Values Replay::valuesOf(const zrm_rmlogent_data_t& row) {
+    const char* const bytes = reinterpret_cast<const char*>(&row);
+    m_values->read(layout(), bytes, LogEntry::ofThisThread);
+    return {m_values->group(), m_values->distinct(), LogPath::of(layout(), bytes)};
+}
+
+std::vector<GroupValue> Replay::groupValues(std::string_view key) const {
+    return GroupKey::values(key, m_rules.groupBy);
+}
+
+std::vector<EndedEpisode> Replay::takeEnded() {
+    return std::exchange(m_ended, {});
+}
+
+std::vector<EndedEpisode> Replay::takeLasting() {
+    m_judge->takeOver([](const Episode&) { return true; }, m_ended);
+    return takeEnded();
 }
 
 } // namespace zrm::host

@@ -3,10 +3,15 @@
 
 #include "host/config/HostConfig.h"
 #include "host/framework/RowLayout.h"
+#include "host/situations/EpisodeJudge.h"
+#include "host/situations/JudgedValues.h"
 
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
 
 class TableManager;
 
@@ -23,10 +28,26 @@ namespace zrm::host {
 /// was written. While an EntryInstant exists, an entry is one of a followed log. One thread.
 class Replay {
 public:
+    /// What groups, episodes and pauses make of an entry that meets every condition.
+    struct Judged {
+        EpisodeJudge::Decision decision = EpisodeJudge::Decision::NONE;
+        std::vector<GroupValue> group = {}; ///< empty: the situation has no groups
+        // Of the episode that it begins or continues.
+        bool hasEpisode = false;
+        std::int64_t first = 0; ///< seconds since 1970
+        std::uint64_t count = 0;
+    };
     struct Verdict {
         bool matches = false;          ///< every condition holds
         bool isRaised = false;         ///< and the thresholds let it pass
         std::optional<long> frequency; ///< entries counted in the period; none without thresholds
+        std::optional<Judged> judged = std::nullopt; ///< only with isJudged(), if it matches
+    };
+    /// By what a matching entry is judged, beside its time.
+    struct Values {
+        std::string group; ///< its key
+        std::string distinct;
+        std::string log;
     };
 
     /// The table's manager outlives the object.
@@ -40,6 +61,9 @@ public:
     /// The columns of the rows.
     const RowLayout& layout() const { return *m_layout; }
 
+    /// Whether the host judges groups, episodes or pauses.
+    bool isJudged() const noexcept { return m_judge.has_value(); }
+
     /// Both thresholds are in force.
     bool hasThresholds() const noexcept;
     /// N: at least N entries in the period; -N: at most N.
@@ -50,14 +74,31 @@ public:
     bool matches(zrm_rmlogent_data_t& row);
     /// The next entry, counted when every condition holds. Writes the row's threshold columns.
     Verdict judge(zrm_rmlogent_data_t& row);
-    /// The next entry, of which it is known that every condition holds: its ENTRYTIME.
-    Verdict count(const char* entryTime);
+    /// The next entry, of which it is known that every condition holds: its ENTRYTIME. With
+    /// isJudged() it is judged by the values.
+    Verdict count(const char* entryTime, const Values& values = {});
+
+    // With isJudged().
+
+    /// The values of a row that matches.
+    Values valuesOf(const zrm_rmlogent_data_t& row);
+    /// The episodes that have ended since the last call.
+    std::vector<EndedEpisode> takeEnded();
+    /// Those that have not. Nothing is judged after it.
+    std::vector<EndedEpisode> takeLasting();
+    std::uint64_t droppedGroups() const noexcept { return m_judge->droppedGroups(); }
+    std::vector<GroupValue> groupValues(std::string_view key) const;
 
 private:
     class Request;
     struct Surroundings;
     Verdict take();
+    void judgeGroup(std::int64_t time, const Values& values, Verdict& verdict);
 
+    const JudgementConfig m_rules;
+    std::optional<JudgedValues> m_values; ///< only if the host judges
+    std::optional<EpisodeJudge> m_judge;
+    std::vector<EndedEpisode> m_ended;
     std::unique_ptr<Surroundings> m_surroundings;
     std::unique_ptr<Request> m_request;
     std::optional<RowLayout> m_layout;

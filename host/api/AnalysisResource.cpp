@@ -57,6 +57,26 @@ std::string timeOf(JsonFields& fields, const char* key) {
     return *stamp;
 }
 
+void write(JsonWriter& json, const Backtest::FoundEpisode& episode) {
+    constexpr std::int64_t milliseconds = 1000; // in a second
+    json.beginObject().key("first").time(episode.first * milliseconds);
+    json.key("last").time(episode.last * milliseconds).member("count", episode.count);
+    json.member("over", episode.isOver);
+    if (!episode.group.empty()) {
+        json.key("group");
+        writeGroup(json, episode.group);
+    }
+    json.endObject();
+}
+
+void writeEpisodes(JsonWriter& json, const Backtest::Result& result) {
+    json.member("episode_count", result.episodes).key("episodes").beginArray();
+    for (const Backtest::FoundEpisode& episode : result.found) {
+        write(json, episode);
+    }
+    json.endArray().member("dropped_groups", result.droppedGroups);
+}
+
 } // namespace
 
 void AnalysisResource::addRoutes(Router& router) {
@@ -253,6 +273,9 @@ HttpAnswer AnalysisResource::backtest(const HttpRequest& request) {
         json.beginObject().member("entries", result.entries).member("matched", result.matched);
         json.member("raised", result.raised).member("truncated", result.isTruncated);
         json.member("raised_at", result.raisedAt).member("decision", result.decision);
+        if (wanted.situation.judgement.isUsed()) {
+            writeEpisodes(json, result);
+        }
         result.reach.write(json);
         json.endObject();
     }));

@@ -12,6 +12,36 @@
 
 namespace zrm::host {
 
+namespace {
+
+std::string groupOf(const JsonText::Json& episode) {
+    std::string text;
+    const JsonText::Json& group = JsonText::member(episode, "group");
+    for (const auto& [name, value] : group.items()) {
+        text += (text.empty() ? "" : ", ") + name + '=' + JsonText::text(value);
+    }
+    return DisplayText::visible(text);
+}
+
+std::string episodesOf(const JsonText::Json& answer) {
+    const JsonText::Json& episodes = JsonText::member(answer, "episodes");
+    if (!episodes.is_array() || episodes.empty()) {
+        return "";
+    }
+    std::string text = "episodes: " + JsonText::text(answer, "episode_count") + '\n';
+    for (const JsonText::Json& episode : episodes) {
+        const std::string group = groupOf(episode);
+        text += "  " + TimeDisplay::local(JsonText::text(episode, "first")) + " to " +
+                TimeDisplay::local(JsonText::text(episode, "last")) + "  " +
+                JsonText::text(episode, "count") + " entries" +
+                (JsonText::text(episode, "over") == "true" ? "" : ", lasting") +
+                (group.empty() ? "" : "  " + group) + '\n';
+    }
+    return text;
+}
+
+} // namespace
+
 BacktestCommand::BacktestCommand(CLI::App& program)
     : m_command(program.add_subcommand("backtest",
                                        "Run a situation over what its log already contains")) {
@@ -39,6 +69,7 @@ CliStatus BacktestCommand::run(Context& context) {
     for (const JsonText::Json& time : JsonText::member(answer, "raised_at")) {
         text += "  " + DisplayText::visible(TimeDisplay::stamp(JsonText::text(time))) + '\n';
     }
+    text += episodesOf(answer);
     context.print(text);
     Context::noteReach(answer);
     if (JsonText::text(answer, "truncated") == "true") {

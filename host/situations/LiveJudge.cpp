@@ -95,24 +95,8 @@ std::int64_t LiveJudge::definitionOf(const SituationConfig& config) {
 LiveJudge::LiveJudge(const SituationConfig& config, std::shared_ptr<const SituationLabel> label,
                      EventQueue& queue)
     : m_config(config), m_label(std::move(label)), m_queue(queue), m_texts(config),
-      m_opened(WallClock::now()), m_judge(config.judgement) {
+      m_opened(WallClock::now()), m_judge(config.judgement), m_values(config) {
     TraceScope trace(anchor);
-    EntryValues values(m_config.conditions);
-    const auto compile = [&](const std::string& name) {
-        Result<EntryValue> value = values.compile(name);
-        if (!value) { // the validator knows the same names
-            trace.error()("Situation %s: %s.", m_config.name.c_str(), value.error().what.c_str());
-        }
-        return value ? std::optional(std::move(*value)) : std::nullopt;
-    };
-    for (const std::string& name : m_config.judgement.groupBy) {
-        if (auto value = compile(name)) {
-            m_groupValues.push_back(std::move(*value));
-        }
-    }
-    if (!m_config.judgement.distinct.empty()) {
-        m_distinctValue = compile(m_config.judgement.distinct);
-    }
     for (const StoredEpisode& stored : PositionBook::current()->takeEpisodes(m_config.name)) {
         continueWith(stored);
     }
@@ -141,28 +125,16 @@ void LiveJudge::resolve(EventQueue& queue, const StoredEpisode& stored, const st
     }
 }
 
-/// The value in the reading's entry, in UTF-8.
-std::string_view LiveJudge::valueOf(const EntryValue& value) {
-    return RowText::ofLocal(value.read(m_reading, m_room), m_utf8);
-}
-
 /// What is judged of the row. Valid until the next call.
 EpisodeJudge::Entry LiveJudge::entryOf(const RowLayout& layout, const char* row) {
-    m_reading.begin(layout, row, LogEntry::ofThisThread);
-    m_group.clear();
-    for (const EntryValue& value : m_groupValues) {
-        GroupKey::append(m_group, valueOf(value));
-    }
-    if (m_distinctValue) {
-        m_distinct = valueOf(*m_distinctValue);
-    }
+    m_values.read(layout, row, LogEntry::ofThisThread);
     const EntryEvents* const events = EntryEvents::ofThisThread;
     if (events == nullptr) {
         m_log.clear();
         LogPath::append(m_log, layout, row);
     }
     const auto& instant = EntryInstant::ofThisThread();
-    return {instant ? *instant : WallClock::now() / second, m_group, m_distinct,
+    return {instant ? *instant : WallClock::now() / second, m_values.group(), m_values.distinct(),
             events == nullptr ? m_log : events->log()};
 }
 
@@ -213,7 +185,7 @@ bool LiveJudge::push(const char* row, const EpisodeJudge::Entry& entry,
         TextFacts facts = factsOf(*judgement);
         facts.count = std::max<std::uint64_t>(facts.count, 1);
         facts.log = entry.log;
-        judgement->text = m_texts.text(m_reading, facts);
+        judgement->text = m_texts.text(m_values.reading(), facts);
     }
     return m_queue.push(m_label, row, judgement);
 }

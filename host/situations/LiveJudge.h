@@ -4,8 +4,8 @@
 #include "host/config/HostConfig.h"
 #include "host/events/EventQueue.h"
 #include "host/framework/RowLayout.h"
-#include "host/situations/EntryValue.h"
 #include "host/situations/EpisodeJudge.h"
+#include "host/situations/JudgedValues.h"
 #include "host/situations/TextRenderer.h"
 
 #include <cstddef>
@@ -61,7 +61,6 @@ public:
 
 private:
     EpisodeJudge::Entry entryOf(const RowLayout& layout, const char* row);
-    std::string_view valueOf(const EntryValue& value);
     void continueWith(const StoredEpisode& stored);
     bool push(const char* row, const EpisodeJudge::Entry& entry,
               const EpisodeJudge::Verdict& verdict);
@@ -75,16 +74,11 @@ private:
     EventQueue& m_queue;
     const TextRenderer m_texts;
     const std::int64_t m_opened; ///< milliseconds since 1970, UTC
-    std::vector<EntryValue> m_groupValues;
-    std::optional<EntryValue> m_distinctValue;
 
     mutable std::mutex m_mutex; ///< guards what follows
     EpisodeJudge m_judge;
-    EntryReading m_reading;
-    std::string m_group; ///< key of the current entry
-    std::string m_distinct;
-    std::string m_log;
-    std::string m_room; ///< of m_distinct and m_group
+    JudgedValues m_values;
+    std::string m_log; ///< of the current entry
     std::string m_utf8;
     std::vector<EndedEpisode> m_ended;
     std::vector<std::shared_ptr<GrowingShare>> m_shares; ///< of logs without positions

@@ -51,6 +51,7 @@ function drawPreview(result, answer) {
       "p",
       { className: "verdict" },
       `Would have been raised ${plural(answer.raised, "time")} in the last 24 hours`,
+      answer.episode_count > 0 && `, in ${plural(answer.episode_count, "episode")}`,
     ),
     h(
       "p",
