@@ -125,6 +125,7 @@ HttpAnswer LogsResource::logs(const HttpRequest& request) {
     }
     for (LogLedgerView& ledger : ledgers) {
         ledger.warnings = m_watch.of(ledger.log);
+        ledger.health = m_watch.healthOf(ledger.log);
     }
     return HttpAnswer::json(JsonWriter::text([&](JsonWriter& json) {
         json.beginObject().key("logs").beginArray();

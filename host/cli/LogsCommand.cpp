@@ -102,6 +102,7 @@ void addLedger(FactList& facts, const Json& ledger) {
         facts.add("skipped", TimeDisplay::bytes(JsonText::number(ledger, "skipped_bytes")));
     }
     facts.add("last entry", lastEntry(ledger));
+    facts.add("health", JsonText::text(ledger, "health"));
     for (const Json& warning : JsonText::member(ledger, "warnings")) {
         facts.add("warning", JsonText::text(warning, "text"), Colour::NOTICE);
     }

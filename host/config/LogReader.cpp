@@ -118,6 +118,7 @@ LogConfig LogReader::read(const toml::table& table) {
     readResumption(section, log);
     readTimezone(section, log);
     readKeep(section, log);
+    readQuiet(section, log);
     section.refuseUnknownKeys();
     return log;
 }
@@ -308,6 +309,28 @@ void LogReader::readTimezone(ConfigSection& section, LogConfig& log) {
                         "write \"UTC\" or a name like \"Europe/Berlin\" (timedatectl "
                         "list-timezones lists them)");
     }
+}
+
+void LogReader::readQuiet(ConfigSection& section, LogConfig& log) {
+    using std::chrono::seconds;
+    constexpr seconds shortest{10};
+    constexpr seconds longest = std::chrono::hours(24 * 366);
+    const std::optional<std::string> text = section.text("quiet");
+    if (!text) {
+        return;
+    }
+    if (*text == "learn") {
+        log.follow.quiet.isLearned = true;
+        return;
+    }
+    const std::optional<seconds> after = DurationText::parse(*text);
+    if (!after || *after < shortest || *after > longest) {
+        section.problem("quiet",
+                        "'" + *text + "' is neither learn nor a duration from 10 s to a year",
+                        R"(write "learn", or for example "30m" or "2h")");
+        return;
+    }
+    log.follow.quiet.after = *after;
 }
 
 } // namespace zrm::host

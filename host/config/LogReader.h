@@ -41,6 +41,7 @@ private:
     void readResumption(ConfigSection& section, LogConfig& log);
     void readTimezone(ConfigSection& section, LogConfig& log);
     void readKeep(ConfigSection& section, LogConfig& log);
+    static void readQuiet(ConfigSection& section, LogConfig& log);
     static std::vector<std::string> namesOfFields(ConfigSection& section,
                                                   const std::vector<ConfigSection::Text>& names);
 

@@ -123,6 +123,22 @@ void addReasons(LogLedgerView& view) {
     }
 }
 
+std::string_view nameOf(LogHealth health) noexcept {
+    switch (health) {
+    case LogHealth::learning:
+        return "learning";
+    case LogHealth::quiet:
+        return "quiet";
+    case LogHealth::unparsed:
+        return "unparsed";
+    case LogHealth::dead:
+        return "dead";
+    case LogHealth::ok:
+        break;
+    }
+    return "ok";
+}
+
 /// The share of lines that matched the format, in percent with one decimal. Rounded down, so that
 /// 100 means all.
 double percentParsed(const LogLedgerView& ledger) {
@@ -194,6 +210,9 @@ void LogLedgers::write(JsonWriter& json, const LogLedgerView& ledger, bool withS
     ledger.lastEntry ? json.time(*ledger.lastEntry) : json.null();
     json.key("follow");
     ledger.follow ? ledger.follow->write(json, withSamples) : static_cast<void>(json.null());
+    if (ledger.health) {
+        json.member("health", nameOf(*ledger.health));
+    }
     json.key("warnings").beginArray();
     for (const LogWarning& warning : ledger.warnings) {
         json.beginObject();

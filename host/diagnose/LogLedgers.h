@@ -21,13 +21,23 @@ class JsonWriter;
 
 /// Something that needs an operator's attention in a log that is monitored without an error.
 struct LogWarning {
-    /// missing, replaced, named_twice, failing, lost, without_time or not_records
+    /// missing, replaced, named_twice, failing, lost, without_time, not_records, quiet, dead or
+    /// unparsed
     std::string kind;
     std::int64_t since; ///< when it was first seen
     std::string text;   ///< what is wrong and how to fix it, in sentences
 
     /// Writes `kind`, `since` and `text`, members of an object.
     void write(JsonWriter& json) const;
+};
+
+/// How a followed log is doing.
+enum class LogHealth : unsigned char {
+    ok,
+    learning, ///< ok as far as is known: its rhythm is not yet
+    quiet,    ///< nothing has come where something was expected
+    unparsed, ///< most lines do not match the format any more
+    dead,     ///< there is no file that can be read
 };
 
 /// A snapshot of what the monitor of one log has read and skipped since monitoring began. A refresh
@@ -72,6 +82,8 @@ struct LogLedgerView {
     std::optional<std::int64_t> lastEntry;
 
     std::vector<LogWarning> warnings; ///< empty unless filled in from LogWatch
+    /// None: a log of the log configuration, or nobody has judged it.
+    std::optional<LogHealth> health;
 
     // The latest ones, oldest first. Only for a log that was requested by name.
     std::vector<Rejected> rejected;

@@ -45,6 +45,7 @@ struct LogWatch::Shared {
     bool isEnded = false;
     std::optional<std::vector<LogLedgerView>> logs; ///< logs to check
     Warnings warnings;
+    std::map<std::string, LogHealth> healths;
 
     Announce announce; ///< used by the thread
 };
@@ -105,6 +106,7 @@ void LogWatch::run(const std::shared_ptr<Shared>& shared) {
         std::vector<std::string> lines;
         for (const LogLedgerView& log : logs) {
             std::vector<LogWarning> warnings = LogWarnings::of(log);
+            warnings.insert(warnings.end(), log.warnings.begin(), log.warnings.end());
             for (LogWarning& warning : warnings) {
                 const std::optional<std::int64_t> begin = beginOf(before, log.log, warning.kind);
                 warning.since = begin.value_or(WallClock::now());
@@ -121,6 +123,12 @@ void LogWatch::run(const std::shared_ptr<Shared>& shared) {
             return;
         }
         shared->warnings = std::move(found);
+        shared->healths.clear();
+        for (const LogLedgerView& log : logs) {
+            if (log.health) {
+                shared->healths.emplace(log.log, *log.health);
+            }
+        }
         shared->logs.reset();
         lock.unlock();
         for (const std::string& line : lines) {
@@ -134,6 +142,12 @@ std::vector<LogWarning> LogWatch::of(const std::string& log) const {
     const std::lock_guard guard(m_shared->mutex);
     const auto found = m_shared->warnings.find(log);
     return found == m_shared->warnings.end() ? std::vector<LogWarning>() : found->second;
+}
+
+std::optional<LogHealth> LogWatch::healthOf(const std::string& log) const {
+    const std::lock_guard guard(m_shared->mutex);
+    const auto found = m_shared->healths.find(log);
+    return found == m_shared->healths.end() ? std::nullopt : std::optional(found->second);
 }
 
 std::map<std::string, std::vector<LogWarning>> LogWatch::all() const {

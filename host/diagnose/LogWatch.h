@@ -7,6 +7,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -29,12 +30,14 @@ public:
     LogWatch(const LogWatch&) = delete;
     LogWatch& operator=(const LogWatch&) = delete;
 
-    /// Starts a check if the last one is over and the interval has passed. `read` returns the logs;
-    /// it is called only then. Used by one thread.
+    /// Starts a check if the last one is over and the interval has passed. `read` returns the logs,
+    /// with the warnings that are known already; it is called only then. Used by one thread.
     void tick(Clock::time_point now, const std::function<std::vector<LogLedgerView>()>& read);
 
     /// The warnings about one log from the last check. Any thread.
     std::vector<LogWarning> of(const std::string& log) const;
+    /// How a followed log was doing at the last check; none for any other. Any thread.
+    std::optional<LogHealth> healthOf(const std::string& log) const;
     /// The warnings about all logs that have any. Any thread.
     std::map<std::string, std::vector<LogWarning>> all() const;
 

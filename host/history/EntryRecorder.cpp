@@ -57,6 +57,7 @@ void EntryRecorder::record() {
         counts[log] = now;
     }
     m_counts = std::move(counts);
+    minute.silences = m_learned();
     m_history.addEntries(std::move(minute));
 }
 

@@ -144,6 +144,11 @@ std::set<std::string> History::logs() {
         .value_or(std::set<std::string>());
 }
 
+std::map<std::string, std::vector<SilentHour>> History::rhythms() {
+    return reading([](Database& database) { return RhythmTable::read(database); })
+        .value_or(std::map<std::string, std::vector<SilentHour>>());
+}
+
 std::unique_ptr<EventSource> History::source(const std::string& key, const std::string& name) {
     std::uint64_t event = newest();
     try {

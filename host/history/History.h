@@ -14,6 +14,7 @@
 #include "host/silences/Silences.h"
 
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <set>
@@ -48,6 +49,9 @@ public:
     /// The paths of the logs of which it has events or counts of entries. Empty if it cannot be
     /// read.
     std::set<std::string> logs();
+
+    /// The rhythms of logs, by path. Empty if they cannot be read.
+    std::map<std::string, std::vector<SilentHour>> rhythms();
 
     /// Begins to store the queue's events, which `format` renders. Their ids follow newest().
     void start(EventQueue& queue, EventJson format);

@@ -52,7 +52,7 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
       m_cursors(m_database), m_positions(m_database), m_episodes(m_database), m_rates(m_database),
-      m_silences(m_database), m_files(path), m_oldest(m_events.oldest()),
+      m_rhythms(m_database), m_silences(m_database), m_files(path), m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
@@ -176,6 +176,9 @@ void HistoryFile::addEntries(const std::vector<MinuteCounts>& minutes) {
         for (const MinuteCounts& counts : minutes) {
             for (const auto& [log, entries] : counts.entries) {
                 m_rates.add(counts.minute, m_labels.log(log), entries, 0);
+            }
+            for (const LogSilence& silence : counts.silences) {
+                m_rhythms.keep(m_labels.log(silence.log), silence.hour);
             }
             m_rates.watched(counts.minute);
         }

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_HISTORY_FILE_H
 #define ZRM_HOST_HISTORY_FILE_H
 
+#include "host/events/LogRhythm.h"
 #include "host/history/Cursors.h"
 #include "host/history/Database.h"
 #include "host/history/EpisodeTable.h"
@@ -10,6 +11,7 @@
 #include "host/history/OpenFiles.h"
 #include "host/history/PositionTable.h"
 #include "host/history/RateTable.h"
+#include "host/history/RhythmTable.h"
 #include "host/history/SilenceTable.h"
 
 #include <cstdint>
@@ -24,6 +26,7 @@ namespace zrm::host {
 struct MinuteCounts {
     std::int64_t minute = 0;                                    ///< since 1970, UTC
     std::vector<std::pair<std::string, std::uint64_t>> entries; ///< path and number of entries read
+    std::vector<LogSilence> silences = {};                      ///< learned in that minute
 };
 
 /// An open history as seen by its only writer. Each operation is one transaction: all or nothing.
@@ -105,6 +108,7 @@ private:
     PositionTable m_positions;
     EpisodeTable m_episodes;
     RateTable m_rates;
+    RhythmTable m_rhythms;
     SilenceTable m_silences;
     const OpenFiles m_files;
     std::uint64_t m_oldest = 0;

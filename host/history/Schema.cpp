@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 10> steps = {
+constexpr std::array<const char*, 11> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -77,6 +77,10 @@ constexpr std::array<const char*, 10> steps = {
     "CREATE TABLE episode_logs (episode INTEGER NOT NULL, log TEXT NOT NULL,"
     " count INTEGER NOT NULL, first INTEGER NOT NULL, last INTEGER NOT NULL,"
     " PRIMARY KEY (episode, log)) WITHOUT ROWID;",
+    // 11: the longest silence of each log that touched an hour (since 1970, of local time),
+    // seconds.
+    "CREATE TABLE rhythms (log INTEGER NOT NULL REFERENCES logs, hour INTEGER NOT NULL,"
+    " silence INTEGER NOT NULL, PRIMARY KEY (log, hour)) WITHOUT ROWID;",
 };
 
 } // namespace

@@ -99,7 +99,8 @@ Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& r
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
     if (History* const history = m_delivery.history()) {
-        m_entries.emplace(*history);
+        m_states = LogStates(history->rhythms());
+        m_entries.emplace(*history, [this] { return m_states.takeLearned(); });
     }
     addResources(config, entries);
 }
@@ -112,7 +113,11 @@ void Serving::apply(const std::vector<SituationConfig>& situations, bool removes
 
 void Serving::tick() {
     m_descriptors.tick();
-    m_watch.tick(Clock::now(), [] { return LogLedgers::read(); });
+    m_watch.tick(Clock::now(), [this] {
+        std::vector<LogLedgerView> logs = LogLedgers::read();
+        m_states.judge(logs, Clock::now(), WallClock::now());
+        return logs;
+    });
     if (m_entries) {
         m_entries->tick(WallClock::now());
     }

@@ -5,6 +5,7 @@
 #include "host/base/Say.h"
 #include "host/config/HostConfig.h"
 #include "host/delivery/Delivery.h"
+#include "host/diagnose/LogStates.h"
 #include "host/diagnose/LogWatch.h"
 #include "host/history/EntryRecorder.h"
 #include "host/http/Credentials.h"
@@ -82,6 +83,7 @@ private:
     Watchdog& m_watchdog;
     Delivery m_delivery;
     Descriptors m_descriptors;
+    LogStates m_states;                     ///< used by the main thread
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
     ConfigReload m_reload;

@@ -35,6 +35,15 @@ struct ZoneOffset {
     bool operator==(const ZoneOffset&) const = default;
 };
 
+/// When the framework calls a log quiet. The monitor makes nothing of it.
+struct QuietRule {
+    bool isLearned = false;        ///< by the rhythm of the weeks before
+    std::chrono::seconds after{0}; ///< without an entry; 0: never, or learned
+
+    explicit operator bool() const noexcept { return isLearned || after.count() > 0; }
+    bool operator==(const QuietRule&) const = default;
+};
+
 /// How a log that is followed through rotations and restarts is read. A log without such settings
 /// is a line of the log configuration and is read as that file's logs always are. Not changed after
 /// it was made: shared by all threads without a lock.
@@ -62,6 +71,7 @@ struct FollowSettings {
     std::string timezone;
     std::vector<ZoneOffset> zone; ///< the offsets of `timezone`, oldest first
     EntryKeep keep;               ///< in events
+    QuietRule quiet;
     /// How entries are taken apart, for logs that have no kind of their own. None: the kind of the
     /// log says it.
     Defined<EntryFormat> format;

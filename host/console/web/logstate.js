@@ -46,6 +46,9 @@ const WARNED = {
   lost: "Lost bytes",
   without_time: "No times",
   not_records: "Wrong type",
+  quiet: "Quiet",
+  dead: "No file",
+  unparsed: "Unparsed",
 };
 
 /** The state of a log of /api/v1/logs: {level: "bad" | "warn" | "idle" | "good", state, why, more};

@@ -12,6 +12,8 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 using namespace zrm::host;
 
@@ -54,7 +56,8 @@ protected:
     EntryRecorderTest() {
         TableManager::RegisterWithManager(&logs);
         history = std::move(History::open({}, directory.file("state")).value());
-        recorder = std::make_unique<EntryRecorder>(*history);
+        recorder = std::make_unique<EntryRecorder>(*history,
+                                                   [this] { return std::exchange(learned, {}); });
     }
     ~EntryRecorderTest() override { Tables::clear(); }
 
@@ -64,6 +67,7 @@ protected:
     RecordingTrace trace{0};
     TemporaryDirectory directory;
     CountingManager logs;
+    std::vector<LogSilence> learned;
     std::unique_ptr<History> history;
     std::unique_ptr<EntryRecorder> recorder;
 };
@@ -96,6 +100,26 @@ TEST_F(EntryRecorderTest, WithoutATickThereIsNothingToRecord) {
     recorder->finish();
     history->storeRest();
     EXPECT_TRUE(history->rates(0, start, 24 * 60 * minute)->logs.empty());
+}
+
+TEST_F(EntryRecorderTest, KeepsWhatWasLearnedOfSilences) {
+    recorder->tick(start);
+    learned = {{"/var/log/a", {480'000, 60}}, {"/var/log/b", {480'000, 7200}}};
+    recorder->tick(start + minute);
+    learned = {{"/var/log/a", {480'000, 90}}, {"/var/log/a", {480'001, 90}}};
+    recorder->tick(start + 2 * minute);
+    history->storeRest();
+    using Hours = std::vector<SilentHour>;
+    EXPECT_THAT(history->rhythms(),
+                ElementsAre(testing::Pair("/var/log/a", Hours{{480'000, 90}, {480'001, 90}}),
+                            testing::Pair("/var/log/b", Hours{{480'000, 7200}})));
+    learned = {{"/var/log/a", {480'000 + 2000, 5}}};
+    recorder->tick(start + 3 * minute);
+    history->storeRest();
+    EXPECT_THAT(history->rhythms(),
+                ElementsAre(testing::Pair("/var/log/a", Hours{{482'000, 5}}),
+                            testing::Pair("/var/log/b", Hours{{480'000, 7200}})))
+        << "what is older than six weeks is removed";
 }
 
 } // namespace

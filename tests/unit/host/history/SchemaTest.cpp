@@ -57,7 +57,7 @@ TEST_F(SchemaTest, CreatesTheTablesOfANewFile) {
     EXPECT_EQ(versionOf(database), Schema::version);
     for (const char* const table :
          {"events", "labels", "logs", "marks", "origin", "cursors", "minutes", "rates",
-          "log_positions", "watched_paths", "silences"}) {
+          "log_positions", "watched_paths", "silences", "episodes", "episode_logs", "rhythms"}) {
         EXPECT_TRUE(hasTable(database, table)) << table;
     }
     Schema::bringUpToDate(database);

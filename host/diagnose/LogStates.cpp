@@ -1,0 +1,199 @@
+#include "host/diagnose/LogStates.h"
+
+#include "base/TraceScope.h"
+#include "logs/FollowSettings.h"
+
+#include <algorithm>
+#include <ctime>
+#include <utility>
+
+namespace zrm::host {
+
+namespace {
+
+using std::chrono::seconds;
+
+TRC1_Anchor anchor{"LogStates.cpp"};
+
+constexpr std::int64_t millisecondsPerSecond = 1000;
+constexpr int healthyPercent = 90; ///< of lines, before they are called unparsed
+constexpr int unparsedPercent = 50;
+
+/// The same time as a clock on the wall shows it, in seconds since 1970.
+std::int64_t localTime(std::int64_t wall) {
+    const std::time_t time = wall / millisecondsPerSecond;
+    std::tm local{};
+    return localtime_r(&time, &local) == nullptr ? time : time + local.tm_gmtoff;
+}
+
+std::string counted(std::int64_t number, const char* unit) {
+    return std::to_string(number) + ' ' + unit + (number == 1 ? "" : "s");
+}
+
+/// "45 seconds", "12 minutes", "3 hours 20 minutes", "2 days 4 hours".
+std::string duration(seconds length) {
+    constexpr std::int64_t minute = 60;
+    constexpr std::int64_t hour = 60 * minute;
+    constexpr std::int64_t day = 24 * hour;
+    const std::int64_t all = length.count();
+    const auto two = [all](std::int64_t large, const char* largeUnit, std::int64_t small,
+                           const char* smallUnit) {
+        const std::int64_t rest = all % large / small;
+        return counted(all / large, largeUnit) + (rest == 0 ? "" : ' ' + counted(rest, smallUnit));
+    };
+    return all < 2 * minute ? counted(all, "second")
+           : all < hour     ? counted(all / minute, "minute")
+           : all < day      ? two(hour, "hour", minute, "minute")
+                            : two(day, "day", hour, "hour");
+}
+
+seconds since(LogStates::Clock::time_point begin, LogStates::Clock::time_point now) {
+    return std::chrono::duration_cast<seconds>(now - begin);
+}
+
+bool isWithoutFile(const FollowView& follow) {
+    return follow.state == "missing" || follow.state == "not a file" || !follow.problem.empty();
+}
+
+int percent(std::int64_t part, std::int64_t whole) {
+    return static_cast<int>(100 * part / whole);
+}
+
+} // namespace
+
+LogStates::LogStates(std::map<std::string, std::vector<SilentHour>> rhythms)
+    : m_kept(std::move(rhythms)) {}
+
+void LogStates::judge(std::vector<LogLedgerView>& logs, Clock::time_point now, std::int64_t wall) {
+    TraceScope trace(anchor);
+    for (auto& [path, watched] : m_logs) {
+        watched.isSeen = false;
+    }
+    const std::int64_t local = localTime(wall);
+    for (LogLedgerView& log : logs) {
+        if (log.follow && log.settings) {
+            judge(log, now, local);
+        }
+    }
+    // A log that comes back begins anew: nobody has watched it in the meantime.
+    for (auto one = m_logs.begin(); one != m_logs.end();) {
+        if (one->second.isSeen) {
+            ++one;
+            continue;
+        }
+        one = m_logs.erase(one);
+    }
+}
+
+LogStates::Watched& LogStates::watched(const LogLedgerView& log, Clock::time_point now) {
+    const auto [at, isNew] = m_logs.try_emplace(log.log);
+    Watched& watched = at->second;
+    watched.isSeen = true;
+    if (isNew) {
+        if (const auto kept = m_kept.find(log.log); kept != m_kept.end()) {
+            watched.rhythm = LogRhythm(kept->second);
+        }
+        watched.silentSince = watched.windowBegin = now;
+        watched.lastEntry = log.lastEntry;
+        watched.windowLines = log.lines;
+        watched.windowRows = log.rows;
+    }
+    return watched;
+}
+
+void LogStates::judge(LogLedgerView& log, Clock::time_point now, std::int64_t local) {
+    Watched& watched = this->watched(log, now);
+    log.health = LogHealth::ok;
+    judgeSilence(log, watched, now, local);
+    judgeLines(log, watched, now);
+    judgeFile(log, watched, now);
+}
+
+void LogStates::judgeFile(LogLedgerView& log, Watched& watched, Clock::time_point now) {
+    if (!isWithoutFile(*log.follow)) {
+        watched.deadSince.reset();
+        return;
+    }
+    if (!watched.deadSince) {
+        watched.deadSince = now;
+    }
+    if (now - *watched.deadSince < longestAbsence) {
+        return;
+    }
+    log.health = LogHealth::dead;
+    if (log.settings->quiet && log.follow->state == "missing") {
+        log.warnings.push_back(
+            {"dead", 0, "No file has had this log's name for a while. The agent waits for one."});
+    }
+}
+
+void LogStates::judgeLines(LogLedgerView& log, Watched& watched, Clock::time_point now) {
+    if (log.lines < watched.windowLines || log.rows < watched.windowRows) { // a new ledger
+        watched.windowLines = watched.windowRows = 0;
+    }
+    const std::int64_t lines = log.lines - watched.windowLines;
+    const std::int64_t rows = log.rows - watched.windowRows;
+    if (now - watched.windowBegin >= parsedWindow && lines >= fewestLines) {
+        const int share = percent(rows, lines);
+        const bool wasHealthy =
+            watched.isUnparsed ||
+            (watched.windowLines >= fewestLines &&
+             percent(watched.windowRows, watched.windowLines) >= healthyPercent);
+        watched.isUnparsed = wasHealthy && share < unparsedPercent;
+        watched.unparsedPercent = share;
+        watched.windowBegin = now;
+        watched.windowLines = log.lines;
+        watched.windowRows = log.rows;
+    }
+    if (watched.isUnparsed) {
+        log.health = LogHealth::unparsed;
+        log.warnings.push_back(
+            {"unparsed", 0,
+             "Only " + std::to_string(watched.unparsedPercent) +
+                 "% of the latest lines match the log's format, and most lines before them did. "
+                 "What writes the log may have changed its format; 'zrmctl logs " +
+                 log.log + "' shows lines that do not match."});
+    }
+}
+
+void LogStates::judgeSilence(LogLedgerView& log, Watched& watched, Clock::time_point now,
+                             std::int64_t local) {
+    const QuietRule& rule = log.settings->quiet;
+    if (log.lastEntry != watched.lastEntry) {
+        if (rule.isLearned) {
+            watched.rhythm.add(local - since(watched.silentSince, now).count(), local);
+        }
+        watched.lastEntry = log.lastEntry;
+        watched.silentSince = now;
+    }
+    if (!rule) {
+        return;
+    }
+    const seconds silence = since(watched.silentSince, now);
+    const std::optional<seconds> limit =
+        rule.isLearned ? watched.rhythm.limitAt(local) : rule.after;
+    if (!limit) {
+        log.health = LogHealth::learning;
+    } else if (silence >= *limit) {
+        log.health = LogHealth::quiet;
+        log.warnings.push_back(
+            {"quiet", 0,
+             "The log has had no entries for " + duration(silence) + ". " +
+                 (rule.isLearned
+                      ? "At this time of the week it is quiet after " + duration(*limit) +
+                            ", by the weeks before."
+                      : "The configuration expects one every " + duration(*limit) + '.')});
+    }
+}
+
+std::vector<LogSilence> LogStates::takeLearned() {
+    std::vector<LogSilence> learned;
+    for (auto& [path, watched] : m_logs) {
+        for (const SilentHour& hour : watched.rhythm.takeChanged()) {
+            learned.push_back({path, hour});
+        }
+    }
+    return learned;
+}
+
+} // namespace zrm::host
