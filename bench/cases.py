@@ -101,7 +101,7 @@ def median(runs, key):
 
 
 def settings_of(kind, log):
-    """How the agent is told of a log of this kind. With a table everything is as by default."""
+    """The agent's settings for a log of this kind. A table is used with its defaults."""
     if kind not in KIND_TABLE:
         return {"log_lines": {log: KIND_LINE[kind]}}
     table = f"[[log]]\npath = \"{log}\"\n{KIND_TABLE[kind]}\n"

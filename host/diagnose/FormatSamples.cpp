@@ -85,7 +85,7 @@ private:
             if (const std::string_view* const value = fields.find(name)) {
                 compare("field " + name, *value, text);
             } else {
-                fail("there is no field " + name);
+                fail("field " + name + " is missing");
             }
         }
     }

@@ -30,7 +30,8 @@ struct TimeParts {
         civil.hour = hour % 12 + (isAfternoon ? 12 : 0);
         return hour >= 1 && hour <= 12;
     }
-    /// Sets the time of the columns, or the time of day alone, unless there is no such time.
+    /// Sets the time of the columns, or the time of day alone, if these parts form a valid one;
+    /// returns whether they do.
     bool give(EntryColumns& columns) const noexcept;
 };
 

@@ -11,8 +11,8 @@ constexpr std::string_view known =
     "write one of %Y %y %m %d %e %b %B %h %a %A %H %I %k %l %M %S %p "
     "%T %D %F %R %j %s %f %z %Z, or %% for %";
 
-/// The directives that one stands for: several, or one that is read in the same way. Empty if there
-/// is no such directive.
+/// The directives that this one stands for: several, or one that is read in the same way. Empty for
+/// an unknown directive.
 std::string_view meaningOf(char directive) noexcept {
     switch (directive) {
     case 'T':

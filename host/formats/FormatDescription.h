@@ -39,7 +39,7 @@ struct FormatDescription {
     std::string timeFormat;                      ///< see TimePattern; empty: "auto"
     std::map<std::string, std::string> columns;  ///< types "json", "logfmt": column to field
     std::map<std::string, std::string> defaults; ///< column to its text where the entry has none
-    /// Column to what stands in the log to what the column shows instead.
+    /// For each column, the texts of the log and what the column shows in their place.
     std::map<std::string, std::map<std::string, std::string>> values;
     std::string unwrap; ///< "docker" or "cri"; empty: entries are the lines themselves
     std::vector<Extract> extracts;

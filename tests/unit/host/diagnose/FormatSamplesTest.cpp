@@ -51,7 +51,7 @@ TEST(FormatSamples, SaysWhatDiffers) {
                 ElementsAre("7: time is \"2026-11-19T10:00:00-03:30\", not \"2026-11-19T10:00:00\"",
                             "7: description is \"started\", not \"stopped\"",
                             "7: field level is \"info\", not \"warn\"",
-                            "7: there is no field port"));
+                            "7: field port is missing"));
 }
 
 TEST(FormatSamples, TimesWithoutAYearAndEntriesWithoutATime) {
