@@ -82,7 +82,7 @@ std::string LogReader::formatName(ConfigSection& section, const LogConfig& log) 
     std::string names;
     if (texts) {
         for (const ConfigSection::Text& text : *texts) {
-            const bool isName = ReadyFormats::isName(text.first);
+            const bool isName = ReadyFiles::isName(text.first);
             names += isName ? (names.empty() ? "" : ", ") + text.first : "";
         }
     }
