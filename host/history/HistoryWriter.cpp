@@ -93,7 +93,13 @@ void HistoryWriter::run() {
 
 /// Where they cannot be made, whoever has asked for them hears it.
 void HistoryWriter::makeRequestedChanges() {
-    if (m_requested.areWaiting() && !attempt([&] { m_requested.run(*m_file); })) {
+    bool isOpen = false;
+    const auto work = [&] {
+        isOpen = true;
+        m_requested.run(*m_file);
+    };
+    // A change that fails is refused by itself; those that come after it may succeed.
+    if (m_requested.areWaiting() && !attempt(work) && !isOpen) {
         m_requested.refuseAll(problem());
     }
 }
