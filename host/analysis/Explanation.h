@@ -34,8 +34,8 @@ struct Explanation {
     std::vector<ConditionVerdict> conditions;
     bool matches = false; ///< every condition holds
     std::optional<Window> window;
-    std::vector<GroupValue> group; ///< empty: none
-    std::optional<EpisodePart> episode;
+    std::vector<GroupValue> group = {}; ///< empty: none
+    std::optional<EpisodePart> episode = std::nullopt;
     bool isRaised = false;
     std::string decision; ///< one sentence
 

@@ -117,6 +117,26 @@ TEST_F(FollowedSituation, OnlyConditionsOnTheLogDecideWhetherItCountsALogsEntrie
     EXPECT_EQ(agent().periodOn(row), 0);
 }
 
+TEST_F(FollowedSituation, EarlierEntriesGoToAnOpenerThatCountsThemItself) {
+    m_test.text("LOGPATH", 1, "/var/log/");
+    m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
+    m_test.earlierPeriod = 300;
+    m_test.accepts = [](const char* row) { return row[0] != 'x'; };
+    zrm_rmlogent_data_t row = blankRow();
+    m_test.comparison = 1;
+    EXPECT_EQ(agent().periodOn(row), 300);
+    m_test.comparison = 0;
+    EXPECT_EQ(agent().periodOn(row), 0) << "another log";
+    agent().countEarlier(row);
+    EXPECT_THAT(m_test.earlier, IsEmpty()) << "of no followed log";
+    const EntryInstant instant(1000);
+    agent().countEarlier(row);
+    row.originnode[0] = 'x'; // does not meet the conditions
+    agent().countEarlier(row);
+    EXPECT_EQ(m_test.earlier.size(), 1u);
+    EXPECT_THAT(m_test.dispatched, IsEmpty());
+}
+
 TEST_F(FollowedSituation, WithoutThresholdsNothingIsCounted) {
     m_request.reset(m_manager.CreateCtreq(&m_test, nullptr));
     zrm_rmlogent_data_t row = blankRow();

@@ -132,6 +132,14 @@ bool ctreq::MeetsConditions(char* row) {
     return CheckForException(row) != 0;
 }
 
+std::int64_t ctreq::EarlierPeriod() const {
+    return m_framework->test.earlierPeriod;
+}
+
+void ctreq::CountEarlier(char* row) {
+    m_framework->test.earlier.emplace_back(row, rowSize);
+}
+
 unsigned ctreq::GetFilterInfo(SEL1_FILTERINFO** filter) {
     TestRequest& test = m_framework->test;
     if (m_framework->nextFilter == test.filters.size()) {

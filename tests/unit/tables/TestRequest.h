@@ -40,11 +40,13 @@ public:
     std::function<bool(const char* row)> accepts; ///< conditions; without it every row passes
     std::deque<unsigned> insertStatus;            ///< of the next insertions; then 0
     unsigned dispatchStatus = 0;
-    int comparison = 0; ///< result of both IsException operations
+    std::int64_t earlierPeriod = 0; ///< for which the opener counts entries itself
+    int comparison = 0;             ///< result of both IsException operations
 
     // What was recorded.
     std::vector<std::string> calls;      ///< in order; TestCalls holds those of all requests
     std::vector<std::string> dispatched; ///< the rows of all dispatches
+    std::vector<std::string> earlier;    ///< rows that the opener was given to count
     std::vector<unsigned> stopped;       ///< reasons
     int stops = 0;
     int fetched = 0; ///< conditions that were fetched

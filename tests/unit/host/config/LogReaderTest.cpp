@@ -296,13 +296,13 @@ TEST(LogReader, ChecksTheFormatOfATextLog) {
 
 TEST(LogReader, ReadsWhenALogIsQuiet) {
     const auto quiet = [](const std::string& text) {
-        return accepted("[[log]]\npath = '/a'\nquiet = '" + text + "'\n")[0].follow.quiet;
+        return logsOf("[[log]]\npath = '/a'\nquiet = '" + text + "'\n")[0].follow.quiet;
     };
-    EXPECT_FALSE(accepted("[[log]]\npath = '/a'\n")[0].follow.quiet);
+    EXPECT_FALSE(logsOf("[[log]]\npath = '/a'\n")[0].follow.quiet);
     EXPECT_TRUE(quiet("learn").isLearned);
     EXPECT_EQ(quiet("30m"), (QuietRule{false, std::chrono::minutes(30)}));
     for (const char* const text : {"9s", "367d", "soon", "", "0s"}) {
-        EXPECT_THAT(refused("[[log]]\npath = '/a'\nquiet = '" + std::string(text) + "'\n"),
+        EXPECT_THAT(problemsOf("[[log]]\npath = '/a'\nquiet = '" + std::string(text) + "'\n"),
                     ElementsAre("zrm.toml:3: log.quiet: '" + std::string(text) +
                                 "' is neither learn nor a duration from 10 s to a year; write "
                                 "\"learn\", or for example \"30m\" or \"2h\""));

@@ -2,7 +2,6 @@
 
 #include "host/config/ReadyFormats.h"
 #include "host/config/ReadyRules.h"
-#include "support/RecordingTrace.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -37,7 +36,6 @@ protected:
         return failuresOf({"mine", directory.write("mine.toml", text)});
     }
 
-    RecordingTrace trace{0};
     TemporaryDirectory directory;
 };
 

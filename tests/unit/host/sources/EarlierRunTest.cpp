@@ -2,6 +2,7 @@
 #include "host/sources/EarlierRun.h"
 
 #include "host/base/TimeText.h"
+#include "host/events/EntryEvents.h"
 #include "host/events/EventQueue.h"
 #include "host/events/PositionBook.h"
 #include "host/sources/LogFinder.h"
@@ -258,7 +259,8 @@ protected:
     }
     void store(const std::string& log) {
         const auto followed = book->log(log);
-        followed->reached(followed->begin(), {1, 2, 3, 4, 5, 6});
+        EntryEvents nothing;
+        followed->reached(followed->begin(), {1, 2, 3, 4, 5, 6}, nothing);
         book->saved(book->unsaved(0));
     }
 
