@@ -209,7 +209,7 @@ TEST_F(HistoryPositionsTest, TheEndOfAnEpisodeIsStoredWithThePositionsReachedBef
         judgement->state = EventJudgement::RESOLVED;
         judgement->episode = std::make_shared<EpisodeId>(1);
         judgement->log = "/log";
-        const auto before = static_cast<std::int64_t>(history->newest());
+        const std::int64_t before = number("SELECT max(id) FROM events");
         EXPECT_TRUE(queue->push(label, nullptr, judgement));
         EXPECT_TRUE(eventually([&] { return number("SELECT max(id) FROM events") > before; }));
         EXPECT_EQ(storedOffset("/log"), 10 + round) << "not a second later";

@@ -162,8 +162,8 @@ TEST_F(HostTest, AnUnusableCommandLineEndsTheProcess) {
 TEST_F(HostTest, AnUnusableConfigurationEndsTheProcessWithEveryProblem) {
     const std::string file = write("a = 1\nb = 2\n");
     const std::string keys =
-        "unknown key; the keys here are state_directory, agent, http, history, formats, sink, "
-        "log, situation\n";
+        "unknown key; the keys here are state_directory, agent, http, history, formats, rules, "
+        "sink, log, situation, use\n";
     EXPECT_EXIT(start({"--config", file}), testing::ExitedWithCode(2),
                 "^zrmagent: " + file + ":1: a: " + keys + "zrmagent: " + file + ":2: b: " + keys +
                     "$");
