@@ -79,7 +79,11 @@ bool LogPositions::isFirstOfRun() const noexcept {
 }
 
 std::optional<LogPosition> LogPositions::stored() const {
-    return m_state->log->newest();
+    std::optional<LogPosition> position = m_state->log->newest();
+    if (position && m_state->isFirst) {
+        position->late = m_state->book->lateOf(m_state->log->name(), position->late);
+    }
+    return position;
 }
 
 void LogPositions::beginEntry() noexcept {

@@ -282,6 +282,23 @@ void PositionBook::left(FollowedLog& by, FollowedLog::Follower follower,
     }
 }
 
+LatePositions PositionBook::lateOf(std::string_view log, const LatePositions& late) const {
+    if (late.files().empty()) {
+        return late;
+    }
+    const std::lock_guard guard(m_mutex);
+    const auto isOfAnother = [&](const LogPosition& file) {
+        return std::any_of(m_logs.begin(), m_logs.end(), [&](const auto& one) {
+            const std::optional<LogPosition> position = one.second->newest();
+            return one.first != log && position && position->device == file.device &&
+                   position->inode == file.inode;
+        });
+    };
+    std::vector<LogPosition> files = late.files();
+    std::erase_if(files, isOfAnother);
+    return LatePositions(std::move(files));
+}
+
 std::optional<LogPosition> PositionBook::takenOver(std::string_view log) const {
     const std::lock_guard guard(m_mutex);
     const auto found = m_logs.find(log);

@@ -227,11 +227,6 @@ void Host::reload() {
             m_file.path().c_str(), removed, m_config.situations.size());
     }
     m_serving->apply(config.situations, removesMost);
-    if (config.situations != m_config.situations) {
-        for (const std::string& warning : warningsOfSituations(config, m_file.path())) {
-            say("%s", warning.c_str());
-        }
-    }
     if (config.logs != m_config.logs) {
         m_logs.apply(config.logs, ownFiles(config));
         if (const auto warning = warningOfDebug(config, m_file.path())) {

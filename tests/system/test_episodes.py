@@ -297,7 +297,8 @@ def test_a_history_from_before_episodes_goes_on(agent):
     with sqlite3.connect(agent.directory / "state" / "history.db") as history:
         history.execute("DROP TABLE episodes")
         history.execute("DROP TABLE episode_logs")
-        history.execute("PRAGMA user_version = 8")
+        history.execute("DROP TABLE rhythms")
+        history.execute("PRAGMA user_version = 9")
     bruteforce(agent)
     agent.start()
     log.append("".join(failed("203.0.113.7") for _ in range(5)))

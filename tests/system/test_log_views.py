@@ -133,6 +133,7 @@ def test_the_client_shows_everything_about_a_followed_log(agent):
     assert shown.pop("generations").isdigit()
     line = 1 + agent.zrm_toml.read_text().splitlines().index("[[log]]")
     assert shown == {
+        "health": "ok",
         "log": str(log),
         "type": "syslog",
         "configured by": f"[[log]] at line {line}",
