@@ -125,8 +125,10 @@ def test_entries_from_while_the_agent_was_stopped_are_judged_as_if_read_in_time(
     log = followed(agent)
     bruteforce(agent, resolve_after="60s")
     agent.start()
+    now = time.time()
     for offset in (-3600, -1800):  # two bursts, of which the later ends the first episode
-        log.append("".join(failed("203.0.113.7", when=at(offset + second)) for second in range(20)))
+        times = (time.localtime(now + offset + second) for second in range(20))
+        log.append("".join(failed("203.0.113.7", when=when) for when in times))
     events = wait_stored(agent, 4)
     assert [state for state, _, _ in states(events)] == ["raised", "resolved", "raised", "resolved"]
     assert [event["episode"]["count"] for event in events] == [5, 20, 5, 20]

@@ -80,6 +80,7 @@ COMMANDS = {
 }
 
 FIXED = [
+    (r'("version": ?)"[0-9a-f]{16}"', r'\1"0123456789abcdef"'),  # of a situation, by its log's path
     (r"\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d\.\d{3}Z", "2026-01-02T03:04:05.678Z"),
     (r"20[1-9]\d-\d\d-\d\d \d\d:\d\d:\d\d", "2026-01-02 03:04:05"),
     (r"\b1\d{15}\b", "1260102030405000"),
