@@ -156,8 +156,8 @@ public:
     /// A log that is followed has left a file at the position (LogPositions::left). Any thread.
     void left(FollowedLog& log, FollowedLog::Follower follower, const LogPosition& position,
               bool isWatched);
-    /// Of the older files of a log that an earlier run has left, those in which no other log has its
-    /// position: that log reads the rest itself. Any thread.
+    /// Of the older files of a log that an earlier run has left, those in which no other log has
+    /// its position: that log reads the rest itself. Any thread.
     LatePositions lateOf(std::string_view log, const LatePositions& late) const;
     /// FollowedLog::takenOver of the log. Any thread.
     std::optional<LogPosition> takenOver(std::string_view log) const;

@@ -15,7 +15,6 @@ constexpr auto largestId = static_cast<std::uint64_t>(std::numeric_limits<std::i
 class Conditions {
 public:
     explicit Conditions(const EpisodeFilter& filter) {
-        m_sql = "state <> 'pause'";
         if (filter.isOpen) {
             m_sql += *filter.isOpen ? " AND state = 'open'" : " AND state = 'resolved'";
         }
@@ -53,7 +52,7 @@ private:
         m_sql += end;
     }
 
-    std::string m_sql;
+    std::string m_sql = "state <> 'pause'";
     std::vector<std::string> m_texts;
 };
 
