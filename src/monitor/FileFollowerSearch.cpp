@@ -211,10 +211,12 @@ FileFollower::findHolder(const LogPosition& position, Search search, Generation*
         return member.file && member.file->holds(position, member.tail);
     };
     // Without bytes before the position, a file that was written to since may be another one that
-    // has the same inode. It is read by its age.
+    // has the same inode. It is read by its age. A compressed one is another, whatever its time,
+    // which is that of the file that was compressed.
     const auto isSure = [&position](const GenerationFile& file) {
-        return position.guardLength > 0 || position.modified == 0 ||
-               file.modified <= position.modified;
+        return position.guardLength > 0 ||
+               (!file.isCompressed &&
+                (position.modified == 0 || file.modified <= position.modified));
     };
     for (const GenerationFile& file : files) {
         if (file.identity == wanted && isSure(file) && !isKnown(file.identity, named) &&

@@ -126,11 +126,11 @@ void FileFollower::takeUpLate(const LogPosition& stored, const Generation* named
             continue;
         }
         const auto isWanted = [&](const GenerationFile& file) { return file.identity == wanted; };
-        const auto plain = std::find_if(files.begin(), files.end(), isWanted);
-        // Without bytes before the position it may be another file that has the same inode.
-        const bool isSure =
-            left.guardLength > 0 || plain == files.end() || plain->modified <= left.modified;
-        if (plain != files.end() && isSure && takeUpLate(left, plain->path)) {
+        const auto same = std::find_if(files.begin(), files.end(), isWanted);
+        // An empty file that was left has no bytes to be recognised by. One that has some now may
+        // be another file, even a compressed older one, which has got the inode.
+        if (same != files.end() && (left.guardLength > 0 || same->size == 0) &&
+            takeUpLate(left, same->path)) {
             continue;
         }
         // Compressed since. Some programs store the time of modification in seconds.

@@ -111,6 +111,34 @@ TEST_F(LateLinesTest, DamageOfAFileThatWasCompressedMeanwhileIsALoss) {
     EXPECT_EQ(m_ledger.lost()[0].source, file("app.log.1.gz"));
 }
 
+TEST_F(LateLinesTest, AnotherFileThatHasTheInodeOfAnEmptyOneIsNotReadAgain) {
+    const auto position = m_follower->position();
+    for (const char* const name : {"app.log.2.gz", "app.log.2"}) {
+        age(file(name), 50, "GZread before\n");
+        auto stored = position;
+        LogPosition left = positionOf(Generation::open(file(name))->identity(), 0, {});
+        left.modified = stored->modified;
+        stored->late = LatePositions({left});
+        begin(stored);
+        EXPECT_EQ(looks(3), "") << name;
+        EXPECT_TRUE(m_follower->position()->late.files().empty()) << name;
+    }
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
+TEST_F(LateLinesTest, AreReadAfterARestartOfAFileThatWasEmpty) {
+    rename("app.log", "app.log.0");
+    m_directory.write("app.log", "");
+    look();
+    rename("app.log", "app.log.empty");
+    append("c\n");
+    EXPECT_EQ(looks(5), "c\n");
+    restart();
+    EXPECT_EQ(look(), "");
+    m_directory.append("app.log.empty", "late\n");
+    EXPECT_EQ(looks(2), "late\n");
+}
+
 TEST_F(LateLinesTest, AFileThatGetsItsNameBackWhileStoppedIsReadOn) {
     appendLate("late\n");
     EXPECT_EQ(look(), "late\n");

@@ -161,6 +161,21 @@ TEST_F(FileFollowerTest, RecognisesAnInodeThatIsUsedAgain) {
     EXPECT_EQ(m_ledger.losses(), 1);
 }
 
+TEST_F(FileFollowerTest, ACompressedFileThatHasTheInodeOfAnEmptyOneIsNotReadAgain) {
+    age(file("app.log.2.gz"), 50, "GZread before\n");
+    age(m_path, 40);
+    fs::resize_file(m_path, 0);
+    look();
+    LogPosition position = *m_follower->position();
+    EXPECT_EQ(position.offset, 0);
+    position.inode = Generation::open(file("app.log.2.gz"))->identity().inode;
+    rename("app.log", "app.log.1");
+    append("a\n");
+    begin(position);
+    EXPECT_EQ(looks(3), "a\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 TEST_F(FileFollowerTest, APositionBeyondTheEndBeginsAtTheBeginning) {
     look();
     LogPosition position = *m_follower->position();
