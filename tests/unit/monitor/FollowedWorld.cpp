@@ -166,6 +166,7 @@ void FollowedWorld::rotateByName(bool creates) {
     }
     endLateWriter();
     ++m_rotations;
+    m_rotatedLast = m_files[m_target];
     if (m_style == Style::SYMLINK) {
         create();
     } else {
@@ -187,6 +188,7 @@ void FollowedWorld::copyAndTruncate(bool losesLines) {
         return;
     }
     endLateWriter();
+    m_rotatedLast.reset();
     shift();
     const std::string to = rotatedName();
     fs::copy_file(m_path, to);
@@ -265,7 +267,8 @@ void FollowedWorld::removeGeneration() {
 }
 
 void FollowedWorld::removeAndCreate() {
-    if (m_style != Style::SYMLINK && m_files.count(m_path) != 0) {
+    if (m_style != Style::SYMLINK && m_files.count(m_path) != 0 && !hasContradictingTime()) {
+        endLateWriter();
         fs::remove(m_path);
         m_files.erase(m_path);
         reopen();

@@ -60,6 +60,8 @@ public:
     void truncate();
     void compress();
     void removeGeneration();
+    /// Not while a late writer's file is younger than the log: then only times say which of two
+    /// files was rotated first.
     void removeAndCreate();
     void replace();
 
@@ -93,6 +95,7 @@ private:
     bool has(const File& file, int entry) const;
     void findMissing();
     void findMissingLate();
+    bool hasContradictingTime() const;
 
     const Style m_style;
     const unsigned m_mostLines;
@@ -110,6 +113,7 @@ private:
     std::shared_ptr<File> m_lateFile; ///< that a program still writes
     int m_lateDescriptor = -1;
     int m_rotations = 0;
+    std::shared_ptr<File> m_rotatedLast; ///< by renaming, if nothing was copied since
     bool m_isReopenDue = false;
     int m_delivered = -1;
     int m_last = -1; ///< before the position of an ended follower; -2: none has ended

@@ -1,6 +1,7 @@
 #include "FollowedWorld.h"
 
 #include <algorithm>
+#include <utility>
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -10,11 +11,9 @@
 /// Another program may go on with the file that the log's own program leaves.
 void FollowedWorld::leaveLateWriter() {
     // An empty file could not be told from another one that gets its inode.
-    const bool isRecognised = m_written && !m_written->entries.empty() && !m_written->isOpenEnded;
-    const bool isRotated = std::any_of(m_files.begin(), m_files.end(), [this](const auto& file) {
-        return file.first != m_target && file.second == m_written;
-    });
-    if (isRotated && isRecognised && m_lateDescriptor < 0 && m_random() % 2 == 0) {
+    const bool isRecognised = m_written && !m_written->entries.empty() && !m_written->isOpenEnded &&
+                              !m_written->isUnknown;
+    if (m_written == m_rotatedLast && isRecognised && m_lateDescriptor < 0 && m_random() % 2 == 0) {
         m_lateDescriptor = m_descriptor;
         m_lateFile = m_written;
     } else if (m_descriptor >= 0) {
@@ -44,6 +43,18 @@ void FollowedWorld::writeLate() {
     }
     append(m_lateDescriptor, text);
     findMissing();
+}
+
+/// True if a late writer has written to a rotated file after the log was written.
+bool FollowedWorld::hasContradictingTime() const {
+    const auto timeOf = [](const std::string& path) {
+        struct stat status {};
+        stat(path.c_str(), &status);
+        return std::pair(status.st_mtim.tv_sec, status.st_mtim.tv_nsec);
+    };
+    return std::any_of(m_files.begin(), m_files.end(), [&](const auto& file) {
+        return !file.second->lateEntries.empty() && timeOf(file.first) > timeOf(m_path);
+    });
 }
 
 void FollowedWorld::findMissingLate() {
@@ -121,5 +132,9 @@ void FollowedWorld::noteStart(bool hasPosition, const Files& lateFiles) {
             LateEntry& late = m_lateEntries[static_cast<std::size_t>(entry)];
             late.mayMiss = late.mayMiss || file->isUnknown;
         }
+    }
+    // Its time may say later that nothing of it was read.
+    if (m_lateFile && m_lateFile->isUnknown) {
+        endLateWriter();
     }
 }
