@@ -121,9 +121,8 @@ void FileFollower::takeUpLate(const LogPosition& stored, const Generation* named
         if (wanted == identityOf(stored) || m_late.has(wanted)) {
             continue; // read in its turn
         }
-        if (named != nullptr && named->identity() == wanted) {
-            takeUpLate(left, m_path); // it has got the name back
-            continue;
+        if (named != nullptr && named->identity() == wanted && takeUpLate(left, m_path)) {
+            continue; // it has got the name back
         }
         const auto isWanted = [&](const GenerationFile& file) { return file.identity == wanted; };
         const auto same = std::find_if(files.begin(), files.end(), isWanted);

@@ -101,6 +101,22 @@ TEST_F(LateLinesTest, AreReadOfAFileThatWasCompressedMeanwhile) {
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(LateLinesTest, AreReadOfACompressedFileWhoseInodeTheLogHasGot) {
+    appendLate("late\n");
+    EXPECT_EQ(look(), "late\n");
+    auto stored = m_follower->position();
+    LogPosition left = stored->late.files().at(0);
+    left.inode = Generation::open(m_path)->identity().inode;
+    stored->late = LatePositions({left});
+    stored->inode = 0; // its file is gone
+    m_directory.write("app.log.1.gz", "GZold\na\nlate\nlater\n");
+    fs::remove(file("app.log.1"));
+    fs::resize_file(m_path, 0);
+    append("c\n");
+    begin(stored);
+    EXPECT_EQ(looks(3), "c\nlater\n");
+}
+
 TEST_F(LateLinesTest, DamageOfAFileThatWasCompressedMeanwhileIsALoss) {
     const auto stored = m_follower->position();
     m_directory.write("app.log.1.gz", "GZold\na\nlate\n\x01");
