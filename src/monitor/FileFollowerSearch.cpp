@@ -287,6 +287,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
             return other != nullptr && member.file->isCopyOf(*other);
         };
         return isOf(named) || (found.holder && isOf(found.holder->file.get())) ||
+               m_late.hasOriginalOf(*member.file) ||
                std::any_of(m_chain.begin(), m_chain.end(),
                            [&](const Member& known) { return isOf(known.file.get()); }) ||
                std::any_of(candidates.begin(), candidates.end(), [&](const Member& other) {

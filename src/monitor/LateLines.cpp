@@ -52,6 +52,11 @@ bool LateLines::has(const FileIdentity& file) const noexcept {
                        [&file](const File& one) { return one.file->identity() == file; });
 }
 
+bool LateLines::hasOriginalOf(Generation& file) const {
+    return std::any_of(m_files.begin(), m_files.end(),
+                       [&file](const File& one) { return file.isCopyOf(*one.file); });
+}
+
 std::optional<LogPosition> LateLines::remove(const FileIdentity& file) {
     stopReading();
     const auto found = std::find_if(m_files.begin(), m_files.end(), [&file](const File& one) {

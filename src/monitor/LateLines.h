@@ -36,6 +36,8 @@ public:
     /// added any more to a compressed one, which is read to its end.
     void add(std::unique_ptr<Generation> file, std::int64_t offset, const Tail& tail, Time now);
     bool has(const FileIdentity& file) const noexcept;
+    /// True if the file is a copy of one of them, like the compressed one.
+    bool hasOriginalOf(Generation& file) const;
     /// Ends the watch over a file, if it is one of them. Returns where reading has left it.
     std::optional<LogPosition> remove(const FileIdentity& file);
     /// Ends the watch over all files, to free their descriptors.

@@ -217,6 +217,18 @@ TEST_F(LateLinesTest, AFileThatIsRemovedIsReadAndClosed) {
     EXPECT_EQ(watched(), std::vector<bool>{false});
 }
 
+TEST_F(LateLinesTest, ACompressedCopyOfTheirFileIsNotReadToo) {
+    appendLate("late\n");
+    m_directory.write("app.log.1.gz", "GZold\na\nlate\n");
+    age(file("app.log.1"), -5); // younger than all that was read
+    fs::last_write_time(file("app.log.1.gz"), fs::last_write_time(file("app.log.1")));
+    fs::remove(file("app.log.1"));
+    fs::remove(m_path); // so that times decide
+    append("c\n");
+    EXPECT_EQ(looks(4), "late\nc\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 TEST_F(LateLinesTest, AFileThatIsTruncatedIsLeft) {
     fs::resize_file(file("app.log.1"), 0);
     appendLate("another\n");
