@@ -118,7 +118,7 @@ void FileFollower::takeUpLate(const LogPosition& stored, const Generation* named
     const std::vector<GenerationFile> files = generations(inodes);
     for (const LogPosition& left : stored.late.files()) {
         const FileIdentity wanted = identityOf(left);
-        if (wanted == identityOf(stored) || m_late.has(wanted)) {
+        if (wanted == identityOf(stored)) {
             continue; // read in its turn
         }
         if (named != nullptr && named->identity() == wanted && takeUpLate(left, m_path)) {
@@ -150,7 +150,9 @@ bool FileFollower::takeUpLate(const LogPosition& left, const std::string& path) 
     if (!opened || !opened->holds(left, tail)) {
         return false;
     }
-    m_late.add(std::move(opened), left.offset, tail, m_now.steady);
+    if (!m_late.has(opened->identity())) { // not taken by an earlier attempt
+        m_late.add(std::move(opened), left.offset, tail, m_now.steady);
+    }
     return true;
 }
 

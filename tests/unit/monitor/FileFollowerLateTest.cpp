@@ -117,6 +117,24 @@ TEST_F(LateLinesTest, AreReadOfACompressedFileWhoseInodeTheLogHasGot) {
     EXPECT_EQ(looks(3), "c\nlater\n");
 }
 
+TEST_F(LateLinesTest, AreReadOfACompressedFileWhoseInodeAnotherOneHasGot) {
+    auto stored = m_follower->position();
+    const LogPosition first = stored->late.files().at(0);
+    m_directory.write("app.log.1.gz", "GZold\na\nlate\n");
+    m_directory.write("app.log.2", "b\n");
+    const auto other = Generation::open(file("app.log.2"));
+    Tail tail;
+    ASSERT_TRUE(other->readTail(2, tail));
+    const LogPosition second =
+        positionOf(Generation::open(file("app.log.1.gz"))->identity(), 2, tail);
+    m_directory.write("app.log.2.gz", "GZb\nlater\n");
+    fs::remove(file("app.log.1"));
+    fs::remove(file("app.log.2"));
+    stored->late = LatePositions({first, second});
+    begin(stored);
+    EXPECT_EQ(looks(3), "late\nlater\n");
+}
+
 TEST_F(LateLinesTest, DamageOfAFileThatWasCompressedMeanwhileIsALoss) {
     const auto stored = m_follower->position();
     m_directory.write("app.log.1.gz", "GZold\na\nlate\n\x01");
