@@ -199,7 +199,7 @@ class SilencesPage {
           "Events that match all of this are kept from the sinks. * stands for any characters; " +
             "what is empty matches everything.",
         ),
-        h("div", { className: "toolbar" }, Object.values(rows)),
+        h("div", { className: "toolbar form" }, Object.values(rows)),
         problem,
         h(
           "p",
