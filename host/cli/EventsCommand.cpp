@@ -68,7 +68,7 @@ std::string entryOf(const Json& event) {
         group = "[silence " + silence + "] ";
     }
     if (const std::string text = JsonText::text(event, "text"); !text.empty()) {
-        return group + text;
+        return group + (JsonText::text(event, "state") == "resolved" ? "Resolved: " : "") + text;
     }
     for (const auto& [name, value] : JsonText::member(event, "group").items()) {
         group += name + '=' + JsonText::text(value) + ' ';

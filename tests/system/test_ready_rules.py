@@ -37,6 +37,7 @@ def log(agent):
 
 def test_a_rule_is_a_situation(agent, log):
     agent.use = ["ssh-bruteforce", "sudo-failure"]
+    agent.listen = "127.0.0.1:0"
     agent.start()
     log.append("".join(failed(second) for second in range(5)))
     event, end = agent.wait_events(2)  # the entries are old: the episode is over
@@ -44,6 +45,9 @@ def test_a_rule_is_a_situation(agent, log):
     assert event["group"] == end["group"] == {"ip": "203.0.113.7"}
     assert event["text"] == "5 failed SSH logins from 203.0.113.7 on web1, the last as root"
     assert end["state"] == "resolved" and end["episode"]["id"] == event["id"]
+    token = ["--url", f"http://127.0.0.1:{Api(agent).port}", "--token-file", str(agent.directory / "state/api-token")]
+    shown = run([*token, "events"])[1].splitlines()
+    assert shown[1].endswith(f"  {event['text']}") and f"  Resolved: {end['text']}" in shown[2]
 
 
 def test_a_table_changes_keys_of_a_rule(agent, log):

@@ -121,7 +121,7 @@ export function frequencyText(frequency, period) {
  * the text of its entry, or what came of an episode.
  */
 export function describe(event) {
-  if (event.text) return event.text;
+  if (event.text) return event.state === "resolved" ? `Resolved: ${event.text}` : event.text;
   const group = Object.entries(event.group ?? {}).map(([name, value]) => `${name}=${value}`);
   const text = event.row
     ? event.row.UENTRYDESC || event.row.ENTRYDESC
