@@ -21,6 +21,16 @@ struct zrm_rmlogent_data_t;
 
 namespace zrm::host {
 
+/// What groups, episodes and pauses make of an entry that meets every condition.
+struct JudgedEntry {
+    EpisodeJudge::Decision decision = EpisodeJudge::Decision::NONE;
+    std::vector<GroupValue> group = {}; ///< empty: the situation has no groups
+    // Of the episode that it begins or continues.
+    bool hasEpisode = false;
+    std::int64_t first = 0; ///< seconds since 1970
+    std::uint64_t count = 0;
+};
+
 /// Judges entries as a situation would, without being one: a request of the agent's own, which no
 /// log offers anything to and which raises nothing. Conditions and thresholds are judged by the
 /// very code that monitors. Of a log of the log configuration, the period in which entries are
@@ -28,15 +38,7 @@ namespace zrm::host {
 /// was written. While an EntryInstant exists, an entry is one of a followed log. One thread.
 class Replay {
 public:
-    /// What groups, episodes and pauses make of an entry that meets every condition.
-    struct Judged {
-        EpisodeJudge::Decision decision = EpisodeJudge::Decision::NONE;
-        std::vector<GroupValue> group = {}; ///< empty: the situation has no groups
-        // Of the episode that it begins or continues.
-        bool hasEpisode = false;
-        std::int64_t first = 0; ///< seconds since 1970
-        std::uint64_t count = 0;
-    };
+    using Judged = JudgedEntry;
     struct Verdict {
         bool matches = false;          ///< every condition holds
         bool isRaised = false;         ///< and the thresholds let it pass
