@@ -34,7 +34,7 @@ public:
     static constexpr std::size_t mostMatched = 1'000'000;
     static constexpr std::size_t mostTimes = 1000;    ///< listed in the result
     static constexpr std::size_t mostEpisodes = 1000; ///< listed in the result
-    /// Bytes of the values by which groups are told apart.
+    /// Bytes of the values that make groups, all together.
     static constexpr std::size_t mostValues = std::size_t{128} * 1024 * 1024;
     static constexpr std::chrono::seconds patience{30};
 

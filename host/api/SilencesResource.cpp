@@ -144,7 +144,7 @@ HttpAnswer SilencesResource::show(const HttpRequest& request) const {
     const std::uint64_t id = idOf(request);
     const std::optional<Silence> silence = m_silences.find(id);
     if (!silence) {
-        throw RequestRefused(404, "there is no silence " + std::to_string(id), "id");
+        throw RequestRefused(404, "silence " + std::to_string(id) + " does not exist", "id");
     }
     return answerWith(*silence);
 }

@@ -25,7 +25,7 @@ public:
     /// A name is looked for in these directories in turn.
     explicit ReadyFiles(std::vector<std::string> directories);
 
-    /// None if there is no such file.
+    /// None if no directory has it.
     std::optional<Place> find(const std::string& name) const;
     /// All files in the order of their names. Of several with one name, the one that counts.
     std::vector<Place> list() const;

@@ -2,8 +2,8 @@
 
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
-#include "host/config/ConfigText.h"
 #include "host/config/FormatReader.h"
+#include "host/config/ReadyFileReader.h"
 
 #include <algorithm>
 #include <string_view>
@@ -102,23 +102,7 @@ Result<ReadyFormat> ReadyFormats::find(const std::string& name) const {
 }
 
 Result<ReadyFormat, std::vector<std::string>> ReadyFormats::load(const Place& place) {
-    ConfigProblems problems(place.path);
-    ReadyFormat ready;
-    ready.name = place.name;
-    ready.path = place.path;
-    Result<std::string> text = ConfigText::read(place.path, ReadyFiles::largestFile);
-    if (!text) {
-        problems.add(0, {text.error().what, "make it a readable file of at most 256 KiB"});
-    } else {
-        ready.text = std::move(*text);
-        if (const std::optional<toml::table> file = ConfigText::parse(ready.text, problems)) {
-            read(*file, problems, ready);
-        }
-    }
-    if (!problems.none()) {
-        return tl::unexpected(problems.texts());
-    }
-    return ready;
+    return readReadyFile<ReadyFormat>(place, read);
 }
 
 } // namespace zrm::host

@@ -2,7 +2,7 @@
 
 #include "host/config/ConfigProblems.h"
 #include "host/config/ConfigSection.h"
-#include "host/config/ConfigText.h"
+#include "host/config/ReadyFileReader.h"
 #include "host/config/SituationReader.h"
 
 #include <iterator>
@@ -103,23 +103,7 @@ Result<ReadyRule> ReadyRules::find(const std::string& name) const {
 }
 
 Result<ReadyRule, std::vector<std::string>> ReadyRules::load(const Place& place) {
-    ConfigProblems problems(place.path);
-    ReadyRule rule;
-    rule.name = place.name;
-    rule.path = place.path;
-    Result<std::string> text = ConfigText::read(place.path, ReadyFiles::largestFile);
-    if (!text) {
-        problems.add(0, {text.error().what, "make it a readable file of at most 256 KiB"});
-    } else {
-        rule.text = std::move(*text);
-        if (const std::optional<toml::table> file = ConfigText::parse(rule.text, problems)) {
-            read(*file, problems, rule);
-        }
-    }
-    if (!problems.none()) {
-        return tl::unexpected(problems.texts());
-    }
-    return rule;
+    return readReadyFile<ReadyRule>(place, read);
 }
 
 } // namespace zrm::host

@@ -14,7 +14,7 @@ namespace zrm::host {
 /// bits of a hash.
 class DistinctValues {
 public:
-    static constexpr std::size_t mostValues = 10'000; ///< that are told apart
+    static constexpr std::size_t mostValues = 10'000; ///< that are counted exactly
     static constexpr std::size_t mostSpans = 4;       ///< times that are further apart
 
     explicit DistinctValues(std::size_t most = mostValues) noexcept : m_most(most) {}

@@ -10,7 +10,7 @@
 
 namespace zrm::host {
 
-/// The values of a group as one text, by which groups are told apart.
+/// The values of a group as one text: different groups have different ones.
 class GroupKey {
 public:
     static constexpr std::size_t longestValue = 256; ///< bytes

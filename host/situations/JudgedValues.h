@@ -16,8 +16,8 @@ class LogEntry;
 
 namespace zrm::host {
 
-/// Reads from the rows that meet a situation's conditions what EpisodeJudge tells them apart by:
-/// their group and the value that is counted. One thread at a time.
+/// Reads the group of each row that meets a situation's conditions, and the value that is counted.
+/// One thread at a time.
 class JudgedValues {
 public:
     explicit JudgedValues(const SituationConfig& config);

@@ -12,7 +12,7 @@ async function textOf(id) {
     return `${silence.why} (${silence.who}, until ${time(silence.expired || silence.until)})`;
   } catch (error) {
     silences.delete(id); // so that it is asked for again
-    return error.status === 404 ? "It is no longer kept." : error.message;
+    return error.status === 404 ? "The silence has been removed since." : error.message;
   }
 }
 
