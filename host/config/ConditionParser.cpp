@@ -89,7 +89,7 @@ Result<ConditionValue::Item> item(Scanner& scanner) {
         return whole;
     }
     // The library also reads "inf" and "nan".
-    if (word.find_first_not_of("0123456789.-eE") == word.npos && isNumber(word, decimal)) {
+    if (word.find_first_not_of("0123456789.+-eE") == word.npos && isNumber(word, decimal)) {
         return decimal;
     }
     return badValue("'" + std::string(word) + "' is not a value",

@@ -20,14 +20,18 @@ std::string quoted(std::string_view text) {
     return result + "'";
 }
 
+/// Numbers that fields are compared with are kept as text, since they may have a fraction.
+std::string numberOf(const Condition& condition) {
+    return condition.text.empty() ? std::to_string(condition.number) : condition.text;
+}
+
 std::string written(const Condition& condition) {
     const char* const names[] = {"", "=", "!=", ">=", "<=", "<", ">"};
     const char* const own[] = {"contains", "starts", "matches", "in"};
-    std::string text = condition.column + ' ';
+    std::string text = ConditionBuilder::written(condition.column) + ' ';
     text += condition.op < INTF_CONTAINS ? names[condition.op] : own[condition.op - INTF_CONTAINS];
     if (condition.op != INTF_IN) {
-        return text + (condition.isNumber ? ' ' + std::to_string(condition.number)
-                                          : quoted(condition.text));
+        return text + (condition.isNumber ? ' ' + numberOf(condition) : quoted(condition.text));
     }
     char separator = '[';
     for (const std::string& value : condition.values) {

@@ -84,6 +84,7 @@ TEST(ConditionParser, ReadsFields) {
     EXPECT_EQ(number.column, "field.request_time");
     EXPECT_EQ(number.op, INTF_GREATER);
     EXPECT_EQ(number.text, "1.5");
+    EXPECT_EQ(parsed("field.bytes > 1e5"), parsed("field.bytes > 1e+05"));
     EXPECT_TRUE(number.isNumber);
     EXPECT_EQ(parsed("field.status != -7").text, "-7");
     EXPECT_EQ(parsed("field.big < 1e300").text, "1e+300");
