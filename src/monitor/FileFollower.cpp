@@ -54,8 +54,10 @@ std::optional<FileIdentity> FileFollower::file() const noexcept {
 LogPosition FileFollower::positionInBlock() const noexcept {
     LogPosition position =
         positionOf(m_chain.front().file->identity(), m_block.offset(), m_block.tail());
-    position.modified =
-        std::max(m_modified == INT64_MAX ? 0 : m_modified, m_hasSeen ? m_seen.modified : 0);
+    position.modified = m_modified == INT64_MAX ? 0 : m_modified;
+    if (m_isInBlock) {
+        position.modified = std::max(position.modified, m_readModified);
+    }
     return position;
 }
 
@@ -99,6 +101,7 @@ void FileFollower::enter() {
     m_isAtEnd = false;
     m_waitingTo = -1;
     m_hasSeen = false;
+    m_readModified = 0;
     m_active = m_now.steady;
     m_readRetry = Retry{};
     member.file->showPosition(member.from);
@@ -168,8 +171,8 @@ bool FileFollower::checkFile() {
         if (m_hasSeen) {
             m_active = m_now.steady;
         }
-        if (m_hasSeen && m_isInBlock) {
-            noteModified(m_seen.modified); // before what is found now was done
+        if (m_isInBlock && m_readModified != 0) {
+            noteModified(m_readModified); // before what is found now was done
         }
         if (m_chain.front().hadName && m_block.readTo() == 0) {
             const bool isPaused = m_isAwaited && !mayTry(m_youngerRetry);
@@ -192,6 +195,13 @@ bool FileFollower::checkFile() {
         return false;
     }
     return true;
+}
+
+/// A read has shown that the file was not truncated before the last look.
+void FileFollower::noteSame() noexcept {
+    if (m_hasSeen) {
+        m_readModified = m_seen.modified;
+    }
 }
 
 char* FileFollower::give(char* entry) noexcept {
@@ -246,7 +256,8 @@ char* FileFollower::nextInOrder() {
                                                : EntryBlock::Fill::failed) {
         case EntryBlock::Fill::more:
             m_bytesRead += m_block.readTo() - from;
-            m_known = std::max(m_seen.size, m_block.readTo()); // the file is still the same
+            m_known = std::max(m_seen.size, m_block.readTo());
+            noteSame();
             m_isAwaited = false;
             if (m_head.length < Tail::size) {
                 noteHead();
@@ -271,6 +282,7 @@ char* FileFollower::nextInOrder() {
             break;
         case EntryBlock::Fill::end:
             succeed(m_readRetry);
+            noteSame();
             m_isAtEnd = true;
             if (!isFinished()) {
                 return hasWaitedEnough() ? give(m_block.endWaiting()) : nullptr;

@@ -171,7 +171,7 @@ private:
     void dropYoungerThanFirst(Found& found);
     Missed insertMissed();
     void noteHead();
-    bool dropShortCopy(Found& found, std::int64_t offset) const;
+    std::optional<std::int64_t> dropShortCopy(Found& found, std::int64_t offset) const;
     bool hasCopyOfWaiting();
     char* recover();
     void prepend(Found& found);
@@ -188,6 +188,7 @@ private:
     bool checkFile();
     bool isFinished() const noexcept;
     void noteModified(std::int64_t time) noexcept;
+    void noteSame() noexcept;
     LogPosition positionInBlock() const noexcept;
     bool switchToNext();
     char* nextInOrder();
@@ -233,9 +234,10 @@ private:
     Generation::Status m_seen{}; ///< of the file that is read, at the last look
     std::int64_t m_known = 0;    ///< size that its present contents had for certain
     bool m_hasSeen = false;
-    bool m_hadName = false;              ///< itself, not by a link, at the last look
-    bool m_mayLeaveOut = false;          ///< looks, while the status is m_seen
-    int m_leftOut = 0;                   ///< looks since the last one at the name
+    std::int64_t m_readModified = 0; ///< of the contents that were read of this file; 0: unknown
+    bool m_hadName = false;          ///< itself, not by a link, at the last look
+    bool m_mayLeaveOut = false;      ///< looks, while the status is m_seen
+    int m_leftOut = 0;               ///< looks since the last one at the name
     std::int64_t m_modified = INT64_MAX; ///< latest of what was read; INT64_MAX: unknown
     std::chrono::steady_clock::time_point m_active{}; ///< when the file grew or lost its name
     bool m_waits = true;           ///< for lines that continue those at the end of the file

@@ -132,8 +132,8 @@ void FileFollower::noteHead() {
 }
 
 /// What was written between the copy and the truncation may have been read, so that the copy ends
-/// before the position. All of it was read then, although its time is younger.
-bool FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
+/// before the position. All of it was read then, although its time is younger. Returns that time.
+std::optional<std::int64_t> FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
     const auto isShortCopy = [&](const Member& member) {
         std::array<char, Tail::size> bytes;
         const std::ptrdiff_t length = member.file->readAt(bytes.data(), m_head.length, 0);
@@ -142,11 +142,13 @@ bool FileFollower::dropShortCopy(Found& found, std::int64_t offset) const {
                member.file->readAt(bytes.data(), 1, offset) <= 0;
     };
     const auto copy = std::find_if(found.younger.begin(), found.younger.end(), isShortCopy);
-    const bool hasShortCopy = copy != found.younger.end();
-    if (hasShortCopy) {
-        found.younger.erase(copy);
+    if (copy == found.younger.end()) {
+        return std::nullopt;
     }
-    return hasShortCopy;
+    Generation::Status status{};
+    copy->file->status(status);
+    found.younger.erase(copy);
+    return status.modified;
 }
 
 /// True if a file has all lines of this one that wait, with what may continue them, or if one that
@@ -167,7 +169,10 @@ char* FileFollower::recover() {
     if (m_block.isWaiting() && !hasCopyOfWaiting()) {
         return give(m_block.endWaiting());
     }
-    const LogPosition at = *position();
+    Member& truncated = m_chain.front();
+    // Else the position is in a file before this one, which was read to its end.
+    const bool isOwn = m_isInBlock || truncated.from > 0;
+    LogPosition at = isOwn ? positionInBlock() : m_position;
     const std::int64_t known = std::max(m_known, m_block.readTo());
     Found found = find(at, Search::byContents, nullptr);
     takeUnreadable(found, at.offset, known);
@@ -176,19 +181,20 @@ char* FileFollower::recover() {
         return nullptr;
     }
     m_ledger.noteTruncation();
+    if (!isOwn) {
+        found.holder.reset();
+    } else if (!found.holder) {
+        const auto copied = dropShortCopy(found, at.offset);
+        at.modified = std::max(at.modified, copied.value_or(0));
+    }
+    if (m_isInBlock) {
+        noteModified(at.modified);
+    }
     m_position = at;
     m_hasPosition = true;
     m_isInBlock = false;
-    Member& truncated = m_chain.front();
     truncated.from = 0;
     truncated.tail = Tail{};
-    // Not if the file was truncated before, and nothing in it was judged since.
-    const bool isOwn =
-        identityOf(at) == truncated.file->identity() && at.offset == m_block.offset();
-    if (isOwn && !found.holder && !dropShortCopy(found, at.offset)) {
-        // What the file has now is younger than the position, wherever the next run finds it.
-        m_position.modified = m_modified == INT64_MAX ? 0 : m_modified;
-    }
     if (found.lost.empty() && (isOwn ? !found.holder : found.younger.empty())) {
         const std::int64_t from = isOwn ? at.offset : 0;
         m_ledger.noteLost(from, std::max(from, known));

@@ -184,6 +184,17 @@ TEST_F(LateLinesTest, AFileThatGetsItsNameBackWhileStoppedIsReadOn) {
     EXPECT_EQ(looks(3), "c\n");
 }
 
+TEST_F(LateLinesTest, AreReadOnceWhenTheNextFileIsTruncatedBeforeItHasAnEntry) {
+    rename("app.log", "app.log.0");
+    append("unfinished");
+    EXPECT_EQ(looks(3), "");
+    m_directory.append("app.log.0", "late\n");
+    fs::resize_file(m_path, 0);
+    EXPECT_EQ(looks(2), "late\n");
+    append("c\n");
+    EXPECT_EQ(looks(2), "c\n");
+}
+
 TEST_F(LateLinesTest, AreTakenBack) {
     const auto position = m_follower->position();
     appendLate("late\n");
