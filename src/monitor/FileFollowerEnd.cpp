@@ -57,7 +57,7 @@ bool FileFollower::switchToNext() {
         identityOf(m_position) == finished.file->identity()) {
         continueIn(next);
     }
-    if (!finished.isComplete && !finished.isRecovery && !finished.file->isCompressed()) {
+    if (!finished.isComplete && !finished.file->isCompressed()) {
         m_late.add(std::move(finished.file), m_block.offset(), m_block.tail(), m_now.steady);
     }
     m_isTakenUp = m_isTakenUp && m_chain.size() > 1;

@@ -87,4 +87,22 @@ TEST_F(TruncatedFileTest, IsContinuedInACopyAlsoIfItHasReplacedAnotherFile) {
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(FileFollowerTest, AGenerationThatWasEmptyAtFirstIsWatchedForLateLines) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log-20260001");
+    m_directory.write("app.log-20260002", ""); // the writer has it
+    m_directory.write("app.log", "");
+    EXPECT_EQ(look(), "");
+    m_directory.append("app.log-20260002", "b\n");
+    EXPECT_EQ(looks(3), "b\n");
+    append("c\n");
+    EXPECT_EQ(looks(3), "c\n");
+    m_directory.append("app.log-20260002", "late\n");
+    EXPECT_EQ(looks(2), "late\n");
+    restart();
+    EXPECT_EQ(looks(2), "");
+}
+
 } // namespace
