@@ -74,13 +74,18 @@ bool FileFollower::hasLostName() const noexcept {
 }
 
 /// What was made after the file that is read had lost its name belongs behind it. A file before
-/// it may have been written to later.
+/// it may have been written to later. Where an empty file was that is gone makes no difference.
 void FileFollower::dropYoungerThanFirst(Found& found) {
-    const Generation& first = *m_chain.front().file;
     Generation::Status status{};
-    first.status(status);
+    const auto first =
+        std::find_if(m_chain.begin(), m_chain.end(), [&status](const Member& member) {
+            return member.file->status(status) && (status.hasName || status.size > 0);
+        });
+    if (first == m_chain.end()) {
+        return;
+    }
     const std::vector<GenerationFile> younger =
-        youngerThan(generations(), {first.identity(), status.modified});
+        youngerThan(generations(), {first->file->identity(), status.modified});
     std::erase_if(found.younger, [&younger](const Member& member) {
         return std::any_of(younger.begin(), younger.end(), [&member](const GenerationFile& file) {
             return file.identity == member.file->identity();

@@ -105,4 +105,23 @@ TEST_F(FileFollowerTest, AGenerationThatWasEmptyAtFirstIsWatchedForLateLines) {
     EXPECT_EQ(looks(2), "");
 }
 
+TEST_F(FileFollowerTest, AnEmptyFileThatIsGoneDoesNotHideOneThatIsWrittenLater) {
+    look();
+    append("a\n");
+    EXPECT_EQ(look(), "a\n");
+    rename("app.log", "app.log-20260001");
+    m_directory.write("app.log-20260002", ""); // the writer has it
+    m_directory.write("app.log", "");
+    age(m_path, 30);
+    EXPECT_EQ(look(), "");
+    rename("app.log", "app.log-20260003");
+    m_directory.append("app.log-20260002", "b\n");
+    m_directory.write("app.log-20260004", "c\n");
+    m_directory.write("app.log", "");
+    EXPECT_EQ(look(), "");
+    fs::remove(file("app.log-20260003"));
+    EXPECT_EQ(looks(4), "b\nc\n");
+    EXPECT_EQ(m_ledger.losses(), 0);
+}
+
 } // namespace
