@@ -44,7 +44,8 @@ std::string summaryOf(const EventRecord& event, const EventRow& row) {
         return row.eventText();
     }
     const std::string_view what = event.text.empty() ? event.situation : event.text;
-    return std::string(what) + " in " + std::string(event.log);
+    return std::string(row.isResolved() ? EventRow::resolvedPrefix : "") + std::string(what) +
+           " in " + std::string(event.log);
 }
 
 void writeAnnotations(JsonWriter& json, const EventRecord& event, const EventRow& row) {

@@ -50,6 +50,9 @@ EventRow::EventRow(const EventRecord& event) {
                  textOf(episode, "first"), textOf(episode, "last")};
     m_group = fieldsOf(member(json, "group"));
     m_eventText = textOf(json, "text");
+    if (isResolved() && !m_eventText.empty()) {
+        m_eventText.insert(0, resolvedPrefix);
+    }
     m_runbook = textOf(json, "runbook");
     m_labels = fieldsOf(member(json, "labels"));
     const Json* const row = &member(json, "row");

@@ -70,7 +70,11 @@ public:
     /// says of its episode.
     std::string_view description() const;
 
-    /// The text that the situation has made for this event; empty: its text is the same for all.
+    /// What the text of a resolved event begins with for people.
+    static constexpr std::string_view resolvedPrefix = "Resolved: ";
+
+    /// The text that the situation has made for this event, with resolvedPrefix if it is resolved;
+    /// empty: its text is the same for all.
     const std::string& eventText() const noexcept { return m_eventText; }
 
     /// What people read first: the text made for this event, or else the description.

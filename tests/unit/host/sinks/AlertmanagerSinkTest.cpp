@@ -79,6 +79,8 @@ TEST_F(AlertmanagerSinkTest, AnEpisodeIsOneAlertThatEndsWhenItIsResolved) {
     EXPECT_EQ(raised.at("startsAt"), resolved.at("startsAt"));
     EXPECT_EQ(raised.at("endsAt"), "2026-12-20T07:03:09.412Z");
     EXPECT_EQ(resolved.at("endsAt"), "2026-11-20T08:03:09.412Z");
+    EXPECT_EQ(resolved.at("annotations").at("summary"),
+              "Resolved: " + raised.at("annotations").at("summary").get<std::string>());
     EXPECT_EQ(resolved.at("annotations").at("count"), "74");
     EXPECT_EQ(resolved.at("annotations").at("episode"), "1");
     EXPECT_EQ(resolved.at("annotations").at("description"),

@@ -48,6 +48,15 @@ TEST(EventRow, TheNodeHasNoType) {
     EXPECT_EQ(rowOf(R"({"row":{}})").node(), "");
 }
 
+TEST(EventRow, TheTextOfAResolvedEventSaysSo) {
+    EXPECT_EQ(rowOf(R"({"state":"raised","text":"5 logins","row":{"ENTRYDESC":"a"}})").message(),
+              "5 logins");
+    const EventRow resolved = rowOf(R"({"state":"resolved","text":"74 logins"})");
+    EXPECT_EQ(resolved.message(), "Resolved: 74 logins");
+    EXPECT_EQ(resolved.eventText(), "Resolved: 74 logins");
+    EXPECT_EQ(rowOf(R"({"state":"resolved"})").message(), "resolved");
+}
+
 TEST(EventRow, JsonWithoutARowHasNoColumns) {
     for (const char* const json :
          {"", "{", "[]", "{}", R"({"row":5})", "null", R"({"row":{"A":1)"}) {
