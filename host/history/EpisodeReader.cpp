@@ -18,6 +18,11 @@ public:
         if (filter.isOpen) {
             m_sql += *filter.isOpen ? " AND state = 'open'" : " AND state = 'resolved'";
         }
+        if (filter.isAcknowledged) {
+            m_sql += *filter.isAcknowledged ? " AND acknowledged IS NOT NULL"
+                                            : " AND acknowledged IS NULL";
+        }
+        addNumbers(" AND id IN (", filter.ids);
         addAny(" AND situation IN (", filter.situations, ")");
         addAny(" AND (log IN (", filter.logs, ")");
         addAny(" OR EXISTS (SELECT 1 FROM episode_logs WHERE episode = id"
@@ -52,6 +57,17 @@ private:
         m_sql += end;
     }
 
+    void addNumbers(const char* begin, const std::vector<std::uint64_t>& values) {
+        if (values.empty()) {
+            return;
+        }
+        m_sql += begin;
+        for (const std::uint64_t value : values) {
+            m_sql += (m_sql.ends_with('(') ? "" : ",") + std::to_string(value);
+        }
+        m_sql += ')';
+    }
+
     std::string m_sql = "state <> 'pause'";
     std::vector<std::string> m_texts;
 };
@@ -84,14 +100,12 @@ std::vector<EpisodeRecord> EpisodeReader::read(Database& database, const Episode
                                " WHERE episode = ? ORDER BY log");
     Statement rows(database,
                    "SELECT id, state = 'open', situation, severity, log, groups, raised, count,"
-                   " first, last, resolved, resolved_by, reason FROM episodes WHERE " +
-                       conditions.sql() + " AND id BETWEEN ? AND ? ORDER BY id DESC LIMIT ?");
+                   " first, last, resolved, resolved_by, reason, acknowledged,"
+                   " acknowledged_by, note FROM episodes WHERE " +
+                       conditions.sql() + " AND id < ? ORDER BY id DESC LIMIT ?");
     const int parameters = conditions.bind(rows);
-    const std::uint64_t before = std::min(filter.before.value_or(largestId), largestId);
-    rows.bind(parameters + 1, std::min(filter.id.value_or(1), largestId));
-    rows.bind(parameters + 2,
-              std::min(filter.id.value_or(before == 0 ? 0 : before - 1), largestId));
-    rows.bind(parameters + 3, std::uint64_t{filter.limit});
+    rows.bind(parameters + 1, std::min(filter.before.value_or(largestId), largestId));
+    rows.bind(parameters + 2, std::uint64_t{filter.limit});
     std::vector<EpisodeRecord> episodes;
     while (rows.step()) {
         EpisodeRecord& episode = episodes.emplace_back();
@@ -108,9 +122,18 @@ std::vector<EpisodeRecord> EpisodeReader::read(Database& database, const Episode
         episode.resolved = rows.integer(10);
         episode.resolvedBy = static_cast<std::uint64_t>(rows.integer(11));
         episode.reason = rows.text(12);
+        episode.acknowledged = {rows.integer(13), std::string(rows.text(14)),
+                                std::string(rows.text(15))};
         readShares(shares, episode);
     }
     return episodes;
+}
+
+std::uint64_t EpisodeReader::countAcknowledged(Database& database) {
+    // The first condition is that of the index.
+    return static_cast<std::uint64_t>(
+        database.number("SELECT count(acknowledged) FROM episodes WHERE state <> 'resolved'"
+                        " AND state = 'open'"));
 }
 
 } // namespace zrm::host

@@ -2,6 +2,7 @@
 #define ZRM_HOST_EPISODE_READER_H
 
 #include "host/events/Episode.h"
+#include "host/history/Acknowledgements.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -20,7 +21,8 @@ struct EpisodeFilter {
     std::vector<std::string> situations = {}; ///< any of these names; empty: all
     std::vector<std::string> logs = {};       ///< any of these full paths; empty: all
     std::vector<GroupValue> group = {};       ///< values that the group has
-    std::optional<std::uint64_t> id = std::nullopt;
+    std::vector<std::uint64_t> ids = {};      ///< any of these; empty: all
+    std::optional<bool> isAcknowledged = std::nullopt;
     std::size_t limit = 100; ///< the most episodes to return
 };
 
@@ -38,6 +40,7 @@ struct EpisodeRecord {
     std::int64_t last = 0;
     std::int64_t resolved = 0;        ///< milliseconds since 1970, UTC; 0: it lasts
     std::uint64_t resolvedBy = 0;     ///< id of the event
+    Acknowledgement acknowledged;     ///< by nobody if `who` is empty
     std::string reason;               ///< why it was resolved; empty: nothing more has come
     std::vector<EpisodeShare> shares; ///< of each log; without the episode's id
 };
@@ -47,6 +50,9 @@ namespace EpisodeReader {
 
 /// The episodes that pass the filter, the newest first.
 std::vector<EpisodeRecord> read(Database& database, const EpisodeFilter& filter);
+
+/// How many of the open episodes somebody has acknowledged.
+std::uint64_t countAcknowledged(Database& database);
 
 } // namespace EpisodeReader
 

@@ -54,6 +54,14 @@ EpisodeTable::EpisodeTable(Database& database)
                            " AND groups = ?"),
       m_share(database, "INSERT OR REPLACE INTO episode_logs (episode, log, count, first, last)"
                         " VALUES (?, ?, ?, ?, ?)"),
+      m_acknowledge(database, "UPDATE episodes SET acknowledged = ?, acknowledged_by = ?, note = ?"
+                              " WHERE id = ? AND state = 'open' AND acknowledged IS NULL"
+                              " RETURNING id"),
+      m_withdraw(database, "UPDATE episodes SET acknowledged = NULL, acknowledged_by = '',"
+                           " note = '' WHERE id = ? AND state = 'open'"
+                           " AND acknowledged IS NOT NULL RETURNING id"),
+      m_find(database, "SELECT state = 'open', acknowledged IS NOT NULL FROM episodes"
+                       " WHERE id = ? AND state <> 'pause'"),
       m_remove(database, "DELETE FROM episodes WHERE id <= ? AND state <> 'open'"),
       m_removeShares(database, "DELETE FROM episode_logs WHERE episode <= ? AND NOT EXISTS"
                                " (SELECT 1 FROM episodes WHERE id = episode)") {}
@@ -87,6 +95,33 @@ void EpisodeTable::keep(const EpisodeChange& change) {
 void EpisodeTable::keep(const EpisodeShare& share) {
     m_share.bind(1, share.episode->value()).bind(2, std::string_view(share.log));
     m_share.bind(3, share.count).bind(4, share.first).bind(5, share.last).run();
+}
+
+AcknowledgementChange EpisodeTable::acknowledge(std::uint64_t episode, const Acknowledgement& by) {
+    m_acknowledge.bind(1, by.time).bind(2, std::string_view(by.who));
+    m_acknowledge.bind(3, std::string_view(by.note)).bind(4, episode);
+    const bool isDone = m_acknowledge.step();
+    m_acknowledge.reset();
+    return isDone ? AcknowledgementChange::DONE : whyNot(episode);
+}
+
+AcknowledgementChange EpisodeTable::withdraw(std::uint64_t episode) {
+    const bool isDone = m_withdraw.bind(1, episode).step();
+    m_withdraw.reset();
+    return isDone ? AcknowledgementChange::DONE : whyNot(episode);
+}
+
+AcknowledgementChange EpisodeTable::whyNot(std::uint64_t episode) {
+    auto reason = AcknowledgementChange::UNKNOWN;
+    if (m_find.bind(1, episode).step()) {
+        const bool isOpen = m_find.integer(0) != 0;
+        const bool isTaken = m_find.integer(1) != 0;
+        reason = !isOpen   ? AcknowledgementChange::RESOLVED
+                 : isTaken ? AcknowledgementChange::TAKEN
+                           : AcknowledgementChange::NOT_TAKEN;
+    }
+    m_find.reset();
+    return reason;
 }
 
 void EpisodeTable::removeUntil(std::uint64_t id) {

@@ -3,6 +3,7 @@
 
 #include "host/events/Episode.h"
 #include "host/events/Event.h"
+#include "host/history/Acknowledgements.h"
 #include "host/history/Statement.h"
 
 #include <cstdint>
@@ -32,6 +33,9 @@ public:
     void keep(const EpisodeChange& change);
     void keep(const EpisodeShare& share);
 
+    AcknowledgementChange acknowledge(std::uint64_t episode, const Acknowledgement& by);
+    AcknowledgementChange withdraw(std::uint64_t episode);
+
     /// Removes what has ended of the events up to this id.
     void removeUntil(std::uint64_t id);
 
@@ -39,10 +43,15 @@ public:
     static std::vector<StoredEpisode> open(Database& database);
 
 private:
+    AcknowledgementChange whyNot(std::uint64_t episode);
+
     Statement m_begin;
     Statement m_end;
     Statement m_endPause;
     Statement m_share;
+    Statement m_acknowledge;
+    Statement m_withdraw;
+    Statement m_find;
     Statement m_remove;
     Statement m_removeShares;
 };

@@ -182,6 +182,26 @@ Result<void> History::keep(const Silence& silence) {
     return m_writer.change([silence](HistoryFile& file) { file.keepSilences({silence}); });
 }
 
+/// The same holds for what the change leaves behind.
+Result<AcknowledgementChange>
+History::change(std::function<AcknowledgementChange(HistoryFile&)> acknowledgement) {
+    const auto outcome = std::make_shared<AcknowledgementChange>();
+    const Result<void> stored = m_writer.change(
+        [outcome, make = std::move(acknowledgement)](HistoryFile& file) { *outcome = make(file); });
+    return stored.map([&] { return *outcome; });
+}
+
+Result<AcknowledgementChange> History::acknowledge(std::uint64_t episode,
+                                                   const Acknowledgement& by) {
+    TraceScope trace(anchor);
+    return change([episode, by](HistoryFile& file) { return file.acknowledge(episode, by); });
+}
+
+Result<AcknowledgementChange> History::withdraw(std::uint64_t episode) {
+    TraceScope trace(anchor);
+    return change([episode](HistoryFile& file) { return file.withdraw(episode); });
+}
+
 template <class Work>
 auto History::reading(Work&& work) -> Result<std::invoke_result_t<Work, Database&>> {
     try {
@@ -243,6 +263,10 @@ std::uint64_t History::waitBeyond(std::uint64_t id, Clock::time_point limit,
 
 Result<std::vector<EpisodeRecord>> History::episodes(const EpisodeFilter& filter) {
     return reading([&](Database& database) { return EpisodeReader::read(database, filter); });
+}
+
+Result<std::uint64_t> History::acknowledgedEpisodes() {
+    return reading([](Database& database) { return EpisodeReader::countAcknowledged(database); });
 }
 
 HistoryState History::state() {

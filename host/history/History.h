@@ -5,6 +5,7 @@
 #include "host/config/HostConfig.h"
 #include "host/events/EventSource.h"
 #include "host/events/PositionBook.h"
+#include "host/history/Acknowledgements.h"
 #include "host/history/Cursors.h"
 #include "host/history/HistoryDirectory.h"
 #include "host/history/HistoryReader.h"
@@ -14,6 +15,7 @@
 #include "host/silences/Silences.h"
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -27,7 +29,7 @@ namespace zrm::host {
 /// The history of events: a SQLite file in a directory of its own, one writer, any number of
 /// readers, and a cursor for each sink. Set up, started and finished by one thread at a time; as a
 /// reader used by any.
-class History : public HistoryReader {
+class History : public HistoryReader, public Acknowledgements {
 public:
     /// Opens the history of this directory; a new one is made, and a corrupt one is moved aside
     /// for a new one, which is logged. Refused when there can be none.
@@ -72,13 +74,20 @@ public:
     std::uint64_t waitBeyond(std::uint64_t id, Clock::time_point limit,
                              const std::stop_token& stop) override;
     Result<std::vector<EpisodeRecord>> episodes(const EpisodeFilter& filter) override;
+    Result<std::uint64_t> acknowledgedEpisodes() override;
     HistoryState state() override;
     Result<Rates> rates(std::int64_t from, std::int64_t to, std::int64_t step) override;
+
+    Result<AcknowledgementChange> acknowledge(std::uint64_t episode,
+                                              const Acknowledgement& by) override;
+    Result<AcknowledgementChange> withdraw(std::uint64_t episode) override;
 
 private:
     History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> directory,
             std::unique_ptr<HistoryFile> file);
     Result<void> keep(const Silence& silence);
+    Result<AcknowledgementChange>
+    change(std::function<AcknowledgementChange(HistoryFile&)> acknowledgement);
     template <class Work>
     auto reading(Work&& work) -> Result<std::invoke_result_t<Work, Database&>>;
     void noteDamage(const std::vector<std::uint64_t>& events);

@@ -147,6 +147,18 @@ void HistoryFile::keepPositions(const PositionValues& positions) {
     });
 }
 
+AcknowledgementChange HistoryFile::acknowledge(std::uint64_t episode, const Acknowledgement& by) {
+    auto change = AcknowledgementChange::UNKNOWN;
+    inTransaction([&] { change = m_episodes.acknowledge(episode, by); });
+    return change;
+}
+
+AcknowledgementChange HistoryFile::withdraw(std::uint64_t episode) {
+    auto change = AcknowledgementChange::UNKNOWN;
+    inTransaction([&] { change = m_episodes.withdraw(episode); });
+    return change;
+}
+
 std::vector<std::string> HistoryFile::removeOldPositions(std::int64_t time) {
     std::vector<std::string> logs;
     inTransaction([&] { logs = m_positions.removeNotedBefore(time); });

@@ -60,6 +60,9 @@ public:
 
     /// The episodes that last, as they were stored.
     std::vector<StoredEpisode> openEpisodes() { return EpisodeTable::open(m_database); }
+    AcknowledgementChange acknowledge(std::uint64_t episode, const Acknowledgement& by);
+    AcknowledgementChange withdraw(std::uint64_t episode);
+
     /// Removes the positions of logs last followed before this time (milliseconds since 1970), and
     /// returns their names. Also removes the paths last watched before it.
     std::vector<std::string> removeOldPositions(std::int64_t time);

@@ -104,6 +104,9 @@ public:
     /// The episodes that pass the filter, the newest first.
     virtual Result<std::vector<EpisodeRecord>> episodes(const EpisodeFilter& filter) = 0;
 
+    /// How many of the open episodes somebody has acknowledged.
+    virtual Result<std::uint64_t> acknowledgedEpisodes() = 0;
+
     virtual HistoryState state() = 0;
 
     /// Entries and events per log from the step in which `from` lies to the one before `to`

@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 11> steps = {
+constexpr std::array<const char*, 12> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -81,6 +81,10 @@ constexpr std::array<const char*, 11> steps = {
     // seconds.
     "CREATE TABLE rhythms (log INTEGER NOT NULL REFERENCES logs, hour INTEGER NOT NULL,"
     " silence INTEGER NOT NULL, PRIMARY KEY (log, hour)) WITHOUT ROWID;",
+    // 12: who has acknowledged an episode, and when (milliseconds since 1970; null: nobody).
+    "ALTER TABLE episodes ADD COLUMN acknowledged INTEGER;"
+    "ALTER TABLE episodes ADD COLUMN acknowledged_by TEXT NOT NULL DEFAULT '';"
+    "ALTER TABLE episodes ADD COLUMN note TEXT NOT NULL DEFAULT '';",
 };
 
 } // namespace

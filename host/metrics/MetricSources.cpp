@@ -7,6 +7,7 @@
 #include "host/http/HttpServer.h"
 #include "host/http/RequestStatistics.h"
 #include "host/metrics/MetricText.h"
+#include "host/silences/Silences.h"
 #include "host/situations/SituationSet.h"
 
 #include <chrono>
@@ -199,13 +200,30 @@ void collectHistory(MetricText& text, const HistoryState& history) {
     text.add(history.newest);
 }
 
+/// Left out when the history cannot be read.
+void collectAcknowledged(MetricText& text, HistoryReader& history) {
+    if (const Result<std::uint64_t> acknowledged = history.acknowledgedEpisodes()) {
+        text.gauge("zrm_episodes_acknowledged", "Open episodes that somebody has acknowledged.");
+        text.add(*acknowledged);
+    }
+}
+
+void collectSilences(MetricText& text, const Silences& silences) {
+    text.gauge("zrm_silences_active", "Silences that are active.");
+    text.add(std::uint64_t{silences.activeCount(WallClock::now())});
+    text.counter("zrm_silenced_events_total", "Events that silences have kept from the sinks.");
+    text.add(silences.heldBack());
+}
+
 } // namespace
 
 void DeliveryMetrics::collect(MetricText& text) {
     collectQueue(text, m_delivery.queueState());
     collectSinks(text, m_delivery.sinkStates());
+    collectSilences(text, m_delivery.silences());
     if (HistoryReader* const history = m_delivery.history()) {
         collectHistory(text, history->state());
+        collectAcknowledged(text, *history);
     }
 }
 

@@ -50,6 +50,11 @@ std::size_t Silences::countActive(std::int64_t now) const {
                       [now](const auto& one) { return one.second.isActive(now); }));
 }
 
+std::size_t Silences::activeCount(std::int64_t now) const {
+    const std::lock_guard guard(m_mutex);
+    return countActive(now);
+}
+
 Silences::Change Silences::add(Silence silence) {
     {
         const std::lock_guard guard(m_mutex);
@@ -137,6 +142,7 @@ void Silences::count(const std::vector<SilencedEvents>& events) {
     }
     const std::lock_guard guard(m_mutex);
     for (const SilencedEvents& counted : events) {
+        m_heldBack.fetch_add(counted.events, std::memory_order_relaxed);
         if (const auto found = m_silences.find(counted.silence); found != m_silences.end()) {
             found->second.events += counted.events;
             found->second.last = std::max(found->second.last, counted.last);

@@ -79,6 +79,10 @@ public:
     /// Those that are active at a time, by id.
     std::vector<Silence> active(std::int64_t now) const;
 
+    std::size_t activeCount(std::int64_t now) const;
+    /// Events that silences have held back since the start.
+    std::uint64_t heldBack() const noexcept { return m_heldBack.load(std::memory_order_relaxed); }
+
     // For whoever stores them.
 
     /// Counts events that are stored.
@@ -94,6 +98,7 @@ private:
 
     Store m_store;
     std::atomic<std::uint64_t> m_version{1};
+    std::atomic<std::uint64_t> m_heldBack{0};
 
     mutable std::mutex m_mutex; ///< guards what follows; not held while something is stored
     std::map<std::uint64_t, Silence> m_silences;

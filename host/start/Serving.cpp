@@ -149,7 +149,7 @@ void Serving::addResources(const HostConfig& config, TableManager& entries) {
     m_reports = reports.get();
     addResource(std::move(reports));
     addResource(std::make_unique<EventsResource>(m_delivery.history()));
-    addResource(std::make_unique<EpisodesResource>(m_delivery.history()));
+    addResource(std::make_unique<EpisodesResource>(m_delivery.history(), m_delivery.history()));
     addResource(std::make_unique<SituationsResource>(m_situations));
     addResource(std::make_unique<SilencesResource>(m_delivery.silences()));
     addResource(std::make_unique<RulesResource>(config.ruleDirectories, m_situations));

@@ -6,7 +6,7 @@ from selenium.webdriver.common.keys import Keys
 
 from browser.support import REFUSED_FIELDS, fill_history, history_of
 
-VIEWS = ["logs", "logs?log=/none", "events", "situations", "situations?new", "situations?name=ssh-failed", "silences", "silences?situation=x", "reports", "try"]
+VIEWS = ["logs", "logs?log=/none", "events", "situations", "situations?new", "situations?name=ssh-failed", "episodes", "silences", "silences?situation=x", "reports", "try"]
 
 # Gives each element with text of its own whose colours are too near each other: WCAG AA.
 CONTRAST = """

@@ -106,6 +106,8 @@ EXAMPLES = [
     ("GET", "/api/v1/episodes", None, None, None),
     ("GET", "/api/v1/episodes", "/api/v1/episodes?state=open&group=ip%3D1&limit=1", None, None),
     ("GET", "/api/v1/episodes/{id}", "/api/v1/episodes/1", None, None),
+    ("POST", "/api/v1/episodes/{id}/ack", "/api/v1/episodes/1/ack", {"who": "anna"}, None),
+    ("DELETE", "/api/v1/episodes/{id}/ack", "/api/v1/episodes/1/ack", None, None),
     ("GET", "/api/v1/rates", None, None, None),
     ("GET", "/api/v1/rates", "/api/v1/rates?step=3600&log={log}", None, None),
     ("GET", "/api/v1/rules", None, None, 200),
@@ -253,6 +255,7 @@ def test_episodes_and_their_events_are_as_documented(agent):
     agent.agent_keys["log_config"] = None
     agent.follow(log, start="beginning")
     agent.situation(log=log, group_by=["ENTRYSYS"], resolve_after="1s")
+    agent.situation("lasts", log=log, resolve_after="1h")
     agent.situation("counted", log=log, group_by=["ENTRYSYS"], frequency=">= 1", period="1m", cooldown="1h")
     agent.listen = "127.0.0.1:0"
     agent.start()
@@ -268,6 +271,20 @@ def test_episodes_and_their_events_are_as_documented(agent):
     status, kind, data = exchange(api, "GET", f"/api/v1/episodes/{episode['id']}")
     check("GET", "/api/v1/episodes/{id}", status, kind, data)
     assert [event["state"] for event in json.loads(data)["events"]] == ["raised", "resolved"]
+    (lasting,) = json.loads(exchange(api, "GET", "/api/v1/episodes?state=open")[2])["episodes"]
+    ack = "/api/v1/episodes/{id}/ack"
+    for method, body, expected in (
+        ("POST", {"who": "anna", "note": "on it"}, 200),
+        ("POST", {"who": "ben"}, 409),
+        ("DELETE", None, 200),
+        ("DELETE", None, 409),
+    ):
+        status, kind, data = exchange(api, method, ack.format(id=lasting["id"]), body)
+        assert status == expected, data
+        check(method, ack, status, kind, data)
+    status, kind, data = exchange(api, "POST", ack.format(id=episode["id"]), {"who": "anna"})
+    assert (status, b"is resolved" in data) == (409, True), data
+    check("POST", ack, status, kind, data)
     for event in json.loads(exchange(api, "GET", "/api/v1/events")[2])["events"]:
         validate(DOCUMENT["components"]["schemas"]["Event"], event)
     status, kind, data = exchange(api, "GET", "/api/v1/situations")

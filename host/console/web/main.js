@@ -6,6 +6,7 @@ import { button, failure, field, fill, h, loading } from "./dom.js";
 const VIEWS = [
   ["logs", "Logs"],
   ["events", "Events"],
+  ["episodes", "Episodes"],
   ["situations", "Situations"],
   ["silences", "Silences"],
   ["reports", "Reports"],

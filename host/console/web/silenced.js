@@ -26,7 +26,7 @@ export function silencedFacts({ silenced: id }) {
 }
 
 /** Leads to a new silence for events like this one. */
-export function silenceLink(event, log) {
+export function silenceLink(event, log, text = "Silence events like this") {
   const group = Object.entries(event.group ?? {}).map(([name, value]) => [
     `group.${name}`,
     literal(value),
@@ -41,7 +41,7 @@ export function silenceLink(event, log) {
         ...Object.fromEntries(group),
       }),
     },
-    "Silence events like this",
+    text,
   );
 }
 

@@ -77,6 +77,7 @@ public:
         episodeFilter = filter;
         return storedEpisodes;
     }
+    Result<std::uint64_t> acknowledgedEpisodes() override { return 1; }
     std::uint64_t newest() const override {
         const std::lock_guard guard(m_mutex);
         return m_events.empty() ? 0 : m_events.back().id;

@@ -98,6 +98,37 @@ TEST_F(EpisodeTableTest, AResolvedOneHasItsEnd) {
     EXPECT_THAT(EpisodeTable::open(database), IsEmpty());
 }
 
+TEST_F(EpisodeTableTest, AnOpenOneIsAcknowledgedOnceUntilThatIsWithdrawn) {
+    using Change = AcknowledgementChange;
+    const Acknowledgement ann{1000, "ann", "on it"};
+    table.keep(change(7, EventJudgement::RAISED, 7));
+    table.keep(change(8, EventJudgement::RAISED, 8, "10.0.0.2"));
+    EXPECT_EQ(table.withdraw(7), Change::NOT_TAKEN);
+    EXPECT_EQ(table.acknowledge(7, ann), Change::DONE);
+    EXPECT_EQ(table.acknowledge(7, {2000, "ben", ""}), Change::TAKEN);
+    EXPECT_EQ(read({.ids = {7}}).at(0).acknowledged, ann);
+    EXPECT_THAT(ids({.isAcknowledged = true}), ElementsAre(7));
+    EXPECT_THAT(ids({.isAcknowledged = false}), ElementsAre(8));
+    EXPECT_EQ(EpisodeReader::countAcknowledged(database), 1u);
+    EXPECT_EQ(table.withdraw(7), Change::DONE);
+    EXPECT_EQ(read({.ids = {7}}).at(0).acknowledged, Acknowledgement());
+    EXPECT_EQ(EpisodeReader::countAcknowledged(database), 0u);
+}
+
+TEST_F(EpisodeTableTest, AResolvedOneKeepsItsAcknowledgementAndTakesNoOther) {
+    using Change = AcknowledgementChange;
+    table.keep(change(7, EventJudgement::RAISED, 7));
+    ASSERT_EQ(table.acknowledge(7, {1000, "ann", "x'; --"}), Change::DONE);
+    table.keep(change(9, EventJudgement::RESOLVED, 7));
+    table.keep(change(10, EventJudgement::PAUSED, 0));
+    EXPECT_EQ(table.acknowledge(7, {1000, "ben", ""}), Change::RESOLVED);
+    EXPECT_EQ(table.withdraw(7), Change::RESOLVED);
+    EXPECT_EQ(read().at(0).acknowledged.note, "x'; --");
+    EXPECT_EQ(EpisodeReader::countAcknowledged(database), 0u) << "it is not open";
+    EXPECT_EQ(table.acknowledge(9, {1000, "ann", ""}), Change::UNKNOWN);
+    EXPECT_EQ(table.acknowledge(10, {1000, "ann", ""}), Change::UNKNOWN) << "a pause";
+}
+
 TEST_F(EpisodeTableTest, APauseIsKeptOncePerGroupAndIsNoEpisode) {
     table.keep(change(7, EventJudgement::PAUSED, 0));
     table.keep(change(8, EventJudgement::PAUSED, 0, "10.0.0.2"));
@@ -125,8 +156,8 @@ TEST_F(EpisodeTableTest, FiltersSelect) {
     EXPECT_THAT(ids({.logs = {"/log"}}), ElementsAre(8, 7));
     EXPECT_THAT(ids({.group = {{"ip", "x'; --"}}}), ElementsAre(8));
     EXPECT_THAT(ids({.group = {{"user", "x'; --"}}}), IsEmpty());
-    EXPECT_THAT(ids({.id = 7}), ElementsAre(7));
-    EXPECT_THAT(ids({.id = 9}), IsEmpty());
+    EXPECT_THAT(ids({.ids = {7}}), ElementsAre(7));
+    EXPECT_THAT(ids({.ids = {9, 8, 12}}), ElementsAre(8));
     EXPECT_THAT(ids({.limit = 1}), ElementsAre(8));
 }
 
