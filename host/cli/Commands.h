@@ -61,7 +61,7 @@ private:
     bool m_check = false;
 };
 
-/// `zrmctl events [-f]`: past events, and new ones as they are raised.
+/// `zrmctl events [-f]`: past events, and new ones as they are raised; those of an episode as one.
 class EventsCommand : public Command {
 public:
     explicit EventsCommand(CLI::App& program);
@@ -76,6 +76,7 @@ private:
 
     CLI::App* m_command;
     bool m_follow = false;
+    bool m_isAll = false; ///< each event of an episode
     std::string m_after;
     std::string m_before;
     std::string m_from;

@@ -2,6 +2,7 @@
 
 #include "host/base/UrlText.h"
 #include "host/cli/Context.h"
+#include "host/cli/EventLines.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"
@@ -19,11 +20,6 @@ namespace {
 using Json = JsonText::Json;
 
 constexpr const char* route = "/api/v1/episodes";
-
-Table::Cell stateCell(const Json& episode) {
-    const std::string state = JsonText::text(episode, "state");
-    return {state, state == "open" ? Colour::BAD : Colour::NONE};
-}
 
 std::string groupOf(const Json& episode) {
     std::string text;
@@ -53,6 +49,7 @@ void EpisodesCommand::addFilters(CLI::App& command) {
         command.add_option(name, values, help)->type_name(type)->allow_extra_args(false);
     };
     command.add_option("--state", m_state, "open or resolved")->type_name("STATE");
+    command.add_flag("--unacknowledged", m_isUnacknowledged, "That nobody has acknowledged");
     anyOf("--situation", m_situations, "NAME", "Of this situation; may be repeated");
     anyOf("--log", m_logs, "LOG", "With entries of this log; may be repeated");
     anyOf("--group", m_groups, "NAME=VALUE", "Whose group has this value; may be repeated");
@@ -80,6 +77,9 @@ CliStatus EpisodesCommand::list(Context& context) {
     if (!m_state.empty()) {
         query.emplace("state", m_state);
     }
+    if (m_isUnacknowledged) {
+        query.emplace("acknowledged", "false");
+    }
     if (m_limit > 0) {
         query.emplace("limit", std::to_string(m_limit));
     }
@@ -95,14 +95,17 @@ CliStatus EpisodesCommand::list(Context& context) {
                  {"FIRST", Table::FIXED},
                  {"LAST", Table::FIXED},
                  {"COUNT", Table::NUMBER},
+                 {"WHO"},
                  {"GROUP"}});
     const Json& episodes = JsonText::member(answer, "episodes");
     for (auto episode = episodes.rbegin(); episode != episodes.rend(); ++episode) {
-        table.add({JsonText::text(*episode, "id"), stateCell(*episode),
+        table.add({JsonText::text(*episode, "id"), EventLines::stateOf(*episode),
                    JsonText::text(*episode, "severity"), JsonText::text(*episode, "situation"),
                    TimeDisplay::local(JsonText::text(*episode, "first")),
                    TimeDisplay::local(JsonText::text(*episode, "last")),
-                   JsonText::text(*episode, "count"), groupOf(*episode)});
+                   JsonText::text(*episode, "count"),
+                   JsonText::text(JsonText::member(*episode, "acknowledged"), "who"),
+                   groupOf(*episode)});
     }
     if (table.empty()) {
         Context::note("no such episode");
@@ -122,6 +125,11 @@ CliStatus EpisodesCommand::show(Context& context) {
     facts.add("situation", JsonText::text(episode, "situation"));
     facts.add("state", JsonText::text(episode, "state"),
               JsonText::text(episode, "state") == "open" ? Colour::BAD : Colour::NONE);
+    if (const Json& by = JsonText::member(episode, "acknowledged"); by.is_object()) {
+        facts.add("acknowledged", "by " + JsonText::text(by, "who") + ", " +
+                                      TimeDisplay::local(JsonText::text(by, "time")));
+        facts.add("note", JsonText::text(by, "note"));
+    }
     facts.add("reason", JsonText::text(episode, "reason"));
     facts.add("severity", JsonText::text(episode, "severity"));
     for (const auto& [name, value] : JsonText::member(episode, "group").items()) {

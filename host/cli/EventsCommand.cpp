@@ -2,16 +2,15 @@
 
 #include "host/cli/CliError.h"
 #include "host/cli/Context.h"
-#include "host/cli/DisplayText.h"
 #include "host/cli/EventFollower.h"
+#include "host/cli/EventLines.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/StopSignals.h"
-#include "host/cli/Table.h"
-#include "host/cli/TimeDisplay.h"
 
 #include <algorithm>
 #include <charconv>
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <system_error>
 #include <utility>
@@ -28,68 +27,6 @@ using Json = JsonText::Json;
 constexpr unsigned usualLimit = 100;
 constexpr unsigned usualBeforeFollowing = 10;
 
-Colour colourOf(const std::string& severity) {
-    if (severity == "critical" || severity == "major") {
-        return Colour::BAD;
-    }
-    return severity == "info" ? Colour::NONE : Colour::NOTICE;
-}
-
-std::string logOf(const Json& event) {
-    if (!event.contains("row")) {
-        return JsonText::text(event, "log");
-    }
-    const Json& row = JsonText::member(event, "row");
-    const std::string name = JsonText::text(row, "ULOGNAME");
-    return name.empty() ? JsonText::text(row, "LOGPATH") + JsonText::text(row, "LOGNAME")
-                        : JsonText::text(row, "ULOGPATH") + name;
-}
-
-/// What an event without an entry says of its episode.
-std::string summaryOf(const Json& event) {
-    const Json& episode = JsonText::member(event, "episode");
-    std::string text = JsonText::text(event, "state");
-    if (event.contains("reason")) {
-        text += ": " + JsonText::text(event, "reason");
-    }
-    if (const std::uint64_t count = JsonText::number(episode, "count"); count > 0) {
-        text += "; " + std::to_string(count) + (count == 1 ? " entry" : " entries") + " from " +
-                TimeDisplay::local(JsonText::text(episode, "first")) + " to " +
-                TimeDisplay::local(JsonText::text(episode, "last"));
-    }
-    return text;
-}
-
-/// The text made for the event; or else the values of its group before the text of its entry.
-/// Before both, the silence that holds the event back.
-std::string entryOf(const Json& event) {
-    std::string group;
-    if (const std::string silence = JsonText::text(event, "silenced"); !silence.empty()) {
-        group = "[silence " + silence + "] ";
-    }
-    if (const std::string text = JsonText::text(event, "text"); !text.empty()) {
-        return group + (JsonText::text(event, "state") == "resolved" ? "Resolved: " : "") + text;
-    }
-    for (const auto& [name, value] : JsonText::member(event, "group").items()) {
-        group += name + '=' + JsonText::text(value) + ' ';
-    }
-    if (!event.contains("row")) {
-        return group + summaryOf(event);
-    }
-    const Json& row = JsonText::member(event, "row");
-    const auto either = [&](const char* utf8, const char* local) {
-        const std::string text = JsonText::text(row, utf8);
-        return text.empty() ? JsonText::text(row, local) : text;
-    };
-    const std::string source = either("UENTRYSRC", "ENTRYSRC");
-    return group + (source.empty() ? "" : source + ": ") + either("UENTRYDESC", "ENTRYDESC");
-}
-
-std::string padded(const std::string& text, std::size_t columns) {
-    const std::size_t width = DisplayText::width(text);
-    return text + std::string(width < columns ? columns - width : 0, ' ');
-}
-
 /// The number of an event; none when it is no such number.
 std::optional<std::int64_t> numberOf(const std::string& text) {
     std::int64_t number = 0;
@@ -103,58 +40,53 @@ std::string problemOfNumber(const std::string& text) {
     return numberOf(text) ? "" : '\'' + text + "' is not the id of an event";
 }
 
-/// One event while following: what comes next is not known, so columns have a width of their own.
-std::string lineOf(const Json& event, const Terminal& terminal) {
-    constexpr std::size_t severityColumns = 8;
-    constexpr std::size_t situationColumns = 20;
-    const std::string severity = DisplayText::visible(JsonText::text(event, "severity"));
-    const std::string head = padded(JsonText::text(event, "id"), 6) + "  " +
-                             TimeDisplay::local(JsonText::text(event, "raised")) + "  ";
-    const std::string tail =
-        padded(DisplayText::visible(JsonText::text(event, "situation")), situationColumns) + "  " +
-        DisplayText::visible(entryOf(event));
-    const std::size_t before = head.size() + severityColumns + 2;
-    const std::size_t room = terminal.width > before ? terminal.width - before : 1;
-    return head + terminal.coloured(padded(severity, severityColumns), colourOf(severity)) + "  " +
-           (terminal.width > 0 ? DisplayText::shortened(tail, room, terminal.ellipsis()) : tail) +
-           '\n';
-}
-
-std::string tableText(const Json& events, const Terminal& terminal) {
-    Table table({{"ID", Table::NUMBER},
-                 {"RAISED", Table::FIXED},
-                 {"SEVERITY", Table::FIXED},
-                 {"SITUATION"},
-                 {"LOG", Table::PATH},
-                 {"ENTRY"}});
-    for (const Json& event : events) {
-        const std::string severity = JsonText::text(event, "severity");
-        table.add({JsonText::text(event, "id"),
-                   TimeDisplay::local(JsonText::text(event, "raised")),
-                   {severity, colourOf(severity)},
-                   JsonText::text(event, "situation"),
-                   logOf(event),
-                   entryOf(event)});
-    }
-    return table.text(terminal);
-}
-
 struct Found {
     Json events = Json::array(); ///< newest first
     std::uint64_t newest = 0;    ///< the newest id of the whole history
 };
 
+/// Events, newest first, in which an episode has one place: that of its latest event. Its beginning
+/// says more than its end.
+class ByEpisode {
+public:
+    explicit ByEpisode(Json& events) : m_events(events) {}
+
+    void add(const Json& event) {
+        const std::uint64_t episode = EventLines::episodeOf(event);
+        if (episode == 0) {
+            m_events.push_back(event);
+            return;
+        }
+        const auto [place, isNew] = m_places.emplace(episode, m_events.size());
+        if (isNew) {
+            m_events.push_back(event);
+        } else {
+            m_events[place->second] = event;
+        }
+    }
+
+private:
+    Json& m_events;
+    std::map<std::uint64_t, std::size_t> m_places;
+};
+
 /// The latest events that the query asks for, at most `limit`. A search for a text takes the
 /// agent several requests.
-Found find(Context& context, std::multimap<std::string, std::string> query, std::size_t limit) {
+Found find(Context& context, std::multimap<std::string, std::string> query, std::size_t limit,
+           bool isByEpisode) {
     Found found;
+    ByEpisode episodes(found.events);
     std::uint64_t before = UINT64_MAX;
     for (bool isMore = true; isMore && found.events.size() < limit;) {
         query.erase("limit");
         query.emplace("limit", std::to_string(limit - found.events.size()));
         const Json answer = context.client().get("/api/v1/events", query);
         for (const Json& event : JsonText::member(answer, "events")) {
-            found.events.push_back(event);
+            if (isByEpisode) {
+                episodes.add(event);
+            } else {
+                found.events.push_back(event);
+            }
         }
         for (const Json& id : JsonText::member(answer, "damaged")) {
             Context::note("event " + JsonText::text(id) +
@@ -170,6 +102,29 @@ Found find(Context& context, std::multimap<std::string, std::string> query, std:
     return found;
 }
 
+/// The episodes of events, by id, as they are now. Those that have expired are missing.
+EventLines::Episodes episodesOf(Context& context, const Json& events) {
+    constexpr std::size_t atOnce = 100; // the agent takes no more
+    std::vector<std::string> ids;
+    for (const Json& event : events) {
+        if (const std::uint64_t id = EventLines::episodeOf(event); id > 0) {
+            ids.push_back(std::to_string(id));
+        }
+    }
+    EventLines::Episodes episodes;
+    for (std::size_t begin = 0; begin < ids.size(); begin += atOnce) {
+        AgentClient::Query query{{"limit", std::to_string(atOnce)}};
+        for (std::size_t at = begin; at < std::min(begin + atOnce, ids.size()); ++at) {
+            query.emplace("id", ids[at]);
+        }
+        const Json answer = context.client().get("/api/v1/episodes", query);
+        for (const Json& episode : JsonText::member(answer, "episodes")) {
+            episodes.emplace(JsonText::number(episode, "id"), episode);
+        }
+    }
+    return episodes;
+}
+
 } // namespace
 
 EventsCommand::EventsCommand(CLI::App& program)
@@ -180,6 +135,7 @@ EventsCommand::EventsCommand(CLI::App& program)
         m_command->add_option(name, values, help)->type_name(type)->allow_extra_args(false);
     };
     m_command->add_flag("-f,--follow", m_follow, "Continue with new events until Ctrl-C");
+    m_command->add_flag("--all", m_isAll, "Each event, also the second one of an episode");
     m_command->add_option("--after", m_after, "Events after this one")
         ->type_name("ID")
         ->check(problemOfNumber);
@@ -235,7 +191,8 @@ CliStatus EventsCommand::list(Context& context) {
     add("before", m_before);
     add("from", m_from.empty() ? "" : Context::time("--from", m_from));
     add("to", m_to.empty() ? "" : Context::time("--to", m_to));
-    Json events = find(context, query, m_limit > 0 ? m_limit : usualLimit).events;
+    const bool isByEpisode = !m_isAll && !context.options().json;
+    Json events = find(context, query, m_limit > 0 ? m_limit : usualLimit, isByEpisode).events;
     std::reverse(events.begin(), events.end()); // the newest is next to the prompt
     if (events.empty()) {
         Context::note("no such event");
@@ -245,8 +202,10 @@ CliStatus EventsCommand::list(Context& context) {
         for (const Json& event : events) {
             context.print(JsonText::dump(event, true) + '\n');
         }
+    } else if (isByEpisode) {
+        context.print(EventLines::table(events, episodesOf(context, events), context.terminal()));
     } else {
-        context.print(tableText(events, context.terminal()));
+        context.print(EventLines::table(events, context.terminal()));
     }
     return CliStatus::DONE;
 }
@@ -259,9 +218,11 @@ CliStatus EventsCommand::follow(Context& context) {
     StopSignals signals;
     AgentClient& client = context.client();
     std::multimap<std::string, std::string> query = filters();
+    const bool isByEpisode = !m_isAll && !context.options().json;
     const auto show = [&](const Json& event) {
-        context.print(context.options().json ? JsonText::dump(event, true) + '\n'
-                                             : lineOf(event, context.terminal()));
+        context.print(context.options().json
+                          ? JsonText::dump(event, true) + '\n'
+                          : EventLines::line(event, context.terminal(), isByEpisode));
     };
     std::uint64_t after = 0;
     if (!m_after.empty()) {
@@ -270,7 +231,8 @@ CliStatus EventsCommand::follow(Context& context) {
         if (!m_from.empty()) {
             query.emplace("from", Context::time("--from", m_from));
         }
-        const Found found = find(context, query, m_limit > 0 ? m_limit : usualBeforeFollowing);
+        const Found found =
+            find(context, query, m_limit > 0 ? m_limit : usualBeforeFollowing, false);
         std::for_each(found.events.rbegin(), found.events.rend(), show);
         after = found.newest;
     }

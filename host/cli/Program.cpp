@@ -66,6 +66,7 @@ Program::Program()
     m_commands.push_back(std::make_unique<LogsCommand>(*m_app));
     m_commands.push_back(std::make_unique<EventsCommand>(*m_app));
     m_commands.push_back(std::make_unique<EpisodesCommand>(*m_app));
+    m_commands.push_back(std::make_unique<AckCommand>(*m_app));
     m_commands.push_back(std::make_unique<ReportCommand>(*m_app));
     m_commands.push_back(std::make_unique<SituationsCommand>(*m_app));
     m_commands.push_back(std::make_unique<SilenceCommand>(*m_app));

@@ -47,6 +47,8 @@ def test_a_rule_is_a_situation(agent, log):
     assert end["state"] == "resolved" and end["episode"]["id"] == event["id"]
     token = ["--url", f"http://127.0.0.1:{Api(agent).port}", "--token-file", str(agent.directory / "state/api-token")]
     shown = run([*token, "events"])[1].splitlines()
+    assert len(shown) == 2 and shown[1].endswith(f"  {event['text']}") and "  resolved  " in shown[1]
+    shown = run([*token, "events", "--all"])[1].splitlines()
     assert shown[1].endswith(f"  {event['text']}") and f"  Resolved: {end['text']}" in shown[2]
 
 
