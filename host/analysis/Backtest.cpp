@@ -105,7 +105,7 @@ public:
         }
         return false; // no row is kept
     }
-    void give(const zrm_rmlogent_data_t&) override {}
+    void give(const zrm_rmlogent_data_t&, const FollowedReport::Detail&) override {}
     void progress(std::int64_t, std::int64_t) override {}
 
     /// What the last file had is newest first from now on.

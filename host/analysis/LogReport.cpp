@@ -1,7 +1,9 @@
 #include "host/analysis/LogReport.h"
 
 #include "base/ProcessValues.h"
+#include "framework/LogEntry.h"
 #include "host/analysis/MonitoredLogs.h"
+#include "host/events/FieldsJson.h"
 #include "host/framework/RequestLimit.h"
 #include "host/framework/Sample.h"
 #include "host/framework/TraceCapture.h"
@@ -27,13 +29,22 @@ constexpr std::chrono::seconds sampleLimit{32};
 
 class FilteredRows : public FollowedReport::Receiver {
 public:
-    FilteredRows(EntryFilter& filter, LogReport::Receiver& receiver)
-        : m_filter(filter), m_receiver(receiver) {}
+    FilteredRows(EntryFilter& filter, const std::vector<std::string>& fields,
+                 LogReport::Receiver& receiver)
+        : m_filter(filter), m_fields(fields), m_receiver(receiver) {}
 
     bool meets(zrm_rmlogent_data_t& row) override { return m_filter.meets(row); }
-    void give(const zrm_rmlogent_data_t& row) override {
+    FollowedReport::Detail describe() override {
+        LogEntry* const entry = LogEntry::ofThisThread;
+        if (m_fields.empty() || entry == nullptr) {
+            return {};
+        }
+        FieldsJson fields = FieldsJson::of(entry->fields(), m_fields, LogReport::mostFieldBytes);
+        return {std::move(fields.text), fields.isCut};
+    }
+    void give(const zrm_rmlogent_data_t& row, const FollowedReport::Detail& fields) override {
         ++count;
-        m_receiver.row(reinterpret_cast<const char*>(&row));
+        m_receiver.row(reinterpret_cast<const char*>(&row), fields);
     }
     void progress(std::int64_t read, std::int64_t total) override {
         m_receiver.progress(read, total);
@@ -43,6 +54,7 @@ public:
 
 private:
     EntryFilter& m_filter;
+    const std::vector<std::string>& m_fields;
     LogReport::Receiver& m_receiver;
 };
 
@@ -104,7 +116,7 @@ LogReport::Result LogReport::run(Receiver& receiver) {
 
 LogReport::Result LogReport::runSource(Receiver& receiver) {
     const TraceSilence silence; // a line that does not fit is counted, not traced
-    FilteredRows rows(m_filter, receiver);
+    FilteredRows rows(m_filter, m_query.fields, receiver);
     m_source->run(rows);
     return {rows.count,
             m_source->isLimited(),
@@ -118,7 +130,7 @@ LogReport::Result LogReport::runFollowed(Receiver& receiver) {
     FollowedReport report(
         m_path, *m_reader,
         {m_query.from, m_query.to, m_query.limit, m_settings->rotatedTo, m_settings->join.value});
-    FilteredRows rows(m_filter, receiver);
+    FilteredRows rows(m_filter, m_query.fields, receiver);
     report.run(rows);
     return {rows.count,
             report.isLimited(),
@@ -141,7 +153,7 @@ LogReport::Result LogReport::runSample(Receiver& receiver) const {
     const bool wasLimitReached = limit.wasReached();
     result.count = std::min(sample->size(), m_query.limit);
     for (std::size_t index = 0; index < result.count; ++index) {
-        receiver.row(sample->row(index));
+        receiver.row(sample->row(index), {});
     }
     // The agent counts the rows that it reads, before the conditions.
     result.isTruncated =

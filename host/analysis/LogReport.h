@@ -30,6 +30,7 @@ struct ReportQuery {
     std::vector<Condition> where;      ///< all must hold
     std::vector<Condition> conditions; ///< all of the above, in the form that the table takes
     std::size_t limit = 1000;          ///< rows
+    std::vector<std::string> fields;   ///< that rows have; "*" means all
 };
 
 /// Why a report did not read all that was asked for, as a clause; empty if it did.
@@ -41,11 +42,17 @@ std::string reasonOf(const SourceReport& report);
 /// configuration is read by a sample of Log Entries, as it always is. One thread at a time.
 class LogReport {
 public:
+    /// Bytes of the names and values that a row has of the fields that were asked for.
+    static constexpr std::size_t mostFieldBytes = 16 * 1024;
+
+    /// The fields of a row: a JSON object, empty if it has none of them, and whether it is cut.
+    using Fields = FollowedReport::Detail;
+
     class Receiver {
     public:
         virtual ~Receiver() = default;
         /// A row that meets the conditions; they come newest first.
-        virtual void row(const char* row) = 0;
+        virtual void row(const char* row, const Fields& fields) = 0;
         /// How many of all bytes were read or passed over so far. Only for a followed log.
         virtual void progress(std::int64_t read, std::int64_t total) = 0;
     };
@@ -68,6 +75,8 @@ public:
     /// False if the agent cannot take any more requests; run must not be called then.
     bool isOpen() const noexcept { return m_filter.isOpen(); }
     const RowLayout& layout() const { return m_filter.layout(); }
+    /// False for a log of the log configuration, whose entries have no fields.
+    bool hasFields() const noexcept { return m_source != nullptr || m_settings != nullptr; }
 
     /// Reads the log, once. Ends early when the thread's RequestLimit is reached. No row is given
     /// while a refresh would have to wait, so the receiver may wait for its client.

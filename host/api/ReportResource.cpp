@@ -1,5 +1,6 @@
 #include "host/api/ReportResource.h"
 
+#include "base/EntryFields.h"
 #include "base/TraceScope.h"
 #include "host/api/ReportStream.h"
 #include "host/base/TimeText.h"
@@ -51,6 +52,26 @@ std::vector<Condition> readLog(JsonFields& fields, const std::string& log) {
     return std::move(*conditions);
 }
 
+/// The names of fields. What looks like the name in a condition is refused.
+std::vector<std::string> readFieldNames(JsonFields& fields) {
+    std::vector<std::string> names = fields.texts("fields", EntryFields::most);
+    for (std::size_t index = 0; index < names.size(); ++index) {
+        const std::string& name = names[index];
+        const auto refuse = [&](const std::string& what, const std::string& cure) {
+            fields.refuse("fields[" + std::to_string(index) + "]", {what, cure, ""});
+        };
+        if (name.empty() || name.size() > EntryFields::longestName) {
+            refuse("is not the name of a field", "write 1 to " +
+                                                     std::to_string(EntryFields::longestName) +
+                                                     " bytes, or \"*\" for all fields");
+        }
+        if (name.starts_with("field.")) {
+            refuse("'" + name + "' begins with 'field.'", "write '" + name.substr(6) + "'");
+        }
+    }
+    return names;
+}
+
 Condition bound(_IntfOper op, std::string stamp) {
     Condition condition;
     condition.column = "ENTRYTIME";
@@ -71,6 +92,7 @@ ReportRequest ReportRequest::parse(std::string_view body) {
     const std::vector<std::string> where = fields.texts("where", mostConditions);
     report.limit = static_cast<std::size_t>(fields.optionalNumber("limit", 1, mostRows)
                                                 .value_or(static_cast<std::int64_t>(report.limit)));
+    report.fields = readFieldNames(fields);
     fields.refuseUnknown();
     if (report.from > report.to) {
         fields.refuse("to", "is before from");
@@ -183,6 +205,11 @@ HttpAnswer ReportResource::report(const HttpRequest& request) {
     }
     if (!report->isOpen()) {
         throw RequestRefused(503, "the agent cannot take any more requests", "");
+    }
+    if (!wanted.fields.empty() && !report->hasFields()) {
+        throw RequestRefused(400,
+                             {"the entries of a log of the log configuration have no fields",
+                              "leave out 'fields', or monitor the log with [[log]]", "fields"});
     }
     const bool isLines = request.accept.find(lines) != std::string::npos;
     const auto stream = std::make_shared<ReportStream>(std::move(wanted), std::move(report),

@@ -18,8 +18,8 @@ namespace zrm::host {
 struct ReportRequest : ReportQuery {
     static constexpr std::int64_t mostRows = 10'000;
 
-    /// Reads {"log", "from", "to", "where": [condition, ..], "limit"}; without `to`, up to the
-    /// newest entry. Throws RequestRefused.
+    /// Reads {"log", "from", "to", "where": [condition, ..], "fields": [name, ..], "limit"};
+    /// without `to`, up to the newest entry. Throws RequestRefused.
     static ReportRequest parse(std::string_view body);
 };
 

@@ -141,13 +141,26 @@ void ReportStream::writeTail(JsonWriter& json, const LogReport::Result& result) 
     json.endArray().member("max_rows", gMaxRows);
 }
 
-void ReportStream::row(const char* row) {
+void ReportStream::writeRow(JsonWriter& json, const char* row,
+                            const LogReport::Fields& fields) const {
+    json.beginObject();
+    m_format.writeMembers(json, row);
+    if (!m_query.fields.empty()) {
+        json.key("fields").raw(fields.text.empty() ? "{}" : fields.text);
+    }
+    if (fields.isCut) {
+        json.member("fields_cut", true);
+    }
+    json.endObject();
+}
+
+void ReportStream::row(const char* row, const LogReport::Fields& fields) {
     if (m_form == Form::document) {
-        m_format.write(*m_json, row);
+        writeRow(*m_json, row, fields);
     } else {
         JsonWriter::append(m_text, [&](JsonWriter& json) {
             json.beginObject().key("row");
-            m_format.write(json, row);
+            writeRow(json, row, fields);
             json.endObject();
         });
         m_text += '\n';

@@ -46,9 +46,10 @@ public:
     void cancel();
 
 private:
-    void row(const char* row) override;
+    void row(const char* row, const LogReport::Fields& fields) override;
     void progress(std::int64_t read, std::int64_t total) override;
 
+    void writeRow(JsonWriter& json, const char* row, const LogReport::Fields& fields) const;
     bool waitForChannel();
     bool isWanted();
     void endChannel();

@@ -106,6 +106,7 @@ private:
     std::string m_to = "now";
     std::vector<std::string> m_where;
     std::vector<std::string> m_columns;
+    std::vector<std::string> m_fields; ///< without "field."
     std::string m_format = "table";
     std::size_t m_limit = 1000;
 };

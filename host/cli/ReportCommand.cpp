@@ -14,6 +14,7 @@
 #include <array>
 #include <cstdint>
 #include <iterator>
+#include <set>
 #include <string_view>
 #include <utility>
 
@@ -51,7 +52,7 @@ std::vector<std::string> chosen(std::vector<std::string> asked, const Json& know
     return asked;
 }
 
-/// The answer with these columns alone.
+/// The answer with these columns alone, and the fields that it has.
 Json withColumns(Json answer, const std::vector<std::string>& columns) {
     answer["columns"] = columns;
     for (Json& row : answer["rows"]) {
@@ -59,9 +60,50 @@ Json withColumns(Json answer, const std::vector<std::string>& columns) {
         for (const std::string& column : columns) {
             chosen[column] = JsonText::member(row, column);
         }
+        for (const char* const key : {"fields", "fields_cut"}) {
+            if (row.contains(key)) {
+                chosen[key] = std::move(row[key]);
+            }
+        }
         row = std::move(chosen);
     }
     return answer;
+}
+
+/// A field as the heading of a column, as in conditions.
+const std::string fieldPrefix = "field.";
+
+/// What a row has in a column, or in the field that it names.
+const Json& cell(const Json& row, const std::string& column) {
+    return column.starts_with(fieldPrefix) ? JsonText::member(JsonText::member(row, "fields"),
+                                                              column.substr(fieldPrefix.size()))
+                                           : JsonText::member(row, column);
+}
+
+bool areAll(const std::vector<std::string>& fields) {
+    return std::find(fields.begin(), fields.end(), "*") != fields.end();
+}
+
+/// The columns for these fields; for all of them those that the rows have, in the order in which
+/// they occur.
+std::vector<std::string> fieldColumns(const std::vector<std::string>& fields, const Json& rows) {
+    std::vector<std::string> columns;
+    std::set<std::string> known;
+    const auto add = [&](const std::string& name) {
+        if (known.insert(name).second) {
+            columns.push_back(fieldPrefix + name);
+        }
+    };
+    if (!areAll(fields)) {
+        std::for_each(fields.begin(), fields.end(), add);
+        return columns;
+    }
+    for (const Json& row : rows) {
+        for (const auto& field : JsonText::member(row, "fields").items()) {
+            add(field.key());
+        }
+    }
+    return columns;
 }
 
 bool isTime(std::string_view column) {
@@ -84,7 +126,7 @@ std::string tableText(const Json& rows, const std::vector<std::string>& columns,
     for (const Json& row : rows) {
         std::vector<Table::Cell> cells;
         for (const std::string& column : columns) {
-            const std::string value = JsonText::text(row, column);
+            const std::string value = JsonText::text(cell(row, column));
             cells.emplace_back(isTime(column) ? TimeDisplay::stamp(value) : value);
         }
         table.add(std::move(cells));
@@ -95,12 +137,13 @@ std::string tableText(const Json& rows, const std::vector<std::string>& columns,
 /// A value as a field: times are readable, nothing steers a terminal, and no spreadsheet takes a
 /// text for a formula.
 std::string csvField(const Json& row, const std::string& column) {
-    const std::string text = JsonText::text(row, column);
+    const Json& value = cell(row, column);
+    const std::string text = JsonText::text(value);
     if (isTime(column)) {
         return TimeDisplay::stamp(text);
     }
     const std::string visible = DisplayText::visible(text);
-    const bool isFormula = JsonText::member(row, column).is_string() && !visible.empty() &&
+    const bool isFormula = value.is_string() && !visible.empty() &&
                            std::string_view("=+-@").find(visible.front()) != std::string_view::npos;
     return isFormula ? '\'' + visible : visible;
 }
@@ -136,6 +179,12 @@ ReportCommand::ReportCommand(CLI::App& program)
         ->type_name("NAMES")
         ->delimiter(',')
         ->allow_extra_args(false);
+    m_command
+        ->add_option("--fields", m_fields,
+                     "The fields to show after the columns, separated by commas; * for all")
+        ->type_name("NAMES")
+        ->delimiter(',')
+        ->allow_extra_args(false);
     m_command->add_option("--format", m_format, "table, json or csv (default table)")
         ->type_name("FORMAT")
         ->check(CLI::IsMember({"table", "json", "csv"}));
@@ -154,7 +203,8 @@ public:
     Receiver(const ReportCommand& command, const Context& context)
         : m_command(command), m_context(context),
           m_isJson(context.options().json || command.m_format == "json"),
-          m_isCsv(!m_isJson && command.m_format == "csv") {}
+          m_isCsv(!m_isJson && command.m_format == "csv"),
+          m_isWritten(m_isCsv && !areAll(command.m_fields)) {}
 
     /// One line of the agent's answer.
     void take(Json&& line);
@@ -163,6 +213,10 @@ public:
 
 private:
     void begin(const Json& head);
+    /// Headings of CSV, whose rows may follow.
+    void beginCsv();
+    /// Adds the columns of the fields to those of the table.
+    void addFieldColumns();
     void flush();
     void printTable();
     void notes() const;
@@ -171,10 +225,12 @@ private:
     const Context& m_context;
     const bool m_isJson;
     const bool m_isCsv;
+    const bool m_isWritten; ///< each row at once; false: the rows decide on the columns
     ProgressLine m_progress;
     std::vector<std::string> m_columns; ///< those that were asked for
     Json m_answer;
     std::size_t m_count = 0; ///< rows received
+    std::size_t m_cut = 0;   ///< of these, rows whose fields are cut
     std::string m_text;      ///< to be written
 };
 
@@ -183,7 +239,8 @@ void ReportCommand::Receiver::take(Json&& line) {
         begin(line["begin"]);
     } else if (line.contains("row")) {
         ++m_count;
-        if (m_isCsv) {
+        m_cut += line["row"].contains("fields_cut") ? 1 : 0;
+        if (m_isWritten) {
             m_text += csvRecord(line["row"], m_columns);
         } else {
             m_answer["rows"].push_back(std::move(line["row"]));
@@ -206,12 +263,22 @@ void ReportCommand::Receiver::begin(const Json& head) {
     m_answer["rows"] = Json::array();
     const Json& known = JsonText::member(m_answer, "columns");
     m_columns = chosen(m_command.m_columns, known);
-    if (m_isCsv) {
-        if (m_columns.empty()) {
-            m_columns = known.get<std::vector<std::string>>();
-        }
-        m_text = CsvText::record(m_columns);
+    if (m_isCsv && m_columns.empty()) {
+        m_columns = known.get<std::vector<std::string>>();
     }
+    if (m_isWritten) {
+        beginCsv();
+    }
+}
+
+void ReportCommand::Receiver::beginCsv() {
+    addFieldColumns();
+    m_text = CsvText::record(m_columns);
+}
+
+void ReportCommand::Receiver::addFieldColumns() {
+    const std::vector<std::string> fields = fieldColumns(m_command.m_fields, m_answer["rows"]);
+    m_columns.insert(m_columns.end(), fields.begin(), fields.end());
 }
 
 void ReportCommand::Receiver::flush() {
@@ -222,6 +289,12 @@ void ReportCommand::Receiver::flush() {
 }
 
 CliStatus ReportCommand::Receiver::finish() {
+    if (m_isCsv && !m_isWritten) {
+        beginCsv();
+        for (const Json& row : m_answer["rows"]) {
+            m_text += csvRecord(row, m_columns);
+        }
+    }
     flush();
     m_progress.clear();
     if (m_isJson) {
@@ -243,6 +316,7 @@ void ReportCommand::Receiver::printTable() {
         std::copy_if(usualColumns.begin(), usualColumns.end(), std::back_inserter(m_columns),
                      [&](const char* column) { return hasAny(rows, column); });
     }
+    addFieldColumns();
     m_context.print(tableText(rows, m_columns, m_context.terminal()));
 }
 
@@ -252,6 +326,11 @@ void ReportCommand::Receiver::notes() const {
         Context::note(std::to_string(skipped) +
                       (skipped == 1 ? " line that is not an entry was passed over"
                                     : " lines that are not entries were passed over"));
+    }
+    if (m_cut > 0) {
+        Context::note("not all fields of " + std::to_string(m_cut) +
+                      (m_cut == 1 ? " entry are shown: it has" : " entries are shown: each has") +
+                      " more than a row may have; ask for fewer with --fields");
     }
     bool hasProblem = false;
     for (const Json& file : JsonText::member(m_answer, "files")) {
@@ -276,11 +355,14 @@ void ReportCommand::Receiver::notes() const {
 }
 
 CliStatus ReportCommand::run(Context& context) {
-    const Json body = {{"log", m_log},
-                       {"from", Context::time("--from", m_from)},
-                       {"to", Context::time("--to", m_to)},
-                       {"where", m_where},
-                       {"limit", m_limit}};
+    Json body = {{"log", m_log},
+                 {"from", Context::time("--from", m_from)},
+                 {"to", Context::time("--to", m_to)},
+                 {"where", m_where},
+                 {"limit", m_limit}};
+    if (!m_fields.empty()) {
+        body["fields"] = m_fields;
+    }
     Receiver receiver(*this, context);
     context.client().lines("/api/v1/reports", body, "end",
                            [&](Json&& line) { receiver.take(std::move(line)); });

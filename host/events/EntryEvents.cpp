@@ -1,49 +1,21 @@
 #include "host/events/EntryEvents.h"
 
-#include "base/EntryFields.h"
 #include "framework/LogEntry.h"
 #include "host/base/JsonWriter.h"
 #include "host/base/Utf8.h"
 #include "host/events/EntryContext.h"
+#include "host/events/FieldsJson.h"
 #include "host/events/RowText.h"
 
-#include <algorithm>
-#include <span>
+#include <string_view>
 
 namespace zrm::host {
 
 namespace {
 
-using Names = std::vector<std::string>;
-
-void writeField(JsonWriter& json, const EntryFields::Field& field) {
-    std::string room;
-    json.key(RowText::ofLocal(field.name, room));
-    json.value(RowText::ofLocal(field.value, room));
-}
-
-bool isWanted(const Names& names, std::string_view field) {
-    return std::find(names.begin(), names.end(), field) != names.end();
-}
-
 /// The fields of these names as a JSON object; empty if the entry has none of them.
-std::string fieldsText(LogEntry& entry, const Names& names) {
-    if (names.empty()) {
-        return {};
-    }
-    const bool areAll = isWanted(names, "*");
-    bool isEmpty = true;
-    std::string text = JsonWriter::text([&](JsonWriter& json) {
-        json.beginObject();
-        for (const EntryFields::Field& field : entry.fields().all()) {
-            if (areAll || isWanted(names, field.name)) {
-                writeField(json, field);
-                isEmpty = false;
-            }
-        }
-        json.endObject();
-    });
-    return isEmpty ? std::string() : text;
+std::string fieldsText(LogEntry& entry, const std::vector<std::string>& names) {
+    return names.empty() ? std::string() : FieldsJson::of(entry.fields(), names).text;
 }
 
 std::string textOf(LogEntry& entry) {

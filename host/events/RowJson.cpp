@@ -13,8 +13,13 @@ RowJson::RowJson(const RowLayout& layout) {
 }
 
 void RowJson::write(JsonWriter& json, const char* row) const {
-    std::string room;
     json.beginObject();
+    writeMembers(json, row);
+    json.endObject();
+}
+
+void RowJson::writeMembers(JsonWriter& json, const char* row) const {
+    std::string room;
     for (const auto& [key, column] : m_columns) {
         json.key(key);
         if (column.isInteger()) {
@@ -23,7 +28,6 @@ void RowJson::write(JsonWriter& json, const char* row) const {
             json.value(RowText::of(column, row, room));
         }
     }
-    json.endObject();
 }
 
 } // namespace zrm::host

@@ -16,6 +16,8 @@ public:
     /// Writes one row as an object: the columns under their upper-case names in table order,
     /// character columns as returned by RowText, integers as numbers.
     void write(JsonWriter& json, const char* row) const;
+    /// The same without the object's begin and end, for one that has more members.
+    void writeMembers(JsonWriter& json, const char* row) const;
 
 private:
     struct Column {

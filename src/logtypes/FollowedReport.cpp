@@ -7,6 +7,7 @@
 #include "framework/cancellation.h"
 #include "logs/ZoneTime.h"
 #include "logtypes/EntryReader.h"
+#include "logtypes/NewestRows.h"
 #include "monitor/BackwardBlock.h"
 #include "monitor/EntryBlock.h"
 #include "monitor/GenerationNames.h"
@@ -16,7 +17,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <ctime>
-#include <deque>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -78,19 +79,27 @@ std::string readProblem(const Generation& generation, std::int64_t offset, int e
                : "reading it failed before byte " + place + ": " + ErrorText(error).text();
 }
 
+std::string fullProblem(std::size_t rows) {
+    return "the fields of its newest " + std::to_string(rows) + " entries have " +
+           std::to_string(FollowedReport::mostDetails / (1024 * 1024)) +
+           " MiB, the most that a report keeps; ask for fewer fields or a shorter period";
+}
+
 /// The entry of a block whose row is judged by the conditions of a report.
 class ReportedEntry final : public LogEntry {
 public:
     explicit ReportedEntry(EntryReader& entries) : m_entries(entries) {}
 
-    /// Whether the row of the block's last entry meets the conditions.
+    /// What the receiver wants to have of the block's last entry; none if its row does not meet the
+    /// conditions.
     template <class Block>
-    bool isMet(const Block& block, zrm_rmlogent_data_t& row, FollowedReport::Receiver& receiver) {
+    std::optional<FollowedReport::Detail> judge(const Block& block, zrm_rmlogent_data_t& row,
+                                                FollowedReport::Receiver& receiver) {
         m_text = block.text();
         m_isCut = block.isTextCut();
         m_hasFields = false;
         const Offer offer(*this);
-        return receiver.meets(row);
+        return receiver.meets(row) ? std::optional(receiver.describe()) : std::nullopt;
     }
 
     std::string_view text() const override {
@@ -142,7 +151,7 @@ void FollowedReport::show(std::int64_t read, Receiver& receiver) {
 
 bool FollowedReport::isEnded() {
     m_isCancelled = m_isCancelled || CTX1_IsCancelled();
-    return m_isCancelled || isLimited();
+    return m_isCancelled || isLimited() || m_isFull;
 }
 
 /// The present file is opened first: if it is renamed now, it is recognised among the others.
@@ -270,9 +279,10 @@ bool FollowedReport::isFar(Place where, Place farPlace, unsigned& far) noexcept 
     return far >= farEntries;
 }
 
-void FollowedReport::give(const zrm_rmlogent_data_t& row, Receiver& receiver) {
+void FollowedReport::give(const zrm_rmlogent_data_t& row, const Detail& detail,
+                          Receiver& receiver) {
     ++m_given;
-    receiver.give(row);
+    receiver.give(row, detail);
     if (m_given % rowsPerProgress == 0) {
         show(m_read, receiver);
     }
@@ -302,8 +312,11 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
             if (where != Place::unfit && timeOf(m_row) < newest) {
                 newest = timeOf(m_row);
             }
-            if (where == Place::within && judged.isMet(block, m_row, receiver)) {
-                give(m_row, receiver);
+            if (where != Place::within) {
+                continue;
+            }
+            if (const auto detail = judged.judge(block, m_row, receiver)) {
+                give(m_row, *detail, receiver);
                 if (isLimited()) {
                     return;
                 }
@@ -320,19 +333,18 @@ void FollowedReport::readBackward(Generation& generation, File& file, Receiver& 
 void FollowedReport::readForward(Generation& generation, File& file, Receiver& receiver) {
     EntryBlock block(m_entries.recordLength(), m_options.join.get());
     block.start(0, {});
-    const std::size_t mostRows = m_options.limit - m_given;
-    std::deque<zrm_rmlogent_data_t> kept;
+    NewestRows kept(m_options.limit - m_given);
     ReportedEntry judged(m_entries);
     bool isPast = false;
     unsigned far = 0;
     const auto look = [&](char* entry) {
         const Place where = place(entry, block.text(), m_newest);
         isPast = isFar(where, Place::farTooNew, far);
-        if (where == Place::within && judged.isMet(block, m_row, receiver)) {
-            kept.push_back(m_row);
-            if (kept.size() > mostRows) {
-                kept.pop_front();
-            }
+        if (where != Place::within) {
+            return;
+        }
+        if (auto detail = judged.judge(block, m_row, receiver)) {
+            kept.add(m_row, std::move(*detail));
         }
     };
     for (EntryBlock::Fill filled = EntryBlock::Fill::more; !isPast;) {
@@ -356,8 +368,12 @@ void FollowedReport::readForward(Generation& generation, File& file, Receiver& r
             return;
         }
     }
-    for (auto row = kept.rbegin(); row != kept.rend() && !m_isCancelled; ++row) {
-        give(*row, receiver);
+    for (auto next = kept.rows().rbegin(); next != kept.rows().rend() && !m_isCancelled; ++next) {
+        give(next->row, next->detail, receiver);
+    }
+    if (kept.isFull()) {
+        m_isFull = true;
+        file.problem = fullProblem(kept.rows().size());
     }
 }
 

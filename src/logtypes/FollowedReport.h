@@ -23,10 +23,20 @@ class LineJoin;
 /// generation of which only the beginning shows that it has nothing between the two times is not
 /// read any further, and none that is older than the first time is opened. Compressed generations
 /// are read once, from their beginning on, and only the rows that may be given are kept; one whose
-/// contents a younger file has is a copy, and is not read. Memory is
-/// bounded whatever the files have. One thread; ends when its request does (CTX1_IsCancelled).
+/// contents a younger file has is a copy, and is not read. Memory is bounded whatever the files
+/// have: where the details of a compressed file's rows need more, the report ends with that file.
+/// One thread; ends when its request does (CTX1_IsCancelled).
 class FollowedReport {
 public:
+    /// Bytes of details that wait with their rows while a compressed file is read.
+    static constexpr std::size_t mostDetails = 32 * 1024 * 1024;
+
+    /// What a receiver wants to have of an entry beside its row.
+    struct Detail {
+        std::string text = {};
+        bool isCut = false;
+    };
+
     /// What the report asks of its caller and gives to it.
     class Receiver {
     public:
@@ -36,8 +46,10 @@ public:
         /// Whether a row between the two times meets the conditions of the report. Its entry is
         /// that of the thread (LogEntry).
         virtual bool meets(zrm_rmlogent_data_t& row) = 0;
-        /// The next row; rows come newest first.
-        virtual void give(const zrm_rmlogent_data_t& row) = 0;
+        /// Called after `meets` of a row that does, while its entry is that of the thread.
+        virtual Detail describe() { return {}; }
+        /// The next row, with what `describe` has returned of it; rows come newest first.
+        virtual void give(const zrm_rmlogent_data_t& row, const Detail& detail) = 0;
         /// Called after each block: how many of all bytes of the files were read or passed over.
         virtual void progress(std::int64_t read, std::int64_t total) = 0;
     };
@@ -91,7 +103,7 @@ private:
     bool isEnded();
     Place place(char* entry, std::string_view text, const std::string& newest);
     static bool isFar(Place where, Place farPlace, unsigned& far) noexcept;
-    void give(const zrm_rmlogent_data_t& row, Receiver& receiver);
+    void give(const zrm_rmlogent_data_t& row, const Detail& detail, Receiver& receiver);
     void show(std::int64_t read, Receiver& receiver);
 
     const std::string m_path;
@@ -110,6 +122,7 @@ private:
     std::size_t m_given = 0;
     std::uint64_t m_skipped = 0;
     bool m_isCancelled = false;
+    bool m_isFull = false; ///< the details left no room for older rows
     std::string m_reached;
     zrm_rmlogent_data_t m_row{};
 };

@@ -87,7 +87,7 @@ void SourceReport::run(FollowedReport::Receiver& receiver) {
             m_reached.assign(row.entrytime, stampLength);
             if (receiver.meets(row)) {
                 ++m_given;
-                receiver.give(row);
+                receiver.give(row, receiver.describe());
             }
         }
     }

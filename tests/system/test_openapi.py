@@ -99,6 +99,7 @@ EXAMPLES = [
     ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/RMMONLOG/sample", {}, 200),
     ("POST", "/api/v1/tables/{table}/sample", "/api/v1/tables/NONE/sample", {}, 404),
     ("POST", "/api/v1/reports", None, {"log": "{log}", "from": FROM}, 200),
+    ("POST", "/api/v1/reports", None, {"log": "{log}", "from": FROM, "fields": ["pid"]}, 400),
     ("POST", "/api/v1/reports", None, {"log": "/none", "from": FROM}, 404),
     ("GET", "/api/v1/events", None, None, None),
     ("GET", "/api/v1/events", "/api/v1/events?limit=1&order=asc&severity=info", None, None),
@@ -247,6 +248,23 @@ def test_events_are_as_documented(serving):
         status, kind, data = exchange(api, "GET", f"/api/v1/events/{event['id']}")
         assert status == 200 and json.loads(data) == event
         check("GET", "/api/v1/events/{id}", status, kind, data)
+
+
+def test_rows_with_fields_are_as_documented(agent):
+    log = Log(agent.directory / "app.log")
+    log.path.write_text(syslog_line("line", "app[7]"))
+    agent.agent_keys["log_config"] = None
+    agent.follow(log)
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    body = {"log": str(log), "from": FROM, "fields": ["*"]}
+    status, kind, data = exchange(Api(agent), "POST", "/api/v1/reports", body)
+    check("POST", "/api/v1/reports", status, kind, data)
+    (row,) = json.loads(data)["rows"]
+    assert row["fields"]["pid"] == "7"
+    validate(DOCUMENT["components"]["schemas"]["ReportRow"], row)
+    with pytest.raises(jsonschema.ValidationError):
+        validate(DOCUMENT["components"]["schemas"]["EntryRow"], row)
 
 
 def test_episodes_and_their_events_are_as_documented(agent):

@@ -47,7 +47,7 @@ public:
     bool meets(zrm_rmlogent_data_t& row) override {
         return std::string_view(row.entrydesc, 2) != "no";
     }
-    void give(const zrm_rmlogent_data_t& row) override {
+    void give(const zrm_rmlogent_data_t& row, const FollowedReport::Detail& /*detail*/) override {
         const std::string text(row.entrydesc, sizeof row.entrydesc);
         given.push_back(text.substr(0, text.find_last_not_of(' ') + 1));
         times.emplace_back(row.entrytime, 7);
@@ -372,8 +372,8 @@ TEST_F(FollowedReportTest, AGenerationThatIsReplacedMeanwhileIsNamed) {
     directory.write("app.log.1", line("10-04", "one"));
     struct Rotating : Rows {
         explicit Rotating(TemporaryDirectory& directory) : files(directory) {}
-        void give(const zrm_rmlogent_data_t& row) override {
-            Rows::give(row);
+        void give(const zrm_rmlogent_data_t& row, const FollowedReport::Detail& detail) override {
+            Rows::give(row, detail);
             files.write("other", line("10-03", "not asked for"));
             rename(files.file("other").c_str(), files.file("app.log.1").c_str());
         }

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <vector>
 
 using namespace zrm::host;
 
@@ -50,6 +51,20 @@ TEST(ReportRequest, WithoutAnEndGoesUpToTheNewestEntry) {
     EXPECT_EQ(report.conditions.size(), 4u);
 }
 
+TEST(ReportRequest, ReadsTheNamesOfFields) {
+    const auto parse = [](const std::string& fields) {
+        return ReportRequest::parse(R"({"log":"/a","from":"2026-11-20","fields":)" + fields + '}')
+            .fields;
+    };
+    EXPECT_EQ(parse(R"(["status","*"])"), (std::vector<std::string>{"status", "*"}));
+    EXPECT_EQ(parse("[]"), std::vector<std::string>());
+    EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","fields":["a","field.b"]})"),
+              "fields[1]: 'field.b' begins with 'field.'; write 'b'");
+    EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","fields":[""]})"),
+              "fields[0]: is not the name of a field; write 1 to 255 bytes, or \"*\" for all "
+              "fields");
+}
+
 TEST(ReportRequest, ReadsTheLimit) {
     const auto limit = [](const std::string& number) {
         return ReportRequest::parse(R"({"log":"/a","from":"2026-11-20","limit":)" + number + '}')
@@ -76,7 +91,8 @@ TEST(ReportRequest, ReportsTheWrongField) {
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","where":"ENTRYSRC = 'a'"})"),
               "where: write a list of at most 100 texts");
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","conditions":[]})"),
-              "conditions: unknown member; the members are log, from, to, where, limit");
+              "conditions: unknown member; the members are log, from, to, where, limit, "
+              "fields");
     EXPECT_EQ(refused(R"({"log":"/a","from":"2026-11-20","limit":10001})").substr(0, 7), "limit: ");
 }
 

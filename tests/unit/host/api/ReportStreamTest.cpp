@@ -108,8 +108,9 @@ protected:
         const Work m_work;
     };
 
-    void begin(ReportStream::Form form, Work work) {
+    void begin(ReportStream::Form form, Work work, std::vector<std::string> fields = {}) {
         ReportQuery query;
+        query.fields = std::move(fields);
         query.log = "/var/log/app.log";
         query.limit = 7;
         stream = std::make_unique<ReportStream>(
@@ -119,12 +120,13 @@ protected:
         stream->attach(client);
         stream->run();
     }
-    static void give(LogReport::Receiver& receiver, const std::string& description) {
+    static void give(LogReport::Receiver& receiver, const std::string& description,
+                     const LogReport::Fields& fields = {}) {
         zrm_rmlogent_data_t row;
         std::memset(&row, ' ', sizeof row);
         row.freqthresh = row.periodthrs = row.sampleno = row.rowno = 0;
         description.copy(row.entrydesc, sizeof row.entrydesc);
-        receiver.row(reinterpret_cast<const char*>(&row));
+        receiver.row(reinterpret_cast<const char*>(&row), fields);
     }
     static LogReport::Result giveTwo(LogReport::Receiver& receiver) {
         give(receiver, "one");
@@ -159,10 +161,28 @@ TEST_F(ReportStreamTest, WritesADocument) {
     EXPECT_EQ(answer["limit"], 7);
     ASSERT_EQ(answer["rows"].size(), 2U);
     EXPECT_EQ(answer["rows"][1]["ENTRYDESC"], "two");
+    EXPECT_FALSE(answer["rows"][1].contains("fields"));
     EXPECT_EQ(answer["count"], 2);
     EXPECT_EQ(answer["skipped"], 3);
     EXPECT_EQ(answer["complete"], true);
     EXPECT_TRUE(client->isEnded());
+}
+
+TEST_F(ReportStreamTest, RowsHaveFieldsWhereTheyWereAskedFor) {
+    const auto giveThree = [](LogReport::Receiver& receiver) {
+        give(receiver, "one", {R"({"status":"500"})", false});
+        give(receiver, "two", {R"({"status":"5"})", true});
+        give(receiver, "three");
+        return LogReport::Result();
+    };
+    begin(ReportStream::Form::document, giveThree, {"status"});
+    run();
+    const Json rows = Json::parse(client->text())["rows"];
+    EXPECT_EQ(rows[0]["fields"], (Json{{"status", "500"}}));
+    EXPECT_FALSE(rows[0].contains("fields_cut"));
+    EXPECT_EQ(rows[1]["fields_cut"], true);
+    EXPECT_EQ(rows[2]["fields"], Json::object());
+    EXPECT_EQ(rows[2]["ENTRYDESC"], "three");
 }
 
 TEST_F(ReportStreamTest, WritesLinesWithTheProgress) {
