@@ -91,7 +91,11 @@ Condition readFilter(const ConditionBuilder& builder, const json& filter, const 
         throw RequestRefused(400, std::move(problem));
     }
     if (condition->isOnField()) {
-        refuse("a sample has no fields: name a column", field + ".column");
+        throw RequestRefused(400, {"the rows of a sample have no fields",
+                                   "name a column, or use a report (POST /api/v1/reports, zrmctl "
+                                   "report) or an explanation (POST /api/v1/explain, zrmctl "
+                                   "explain), which judge conditions on fields",
+                                   field + ".column"});
     }
     return std::move(*condition);
 }

@@ -2,12 +2,15 @@
 
 #include "host/http/RequestRefused.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <string>
 #include <vector>
 
 using namespace zrm::host;
+using testing::HasSubstr;
+using testing::StartsWith;
 
 namespace {
 
@@ -44,6 +47,14 @@ TEST(SampleRequest, NeedsNoFiltersForTheMonitoredLogs) {
     EXPECT_EQ(refused("{}"), "accepted");
     EXPECT_EQ(refused(R"({"filters":[]})"), "accepted");
     EXPECT_EQ(refused(R"({"filters":null})"), "accepted");
+}
+
+TEST(SampleRequest, NamesWhatJudgesFields) {
+    const std::string refusal =
+        refused(filter(R"("column":"field.status","op":"=","value":"500")"), "RMLOGENT");
+    EXPECT_THAT(refusal, StartsWith("filters[0].column: the rows of a sample have no fields; "));
+    EXPECT_THAT(refusal, HasSubstr("zrmctl report"));
+    EXPECT_THAT(refusal, HasSubstr("zrmctl explain"));
 }
 
 TEST(SampleRequest, RefusesInvalidBodies) {
