@@ -37,6 +37,16 @@ constexpr const char* firstVersion =
 /// What the third version added to labels.
 constexpr const char* labelTexts = "ALTER TABLE labels ADD COLUMN text TEXT NOT NULL DEFAULT '';";
 
+/// A table of positions, with the columns that came after its first and with one row.
+std::string positions(const std::string& laterColumns, const std::string& laterValues) {
+    return "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
+           " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
+           " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL" +
+           laterColumns +
+           ") WITHOUT ROWID; INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6" +
+           laterValues + ");";
+}
+
 class SchemaTest : public testing::Test {
 protected:
     static bool hasTable(Database& database, const std::string& name) {
@@ -45,6 +55,15 @@ protected:
     }
     static std::int64_t versionOf(Database& database) {
         return database.number("PRAGMA user_version");
+    }
+
+    /// Makes a file as a version since the fourth left it, and brings it up to date.
+    void bringUpToDateFrom(int oldVersion, const std::string& further) {
+        database.run(firstVersion);
+        database.run(labelTexts + ("ALTER TABLE events ADD COLUMN checksum INTEGER;" + further) +
+                     "PRAGMA user_version = " + std::to_string(oldVersion));
+        Schema::bringUpToDate(database);
+        EXPECT_EQ(versionOf(database), Schema::version);
     }
 
     FaultyDisk disk;
@@ -121,44 +140,21 @@ TEST_F(SchemaTest, UpgradesAFileOfTheThirdVersion) {
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheFourthVersionUpToDate) {
-    database.run(firstVersion);
-    database.run(std::string(labelTexts) +
-                 "ALTER TABLE events ADD COLUMN checksum INTEGER; PRAGMA user_version = 4");
-    Schema::bringUpToDate(database);
-    EXPECT_EQ(versionOf(database), Schema::version);
+    bringUpToDateFrom(4, "");
     EXPECT_EQ(database.number("SELECT id FROM events"), 41);
     database.run("INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, 'c', '')");
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheFifthVersionUpToDate) {
-    database.run(firstVersion);
-    database.run(std::string(labelTexts) +
-                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
-                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
-                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
-                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL) WITHOUT ROWID;"
-                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6);"
-                 "PRAGMA user_version = 5");
-    Schema::bringUpToDate(database);
-    EXPECT_EQ(versionOf(database), Schema::version);
+    bringUpToDateFrom(5, positions("", ""));
     EXPECT_EQ(database.number("SELECT offset FROM log_positions"), 3);
     EXPECT_EQ(database.number("SELECT modified FROM log_positions"), 0) << "unknown";
     EXPECT_EQ(database.number("SELECT count(*) FROM watched_paths"), 0);
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
-    database.run(firstVersion);
-    database.run(std::string(labelTexts) +
-                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
-                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
-                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
-                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
-                 " modified INTEGER NOT NULL DEFAULT 0) WITHOUT ROWID;"
-                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7);"
-                 "PRAGMA user_version = 6");
-    Schema::bringUpToDate(database);
-    EXPECT_EQ(versionOf(database), Schema::version);
+    bringUpToDateFrom(6, positions(", modified INTEGER NOT NULL DEFAULT 0", ", 7"));
     Statement position(database, "SELECT offset, cursor FROM log_positions");
     ASSERT_TRUE(position.step());
     EXPECT_EQ(position.integer(0), 3);
@@ -166,18 +162,9 @@ TEST_F(SchemaTest, BringsAFileOfTheSixthVersionUpToDate) {
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheSeventhVersionUpToDate) {
-    database.run(firstVersion);
-    database.run(std::string(labelTexts) +
-                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
-                 "CREATE TABLE log_positions (log TEXT PRIMARY KEY, device INTEGER NOT NULL,"
-                 " inode INTEGER NOT NULL, offset INTEGER NOT NULL, guard INTEGER NOT NULL,"
-                 " guard_length INTEGER NOT NULL, noted INTEGER NOT NULL,"
-                 " modified INTEGER NOT NULL DEFAULT 0, cursor TEXT NOT NULL DEFAULT '')"
-                 " WITHOUT ROWID;"
-                 "INSERT INTO log_positions VALUES ('/log', 1, 2, 3, 4, 5, 6, 7, '');"
-                 "PRAGMA user_version = 7");
-    Schema::bringUpToDate(database);
-    EXPECT_EQ(versionOf(database), Schema::version);
+    bringUpToDateFrom(7, positions(", modified INTEGER NOT NULL DEFAULT 0,"
+                                   " cursor TEXT NOT NULL DEFAULT ''",
+                                   ", 7, ''"));
     Statement position(database, "SELECT offset, late FROM log_positions");
     ASSERT_TRUE(position.step());
     EXPECT_EQ(position.integer(0), 3);
@@ -185,14 +172,8 @@ TEST_F(SchemaTest, BringsAFileOfTheSeventhVersionUpToDate) {
 }
 
 TEST_F(SchemaTest, BringsAFileOfTheEighthVersionUpToDate) {
-    database.run(firstVersion);
-    database.run(std::string(labelTexts) +
-                 "ALTER TABLE events ADD COLUMN checksum INTEGER;"
-                 "INSERT INTO labels VALUES (2, 'other', 'minor', 1, 'a text');"
-                 "INSERT INTO events VALUES (42, 1795158189412, 2, '{}', 7);"
-                 "PRAGMA user_version = 8");
-    Schema::bringUpToDate(database);
-    EXPECT_EQ(versionOf(database), Schema::version);
+    bringUpToDateFrom(8, "INSERT INTO labels VALUES (2, 'other', 'minor', 1, 'a text');"
+                         "INSERT INTO events VALUES (42, 1795158189412, 2, '{}', 7);");
     Statement event(database, "SELECT text, silence, checksum FROM events"
                               " JOIN labels ON labels.id = label WHERE events.id = 42");
     ASSERT_TRUE(event.step());
