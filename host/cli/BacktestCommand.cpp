@@ -5,6 +5,7 @@
 #include "host/cli/DisplayText.h"
 #include "host/cli/JsonText.h"
 #include "host/cli/SituationOptions.h"
+#include "host/cli/Table.h"
 #include "host/cli/TimeDisplay.h"
 
 #include <CLI/CLI.hpp>
@@ -18,24 +19,32 @@ std::string groupOf(const JsonText::Json& episode) {
     std::string text;
     const JsonText::Json& group = JsonText::member(episode, "group");
     for (const auto& [name, value] : group.items()) {
-        text += (text.empty() ? "" : ", ") + name + '=' + JsonText::text(value);
+        text += (text.empty() ? "" : " ") + name + '=' + JsonText::text(value);
     }
-    return DisplayText::visible(text);
+    return text;
 }
 
-std::string episodesOf(const JsonText::Json& answer) {
-    const JsonText::Json& episodes = JsonText::member(answer, "episodes");
-    if (!episodes.is_array() || episodes.empty()) {
-        return "";
-    }
-    std::string text = "episodes: " + JsonText::text(answer, "episode_count") + '\n';
+std::string tableOf(const JsonText::Json& episodes, const Terminal& terminal) {
+    Table table({{"STATE", Table::FIXED},
+                 {"FIRST", Table::FIXED},
+                 {"LAST", Table::FIXED},
+                 {"COUNT", Table::NUMBER},
+                 {"GROUP"}});
     for (const JsonText::Json& episode : episodes) {
-        const std::string group = groupOf(episode);
-        text += "  " + TimeDisplay::local(JsonText::text(episode, "first")) + " to " +
-                TimeDisplay::local(JsonText::text(episode, "last")) + "  " +
-                JsonText::text(episode, "count") + " entries" +
-                (JsonText::text(episode, "over") == "true" ? "" : ", lasting") +
-                (group.empty() ? "" : "  " + group) + '\n';
+        const bool isOver = JsonText::text(episode, "over") == "true";
+        table.add({{isOver ? "resolved" : "open", isOver ? Colour::NONE : Colour::BAD},
+                   TimeDisplay::local(JsonText::text(episode, "first")),
+                   TimeDisplay::local(JsonText::text(episode, "last")),
+                   JsonText::text(episode, "count"),
+                   groupOf(episode)});
+    }
+    return table.text(terminal);
+}
+
+std::string timesOf(const JsonText::Json& raised) {
+    std::string text;
+    for (const JsonText::Json& time : raised) {
+        text += "  " + DisplayText::visible(TimeDisplay::stamp(JsonText::text(time))) + '\n';
     }
     return text;
 }
@@ -66,10 +75,9 @@ CliStatus BacktestCommand::run(Context& context) {
         return CliStatus::DONE;
     }
     std::string text = DisplayText::visible(JsonText::text(answer, "decision")) + '\n';
-    for (const JsonText::Json& time : JsonText::member(answer, "raised_at")) {
-        text += "  " + DisplayText::visible(TimeDisplay::stamp(JsonText::text(time))) + '\n';
-    }
-    text += episodesOf(answer);
+    const JsonText::Json& episodes = JsonText::member(answer, "episodes");
+    text += episodes.empty() ? timesOf(JsonText::member(answer, "raised_at"))
+                             : tableOf(episodes, context.terminal());
     context.print(text);
     Context::noteReach(answer);
     if (JsonText::text(answer, "truncated") == "true") {

@@ -5,6 +5,7 @@ import random
 import time
 
 import pytest
+import zrmctl
 from analysis import Analysis
 from api import stamp
 from conftest import wait_until
@@ -129,4 +130,27 @@ def test_an_explanation_says_what_became_of_an_entry(agent):
         "explanations"
     ]
     assert explained["group"] == {"ip": "10.0.0.2"} and explained["window"]["count"] == 1
+    assert agent.stop() == 0
+
+
+def test_the_client_lists_the_episodes_of_a_backtest(agent):
+    agent.listen = "127.0.0.1:0"
+    log = followed(agent)
+    agent.situation("failed", when=FAILED, log=log, group_by=["ip"], resolve_after="30s")
+    lines = [failed("10.0.0.1", when=at(seconds - 3600)) for seconds in (0, 10, 50)]
+    log.append("".join([*lines, failed("10.0.0.2", when=at(-5))]))
+    agent.start()
+    api = Analysis(agent)
+    wait_until(lambda: api.counts("failed")["matched"] == 4, "the lines to be read")
+    where = ["--url", f"http://127.0.0.1:{api.port}", "--token-file", api.token_file]
+    status, out, _ = zrmctl.run(["backtest", "failed", "--from", "-2h", *where])
+    assert status == 0
+    decision, heading, *rows = out.splitlines()
+    assert decision.startswith("Would have been raised 3 times")
+    assert heading.split() == ["STATE", "FIRST", "LAST", "COUNT", "GROUP"]
+    assert [(row.split()[0], *row.split()[-2:]) for row in rows] == [
+        ("resolved", "2", "ip=10.0.0.1"),
+        ("resolved", "1", "ip=10.0.0.1"),
+        ("open", "1", "ip=10.0.0.2"),
+    ]
     assert agent.stop() == 0
