@@ -2,6 +2,10 @@
 
 import { button, empty, fill, h, visible } from "./dom.js";
 import { bytes, ENTRY_COLUMNS, plural, reachText, stamp } from "./format.js";
+import { FIELD, valueOf } from "./report-columns.js";
+
+const LABELS = new Map(ENTRY_COLUMNS);
+const MANY = 8; // columns from which a narrow screen scrolls rather than showing cards
 
 /** Why there may be more entries. */
 function limitText({ count, limit, max_rows: most }) {
@@ -61,38 +65,50 @@ function filesElement({ files, skipped }) {
   );
 }
 
-function compare(a, b, { name, up }) {
-  const order =
-    typeof a[name] === "number"
-      ? a[name] - b[name]
-      : a[name] < b[name]
-        ? -1
-        : a[name] > b[name]
-          ? 1
-          : 0;
-  return up ? order : -order;
+const NUMBER = /^-?\d+(?:\.\d+)?$/;
+
+/** The rows in this order; numbers by their value where a column has nothing else. */
+function sortedBy({ name, up }, rows) {
+  const values = rows.map((row) => valueOf(row, name));
+  const areNumbers = values.every((value) => value === "" || NUMBER.test(value));
+  const keyOf = (value) => (areNumbers ? (value === "" ? -Infinity : Number(value)) : value);
+  const compare = (a, b) => (a.key < b.key ? -1 : a.key > b.key ? 1 : 0);
+  return rows
+    .map((row, index) => ({ row, key: keyOf(values[index]) }))
+    .sort((a, b) => (up ? compare(a, b) : compare(b, a)))
+    .map(({ row }) => row);
 }
 
 // What a log holds must neither steer a terminal nor be a formula to a spreadsheet.
-function csvOf(rows) {
+function csvOf(rows, columns, fields) {
   const cell = (value) => {
     const text = visible(String(value));
     const safe = typeof value === "string" && /^[=+\-@\t]/.test(text) ? `'${text}` : text;
     return /[",\r\n]/.test(safe) ? `"${safe.replaceAll('"', '""')}"` : safe;
   };
-  const names = Object.keys(rows[0]);
-  return [names, ...rows.map((row) => names.map((name) => row[name]))]
+  const names = [...columns, ...fields.map((name) => FIELD + name)];
+  return [names, ...rows.map((row) => names.map((name) => valueOf(row, name)))]
     .map((row) => `${row.map(cell).join(",")}\r\n`)
     .join("");
 }
 
+function classOf(name) {
+  if (name.startsWith(FIELD)) return "break";
+  if (name.endsWith("DESC")) return "wide break";
+  return name === "ENTRYTIME" ? "fit whole" : "fit";
+}
+
 export class ReportResult {
-  /** Draws an answer in place of what the element has. */
-  constructor(element, answer) {
+  /** Draws an answer in place of what the element has. asked: the fields that the report was asked
+   * for; chosen: the ReportColumns that say what is shown. */
+  constructor(element, answer, asked, chosen) {
     this.answer = answer;
+    this.asked = asked;
+    this.chosen = chosen;
     this.sort = null;
     const files = filesElement(answer);
     if (answer.rows.length === 0) {
+      chosen.setAsked(asked);
       fill(
         element,
         h("div", { className: "panel" }, empty("No entries", emptyText(answer))),
@@ -100,19 +116,19 @@ export class ReportResult {
       );
       return;
     }
-    const all = h("input", { type: "checkbox", onchange: () => this.#drawTable(all.checked) });
     this.holder = h("div", {
       className: "panel flush",
       tabIndex: 0,
       role: "region",
       "aria-label": "Entries",
     });
-    fill(element, this.#head(all), files, this.holder);
-    this.#drawTable(false);
+    fill(element, this.#head(), files, this.holder);
+    this.draw();
   }
 
-  #head(all) {
-    const { rows, truncated, complete } = this.answer;
+  #head() {
+    const { rows, columns, truncated, complete } = this.answer;
+    const cut = rows.filter((row) => row.fields_cut).length;
     const json = () => `${visible(JSON.stringify(rows, null, 2))}\n`;
     return h(
       "div",
@@ -120,11 +136,17 @@ export class ReportResult {
       h("h2", { role: "status" }, plural(rows.length, "entry", "entries")),
       truncated && h("p", { className: "why warn" }, limitText(this.answer)),
       !truncated && !complete && h("p", { className: "why warn" }, missingText(this.answer)),
+      cut > 0 &&
+        h(
+          "p",
+          { className: "why warn" },
+          `Not all fields of ${plural(cut, "entry", "entries")} are here: ` +
+            "a row has at most 16 KiB of them. Choose fewer fields.",
+        ),
       h(
         "div",
         { className: "push" },
-        h("label", { className: "check" }, all, "All columns"),
-        button("CSV", () => this.#download("csv", "text/csv", csvOf(rows)), {
+        button("CSV", () => this.#download("csv", "text/csv", csvOf(rows, columns, this.asked)), {
           "aria-label": "Download as CSV",
         }),
         button("JSON", () => this.#download("json", "application/json", json()), {
@@ -134,19 +156,34 @@ export class ReportResult {
     );
   }
 
-  #drawTable(isWhole) {
+  /** The chosen columns but the usual ones that are blank, then the chosen fields that were asked
+   * for. */
+  #shown() {
     const { rows } = this.answer;
-    const shown = isWhole
-      ? Object.keys(rows[0]).map((name) => [name, name])
-      : ENTRY_COLUMNS.filter(([name]) => rows.some((row) => row[name] !== ""));
-    const sorted = this.sort ? [...rows].sort((a, b) => compare(a, b, this.sort)) : rows;
+    const columns = this.chosen.columns.filter(
+      (name) => !LABELS.has(name) || rows.some((row) => row[name] !== ""),
+    );
+    const fields = this.chosen.fields.filter((name) => this.asked.includes(name));
+    return [
+      ...columns.map((name) => [name, LABELS.get(name) ?? name]),
+      ...fields.map((name) => [FIELD + name, name]),
+    ];
+  }
+
+  /** Draws the table with the columns and fields that are chosen now. */
+  draw() {
+    this.chosen.setAsked(this.asked);
+    const { rows } = this.answer;
+    if (rows.length === 0) return;
+    const shown = this.#shown();
+    const sorted = this.sort ? sortedBy(this.sort, rows) : rows;
     const head = shown.map(([name, label]) => {
       const isSorted = this.sort?.name === name;
       return h(
         "th",
         {
           scope: "col",
-          className: name.endsWith("DESC") ? "" : "fit",
+          className: classOf(name).startsWith("fit") ? "fit" : "",
           role: "columnheader",
           "aria-sort": isSorted ? (this.sort.up ? "ascending" : "descending") : "none",
         },
@@ -154,8 +191,8 @@ export class ReportResult {
           `${label}${isSorted ? (this.sort.up ? " ▲" : " ▼") : ""}`,
           () => {
             this.sort = { name, up: isSorted ? !this.sort.up : true };
-            this.#drawTable(isWhole);
-            this.holder.querySelector(`[data-name="${name}"]`).focus();
+            this.draw();
+            this.holder.querySelector(`[data-name="${CSS.escape(name)}"]`).focus();
           },
           { "data-name": name },
         ),
@@ -165,7 +202,7 @@ export class ReportResult {
       this.holder,
       h(
         "table",
-        { role: "table", className: isWhole ? "" : "cards sortable" },
+        { role: "table", className: shown.length > MANY ? "" : "cards sortable" },
         h("caption", { className: "unseen" }, `Entries of ${this.answer.log}`),
         h("thead", { role: "rowgroup" }, h("tr", { role: "row" }, head)),
         h(
@@ -181,13 +218,9 @@ export class ReportResult {
                   {
                     role: "cell",
                     "data-label": label,
-                    className: name.endsWith("DESC")
-                      ? "wide break"
-                      : name === "ENTRYTIME"
-                        ? "fit whole"
-                        : "fit",
+                    className: classOf(name),
                   },
-                  name === "ENTRYTIME" ? stamp(row[name]) : String(row[name]),
+                  name === "ENTRYTIME" ? stamp(row[name]) : String(valueOf(row, name)),
                 ),
               ),
             ),

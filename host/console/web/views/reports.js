@@ -1,9 +1,10 @@
 // Reports: what a log held between two times.
 
-import { get, postForLines } from "../api.js";
+import { get, postForLines, withQuery } from "../api.js";
 import { Conditions } from "../conditions.js";
 import { button, empty, failure, field, fill, h, select } from "../dom.js";
 import { bytes, offsetOf, plural } from "../format.js";
+import { ReportColumns } from "../report-columns.js";
 import { ReportResult } from "../report-result.js";
 
 const HOUR = 3600 * 1000;
@@ -93,7 +94,8 @@ class ReportPage {
         ),
       ),
     );
-    this.log = field("Log", select(logs, log && logs.includes(log) ? log : logs[0]));
+    const first = log && logs.includes(log) ? log : logs[0];
+    this.log = field("Log", select(logs, first, { onchange: () => this.#readFields() }));
     this.preset = field("Time", select(PRESETS, "day", { onchange: () => this.#setWindow() }));
     const own = () => {
       this.preset.control.value = "own";
@@ -102,6 +104,7 @@ class ReportPage {
     this.to = field("To", h("input", { type: "datetime-local", step: 1, oninput: own }));
     this.limit = field("Entries at most", select(["100", "1000", "10000"], "1000"));
     this.conditions = new Conditions(columns, [], () => this.conditions.setProblems([]));
+    this.shown = new ReportColumns(columns, () => this.report?.draw());
     this.zone = h("p", { className: "hint" });
     this.run = h("button", { className: "primary" }, "Run the report");
     this.#setWindow();
@@ -121,10 +124,27 @@ class ReportPage {
         h("div", { className: "fields" }, this.log, this.preset, this.from, this.to, this.limit),
         this.zone,
         this.conditions.element,
+        this.shown.element,
         h("p", { className: "actions" }, this.run),
       ),
       this.result,
     );
+    this.#readFields();
+  }
+
+  /** The names of the log's fields, for the conditions and to show. */
+  async #readFields() {
+    const log = this.log.control.value;
+    this.shown.forget();
+    this.conditions.suggest([]);
+    try {
+      const { fields } = await get(withQuery("/api/v1/fields", { log }));
+      if (log !== this.log.control.value) return;
+      this.shown.suggest(fields);
+      this.conditions.suggest(fields);
+    } catch {
+      // They only save typing.
+    }
   }
 
   /** Says whose times are meant, where the agent's machine has others than this browser. */
@@ -168,6 +188,7 @@ class ReportPage {
     if (Number.isNaN(from.getTime()) || Number.isNaN(to.getTime()) || to < from) return;
     this.abort = new AbortController();
     const abort = this.abort; // of this run; another may begin before its answer
+    this.report = null;
     this.#showProgress();
     try {
       const body = {
@@ -176,6 +197,7 @@ class ReportPage {
         to: to.toISOString(),
         where: this.conditions.texts,
         limit: Number(this.limit.control.value),
+        fields: this.shown.fields,
       };
       const answer = { rows: [] };
       await postForLines("/api/v1/reports", body, abort.signal, (line) => {
@@ -183,7 +205,7 @@ class ReportPage {
         else if (line.progress) this.#progress = { ...line.progress, found: answer.rows.length };
         else Object.assign(answer, line.begin, line.end);
       });
-      new ReportResult(this.result, answer);
+      this.report = new ReportResult(this.result, answer, body.fields, this.shown);
     } catch (error) {
       if (abort !== this.abort) return;
       this.#fail(error);
