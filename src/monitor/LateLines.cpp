@@ -120,6 +120,9 @@ bool LateLines::checkFile(File& file, Time now) {
 }
 
 char* LateLines::next() {
+    if (char* const entry = m_read != nullptr ? nextOf(*m_read) : nullptr) {
+        return entry;
+    }
     for (File& file : m_files) {
         if (file.isDue) {
             if (char* const entry = nextOf(file)) {
@@ -132,6 +135,7 @@ char* LateLines::next() {
 
 char* LateLines::nextOf(File& file) {
     if (m_read != &file) {
+        stopReading();
         m_read = &file;
         m_block.start(file.offset, file.tail);
     }

@@ -218,4 +218,22 @@ TEST_F(FileFollowerJoinTest, LateLinesWaitForOthers) {
     EXPECT_THAT(entries(seconds(5)), IsEmpty());
 }
 
+TEST_F(FileFollowerJoinTest, LateLinesOfOneFileAreGivenOnceWhileThoseOfAnotherWait) {
+    rename("app.log", "app.log.2");
+    append("one\n");
+    EXPECT_THAT(entries(), IsEmpty());
+    rename("app.log", "app.log.1");
+    append("two\n");
+    EXPECT_THAT(entries(seconds(6)), IsEmpty());
+    EXPECT_THAT(entries(seconds(6)), ElementsAre("one"));
+    EXPECT_THAT(entries(seconds(6)), ElementsAre("two"));
+    m_directory.append("app.log.1", "a\nb\n");
+    EXPECT_THAT(entries(), ElementsAre("a"));
+    m_directory.append("app.log.2", "waits\n");
+    EXPECT_TRUE(m_follower->look({m_now += seconds(6), 0}));
+    EXPECT_STREQ(m_follower->next(), "b\n");
+    EXPECT_EQ(m_follower->next(), nullptr);
+    EXPECT_THAT(entries(seconds(6)), ElementsAre("waits"));
+}
+
 } // namespace
