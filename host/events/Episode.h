@@ -64,6 +64,7 @@ struct StoredEpisode {
     std::string log;
     std::string node;
     std::vector<GroupValue> group;
+    std::vector<GroupValue> values;   ///< as in EventJudgement
     std::int64_t raised = 0;          ///< milliseconds since 1970, UTC
     std::int64_t last = 0;            ///< of a pause: time of its entry, in seconds since 1970
     std::vector<EpisodeShare> shares; ///< of each log; without the episode's id
@@ -85,6 +86,7 @@ struct EventJudgement {
     std::int64_t first = 0;             ///< time of the first of them, in seconds since 1970
     std::int64_t last = 0;              ///< time of the last
     std::vector<GroupValue> group;      ///< empty: the situation has no groups
+    std::vector<GroupValue> values;     ///< of the entry: what the text of the end needs
     std::string text;                   ///< rendered for this event; empty: the situation's
     std::string reason;                 ///< why it is resolved; empty: nothing more has come
 

@@ -8,27 +8,27 @@ namespace zrm::host {
 
 namespace {
 
-std::string groupText(const std::vector<GroupValue>& group) {
+std::string valuesText(const std::vector<GroupValue>& values) {
     return JsonWriter::text([&](JsonWriter& json) {
         json.beginObject();
-        for (const GroupValue& value : group) {
+        for (const GroupValue& value : values) {
             json.member(value.name, value.value);
         }
         json.endObject();
     });
 }
 
-std::vector<GroupValue> groupOf(std::string_view text) {
-    std::vector<GroupValue> group;
+std::vector<GroupValue> valuesOf(std::string_view text) {
+    std::vector<GroupValue> values;
     const auto json = nlohmann::ordered_json::parse(text, nullptr, false);
     if (json.is_object()) {
         for (const auto& [name, value] : json.items()) {
             if (value.is_string()) {
-                group.push_back({name, value.get<std::string>()});
+                values.push_back({name, value.get<std::string>()});
             }
         }
     }
-    return group;
+    return values;
 }
 
 const char* stateOf(EventJudgement::State state) {
@@ -46,8 +46,8 @@ const char* stateOf(EventJudgement::State state) {
 
 EpisodeTable::EpisodeTable(Database& database)
     : m_begin(database, "INSERT OR REPLACE INTO episodes (id, state, situation, severity,"
-                        " definition, log, node, groups, raised, count, first, last)"
-                        " VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"),
+                        " definition, log, node, groups, raised, count, first, last,"
+                        " text_values) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"),
       m_end(database, "UPDATE episodes SET state = 'resolved', resolved = ?, resolved_by = ?,"
                       " reason = ?, count = ?, first = ?, last = ? WHERE id = ?"),
       m_endPause(database, "DELETE FROM episodes WHERE state = 'pause' AND situation = ?"
@@ -78,7 +78,7 @@ void EpisodeTable::keep(const EpisodeChange& change) {
         m_end.bind(7, judgement.episode->value()).run();
         return;
     }
-    const std::string group = groupText(judgement.group);
+    const std::string group = valuesText(judgement.group);
     if (judgement.state == EventJudgement::PAUSED) {
         m_endPause.bind(1, std::string_view(change.situation->name));
         m_endPause.bind(2, std::string_view(group)).run();
@@ -89,7 +89,8 @@ void EpisodeTable::keep(const EpisodeChange& change) {
     m_begin.bind(5, change.situation->definition).bind(6, std::string_view(change.log));
     m_begin.bind(7, std::string_view(change.node)).bind(8, std::string_view(group));
     m_begin.bind(9, change.raised).bind(10, judgement.count);
-    m_begin.bind(11, judgement.first).bind(12, judgement.last).run();
+    m_begin.bind(11, judgement.first).bind(12, judgement.last);
+    m_begin.bind(13, std::string_view(valuesText(judgement.values))).run();
 }
 
 void EpisodeTable::keep(const EpisodeShare& share) {
@@ -133,9 +134,10 @@ std::vector<StoredEpisode> EpisodeTable::open(Database& database) {
     std::vector<StoredEpisode> episodes;
     Statement shares(database,
                      "SELECT log, count, first, last FROM episode_logs WHERE episode = ?");
-    Statement rows(database, "SELECT id, state = 'pause', situation, severity, definition, log,"
-                             " node, groups, raised, last FROM episodes WHERE state <> 'resolved'"
-                             " ORDER BY id");
+    Statement rows(
+        database, "SELECT id, state = 'pause', situation, severity, definition, log,"
+                  " node, groups, raised, last, text_values FROM episodes WHERE state <> 'resolved'"
+                  " ORDER BY id");
     while (rows.step()) {
         StoredEpisode& episode = episodes.emplace_back();
         episode.id = static_cast<std::uint64_t>(rows.integer(0));
@@ -145,9 +147,10 @@ std::vector<StoredEpisode> EpisodeTable::open(Database& database) {
         episode.definition = rows.integer(4);
         episode.log = rows.text(5);
         episode.node = rows.text(6);
-        episode.group = groupOf(rows.text(7));
+        episode.group = valuesOf(rows.text(7));
         episode.raised = rows.integer(8);
         episode.last = rows.integer(9);
+        episode.values = valuesOf(rows.text(10));
         shares.bind(1, episode.id);
         while (shares.step()) {
             episode.shares.push_back({nullptr, std::string(shares.text(0)),

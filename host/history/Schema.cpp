@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 12> steps = {
+constexpr std::array<const char*, 13> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -85,6 +85,8 @@ constexpr std::array<const char*, 12> steps = {
     "ALTER TABLE episodes ADD COLUMN acknowledged INTEGER;"
     "ALTER TABLE episodes ADD COLUMN acknowledged_by TEXT NOT NULL DEFAULT '';"
     "ALTER TABLE episodes ADD COLUMN note TEXT NOT NULL DEFAULT '';",
+    // 13: what the text of an episode's end says of the entry that raised it.
+    "ALTER TABLE episodes ADD COLUMN text_values TEXT NOT NULL DEFAULT '{}';",
 };
 
 } // namespace

@@ -26,9 +26,10 @@ struct Episode {
     std::uint64_t used = 0;                                 ///< number of its last entry
 
     // For the caller, who knows the clock and the event; the judge does not look at them.
-    std::string log = {};  ///< full path of the log that raised it
-    std::string node = {}; ///< as the rows have it in ORIGINNODE
-    std::int64_t cap = 0;  ///< no later time counts as its last entry's; 0: none
+    std::string log = {};                ///< full path of the log that raised it
+    std::string node = {};               ///< as the rows have it in ORIGINNODE
+    std::vector<GroupValue> values = {}; ///< of the entry that raised it, for the text of its end
+    std::int64_t cap = 0;                ///< no later time counts as its last entry's; 0: none
 };
 
 /// An episode that has ended.

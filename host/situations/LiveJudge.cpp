@@ -39,6 +39,7 @@ std::shared_ptr<EventJudgement> resolvedJudgement(Episode episode, std::vector<G
     judgement->first = episode.first;
     judgement->last = episode.last;
     judgement->group = std::move(group);
+    judgement->values = std::move(episode.values);
     judgement->reason = reason;
     judgement->log = std::move(episode.log);
     judgement->node = std::move(episode.node);
@@ -53,6 +54,7 @@ TextFacts factsOf(const EventJudgement& judgement) {
     facts.last = judgement.last * second;
     facts.log = judgement.log;
     facts.group = judgement.group;
+    facts.values = judgement.values;
     return facts;
 }
 
@@ -61,6 +63,7 @@ Episode episodeOf(const StoredEpisode& stored) {
     episode.id = std::make_shared<EpisodeId>(stored.id, stored.raised);
     episode.log = stored.log;
     episode.node = stored.node;
+    episode.values = stored.values;
     for (const EpisodeShare& share : stored.shares) {
         const auto shared = std::make_shared<GrowingShare>(share);
         shared->episode = episode.id;
@@ -186,6 +189,10 @@ bool LiveJudge::push(const char* row, const EpisodeJudge::Entry& entry,
         facts.count = std::max<std::uint64_t>(facts.count, 1);
         facts.log = entry.log;
         judgement->text = m_texts.text(m_values.reading(), facts);
+        if (verdict.episode != nullptr) {
+            judgement->values = m_texts.values(m_values.reading());
+            verdict.episode->values = judgement->values;
+        }
     }
     return m_queue.push(m_label, row, judgement);
 }

@@ -34,6 +34,10 @@ bool isTimeColumn(std::string_view name, const std::vector<Condition>& condition
            columnsOf("RMLOGENT")[found->column].isTime;
 }
 
+auto isNamed(std::string_view name) {
+    return [name](const GroupValue& value) { return value.name == name; };
+}
+
 } // namespace
 
 TextRenderer::TextRenderer(const SituationConfig& situation) : m_situation(situation.name) {
@@ -71,7 +75,7 @@ std::string TextRenderer::render(EntryReading* entry, const TextFacts& facts) co
             if (entry != nullptr) {
                 appendValue(out, part, *entry);
             } else {
-                appendGroup(out, part, facts);
+                appendKept(out, part, facts);
             }
             break;
         case Kind::count:
@@ -111,11 +115,26 @@ void TextRenderer::appendValue(std::string& out, const Part& part, EntryReading&
     appendLine(out, RowText::ofLocal(raw, room));
 }
 
-void TextRenderer::appendGroup(std::string& out, const Part& part, const TextFacts& facts) const {
-    const auto found =
-        std::find_if(facts.group.begin(), facts.group.end(),
-                     [&](const GroupValue& group) { return group.name == part.text; });
-    appendLine(out, found == facts.group.end() ? std::string_view("-") : found->value);
+void TextRenderer::appendKept(std::string& out, const Part& part, const TextFacts& facts) {
+    for (const std::span<const GroupValue> values : {facts.group, facts.values}) {
+        const auto found = std::find_if(values.begin(), values.end(), isNamed(part.text));
+        if (found != values.end()) {
+            appendLine(out, found->value);
+            return;
+        }
+    }
+    out += '-';
+}
+
+std::vector<GroupValue> TextRenderer::values(EntryReading& entry) const {
+    std::vector<GroupValue> values;
+    for (const Part& part : m_parts) {
+        if (part.kind == Kind::value &&
+            std::none_of(values.begin(), values.end(), isNamed(part.text))) {
+            appendValue(values.emplace_back(GroupValue{part.text, ""}).value, part, entry);
+        }
+    }
+    return values;
 }
 
 } // namespace zrm::host

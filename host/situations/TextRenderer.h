@@ -18,11 +18,14 @@ namespace zrm::host {
 
 /// What the text of an event may say beside the values of its entry.
 struct TextFacts {
-    std::uint64_t count = 1;           ///< entries that were counted
-    std::int64_t first = 0;            ///< time of the first of them: milliseconds since 1970, UTC
-    std::int64_t last = 0;             ///< time of the last
-    std::string_view log;              ///< full path, UTF-8
-    std::span<const GroupValue> group; ///< values for events without an entry
+    std::uint64_t count = 1; ///< entries that were counted
+    std::int64_t first = 0;  ///< time of the first of them: milliseconds since 1970, UTC
+    std::int64_t last = 0;   ///< time of the last
+    std::string_view log;    ///< full path, UTF-8
+
+    // For events without an entry.
+    std::span<const GroupValue> group;
+    std::span<const GroupValue> values; ///< of the entry that raised the episode
 };
 
 /// Makes the texts of a situation's events, for people: on one line, in UTF-8, of a bounded length.
@@ -41,8 +44,12 @@ public:
     /// The text of an event that an entry has raised. Times in columns are as UtcTime writes them.
     std::string text(EntryReading& entry, const TextFacts& facts) const;
 
-    /// The text of an event without an entry: the values of its group, "-" for any other.
+    /// The text of an event without an entry: the values of its group and of the entry that raised
+    /// the episode, "-" for any other.
     std::string text(const TextFacts& facts) const;
+
+    /// What the text says of the entry, for the events of its episode that have none.
+    std::vector<GroupValue> values(EntryReading& entry) const;
 
 private:
     using Kind = TextTemplate::Piece::Kind;
@@ -56,7 +63,7 @@ private:
 
     std::string render(EntryReading* entry, const TextFacts& facts) const;
     void appendValue(std::string& out, const Part& part, EntryReading& entry) const;
-    void appendGroup(std::string& out, const Part& part, const TextFacts& facts) const;
+    static void appendKept(std::string& out, const Part& part, const TextFacts& facts);
 
     const std::string m_situation;
     std::vector<Part> m_parts;

@@ -121,6 +121,23 @@ def test_an_episode_that_ran_out_while_the_agent_was_stopped_is_resolved_at_the_
     assert agent.stop() == 0
 
 
+def test_the_end_of_an_episode_says_what_its_beginning_said_also_after_a_restart(agent):
+    log = followed(agent)
+    bruteforce(agent, resolve_after="4s", text="{count} failures of {user} from {ip} on {ENTRYSYS}")
+    agent.start()
+    log.append("".join(failed("203.0.113.7") for _ in range(6)))
+    wait_stored(agent, 1)
+    agent.send(SIGKILL)
+    agent.wait_end()
+    time.sleep(5)  # it runs out
+    agent.start()
+    raised, resolved = wait_stored(agent, 2)
+    host = raised["row"]["ENTRYSYS"]
+    assert host and raised["text"] == f"5 failures of root from 203.0.113.7 on {host}"
+    assert resolved["text"] == f"6 failures of root from 203.0.113.7 on {host}"
+    assert agent.stop() == 0
+
+
 def test_entries_from_while_the_agent_was_stopped_are_judged_as_if_read_in_time(agent):
     log = followed(agent)
     bruteforce(agent, resolve_after="60s")

@@ -38,7 +38,7 @@ protected:
     RecordingTrace trace{0};
     const TimeZone zone{"UTC0"};
     GivenEntry entry;
-    TextFacts facts{5, 1'795'158'189'000, 1'795'158'249'500, "/var/log/auth.log", {}};
+    TextFacts facts{5, 1'795'158'189'000, 1'795'158'249'500, "/var/log/auth.log", {}, {}};
 };
 
 TEST_F(TextRendererTest, IsNotNeededWithoutPlaces) {
@@ -95,6 +95,21 @@ TEST_F(TextRendererTest, WithoutAnEntryThereAreTheGroupsValues) {
     const std::vector<GroupValue> group = {{"ip", "10.0.0.7"}};
     facts.group = group;
     EXPECT_EQ(rendererOf("{count} from {ip} on {ENTRYSYS}").text(facts), "5 from 10.0.0.7 on -");
+}
+
+TEST_F(TextRendererTest, WithoutAnEntryThereAreTheValuesOfTheEntryThatRaisedTheEpisode) {
+    entry.describe("Failed password for eve from 10.0.0.7");
+    GivenEntry::fill(entry.row.entrysys, "web1");
+    EntryReading reading;
+    reading.begin(*entry.layout, entry.bytes(), &entry);
+    const TextRenderer renderer = rendererOf("{count} of {user}, {user} on {ENTRYSYS} at {ip}");
+    const std::vector<GroupValue> kept = renderer.values(reading);
+    EXPECT_EQ(kept,
+              (std::vector<GroupValue>{{"user", "eve"}, {"ENTRYSYS", "web1"}, {"ip", "10.0.0.7"}}));
+    const std::vector<GroupValue> group = {{"ip", "10.0.0.8"}};
+    facts.group = group;
+    facts.values = kept;
+    EXPECT_EQ(renderer.text(facts), "5 of eve, eve on web1 at 10.0.0.8") << "the group comes first";
 }
 
 } // namespace
