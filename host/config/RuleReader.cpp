@@ -51,6 +51,7 @@ void RuleReader::add(const std::string& name, unsigned line, const toml::table& 
     const ConfigProblems::Place place(m_problems, line);
     SituationConfig config = m_reader.read(situation, {}, "use");
     config.rule = rule->name;
+    config.ruleFile = rule->path;
     config.ruleLogs = rule->logs;
     m_situations.push_back(std::move(config));
 }

@@ -5,6 +5,7 @@
 #include "host/config/TextTemplate.h"
 
 #include <algorithm>
+#include <fstream>
 #include <string_view>
 
 namespace zrm::host {
@@ -74,20 +75,46 @@ bool isMonitored(const HostConfig& config, const std::string& log) {
     });
 }
 
-bool hasLogConfig(const HostConfig& config) {
-    return std::any_of(config.environment.begin(), config.environment.end(),
-                       [](const auto& one) { return one.variable == "ZRM_CONFIG_FILE"; });
+/// The log configuration; empty: none.
+std::string logConfigOf(const HostConfig& config) {
+    const auto found = std::find_if(
+        config.environment.begin(), config.environment.end(),
+        [](const EnvironmentSetting& one) { return one.variable == "ZRM_CONFIG_FILE"; });
+    return found == config.environment.end() ? "" : found->value;
 }
 
-/// A rule whose log nobody monitors is never raised. Logs of the log configuration are not known
-/// here.
+/// Whether a line of the log configuration is, or may be, about one of these logs. Without lines
+/// the agent takes the logs of the system's syslog.
+bool mayName(const std::string& logConfig, const std::vector<std::string>& logs) {
+    std::ifstream lines(logConfig);
+    bool hasLines = false;
+    for (std::string line; std::getline(lines, line);) {
+        const std::string_view text =
+            std::string_view(line).substr(std::min(line.find_first_not_of(" \t"), line.size()));
+        hasLines = hasLines || (!text.empty() && text.front() != '#');
+        const auto isAbout = [text](const std::string& log) {
+            return text.starts_with(log) && (text.size() == log.size() || text[log.size()] == ';' ||
+                                             text[log.size()] == ' ' || text[log.size()] == '\t');
+        };
+        if (std::any_of(logs.begin(), logs.end(), isAbout)) {
+            return true;
+        }
+    }
+    return !hasLines;
+}
+
+/// A rule whose log nobody monitors is never raised.
 std::string ruleWarning(const HostConfig& config, const SituationConfig& situation) {
-    if (situation.rule.empty() || hasLogConfig(config)) {
+    if (situation.rule.empty()) {
         return {};
     }
     std::vector<std::string> logs = situation.ruleLogs;
     if (situation.log) {
         logs = {*situation.log};
+    }
+    const std::string logConfig = logConfigOf(config);
+    if (!logConfig.empty() && mayName(logConfig, logs)) {
+        return {};
     }
     std::string names;
     for (const std::string& log : logs) {
@@ -98,7 +125,9 @@ std::string ruleWarning(const HostConfig& config, const SituationConfig& situati
     }
     return names.empty()
                ? ""
-               : "no [[log]] table names " + names +
+               : "no [[log]] table " +
+                     (logConfig.empty() ? "" : "and no line of " + logConfig + ' ') + "names " +
+                     names +
                      (situation.log
                           ? "; add one, or name another log"
                           : "; add one, or name the log that has such entries: [[use]] with "

@@ -59,6 +59,7 @@ Host::Host() : m_logs([] { ::kill(::getpid(), SIGHUP); }) {}
 void Host::configure(HostConfig config, WatchedFile file, ServiceNotifier notifier) {
     m_config = std::move(config);
     m_file = std::move(file);
+    watchRules();
     m_notifier = std::move(notifier);
     m_history = openHistory(m_config);
 }
@@ -182,9 +183,35 @@ void Host::tick(int number) {
         sayNoLogs();
     }
     m_serving->tick();
-    if (m_file.hasChanged()) {
+    if (haveFilesChanged()) {
         reload();
     }
+}
+
+/// Whether the configuration, or a ready situation that it uses, has changed.
+bool Host::haveFilesChanged() {
+    bool hasChanged = m_file.hasChanged();
+    for (auto& [path, file] : m_ruleFiles) {
+        hasChanged = file.hasChanged() || hasChanged;
+    }
+    return hasChanged;
+}
+
+/// Files that are watched already stay as they were seen last.
+void Host::watchRules() {
+    std::map<std::string, WatchedFile> files;
+    for (const SituationConfig& situation : m_config.situations) {
+        if (situation.ruleFile.empty()) {
+            continue;
+        }
+        const auto known = m_ruleFiles.find(situation.ruleFile);
+        if (known != m_ruleFiles.end()) {
+            files.insert(*known);
+        } else {
+            files.emplace(situation.ruleFile, WatchedFile(situation.ruleFile));
+        }
+    }
+    m_ruleFiles = std::move(files);
 }
 
 void Host::sayNoLogs() const {
@@ -247,6 +274,7 @@ void Host::reload() {
             m_file.path().c_str());
     }
     m_config = std::move(config);
+    watchRules();
 }
 
 void Host::stop() {

@@ -9,6 +9,7 @@
 #include "host/start/Watchdog.h"
 
 #include <condition_variable>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <set>
@@ -66,6 +67,8 @@ private:
     bool begin();
     bool waitForTick();
     void tick(int number);
+    bool haveFilesChanged();
+    void watchRules();
     void reload();
     void sayNoLogs() const;
     void sayWhatIsReadAgain(const std::set<std::string>& monitored) const;
@@ -77,6 +80,7 @@ private:
     HostConfig m_config;
     OpenedHistory m_history; ///< until it is served
     WatchedFile m_file{""};
+    std::map<std::string, WatchedFile> m_ruleFiles; ///< of the situations in force, by path
     ServiceNotifier m_notifier;
     int (*m_loader)() = nullptr;
     std::string m_traceFile;

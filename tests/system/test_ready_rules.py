@@ -94,6 +94,32 @@ def test_use_is_reloaded(agent, log):
     assert event["situation"] == "ssh-password-login"
 
 
+def test_a_changed_rule_is_reloaded_alone(agent, log):
+    agent.rules = agent.directory / "rules"
+    agent.rules.mkdir()
+    rule = agent.rules / "ours.toml"
+    text = "description = 'Ours'\n[situation]\nseverity = '{}'\nwhen = \"ENTRYDESC contains '{}'\"\n"
+    rule.write_text(text.format("minor", "Failed"))
+    agent.use = ["ours"]
+    agent.start()
+    log.append(failed(1))
+    assert [event["severity"] for event in agent.wait_events(1)] == ["minor"]
+    rule.write_text(text.format("major", "password"))
+
+    def raised():
+        log.append(failed(2))
+        return [event for event in agent.events() if event["severity"] == "major"]
+
+    wait_until(raised, "the changed rule to be in force")
+    rule.write_text("[situation]\nwhen = 'nonsense'\n")
+    wait_until(lambda: "was not loaded; the situations and the logs stay" in agent.stderr.text(), "the refusal")
+    before = len(agent.events())
+    log.append(failed(3))
+    assert agent.wait_events(before + 1)[-1]["severity"] == "major"
+    rule.write_text(text.format("critical", "password"))
+    wait_until(lambda: [log.append(failed(4))] and agent.events()[-1]["severity"] == "critical", "the fixed rule")
+
+
 def start_refused(agent):
     agent.start(wait=False)
     assert agent.process.wait(PATIENCE) == 2

@@ -114,8 +114,18 @@ TEST_F(RuleReaderTest, WarnsIfNoLogOfTheRuleIsMonitored) {
     EXPECT_THAT(warnings("use = ['disk']", "[[log]]\ntype = 'journal'\n"), IsEmpty());
     EXPECT_THAT(warnings("", "[[use]]\nrule = 'disk'\nlog = '/a'\n[[log]]\npath = '/b'\n"),
                 ElementsAre(HasSubstr("no [[log]] table names /a; add one, or name another log")));
-    EXPECT_THAT(warnings("use = ['disk']", "[agent]\nlog_config = '/etc/zrm/logs.conf'\n"),
-                IsEmpty());
+    EXPECT_THAT(warnings("use = ['disk']", "[agent]\nlog_config = '/none/logs.conf'\n"), IsEmpty())
+        << "the agent takes the logs of the system's syslog";
+    const std::string logs = directory.path().string() + "/logs.conf";
+    const std::string tables = "[agent]\nlog_config = '" + logs + "'\n";
+    directory.write("logs.conf", "# /var/log/kern.log\n/var/log/kern.log.1 ;N ;S\n");
+    EXPECT_THAT(warnings("use = ['disk']", tables),
+                ElementsAre(HasSubstr("no [[log]] table and no line of " + logs +
+                                      " names /var/log/kern.log or journal; add one")));
+    directory.write("logs.conf", "/a ;N ;S\n  /var/log/kern.log;N ;S\n");
+    EXPECT_THAT(warnings("use = ['disk']", tables), IsEmpty());
+    directory.write("logs.conf", "# nothing\n");
+    EXPECT_THAT(warnings("use = ['disk']", tables), IsEmpty());
 }
 
 } // namespace
