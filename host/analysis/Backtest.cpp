@@ -238,6 +238,7 @@ void Backtest::add(const zrm_rmlogent_data_t& row, std::optional<std::int64_t> i
         matched.group = m_texts.add(values.group);
         matched.distinct = m_texts.add(values.distinct);
         matched.log = m_texts.add(values.log);
+        matched.mayRaise = values.mayRaise;
     }
 }
 
@@ -273,7 +274,7 @@ Replay::Verdict Backtest::count(const Matched& matched) {
     Replay::Values values;
     if (m_replay.isJudged()) {
         values = {m_texts.text(matched.group), m_texts.text(matched.distinct),
-                  m_texts.text(matched.log)};
+                  m_texts.text(matched.log), matched.mayRaise};
     }
     if (!matched.instant) {
         return m_replay.count(matched.time.data(), values);
@@ -351,7 +352,8 @@ std::string Backtest::decisionOf(const Result& result) const {
                (result.matched == 1 ? " meets" : " meet") + " every condition, but never " +
                (m_replay.frequency() < 0 ? "<= " : ">= ") +
                std::to_string(std::abs(m_replay.frequency())) + " in " +
-               std::to_string(m_replay.periodSeconds()) + " s";
+               std::to_string(m_replay.periodSeconds()) + " s" +
+               (m_then.empty() ? "" : " before one with " + m_then);
     }
     return text + (result.reach.isComplete()
                        ? "."

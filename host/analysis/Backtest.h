@@ -62,7 +62,8 @@ public:
 
     /// The table's manager must outlive the object.
     Backtest(const SituationConfig& situation, TableManager& entries)
-        : m_replay(situation, entries), m_resolveAfter(situation.judgement.resolveAfter) {}
+        : m_replay(situation, entries), m_resolveAfter(situation.judgement.resolveAfter),
+          m_then(situation.judgement.then) {}
 
     /// Whether the table opened a request; if not, nothing else may be called.
     bool isOpen() const noexcept { return m_replay.isOpen(); }
@@ -85,6 +86,7 @@ private:
         TextPool::Number group = 0;
         TextPool::Number distinct = 0;
         TextPool::Number log = 0;
+        bool mayRaise = true;
     };
 
     void read(LogFile& log, const std::string& from, const std::string& to, Limits& limits,
@@ -105,6 +107,7 @@ private:
     Replay m_replay;
     TextPool m_texts;
     std::int64_t m_resolveAfter;
+    std::string m_then;             ///< of JudgementConfig
     std::vector<Matched> m_matched; ///< newest first within a log, one log after another
 };
 

@@ -297,10 +297,14 @@ std::string Explainer::reasonOf(const Replay::Verdict& verdict) const {
         reason = numberOf(*verdict.frequency, isDistinct ? "value" : "entry",
                           isDistinct ? "different values" : "entries") +
                  (isDistinct ? " of " + rules.distinct : "") + group + " in " +
-                 std::to_string(m_replay.periodSeconds()) + " s, the threshold is " +
-                 boundOf(m_replay);
+                 std::to_string(m_replay.periodSeconds()) + " s" +
+                 (rules.then.empty() || !judged.mayRaise ? "" : " before it") +
+                 ", the threshold is " + boundOf(m_replay);
         isMet = rules.isUpperBound ? *verdict.frequency <= rules.frequency
                                    : *verdict.frequency >= rules.frequency;
+    }
+    if (!judged.mayRaise) {
+        return reason + ", and only an entry with " + rules.then + " raises an event";
     }
     if (judged.decision == RAISES) {
         return reason + (judged.hasEpisode ? ", and an episode begins" : "");

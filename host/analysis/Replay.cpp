@@ -149,13 +149,14 @@ Replay::Verdict Replay::take() {
 void Replay::judgeGroup(std::int64_t time, const Values& values, Verdict& verdict) {
     using enum EpisodeJudge::Decision;
     const EpisodeJudge::Verdict found =
-        m_judge->judge({time, values.group, values.distinct, values.log}, m_ended);
+        m_judge->judge({time, values.group, values.distinct, values.log, values.mayRaise}, m_ended);
     verdict.isRaised = found.decision == RAISES;
     if (hasThresholds()) {
         verdict.frequency = static_cast<long>(found.count);
     }
     Judged& judged = verdict.judged.emplace();
     judged.decision = found.decision;
+    judged.mayRaise = values.mayRaise;
     judged.group = groupValues(values.group);
     if (found.episode != nullptr) {
         judged.hasEpisode = true;
@@ -167,7 +168,8 @@ void Replay::judgeGroup(std::int64_t time, const Values& values, Verdict& verdic
 Replay::Values Replay::valuesOf(const zrm_rmlogent_data_t& row) {
     const char* const bytes = reinterpret_cast<const char*>(&row);
     m_values->read(layout(), bytes, LogEntry::ofThisThread);
-    return {m_values->group(), m_values->distinct(), LogPath::of(layout(), bytes)};
+    return {m_values->group(), m_values->distinct(), LogPath::of(layout(), bytes),
+            m_values->mayRaise()};
 }
 
 std::vector<GroupValue> Replay::groupValues(std::string_view key) const {

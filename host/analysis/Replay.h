@@ -24,11 +24,20 @@ namespace zrm::host {
 /// What groups, episodes and pauses make of an entry that meets every condition.
 struct JudgedEntry {
     EpisodeJudge::Decision decision = EpisodeJudge::Decision::NONE;
+    bool mayRaise = true;               ///< it has the value of `then`, if there is one
     std::vector<GroupValue> group = {}; ///< empty: the situation has no groups
     // Of the episode that it begins or continues.
     bool hasEpisode = false;
     std::int64_t first = 0; ///< seconds since 1970
     std::uint64_t count = 0;
+};
+
+/// By what a matching entry is judged, beside its time.
+struct JudgedBy {
+    std::string group; ///< its key
+    std::string distinct;
+    std::string log;
+    bool mayRaise = true; ///< it has the value of `then`, if there is one
 };
 
 /// Judges entries as a situation would, without being one: a request of the agent's own, which no
@@ -45,12 +54,7 @@ public:
         std::optional<long> frequency; ///< entries counted in the period; none without thresholds
         std::optional<Judged> judged = std::nullopt; ///< only with isJudged(), if it matches
     };
-    /// By what a matching entry is judged, beside its time.
-    struct Values {
-        std::string group; ///< its key
-        std::string distinct;
-        std::string log;
-    };
+    using Values = JudgedBy;
 
     /// The table's manager outlives the object.
     Replay(const SituationConfig& situation, TableManager& entries);

@@ -54,6 +54,7 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
         text.judgement.maxGroups = fields.number("max_groups", 1, JudgementRules::mostGroups);
     }
     text.judgement.distinct = fields.optionalText("distinct");
+    text.judgement.then = fields.optionalText("then");
     text.judgement.resolveAfter = fields.optionalText("resolve_after");
     text.judgement.cooldown = fields.optionalText("cooldown");
     fields.refuseUnknown();

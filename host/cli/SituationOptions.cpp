@@ -113,6 +113,8 @@ void SituationOptions::addTo(CLI::App& command) {
         ->allow_extra_args(false);
     addMember("max_groups", m_maxGroups, "COUNT", "How many groups are kept at a time");
     addMember("distinct", m_distinct, "NAME", "Count different values of this, not entries");
+    addMember("then", m_then, "NAME=VALUE",
+              "Raise only with an entry of this value, before which the others have come");
     addMember("resolve_after", m_resolveAfter, "TIME",
               "Raise one event per episode, which ends when nothing has come for this long");
     addMember("cooldown", m_cooldown, "TIME", "Raise at most one event within this time");

@@ -54,6 +54,7 @@ private:
     std::vector<std::string> m_groupBy;
     std::string m_maxGroups;
     std::string m_distinct;
+    std::string m_then;
     std::string m_resolveAfter;
     std::string m_cooldown;
 };

@@ -53,6 +53,7 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
         facts.add("group by", JsonText::text(name));
     }
     facts.add("distinct", JsonText::text(situation, "distinct"));
+    facts.add("then", JsonText::text(situation, "then"));
     facts.add("resolve after", JsonText::text(situation, "resolve_after"));
     facts.add("cooldown", JsonText::text(situation, "cooldown"));
     const std::string context = JsonText::text(situation, "context");

@@ -55,8 +55,8 @@ struct SituationConfig {
     std::size_t context = 0;  ///< earlier entries of the log that its events have
     std::string runbook = {}; ///< URL of what to do about its events; empty: none
     std::map<std::string, std::string> labels = {}; ///< of its events, for their receivers
-    std::string rule = {}; ///< the ready situation that it is; empty: written by the operator
-    std::string ruleFile = {};              ///< of that one
+    std::string rule = {};     ///< the ready situation that it is; empty: written by the operator
+    std::string ruleFile = {}; ///< of that one
     std::vector<std::string> ruleLogs = {}; ///< paths of logs that the rule is for
     JudgementConfig judgement = {};
     std::size_t patternSize = 0; ///< instructions in its regular expressions (PatternBudget)

@@ -4,13 +4,14 @@
 #include <cstddef>
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace zrm::host {
 
 /// What the host decides about the entries that meet a situation's conditions, where `group_by`,
-/// `distinct`, `resolve_after` or `cooldown` ask for more than the table of entries does. Durations
-/// are in seconds.
+/// `distinct`, `then`, `resolve_after` or `cooldown` ask for more than the table of entries does.
+/// Durations are in seconds.
 struct JudgementConfig {
     static constexpr std::size_t usualGroups = 10'000;
 
@@ -20,15 +21,25 @@ struct JudgementConfig {
     std::int64_t frequency = 0;            ///< of the threshold; 0: none
     bool isUpperBound = false;             ///< at most `frequency`, not at least
     std::int64_t period = 0;               ///< of the threshold
-    std::int64_t resolveAfter = 0;         ///< an episode ends this long after its last entry;
-                                           ///< 0: there are no episodes
-    std::int64_t cooldown = 0;             ///< of a group after an event; 0: none
-    std::string resolveAfterText = {};     ///< as the operator has written it
+    /// Only an entry with a certain value raises an event, if the others within the period before
+    /// it meet the threshold: "NAME=VALUE"; empty: every entry may, and counts.
+    std::string then = {};
+    std::int64_t resolveAfter = 0;     ///< an episode ends this long after its last entry;
+                                       ///< 0: there are no episodes
+    std::int64_t cooldown = 0;         ///< of a group after an event; 0: none
+    std::string resolveAfterText = {}; ///< as the operator has written it
     std::string cooldownText = {};
 
     /// Whether the host judges at all.
     bool isUsed() const noexcept {
-        return !groupBy.empty() || !distinct.empty() || resolveAfter > 0 || cooldown > 0;
+        return !groupBy.empty() || !distinct.empty() || !then.empty() || resolveAfter > 0 ||
+               cooldown > 0;
+    }
+    std::string_view thenName() const noexcept {
+        return std::string_view(then).substr(0, then.find('='));
+    }
+    std::string_view thenValue() const noexcept {
+        return std::string_view(then).substr(then.find('=') + 1);
     }
     bool operator==(const JudgementConfig&) const = default;
 };

@@ -69,6 +69,26 @@ void checkGroups(const JudgementText& text, const EntryNames& names, Problems& p
     }
 }
 
+void checkThen(const JudgementText& text, const JudgementConfig& rules, const EntryNames& names,
+               Problems& problems) {
+    if (!text.then) {
+        return;
+    }
+    const std::size_t sign = text.then->find('=');
+    if (sign == 0 || sign == std::string::npos) {
+        problems.push_back({"'" + *text.then + "' is not a name and a value",
+                            "write NAME=VALUE, for example \"result=Accepted\"", "then"});
+        return;
+    }
+    checkName("then", text.then->substr(0, sign), names, problems);
+    if (rules.frequency == 0 || rules.period == 0) {
+        problems.push_back({"has no effect without frequency and period",
+                            "add how many entries come before: frequency = \">= 5\" and "
+                            "period = \"10m\"",
+                            "then"});
+    }
+}
+
 } // namespace
 
 JudgementConfig JudgementRules::check(const JudgementText& text, std::vector<Condition>& conditions,
@@ -76,6 +96,7 @@ JudgementConfig JudgementRules::check(const JudgementText& text, std::vector<Con
     JudgementConfig rules;
     rules.groupBy = text.groupBy;
     rules.distinct = text.distinct.value_or("");
+    rules.then = text.then.value_or("");
     rules.resolveAfter = durationOf("resolve_after", text.resolveAfter, problems);
     rules.cooldown = durationOf("cooldown", text.cooldown, problems);
     rules.resolveAfterText = text.resolveAfter.value_or("");
@@ -93,6 +114,7 @@ JudgementConfig JudgementRules::check(const JudgementText& text, std::vector<Con
     checkGroups(text, names, problems);
     rules.maxGroups = static_cast<std::size_t>(std::clamp<std::int64_t>(
         text.maxGroups.value_or(JudgementConfig::usualGroups), 1, mostGroups));
+    checkThen(text, rules, names, problems);
     if (text.distinct) {
         checkName("distinct", *text.distinct, names, problems);
         if (rules.frequency == 0 || rules.period == 0) {

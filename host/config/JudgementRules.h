@@ -18,6 +18,7 @@ struct JudgementText {
     std::vector<std::string> groupBy = {};
     std::optional<std::int64_t> maxGroups = std::nullopt;
     std::optional<std::string> distinct = std::nullopt;
+    std::optional<std::string> then = std::nullopt;
     std::optional<std::string> resolveAfter = std::nullopt;
     std::optional<std::string> cooldown = std::nullopt;
 };

@@ -68,6 +68,7 @@ SituationConfig SituationReader::read(const toml::table& table, const std::strin
     }
     text.judgement.maxGroups = section.number("max_groups");
     text.judgement.distinct = fields.text("distinct");
+    text.judgement.then = fields.text("then");
     text.judgement.resolveAfter = fields.text("resolve_after");
     text.judgement.cooldown = fields.text("cooldown");
 

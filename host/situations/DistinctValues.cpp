@@ -53,4 +53,16 @@ std::int64_t DistinctValues::add(std::int64_t time, std::int64_t period, std::st
     return static_cast<std::int64_t>(span.times.size());
 }
 
+std::int64_t DistinctValues::within(std::int64_t time, std::int64_t period) const {
+    std::int64_t most = 0;
+    for (const Span& span : m_spans) {
+        const auto found =
+            std::count_if(span.times.begin(), span.times.end(), [&](const auto& one) {
+                return one.second > time - period && one.second <= time;
+            });
+        most = std::max<std::int64_t>(most, found);
+    }
+    return most;
+}
+
 } // namespace zrm::host

@@ -23,6 +23,9 @@ public:
     /// with the newest entry less than a period away. Both in seconds.
     std::int64_t add(std::int64_t time, std::int64_t period, std::string_view value);
 
+    /// The number of different values that were added of the period (time - period, time].
+    std::int64_t within(std::int64_t time, std::int64_t period) const;
+
 private:
     /// Values whose times are less than a period before the newest one.
     struct Span {

@@ -64,15 +64,33 @@ bool EpisodeJudge::count(Group& group, const Entry& entry, Verdict& verdict) con
     if (m_rules.frequency == 0) {
         return true;
     }
-    verdict.count = group.windows.add(entry.time, m_rules.period);
-    if (!m_rules.distinct.empty()) {
-        if (group.values == nullptr) {
-            group.values = std::make_unique<DistinctValues>();
-        }
-        verdict.count = group.values->add(entry.time, m_rules.period, entry.distinct);
+    if (!m_rules.distinct.empty() && group.values == nullptr) {
+        group.values = std::make_unique<DistinctValues>();
     }
-    return m_rules.isUpperBound ? verdict.count <= m_rules.frequency
-                                : verdict.count >= m_rules.frequency;
+    if (isAfterOthers(entry)) {
+        verdict.count = group.windows.within(entry.time, m_rules.period).entries;
+        if (!m_rules.distinct.empty()) {
+            verdict.count = group.values->within(entry.time, m_rules.period);
+        }
+    } else {
+        verdict.count = group.windows.add(entry.time, m_rules.period);
+        if (!m_rules.distinct.empty()) {
+            verdict.count = group.values->add(entry.time, m_rules.period, entry.distinct);
+        }
+    }
+    const bool isMet = m_rules.isUpperBound ? verdict.count <= m_rules.frequency
+                                            : verdict.count >= m_rules.frequency;
+    return isMet && entry.mayRaise;
+}
+
+/// The entries that the threshold has counted, with this one.
+EntryWindows::Counted EpisodeJudge::countedWith(const Group& group, const Entry& entry) const {
+    if (!isAfterOthers(entry)) {
+        return group.windows.counted(entry.time, m_rules.period);
+    }
+    EntryWindows::Counted counted = group.windows.within(entry.time, m_rules.period);
+    ++counted.entries;
+    return counted;
 }
 
 EpisodeJudge::Verdict EpisodeJudge::judge(const Entry& entry, std::vector<EndedEpisode>& ended) {
@@ -85,7 +103,7 @@ EpisodeJudge::Verdict EpisodeJudge::judge(const Entry& entry, std::vector<EndedE
     } else if (isMet && !cools(group, entry.time)) {
         verdict.decision = Decision::RAISES;
         if (verdict.count > 0) {
-            verdict.first = group.windows.counted(entry.time, m_rules.period).first;
+            verdict.first = countedWith(group, entry).first;
         }
     }
     return verdict;
@@ -120,7 +138,7 @@ void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Ve
     }
     std::uint64_t entries = 1;
     if (m_rules.frequency > 0) {
-        const auto counted = group.windows.counted(entry.time, m_rules.period);
+        const auto counted = countedWith(group, entry);
         entries = static_cast<std::uint64_t>(counted.entries);
         verdict.first = counted.first;
     }

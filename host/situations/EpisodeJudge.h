@@ -37,6 +37,8 @@ public:
         std::string_view group = {};
         std::string_view distinct = {}; ///< the value that is counted, if any is
         std::string_view log = {};      ///< its name
+        /// Whether it has the value of `then`. Without one, every entry may raise an event.
+        bool mayRaise = true;
     };
 
     enum class Decision {
@@ -84,6 +86,8 @@ private:
     Group& groupOf(const Entry& entry, std::vector<EndedEpisode>& ended);
     bool isIdle(const Group& group, std::int64_t time) const;
     bool count(Group& group, const Entry& entry, Verdict& verdict) const;
+    bool isAfterOthers(const Entry& entry) const { return !m_rules.then.empty() && entry.mayRaise; }
+    EntryWindows::Counted countedWith(const Group& group, const Entry& entry) const;
     void judgeEpisode(Group& group, const Entry& entry, bool isMet, Verdict& verdict,
                       std::vector<EndedEpisode>& ended);
     void endEarlier(Group& group, const Entry& entry, std::vector<EndedEpisode>& ended);

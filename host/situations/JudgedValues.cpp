@@ -14,7 +14,7 @@ TRC1_Anchor anchor{"JudgedValues.cpp"};
 
 } // namespace
 
-JudgedValues::JudgedValues(const SituationConfig& config) {
+JudgedValues::JudgedValues(const SituationConfig& config) : m_then(config.judgement.thenValue()) {
     TraceScope trace(anchor);
     EntryValues values(config.conditions);
     const auto compile = [&](const std::string& name) {
@@ -32,6 +32,9 @@ JudgedValues::JudgedValues(const SituationConfig& config) {
     if (!config.judgement.distinct.empty()) {
         m_distinctValue = compile(config.judgement.distinct);
     }
+    if (!config.judgement.then.empty()) {
+        m_thenValue = compile(std::string(config.judgement.thenName()));
+    }
 }
 
 /// The value in the reading's entry, in UTF-8.
@@ -47,6 +50,9 @@ void JudgedValues::read(const RowLayout& layout, const char* row, LogEntry* entr
     }
     if (m_distinctValue) {
         m_distinct = valueOf(*m_distinctValue);
+    }
+    if (m_thenValue) {
+        m_mayRaise = valueOf(*m_thenValue) == m_then;
     }
 }
 

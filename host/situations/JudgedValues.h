@@ -31,6 +31,8 @@ public:
     const std::string& group() const noexcept { return m_group; }
     /// Empty if the situation counts entries.
     const std::string& distinct() const noexcept { return m_distinct; }
+    /// Whether it has the value that raises events; true if any does.
+    bool mayRaise() const noexcept { return m_mayRaise; }
     /// For further values, without matching patterns again.
     EntryReading& reading() noexcept { return m_reading; }
 
@@ -39,9 +41,12 @@ private:
 
     std::vector<EntryValue> m_groupValues;
     std::optional<EntryValue> m_distinctValue;
+    std::optional<EntryValue> m_thenValue;
+    const std::string m_then; ///< what m_thenValue is to be
     EntryReading m_reading;
     std::string m_group;
     std::string m_distinct;
+    bool m_mayRaise = true;
     std::string m_room; ///< of a value
     std::string m_utf8;
 };

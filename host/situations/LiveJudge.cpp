@@ -92,6 +92,9 @@ std::int64_t LiveJudge::definitionOf(const SituationConfig& config) {
         add(std::to_string(number));
     }
     add(rules.distinct);
+    if (!rules.then.empty()) {
+        add("then " + rules.then);
+    }
     return static_cast<std::int64_t>(XXH3_64bits(text.data(), text.size()));
 }
 
@@ -138,7 +141,7 @@ EpisodeJudge::Entry LiveJudge::entryOf(const RowLayout& layout, const char* row)
     }
     const auto& instant = EntryInstant::ofThisThread();
     return {instant ? *instant : WallClock::now() / second, m_values.group(), m_values.distinct(),
-            events == nullptr ? m_log : events->log()};
+            events == nullptr ? m_log : events->log(), m_values.mayRaise()};
 }
 
 std::optional<unsigned> LiveJudge::judge(const RowLayout& layout, const char* row) {
@@ -186,6 +189,9 @@ bool LiveJudge::push(const char* row, const EpisodeJudge::Entry& entry,
     }
     if (m_texts.isNeeded()) {
         TextFacts facts = factsOf(*judgement);
+        if (!rules.then.empty()) { // an episode has this entry, too
+            facts.count = static_cast<std::uint64_t>(verdict.count);
+        }
         facts.count = std::max<std::uint64_t>(facts.count, 1);
         facts.log = entry.log;
         judgement->text = m_texts.text(m_values.reading(), facts);

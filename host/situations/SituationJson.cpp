@@ -44,9 +44,10 @@ Json SituationJson::definition(const SituationConfig& situation) {
         object["group_by"] = judgement.groupBy;
         object["max_groups"] = judgement.maxGroups;
     }
-    for (const auto& [key, value] : {std::pair("distinct", &judgement.distinct),
-                                     std::pair("resolve_after", &judgement.resolveAfterText),
-                                     std::pair("cooldown", &judgement.cooldownText)}) {
+    for (const auto& [key, value] :
+         {std::pair("distinct", &judgement.distinct), std::pair("then", &judgement.then),
+          std::pair("resolve_after", &judgement.resolveAfterText),
+          std::pair("cooldown", &judgement.cooldownText)}) {
         if (!value->empty()) {
             object[key] = *value;
         }

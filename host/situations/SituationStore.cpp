@@ -93,6 +93,7 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
         text.judgement.maxGroups = object.at("max_groups").get<std::int64_t>();
     }
     text.judgement.distinct = optionalText(object, "distinct");
+    text.judgement.then = optionalText(object, "then");
     text.judgement.resolveAfter = optionalText(object, "resolve_after");
     text.judgement.cooldown = optionalText(object, "cooldown");
     SituationStore::Made made;

@@ -36,6 +36,16 @@ std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
     return most;
 }
 
+EntryWindows::Counted EntryWindows::within(std::int64_t time, std::int64_t period) const noexcept {
+    period = std::min(period, longestPeriod);
+    Counted most{0, time};
+    for (const Group& group : m_groups) {
+        const Counted found = group.within(time, period);
+        most = found.entries > most.entries ? found : most;
+    }
+    return most;
+}
+
 EntryWindows::Counted EntryWindows::counted(std::int64_t time, std::int64_t period) const noexcept {
     period = std::min(period, longestPeriod);
     Counted most{0, time};

@@ -34,6 +34,9 @@ public:
     /// What add has just counted for this time.
     Counted counted(std::int64_t time, std::int64_t period) const noexcept;
 
+    /// The entries that were added of the period (time - period, time].
+    Counted within(std::int64_t time, std::int64_t period) const noexcept;
+
     /// Whether no entry from this time on would be counted together with one that was added.
     bool isOver(std::int64_t time, std::int64_t period) const noexcept;
 

@@ -334,6 +334,8 @@ def test_a_history_from_before_episodes_goes_on(agent):
         ({"group_by": ["ip", "ip"]}, "group_by: 'ip' is there twice"),
         ({"max_groups": 5}, "max_groups: has no effect without group_by"),
         ({"group_by": "ip", "max_groups": 0}, "max_groups: 0 is not a usable number of groups"),
+        ({"then": "user=root"}, "then: has no effect without frequency and period"),
+        ({"then": "root", "frequency": ">= 2", "period": "1m"}, "then: 'root' is not a name and a value"),
         ({"distinct": "user"}, "distinct: has no effect without frequency and period"),
     ],
 )

@@ -17,6 +17,8 @@ SITUATIONS = {
     "groups": {"group_by": ["ip"], "frequency": ">= 3", "period": "60s", "resolve_after": "90s"},
     "users": {"group_by": ["ip"], "distinct": "user", "frequency": ">= 3", "period": "5m", "resolve_after": "2m"},
     "pauses": {"group_by": "ip", "frequency": ">= 2", "period": "30s", "cooldown": "10m"},
+    "after": {"group_by": ["ip"], "frequency": ">= 2", "period": "5m", "then": "user=user3", "cooldown": "1m"},
+    "lasting": {"group_by": ["ip"], "frequency": ">= 3", "period": "5m", "then": "user=user3", "resolve_after": "2m"},
     "episodes": {"resolve_after": "20s"},
     "alternating": {"group_by": ["user"], "max_groups": 2, "resolve_after": "30s"},
 }
@@ -96,6 +98,7 @@ def test_an_explanation_says_what_became_of_an_entry(agent):
     agent.situation("bruteforce", when=FAILED, log=log, **SITUATIONS["groups"])
     agent.situation("paused", when=FAILED, log=log, **SITUATIONS["pauses"])
     agent.situation("users", when=FAILED, log=log, **SITUATIONS["users"])
+    agent.situation("after", when=FAILED, log=log, **SITUATIONS["after"])
     agent.start()
     api = Analysis(agent)
     log.append("".join(failed("10.0.0.1", f"user{second}", when=at(second - 3600)) for second in range(4)))
@@ -119,6 +122,13 @@ def test_an_explanation_says_what_became_of_an_entry(agent):
     assert decisions("users")[1] == (
         f"Would not be raised: 2 different values of user {group} in 300 s, the threshold is >= 3."
     )
+    assert decisions("after")[1:] == [
+        f"Would not be raised: 2 entries {group} in 300 s, the threshold is >= 2, "
+        "and only an entry with user=user3 raises an event.",
+        f"Would not be raised: 3 entries {group} in 300 s, the threshold is >= 2, "
+        "and only an entry with user=user3 raises an event.",
+        f"Would be raised: 3 entries {group} in 300 s before it, the threshold is >= 2.",
+    ]
     # A line that is not in the log comes after all that are.
     line = failed("10.0.0.1", "other", when=at(4 - 3600)).rstrip()
     (explained,) = api.request("POST", "/api/v1/explain", {"situation": "bruteforce", "log": str(log), "line": line})[2][

@@ -12,7 +12,7 @@ from zrmctl import run
 ROOT = Path(__file__).resolve().parents[2]
 RULES = ROOT / "rules"
 NAMED = {
-    "ssh-bruteforce", "ssh-password-login", "sudo-failure", "account-created", "kernel-oom", "disk-error",
+    "ssh-bruteforce", "ssh-bruteforce-success", "ssh-password-login", "sudo-failure", "account-created", "kernel-oom", "disk-error",
     "filesystem-error", "segfault", "systemd-unit-failed", "systemd-restart-loop", "certificate-expiry",
     "cron-failure", "http-5xx", "http-scan", "postgresql-deadlock", "postgresql-connections", "failover",
 }  # fmt: skip
@@ -78,6 +78,33 @@ def test_rules_for_formats_read_their_fields(agent, log):
     web.append(line.format(200) + line.format(503) + line.format(404) + line.format(502))
     event = agent.wait_events(2)[0]
     assert event["text"].startswith("2 answers with a status from 500, the last 502 for GET /cart")
+
+
+def test_a_login_after_a_brute_force_is_reported_also_across_a_restart(agent, log):
+    agent.use = ["ssh-bruteforce-success"]
+    agent.listen = "127.0.0.1:0"
+    agent.start()
+    accepted = "Nov 20 07:0{}:05 web1 sshd[8]: Accepted {} for anna from {} port 22 ssh2\n"
+    log.append("".join(failed(second) for second in range(4)) + failed(4, "2001:db8::7"))
+    log.append(accepted.format(4, "password", "203.0.113.7"))  # after four
+    log.append("".join(failed(second, "198.51.100.4") for second in range(5, 10)))
+    api = Api(agent)
+
+    def matched():
+        (situation,) = api.request("GET", "/api/v1/situations")[2]["situations"]
+        return situation["counts"]["matched"] == 11
+
+    wait_until(matched, "the entries to be judged")
+    assert agent.stop() == 0 and agent.events() == []
+    agent.start()  # what was counted is counted again
+    log.append(accepted.format(5, "publickey", "2001:db8::7"))
+    log.append(accepted.format(6, "keyboard-interactive/pam", "198.51.100.4"))
+    (event,) = agent.wait_events(1)
+    assert (event["severity"], event["count"]) == ("critical", 5)
+    assert event["text"] == "SSH login as anna from 198.51.100.4 on web1 after 5 failed ones"
+    log.append(accepted.format(7, "password", "198.51.100.4"))  # it cools down
+    log.append(failed(1, "198.51.100.4"))
+    assert agent.stop() == 0 and len(agent.events()) == 1
 
 
 def test_use_is_reloaded(agent, log):

@@ -99,6 +99,12 @@ TEST(SituationValidator, WithGroupsOrEpisodesTheHostCounts) {
     EXPECT_EQ(situation.judgement.resolveAfter, 900);
     EXPECT_EQ(situation.judgement.maxGroups, 7u);
     text.judgement = {};
+    text.judgement.then = "ENTRYSYS=a=b";
+    const JudgementConfig sequence = SituationValidator::check(text).situation.judgement;
+    EXPECT_TRUE(sequence.isUsed());
+    EXPECT_EQ(sequence.thenName(), "ENTRYSYS");
+    EXPECT_EQ(sequence.thenValue(), "a=b");
+    text.judgement = {};
     text.judgement.cooldown = "1h";
     text.frequency = "> 4";
     EXPECT_EQ(SituationValidator::check(text).situation.judgement.frequency, 5);
@@ -124,6 +130,14 @@ TEST(SituationValidator, RefusesRulesOfGroupsAndEpisodesThatHaveNoEffect) {
     EXPECT_THAT(fieldsWith({.groupBy = {"ENTRYSYS"}, .maxGroups = 1'000'001}),
                 ElementsAre("max_groups"));
     EXPECT_THAT(fieldsWith({.distinct = "ENTRYSYS"}), ElementsAre("distinct"));
+    EXPECT_THAT(fieldsWith({.then = "ENTRYSYS=web1"}), ElementsAre("then")) << "no threshold";
+    for (const char* const then : {"", "=web1", "ENTRYSYS", "nobody=x"}) {
+        SituationText text = named("a");
+        text.frequency = ">= 2";
+        text.period = "1m";
+        text.judgement.then = then;
+        EXPECT_THAT(fieldsOf(text), ElementsAre("then")) << then;
+    }
     EXPECT_THAT(fieldsWith({.resolveAfter = "0s"}), ElementsAre("resolve_after"));
     EXPECT_THAT(fieldsWith({.cooldown = "soon"}), ElementsAre("cooldown"));
     EXPECT_THAT(fieldsWith({.resolveAfter = "1m", .cooldown = "1m"}), ElementsAre("cooldown"));

@@ -68,6 +68,77 @@ TEST_F(EpisodeJudgeTest, OneEpisodeForABurst) {
     EXPECT_TRUE(ended.empty());
 }
 
+/// Three others within a minute, then the entry.
+JudgementConfig sequence() {
+    JudgementConfig rules = lasting(0, 3);
+    rules.groupBy = {"ip"};
+    rules.then = "result=Accepted";
+    return rules;
+}
+
+TEST_F(EpisodeJudgeTest, WhatComesAfterOthersRaisesAndIsNotCounted) {
+    EpisodeJudge judge(sequence());
+    const auto other = [&](std::int64_t time, std::string_view group) {
+        verdict = judge.judge({noon + time, group, "", "/log", false}, ended);
+        return verdict.decision;
+    };
+    EXPECT_EQ(other(0, "a"), Decision::NONE);
+    EXPECT_EQ(other(1, "a"), Decision::NONE);
+    EXPECT_EQ(at(judge, 2, "a"), Decision::NONE);
+    EXPECT_EQ(verdict.count, 2);
+    EXPECT_EQ(other(3, "a"), Decision::NONE) << "only what comes after them raises";
+    EXPECT_EQ(verdict.count, 3);
+    EXPECT_EQ(other(3, "b"), Decision::NONE);
+    EXPECT_EQ(at(judge, 4, "b"), Decision::NONE) << "another group";
+    EXPECT_EQ(at(judge, 59, "a"), Decision::RAISES);
+    EXPECT_EQ(verdict.count, 3);
+    EXPECT_EQ(verdict.first, noon);
+    EXPECT_EQ(at(judge, 60, "a"), Decision::NONE) << "the first of them is too old";
+    EXPECT_EQ(verdict.count, 2);
+    EXPECT_EQ(at(judge, 2, "a"), Decision::NONE) << "a late one, before which there were two";
+}
+
+TEST_F(EpisodeJudgeTest, OthersThatAnEarlierRunHasJudgedCountForWhatComesAfter) {
+    EpisodeJudge judge(sequence());
+    for (const std::int64_t time : {0, 1, 2}) {
+        judge.recount({noon + time, "a", "", "/log", false});
+    }
+    judge.recount({noon + 3, "a", "", "/log", true});
+    EXPECT_EQ(at(judge, 4, "a"), Decision::RAISES);
+    EXPECT_EQ(verdict.count, 3);
+}
+
+TEST_F(EpisodeJudgeTest, AnEpisodeOfASequenceHasAllItsEntries) {
+    JudgementConfig rules = sequence();
+    rules.resolveAfter = 100;
+    EpisodeJudge judge(rules);
+    for (const std::int64_t time : {0, 1, 2}) {
+        judge.judge({noon + time, "a", "", "/log", false}, ended);
+    }
+    EXPECT_EQ(at(judge, 10, "a"), Decision::RAISES);
+    EXPECT_EQ(verdict.episode->count, 4u);
+    EXPECT_EQ(verdict.episode->first, noon);
+    verdict = judge.judge({noon + 50, "a", "", "/log", false}, ended);
+    EXPECT_EQ(verdict.decision, Decision::CONTINUES);
+    EXPECT_EQ(verdict.episode->count, 5u);
+}
+
+TEST_F(EpisodeJudgeTest, ASequenceMayCountDifferentValues) {
+    JudgementConfig rules = sequence();
+    rules.distinct = "user";
+    EpisodeJudge judge(rules);
+    EXPECT_EQ(at(judge, 0, "a"), Decision::NONE) << "nothing came before";
+    for (const char* const user : {"x", "y", "x", "x"}) {
+        judge.judge({noon + 1, "a", user, "/log", false}, ended);
+    }
+    EXPECT_EQ(at(judge, 2, "a", "z"), Decision::NONE);
+    EXPECT_EQ(verdict.count, 2);
+    judge.judge({noon + 3, "a", "w", "/log", false}, ended);
+    EXPECT_EQ(at(judge, 4, "a", "z"), Decision::RAISES);
+    EXPECT_EQ(at(judge, 61, "a", "z"), Decision::NONE) << "only one is recent enough";
+    EXPECT_EQ(verdict.count, 1);
+}
+
 TEST_F(EpisodeJudgeTest, AnyMatchingEntryKeepsItOpen) {
     EpisodeJudge judge(lasting(100, 2));
     EXPECT_THAT(all(judge, {0, 1, 100, 199, 298}),
