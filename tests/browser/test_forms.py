@@ -87,7 +87,8 @@ def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
     auth, _ = logs_agent(agent)
     page.on(agent)
     when = ["ENTRYTYPE = ''", "ENTRYSRC in ['a,b', 'c']", "ENTRYSYS in ['web1', 'web2']", "ENTRYDESC contains 'it''s'"]
-    body = {"name": "by-hand", "text": "Kept", "severity": "minor", "log": str(auth), "when": when}
+    kept = {"labels": {"team": "web"}, "group_by": ["ENTRYSYS"], "max_groups": 7, "distinct": "ENTRYSRC", "then": "ENTRYSYS=web1", "cooldown": "1h"}
+    body = {"name": "by-hand", "text": "Kept", "severity": "minor", "log": str(auth), "when": when, "frequency": ">= 2", "period": "60s", **kept}
     status, _, answer = page.api.request("POST", "/api/v1/situations", body)
     assert status == 201, answer
 
@@ -102,6 +103,7 @@ def test_conditions_that_fields_cannot_hold_are_edited_as_text(page, agent):
     page.click("Save changes")
     page.heading("by-hand")
     assert (stored()["when"], stored()["severity"]) == (when, "major")
+    assert {key: stored()[key] for key in kept} == kept, "what the form does not show"
     page.click("Edit by-hand")
     page.heading("Edit by-hand")
     text = page.find("(//input[@aria-label='Condition'])[2]")

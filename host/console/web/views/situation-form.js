@@ -19,6 +19,17 @@ const BLANK = {
   runbook: null,
   labels: {},
 };
+// Not edited here, and not to be lost.
+const KEPT = [
+  "labels",
+  "group_by",
+  "max_groups",
+  "distinct",
+  "then",
+  "resolve_after",
+  "cooldown",
+  "absent",
+];
 const ANY = "*"; // no log has this path
 const UNITS = [
   ["s", "seconds"],
@@ -51,7 +62,9 @@ export async function show(element, name, query) {
 class Form {
   constructor(element, name, situation, logs, columns) {
     this.name = name;
-    this.labels = situation.labels; // not edited here, and not to be lost
+    this.kept = Object.fromEntries(
+      KEPT.filter((key) => situation[key] !== undefined).map((key) => [key, situation[key]]),
+    );
     this.version = situation.version;
     const changed = () => this.changed();
     if (situation.log && !logs.includes(situation.log)) logs.unshift(situation.log);
@@ -226,7 +239,7 @@ class Form {
       ...this.repeats.value,
       context: Number(context.control.value),
       runbook: runbook.control.value.trim() || null,
-      labels: this.labels,
+      ...this.kept,
     };
   }
 
