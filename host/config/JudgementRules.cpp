@@ -19,7 +19,7 @@ std::int64_t durationOf(const char* field, const std::optional<std::string>& tex
     }
     const auto length = DurationText::parse(*text);
     if (!length) {
-        problems.push_back({"'" + *text + "' is not a duration",
+        problems.push_back({"'" + *text + "' is not a duration of a second or more",
                             "write a number and s, m, h or d, for example \"15m\"", field});
         return 0;
     }
