@@ -2,7 +2,10 @@
 
 #include "host/formats/IsoShape.h"
 
+#include <algorithm>
+#include <charconv>
 #include <cstdint>
+#include <initializer_list>
 
 namespace zrm::host {
 
@@ -34,6 +37,9 @@ std::optional<TimeParts> CommonTime::epoch() noexcept {
 
 std::optional<TimeParts> CommonTime::any() noexcept {
     m_text.takeBlanks();
+    if (m_text.next() == '@') {
+        return result(readAtomicLabel() && readTail());
+    }
     const bool isNumeric = TimeCursor::isDigit(m_text.next());
     return result((isNumeric ? readNumeric() : readNamed()) && readTail());
 }
@@ -97,11 +103,12 @@ bool CommonTime::readNumeric() noexcept {
     }
 }
 
-/// "2026-11-19 10:00:00", "2026/11/19 10:00:00", "2026-Nov-19 10:00:00", "2026 Nov 19 10:00:00".
+/// "2026-11-19 10:00:00", "2026/11/19 10:00:00", "2026-Nov-19 10:00:00", "2026 Nov 19 10:00:00",
+/// "2026:11:19-10:00:00".
 bool CommonTime::readYearFirst() noexcept {
     unsigned year = 0;
     const char separator = m_text.next(4);
-    if (!m_text.takeNumber(4, 4, year) || !m_text.takeOneOf("-/. ")) {
+    if (!m_text.takeNumber(4, 4, year) || !m_text.takeOneOf("-/.: ")) {
         return false;
     }
     m_parts.setYear(year);
@@ -142,8 +149,8 @@ bool CommonTime::readMonthAndDay() noexcept {
            m_text.takeNumber(2, 2, m_parts.civil.day) && m_text.takeBlanks() && readTimeOfDay();
 }
 
-/// A time that begins with the name of a weekday or a month, as "Nov 19 10:00:00 2026" and
-/// "nov/19/2026 10:00:00" do.
+/// A time that begins with the name of a weekday or a month, as "Nov 19 10:00:00 2026",
+/// "Nov19 10:00:00" and "nov/19/2026 10:00:00" do.
 bool CommonTime::readNamed() noexcept {
     if (m_text.takeWeekday()) {
         m_text.take(',');
@@ -157,7 +164,7 @@ bool CommonTime::readNamed() noexcept {
     }
     m_text.take('.');
     const bool isNumeric = m_text.next() == '/';
-    if ((!m_text.take('/') && !m_text.takeBlanks()) ||
+    if ((!m_text.take('/') && !m_text.takeBlanks() && !TimeCursor::isDigit(m_text.next())) ||
         !m_text.takeNumber(1, 2, m_parts.civil.day) || m_text.next() == ':' ||
         (isNumeric ? !m_text.take('/') : !takeBreak())) {
         return false;
@@ -181,7 +188,7 @@ bool CommonTime::readShortFirst() noexcept {
     }
     unsigned first = 0;
     unsigned second = 0;
-    const bool hasTwoDigits = m_text.digits() == 2;
+    m_hasShortFirst = m_text.digits() == 1;
     m_text.takeNumber(1, 2, first);
     const char separator = m_text.next();
     if (!m_text.takeOneOf("/-. ")) {
@@ -194,8 +201,7 @@ bool CommonTime::readShortFirst() noexcept {
         return false;
     }
     if (separator != ' ' && m_text.take(separator)) {
-        return (hasTwoDigits || m_text.digits() == 4) &&
-               readThreeNumbers(first, second, separator) && takeBreak() && readTimeOfDay();
+        return readThreeNumbers(first, second, separator) && takeBreak() && readTimeOfDay();
     }
     m_parts.civil.month = first;
     m_parts.civil.day = second;
@@ -225,27 +231,48 @@ bool CommonTime::readDayAndMonthName(unsigned day) noexcept {
 }
 
 /// Which number is the year, the month and the day in "11/19/2026", "19-11-2026", "19.11.2026",
-/// "26/11/19", "26-11-19" and "19.11.26". Two numbers and the separators have been taken.
+/// "26/11/19", "26-11-19", "19.11.26" and "11/19/26". Two numbers and the separators have been
+/// taken. If the usual order gives no date, the first of the others that does counts.
 bool CommonTime::readThreeNumbers(unsigned first, unsigned second, char separator) noexcept {
     const bool hasCentury = m_text.digits() == 4;
     unsigned third = 0;
     if (!m_text.takeNumber(2, 4, third) || (!hasCentury && third > 99)) {
         return false;
     }
-    CivilTime& civil = m_parts.civil;
-    if (hasCentury) {
-        m_parts.setYear(third);
-        civil.month = separator == '/' ? first : second;
-        civil.day = separator == '/' ? second : first;
-    } else if (separator == '.') {
-        m_parts.setShortYear(third);
-        civil.month = second;
-        civil.day = first;
-    } else {
-        m_parts.setShortYear(first);
-        civil.month = second;
-        civil.day = third;
+    if (m_order != DateOrder::usual) {
+        return setDate(m_order, first, second, third);
     }
+    const bool isYear = !hasCentury && !m_hasShortFirst && separator != '.';
+    if (isYear && setDate(DateOrder::yearFirst, first, second, third)) {
+        return true;
+    }
+    const bool isMonthFirst = separator == '/';
+    return setDate(isMonthFirst ? DateOrder::monthFirst : DateOrder::dayFirst, first, second,
+                   third) ||
+           setDate(isMonthFirst ? DateOrder::dayFirst : DateOrder::monthFirst, first, second,
+                   third);
+}
+
+/// False if the numbers in this order are no date.
+bool CommonTime::setDate(DateOrder order, unsigned first, unsigned second,
+                         unsigned third) noexcept {
+    constexpr unsigned months = 12;
+    constexpr unsigned days = 31;
+    constexpr unsigned century = 100;
+    const bool isYearFirst = order == DateOrder::yearFirst;
+    const unsigned year = isYearFirst ? first : third;
+    const unsigned month = order == DateOrder::monthFirst ? first : second;
+    const unsigned day = isYearFirst ? third : order == DateOrder::dayFirst ? first : second;
+    if (month == 0 || month > months || day == 0 || day > days) {
+        return false;
+    }
+    if (year < century) {
+        m_parts.setShortYear(year);
+    } else {
+        m_parts.setYear(year);
+    }
+    m_parts.civil.month = month;
+    m_parts.civil.day = day;
     return true;
 }
 
@@ -273,21 +300,65 @@ bool CommonTime::readEpoch() noexcept {
     return takeFraction(".");
 }
 
+/// The labels of tai64 and tai64n: "@" and, as sixteen hexadecimal digits, 2^62 plus the seconds
+/// since 1970 plus ten, since loggers know of no later leap seconds; eight more are nanoseconds.
+bool CommonTime::readAtomicLabel() noexcept {
+    constexpr std::size_t seconds = 16;
+    constexpr std::size_t whole = 24;
+    constexpr std::uint64_t base = (std::uint64_t{1} << 62) + 10;
+    constexpr std::uint64_t latest = 100'000'000'000; // in the year 5138
+    m_text.skip(1);
+    const std::string_view text = m_text.rest();
+    const std::size_t digits =
+        std::min(text.find_first_not_of("0123456789abcdefABCDEF"), text.size());
+    if (digits != seconds && digits != whole) {
+        return false;
+    }
+    std::uint64_t label = 0;
+    std::from_chars(text.data(), text.data() + seconds, label, 16);
+    if (label < base || label - base > latest) {
+        return false;
+    }
+    m_text.skip(digits);
+    m_parts.civil = CivilTime::of(static_cast<std::int64_t>(label - base));
+    m_parts.hasYear = true;
+    m_parts.offset = 0;
+    m_hasZone = true;
+    return true;
+}
+
 /// A fraction of a second, if one of these marks comes next.
 bool CommonTime::takeFraction(std::string_view marks) noexcept {
     return !m_text.takeOneOf(marks) || m_text.takeFraction();
 }
 
-/// What stands between a date and a time of day.
+/// What stands between a date and a time of day: one character, blanks with or without dashes
+/// between them, or the marks between two columns, as in "[2026-11-19][10:00:00]".
 bool CommonTime::takeBreak() noexcept {
-    if (m_text.takeOneOf("Tt_:-|")) {
+    for (const std::string_view marks : {"][", "] [", "\",\""}) {
+        if (m_text.rest().starts_with(marks)) {
+            m_text.skip(marks.size());
+            return true;
+        }
+    }
+    if (m_text.takeOneOf("Tt_:-|;")) {
         return true;
     }
     const bool hasComma = m_text.take(',');
-    return m_text.takeBlanks() || hasComma;
+    if (!m_text.takeBlanks()) {
+        return hasComma;
+    }
+    for (const std::string_view dash : {"- ", "-- "}) {
+        if (m_text.rest().starts_with(dash)) {
+            m_text.skip(dash.size());
+            break;
+        }
+    }
+    return true;
 }
 
-/// "10:00", "10:00:00", "10:00:00.123", "10.00.00,123", "10:00:00:123", "100000", "1000".
+/// "10:00", "10:00:00", "10:00:00.123", "10.00.00,123", "10:00:00:123", "10h00.00", "100000",
+/// "1000".
 bool CommonTime::readTimeOfDay() noexcept {
     CivilTime& civil = m_parts.civil;
     const std::size_t digits = m_text.digits();
@@ -300,8 +371,8 @@ bool CommonTime::readTimeOfDay() noexcept {
     if (!m_text.takeNumber(1, 2, civil.hour)) {
         return false;
     }
-    const char separator = m_text.next();
-    if (!m_text.takeOneOf(":.") || !m_text.takeNumber(1, 2, civil.minute)) {
+    const char separator = m_text.next() == 'h' ? '.' : m_text.next();
+    if (!m_text.takeOneOf(":.h") || !m_text.takeNumber(1, 2, civil.minute)) {
         return false;
     }
     if (!m_text.take(separator)) {

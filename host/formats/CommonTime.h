@@ -35,11 +35,16 @@ struct TimeParts {
     bool give(EntryColumns& columns) const noexcept;
 };
 
+/// What the first of three numbers such as "03/04/26" is. "usual" goes by the separator and by
+/// which numbers can be a month.
+enum class DateOrder : unsigned char { usual, dayFirst, monthFirst, yearFirst };
+
 /// Reads a time whose form is not known, from the whole of a text. Looks at each character about
 /// once.
 class CommonTime {
 public:
-    explicit CommonTime(std::string_view text) noexcept : m_text(text) {}
+    explicit CommonTime(std::string_view text, DateOrder order = DateOrder::usual) noexcept
+        : m_text(text), m_order(order) {}
 
     /// Of each of these, if it is the time: a form of ISO 8601, seconds and so on since 1970, any
     /// usual form.
@@ -59,7 +64,9 @@ private:
     bool readShortFirst() noexcept;
     bool readDayAndMonthName(unsigned day) noexcept;
     bool readThreeNumbers(unsigned first, unsigned second, char separator) noexcept;
+    bool setDate(DateOrder order, unsigned first, unsigned second, unsigned third) noexcept;
     bool readEpoch() noexcept;
+    bool readAtomicLabel() noexcept;
     bool takeFraction(std::string_view marks) noexcept;
     bool takeBreak() noexcept;
     bool readTimeOfDay() noexcept;
@@ -69,9 +76,11 @@ private:
     std::optional<TimeParts> result(bool isRead) noexcept;
 
     TimeCursor m_text;
+    const DateOrder m_order;
     TimeParts m_parts;
     bool m_hasMeridiem = false;
     bool m_hasZone = false;
+    bool m_hasShortFirst = false; ///< the first number of the date has one digit
 };
 
 } // namespace zrm::host

@@ -17,25 +17,32 @@ class NamedTime final : public TimePattern {
 public:
     using Form = std::optional<TimeParts> (CommonTime::*)() noexcept;
 
-    explicit NamedTime(Form form) noexcept : m_form(form) {}
+    explicit NamedTime(Form form, DateOrder order = DateOrder::usual) noexcept
+        : m_form(form), m_order(order) {}
 
     bool readsIso() const noexcept override { return m_form != &CommonTime::epoch; }
     bool read(std::string_view text, EntryColumns& columns) const noexcept override {
-        CommonTime time(text);
+        CommonTime time(text, m_order);
         const std::optional<TimeParts> parts = (time.*m_form)();
         return parts && parts->give(columns);
     }
 
 private:
     const Form m_form;
+    const DateOrder m_order;
 };
 
 struct Name {
     std::string_view name;
     NamedTime::Form form;
+    DateOrder order = DateOrder::usual;
 };
 
-constexpr std::array names = {Name{"auto", &CommonTime::any}, Name{"iso8601", &CommonTime::iso},
+constexpr std::array names = {Name{"auto", &CommonTime::any},
+                              Name{"day-first", &CommonTime::any, DateOrder::dayFirst},
+                              Name{"month-first", &CommonTime::any, DateOrder::monthFirst},
+                              Name{"year-first", &CommonTime::any, DateOrder::yearFirst},
+                              Name{"iso8601", &CommonTime::iso},
                               Name{"epoch", &CommonTime::epoch}};
 
 constexpr std::size_t longestPattern = 256;
@@ -56,16 +63,18 @@ Result<std::shared_ptr<const TimePattern>> TimePattern::compile(const std::strin
     }
     const auto name = std::ranges::find(names, pattern, &Name::name);
     if (name != names.end()) {
-        return std::make_shared<const NamedTime>(name->form);
+        return std::make_shared<const NamedTime>(name->form, name->order);
     }
     if (pattern.size() > longestPattern) {
         return refused("is longer than " + std::to_string(longestPattern) + " bytes",
                        "describe nothing but the time", "time_format");
     }
     if (pattern.find('%') == std::string::npos) {
-        return refused("'" + pattern + "' is not the form of a time",
-                       "write auto, iso8601, epoch, or directives such as %Y-%m-%d %H:%M:%S",
-                       "time_format");
+        return refused(
+            "'" + pattern + "' is not the form of a time",
+            "write auto, day-first, month-first, year-first, iso8601, epoch, or directives such "
+            "as %Y-%m-%d %H:%M:%S",
+            "time_format");
     }
     return DirectiveTime::make(pattern);
 }

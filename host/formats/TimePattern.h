@@ -17,7 +17,8 @@ public:
     /// A pattern of strftime's directives (with %f for a fraction, %s for seconds since 1970, %z
     /// for any way to write an offset), or the name of a common form: "iso8601", "epoch" (of
     /// seconds, milliseconds, microseconds or nanoseconds, told apart by size), "auto" (whichever
-    /// common form fits). An empty text stands for "auto".
+    /// common form fits), "day-first", "month-first", "year-first" (the same, but for the order of
+    /// dates such as 03/04/26). An empty text stands for "auto".
     static Result<std::shared_ptr<const TimePattern>> compile(const std::string& pattern);
     /// "auto".
     static std::shared_ptr<const TimePattern> common();

@@ -86,21 +86,27 @@ INSTANTIATE_TEST_SUITE_P(
     YearFirst, CommonForm,
     testing::Values(Form{"2026/11/19 10:00:05", local}, Form{"2026/11/19 10:00:05.123456", local},
                     Form{"2026.11.19 10:00:05", local}, Form{"2026-Nov-19 10:00:05.123456", local},
-                    Form{"2026 Nov 19 10:00:05.123", local}, Form{"26/11/19 10:00:05", local},
-                    Form{"26-11-19 10:00:05,123", local}, Form{"261119 10:00:05", local},
-                    Form{"261119  1:02:03", "2026-11-19 01:02:03"}, Form{"261119 100005", local}));
+                    Form{"2026 Nov 19 10:00:05.123", local}, Form{"2026:11:19-10:00:05", local},
+                    Form{"2026-11-19 10h00.05", local}, Form{"20261119100005.123", local},
+                    Form{"2026-11-19][10:00:05", local}, Form{"2026-11-19] [10:00:05", local},
+                    Form{"26/11/19 10:00:05", local}, Form{"26-11-19 10:00:05,123", local},
+                    Form{"261119 10:00:05", local}, Form{"261119  1:02:03", "2026-11-19 01:02:03"},
+                    Form{"261119 100005", local}));
 
 INSTANTIATE_TEST_SUITE_P(
     DayFirst, CommonForm,
-    testing::Values(
-        Form{"19/Nov/2026:10:00:05 +0100", east}, Form{"19/Nov/2026:10:00:05", local},
-        Form{"19 Nov 2026 10:00:05.123", local}, Form{"19-Nov-2026 10:00:05.123", local},
-        Form{"19-NOV-26 10.00.05.123456 AM", local}, Form{"19 Nov 10:00:05.123", yearless},
-        Form{"19 November 2026 10:00:05", local}, Form{"19-11-2026 10:00:05", local},
-        Form{"19.11.2026 10:00:05", local}, Form{"19.11.26, 10:00:05", local},
-        Form{"Thu, 19 Nov 2026 10:00:05 +0100", east}, Form{"Thu, 19 Nov 2026 10:00:05 GMT", utc},
-        Form{"Thu, 19 Nov 2026 10:00:05 +0100 (CET)", east},
-        Form{"Thursday, 19-Nov-26 10:00:05 GMT", utc}));
+    testing::Values(Form{"19/Nov/2026:10:00:05 +0100", east}, Form{"19/Nov/2026:10:00:05", local},
+                    Form{"19 Nov 2026 10:00:05.123", local},
+                    Form{"19-Nov-2026 10:00:05.123", local},
+                    Form{"19-NOV-26 10.00.05.123456 AM", local},
+                    Form{"19 Nov 10:00:05.123", yearless}, Form{"19 November 2026 10:00:05", local},
+                    Form{"19-11-2026 10:00:05", local}, Form{"19.11.2026 10:00:05", local},
+                    Form{"19/11/2026 -- 10:00:05", local}, Form{"19/11/2026 10:00:05", local},
+                    Form{"19/11/2026 - 10:00:05", local}, Form{"19.11.26, 10:00:05", local},
+                    Form{"Thu, 19 Nov 2026 10:00:05 +0100", east},
+                    Form{"Thu, 19 Nov 2026 10:00:05 GMT", utc},
+                    Form{"Thu, 19 Nov 2026 10:00:05 +0100 (CET)", east},
+                    Form{"Thursday, 19-Nov-26 10:00:05 GMT", utc}));
 
 INSTANTIATE_TEST_SUITE_P(
     MonthFirst, CommonForm,
@@ -116,7 +122,10 @@ INSTANTIATE_TEST_SUITE_P(
         Form{"Thu Nov 19 10:00:05 CET 2026", east},
         Form{"Thu Nov 19 2026 10:00:05 GMT+0100 (CET)", east},
         Form{"Thu Nov 19 10:00:05 +0100 2026", east}, Form{"Thu 2026-11-19 10:00:05 CET", east},
-        Form{"11/19/2026 10:00:05", local}, Form{"11/19/2026 10:00:05 AM", local},
+        Form{"11/19/2026 10:00:05", local}, Form{"11/19/26 10:00:05", local},
+        Form{"11/19/26\",\"10:00:05", local}, Form{"9/3/26 10:00:05", "2026-09-03 10:00:05"},
+        Form{"11-19-26 10:00:05", local}, Form{"Nov19 10:00:05", yearless},
+        Form{"11/19/2026 10:00:05 AM", local},
         Form{"11/19/2026, 10:00:05 PM", "2026-11-19 22:00:05"},
         Form{"1119 10:00:05.123456", yearless}, Form{"11-19 10:00:05.123", yearless},
         Form{"11/19 10:00:05", yearless}, Form{"11.19 10:00:05", yearless},
@@ -128,6 +137,31 @@ INSTANTIATE_TEST_SUITE_P(Epoch, CommonForm,
                                          Form{"1795082405123.456", utc},
                                          Form{"1795082405123456", utc},
                                          Form{"1795082405123456789", utc}));
+
+INSTANTIATE_TEST_SUITE_P(AtomicLabel, CommonForm,
+                         testing::Values(Form{"@400000006afec8af12345678", utc},
+                                         Form{"@400000006afec8af", utc}));
+
+TEST(TimePattern, RefusesLabelsThatAreNoTime) {
+    EXPECT_EQ(common("@"), "not a time");
+    EXPECT_EQ(common("@400000006afec8a"), "not a time");
+    EXPECT_EQ(common("@400000006afec8ag12345678"), "not a time");
+    EXPECT_EQ(common("@000000006afec8af"), "not a time");
+    EXPECT_EQ(common("@ffffffffffffffff"), "not a time");
+}
+
+TEST(TimePattern, TheOrderOfADateMayBeSaid) {
+    EXPECT_EQ(timeOf("day-first", "03/04/2026 10:00:05"), "2026-04-03 10:00:05");
+    EXPECT_EQ(timeOf("month-first", "03/04/2026 10:00:05"), "2026-03-04 10:00:05");
+    EXPECT_EQ(timeOf("day-first", "03/04/26 10:00:05"), "2026-04-03 10:00:05");
+    EXPECT_EQ(timeOf("month-first", "03-04-26 10:00:05"), "2026-03-04 10:00:05");
+    EXPECT_EQ(timeOf("year-first", "03/04/26 10:00:05"), "2003-04-26 10:00:05");
+    EXPECT_EQ(timeOf("month-first", "19/11/2026 10:00:05"), "not a time");
+    EXPECT_EQ(timeOf("day-first", "11/19/2026 10:00:05"), "not a time");
+    // Others are read as they always are.
+    EXPECT_EQ(timeOf("day-first", "2026-11-19 10:00:05"), local);
+    EXPECT_EQ(timeOf("day-first", "Nov 19 10:00:05"), yearless);
+}
 
 INSTANTIATE_TEST_SUITE_P(TimeOfDay, CommonForm,
                          testing::Values(Form{"10:00:05", "no date 10:00:05"},
@@ -167,7 +201,8 @@ TEST(TimePattern, RefusesWhatIsNotATime) {
                              "Nove 19 10:00:00",
                              "Xyz 19 10:00:00",
                              "Feb 30 10:00:00",
-                             "19/11/2026 10:00:00",
+                             "32/11/2026 10:00:00",
+                             "13/13/2026 10:00:00",
                              "19/Nov/2026",
                              "12345678",
                              "123456789012",
