@@ -24,7 +24,8 @@ bool isFurther(std::string_view line) noexcept {
 
 /// Whether a word may be the name of a host: a level or a word in brackets, for example, is none.
 bool isHost(std::string_view word) noexcept {
-    return !isLevelName(word) && !word.ends_with(':') &&
+    const bool isLetter = word.size() == 1 && word[0] >= 'A' && word[0] <= 'Z';
+    return !isLevelName(word) && !isLetter && !word.ends_with(':') &&
            std::all_of(word.begin(), word.end(), [](char c) {
                constexpr std::string_view others = ".-_:%,";
                return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') ||
@@ -137,11 +138,16 @@ double FormatFit::share() const noexcept {
 }
 
 double FormatFit::score() const noexcept {
+    constexpr double program = 0.1; ///< less than a source of its own
+    return scoreWithoutProgram() +
+           (namesProgram ? share() * program * partOf(entries - withSource, entries) : 0);
+}
+
+double FormatFit::scoreWithoutProgram() const noexcept {
     constexpr double base = 0.3;
     constexpr double each = 0.2;
     constexpr double detail = 0.1;
-    constexpr double program = 0.1; ///< less than a source of its own
-    return share() * (base + (namesProgram ? program * partOf(entries - withSource, entries) : 0) +
+    return share() * (base +
                       each * (partOf(withTime, entries) + partOf(withType, entries) +
                               partOf(withSource, entries)) +
                       detail * partOf(withDetail, entries));

@@ -27,6 +27,8 @@ struct FormatFit {
     /// What makes one format better than another for the same lines: the share, and how much is
     /// known of each entry. 0 to 1.
     double score() const noexcept;
+    /// The same, but it does not count that the format names the program where an entry does not.
+    double scoreWithoutProgram() const noexcept;
 
     /// Whether an entry that was read is one of the format. Every line is an entry of a syslog
     /// file, but one in no form that system loggers write is nothing but a description.

@@ -8,7 +8,10 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
+#include <limits>
 #include <map>
+#include <string_view>
 #include <tuple>
 #include <utility>
 
@@ -33,6 +36,52 @@ bool isBefore(const Shape& one, const Shape& other) {
         return std::tuple(shape.columns.hasType, shape.columns.length, shape.lines);
     };
     return rank(one) > rank(other);
+}
+
+/// How the times of some lines are read if their dates have an order.
+struct Reading {
+    std::size_t times = 0; ///< that can be read
+    std::int64_t span = 0; ///< seconds between the earliest and the latest
+};
+
+Reading readingOf(const std::vector<std::string_view>& texts, const TimePattern& times) {
+    Reading reading;
+    std::int64_t first = std::numeric_limits<std::int64_t>::max();
+    std::int64_t last = std::numeric_limits<std::int64_t>::min();
+    for (const std::string_view text : texts) {
+        EntryColumns columns;
+        if (times.read(text, columns)) {
+            ++reading.times;
+            first = std::min(first, columns.time.seconds());
+            last = std::max(last, columns.time.seconds());
+        }
+    }
+    reading.span = reading.times == 0 ? 0 : last - first;
+    return reading;
+}
+
+/// The order of dates such as 03/04/26 that reads most times, and of those that read as many the
+/// one that puts them next to each other: the wrong one scatters the days of a month over a year.
+/// Empty if the usual order does.
+std::string dateOrder(const std::vector<std::vector<LineToken>>& lines) {
+    std::vector<std::string_view> texts;
+    for (const std::vector<LineToken>& line : lines) {
+        const auto time = std::ranges::find(line, LineToken::Kind::time, &LineToken::kind);
+        if (time != line.end()) {
+            texts.push_back(time->text);
+        }
+    }
+    std::string best;
+    Reading most = readingOf(texts, *TimePattern::common());
+    for (const char* order : {"day-first", "month-first", "year-first"}) {
+        const auto times = TimePattern::compile(order);
+        const Reading reading = times ? readingOf(texts, **times) : Reading{};
+        if (std::pair(reading.times, most.span) > std::pair(most.times, reading.span)) {
+            best = order;
+            most = reading;
+        }
+    }
+    return best;
 }
 
 bool hasPairs(const std::vector<std::string>& lines, std::size_t count) {
@@ -102,6 +151,7 @@ std::optional<FormatDescription> proposeFormat(const std::vector<std::string>& l
     FormatDescription format;
     format.type = "regex";
     format.pairs = hasPairs(lines, count);
+    format.timeFormat = dateOrder(tokens);
     bool begin = true; // all with the time
     std::string starts;
     for (Shape& shape : chosen(heads, telling)) {

@@ -173,6 +173,15 @@ private:
     std::vector<Found> m_found;
 };
 
+double FormatSuggestion::leastScore(const Choice& best, std::string_view log) {
+    // That a format of another program finds the time is no sign that the log is that program's.
+    const bool isBare = best.fit.withType == 0 && best.fit.withSource == 0;
+    if (isBare && !best.names.empty() && !namesProgram(log, best.names.front())) {
+        return best.fit.scoreWithoutProgram();
+    }
+    return best.fit.score() + (best.isGeneric ? leastGain : leastGainOverOwn);
+}
+
 FormatSuggestion FormatSuggestion::of(const ReadyFormats& formats, std::vector<std::string> lines,
                                       std::string_view log) {
     if (lines.size() > mostLines) {
@@ -194,12 +203,9 @@ FormatSuggestion FormatSuggestion::of(const ReadyFormats& formats, std::vector<s
     }
     suggestion.m_ready = search.take();
     suggestion.m_proposal = search.propose();
-    if (suggestion.m_proposal && !suggestion.m_ready.empty()) {
-        const Choice& best = suggestion.m_ready.front();
-        const double least = best.fit.score() + (best.isGeneric ? leastGain : leastGainOverOwn);
-        if (suggestion.m_proposal->fit.score() < least) {
-            suggestion.m_proposal.reset();
-        }
+    if (suggestion.m_proposal && !suggestion.m_ready.empty() &&
+        suggestion.m_proposal->fit.score() < leastScore(suggestion.m_ready.front(), log)) {
+        suggestion.m_proposal.reset();
     }
     return suggestion;
 }

@@ -52,6 +52,9 @@ public:
 private:
     class Search;
 
+    /// Of a proposal that is worth to be shown beside the best of the ready formats.
+    static double leastScore(const Choice& best, std::string_view log);
+
     std::size_t m_lines = 0;
     std::vector<Choice> m_ready;
     std::optional<Choice> m_proposal;

@@ -27,6 +27,22 @@ constexpr std::array<std::pair<char, const char*>, 9> letterNames = {{{'D', "DEB
                                                                       {'T', "TRACE"},
                                                                       {'V', "VERBOSE"}}};
 
+constexpr std::array<const char*, 8> severityNames = {"EMERGENCY", "ALERT",  "CRITICAL", "ERROR",
+                                                      "WARNING",   "NOTICE", "INFO",     "DEBUG"};
+
+/// Whether a text is the name of a file with source code, as in "server.go:17".
+bool isPlace(std::string_view text) {
+    const std::size_t colon = text.find(':');
+    const bool hasLine = colon != std::string_view::npos && colon + 1 < text.size() &&
+                         text[colon + 1] >= '0' && text[colon + 1] <= '9';
+    const std::string_view file = text.substr(0, colon);
+    const std::size_t dot = file.rfind('.');
+    constexpr std::array<std::string_view, 14> endings = {
+        "c", "cc", "cpp", "cxx", "h", "hpp", "go", "py", "rs", "js", "java", "ts", "rb", "php"};
+    return dot != std::string_view::npos && (hasLine || file.find('/') != std::string_view::npos) &&
+           std::ranges::find(endings, file.substr(dot + 1)) != endings.end();
+}
+
 /// Whether a text looks like the name of a thread, a number or an address rather than like who
 /// speaks.
 bool isThread(std::string_view text) {
@@ -38,7 +54,10 @@ bool isThread(std::string_view text) {
                               return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f') || c == 'x' ||
                                      c == '-' || c == '.' || c == ':' || c == '/';
                           });
-    return isNumber || text == "main" || std::ranges::any_of(words, [text](std::string_view word) {
+    const bool isNumbered = hasDigit && text.front() >= '0' && text.front() <= '9' &&
+                            text.find_first_of("/:") != std::string_view::npos;
+    return isNumber || isNumbered || text == "main" ||
+           std::ranges::any_of(words, [text](std::string_view word) {
                return text.find(word) != std::string_view::npos;
            });
 }
@@ -76,6 +95,11 @@ public:
                 columns.values["type"][std::string(1, letter)] = name;
             }
         }
+        if (m_type != none && token(m_type).kind == Kind::severity) {
+            for (std::size_t at = 0; at < severityNames.size(); ++at) {
+                columns.values["type"][std::to_string(at)] = severityNames[at];
+            }
+        }
         return columns;
     }
 
@@ -96,20 +120,29 @@ private:
         const bool isCertain = m_head.certain > 0 && m_head.certain - 1 < m_length;
         if (isCertain) {
             const Kind kind = token(m_head.certain - 1).kind;
-            if (kind == Kind::level || kind == Kind::letter) {
+            if (kind == Kind::level || kind == Kind::letter || kind == Kind::severity) {
                 return m_head.certain - 1;
             }
         }
-        const std::size_t level = first(Kind::level);
-        return level != none ? level : first(Kind::letter);
+        for (const Kind kind : {Kind::severity, Kind::level, Kind::letter}) {
+            if (const std::size_t at = first(kind); at != none) {
+                return at;
+            }
+        }
+        return none;
     }
 
     template <class Of> bool isForMost(std::size_t at, Of of) const {
         std::size_t count = 0;
+        std::size_t empty = 0;
         for (const auto* line : m_head.lines) {
-            count += of((*line)[at].text) ? 1 : 0;
+            const std::string_view text = (*line)[at].text;
+            const bool isEmpty = text.empty() || text == "-";
+            empty += isEmpty ? 1 : 0;
+            count += !isEmpty && of(text) ? 1 : 0;
         }
-        return count * 2 > m_head.lines.size();
+        const std::size_t filled = m_head.lines.size() - empty;
+        return filled == 0 || count * 2 > filled;
     }
 
     /// How much a column looks like the name of who speaks.
@@ -124,7 +157,7 @@ private:
             rank = 45;
             break;
         case Kind::bracket:
-            rank = token(at).mark == '(' ? 25 : 30;
+            rank = token(at).mark == '(' || token(at).mark == '{' ? 25 : 30;
             break;
         case Kind::cell:
             rank = 25;
@@ -141,7 +174,12 @@ private:
                        static_cast<unsigned char>(c) > 0x7f;
             });
         };
-        rank -= isForMost(at, isThread) || isForMost(at, isMute) ? thread : 0;
+        constexpr int place = 45;
+        if (isForMost(at, isPlace)) {
+            rank -= place;
+        } else if (isForMost(at, isThread) || isForMost(at, isMute)) {
+            rank -= thread;
+        }
         rank += isForMost(at,
                           [](std::string_view text) {
                               return text.find_first_of("./") != std::string_view::npos ||
@@ -178,7 +216,13 @@ private:
 
     /// Numbers, quoted texts and pairs in front of a message are part of it.
     void trim() {
-        const auto isPart = [this](std::size_t at) {
+        constexpr std::string_view delimiters = "|\t;";
+        const auto isPart = [this, delimiters](std::size_t at) {
+            const bool isCell = at + 1 < m_length && token(at + 1).kind == Kind::mark &&
+                                delimiters.find(token(at + 1).mark) != std::string_view::npos;
+            if (isCell || token(at).isInside) {
+                return false;
+            }
             const Kind kind = token(at).kind;
             const bool isKept = at == m_time || at == m_type || at == m_source;
             return !isKept && (kind == Kind::number || kind == Kind::quoted || kind == Kind::pair ||
@@ -242,6 +286,8 @@ private:
             return captured(at, levelExpression(at));
         case Kind::letter:
             return captured(at, "[A-Z]");
+        case Kind::severity:
+            return captured(at, "[0-7]");
         case Kind::number:
             return captured(at, R"(\d+)");
         case Kind::pair:
@@ -249,7 +295,10 @@ private:
         case Kind::quoted:
             return '"' + captured(at, "[^\"]*") + '"';
         case Kind::bracket: {
-            const char close = one.mark == '[' ? ']' : one.mark == '(' ? ')' : '>';
+            const char close = one.mark == '['   ? ']'
+                               : one.mark == '(' ? ')'
+                               : one.mark == '{' ? '}'
+                                                 : '>';
             const std::string inner =
                 contains(at, close) ? ".*?" : "[^" + literalExpression(close) + "]*?";
             return literalExpression(one.mark) + R"(\s*)" + captured(at, inner) + R"(\s*)" +
@@ -273,7 +322,7 @@ private:
     std::string levelExpression(std::size_t at) const {
         const bool isEnclosed = at > 0 && at + 1 < m_length && token(at - 1).kind == Kind::mark &&
                                 token(at + 1).kind == Kind::mark && token(at - 1).mark != ':';
-        if (isEnclosed) {
+        if (isEnclosed && m_head.lines.size() * 2 >= m_head.all) {
             return "[A-Za-z]+";
         }
         std::set<std::string> names;

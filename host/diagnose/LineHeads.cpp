@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <map>
+#include <set>
 #include <string_view>
 #include <utility>
 
@@ -16,11 +17,19 @@ using Line = std::vector<LineToken>;
 
 constexpr std::size_t furthestTime = 16;  ///< tokens
 constexpr std::size_t furthestLevel = 12; ///< tokens behind the time, or behind the beginning
+constexpr std::size_t mostWords = 2;      ///< between the time and a level that most lines lack
 constexpr std::size_t leastPercent = 4;   ///< of the lines must have their level at one place
+constexpr std::size_t leastLone = 50;     ///< the same, of levels between plain words
 
 bool isEnclosed(const Line& line, std::size_t at) {
     return at > 0 && at + 1 < line.size() && line[at - 1].kind == Kind::mark &&
            line[at + 1].kind == Kind::mark;
+}
+
+/// The same, by marks that stand for nothing else.
+bool isBracketed(const Line& line, std::size_t at) {
+    constexpr std::string_view opening = "[(<{*|\t\"";
+    return isEnclosed(line, at) && opening.find(line[at - 1].mark) != std::string_view::npos;
 }
 
 bool isUpper(std::string_view word) {
@@ -37,31 +46,89 @@ std::size_t timeOf(const Line& line) {
     return line.size();
 }
 
-/// Whether the word looks like a level and not like a word of the message.
-bool isLevel(const Line& line, std::size_t at, std::size_t time) {
+/// The number of words and names between two tokens.
+std::size_t wordsBetween(const Line& line, std::size_t from, std::size_t to) {
+    return static_cast<std::size_t>(std::count_if(
+        line.begin() + static_cast<std::ptrdiff_t>(from),
+        line.begin() + static_cast<std::ptrdiff_t>(to), [](const LineToken& token) {
+            return token.kind == Kind::word || token.kind == Kind::name || token.kind == Kind::path;
+        }));
+}
+
+/// How much a token looks like the level of an entry, and not like a word of its message.
+enum class Likeness : unsigned char { none, lone, good };
+
+Likeness likeness(const Line& line, std::size_t at, std::size_t time) {
     const LineToken& token = line[at];
     const bool isNext = at == 0 || line[at - 1].kind == Kind::mark || at == time + 1;
     const bool isMarked = at + 1 < line.size() && line[at + 1].kind == Kind::mark;
-    if (token.kind == Kind::level) {
-        return isUpper(token.text) || isEnclosed(line, at) || (isNext && token.blanks > 1) ||
-               (isClearLevelName(token.text) && (isNext || isMarked));
+    const bool isDeep = at > time && wordsBetween(line, time, at) > mostWords;
+    if (token.kind == Kind::severity) {
+        return Likeness::good;
     }
-    return token.kind == Kind::letter &&
-           (isEnclosed(line, at) || (isNext && at + 1 < line.size()) || at + 1 == time);
+    if (token.kind == Kind::level) {
+        const bool isClear = isClearLevelName(token.text);
+        const bool isPadded = at > 0 && line[at - 1].blanks > 1;
+        if (isBracketed(line, at)) {
+            return Likeness::good;
+        }
+        if (isDeep) {
+            return isUpper(token.text) && isClear ? Likeness::lone : Likeness::none;
+        }
+        if ((isNext && token.blanks > 1) || (isClear && (isNext || isMarked)) ||
+            (isUpper(token.text) && (isNext || isPadded))) {
+            return Likeness::good;
+        }
+        return isUpper(token.text) && isBracketLevel(token.text) ? Likeness::lone : Likeness::none;
+    }
+    const bool isLetter =
+        token.kind == Kind::letter &&
+        (isEnclosed(line, at) || (isNext && at + 1 < line.size()) || at + 1 == time);
+    return isLetter ? Likeness::good : Likeness::none;
 }
 
 /// The place of the level; the number of tokens if there is none.
-std::size_t levelOf(const Line& line, std::size_t time) {
+std::size_t levelOf(const Line& line, std::size_t time, Likeness least) {
     const std::size_t from = time == line.size() ? 0 : time;
     const std::size_t most = std::min(line.size(), from + furthestLevel);
-    for (const Kind kind : {Kind::level, Kind::letter}) {
+    for (const Kind kind : {Kind::severity, Kind::level, Kind::letter}) {
         for (std::size_t at = 0; at < most; ++at) {
-            if (line[at].kind == kind && isLevel(line, at, time)) {
+            if (line[at].kind == kind && likeness(line, at, time) >= least) {
                 return at;
             }
         }
     }
     return line.size();
+}
+
+/// A word in upper case between other words is a level if most lines have one at its place.
+bool hasLoneLevels(const std::vector<Line>& lines) {
+    std::map<std::size_t, std::size_t> places;
+    std::size_t most = 0;
+    for (const Line& line : lines) {
+        const std::size_t time = timeOf(line);
+        if (const std::size_t at = levelOf(line, time, Likeness::lone); at < line.size()) {
+            most = std::max(most, ++places[at]);
+        }
+    }
+    return most * 100 >= lines.size() * leastLone;
+}
+
+/// "org.example.shop.Cart" and "c.e.s.Cart": no message begins so.
+bool isLoggerName(std::string_view text) {
+    return std::ranges::count(text, '.') > 1 && text.find_first_of("/:@(<") == text.npos;
+}
+
+/// Whether a name and its colon follow, brackets, marks and numbers aside.
+bool isBeforeName(const Line& line, std::size_t at) {
+    const auto isAside = [](const LineToken& token) {
+        return token.kind == Kind::mark || token.kind == Kind::bracket ||
+               token.kind == Kind::number || (token.text[0] >= '0' && token.text[0] <= '9');
+    };
+    while (at < line.size() && isAside(line[at])) {
+        ++at;
+    }
+    return at < line.size() && line[at].kind == Kind::name;
 }
 
 /// The number of tokens up to a name that a dash follows, as in "com.example.Main - started"; that
@@ -72,9 +139,13 @@ std::size_t withSource(const Line& line, std::size_t count) {
     for (std::size_t at = count; at + 2 < std::min(line.size(), count + furthest); ++at) {
         const bool isName =
             line[at].kind == Kind::path || (line[at].kind == Kind::word && isBehindBrackets);
-        if (isName && line[at].blanks > 0 && line[at + 1].mark == '-' &&
-            line[at + 1].kind == Kind::mark && line[at + 1].blanks > 0) {
-            return at + 2;
+        std::size_t end = at + 1;
+        while (end + 1 < line.size() && line[end].mark == '-' && line[end].blanks == 0) {
+            ++end;
+        }
+        if (isName && line[at].blanks > 0 && line[end].mark == '-' &&
+            line[end].kind == Kind::mark && line[end].blanks > 0) {
+            return end + 1;
         }
         isBehindBrackets = line[at].kind == Kind::bracket;
     }
@@ -92,13 +163,16 @@ std::string symbols(const Line& line, std::size_t count) {
 class Grouping {
 public:
     explicit Grouping(const std::vector<Line>& lines) {
+        const Likeness least = hasLoneLevels(lines) ? Likeness::lone : Likeness::good;
         std::map<std::string, std::vector<const Line*>> certain;
         for (const Line& line : lines) {
             const std::size_t time = timeOf(line);
-            const std::size_t level = levelOf(line, time);
+            const std::size_t level = levelOf(line, time, least);
             const std::size_t count =
                 std::max(time < line.size() ? time + 1 : 0, level < line.size() ? level + 1 : 0);
             if (count > 0) {
+                ++m_lines;
+                m_named += isBeforeName(line, count) ? 1 : 0;
                 certain[symbols(line, withSource(line, count))].push_back(&line);
             }
         }
@@ -123,6 +197,7 @@ public:
     std::vector<LineHead> run() {
         std::vector<LineHead> open;
         for (auto& [key, head] : m_groups) {
+            head.all = m_lines;
             open.push_back(std::move(head));
         }
         std::vector<LineHead> done;
@@ -136,7 +211,7 @@ public:
 
 private:
     /// Splits the lines by their next token; those whose message begins there are done.
-    static void extend(LineHead head, std::vector<LineHead>& open, std::vector<LineHead>& done) {
+    void extend(LineHead head, std::vector<LineHead>& open, std::vector<LineHead>& done) const {
         std::map<std::string, LineHead> next;
         for (const Line* line : head.lines) {
             if (head.length >= line->size()) {
@@ -145,10 +220,11 @@ private:
             }
             LineHead& one = next[(*line)[head.length].symbol()];
             one.length = head.length + 1;
+            one.all = head.all;
             one.certain = head.certain;
             one.lines.push_back(line);
         }
-        LineHead rest{{}, head.length, head.certain};
+        LineHead rest{{}, head.all, head.length, head.certain};
         for (auto& [symbol, one] : next) {
             if (!symbol.empty() && isColumn(one, head.lines.size())) {
                 open.push_back(std::move(one));
@@ -162,7 +238,7 @@ private:
     }
 
     /// Whether the last token of these lines, out of `all`, is a column and not part of messages.
-    static bool isColumn(const LineHead& head, std::size_t all) {
+    bool isColumn(const LineHead& head, std::size_t all) const {
         const std::size_t at = head.length - 1;
         const LineToken& token = (*head.lines.front())[at];
         const auto isPart = [&](std::size_t percent) {
@@ -187,13 +263,16 @@ private:
                               ? few
                               : most);
         case Kind::word:
-            return isPart(most) && isPadded(head, at);
+            return isPart(most) && (isPadded(head, at) || isRightAligned(head, at));
+        case Kind::name:
+            return isPart(most) && m_named * 2 >= m_lines;
         case Kind::cell:
         case Kind::level:
         case Kind::letter:
+        case Kind::severity:
         case Kind::number:
-        case Kind::name:
         case Kind::path:
+            return isPart(isFirst && isLoggerName(token.text) ? few : most);
         case Kind::pair:
         case Kind::quoted:
             return isPart(most);
@@ -217,12 +296,31 @@ private:
     /// Whether a name with its colon, or brackets behind them, is in front of the last token.
     static bool endsSource(const LineHead& head) {
         const Line& line = *head.lines.front();
-        for (std::size_t at = head.certain; at + 2 < head.length; ++at) {
-            if (line[at].kind == Kind::name && line[at + 1].mark == ':' && !line[at].isInside) {
+        for (std::size_t at = head.certain; at + 1 < head.length; ++at) {
+            if (line[at].kind == Kind::name && at + 2 < head.length && line[at + 1].mark == ':' &&
+                !line[at].isInside) {
+                return true;
+            }
+            const bool isTag = at > 1 && line[at - 1].mark == '/' && line[at - 1].blanks == 0 &&
+                               line[at - 2].kind == Kind::letter && line[at].kind == Kind::path;
+            if (isTag) {
                 return true;
             }
         }
         return false;
+    }
+
+    /// Whether words of different lengths end at the same distance from what is in front of them.
+    static bool isRightAligned(const LineHead& head, std::size_t at) {
+        std::map<std::size_t, std::size_t> ends;
+        std::set<std::size_t> sizes;
+        std::size_t most = 0;
+        for (const Line* line : head.lines) {
+            const std::size_t size = (*line)[at].text.size();
+            sizes.insert(size);
+            most = std::max(most, ++ends[(at > 0 ? (*line)[at - 1].blanks : 0) + size]);
+        }
+        return sizes.size() > 1 && most * 10 >= head.lines.size() * 9;
     }
 
     /// Whether what is behind a word is as wide as columns need, or a mark.
@@ -243,6 +341,8 @@ private:
     }
 
     std::map<std::string, LineHead> m_groups;
+    std::size_t m_lines = 0; ///< with a time or a level
+    std::size_t m_named = 0; ///< of these, those whose message would begin with a name
 };
 
 } // namespace

@@ -12,6 +12,7 @@ namespace zrm::host {
 /// Lines whose columns in front of the message are the same.
 struct LineHead {
     std::vector<const std::vector<LineToken>*> lines; ///< never empty; whole, with their messages
+    std::size_t all = 0;                              ///< lines of all heads together
     std::size_t length = 0;                           ///< tokens in front of the message
     std::size_t certain = 0; ///< of these, those up to the time and the level
 };

@@ -1,9 +1,11 @@
 #include "host/diagnose/LineTokens.h"
 
 #include "host/diagnose/LineWords.h"
+#include "host/diagnose/TokenShapes.h"
 #include "host/formats/TimePattern.h"
 
 #include <algorithm>
+#include <optional>
 #include <utility>
 
 namespace zrm::host {
@@ -12,10 +14,8 @@ namespace {
 
 constexpr std::size_t mostTokens = 40;
 constexpr std::size_t longestHead = 512; ///< bytes of a line that are looked at
-constexpr std::size_t longestTime = 40;
 constexpr std::size_t longestBracket = 120;
-constexpr std::size_t mostTimeEnds = 8;
-constexpr std::string_view letters = "DINWEFCTV"; ///< that stand for levels
+constexpr std::string_view timePrefixes = "*%#~!."; ///< marks that some write in front of times
 
 constexpr bool isLetter(char c) noexcept {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
@@ -27,7 +27,7 @@ constexpr bool isBlank(char c) noexcept {
     return c == ' ' || c == '\t';
 }
 constexpr char closing(char open) noexcept {
-    return open == '[' ? ']' : open == '(' ? ')' : open == '<' ? '>' : '\0';
+    return open == '[' ? ']' : open == '(' ? ')' : open == '<' ? '>' : open == '{' ? '}' : '\0';
 }
 
 class Tokens {
@@ -63,52 +63,25 @@ private:
     }
     void takeMark() { take(Kind::mark, 1, m_rest.front()); }
 
-    bool isAfterMark() const { return m_tokens.empty() || m_tokens.back().kind == Kind::mark; }
-
     void takeToken() {
-        if (m_rest[0] == '*' && timeLength(m_rest.substr(1)) > 0) {
+        if (isBeforeTime()) {
             takeMark();
             return;
         }
-        if (takeGluedLetter() || takeTime() || takeEnclosed() || takeCell()) {
+        if (takeGluedLetter() || takeTime() || takeEnclosed() || takeCell() || takeCode()) {
             return;
         }
         takeWord();
     }
 
-    /// The length of a time at the beginning of a text; 0: there is none.
-    std::size_t timeLength(std::string_view text) const {
-        if (text.empty() || (!isDigit(text.front()) && !isLetter(text.front()))) {
-            return 0;
-        }
-        std::size_t best = 0;
-        std::size_t end = 0;
-        for (std::size_t ends = 0; ends < mostTimeEnds && end < text.size(); ++ends) {
-            end = std::min(text.find_first_of(" \t],|;)>:-", end + 1), text.size());
-            if (end > longestTime) {
-                break;
-            }
-            if (end > 0 && isTime(text.substr(0, end))) {
-                best = end;
-            }
-        }
-        return best;
-    }
-    bool isTime(std::string_view text) const {
-        const auto colons = std::count(text.begin(), text.end(), ':');
-        if (text.find_first_not_of("0123456789.") == std::string_view::npos && !isEpoch(text) &&
-            text.size() != 14) {
-            return false;
-        }
-        const std::size_t bracket = text.find('[');
-        const bool isRemark = bracket == std::string_view::npos || text[bracket - 1] != ' ';
-        EntryColumns columns;
-        return isRemark && text.back() != ' ' && m_times.read(text, columns) &&
-               (columns.hasTime || colons == 2);
+    /// "*Mar  1 18:48:50": a mark that touches the time.
+    bool isBeforeTime() const {
+        return !m_hasTime && timePrefixes.find(m_rest[0]) != std::string_view::npos &&
+               timeLength(m_rest.substr(1), m_times) > 0;
     }
 
     bool takeTime() {
-        const std::size_t length = m_hasTime ? 0 : timeLength(m_rest);
+        const std::size_t length = m_hasTime ? 0 : timeLength(m_rest, m_times);
         if (length == 0) {
             return false;
         }
@@ -122,8 +95,8 @@ private:
     /// "I1119 10:00:00": a level that touches the time.
     bool takeGluedLetter() {
         const bool isGlued = m_tokens.empty() && m_rest.size() > 1 && isDigit(m_rest[1]) &&
-                             letters.find(m_rest[0]) != std::string_view::npos &&
-                             timeLength(m_rest.substr(1)) > 0;
+                             isOneLetter(m_rest.substr(0, 1)) &&
+                             timeLength(m_rest.substr(1), m_times) > 0;
         if (isGlued) {
             take(Kind::letter, 1);
         }
@@ -137,14 +110,20 @@ private:
             m_open.pop_back();
             return true;
         }
+        if (opensTime() || opensLevel()) {
+            m_open += first == '*' || first == '"' ? first : closing(first);
+            takeMark();
+            return true;
+        }
         if (first == '"') {
             return takeQuoted();
         }
         const std::size_t end = closing(first) == '\0' ? 0 : endOfBracket();
-        if (end == 0) {
+        if (end == 0 || (first == '{' && !isPath(m_rest.substr(1, end - 1)) &&
+                         !isNameWord(m_rest.substr(1, end - 1)))) {
             return false;
         }
-        if (hasColumns(m_rest.substr(1, end - 1))) {
+        if (enclosesColumns(m_rest.substr(1, end - 1), m_hasTime ? nullptr : &m_times)) {
             m_open += closing(first);
             takeMark();
             return true;
@@ -155,12 +134,26 @@ private:
         return true;
     }
 
+    /// Whether a bracket or quote opens a time that ends behind others, as in
+    /// "[2026-11-19][10:00:00]".
+    bool opensTime() const {
+        constexpr std::string_view opening = "[\"";
+        return !m_hasTime && opening.find(m_rest.front()) != std::string_view::npos &&
+               timeLength(m_rest.substr(1), m_times) > 0;
+    }
+    /// "*INFO*"
+    bool opensLevel() const {
+        const std::size_t end = m_rest.front() == '*' ? m_rest.find('*', 1) : 0;
+        return end != 0 && end != std::string_view::npos &&
+               isClearLevelName(m_rest.substr(1, end - 1));
+    }
+
     bool takeQuoted() {
         const std::size_t end = m_rest.find('"', 1);
         if (end == std::string_view::npos || end > longestBracket) {
             return false;
         }
-        if (hasColumns(m_rest.substr(1, end - 1))) {
+        if (enclosesColumns(m_rest.substr(1, end - 1), m_hasTime ? nullptr : &m_times)) {
             m_open += '"';
             takeMark();
             return true;
@@ -181,53 +174,6 @@ private:
             }
         }
         return 0;
-    }
-
-    static std::string_view trimmed(std::string_view text) {
-        while (!text.empty() && isBlank(text.front())) {
-            text.remove_prefix(1);
-        }
-        while (!text.empty() && isBlank(text.back())) {
-            text.remove_suffix(1);
-        }
-        return text;
-    }
-
-    /// Whether what is in a bracket is a time or a level, alone or with others.
-    bool hasColumns(std::string_view inner) const {
-        inner = trimmed(inner);
-        if (isOneLetter(inner) || (!m_hasTime && timeLength(inner) > 0)) {
-            return true;
-        }
-        constexpr std::string_view ends = " /:,";
-        const std::size_t first = std::min(inner.find_first_of(ends), inner.size());
-        const std::size_t last = inner.find_last_of(ends);
-        const bool isLast = last != std::string_view::npos && inner[last] != ' ' &&
-                            isLevelName(inner.substr(last + 1));
-        const bool isFirst =
-            isLevelName(inner.substr(0, first)) && (first == inner.size() || inner[first] != ' ');
-        const bool isWithTime =
-            first + 1 < inner.size() && !m_hasTime &&
-            (isOneLetter(inner.substr(0, first)) || isLevelName(inner.substr(0, first))) &&
-            timeLength(inner.substr(first + 1)) > 0;
-        return isFirst || isLast || isWithTime || (!m_hasTime && hasTimeWithin(inner));
-    }
-    /// A time behind one of the first commas or colons.
-    bool hasTimeWithin(std::string_view inner) const {
-        std::size_t at = 0;
-        for (int parts = 0; parts < 3; ++parts) {
-            at = inner.find_first_of(",:", at);
-            if (at == std::string_view::npos) {
-                return false;
-            }
-            if (timeLength(inner.substr(++at)) > 0) {
-                return true;
-            }
-        }
-        return false;
-    }
-    static bool isOneLetter(std::string_view text) {
-        return text.size() == 1 && letters.find(text[0]) != std::string_view::npos;
     }
 
     /// What is between two delimiters, or before a level within brackets.
@@ -265,11 +211,40 @@ private:
             ends += m_delimiter;
         }
         ends += m_hasColons || !m_open.empty() ? ":" : "";
-        ends += m_open.empty() ? "" : "/,";
+        ends += m_open.empty() ? "" : ",";
         if (!m_open.empty()) {
             ends += m_open.back();
         }
-        return std::min(m_rest.find_first_of(ends), m_rest.size());
+        const std::size_t end = std::min(m_rest.find_first_of(ends), m_rest.size());
+        return end + placeLength(m_rest.substr(0, end), m_rest.substr(end));
+    }
+    /// The length of ":17" behind the name of a source file within brackets.
+    std::size_t placeLength(std::string_view word, std::string_view rest) const {
+        if (m_open.empty() || word.find('.') == std::string_view::npos || !rest.starts_with(':')) {
+            return 0;
+        }
+        const std::size_t end = std::min(rest.find_first_not_of("0123456789", 1), rest.size());
+        const bool isEnd = end < rest.size() && (isBlank(rest[end]) || rest[end] == m_open.back());
+        return end > 1 && isEnd ? end : 0;
+    }
+
+    bool takeCode() {
+        const std::optional<MessageCode> code = messageCode(m_rest);
+        if (!code) {
+            return false;
+        }
+        for (std::size_t marks = 0; marks < code->marks; ++marks) {
+            takeMark();
+        }
+        if (code->number > 0) {
+            take(Kind::number, code->number);
+        }
+        take(Kind::path, code->source);
+        takeMark();
+        take(Kind::severity, 1);
+        takeMark();
+        take(Kind::cell, code->name);
+        return true;
     }
 
     void takeWord() {
@@ -287,11 +262,16 @@ private:
             length = end;
         }
         std::string_view word = m_rest.substr(0, length);
+        if (takeTag(word)) {
+            return;
+        }
         constexpr std::string_view single = "-|,;/]>:.!)=\"";
         const bool isBehindLevel = word[0] == '/' && !m_tokens.empty() &&
                                    m_tokens.back().kind == Kind::level &&
                                    m_tokens.back().blanks == 0;
-        if (isBehindLevel || isArrow(word) ||
+        const bool isTightColon = word[0] == ':' && !m_tokens.empty() &&
+                                  m_tokens.back().blanks == 0 && m_tokens.back().kind != Kind::mark;
+        if (isBehindLevel || isTightColon || isArrow(word) ||
             (word.size() == 1 && single.find(word[0]) != std::string_view::npos)) {
             takeMark();
             return;
@@ -310,7 +290,7 @@ private:
         }
         const std::size_t dot = word.rfind('.');
         if (dot != std::string_view::npos && dot > 0 && isLevelName(word.substr(dot + 1)) &&
-            isLetter(word[0])) {
+            isLetter(word[0]) && !hasLevel()) {
             take(Kind::cell, dot);
             takeMark();
             take(Kind::level, word.size() - dot - 1);
@@ -318,6 +298,18 @@ private:
         }
         const bool hasColon = length < m_rest.size() && m_rest[length] == ':';
         take(kindOf(word, hasColon), length);
+    }
+
+    /// "D/nsHttp" and "W/Binder(": a level of one letter, and who speaks.
+    bool takeTag(std::string_view word) {
+        if (word.size() < 4 || word[1] != '/' || !isOneLetter(word.substr(0, 1)) ||
+            !isLetter(word[2])) {
+            return false;
+        }
+        take(Kind::letter, 1);
+        takeMark();
+        take(Kind::path, std::min(word.substr(2).find_first_of("(:"), word.size() - 2));
+        return true;
     }
 
     /// key=value and key="a value".
@@ -340,8 +332,13 @@ private:
         return true;
     }
 
+    bool hasLevel() const {
+        return std::ranges::find(m_tokens, Kind::level, &LineToken::kind) != m_tokens.end();
+    }
+
     static bool isArrow(std::string_view word) {
-        return word == "->" || word == "=>" || word == "::" || word == ">>" || word == "--";
+        return word == "->" || word == "=>" || word == "::" || word == ">>" || word == "--" ||
+               word == "-->" || word == "==>";
     }
 
     static Kind kindOf(std::string_view word, bool hasColon) {

@@ -14,18 +14,19 @@ class TimePattern;
 /// tokens are not tokens.
 struct LineToken {
     enum class Kind {
-        mark,    ///< one character that separates or encloses
-        time,    ///< a time with or without a date
-        level,   ///< a word such as WARN
-        letter,  ///< a level of one letter
-        number,  ///< digits
-        name,    ///< a word before a colon
-        path,    ///< a word such as com.example.Main, shop::cart or server.go:17
-        pair,    ///< key=value
-        quoted,  ///< a text between double quotes, without them
-        bracket, ///< a text between brackets, without them
-        cell,    ///< a text between two bars, tabs or the like
-        word,    ///< any other word
+        mark,     ///< one character that separates or encloses
+        time,     ///< a time with or without a date
+        level,    ///< a word such as WARN
+        letter,   ///< a level of one letter
+        severity, ///< a level from 0 to 7, as in "%LINK-3-UPDOWN:"
+        number,   ///< digits
+        name,     ///< a word before a colon
+        path,     ///< a word such as com.example.Main, shop::cart or server.go:17
+        pair,     ///< key=value
+        quoted,   ///< a text between double quotes, without them
+        bracket,  ///< a text between brackets, without them
+        cell,     ///< a text between two bars, tabs or the like
+        word,     ///< any other word
     };
 
     Kind kind = Kind::word;

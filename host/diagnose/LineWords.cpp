@@ -11,13 +11,13 @@ namespace {
 
 /// That hardly stand for anything else.
 constexpr std::string_view clearLevels[] = {
-    "trace",       "debug",  "verbose", "info",     "notice", "warn",  "warning", "error",
-    "err",         "crit",   "fatal",   "critical", "alert",  "emerg", "severe",  "emergency",
-    "panic",       "dbg",    "wrn",     "inf",      "ftl",    "vrb",   "audit",   "ddebug",
-    "information", "finest", "finer",   "subdebug", "erro",   "debu",  "fata",    "pani"};
-constexpr std::string_view otherLevels[] = {"fine",    "inform",  "log",    "success",
-                                            "config",  "note",    "system", "default",
-                                            "display", "message", "fail",   "failure"};
+    "trace",    "debug", "verbose",  "info",  "notice", "warn",   "warning",     "error",  "err",
+    "crit",     "fatal", "critical", "alert", "emerg",  "severe", "emergency",   "panic",  "dbg",
+    "wrn",      "inf",   "ftl",      "vrb",   "audit",  "ddebug", "information", "finest", "finer",
+    "subdebug", "erro",  "debu",     "fata",  "pani",   "warni",  "noti",        "critic"};
+constexpr std::string_view bracketLevels[] = {"fine", "inform",  "note",    "log",
+                                              "fail", "success", "failure", "lifecycle"};
+constexpr std::string_view otherLevels[] = {"config", "default", "display", "message"};
 
 constexpr bool isLetter(char c) noexcept {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
@@ -70,7 +70,11 @@ char delimiterOf(std::string_view line) noexcept {
 }
 
 bool isLevelName(std::string_view word) noexcept {
-    return isClearLevelName(word) || isOneOf(otherLevels, word);
+    return isBracketLevel(word) || isOneOf(otherLevels, word);
+}
+
+bool isBracketLevel(std::string_view word) noexcept {
+    return isClearLevelName(word) || isOneOf(bracketLevels, word);
 }
 
 bool isClearLevelName(std::string_view word) noexcept {

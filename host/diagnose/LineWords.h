@@ -8,6 +8,8 @@ namespace zrm::host {
 
 /// Whether a word is the usual name of a level, in any case.
 bool isLevelName(std::string_view word) noexcept;
+/// One that may stand in brackets, where "config" and "message" are names.
+bool isBracketLevel(std::string_view word) noexcept;
 /// The same, of a name that is hardly ever a word of a message.
 bool isClearLevelName(std::string_view word) noexcept;
 

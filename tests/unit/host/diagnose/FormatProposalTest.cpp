@@ -149,6 +149,85 @@ TEST(FormatProposal, ADashSeparatesTheSourceFromTheMessage) {
               "WARN|soap|slow");
 }
 
+TEST(FormatProposal, TheSampleSaysInWhichOrderDatesAre) {
+    const auto orderOf = [](const std::vector<std::string>& lines) {
+        return proposeFormat(lines).value().timeFormat;
+    };
+    EXPECT_EQ(orderOf({"30/10/2026 10:00:00 INFO a", "31/10/2026 10:00:00 INFO b",
+                       "01/11/2026 10:00:00 INFO c", "02/11/2026 10:00:00 INFO d"}),
+              "day-first");
+    EXPECT_EQ(orderOf({"10/30/2026 10:00:00 INFO a", "11/01/2026 10:00:00 INFO b",
+                       "11/02/2026 10:00:00 INFO c"}),
+              "");
+    EXPECT_EQ(orderOf({"10/30/26 10:00:00 INFO a", "10/11/26 10:00:00 INFO b"}), "month-first");
+    EXPECT_EQ(orderOf({"26/10/30 10:00:00 INFO a", "26/11/01 10:00:00 INFO b"}), "");
+    const Proposed one({"31/10/2026 10:00:00 INFO b", "01/11/2026 10:00:00 INFO c"});
+    EXPECT_EQ(one.columns.time.month, 11U);
+    EXPECT_EQ(one.columns.time.day, 1U);
+}
+
+TEST(FormatProposal, FindsTimesThatStandInSeveralColumns) {
+    const Proposed brackets({"[2026-11-19][10:00:01][shop::server][INFO] listening"});
+    EXPECT_EQ(brackets.columns.time.second, 1U);
+    EXPECT_EQ(brackets.columns.source, "shop::server");
+    EXPECT_EQ(brackets.columns.description, "listening");
+    const Proposed dashes({"19/11/2026 -- 10:00:01 - <Info> - CPUs online: 4"});
+    EXPECT_EQ(dashes.columns.time.second, 1U);
+    EXPECT_EQ(dashes.columns.type, "Info");
+    EXPECT_EQ(dashes.columns.description, "CPUs online: 4");
+    const Proposed mark({"%Nov 19 10:00:01:123 2026 SW1 IFNET/3/PHY_UPDOWN: changed to up"});
+    EXPECT_TRUE(mark.columns.hasYear);
+    EXPECT_EQ(mark.columns.time.second, 1U);
+}
+
+TEST(FormatProposal, ReadsSeveritiesWithinCodes) {
+    EXPECT_EQ(columnsOf({"2026 Nov 19 10:00:00 sw1 %ETHPORT-5-IF_UP: Interface is up"}),
+              "NOTICE|ETHPORT|Interface is up");
+    EXPECT_EQ(columnsOf({"Nov 19 2026 10:00:00+01:00 SW1 %%01IFNET/4/LINK(l)[17]:Vlanif10 is up"}),
+              "WARNING|IFNET|Vlanif10 is up");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 INFO ratio is 1-3-2: ok"}),
+              "INFO||ratio is 1-3-2: ok");
+}
+
+TEST(FormatProposal, FindsLevelsBetweenOtherMarks) {
+    EXPECT_EQ(columnsOf({"19.11.2026 10:00:00.123 *INFO* [main] org.example.log.Service started"}),
+              "INFO|org.example.log.Service|started");
+    EXPECT_EQ(columnsOf({"2026-11-19T10:00:00Z [1] WARNING [3ad54] {engines} slow sync"}),
+              "WARNING|engines|slow sync");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 UTC - [Parent 1: Main]: D/nsHttp Handler::Init"}),
+              "DEBUG|nsHttp|Handler::Init");
+    EXPECT_EQ(columnsOf({"2026-11-19T10:00:00 [vm:api:INFO:src/main.rs:117] running"}),
+              "INFO|api|running");
+    EXPECT_EQ(columnsOf({"ERROR - 2026-11-19 10:00:00 --> page not found"}),
+              "ERROR||page not found");
+}
+
+TEST(FormatProposal, WordsInUpperCaseAreLevelsOnlyWhereMostLinesHaveThem) {
+    const std::vector<std::string> lines = {
+        "2026-11-19 10:00:00 - the queue is empty", "2026-11-19 10:00:01 - one of many came",
+        "2026-11-19 10:00:02 - a b c d ERROR NOTICE backtrace", "2026-11-19 10:00:03 - end"};
+    EXPECT_EQ(columnsOf({lines[0], lines[1], lines[3], lines[2]}),
+              "||a b c d ERROR NOTICE backtrace");
+    EXPECT_EQ(
+        columnsOf({"[2026-11-19 10:00:00] [Config] loaded", "[2026-11-19 10:00:01] [Hue] up"}),
+        "|Hue|up");
+}
+
+TEST(FormatProposal, WordsThatAreAlignedToTheRightAreColumns) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 INFO     general started", //
+                         "2026-11-19 10:00:00 INFO     network is up",
+                         "2026-11-19 10:00:00 INFO          ui is up"}),
+              "INFO|ui|is up");
+}
+
+TEST(FormatProposal, ALoggerComesBeforeAPlaceInTheSource) {
+    EXPECT_EQ(columnsOf({"INFO  2026-11-19 10:00:00,123 [shard 0] rpc - net/rpc.cc:412 - ready",
+                         "INFO  2026-11-19 10:00:00,123 [shard 0] kafka - kafka.cc:17 - ready"}),
+              "INFO|kafka|kafka.cc:17 - ready");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 I [1234:main] Shop::Server -- listening"}),
+              "INFO|Shop::Server|listening");
+}
+
 TEST(FormatProposal, PairsBehindAPaddedMessageMakeNoColumnOfIt) {
     EXPECT_EQ(columnsOf({"ERRO[0013] failed                     error=x"}),
               "ERRO||failed                     error=x");

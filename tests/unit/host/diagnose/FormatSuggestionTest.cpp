@@ -100,6 +100,18 @@ TEST(FormatSuggestion, AFormatIsMadeWhereItFindsMoreThanAGenericOne) {
     EXPECT_THAT(own.ready().front().names, ElementsAre("pgbouncer"));
 }
 
+TEST(FormatSuggestion, AFormatOfAnotherProgramThatFindsTheTimeAloneIsNoBetter) {
+    const std::vector<std::string> lines = {"2026-11-19 10:00:00 SYSTEM STATS: Time:1.2 Hosts:17",
+                                            "2026-11-19 10:00:01 the queue is empty"};
+    const auto made = [&](std::string_view log) {
+        return FormatSuggestion::of(ReadyFormats({ZRM_FORMATS}), lines, log);
+    };
+    ASSERT_FALSE(made("/srv/app.log").ready().empty());
+    EXPECT_THAT(made("/srv/app.log").ready().front().names, ElementsAre("exim"));
+    EXPECT_TRUE(made("/srv/app.log").proposal());
+    EXPECT_FALSE(made("/var/log/exim/mainlog").proposal());
+}
+
 TEST(FormatSuggestion, TheTableOfAProposalHasAllThatItNeeds) {
     const FormatSuggestion made = suggest({"2026-11-19 10:00:00.123456 W | op-osd: slow a=1",
                                            "  further", "2026-11-19 10:00:01.5 E | op-osd: b=2"});
