@@ -13,6 +13,11 @@ constexpr bool isBlank(char character) noexcept {
     return static_cast<unsigned char>(character) <= ' ';
 }
 
+/// A pair may begin behind a bar, as the first one of security products does.
+constexpr bool isBefore(char character) noexcept {
+    return isBlank(character) || character == '|';
+}
+
 constexpr bool isKeyCharacter(char character) noexcept {
     return (character >= 'a' && character <= 'z') || (character >= 'A' && character <= 'Z') ||
            (character >= '0' && character <= '9') || character == '_' || character == '.' ||
@@ -46,7 +51,7 @@ bool KeyValuePairs::begin(std::string_view text) noexcept {
 
 bool KeyValuePairs::next(Pair& pair) noexcept {
     while (!m_rest.empty()) {
-        const auto first = std::find_if_not(m_rest.begin(), m_rest.end(), isBlank);
+        const auto first = std::find_if_not(m_rest.begin(), m_rest.end(), isBefore);
         m_rest.remove_prefix(static_cast<std::size_t>(first - m_rest.begin()));
         const std::size_t length = keyLength(m_rest);
         if (length > 0) {
@@ -55,7 +60,7 @@ bool KeyValuePairs::next(Pair& pair) noexcept {
             takeValue(pair);
             return true;
         }
-        const auto end = std::find_if(m_rest.begin(), m_rest.end(), isBlank);
+        const auto end = std::find_if(m_rest.begin(), m_rest.end(), isBefore);
         m_rest.remove_prefix(static_cast<std::size_t>(end - m_rest.begin()));
     }
     return false;

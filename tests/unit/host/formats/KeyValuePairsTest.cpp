@@ -33,6 +33,8 @@ TEST(KeyValuePairs, FindsPairsBetweenOtherWords) {
         fieldsOf("listening address=127.0.0.1:80 on tls.mode=strict, n=3;"),
         ElementsAre(Pair("address", "127.0.0.1:80"), Pair("tls.mode", "strict"), Pair("n", "3")));
     EXPECT_THAT(fieldsOf("a=b=c d= e"), ElementsAre(Pair("a", "b=c"), Pair("d", "")));
+    EXPECT_THAT(fieldsOf("stopped|10|src=10.0.0.1 act=blocked"),
+                ElementsAre(Pair("src", "10.0.0.1"), Pair("act", "blocked")));
     EXPECT_THAT(fieldsOf(""), IsEmpty());
     EXPECT_THAT(fieldsOf("= =a x =b \xff=c [k=v]"), IsEmpty());
 }
