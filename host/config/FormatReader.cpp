@@ -33,7 +33,7 @@ constexpr Key keys[] = {
 };
 
 /// The types whose entries may have several lines.
-constexpr Key entryKey{"entry", "regex json logfmt syslog"};
+constexpr Key entryKey{"entry", "regex json logfmt syslog journal"};
 
 /// The texts of a table, by key.
 std::map<std::string, std::string> readTexts(ConfigSection& section) {

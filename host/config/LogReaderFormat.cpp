@@ -112,10 +112,6 @@ void LogReader::useFormat(ConfigSection& section, const FormatDescription& forma
 /// What is read from the messages of a journal.
 void LogReader::readMessages(ConfigSection& section, LogConfig& log) {
     const std::size_t problems = section.problemCount();
-    section.refuse("entry",
-                   "has no meaning for a journal, in which each message is an entry, also one of "
-                   "several lines",
-                   "leave it out; what a program writes line by line is an entry per line");
     section.refuse("unwrap", "has no meaning for a journal, whose messages are not wrapped");
     section.refuse("time_format", "has no meaning for a journal, which has each message's time");
     if (section.problemCount() != problems) {
@@ -127,7 +123,13 @@ void LogReader::readMessages(ConfigSection& section, LogConfig& log) {
     const std::optional<FormatDescription> format =
         section.has("format") ? readNamedFormat(section, m_formats)
                               : FormatReader::readOver(section, std::move(plain));
-    if (!format || !FormatReader::describes(section)) {
+    if (!format) {
+        return;
+    }
+    FormatDescription lines;
+    lines.lines = format->lines;
+    log.follow.join.value = EntryLinesReader::make(section, lines);
+    if (!FormatReader::describes(section)) {
         return;
     }
     auto messages = MessageFormat::make(*format);

@@ -1,17 +1,12 @@
 #include "host/sources/Journal.h"
 
-#include "base/EntryFields.h"
 #include "framework/LogEntry.h"
 #include "host/sources/MapFaults.h"
-#include "logs/ZoneTime.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <charconv>
 #include <cstdlib>
-#include <cstring>
 #include <filesystem>
-#include <optional>
 #include <system_error>
 #include <utility>
 
@@ -26,9 +21,6 @@ namespace {
 constexpr std::size_t longestText = EntryKeep::longestText;
 constexpr std::string_view messageName = "MESSAGE";
 constexpr std::size_t mostSteps = 10'000; ///< entries passed over in one call
-
-constexpr std::array<std::string_view, 8> priorityNames = {"emerg",   "alert",  "crit", "err",
-                                                           "warning", "notice", "info", "debug"};
 
 bool isGlob(std::string_view text) noexcept {
     return text.find_first_of("*?[") != text.npos;
@@ -203,89 +195,6 @@ bool Journal::wait(std::chrono::milliseconds most) {
     return outcome == SD_JOURNAL_INVALIDATE;
 }
 
-/// Takes what the columns need out of the entry. Asking for each field alone would look at all of
-/// them each time.
-bool Journal::load() {
-    for (Text& slot : m_slots) {
-        slot.length = 0;
-    }
-    m_hasMessage = m_isMessageCut = m_isOwn = false;
-    m_messageLength = 0;
-    m_priority = -1;
-    sd_journal_restart_data(m_journal);
-    const void* data = nullptr;
-    std::size_t length = 0;
-    int outcome = 0;
-    while ((outcome = sd_journal_enumerate_available_data(m_journal, &data, &length)) > 0) {
-        take({static_cast<const char*>(data), length});
-    }
-    m_message[m_messageLength] = '\0';
-    return outcome == 0 && sd_journal_get_realtime_usec(m_journal, &m_time) >= 0;
-}
-
-void Journal::keep(Slot slot, std::string_view value) noexcept {
-    Text& text = m_slots[slot];
-    if (text.length == 0) { // of several values the first counts
-        text.length = value.copy(text.text.data(), text.text.size());
-    }
-}
-
-/// Takes one field, "NAME=value".
-void Journal::take(std::string_view data) {
-    const auto value = [&data](std::string_view name) {
-        return data.starts_with(name) ? std::optional(data.substr(name.size())) : std::nullopt;
-    };
-    const auto keepIf = [&](Slot slot, std::string_view name) {
-        if (const auto found = value(name)) {
-            keep(slot, *found);
-        }
-    };
-    if (data.size() < 3) {
-        return;
-    }
-    switch (data[0] == '_' ? data[1] + 128 : data[0]) {
-    case 'M':
-        if (const auto text = value("MESSAGE="); text && !m_hasMessage) {
-            m_hasMessage = true;
-            m_isMessageCut = text->size() > longestText;
-            m_messageLength = text->copy(m_message.data(), longestText);
-        }
-        break;
-    case 'P':
-        if (const auto text = value("PRIORITY=");
-            text && text->size() == 1 && (*text)[0] >= '0' && (*text)[0] <= '7') {
-            m_priority = (*text)[0] - '0';
-        }
-        break;
-    case 'S':
-        keepIf(identifier, "SYSLOG_IDENTIFIER=");
-        keepIf(claimed, "SYSLOG_PID=");
-        break;
-    case 'U':
-        keepIf(managed, "UNIT=");
-        break;
-    case 'C' + 128:
-        keepIf(command, "_COMM=");
-        break;
-    case 'E' + 128:
-        m_isOwn = m_isOwn || (!m_ownProgram.empty() && value("_EXE=") == m_ownProgram);
-        break;
-    case 'H' + 128:
-        keepIf(host, "_HOSTNAME=");
-        break;
-    case 'P' + 128:
-        keepIf(process, "_PID=");
-        break;
-    case 'S' + 128:
-        keepIf(unit, "_SYSTEMD_UNIT=");
-        m_isOwn = m_isOwn ||
-                  (!m_ownInvocation.empty() && value("_SYSTEMD_INVOCATION_ID=") == m_ownInvocation);
-        break;
-    default:
-        break;
-    }
-}
-
 bool Journal::isWanted() const {
     if (m_isOwn) {
         return false;
@@ -302,68 +211,6 @@ bool Journal::isWanted() const {
                            });
     };
     return matches(unit) || (of(process) == "1" && matches(managed));
-}
-
-void Journal::buildSource() {
-    m_sourceLength = 0;
-    const auto append = [this](std::string_view text) {
-        m_sourceLength +=
-            text.copy(m_source.data() + m_sourceLength, m_source.size() - m_sourceLength);
-    };
-    append(!of(identifier).empty() ? of(identifier) : of(command));
-    const std::string_view number = !of(process).empty() ? of(process) : of(claimed);
-    if (m_sourceLength > 0 && !number.empty()) {
-        append("[");
-        append(number);
-        append("]");
-    }
-}
-
-void Journal::read(EntryColumns& columns) {
-    constexpr std::string_view service = ".service";
-    buildSource();
-    columns.hasTime = columns.hasYear = true;
-    columns.time = CivilTime::of(static_cast<std::int64_t>(m_time / 1'000'000));
-    columns.offset = 0;
-    columns.system = of(host);
-    columns.source = {m_source.data(), m_sourceLength};
-    columns.type =
-        m_priority < 0 ? std::string_view() : priorityNames[static_cast<std::size_t>(m_priority)];
-    // What the manager says of a unit is about that, not about the manager.
-    columns.entryClass = of(process) == "1" && !of(managed).empty() ? of(managed) : of(unit);
-    if (columns.entryClass.ends_with(service)) {
-        columns.entryClass.remove_suffix(service.size());
-    }
-    columns.description = message();
-    if (m_messageReader) {
-        m_messageReader->read(columns);
-    }
-}
-
-void Journal::readFields(EntryFields& fields) {
-    const MapFaults tolerated;
-    const void* data = nullptr;
-    std::size_t length = 0;
-    sd_journal_restart_data(m_journal);
-    while (sd_journal_enumerate_available_data(m_journal, &data, &length) > 0) {
-        const std::string_view field(static_cast<const char*>(data), length);
-        const std::size_t end = field.find('=');
-        if (end == field.npos) {
-            continue;
-        }
-        if (field.substr(0, end) == messageName) {
-            fields.add(messageName, message()); // which is kept here already
-            continue;
-        }
-        if (const auto kept = fields.append(field).takeText()) {
-            fields.add(kept->substr(0, end), kept->substr(end + 1));
-        } else {
-            fields.noteLeftOut();
-        }
-    }
-    if (m_messageReader) {
-        m_messageReader->readFields({m_source.data(), m_sourceLength}, message(), fields);
-    }
 }
 
 } // namespace zrm::host

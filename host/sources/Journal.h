@@ -3,6 +3,7 @@
 
 #include "host/config/SourceConfig.h"
 #include "host/formats/MessageFormat.h"
+#include "host/sources/JournalLine.h"
 #include "logs/EntrySource.h"
 
 #include <array>
@@ -75,6 +76,10 @@ public:
 
     // The last entry.
 
+    /// A copy of it.
+    JournalLine line();
+    /// Makes what was joined the last entry, for what follows. It must be valid until the next one.
+    void show(const JournalEntry& entry);
     /// Call it before readFields.
     void read(EntryColumns& columns);
     char* text() noexcept { return m_message.data(); }
@@ -99,7 +104,9 @@ private:
     void addAlternatives(const char* field, const std::vector<std::string>& values);
     Step step(Direction direction);
     bool load();
+    void forget() noexcept;
     void take(std::string_view data);
+    void addField(std::string_view field, EntryFields& fields) const;
     void keep(Slot slot, std::string_view value) noexcept;
     std::string_view of(Slot slot) const noexcept {
         return {m_slots[slot].text.data(), m_slots[slot].length};
@@ -124,6 +131,7 @@ private:
     int m_priority = -1;  ///< -1: the entry has none
     bool m_isOwn = false; ///< this agent has written the entry
     std::uint64_t m_time = 0;
+    const JournalLine* m_shown = nullptr; ///< null: the last entry is the library's
     std::uint64_t m_damaged = 0;
     int m_error = 0;
 };

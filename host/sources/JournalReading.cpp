@@ -25,9 +25,14 @@ constexpr const char* beforeAll = "beginning"; ///< the position before the firs
 } // namespace
 
 JournalReading::JournalReading(const JournalConfig& config,
-                               std::shared_ptr<const MessageFormat> messages)
-    : m_config(config), m_journal(config, std::move(messages)), m_faults(MapFaults::count()),
-      m_pause(firstPause, longestPause) {}
+                               std::shared_ptr<const MessageFormat> messages,
+                               std::shared_ptr<const LineJoin> join)
+    : m_config(config), m_journal(config, std::move(messages)), m_rules(std::move(join)),
+      m_faults(MapFaults::count()), m_pause(firstPause, longestPause) {
+    if (m_rules) {
+        m_join.emplace(*m_rules);
+    }
+}
 
 void JournalReading::startAt(Start start) {
     m_position = start == Start::beginning ? beforeAll : "";
@@ -35,19 +40,22 @@ void JournalReading::startAt(Start start) {
 }
 
 void JournalReading::resumeAt(const std::string& position) {
-    m_position = position;
+    m_position = JournalJoin::cursorOf(position);
+    if (m_join) {
+        m_join->begin(position);
+    }
     open();
-    if (m_journal.isOpen() && position != beforeAll && !Journal::holds(m_config, position)) {
+    if (m_journal.isOpen() && m_position != beforeAll && !Journal::holds(m_config, m_position)) {
         noteLoss();
     }
 }
 
 void JournalReading::recall(const std::string& position, std::chrono::seconds period) {
     const auto length = static_cast<std::uint64_t>(period.count()) * second;
-    const std::uint64_t time = Journal::timeOf(position);
-    m_last = position;
+    m_last = JournalJoin::cursorOf(position);
+    const std::uint64_t time = Journal::timeOf(*m_last);
     m_recallFrom = time > length ? time - length : 0;
-    m_isRecalled = position == beforeAll;
+    m_isRecalled = *m_last == beforeAll;
     open();
 }
 
@@ -77,6 +85,9 @@ bool JournalReading::open() {
     if (outcome < 0) {
         fail(std::string("the journal cannot be opened: ") + ErrorText(-outcome).text());
         return false;
+    }
+    if (m_join && !m_join->hasBegun()) {
+        m_join->begin(m_position);
     }
     m_pause.reset();
     return true;
@@ -147,6 +158,27 @@ int JournalReading::seekPosition() {
 }
 
 char* JournalReading::next() {
+    if (!m_join) {
+        return nextLine();
+    }
+    for (bool isMore = true;;) {
+        const bool isOver = m_last && !isMore; // what is recalled has no further lines
+        if (const JournalEntry* const entry = m_join->next(Clock::now(), isOver)) {
+            m_journal.show(*entry);
+            return m_journal.text();
+        }
+        if (!isMore) {
+            return nullptr;
+        }
+        isMore = nextLine() != nullptr;
+        if (isMore) {
+            m_join->add(m_journal.line(), Clock::now());
+        }
+    }
+}
+
+/// The next entry of the journal, which may be one of several lines that are joined.
+char* JournalReading::nextLine() {
     if (m_isRecalled || (!m_journal.isOpen() && (Clock::now() < m_retry || !open()))) {
         return nullptr;
     }
@@ -157,7 +189,7 @@ char* JournalReading::next() {
     m_isPassing = step == Journal::Step::passing;
     noteDamage();
     if (step == Journal::Step::failed) {
-        position();
+        notePosition();
         fail(std::string("the journal cannot be read: ") + ErrorText(-m_journal.error()).text());
     }
     if (step != Journal::Step::entry) {
@@ -191,14 +223,22 @@ void JournalReading::remark(EntrySource::Remark remark) {
     }
 }
 
-std::string JournalReading::position() {
+void JournalReading::notePosition() {
     if (std::string cursor = m_journal.cursor(); !cursor.empty()) {
         m_position = std::move(cursor);
     }
-    return m_position;
+}
+
+std::string JournalReading::position() {
+    notePosition();
+    return m_join ? m_join->position() : m_position;
 }
 
 std::string JournalReading::takeBack() {
+    if (m_join) {
+        m_join->takeBack();
+        return m_join->position();
+    }
     return m_journal.isOpen() && m_journal.stepBack() ? m_journal.cursor() : m_position;
 }
 
@@ -211,8 +251,8 @@ void JournalReading::wait(std::chrono::milliseconds most) {
         std::this_thread::sleep_for(std::clamp<std::chrono::milliseconds>(pause, 0ms, most));
         return;
     }
-    position(); // the library forgets the entry if its file is removed
-    if (m_journal.wait(most)) {
+    notePosition(); // the library forgets the entry if its file is removed
+    if (m_journal.wait(m_join ? m_join->patience(Clock::now(), most) : most)) {
         lookAtFiles();
     }
     if (Clock::now() >= m_look && hasNewDirectory()) {

@@ -4,6 +4,7 @@
 #include "host/base/RetryPause.h"
 #include "host/sources/Journal.h"
 #include "host/sources/JournalFiles.h"
+#include "host/sources/JournalJoin.h"
 
 #include <chrono>
 #include <cstdint>
@@ -20,9 +21,11 @@ namespace zrm::host {
 /// Reads a journal as it grows, each entry once, through rotation and the removal of old files.
 class JournalReading final : public EntrySource::Reading {
 public:
-    /// Call it on the thread that reads. `messages` as for Journal.
+    /// Call it on the thread that reads. `messages` as for Journal; `join`: which entries of the
+    /// journal make one; null: each is one.
     explicit JournalReading(const JournalConfig& config,
-                            std::shared_ptr<const MessageFormat> messages = nullptr);
+                            std::shared_ptr<const MessageFormat> messages = nullptr,
+                            std::shared_ptr<const LineJoin> join = nullptr);
 
     void startAt(Start start) override;
     void resumeAt(const std::string& position) override;
@@ -43,6 +46,8 @@ private:
     using Clock = std::chrono::steady_clock;
 
     bool open();
+    char* nextLine();
+    void notePosition();
     int seek();
     int seekEnd();
     int seekPosition();
@@ -55,6 +60,8 @@ private:
 
     const JournalConfig m_config;
     Journal m_journal;
+    const std::shared_ptr<const LineJoin> m_rules;
+    std::optional<JournalJoin> m_join; ///< none: nothing is joined
     /// Of the last entry that was read, or before all; empty: at the end.
     std::string m_position;
     bool m_wasAbsent = false;          ///< there was no journal at an earlier look

@@ -12,7 +12,7 @@ namespace {
 
 std::shared_ptr<const EntrySource> sourceOf(const LogConfig& log) {
     if (log.journal) {
-        return std::make_shared<const JournalSource>(*log.journal, log.messages);
+        return std::make_shared<const JournalSource>(*log.journal, log.messages, log.follow.join);
     }
     return std::make_shared<const CommandSource>(*log.command, log.follow.format, log.follow.join);
 }

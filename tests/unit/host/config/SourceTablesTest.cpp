@@ -4,6 +4,7 @@
 
 #include <gmock/gmock.h>
 
+#include <chrono>
 #include <string>
 
 using namespace zrm;
@@ -88,16 +89,29 @@ TEST(SourceTables, ReadsWhatIsReadFromTheMessagesOfAJournal) {
     EXPECT_THAT(lines.messages->definition(), HasSubstr("lvl"));
 }
 
+TEST(SourceTables, MessagesOfAJournalAreJoined) {
+    const std::string table = "[[log]]\ntype = 'journal'\n";
+    EXPECT_FALSE(logsOf(table)[0].follow.join);
+    const LogConfig log = logsOf(table + "entry = { indented = true, wait = '5s' }\n")[0];
+    ASSERT_TRUE(log.follow.join);
+    EXPECT_TRUE(log.follow.join->joins("first", "  second"));
+    EXPECT_EQ(log.follow.join->limits().wait, std::chrono::seconds(5));
+    const std::string formats = "[formats]\ndirectory = '" ZRM_FORMATS "'\n" + table;
+    EXPECT_TRUE(logsOf(formats + "format = 'java'\n")[0].follow.join);
+    EXPECT_FALSE(logsOf(formats + "format = 'sshd'\n")[0].follow.join);
+    EXPECT_THAT(problemsOf(table + "entry = { starts = '(' }\n"),
+                ElementsAre(HasSubstr("log.entry.starts: ")));
+    EXPECT_THAT(problemsOf(table + "entry = { wait = '2s' }\n"),
+                ElementsAre(HasSubstr("does not say which lines make an entry")));
+}
+
 TEST(SourceTables, RefusesWhatMessagesOfAJournalCannotBe) {
     const std::string log = "[[log]]\ntype = 'journal'\n";
     EXPECT_THAT(
-        problemsOf(log + "entry = { starts = 'a' }\nunwrap = 'cri'\ntime_format = 'auto'\n"),
-        ElementsAre("zrm.toml:3: log.entry: has no meaning for a journal, in which each message is "
-                    "an entry, also one of several lines; leave it out; what a program writes line "
-                    "by line is an entry per line",
-                    "zrm.toml:4: log.unwrap: has no meaning for a journal, whose messages are not "
+        problemsOf(log + "unwrap = 'cri'\ntime_format = 'auto'\n"),
+        ElementsAre("zrm.toml:3: log.unwrap: has no meaning for a journal, whose messages are not "
                     "wrapped; leave it out",
-                    "zrm.toml:5: log.time_format: has no meaning for a journal, which has each "
+                    "zrm.toml:4: log.time_format: has no meaning for a journal, which has each "
                     "message's time; leave it out"));
     EXPECT_THAT(
         problemsOf(log + "columns = { type = 'a' }\n"),
