@@ -118,7 +118,11 @@ class EpisodesPage {
       h(
         "div",
         {},
-        h("a", { href: withQuery("#/events", { situation: episode.situation }) }, episode.situation),
+        h(
+          "a",
+          { href: withQuery("#/events", { situation: episode.situation }) },
+          episode.situation,
+        ),
         ` ${groupText(episode.group)}`,
         h("p", { className: "why" }, episode.log, episode.reason && `; ${episode.reason}`),
       ),
