@@ -35,10 +35,13 @@ EpisodeJudge::EpisodeJudge(JudgementConfig rules)
 
 /// Whether the group counts nothing that an entry of this time could add to.
 bool EpisodeJudge::isIdle(const Group& group, std::int64_t time) const {
-    const bool isOver = m_rules.period == 0 || group.windows.isOver(time, m_rules.period);
-    return isOver && group.episodes.empty() &&
-           std::all_of(group.raised.begin(), group.raised.end(),
-                       [&](std::int64_t raised) { return time - raised >= m_rules.cooldown; });
+    const bool isOver = m_rules.period == 0 || group.windows().isOver(time, m_rules.period);
+    const Group::Extra* const extra = group.extra();
+    return isOver &&
+           (extra == nullptr ||
+            (extra->episodes.empty() &&
+             std::all_of(extra->events.begin(), extra->events.end(),
+                         [&](std::int64_t event) { return time - event >= m_rules.cooldown; })));
 }
 
 Group& EpisodeJudge::groupOf(const Entry& entry, std::vector<EndedEpisode>& ended) {
@@ -48,12 +51,12 @@ Group& EpisodeJudge::groupOf(const Entry& entry, std::vector<EndedEpisode>& ende
     if (m_groups.isFull()) {
         Group& oldest = m_groups.oldest();
         m_dropped += isIdle(oldest, entry.time) ? 0 : 1;
-        for (Episode& episode : oldest.episodes) {
-            const bool isOver = episode.last + m_rules.resolveAfter <= entry.time;
-            ended.push_back({std::move(episode), oldest.key, !isOver});
-            --m_episodes;
+        if (Group::Extra* const extra = oldest.extra()) {
+            for (Episode& episode : extra->episodes) {
+                const bool isOver = episode.last + m_rules.resolveAfter <= entry.time;
+                end(oldest, episode, ended, !isOver);
+            }
         }
-        m_groups.removeOldest();
     }
     return m_groups.add(entry.group);
 }
@@ -64,18 +67,16 @@ bool EpisodeJudge::count(Group& group, const Entry& entry, Verdict& verdict) con
     if (m_rules.frequency == 0) {
         return true;
     }
-    if (!m_rules.distinct.empty() && group.values == nullptr) {
-        group.values = std::make_unique<DistinctValues>();
-    }
+    DistinctValues* const values = m_rules.distinct.empty() ? nullptr : &group.makeExtra().values;
     if (isAfterOthers(entry)) {
-        verdict.count = group.windows.within(entry.time, m_rules.period).entries;
-        if (!m_rules.distinct.empty()) {
-            verdict.count = group.values->within(entry.time, m_rules.period);
+        verdict.count = group.windows().within(entry.time, m_rules.period).entries;
+        if (values != nullptr) {
+            verdict.count = values->within(entry.time, m_rules.period);
         }
     } else {
-        verdict.count = group.windows.add(entry.time, m_rules.period);
-        if (!m_rules.distinct.empty()) {
-            verdict.count = group.values->add(entry.time, m_rules.period, entry.distinct);
+        verdict.count = group.windows().add(entry.time, m_rules.period);
+        if (values != nullptr) {
+            verdict.count = values->add(entry.time, m_rules.period, entry.distinct);
         }
     }
     const bool isMet = m_rules.isUpperBound ? verdict.count <= m_rules.frequency
@@ -86,9 +87,9 @@ bool EpisodeJudge::count(Group& group, const Entry& entry, Verdict& verdict) con
 /// The entries that the threshold has counted, with this one.
 EntryWindows::Counted EpisodeJudge::countedWith(const Group& group, const Entry& entry) const {
     if (!isAfterOthers(entry)) {
-        return group.windows.counted(entry.time, m_rules.period);
+        return group.windows().counted(entry.time, m_rules.period);
     }
-    EntryWindows::Counted counted = group.windows.within(entry.time, m_rules.period);
+    EntryWindows::Counted counted = group.windows().within(entry.time, m_rules.period);
     ++counted.entries;
     return counted;
 }
@@ -96,7 +97,7 @@ EntryWindows::Counted EpisodeJudge::countedWith(const Group& group, const Entry&
 EpisodeJudge::Verdict EpisodeJudge::judge(const Entry& entry, std::vector<EndedEpisode>& ended) {
     Verdict verdict;
     Group& group = groupOf(entry, ended);
-    ++group.entries;
+    ++m_entries;
     const bool isMet = count(group, entry, verdict);
     if (m_rules.resolveAfter > 0) {
         judgeEpisode(group, entry, isMet, verdict, ended);
@@ -120,19 +121,16 @@ void EpisodeJudge::recount(const Entry& entry) {
 
 void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Verdict& verdict,
                                 std::vector<EndedEpisode>& ended) {
-    const auto lasting =
-        std::find_if(group.episodes.begin(), group.episodes.end(), [&](const Episode& episode) {
-            return entry.time < episode.last + m_rules.resolveAfter &&
-                   entry.time > episode.first - m_rules.resolveAfter;
-        });
-    if (lasting != group.episodes.end()) {
-        lasting->used = group.entries;
-        verdict.share = addTo(*lasting, entry, 1, entry.time);
-        verdict.episode = &*lasting;
-        verdict.decision = Decision::CONTINUES;
-        return;
+    if (group.extra() != nullptr) {
+        if (Episode* const lasting = lastingAt(*group.extra(), entry.time)) {
+            lasting->used = m_entries;
+            verdict.share = addTo(*lasting, entry, 1, entry.time);
+            verdict.episode = lasting;
+            verdict.decision = Decision::CONTINUES;
+            return;
+        }
+        endEarlier(group, entry, ended);
     }
-    endEarlier(group, entry, ended);
     if (!isMet) {
         return;
     }
@@ -143,7 +141,7 @@ void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Ve
         verdict.first = counted.first;
     }
     Episode& episode = begin(group, ended);
-    episode.used = group.entries;
+    episode.used = m_entries;
     episode.first = verdict.first;
     episode.last = entry.time;
     verdict.share = addTo(episode, entry, entries, verdict.first);
@@ -152,15 +150,32 @@ void EpisodeJudge::judgeEpisode(Group& group, const Entry& entry, bool isMet, Ve
     m_earliestLast = std::min(m_earliestLast, entry.time);
 }
 
-/// Ends what has had nothing for long enough, as far as this entry's log can say so.
+/// The episode that an entry of this time belongs to; null if there is none.
+Episode* EpisodeJudge::lastingAt(Group::Extra& extra, std::int64_t time) const {
+    const auto found =
+        std::find_if(extra.episodes.begin(), extra.episodes.end(), [&](const Episode& episode) {
+            return time < episode.last + m_rules.resolveAfter &&
+                   time > episode.first - m_rules.resolveAfter;
+        });
+    return found == extra.episodes.end() ? nullptr : &*found;
+}
+
+/// Gives away an episode, which its group then forgets.
+void EpisodeJudge::end(const Group& group, Episode& episode, std::vector<EndedEpisode>& ended,
+                       bool isDropped) {
+    ended.push_back({std::move(episode), std::string(group.key()), isDropped});
+    --m_episodes;
+}
+
+/// Ends what has had nothing for long enough, as far as this entry's log can say so. Only if the
+/// group has raised something.
 void EpisodeJudge::endEarlier(Group& group, const Entry& entry, std::vector<EndedEpisode>& ended) {
-    std::erase_if(group.episodes, [&](Episode& episode) {
+    std::erase_if(group.extra()->episodes, [&](Episode& episode) {
         const bool isOver = entry.time >= episode.last + m_rules.resolveAfter &&
                             std::all_of(episode.shares.begin(), episode.shares.end(),
                                         [&](const auto& share) { return share->log == entry.log; });
         if (isOver) {
-            ended.push_back({std::move(episode), group.key});
-            --m_episodes;
+            end(group, episode, ended);
         }
         return isOver;
     });
@@ -168,16 +183,16 @@ void EpisodeJudge::endEarlier(Group& group, const Entry& entry, std::vector<Ende
 
 /// A new episode of the group.
 Episode& EpisodeJudge::begin(Group& group, std::vector<EndedEpisode>& ended) {
-    if (group.episodes.size() == mostEpisodes) {
+    std::vector<Episode>& episodes = group.makeExtra().episodes;
+    if (episodes.size() == mostEpisodes) {
         const auto least =
-            std::min_element(group.episodes.begin(), group.episodes.end(),
+            std::min_element(episodes.begin(), episodes.end(),
                              [](const Episode& a, const Episode& b) { return a.used < b.used; });
-        ended.push_back({std::move(*least), group.key, true});
-        group.episodes.erase(least);
-        --m_episodes;
+        end(group, *least, ended, true);
+        episodes.erase(least);
     }
     ++m_episodes;
-    return group.episodes.emplace_back();
+    return episodes.emplace_back();
 }
 
 /// Whether an event of the group was raised less than the cooldown before or after this time. If
@@ -186,15 +201,16 @@ bool EpisodeJudge::cools(Group& group, std::int64_t time) const {
     if (m_rules.cooldown == 0) {
         return false;
     }
-    for (const std::int64_t raised : group.raised) {
+    std::vector<std::int64_t>& events = group.makeExtra().events;
+    for (const std::int64_t raised : events) {
         if (time < raised + m_rules.cooldown && time > raised - m_rules.cooldown) {
             return true;
         }
     }
-    if (group.raised.size() == mostPauses) {
-        group.raised.erase(group.raised.begin());
+    if (events.size() == mostPauses) {
+        events.erase(events.begin());
     }
-    group.raised.push_back(time);
+    events.push_back(time);
     return false;
 }
 
@@ -202,13 +218,13 @@ void EpisodeJudge::restore(std::string_view key, Episode episode,
                            std::vector<EndedEpisode>& ended) {
     Group& group = groupOf({.group = key}, ended);
     m_earliestLast = std::min(m_earliestLast, episode.last);
-    group.episodes.push_back(std::move(episode));
+    group.makeExtra().episodes.push_back(std::move(episode));
     ++m_episodes;
 }
 
 void EpisodeJudge::restorePause(std::string_view key, std::int64_t raised,
                                 std::vector<EndedEpisode>& ended) {
-    groupOf({.group = key}, ended).raised.push_back(raised);
+    groupOf({.group = key}, ended).makeExtra().events.push_back(raised);
 }
 
 void EpisodeJudge::takeOver(const std::function<bool(Episode&)>& isOver,
@@ -217,17 +233,19 @@ void EpisodeJudge::takeOver(const std::function<bool(Episode&)>& isOver,
     if (m_episodes == 0) {
         return;
     }
-    for (Group& group : m_groups.all()) {
-        std::erase_if(group.episodes, [&](Episode& episode) {
+    m_groups.visitAll([&](Group& group) {
+        if (group.extra() == nullptr) {
+            return;
+        }
+        std::erase_if(group.extra()->episodes, [&](Episode& episode) {
             if (!isOver(episode)) {
                 m_earliestLast = std::min(m_earliestLast, episode.last);
                 return false;
             }
-            ended.push_back({std::move(episode), group.key});
-            --m_episodes;
+            end(group, episode, ended);
             return true;
         });
-    }
+    });
 }
 
 } // namespace zrm::host

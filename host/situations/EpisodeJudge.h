@@ -90,6 +90,9 @@ private:
     EntryWindows::Counted countedWith(const Group& group, const Entry& entry) const;
     void judgeEpisode(Group& group, const Entry& entry, bool isMet, Verdict& verdict,
                       std::vector<EndedEpisode>& ended);
+    Episode* lastingAt(Group::Extra& extra, std::int64_t time) const;
+    void end(const Group& group, Episode& episode, std::vector<EndedEpisode>& ended,
+             bool isDropped = false);
     void endEarlier(Group& group, const Entry& entry, std::vector<EndedEpisode>& ended);
     Episode& begin(Group& group, std::vector<EndedEpisode>& ended);
     bool cools(Group& group, std::int64_t time) const;
@@ -99,6 +102,7 @@ private:
     const JudgementConfig m_rules;
     GroupTable m_groups;
     std::size_t m_episodes = 0;
+    std::uint64_t m_entries = 0; ///< judged so far
     std::uint64_t m_dropped = 0;
     std::int64_t m_earliestLast = none; ///< a lower bound, renewed by takeOver
 };

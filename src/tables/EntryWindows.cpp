@@ -12,25 +12,30 @@ namespace {
 /// No entries are further apart.
 constexpr std::int64_t longestPeriod = std::int64_t{1} << 42;
 
+/// Room for as many seconds is made at once.
+constexpr std::size_t usualSeconds = 3;
+
 } // namespace
 
 std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
     period = std::min(period, longestPeriod);
     ++m_additions;
     std::int64_t most = 0;
-    for (Group& group : m_groups) {
-        if (group.takes(time, period)) {
-            most = std::max(most, group.add(time, period, m_mostSeconds));
-            group.used = m_additions;
+    const std::size_t count = groups();
+    for (std::size_t index = 0; index < count; ++index) {
+        Group& taking = group(index);
+        if (taking.takes(time, period)) {
+            most = std::max(most, taking.add(time, period, m_mostSeconds));
+            taking.used = m_additions;
         }
     }
     if (most == 0) {
-        Group& group = spareGroup();
-        group.begin(time);
-        group.used = m_additions;
+        Group& begun = spareGroup();
+        begun.begin(time);
+        begun.used = m_additions;
         return 1;
     }
-    if (m_groups.size() > 1) {
+    if (count > 1) {
         joinAt(time);
     }
     return most;
@@ -39,8 +44,8 @@ std::int64_t EntryWindows::add(std::int64_t time, std::int64_t period) {
 EntryWindows::Counted EntryWindows::within(std::int64_t time, std::int64_t period) const noexcept {
     period = std::min(period, longestPeriod);
     Counted most{0, time};
-    for (const Group& group : m_groups) {
-        const Counted found = group.within(time, period);
+    for (std::size_t index = 0; index < groups(); ++index) {
+        const Counted found = group(index).within(time, period);
         most = found.entries > most.entries ? found : most;
     }
     return most;
@@ -49,10 +54,11 @@ EntryWindows::Counted EntryWindows::within(std::int64_t time, std::int64_t perio
 EntryWindows::Counted EntryWindows::counted(std::int64_t time, std::int64_t period) const noexcept {
     period = std::min(period, longestPeriod);
     Counted most{0, time};
-    for (const Group& group : m_groups) {
-        if (group.takes(time, period)) {
-            for (const std::int64_t end : {time, group.newest()}) {
-                const Counted found = group.within(end, period);
+    for (std::size_t index = 0; index < groups(); ++index) {
+        const Group& taking = group(index);
+        if (taking.takes(time, period)) {
+            for (const std::int64_t end : {time, taking.newest()}) {
+                const Counted found = taking.within(end, period);
                 most = found.entries > most.entries ? found : most;
             }
         }
@@ -61,44 +67,56 @@ EntryWindows::Counted EntryWindows::counted(std::int64_t time, std::int64_t peri
 }
 
 bool EntryWindows::isOver(std::int64_t time, std::int64_t period) const noexcept {
-    return std::ranges::all_of(m_groups, [time, period](const Group& group) {
+    const auto isOver = [&](const Group& group) {
         return time - group.newest() >= std::min(period, longestPeriod);
-    });
+    };
+    return groups() == 0 || (isOver(m_first) && std::ranges::all_of(m_others, isOver));
 }
 
 /// A group to begin anew: the one that has not been used for longest, if there are enough.
 EntryWindows::Group& EntryWindows::spareGroup() {
-    if (m_groups.size() < mostGroups) {
-        return m_groups.emplace_back();
+    if (m_first.isEmpty()) {
+        return m_first;
     }
-    return *std::min_element(m_groups.begin(), m_groups.end(),
-                             [](const Group& a, const Group& b) { return a.used < b.used; });
+    if (groups() < mostGroups) {
+        return m_others.emplace_back();
+    }
+    Group* least = &m_first;
+    for (Group& other : m_others) {
+        least = other.used < least->used ? &other : least;
+    }
+    return *least;
 }
 
 /// Groups whose newest entries are of the same time would take the same entries from now on: the
 /// one with most is enough.
 void EntryWindows::joinAt(std::int64_t newest) {
-    const auto hasMet = [newest](const Group& group) { return group.newest() == newest; };
-    const auto kept = std::find_if(m_groups.begin(), m_groups.end(), hasMet);
-    for (auto group = kept; group != m_groups.end();) {
-        if (group == kept || !hasMet(*group)) {
-            ++group;
+    Group* kept = m_first.newest() == newest ? &m_first : nullptr;
+    for (auto other = m_others.begin(); other != m_others.end();) {
+        if (other->newest() != newest) {
+            ++other;
             continue;
         }
-        if (kept->count() < group->count()) {
-            std::swap(*kept, *group);
+        if (kept == nullptr) {
+            kept = &*other++;
+            continue;
         }
-        group = m_groups.erase(group);
+        if (kept->count() < other->count()) {
+            std::swap(*kept, *other);
+        }
+        other = m_others.erase(other);
     }
 }
 
 void EntryWindows::Group::begin(std::int64_t time) {
     m_seconds.clear();
+    m_seconds.reserve(usualSeconds);
     m_seconds.push_back({time, 1});
     m_gone = 0;
     m_begin = 0;
     m_count = 1;
     m_newest = time;
+    m_earliest = time;
     m_width = 0;
 }
 
@@ -114,6 +132,9 @@ std::int64_t EntryWindows::Group::add(std::int64_t time, std::int64_t period,
     } else {
         addNewest(time, period);
         most = m_count;
+    }
+    if (m_seconds.size() - m_gone > mostSeconds) {
+        forget(m_newest - 2 * period);
     }
     if (m_seconds.size() - m_gone > mostSeconds) {
         widen(mostSeconds);
@@ -136,7 +157,7 @@ EntryWindows::Counted EntryWindows::Group::within(std::int64_t time,
 }
 
 void EntryWindows::Group::addNewest(std::int64_t time, std::int64_t period) {
-    if (isSameSecond(m_seconds.back().time, time)) {
+    if (isSameSecond(m_newest, time)) {
         m_seconds.back().time = time;
         ++m_seconds.back().entries;
     } else {
@@ -144,11 +165,19 @@ void EntryWindows::Group::addNewest(std::int64_t time, std::int64_t period) {
     }
     ++m_count;
     m_newest = time;
-    while (m_seconds[m_begin].time <= time - period) {
+    if (m_earliest <= time - period) {
+        passOver(time - period);
+        // The period before is kept for late entries.
+        forget(time - 2 * period);
+    }
+}
+
+/// Counts no longer what is not younger.
+void EntryWindows::Group::passOver(std::int64_t until) {
+    while (m_seconds[m_begin].time <= until) {
         m_count -= m_seconds[m_begin++].entries;
     }
-    // The period before is kept for late entries.
-    forget(time - 2 * period);
+    m_earliest = m_seconds[m_begin].time;
 }
 
 /// Forgets what is not younger.
@@ -179,6 +208,7 @@ std::int64_t EntryWindows::Group::addLate(std::int64_t time, std::int64_t period
         m_seconds.insert(at, {time, 1});
         ++m_count;
     }
+    m_earliest = std::min(m_earliest, time);
     std::int64_t own = m_count - newer;
     for (std::size_t index = m_begin; index-- > m_gone && m_seconds[index].time > time - period;) {
         own += m_seconds[index].entries;
@@ -213,10 +243,11 @@ void EntryWindows::Group::widen(std::size_t mostSeconds) {
 }
 
 void EntryWindows::Group::findBegin(std::int64_t period) {
-    m_begin = m_seconds.size();
+    m_begin = static_cast<std::uint32_t>(m_seconds.size());
     m_count = 0;
     while (m_begin > m_gone && m_seconds[m_begin - 1].time > m_newest - period) {
         m_count += m_seconds[--m_begin].entries;
+        m_earliest = m_seconds[m_begin].time;
     }
 }
 

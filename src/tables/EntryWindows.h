@@ -20,7 +20,10 @@ public:
     static constexpr std::size_t mostGroups = 8;
     static constexpr std::size_t mostSeconds = 16'384; ///< with entries, per group
 
-    explicit EntryWindows(std::size_t seconds = mostSeconds) noexcept : m_mostSeconds(seconds) {}
+    /// Keeps at most so many seconds per group, and no more than `mostSeconds`.
+    explicit EntryWindows(std::size_t seconds = mostSeconds) noexcept
+        : m_mostSeconds(static_cast<std::uint32_t>(seconds < mostSeconds ? seconds : mostSeconds)) {
+    }
 
     /// Adds an entry's time. Returns the number of entries in the period (time - period, time] or
     /// in the one that ends with the newest entry of its group, whichever is larger. Both in
@@ -46,6 +49,7 @@ private:
     class Group {
     public:
         void begin(std::int64_t time);
+        bool isEmpty() const noexcept { return m_seconds.empty(); }
         bool takes(std::int64_t time, std::int64_t period) const noexcept {
             return time > m_newest - period && time < m_newest + period;
         }
@@ -69,25 +73,35 @@ private:
         bool isSameSecond(std::int64_t left, std::int64_t right) const noexcept;
         void addTo(Second& second, std::int64_t time, std::int64_t period);
         void addNewest(std::int64_t time, std::int64_t period);
+        void passOver(std::int64_t until);
         std::int64_t addLate(std::int64_t time, std::int64_t period);
         void forget(std::int64_t until);
         void widen(std::size_t mostSeconds);
         void findBegin(std::int64_t period);
 
         Seconds m_seconds;         ///< oldest first, twice the period
-        std::size_t m_gone = 0;    ///< at the front: forgotten, and soon removed
-        std::size_t m_begin = 0;   ///< the first within the period that ends with the newest
+        std::uint32_t m_gone = 0;  ///< at the front: forgotten, and soon removed
+        std::uint32_t m_begin = 0; ///< the first within the period that ends with the newest
         std::int64_t m_count = 0;  ///< entries from there on
         std::int64_t m_newest = 0; ///< time
-        int m_width = 0;           ///< of a second: the power of two
+        /// Of those that m_count counts none is earlier. While this is within the period, an entry
+        /// is added without a look at the seconds, which are rarely in the processor's cache.
+        std::int64_t m_earliest = 0;
+        int m_width = 0; ///< of a second: the power of two
     };
 
+    std::size_t groups() const noexcept { return m_first.isEmpty() ? 0 : 1 + m_others.size(); }
+    const Group& group(std::size_t index) const noexcept {
+        return index == 0 ? m_first : m_others[index - 1];
+    }
+    Group& group(std::size_t index) noexcept { return index == 0 ? m_first : m_others[index - 1]; }
     Group& spareGroup();
     void joinAt(std::int64_t newest);
 
-    std::vector<Group> m_groups;
+    Group m_first; ///< nearly always the only one, so it is kept here
+    std::vector<Group> m_others;
     std::uint64_t m_additions = 0;
-    std::size_t m_mostSeconds;
+    std::uint32_t m_mostSeconds;
 };
 
 } // namespace zrm

@@ -140,6 +140,15 @@ TEST(EntryWindows, FewerSecondsAreKeptOnRequest) {
     }
 }
 
+TEST(EntryWindows, ForgottenSecondsTakeNoRoomFromOthers) {
+    EntryWindows windows(5);
+    for (const std::int64_t time : {0, 5, 12, 13, 15, 20}) {
+        windows.add(noon + time, 10);
+    }
+    EXPECT_EQ(windows.counted(noon + 20, 10).entries, 4);
+    EXPECT_EQ(windows.counted(noon + 20, 10).first, noon + 12) << "told apart from the next one";
+}
+
 /// The same by plain lists of times.
 class PlainWindows {
 public:
