@@ -27,7 +27,7 @@ struct FollowView {
         std::string text{}; ///< what a log that is not a file has lost, as a sentence
     };
 
-    /// "waiting", "reading", "finishing", "missing" or "not a file".
+    /// "waiting", "reading", "finishing", "missing", "not a file" or "taken".
     std::string state;
     std::string problem;    ///< what fails at present and is tried again; empty if nothing does
     bool isSource = false;  ///< the log is not a file

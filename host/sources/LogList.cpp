@@ -3,6 +3,7 @@
 #include "host/base/TimeText.h"
 #include "host/events/PositionBook.h"
 #include "logs/FollowSettings.h"
+#include "monitor/FileOwners.h"
 
 #include <algorithm>
 #include <condition_variable>
@@ -39,7 +40,32 @@ std::shared_ptr<const FoundLogs> exchange(std::shared_ptr<const FoundLogs> found
     return std::exchange(latest().found, std::move(found));
 }
 
+/// The files in which logs have positions that nobody follows yet.
+std::vector<FileOwners::Expected> expectedFiles(const FoundLogs& found) {
+    const PositionBook& book = *PositionBook::current();
+    const std::map<std::string, LogPosition> positions = book.positions();
+    std::set<PositionBook::File> read;
+    for (const auto& [log, position] : positions) {
+        read.emplace(position.device, position.inode);
+    }
+    std::vector<FileOwners::Expected> expected;
+    for (const FurtherLog& log : found.logs) {
+        const auto position = positions.find(log.name);
+        if (position == positions.end() || book.isFollowed(log.name)) {
+            continue;
+        }
+        expected.emplace_back(log.name, position->second);
+        for (const LogPosition& late : position->second.late.files()) {
+            if (!read.contains({late.device, late.inode})) { // else it is that log's
+                expected.emplace_back(log.name, late);
+            }
+        }
+    }
+    return expected;
+}
+
 void publish(const FoundLogs& found) {
+    FileOwners::ofProcess().expect(expectedFiles(found));
     FurtherLogs::publish(std::make_shared<const FurtherLogs::List>(found.logs));
 }
 

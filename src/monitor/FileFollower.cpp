@@ -29,7 +29,7 @@ FileFollower::Moment FileFollower::Moment::now() noexcept {
 FileFollower::FileFollower(std::string path, const Options& options, FollowLedger& ledger)
     : m_path(std::move(path)), m_options(options), m_ledger(ledger),
       m_block(options.recordLength, options.join.get()),
-      m_late(options.recordLength, options.join, ledger) {}
+      m_late(options.recordLength, options.join, ledger), m_owner(options.owners, options.log) {}
 
 void FileFollower::fail(Retry& retry, const char* call, int number, const std::string& file) {
     ++retry.failures;
@@ -74,6 +74,11 @@ std::optional<LogPosition> FileFollower::position() const noexcept {
     }
     LogPosition position = m_isInBlock ? positionInBlock() : m_position;
     position.late = m_late.positions();
+    if (!m_given.empty()) [[unlikely]] {
+        std::vector<LogPosition> files = m_given;
+        files.insert(files.end(), position.late.files().begin(), position.late.files().end());
+        position.late = LatePositions(std::move(files));
+    }
     return position;
 }
 
@@ -82,13 +87,15 @@ bool FileFollower::look(const Moment& now) {
     m_mayLeaveOut = false;
     m_lookBegan = std::chrono::steady_clock::now();
     if (m_chain.empty()) {
-        return mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
+        const bool hasBegun = mayTry(m_nameRetry) && mayTry(m_youngerRetry) && begin();
+        return hasBegun || (m_isGivenAway && m_late.look(now.steady));
     }
     if (m_options.byName && mayTry(m_nameRetry)) {
         checkName();
+        giveAway();
     }
     const bool hasLate = m_late.look(now.steady);
-    return (mayTry(m_readRetry) && checkFile()) || hasLate;
+    return (!m_chain.empty() && mayTry(m_readRetry) && checkFile()) || hasLate;
 }
 
 /// Begins with the first file of the chain.
@@ -104,6 +111,11 @@ void FileFollower::enter() {
     m_readModified = 0;
     m_active = m_now.steady;
     m_readRetry = Retry{};
+    if (member.isLeft) {
+        // A restart would not find out from the file before it where this one was left.
+        m_position = positionInBlock();
+        m_hasPosition = true;
+    }
     member.file->showPosition(member.from);
     m_ledger.noteGeneration(member.file->identity(), member.file->path());
     notePresent();
@@ -309,19 +321,28 @@ bool FileFollower::takeBack() noexcept {
 }
 
 void FileFollower::noteProgress() {
-    if (m_chain.empty()) {
-        return;
-    }
+    std::vector<FileIdentity> files = m_late.files();
     std::int64_t behind = 0;
     for (const Member& member : m_chain) {
+        files.push_back(member.file->identity());
         Generation::Status status;
         if (!member.file->isCompressed() && member.file->status(status)) {
             const bool isFirst = &member == &m_chain.front();
             behind += std::max<std::int64_t>(status.size - (isFirst ? m_block.offset() : 0), 0);
         }
     }
-    m_chain.front().file->showPosition(m_block.readTo());
-    m_ledger.notePosition(m_block.offset(), behind);
+    m_owner.keep(files);
+    std::erase_if(m_given, [this](const LogPosition& left) {
+        return m_owner.isSettledByAnother(identityOf(left));
+    });
+    if (!m_chain.empty()) {
+        const FileIdentity& first = m_chain.front().file->identity();
+        if (m_isInBlock || identityOf(m_position) == first) {
+            m_owner.settle(first);
+        }
+        m_chain.front().file->showPosition(m_block.readTo());
+        m_ledger.notePosition(m_block.offset(), behind);
+    }
 }
 
 } // namespace zrm

@@ -4,6 +4,7 @@
 #include "framework/LogPositions.h"
 #include "logs/LineJoin.h"
 #include "monitor/EntryBlock.h"
+#include "monitor/FileOwners.h"
 #include "monitor/FollowLedger.h"
 #include "monitor/Generation.h"
 #include "monitor/GenerationNames.h"
@@ -42,6 +43,8 @@ public:
         std::string rotatedTo;                  ///< see FollowSettings
         std::size_t recordLength = 0;           ///< 0: the entries are lines
         std::shared_ptr<const LineJoin> join{}; ///< which lines make an entry; null: each is one
+        FileOwners* owners = nullptr;           ///< null: no other log reads these files
+        std::string log{};                      ///< by which the owners know this one
     };
     struct Moment {
         std::chrono::steady_clock::time_point steady;
@@ -52,6 +55,10 @@ public:
 
     /// The ledger outlives the follower.
     FileFollower(std::string path, const Options& options, FollowLedger& ledger);
+    FileFollower(const FileFollower&) = delete;
+    FileFollower& operator=(const FileFollower&) = delete;
+    /// Another log goes on with its files where this one has left them.
+    ~FileFollower();
 
     /// Continues at the position. Call it before the first look.
     void resumeAt(const LogPosition& stored) noexcept { m_stored = stored; }
@@ -83,7 +90,7 @@ public:
     /// True if the last entry came late to an older file.
     bool isLate() const noexcept { return m_isLate; }
     /// How far the older files were read to which late lines may come.
-    std::vector<LateLines::Left> takeLeft() { return m_late.takeLeft(); }
+    std::vector<LateLines::Left> takeLeft();
     /// The file that is read, and where in it the next entry begins. None while there is no file.
     struct Place {
         Generation& file;
@@ -94,7 +101,7 @@ public:
     std::int64_t takeBytesRead() noexcept {
         return std::exchange(m_bytesRead, 0) + m_late.takeBytesRead();
     }
-    /// Updates the position in the ledger.
+    /// Updates the position in the ledger, and which files are this log's.
     void noteProgress();
     /// The file that is read, if any.
     std::optional<FileIdentity> file() const noexcept;
@@ -108,6 +115,7 @@ private:
         bool hadName = false;    ///< it is or was the present file
         bool isComplete = false; ///< nothing is added to it any more
         bool isRecovery = false; ///< read instead of what a truncation removed
+        bool isLeft = false;     ///< another log has read what is before `from`
     };
     struct Found {
         /// A generation that cannot be read.
@@ -164,6 +172,13 @@ private:
     bool isKnown(const FileIdentity& file, const Generation* named) const noexcept;
     std::vector<GenerationFile> generations(const std::vector<ino_t>& inodes = {});
 
+    // Files that other logs have, or get (FileFollowerOwner.cpp).
+    void leaveToOthers(LogPosition& stored);
+    void giveAway();
+    void giveFirstAway();
+    void giveUpAt(const LogPosition& left);
+    bool beginWhereLeft(Member& member) const;
+
     // What is read, and in which order (FileFollowerChain.cpp).
     void extend(std::unique_ptr<Generation> named);
     bool isOlder(Generation& file) const;
@@ -214,17 +229,20 @@ private:
     FollowLedger& m_ledger;
     std::optional<LogPosition> m_stored;
     Moment m_now{};
-    bool m_wasAbsent = false; ///< nothing had the name at an earlier look
-    bool m_isTakenUp = false; ///< files rotated before the start are read
+    bool m_wasAbsent = false;   ///< nothing had the name at an earlier look
+    bool m_isTakenUp = false;   ///< files rotated before the start are read
+    bool m_isGivenAway = false; ///< another log has got the only file that was read
     /// What had contents beside the first file, if that was empty: older, whenever it was written
     /// to.
     std::vector<Older> m_older;
     std::deque<Member> m_chain; ///< the first is read; the last has the name, unless it lost it
     EntryBlock m_block;
     LateLines m_late;
-    bool m_isLate = false;  ///< the last entry is of m_late
-    LogPosition m_before;   ///< m_position before that
-    LogPosition m_position; ///< if it is not in the block
+    FileOwner m_owner;
+    std::vector<LogPosition> m_given; ///< files that no other log has a position in yet
+    bool m_isLate = false;            ///< the last entry is of m_late
+    LogPosition m_before;             ///< m_position before that
+    LogPosition m_position;           ///< if it is not in the block
     bool m_hasPosition = false;
     bool m_wasInBlock = false; ///< m_isInBlock before the last entry
     bool m_isInBlock = false;  ///< the position is the block's, in the file that is read

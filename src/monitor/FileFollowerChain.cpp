@@ -48,12 +48,16 @@ void FileFollower::extend(std::unique_ptr<Generation> named) {
 /// The file that has the name. An older one may have got it back.
 FileFollower::Member FileFollower::memberOf(std::unique_ptr<Generation> named) {
     Member present;
-    const std::optional<LogPosition> left = m_late.remove(named->identity());
-    if (left && named->holds(*left, present.tail)) {
-        present.from = left->offset;
-    }
     present.file = std::move(named);
     present.hadName = true;
+    const std::optional<LogPosition> left = m_late.remove(present.file->identity());
+    Tail tail;
+    if (!left) {
+        beginWhereLeft(present);
+    } else if (present.file->holds(*left, tail)) {
+        present.from = left->offset;
+        present.tail = tail;
+    }
     return present;
 }
 
@@ -200,6 +204,7 @@ char* FileFollower::recover() {
     m_isInBlock = false;
     truncated.from = 0;
     truncated.tail = Tail{};
+    truncated.isLeft = false;
     if (found.lost.empty() && (isOwn ? !found.holder : found.younger.empty())) {
         const std::int64_t from = isOwn ? at.offset : 0;
         m_ledger.noteLost(from, std::max(from, known));

@@ -59,6 +59,8 @@ bool FileFollower::switchToNext() {
     }
     if (!finished.isComplete && !finished.file->isCompressed()) {
         m_late.add(std::move(finished.file), m_block.offset(), m_block.tail(), m_now.steady);
+    } else if (m_block.readTo() > 0) {
+        m_owner.leave(m_position);
     }
     m_isTakenUp = m_isTakenUp && m_chain.size() > 1;
     enter();

@@ -55,6 +55,10 @@ std::unique_ptr<Generation> FileFollower::openNamed() {
     }
     if (number == 0) {
         succeed(m_nameRetry);
+        if (!m_owner.ask(named->identity())) {
+            m_ledger.setState(FollowLedger::State::taken);
+            named.reset();
+        }
     } else if (number == ENOENT || number == ENOTDIR) {
         m_wasAbsent = true;
         m_ledger.setState(m_chain.empty() ? FollowLedger::State::waiting
@@ -220,7 +224,7 @@ FileFollower::findHolder(const LogPosition& position, Search search, Generation*
     };
     for (const GenerationFile& file : files) {
         if (file.identity == wanted && isSure(file) && !isKnown(file.identity, named) &&
-            opens(file)) {
+            m_owner.take(file.identity) && opens(file)) {
             return member;
         }
     }
@@ -234,7 +238,7 @@ FileFollower::findHolder(const LogPosition& position, Search search, Generation*
     std::vector<GenerationFile> others = files;
     std::sort(others.begin(), others.end(), isBetterHolder);
     for (const GenerationFile& file : others) {
-        if (!isKnown(file.identity, named) && opens(file)) {
+        if (!isKnown(file.identity, named) && m_owner.take(file.identity) && opens(file)) {
             return member;
         }
     }
@@ -248,7 +252,8 @@ bool FileFollower::openYounger(const GenerationReference& reference,
                                Found& found) {
     std::vector<Member> candidates;
     for (const GenerationFile& file : youngerThan(files, reference)) {
-        if (isKnown(file.identity, named) || m_late.has(file.identity) || isCountedLost(file)) {
+        if (isKnown(file.identity, named) || m_late.has(file.identity) || isCountedLost(file) ||
+            !m_owner.take(file.identity)) {
             continue;
         }
         if (candidates.size() == mostOpen) {
@@ -270,6 +275,7 @@ bool FileFollower::openYounger(const GenerationReference& reference,
         char first;
         const std::ptrdiff_t count = member.file && !isRead ? member.file->readAt(&first, 1, 0) : 0;
         if (count > 0) {
+            beginWhereLeft(member);
             candidates.push_back(std::move(member));
             continue;
         }

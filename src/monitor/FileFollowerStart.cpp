@@ -16,6 +16,7 @@ bool FileFollower::begin() {
         return false;
     }
     if (m_stored) {
+        leaveToOthers(*m_stored);
         takeUp(*m_stored, std::move(named));
     } else if (named) {
         beginFirst(std::move(named));
@@ -32,22 +33,23 @@ bool FileFollower::begin() {
 /// A log without a position.
 void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     Member member;
+    member.file = std::move(named);
+    member.hadName = true;
     Generation::Status status;
-    const bool isFromEnd = !m_options.fromBeginning && !m_wasAbsent;
-    if (!named->status(status) || (isFromEnd && !named->readTail(status.size, member.tail))) {
+    const bool isFromEnd = !beginWhereLeft(member) && !m_options.fromBeginning && !m_wasAbsent;
+    if (!member.file->status(status) ||
+        (isFromEnd && !member.file->readTail(status.size, member.tail))) {
         fail(m_nameRetry, "read", errno);
         return;
     }
-    member.from = isFromEnd ? status.size : 0;
+    member.from = isFromEnd ? status.size : member.from;
     m_modified = status.modified;
     if (status.size == 0) {
         noteOlder();
     }
-    m_position = positionOf(named->identity(), member.from, member.tail);
+    m_position = positionOf(member.file->identity(), member.from, member.tail);
     m_position.modified = m_modified;
     m_hasPosition = true;
-    member.file = std::move(named);
-    member.hadName = true;
     m_chain.push_back(std::move(member));
 }
 
@@ -68,8 +70,10 @@ void FileFollower::noteOlder() {
 
 /// Continues at a position of an earlier run.
 void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation> named) {
-    m_position = stored;
-    m_hasPosition = true;
+    if (!m_isGivenAway) {
+        m_position = stored;
+        m_hasPosition = true;
+    }
     m_modified = stored.modified == 0 ? INT64_MAX : stored.modified;
     takeUpLate(stored, named.get());
     Found found = find(stored, Search::byContents, named.get());
@@ -82,7 +86,7 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
     if (found.holder && !found.holder->file) {
         present = std::move(found.holder);
         found.holder.reset();
-    } else if (!isHeld && (named || !found.younger.empty())) {
+    } else if (!isHeld && (named || !found.younger.empty()) && stored.inode != 0) {
         m_ledger.noteLost(stored.offset, stored.offset);
     }
     // A copy of the present file may be younger than the position.
@@ -97,7 +101,7 @@ void FileFollower::takeUp(const LogPosition& stored, std::unique_ptr<Generation>
     m_isTakenUp = !m_chain.empty();
     if (named && found.isAll) {
         Member member = memberOf(std::move(named));
-        if (present) {
+        if (present && present->from >= member.from) {
             member.from = present->from;
             member.tail = present->tail;
         }
@@ -147,7 +151,7 @@ void FileFollower::takeUpLate(const LogPosition& stored, const Generation* named
 bool FileFollower::takeUpLate(const LogPosition& left, const std::string& path) {
     std::unique_ptr<Generation> opened = Generation::open(path);
     Tail tail;
-    if (!opened || !opened->holds(left, tail)) {
+    if (!opened || !m_owner.take(opened->identity()) || !opened->holds(left, tail)) {
         return false;
     }
     if (!m_late.has(opened->identity())) { // not taken by an earlier attempt

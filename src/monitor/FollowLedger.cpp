@@ -94,6 +94,8 @@ const char* followStateText(FollowLedger::State state) noexcept {
         return "missing";
     case FollowLedger::State::notAFile:
         return "not a file";
+    case FollowLedger::State::taken:
+        return "taken";
     }
     return "waiting";
 }

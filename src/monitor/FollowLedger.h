@@ -25,6 +25,7 @@ public:
         finishing, ///< a file that no longer has it; its successors are read after it
         missing,   ///< a file that has lost the name, which nothing has now
         notAFile,  ///< the name is not a regular file's
+        taken,     ///< the file that has the name is read as another log (FileOwners)
     };
     struct Failure {
         const char* call; ///< static text: "open", "read", ...

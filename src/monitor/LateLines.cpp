@@ -52,6 +52,14 @@ bool LateLines::has(const FileIdentity& file) const noexcept {
                        [&file](const File& one) { return one.file->identity() == file; });
 }
 
+std::vector<FileIdentity> LateLines::files() const {
+    std::vector<FileIdentity> files;
+    for (const File& one : m_files) {
+        files.push_back(one.file->identity());
+    }
+    return files;
+}
+
 bool LateLines::hasOriginalOf(Generation& file) const {
     return std::any_of(m_files.begin(), m_files.end(),
                        [&file](const File& one) { return file.isCopyOf(*one.file); });

@@ -45,6 +45,8 @@ public:
 
     /// Looks at the files. True if there may be entries.
     bool look(Time now);
+    /// Those that are watched.
+    std::vector<FileIdentity> files() const;
     /// True if no file is watched.
     bool isEmpty() const noexcept { return m_files.empty(); }
     /// The next entry, as EntryBlock gives it; null if there is none until the next look.

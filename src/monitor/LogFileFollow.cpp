@@ -27,8 +27,11 @@ constexpr timeval lookInterval{1, 0};
 constexpr std::chrono::seconds noteInterval{1};
 constexpr unsigned entriesPerClock = 1024; ///< entries between two looks at the clock
 
-FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t recordLength) {
+FileFollower::Options optionsFor(const FollowSettings& settings, std::size_t recordLength,
+                                 const char* log) {
     FileFollower::Options options;
+    options.owners = &FileOwners::ofProcess();
+    options.log = log;
     options.byName = settings.follow == FollowSettings::Follow::name;
     options.fromBeginning =
         settings.isNewcomer || settings.start == FollowSettings::Start::beginning;
@@ -85,7 +88,8 @@ void noteLeft(FileFollower& follower, LogPositions& positions) {
 void LogFile::followLog(std::size_t recordLength) {
     TraceScope trace(anchor);
     const FollowSettings& settings = *followSettings();
-    FileFollower follower(fileNameLocal(), optionsFor(settings, recordLength), *m_followLedger);
+    FileFollower follower(fileNameLocal(), optionsFor(settings, recordLength, fileNameUTF8()),
+                          *m_followLedger);
     LogPositions positions(fileNameUTF8());
     FollowedEntry current(*this, follower, recordLength == 0);
     const LogEntry::Offer offer(current);

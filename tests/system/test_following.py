@@ -276,6 +276,45 @@ def test_a_log_renamed_within_its_glob_is_read_on_under_its_new_name(agent):
     assert names()[: len(before) + 1] == ["old.log"] * (len(before) - 1) + ["new.log", "old.log"]
 
 
+def test_a_log_that_is_renamed_over_another_is_read_on_as_that(agent):
+    """Each line is read once, and each file as one log."""
+    agent.agent_keys["log_config"] = None
+    agent.sink = agent.directory / "events"
+    logs = agent.directory / "logs"
+    logs.mkdir()
+    a, b = Log(logs / "a.log"), Log(logs / "b.log")
+    for log in (a, b):
+        log.path.write_text("")
+    agent.follow(a, rotate_wait="1s")
+    agent.follow(logs / "*.log", rotate_wait="1s")
+    agent.situation()
+    agent.start()
+    for log in (a, b):
+        agent.wait_open(log)
+        log.append(syslog_line(f"of {log.path.name}"))
+    agent.wait_events(2)
+    a.path.rename(b.path)
+    b.append(syslog_line("renamed"))
+    agent.wait_events(3)
+    a.path.write_text(syslog_line("made anew"))
+    agent.wait_events(4)
+    wait_until(lambda: known_positions(agent).get(str(b)) == b.path.stat().st_size, "the position", 60)
+    b.append(syslog_line("of the other"))
+    last = agent.wait_events(5)[-1]
+    assert (last["row"]["LOGNAME"], last["row"]["ENTRYDESC"]) == ("b.log", "of the other")
+    a.path.rename(b.path)
+    assert agent.stop() == 0
+    b.append(syslog_line("while it was stopped"))
+    agent.start()
+    agent.wait_events(6)
+    b.append(syslog_line("last"))
+    agent.wait_events(7)
+    assert agent.stop() == 0
+    texts = descriptions(agent.events())
+    assert sorted(texts[:2]) == ["of a.log", "of b.log"]
+    assert texts[2:] == ["renamed", "made anew", "of the other", "while it was stopped", "last"]
+
+
 def test_lines_written_late_to_a_rotated_file_are_read(agent):
     log = followed(agent)
     rotated = Log(f"{log}.1")

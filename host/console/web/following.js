@@ -9,6 +9,7 @@ const STATES = {
   missing: "reading a file that has lost this name; no file has it now",
   waiting: "waiting for a file",
   "not a file": "waiting: what has this name is not a regular file",
+  taken: "waiting: the file of this name is still read as another log",
 };
 const RANGES = [
   { label: "Time", className: "fit" },
