@@ -30,38 +30,6 @@ constexpr std::array<std::pair<char, const char*>, 9> letterNames = {{{'D', "DEB
 constexpr std::array<const char*, 8> severityNames = {"EMERGENCY", "ALERT",  "CRITICAL", "ERROR",
                                                       "WARNING",   "NOTICE", "INFO",     "DEBUG"};
 
-/// Whether a text is the name of a file with source code, as in "server.go:17".
-bool isPlace(std::string_view text) {
-    const std::size_t colon = text.find(':');
-    const bool hasLine = colon != std::string_view::npos && colon + 1 < text.size() &&
-                         text[colon + 1] >= '0' && text[colon + 1] <= '9';
-    const std::string_view file = text.substr(0, colon);
-    const std::size_t dot = file.rfind('.');
-    constexpr std::array<std::string_view, 14> endings = {
-        "c", "cc", "cpp", "cxx", "h", "hpp", "go", "py", "rs", "js", "java", "ts", "rb", "php"};
-    return dot != std::string_view::npos && (hasLine || file.find('/') != std::string_view::npos) &&
-           std::ranges::find(endings, file.substr(dot + 1)) != endings.end();
-}
-
-/// Whether a text looks like the name of a thread, a number or an address rather than like who
-/// speaks.
-bool isThread(std::string_view text) {
-    constexpr std::array<std::string_view, 15> words = {
-        "hread", "exec",      "worker",   "pool", "qtp",   "andler",      "Timer", "pid:",
-        "shard", "ispatcher", "Executor", "myid", "-nio-", "scheduling-", "tid:"};
-    const bool hasDigit = text.find_first_of("0123456789") != std::string_view::npos;
-    const bool isNumber = hasDigit && std::all_of(text.begin(), text.end(), [](char c) {
-                              return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f') || c == 'x' ||
-                                     c == '-' || c == '.' || c == ':' || c == '/';
-                          });
-    const bool isNumbered = hasDigit && text.front() >= '0' && text.front() <= '9' &&
-                            text.find_first_of("/:") != std::string_view::npos;
-    return isNumber || isNumbered || text == "main" ||
-           std::ranges::any_of(words, [text](std::string_view word) {
-               return text.find(word) != std::string_view::npos;
-           });
-}
-
 class Columns {
 public:
     Columns(const LineHead& head, std::size_t length) : m_head(head), m_length(length) {
@@ -176,7 +144,7 @@ private:
         };
         constexpr int place = 45;
         if (isForMost(at, isPlace)) {
-            rank -= place;
+            rank = std::max(rank - place, 1);
         } else if (isForMost(at, isThread) || isForMost(at, isMute)) {
             rank -= thread;
         }
@@ -188,6 +156,7 @@ private:
                     ? 10
                     : 0;
         rank += at >= m_head.certain ? 5 : 0;
+        rank += isBeforeProcess(at) ? 20 : 0;
         const bool isBeforeDash = at + 1 < m_length && token(at + 1).mark == '-' &&
                                   token(at + 1).kind == Kind::mark && hasBlanks(at);
         rank += isBeforeDash ? 20 : 0;
@@ -197,6 +166,12 @@ private:
                 ? 30
                 : 0;
         return rank;
+    }
+
+    /// "pacemakerd [1234]"
+    bool isBeforeProcess(std::size_t at) const {
+        return at + 1 < m_length && token(at).kind == Kind::word &&
+               token(at + 1).kind == Kind::bracket && isForMost(at + 1, isNumber);
     }
 
     std::size_t sourceOf() const {
@@ -324,6 +299,15 @@ private:
                                 token(at + 1).kind == Kind::mark && token(at - 1).mark != ':';
         if (isEnclosed && m_head.lines.size() * 2 >= m_head.all) {
             return "[A-Za-z]+";
+        }
+        // "DETAIL:" where most lines have "INFO:" is one, too.
+        const bool isMarked = at + 1 < m_length && token(at + 1).kind == Kind::mark &&
+                              token(at + 1).blanks > 0 && token(at + 1).mark == ':';
+        const bool isUpper = isForMost(at, [](std::string_view text) {
+            return std::ranges::all_of(text, [](char c) { return c >= 'A' && c <= 'Z'; });
+        });
+        if (isMarked && isUpper && m_head.lines.size() * 2 >= m_head.all) {
+            return "[A-Z]+";
         }
         std::set<std::string> names;
         for (const auto* line : m_head.lines) {

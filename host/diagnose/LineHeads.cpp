@@ -79,11 +79,13 @@ Likeness likeness(const Line& line, std::size_t at, std::size_t time) {
             (isUpper(token.text) && (isNext || isPadded))) {
             return Likeness::good;
         }
-        return isUpper(token.text) && isBracketLevel(token.text) ? Likeness::lone : Likeness::none;
+        return isClear || (isUpper(token.text) && isBracketLevel(token.text)) ? Likeness::lone
+                                                                              : Likeness::none;
     }
     const bool isLetter =
         token.kind == Kind::letter &&
-        (isEnclosed(line, at) || (isNext && at + 1 < line.size()) || at + 1 == time);
+        (isEnclosed(line, at) || (isNext && at + 1 < line.size()) || at + 1 == time ||
+         (at > 0 && line[at - 1].blanks > 1 && token.blanks > 0));
     return isLetter ? Likeness::good : Likeness::none;
 }
 
@@ -101,13 +103,14 @@ std::size_t levelOf(const Line& line, std::size_t time, Likeness least) {
     return line.size();
 }
 
-/// A word in upper case between other words is a level if most lines have one at its place.
+/// A level between other words is one if most lines have one at its place and nowhere else.
 bool hasLoneLevels(const std::vector<Line>& lines) {
     std::map<std::size_t, std::size_t> places;
     std::size_t most = 0;
     for (const Line& line : lines) {
         const std::size_t time = timeOf(line);
-        if (const std::size_t at = levelOf(line, time, Likeness::lone); at < line.size()) {
+        const std::size_t at = levelOf(line, time, Likeness::lone);
+        if (at < line.size() && levelOf(line, time, Likeness::good) == line.size()) {
             most = std::max(most, ++places[at]);
         }
     }
@@ -226,7 +229,7 @@ private:
         }
         LineHead rest{{}, head.all, head.length, head.certain};
         for (auto& [symbol, one] : next) {
-            if (!symbol.empty() && isColumn(one, head.lines.size())) {
+            if (!symbol.empty() && isColumn(one, head.lines.size()) && !endsLines(one)) {
                 open.push_back(std::move(one));
             } else {
                 rest.lines.insert(rest.lines.end(), one.lines.begin(), one.lines.end());
@@ -263,7 +266,8 @@ private:
                               ? few
                               : most);
         case Kind::word:
-            return isPart(most) && (isPadded(head, at) || isRightAligned(head, at));
+            return isPart(most) &&
+                   (isPadded(head, at) || isRightAligned(head, at) || isBeforeBrackets(head, at));
         case Kind::name:
             return isPart(most) && m_named * 2 >= m_lines;
         case Kind::cell:
@@ -308,6 +312,22 @@ private:
             }
         }
         return false;
+    }
+
+    /// Whether most lines have nothing behind the last token, which is their message then.
+    static bool endsLines(const LineHead& head) {
+        const auto ended = std::ranges::count_if(
+            head.lines, [&](const Line* line) { return line->size() == head.length; });
+        return (*head.lines.front())[head.length - 1].kind != Kind::mark &&
+               static_cast<std::size_t>(ended) * 2 > head.lines.size();
+    }
+
+    /// Whether words are in front of brackets and a colon, as in "core [main.c:17]: text".
+    static bool isBeforeBrackets(const LineHead& head, std::size_t at) {
+        return std::ranges::all_of(head.lines, [at](const Line* line) {
+            return at + 2 < line->size() && (*line)[at + 1].kind == Kind::bracket &&
+                   (*line)[at + 2].kind == Kind::mark && (*line)[at + 2].mark == ':';
+        });
     }
 
     /// Whether words of different lengths end at the same distance from what is in front of them.

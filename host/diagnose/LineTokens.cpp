@@ -257,8 +257,9 @@ private:
             return;
         }
         // ERROR[11-19, information/Listener and shop.INFO
-        const std::size_t end = m_rest.substr(0, length).find_first_of("[/(");
-        if (end != std::string_view::npos && end > 0 && isLevelName(m_rest.substr(0, end))) {
+        const std::size_t end = m_rest.substr(0, length).find_first_of("[/(:");
+        if (end != std::string_view::npos && end > 0 && end + 1 < length &&
+            isLevelName(m_rest.substr(0, end))) {
             length = end;
         }
         std::string_view word = m_rest.substr(0, length);

@@ -1,6 +1,7 @@
 #include "host/diagnose/LineWords.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <span>
 #include <utility>
@@ -51,6 +52,35 @@ bool isPath(std::string_view word) noexcept {
                         std::all_of(word.begin(), word.end(), isPathCharacter);
     return isName && word.find("//") == std::string_view::npos &&
            word.find_first_of("./:[#") != std::string_view::npos;
+}
+
+bool isPlace(std::string_view text) noexcept {
+    const std::size_t colon = text.find(':');
+    const bool hasLine = colon != std::string_view::npos && colon + 1 < text.size() &&
+                         text[colon + 1] >= '0' && text[colon + 1] <= '9';
+    const std::string_view file = text.substr(0, colon);
+    const std::size_t dot = file.rfind('.');
+    constexpr std::array<std::string_view, 14> endings = {
+        "c", "cc", "cpp", "cxx", "h", "hpp", "go", "py", "rs", "js", "java", "ts", "rb", "php"};
+    return dot != std::string_view::npos && (hasLine || file.find('/') != std::string_view::npos) &&
+           std::ranges::find(endings, file.substr(dot + 1)) != endings.end();
+}
+
+bool isThread(std::string_view text) noexcept {
+    constexpr std::array<std::string_view, 15> words = {
+        "hread", "exec",      "worker",   "pool", "qtp",   "andler",      "Timer", "pid:",
+        "shard", "ispatcher", "Executor", "myid", "-nio-", "scheduling-", "tid:"};
+    const bool hasDigit = text.find_first_of("0123456789") != std::string_view::npos;
+    const bool isNumber = hasDigit && std::all_of(text.begin(), text.end(), [](char c) {
+                              return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f') || c == 'x' ||
+                                     c == '-' || c == '.' || c == ':' || c == '/';
+                          });
+    const bool isNumbered = hasDigit && text.front() >= '0' && text.front() <= '9' &&
+                            text.find_first_of("/:") != std::string_view::npos;
+    return isNumber || isNumbered || text == "main" ||
+           std::ranges::any_of(words, [text](std::string_view word) {
+               return text.find(word) != std::string_view::npos;
+           });
 }
 
 bool isEpoch(std::string_view text) noexcept {

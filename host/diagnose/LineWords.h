@@ -17,6 +17,11 @@ bool isClearLevelName(std::string_view word) noexcept;
 bool isNumber(std::string_view word) noexcept;
 /// A name such as com.example.Main, shop::cart, server.go:17, queue/reader or cron[17].
 bool isPath(std::string_view word) noexcept;
+/// The name of a file with source code, as in "server.go:17".
+bool isPlace(std::string_view text) noexcept;
+/// Whether a text looks like the name of a thread, a number or an address rather than like who
+/// speaks.
+bool isThread(std::string_view text) noexcept;
 /// Seconds or milliseconds since 1970, such as "1795078800" or "1795078800.123": other numbers are
 /// not times.
 bool isEpoch(std::string_view text) noexcept;

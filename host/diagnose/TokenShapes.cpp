@@ -103,7 +103,8 @@ bool enclosesColumns(std::string_view inner, const TimePattern* times) {
     const std::string_view start = inner.substr(0, first);
     const bool isLast = last != std::string_view::npos && inner[last] != ' ' &&
                         isBracketLevel(inner.substr(last + 1));
-    const bool isFirst = isBracketLevel(start) && (first == inner.size() || inner[first] != ' ');
+    const bool isFirst = isBracketLevel(start) && (first == inner.size() || inner[first] != ' ' ||
+                                                   inner.substr(first).starts_with(" - "));
     if (isFirst || isLast || hasLevelWithin(inner)) {
         return true;
     }

@@ -203,6 +203,9 @@ TEST(FormatProposal, FindsLevelsBetweenOtherMarks) {
 }
 
 TEST(FormatProposal, WordsInUpperCaseAreLevelsOnlyWhereMostLinesHaveThem) {
+    EXPECT_EQ(columnsOf({"Nov 19 10:00:00 [17] node1 corosync notice  [TOTEM ] formed",
+                         "Nov 19 10:00:01 [17] node1 corosync warning [MAIN  ] no memory"}),
+              "warning|MAIN|no memory");
     const std::vector<std::string> lines = {
         "2026-11-19 10:00:00 - the queue is empty", "2026-11-19 10:00:01 - one of many came",
         "2026-11-19 10:00:02 - a b c d ERROR NOTICE backtrace", "2026-11-19 10:00:03 - end"};
@@ -211,6 +214,26 @@ TEST(FormatProposal, WordsInUpperCaseAreLevelsOnlyWhereMostLinesHaveThem) {
     EXPECT_EQ(
         columnsOf({"[2026-11-19 10:00:00] [Config] loaded", "[2026-11-19 10:00:01] [Hue] up"}),
         "|Hue|up");
+}
+
+TEST(FormatProposal, AWordInThePlaceOfTheLevelsIsOne) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00.1 P00   INFO: started",
+                         "2026-11-19 10:00:01.1 P00   INFO: ready",
+                         "2026-11-19 10:00:02.1 P01 DETAIL: backup file"}),
+              "DETAIL|P01|backup file");
+}
+
+TEST(FormatProposal, BracketsBehindANameBelongToIt) {
+    EXPECT_EQ(columnsOf({" 0(1234) INFO: tls [tls_mod.c:390]: With ECDH"}), "INFO|tls|With ECDH");
+    EXPECT_EQ(columnsOf({"Nov 19 10:00:00 n1 pacemakerd   [1234] (read_config)  info: Reading"}),
+              "info|pacemakerd|Reading");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 (main) [ERROR - org.shop.Cart.add(X.java:62)] Full"}),
+              "ERROR|org.shop.Cart.add(X.java|Full");
+}
+
+TEST(FormatProposal, WhatEndsALineIsItsMessage) {
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00.123 zmdc[1234].INF [Starting pending process]"}),
+              "INF|zmdc[1234]|[Starting pending process]");
 }
 
 TEST(FormatProposal, WordsThatAreAlignedToTheRightAreColumns) {
