@@ -208,9 +208,9 @@ std::vector<LogWarning> LogWarnings::of(const LogLedgerView& log) {
         warnings.push_back(
             {"without_time", 0,
              std::to_string(log.withoutTime) + " of " + std::to_string(log.rows) +
-                 (log.follow ? std::string(" entries have no time: their lines are in no "
-                                           "form that system loggers write. Describe the "
-                                           "file as a text log with a format.")
+                 (log.follow ? " entries have no time: their lines are in no form that system "
+                               "loggers write. \"zrmctl suggest " +
+                                   log.file + "\" names the format to put into its [[log]] table."
                              : " entries have no time: their lines do not begin like \"Oct "
                                " 5 07:03:09\". " +
                                    std::string(syslogCure))});

@@ -106,8 +106,13 @@ TEST_F(LogWarningsTest, WarnsAboutASyslogFileWithoutTimes) {
     EXPECT_THAT(kindsOf(log), IsEmpty());
     log.withoutTime = 6;
     EXPECT_THAT(kindsOf(log), ElementsAre("without_time"));
+    EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("(RSYSLOG_TraditionalFileFormat)"));
     log.type = 'U';
     EXPECT_THAT(kindsOf(log), IsEmpty()) << "a format may have no time";
+    log.type = 'S';
+    log.follow.emplace().state = "reading";
+    ASSERT_THAT(kindsOf(log), ElementsAre("without_time"));
+    EXPECT_THAT(LogWarnings::of(log)[0].text, HasSubstr("\"zrmctl suggest " + m_path + "\""));
 }
 
 TEST_F(LogWarningsTest, WarnsAboutAFileWithoutAccountingRecords) {
