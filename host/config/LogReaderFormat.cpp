@@ -4,6 +4,7 @@
 #include "host/config/FormatReader.h"
 #include "host/config/LogReader.h"
 #include "host/config/NamedFormat.h"
+#include "host/config/NamedTextFormat.h"
 #include "host/config/PathPattern.h"
 #include "host/framework/TraceCapture.h"
 #include "logtypes/FormatLogFile.h"
@@ -16,22 +17,6 @@
 #include <utility>
 
 namespace zrm::host {
-
-namespace {
-
-/// The length of a format in which each ${@} is replaced by the log's name.
-std::size_t namedLength(std::string_view format, std::string_view name) {
-    constexpr std::string_view token = "${@}";
-    std::size_t length = format.size();
-    for (std::size_t at = format.find(token); at != std::string_view::npos;
-         at = format.find(token, at + token.size())) {
-        length += name.size();
-        length -= token.size();
-    }
-    return length;
-}
-
-} // namespace
 
 void LogReader::readFormat(ConfigSection& section, LogConfig& log) {
     if (log.journal) {
@@ -183,22 +168,10 @@ void LogReader::readNamed(ConfigSection& section, LogConfig& log) {
 }
 
 void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
-    constexpr std::size_t longest = 1022;
-    if (log.format.size() > longest) {
+    if (log.format.size() > longestTextFormat) {
         section.problem("format", "has " + std::to_string(log.format.size()) + " bytes",
-                        "write at most " + std::to_string(longest));
+                        "write at most " + std::to_string(longestTextFormat));
         return;
-    }
-    for (const std::string& path : log.paths) {
-        const std::size_t length = namedLength(log.format, path);
-        if (!PathPattern::isPattern(path) && length > longest) {
-            section.problem("format",
-                            "has " + std::to_string(length) +
-                                " characters once each ${@} is replaced by '" + path + "'",
-                            "write at most " + std::to_string(longest) +
-                                ", with ${@} in fewer places");
-            return;
-        }
     }
     TraceCapture errors;
     const StringParser parser(log.format.c_str(), UserLogFile::followedFields());
@@ -207,6 +180,16 @@ void LogReader::checkTextFormat(ConfigSection& section, const LogConfig& log) {
         why.erase(why.find_last_not_of(" .") + 1);
         section.problem("format", "cannot be used" + (why.empty() ? std::string() : ": " + why),
                         "correct it; 'zrmctl try FORMAT FILE' shows where it stops matching");
+        return;
+    }
+    for (const std::string& path : log.paths) {
+        if (PathPattern::isPattern(path)) {
+            continue; // the files that match are judged when they are found
+        }
+        if (const Result<void> usable = checkNamedTextFormat(log.format, path); !usable) {
+            section.problem("format", usable.error().what, usable.error().cure);
+            return;
+        }
     }
 }
 

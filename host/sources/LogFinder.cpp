@@ -2,6 +2,7 @@
 
 #include "base/ErrorText.h"
 #include "host/base/Utf8.h"
+#include "host/config/NamedTextFormat.h"
 #include "host/config/PathPattern.h"
 #include "host/events/PositionBook.h"
 #include "host/sources/NamedSources.h"
@@ -171,6 +172,11 @@ private:
         }
         if (!candidate.isNamed && isCompressed(candidate.name)) {
             return passOver(candidate, "It is compressed");
+        }
+        if (const LogConfig& log = m_logs[candidate.source]; log.letter == 'U') {
+            if (const auto usable = checkNamedTextFormat(log.format, candidate.name); !usable) {
+                return passOver(candidate, "Its format " + usable.error().text());
+            }
         }
         struct stat status;
         if (::stat(candidate.name.c_str(), &status) != 0) {

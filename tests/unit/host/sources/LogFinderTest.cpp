@@ -22,6 +22,7 @@ using namespace zrm::host;
 namespace {
 
 using namespace std::chrono_literals;
+using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
@@ -125,6 +126,25 @@ TEST_F(LogFinderTest, PassesOverWhatIsNoFile) {
     EXPECT_EQ(reason(file("dangling.log")), "It is a link that leads nowhere");
     EXPECT_EQ(reason(file("old.log.gz")), "It is compressed");
     EXPECT_EQ(reason(file("b\xff.log")), "Its name is not UTF-8");
+}
+
+TEST_F(LogFinderTest, SaysThatAPathDoesNotFitItsFormat) {
+    logs = {table({file("*.log")})};
+    logs[0].letter = 'U';
+    logs[0].format = R"(A,"%s" , description = "${@} %s")";
+    const std::string good = create("good.log");
+    const std::string odd = create("100%d.log");
+    const std::string deep = create(std::string(240, 'x') + ".log");
+    look();
+    EXPECT_THAT(names(), ElementsAre(good));
+    EXPECT_THAT(reason(odd), HasSubstr("since '%' and '\"' mean something in it; leave out ${@}"));
+    EXPECT_THAT(reason(deep),
+                AllOf(testing::StartsWith("Its format has a directive of more than 255 characters "
+                                          "once each ${@} is replaced by '/"),
+                      HasSubstr("; write ${@} in fewer places, or give the log a shorter path")));
+    logs[0].format = R"(A,"%s" , description)";
+    look();
+    EXPECT_EQ(names().size(), 3U);
 }
 
 TEST_F(LogFinderTest, AFileThatAppearsLaterIsANewcomerAndStaysOne) {
