@@ -18,7 +18,8 @@ public:
         columns.hasYear = time.hasYear;
         columns.time = time.time;
         columns.offset = time.offset;
-        const SyslogParts parts = SyslogForms::split(entry, time);
+        takeApart(entry, time);
+        const SyslogParts& parts = m_parts;
         if (const auto priority = SyslogForms::priority(entry)) {
             columns.type = SyslogForms::severityOf(*priority);
             columns.entryClass = SyslogForms::facilityOf(*priority);
@@ -31,14 +32,21 @@ public:
     }
 
     void readFields(std::string_view entry, EntryFields& fields) override {
-        SyslogFields::read(entry, fields);
-        const SyslogParts parts = SyslogForms::split(entry, SyslogForms::recognise(entry));
-        m_format.m_extracts.read(parts.source, parts.description, fields, m_workspace);
+        if (entry.data() != m_line.data() || entry.size() != m_line.size()) {
+            takeApart(entry, SyslogForms::recognise(entry));
+        }
+        SyslogFields::read(entry, m_form, m_parts, fields);
+        m_format.m_extracts.read(m_parts.source, m_parts.description, fields, m_workspace);
     }
 
     std::string_view reason() const noexcept override { return {}; }
 
 private:
+    void takeApart(std::string_view line, const SyslogHead& head) {
+        m_line = line;
+        m_form = head.form;
+        m_parts = SyslogForms::split(line, head);
+    }
     /// "app[process]", of which the line has the two apart in RFC 5424.
     std::string_view sourceOf(const SyslogParts& parts) {
         if (parts.processId.empty()) {
@@ -49,6 +57,10 @@ private:
     }
 
     const SyslogFormat& m_format;
+    // The line that was taken apart last: its fields are mostly asked for next.
+    std::string_view m_line = "";
+    SyslogHead::Form m_form = SyslogHead::Form::none;
+    SyslogParts m_parts;
     std::string m_source;
     FieldExtracts::Workspace m_workspace;
 };
