@@ -292,6 +292,14 @@ TEST(LogReader, ChecksTheFormatOfATextLog) {
     EXPECT_TRUE(tooLong[0].starts_with(
         "zrm.toml:4: log.format: has 1217 characters once each ${@} is replaced by '/ppp"))
         << tooLong[0];
+    const std::vector<std::string> tooWide =
+        problemsOf("[[log]]\npath = '" + path +
+                   "'\ntype = 'text'\nformat = 'A,\"%s\" , description = \"${@} %s\"'\n");
+    ASSERT_EQ(tooWide.size(), 1U);
+    EXPECT_TRUE(tooWide[0].starts_with("zrm.toml:4: log.format: has a directive of more than 255 "
+                                       "characters once each ${@} is replaced by '/ppp"))
+        << tooWide[0];
+    EXPECT_TRUE(tooWide[0].ends_with("give the log a shorter path")) << tooWide[0];
 }
 
 TEST(LogReader, ReadsWhenALogIsQuiet) {

@@ -1,12 +1,7 @@
-#include "host/formats/JsonFormat.h"
-
-#include "base/EntryFields.h"
-#include "framework/LogEntry.h"
-#include "host/formats/FormatDescription.h"
+#include "JsonEntry.h"
 
 #include <gtest/gtest.h>
 
-#include <memory>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -15,69 +10,13 @@
 using namespace zrm;
 using namespace zrm::host;
 
-namespace {
-
-/// Reads entries by a format, each from memory of exactly its size.
-class Entry {
-public:
-    explicit Entry(const FormatDescription& description = {}) {
-        auto format = JsonFormat::make(description);
-        EXPECT_TRUE(format) << format.error().text();
-        m_format = std::move(*format);
-        m_reader = m_format->reader();
-    }
-
-    bool read(std::string_view text) {
-        m_text.assign(text.begin(), text.end());
-        columns = {};
-        fields.clear();
-        const bool isRead = m_reader->read({m_text.data(), m_text.size()}, columns);
-        if (isRead) {
-            m_reader->readFields({m_text.data(), m_text.size()}, fields);
-        }
-        return isRead;
-    }
-    std::string reasonOf(std::string_view text) {
-        return read(text) ? "read" : std::string(m_reader->reason());
-    }
-    std::string field(std::string_view name) const {
-        const std::string_view* const value = fields.find(name);
-        return value == nullptr ? "(none)" : std::string(*value);
-    }
-    EntryFormat::Reader& reader() { return *m_reader; }
-
-    EntryColumns columns;
-    EntryFields fields;
-
-private:
-    std::shared_ptr<const EntryFormat> m_format;
-    std::unique_ptr<EntryFormat::Reader> m_reader;
-    std::vector<char> m_text;
-};
-
-std::string timeOf(const EntryColumns& columns) {
-    if (!columns.hasTime) {
-        return "none";
-    }
-    const std::int64_t seconds = columns.time.seconds() - columns.offset.value_or(0);
-    return std::to_string(seconds) + (columns.offset ? " UTC" : " local");
-}
-
-FormatDescription withColumns(std::map<std::string, std::string> columns) {
-    FormatDescription description;
-    description.columns = std::move(columns);
-    return description;
-}
-
-} // namespace
-
 TEST(JsonFormat, FillsTheColumnsFromTheNamedFields) {
-    Entry entry(withColumns({{"time", "when"},
-                             {"type", "how.bad"},
-                             {"source", "who"},
-                             {"system", "where"},
-                             {"class", "kind"},
-                             {"description", "what"}}));
+    JsonEntry entry(withColumns({{"time", "when"},
+                                 {"type", "how.bad"},
+                                 {"source", "who"},
+                                 {"system", "where"},
+                                 {"class", "kind"},
+                                 {"description", "what"}}));
     ASSERT_TRUE(entry.read(R"({"when":"2026-11-22T10:00:00Z","how":{"bad":"very"},"who":"me",)"
                            R"("where":"here","kind":"a","what":"it broke","msg":"other"})"));
     EXPECT_EQ(timeOf(entry.columns), "1795341600 UTC");
@@ -91,7 +30,7 @@ TEST(JsonFormat, FillsTheColumnsFromTheNamedFields) {
 }
 
 TEST(JsonFormat, FillsNothingFromAColumnWithAnEmptyName) {
-    Entry entry(withColumns({{"source", ""}, {"type", "level"}, {"class", "level"}}));
+    JsonEntry entry(withColumns({{"source", ""}, {"type", "level"}, {"class", "level"}}));
     ASSERT_TRUE(entry.read(R"({"level":"info","logger":"web","msg":"m"})"));
     EXPECT_EQ(entry.columns.source, "");
     EXPECT_EQ(entry.columns.type, "info");
@@ -176,7 +115,7 @@ INSTANTIATE_TEST_SUITE_P(All, JsonWriters, testing::ValuesIn(written),
 
 TEST_P(JsonWriters, AreReadWithoutConfiguration) {
     const Logged& logged = GetParam();
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(logged.text)) << entry.reader().reason();
     EXPECT_EQ(timeOf(entry.columns), logged.time);
     EXPECT_EQ(entry.columns.type, logged.type);
@@ -186,7 +125,7 @@ TEST_P(JsonWriters, AreReadWithoutConfiguration) {
 }
 
 TEST(JsonFormat, PrefersEarlierNamesWhereverTheyAre) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(
         entry.read(R"({"event":"e","message":"m","MSG":"first","caller":"c","Logger":"l"})"));
     EXPECT_EQ(entry.columns.description, "first");
@@ -196,7 +135,7 @@ TEST(JsonFormat, PrefersEarlierNamesWhereverTheyAre) {
 }
 
 TEST(JsonFormat, PrefersATimeWithADateToATimeOfDay) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(R"({"time":"10:00:05.123","ts":1795341600,"msg":"m"})"));
     EXPECT_EQ(timeOf(entry.columns), "1795341600 UTC");
     ASSERT_TRUE(entry.read(R"({"time":"10:00:05.123","ts":"soon","msg":"m"})"));
@@ -206,7 +145,7 @@ TEST(JsonFormat, PrefersATimeWithADateToATimeOfDay) {
 }
 
 TEST(JsonFormat, LeavesColumnsEmptyThatTheObjectDoesNotHave) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(R"({"n":1})"));
     EXPECT_FALSE(entry.columns.hasTime);
     EXPECT_EQ(entry.columns.type, "");
@@ -222,7 +161,7 @@ TEST(JsonFormat, ExchangesAndFillsTexts) {
     FormatDescription description = withColumns({{"type", "level"}});
     description.values["type"] = {{"30", "information"}};
     description.defaults = {{"source", "app"}, {"description", "nothing"}};
-    Entry entry(description);
+    JsonEntry entry(description);
     ASSERT_TRUE(entry.read(R"({"level":30})"));
     EXPECT_EQ(entry.columns.type, "information");
     EXPECT_EQ(entry.columns.source, "app");
@@ -232,7 +171,7 @@ TEST(JsonFormat, ExchangesAndFillsTexts) {
 }
 
 TEST(JsonFormat, NamesNumericLevels) {
-    Entry entry;
+    JsonEntry entry;
     const auto typeOf = [&](const char* text) {
         return entry.read(text) ? std::string(entry.columns.type) : "rejected";
     };
@@ -252,7 +191,7 @@ TEST(JsonFormat, NamesNumericLevels) {
 TEST(JsonFormat, ReadsTimesByTheGivenPattern) {
     FormatDescription description = withColumns({{"time", "at"}});
     description.timeFormat = "%d/%m/%Y %H-%M-%S";
-    Entry entry(description);
+    JsonEntry entry(description);
     ASSERT_TRUE(entry.read(R"({"at":"22/11/2026 10-00-00"})"));
     EXPECT_EQ(timeOf(entry.columns), "1795341600 local");
     EXPECT_EQ(entry.reasonOf(R"({"at":"2026-11-22T10:00:00Z"})"), "field at is not a time");
@@ -261,7 +200,7 @@ TEST(JsonFormat, ReadsTimesByTheGivenPattern) {
 }
 
 TEST(JsonFormat, NamesFieldsOfNestedObjectsAndArrays) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(
         R"({"http":{"request":{"method":"GET"},"status":503},"tags":["a",["b",{"c":"d"}]],)"
         R"("e":{},"f":[],"g":null,"h":[null,1]})"));
@@ -275,7 +214,7 @@ TEST(JsonFormat, NamesFieldsOfNestedObjectsAndArrays) {
 }
 
 TEST(JsonFormat, KeepsScalarsAsTheyAreWritten) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(
         R"({"a": 1.50 , "b":-0,"c":12345678901234567890123456789,"d":1E+400,"e":true,"f":false , "g":""})"));
     EXPECT_EQ(entry.field("a"), "1.50");
@@ -288,7 +227,7 @@ TEST(JsonFormat, KeepsScalarsAsTheyAreWritten) {
 }
 
 TEST(JsonFormat, RemovesEscapes) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(
         R"({"msg":"a \"b\" \\ \/ \n\t\u00e4\ud83d\ude00","k\"e\u0079":"v","in":{"\u0061":"\\"},"plain":"p"})"));
     EXPECT_EQ(entry.columns.description, "a \"b\" \\ / \n\t\xc3\xa4\xf0\x9f\x98\x80");
@@ -298,147 +237,10 @@ TEST(JsonFormat, RemovesEscapes) {
 }
 
 TEST(JsonFormat, CountsTheFirstOfMembersWithTheSameName) {
-    Entry entry;
+    JsonEntry entry;
     ASSERT_TRUE(entry.read(R"({"msg":"first","a":1,"msg":"second","a":2,"b":{"c":3},"b.c":4})"));
     EXPECT_EQ(entry.columns.description, "first");
     EXPECT_EQ(entry.field("a"), "1");
     EXPECT_EQ(entry.field("b.c"), "3");
     EXPECT_EQ(entry.fields.all().size(), 3u);
-}
-
-TEST(JsonFormat, SaysWhyAnEntryIsRejected) {
-    Entry entry;
-    using namespace std::string_literals;
-    EXPECT_EQ(entry.reasonOf(""), "it is empty");
-    EXPECT_EQ(entry.reasonOf("  "), "it is empty");
-    EXPECT_EQ(entry.reasonOf("Nov 22 started"), "it is not a JSON object");
-    EXPECT_EQ(entry.reasonOf("[1]"), "it is not a JSON object");
-    EXPECT_EQ(entry.reasonOf("\"text\""), "it is not a JSON object");
-    EXPECT_EQ(entry.reasonOf("{"), "it does not end with the end of a JSON object");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1)"), "it does not end with the end of a JSON object");
-    EXPECT_EQ(entry.reasonOf(R"({"a":{"b":1})"), "it does not end with the end of a JSON object");
-    EXPECT_EQ(entry.reasonOf(R"({"a":"b)"), "a text in it has no closing quote");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1} x)"), "it does not end with the end of a JSON object");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1} {"b":2})"), "something follows the JSON object, at byte 9");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1}})"), "something follows the JSON object, at byte 8");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1,})"), "it is not JSON, at byte 8");
-    EXPECT_EQ(entry.reasonOf(R"({"a" 1})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1 "b":2})"), "it is not JSON, at byte 8");
-    EXPECT_EQ(entry.reasonOf(R"({"a":NaN})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":01})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1.})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":tru})"), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({1:2})"), "it is not JSON, at byte 2");
-    EXPECT_EQ(entry.reasonOf("{'a':1}"), "it is not JSON, at byte 2");
-    EXPECT_EQ(entry.reasonOf(R"({"a":"\x"})"),
-              "a text in it has an escape that is not one of JSON's, at byte 6");
-    EXPECT_EQ(entry.reasonOf(R"({"a":"\ud83d"})"),
-              "a text in it has an escape that is not one of JSON's, at byte 6");
-    EXPECT_EQ(entry.reasonOf("{\"a\":\"\xff\"}"), "it is not valid UTF-8");
-    EXPECT_EQ(entry.reasonOf("{\"a\":\"\0\"}"s), "a text in it has a control character");
-    EXPECT_EQ(entry.reasonOf("{\"a\":\0}"s), "it is not JSON, at byte 6");
-    EXPECT_EQ(entry.reasonOf("{\"a\":\"b\nc\"}"), "a text in it has a control character");
-    EXPECT_EQ(entry.reasonOf(R"({"a":1})"), "read");
-}
-
-TEST(JsonFormat, SaysThatAnEntryIsTooLong) {
-    Entry entry;
-    std::string text = "{\"a\":\"" + std::string(EntryKeep::longestText, 'x');
-    text.resize(EntryKeep::longestText);
-    EXPECT_EQ(entry.reasonOf(text), "it is longer than 65536 bytes");
-    text.replace(text.size() - 2, 2, "\"}");
-    EXPECT_EQ(entry.reasonOf(text), "read");
-    EXPECT_EQ(entry.field("a").size(), text.size() - 8);
-}
-
-TEST(JsonFormat, BoundsNesting) {
-    Entry entry;
-    const auto nested = [](std::size_t depth, const std::string& inside) {
-        std::string text;
-        for (std::size_t i = 0; i < depth; ++i) {
-            text += "{\"a\":";
-        }
-        return text + inside + std::string(depth, '}');
-    };
-    std::string name = "a";
-    for (int i = 1; i < 16; ++i) {
-        name += ".a";
-    }
-    ASSERT_TRUE(entry.read(nested(16, "1")));
-    EXPECT_EQ(entry.field(name), "1");
-    ASSERT_TRUE(entry.read(nested(17, "1 ")));
-    EXPECT_EQ(entry.field(name), "{\"a\":1 }");
-    ASSERT_TRUE(entry.read(nested(10000, "[]")));
-    EXPECT_EQ(entry.field(name), nested(10000 - 16, "[]"));
-    std::string arrays = "{\"a\":" + std::string(10000, '[') + std::string(10000, ']') + "}";
-    ASSERT_TRUE(entry.read(arrays));
-    EXPECT_EQ(entry.fields.all().size(), 1u);
-    arrays.erase(arrays.size() - 2, 1);
-    EXPECT_NE(entry.reasonOf(arrays), "read");
-}
-
-TEST(JsonFormat, BoundsFieldsAndStillFillsColumns) {
-    Entry entry;
-    std::string text = "{\"n\":[0";
-    for (int i = 1; i < 300; ++i) {
-        text += "," + std::to_string(i);
-    }
-    ASSERT_TRUE(entry.read(text + "],\"msg\":\"behind\"}"));
-    EXPECT_EQ(entry.fields.all().size(), EntryFields::most);
-    EXPECT_EQ(entry.fields.leftOut(), 300u + 1 - EntryFields::most);
-    EXPECT_EQ(entry.field("n.255"), "255");
-    EXPECT_EQ(entry.columns.description, "behind");
-}
-
-TEST(JsonFormat, LeavesOutNamesThatAreTooLongOrEmpty) {
-    Entry entry;
-    const std::string longest(EntryFields::longestName, 'n');
-    ASSERT_TRUE(entry.read("{\"" + longest + "\":1,\"" + longest + "n\":2,\"\":3}"));
-    EXPECT_EQ(entry.field(longest), "1");
-    EXPECT_EQ(entry.fields.leftOut(), 2u);
-    const std::string outer(EntryFields::longestName - 2, 'o');
-    ASSERT_TRUE(
-        entry.read("{\"" + outer + "\":{\"i\":1,\"ii\":2,\"j\":{\"k\":3}},\"\":{\"l\":4}}"));
-    EXPECT_EQ(entry.field(outer + ".i"), "1");
-    EXPECT_EQ(entry.field(".l"), "4");
-    EXPECT_EQ(entry.fields.all().size(), 2u);
-    EXPECT_EQ(entry.fields.leftOut(), 2u);
-}
-
-TEST(JsonFormat, ReadsTheFieldsOfAnyEntry) {
-    Entry entry;
-    EntryColumns columns;
-    EntryFields fields;
-    std::string text = R"({"a":"1"})";
-    ASSERT_TRUE(entry.reader().read(text, columns));
-    // The same memory, the same size, another entry.
-    text[6] = '2';
-    entry.reader().readFields(text, fields);
-    ASSERT_NE(fields.find("a"), nullptr);
-    EXPECT_EQ(*fields.find("a"), "2");
-    text[6] = '3';
-    EXPECT_EQ(*fields.find("a"), "2") << "views into memory of the reader";
-
-    fields.clear();
-    entry.reader().readFields("no object", fields);
-    EXPECT_TRUE(fields.all().empty());
-}
-
-TEST(JsonFormat, RefusesWhatCannotBeConfigured) {
-    const auto fieldOf = [](const FormatDescription& description) {
-        const auto format = JsonFormat::make(description);
-        return format ? "made" : format.error().field;
-    };
-    EXPECT_EQ(fieldOf(withColumns({{"level", "lvl"}})), "columns.level");
-    EXPECT_EQ(fieldOf(withColumns({{"type", std::string(256, 'a')}})), "columns.type");
-    FormatDescription description;
-    description.patterns = {".*"};
-    EXPECT_EQ(fieldOf(description), "format");
-    description = {};
-    description.timeFormat = "%Q";
-    EXPECT_EQ(fieldOf(description), "time_format");
-    description = {};
-    description.defaults["time"] = "now";
-    EXPECT_EQ(fieldOf(description), "defaults.time");
 }

@@ -119,6 +119,19 @@ std::string fieldsOf(EntryFormat::Reader& reader, std::string_view line) {
     return result;
 }
 
+TEST(SyslogFormat, ReadsTheFieldsOfALineThatIsNotTheLastOne) {
+    const auto format = formatOf(described());
+    const auto reader = format->reader();
+    EntryColumns columns;
+    ASSERT_TRUE(reader->read(lines[0], columns));
+    EntryFields fields;
+    reader->readFields(lines[3], fields);
+    EXPECT_EQ(*fields.find("a@1.b"), "c \"d\"");
+    fields.clear();
+    reader->readFields(lines[0], fields);
+    EXPECT_EQ(*fields.find("pid"), "412");
+}
+
 TEST(SyslogFormat, AddsFieldsOfTheFirstExpressionThatMatchesTheMessage) {
     const auto format = formatOf(
         described({{"sshd*",
