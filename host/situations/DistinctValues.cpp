@@ -7,14 +7,22 @@
 
 namespace zrm::host {
 
-DistinctValues::Span& DistinctValues::spanOf(std::int64_t time, std::int64_t period) {
-    Span* latest = nullptr; // of those that take the time
-    for (Span& span : m_spans) {
+/// Of the spans that take the time, the latest; the end if none does.
+std::size_t DistinctValues::find(std::int64_t time, std::int64_t period) const {
+    std::size_t latest = m_spans.size();
+    for (std::size_t at = 0; at < m_spans.size(); ++at) {
+        const Span& span = m_spans[at];
         const bool takes = time > span.newest - period && time < span.newest + period;
-        latest = takes && (latest == nullptr || span.newest > latest->newest) ? &span : latest;
+        if (takes && (latest == m_spans.size() || span.newest > m_spans[latest].newest)) {
+            latest = at;
+        }
     }
-    if (latest != nullptr) {
-        return *latest;
+    return latest;
+}
+
+DistinctValues::Span& DistinctValues::spanOf(std::int64_t time, std::int64_t period) {
+    if (const std::size_t found = find(time, period); found < m_spans.size()) {
+        return m_spans[found];
     }
     if (m_spans.size() < mostSpans) {
         m_spans.emplace_back();
@@ -54,15 +62,14 @@ std::int64_t DistinctValues::add(std::int64_t time, std::int64_t period, std::st
 }
 
 std::int64_t DistinctValues::within(std::int64_t time, std::int64_t period) const {
-    std::int64_t most = 0;
-    for (const Span& span : m_spans) {
-        const auto found =
-            std::count_if(span.times.begin(), span.times.end(), [&](const auto& one) {
-                return one.second > time - period && one.second <= time;
-            });
-        most = std::max<std::int64_t>(most, found);
+    const std::size_t found = find(time, period);
+    if (found == m_spans.size()) {
+        return 0;
     }
-    return most;
+    const Span& span = m_spans[found];
+    const std::int64_t end = std::max(time, span.newest);
+    return std::count_if(span.times.begin(), span.times.end(),
+                         [&](const auto& one) { return one.second > end - period; });
 }
 
 } // namespace zrm::host

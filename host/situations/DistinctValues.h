@@ -23,7 +23,8 @@ public:
     /// with the newest entry less than a period away. Both in seconds.
     std::int64_t add(std::int64_t time, std::int64_t period, std::string_view value);
 
-    /// The number of different values that were added of the period (time - period, time].
+    /// The same for the period that ends with this time, or with a newer entry as there, whose
+    /// value is not added.
     std::int64_t within(std::int64_t time, std::int64_t period) const;
 
 private:
@@ -34,6 +35,7 @@ private:
         std::uint64_t used = 0;                                ///< number of the last addition
         std::unordered_map<std::uint64_t, std::int64_t> times; ///< of each value, the latest
     };
+    std::size_t find(std::int64_t time, std::int64_t period) const;
     Span& spanOf(std::int64_t time, std::int64_t period);
 
     std::vector<Span> m_spans;

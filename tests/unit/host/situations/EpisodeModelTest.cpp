@@ -38,18 +38,22 @@ public:
     Decision judge(const Entry& entry) {
         const std::string group(entry.group);
         auto& times = m_times[group];
-        times.emplace_back(entry.time, std::string(entry.distinct));
+        const bool isAfterOthers = !m_rules.then.empty() && entry.mayRaise;
+        if (!isAfterOthers) {
+            times.emplace_back(entry.time, std::string(entry.distinct));
+        }
         ++m_step;
-        const std::int64_t newest = std::max_element(times.begin(), times.end())->first;
-        const std::int64_t count =
-            m_rules.frequency == 0 ? 0 : m_windows[group].add(entry.time, m_rules.period);
-        const std::int64_t first = m_windows[group].counted(entry.time, m_rules.period).first;
+        const std::int64_t newest = std::max(
+            entry.time,
+            times.empty() ? entry.time : std::max_element(times.begin(), times.end())->first);
+        auto [count, first] = countIn(m_windows[group], entry, isAfterOthers);
         counted = m_rules.frequency == 0     ? 0
                   : m_rules.distinct.empty() ? count
                                              : different(times, newest);
         const bool isMet =
             m_rules.frequency == 0 ||
-            (m_rules.isUpperBound ? counted <= m_rules.frequency : counted >= m_rules.frequency);
+            (entry.mayRaise &&
+             (m_rules.isUpperBound ? counted <= m_rules.frequency : counted >= m_rules.frequency));
         if (m_rules.resolveAfter == 0) {
             return isMet && !cools(group, entry.time) ? Decision::RAISES : Decision::NONE;
         }
@@ -76,8 +80,9 @@ public:
         if (!isMet) {
             return Decision::NONE;
         }
-        const auto entries =
-            m_rules.frequency == 0 ? std::size_t{1} : static_cast<std::size_t>(count);
+        const auto entries = m_rules.frequency == 0
+                                 ? std::size_t{1}
+                                 : static_cast<std::size_t>(count) + (isAfterOthers ? 1 : 0);
         if (m_open[group].size() == EpisodeJudge::mostEpisodes) {
             const auto least =
                 std::min_element(m_open[group].begin(), m_open[group].end(),
@@ -108,6 +113,19 @@ public:
 private:
     using Times = std::vector<std::pair<std::int64_t, std::string>>;
 
+    /// How many entries there are, and the time of the first.
+    std::pair<std::int64_t, std::int64_t> countIn(zrm::EntryWindows& windows, const Entry& entry,
+                                                  bool isAfterOthers) const {
+        if (m_rules.frequency == 0) {
+            return {0, entry.time};
+        }
+        if (isAfterOthers) {
+            const auto others = windows.within(entry.time, m_rules.period);
+            return {others.entries, others.first};
+        }
+        const std::int64_t count = windows.add(entry.time, m_rules.period);
+        return {count, windows.counted(entry.time, m_rules.period).first};
+    }
     std::int64_t different(const Times& times, std::int64_t end) const {
         std::set<std::string> values;
         for (const auto& [time, value] : times) {
@@ -149,6 +167,7 @@ JudgementConfig randomRules(std::mt19937& random) {
         rules.period = std::vector<std::int64_t>{5, 60, 600}[random() % 3];
         rules.isUpperBound = random() % 5 == 0;
         rules.distinct = random() % 4 == 0 ? "user" : "";
+        rules.then = random() % 3 == 0 ? "result=good" : "";
     }
     switch (random() % 3) {
     case 0:
@@ -185,7 +204,8 @@ void compareEntries(std::mt19937& random, int entries) {
         auto& of = newest[group];
         time = std::max(time, of - latest + 1);
         of = std::max(of, time);
-        const Entry entry{time, group, user, log};
+        const bool mayRaise = rules.then.empty() || random() % 4 == 0;
+        const Entry entry{time, group, user, log, mayRaise};
         const EpisodeJudge::Verdict verdict = judge.judge(entry, ended);
         ASSERT_EQ(static_cast<int>(verdict.decision), static_cast<int>(plain.judge(entry)))
             << "entry " << number;
