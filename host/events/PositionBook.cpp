@@ -342,6 +342,9 @@ std::vector<EpisodeShare> PositionBook::takeShares() {
 }
 
 void PositionBook::note(std::vector<EpisodeShare> shares) {
+    if (!m_isKept) {
+        return; // nobody takes them
+    }
     const std::lock_guard guard(m_mutex);
     std::move(shares.begin(), shares.end(), std::back_inserter(m_shares));
 }

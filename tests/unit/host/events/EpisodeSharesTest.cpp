@@ -148,6 +148,12 @@ TEST_F(EpisodeSharesTest, TheBookKnowsUntilWhenLogsAreJudged) {
     EXPECT_GE(book->judgedUntil(std::nullopt), before) << "the other is no longer followed";
 }
 
+TEST_F(EpisodeSharesTest, WithoutAHistoryNothingIsCollectedForIt) {
+    const auto unkept = PositionBook::unkept();
+    unkept->note({{std::make_shared<EpisodeId>(1), "/log", 1, 0, 0}});
+    EXPECT_THAT(unkept->takeShares(), IsEmpty());
+}
+
 TEST_F(EpisodeSharesTest, EpisodesOfAnEarlierRunAreTakenOnce) {
     StoredEpisode first;
     first.situation = "a";
