@@ -148,8 +148,12 @@ Backtest::Result Backtest::run(const std::vector<LogFile*>& logs, const std::str
             break;
         }
     }
-    replay(result);
-    result.decision = decisionOf(result);
+    replay(from, to, result);
+    result.decision = m_replay.isOfAbsence() ? absenceDecision(result) : decisionOf(result);
+    if (!result.reach.isComplete()) {
+        result.decision += "; older entries were not examined: " + result.reach.reason;
+    }
+    result.decision += '.';
     return result;
 }
 
@@ -283,13 +287,41 @@ Replay::Verdict Backtest::count(const Matched& matched) {
     return m_replay.count(matched.time.data(), values);
 }
 
-void Backtest::replay(Result& result) {
+/// Entries are expected from the first time on, or where reading has ended: what a log held before
+/// that is not known.
+void Backtest::beginAbsence(const std::string& from, const Result& result) {
+    if (const auto begin = Replay::timeOf(std::max(from, result.reach.reached))) {
+        m_replay.beginAt(*begin);
+    }
+}
+
+/// Until the last time, or until now.
+void Backtest::endAbsence(const std::string& to) {
+    const std::int64_t now = WallClock::seconds();
+    m_replay.endAt(std::min(Replay::timeOf(to).value_or(now), now));
+}
+
+void Backtest::addAbsences(Result& result) {
+    constexpr std::int64_t milliseconds = 1000; // in a second
+    for (const FoundAbsence& absence : m_replay.takeRaised()) {
+        ++result.raised;
+        const auto stamp = TimeText::toStamp(UtcTime::text(absence.raised * milliseconds));
+        if (stamp && result.raisedAt.size() < mostTimes) {
+            result.raisedAt.push_back(*stamp);
+        }
+    }
+}
+
+void Backtest::replay(const std::string& from, const std::string& to, Result& result) {
     TraceScope trace(anchor);
     // Entries of one second stay as the log has them, which is newest first here.
     std::reverse(m_matched.begin(), m_matched.end());
     std::stable_sort(
         m_matched.begin(), m_matched.end(),
         [](const Matched& left, const Matched& right) { return left.order < right.order; });
+    if (m_replay.isOfAbsence()) {
+        beginAbsence(from, result);
+    }
     for (const Matched& matched : m_matched) {
         if (count(matched).isRaised) {
             ++result.raised;
@@ -298,19 +330,28 @@ void Backtest::replay(Result& result) {
             }
         }
         if (m_replay.isJudged()) {
+            addAbsences(result);
             addEpisodes(m_replay.takeEnded(), true, result);
         }
     }
+    if (m_replay.isOfAbsence()) {
+        endAbsence(to);
+        addAbsences(result);
+    }
     if (m_replay.isJudged()) {
-        addEpisodes(m_replay.takeLasting(), false, result);
-        result.droppedGroups = m_replay.droppedGroups();
-        std::sort(result.found.begin(), result.found.end(),
-                  [](const FoundEpisode& left, const FoundEpisode& right) {
-                      return left.first < right.first;
-                  });
-        if (result.found.size() > mostEpisodes) {
-            result.found.resize(mostEpisodes);
-        }
+        listEpisodes(result);
+    }
+}
+
+void Backtest::listEpisodes(Result& result) {
+    addEpisodes(m_replay.takeLasting(), false, result);
+    result.droppedGroups = m_replay.droppedGroups();
+    std::sort(result.found.begin(), result.found.end(),
+              [](const FoundEpisode& left, const FoundEpisode& right) {
+                  return left.first < right.first;
+              });
+    if (result.found.size() > mostEpisodes) {
+        result.found.resize(mostEpisodes);
     }
 }
 
@@ -321,9 +362,9 @@ void Backtest::addEpisodes(const std::vector<EndedEpisode>& episodes, bool areOv
     for (const EndedEpisode& ended : episodes) {
         const Episode& episode = ended.episode;
         ++result.episodes;
-        result.found.push_back({episode.first, episode.last, episode.count,
-                                m_replay.groupValues(ended.group),
-                                areOver || episode.last + m_resolveAfter <= now});
+        result.found.push_back(
+            {episode.first, episode.last, episode.count, m_replay.groupValues(ended.group),
+             areOver || (m_resolveAfter > 0 && episode.last + m_resolveAfter <= now)});
     }
     if (result.found.size() > 2 * mostEpisodes) {
         // The order of their ends is nearly that of their beginnings.
@@ -355,9 +396,18 @@ std::string Backtest::decisionOf(const Result& result) const {
                std::to_string(m_replay.periodSeconds()) + " s" +
                (m_then.empty() ? "" : " before one with " + m_then);
     }
-    return text + (result.reach.isComplete()
-                       ? "."
-                       : "; older entries were not examined: " + result.reach.reason + '.');
+    return text;
+}
+
+std::string Backtest::absenceDecision(const Result& result) const {
+    const std::string of = std::to_string(result.matched) + " of " + entriesText(result.entries) +
+                           (result.matched == 1 ? " meets" : " meet") + " every condition";
+    if (result.raised == 0) {
+        return "Would not have been raised: " + of + ", and never was there none for " + m_absent;
+    }
+    return "Would have been raised " + times(result.raised) + ", first at " +
+           readable(result.raisedAt.front()) + ", since no entry had come for " + m_absent + ": " +
+           of;
 }
 
 } // namespace zrm::host

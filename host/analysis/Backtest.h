@@ -63,7 +63,7 @@ public:
     /// The table's manager must outlive the object.
     Backtest(const SituationConfig& situation, TableManager& entries)
         : m_replay(situation, entries), m_resolveAfter(situation.judgement.resolveAfter),
-          m_then(situation.judgement.then) {}
+          m_then(situation.judgement.then), m_absent(situation.judgement.absentText) {}
 
     /// Whether the table opened a request; if not, nothing else may be called.
     bool isOpen() const noexcept { return m_replay.isOpen(); }
@@ -100,14 +100,20 @@ private:
     void addEpisodes(const std::vector<EndedEpisode>& episodes, bool areOver, Result& result);
     void keepOrder(std::size_t first);
     Replay::Verdict count(const Matched& matched);
-    void replay(Result& result);
+    void replay(const std::string& from, const std::string& to, Result& result);
+    void beginAbsence(const std::string& from, const Result& result);
+    void endAbsence(const std::string& to);
+    void addAbsences(Result& result);
+    void listEpisodes(Result& result);
     static void addReach(const LogFile& log, Reach reach, Result& result);
     std::string decisionOf(const Result& result) const;
+    std::string absenceDecision(const Result& result) const;
 
     Replay m_replay;
     TextPool m_texts;
     std::int64_t m_resolveAfter;
     std::string m_then;             ///< of JudgementConfig
+    std::string m_absent;           ///< as the operator has written it; empty: none
     std::vector<Matched> m_matched; ///< newest first within a log, one log after another
 };
 

@@ -284,6 +284,14 @@ std::string Explainer::reasonOf(const Replay::Verdict& verdict) const {
     using enum EpisodeJudge::Decision;
     const Replay::Judged& judged = *verdict.judged;
     const std::string group = groupText(judged.group);
+    if (m_replay.isOfAbsence()) {
+        const std::string& limit = m_situation.judgement.absentText;
+        return judged.absence
+                   ? "it ends an absence" + group + ": no entry had met every condition for " +
+                         std::to_string(*judged.absence) + " s, and the limit is " + limit
+                   : "every condition holds" + group + "; it would be raised " + limit +
+                         " after this entry unless another one comes";
+    }
     if (judged.decision == CONTINUES) {
         return "it belongs to the episode" + group + " that began at " +
                UtcTime::text(judged.first * millisecondsPerSecond) + " and has " +

@@ -9,6 +9,7 @@
 #include "tables/Timestamp.h"
 #include "tables/zrm_rmlogent_agent.h"
 
+#include <algorithm>
 #include <cstring>
 #include <new>
 #include <utility>
@@ -77,7 +78,11 @@ Replay::Replay(const SituationConfig& situation, TableManager& entries)
     TraceScope trace(anchor);
     if (m_rules.isUsed()) {
         m_values.emplace(situation);
-        m_judge.emplace(m_rules);
+        if (isOfAbsence()) {
+            m_absence.emplace(m_rules.absent, m_rules.groupBy.empty() ? 1 : m_rules.maxGroups);
+        } else {
+            m_judge.emplace(m_rules);
+        }
     }
     m_request.reset(new (std::nothrow)
                         Request(&m_surroundings->detail, &m_surroundings->context, &entries));
@@ -127,7 +132,10 @@ Replay::Verdict Replay::count(const char* entryTime, const Values& values) {
     if (isJudged()) {
         Verdict verdict{true, false, std::nullopt};
         const auto& instant = EntryInstant::ofThisThread();
-        if (const auto time = instant ? instant : localTime(entryTime)) {
+        const auto time = instant ? instant : localTime(entryTime);
+        if (time && isOfAbsence()) {
+            judgeAbsence(*time, values, verdict);
+        } else if (time) {
             judgeGroup(*time, values, verdict);
         }
         return verdict;
@@ -165,6 +173,56 @@ void Replay::judgeGroup(std::int64_t time, const Values& values, Verdict& verdic
     }
 }
 
+void Replay::judgeAbsence(std::int64_t time, const Values& values, Verdict& verdict) {
+    m_newest = std::max(m_newest, time); // what comes late still shows that something comes
+    endAt(m_newest);
+    std::vector<AbsenceJudge::Group> dropped;
+    AbsenceJudge::Group& group = m_absence->came(values.group, m_newest, dropped);
+    Judged& judged = verdict.judged.emplace();
+    judged.group = groupValues(values.group);
+    if (std::exchange(group.absence, nullptr) != nullptr) {
+        judged.absence = m_newest - group.since;
+        endAbsence(group, m_newest);
+    }
+    group.since = m_newest;
+    for (const AbsenceJudge::Group& one : dropped) {
+        if (one.absence != nullptr) {
+            endAbsence(one, m_newest);
+        }
+    }
+}
+
+void Replay::endAbsence(const AbsenceJudge::Group& group, std::int64_t time) {
+    EndedEpisode& ended = m_ended.emplace_back();
+    ended.episode.first = group.since;
+    ended.episode.last = time;
+    ended.group = group.key;
+}
+
+void Replay::beginAt(std::int64_t time) {
+    m_newest = time;
+    if (m_rules.groupBy.empty()) {
+        std::vector<AbsenceJudge::Group> dropped;
+        m_absence->expect({.key = "", .seen = time, .since = time}, dropped);
+    }
+}
+
+void Replay::endAt(std::int64_t time) {
+    while (AbsenceJudge::Group* const group = m_absence->takeDue(time)) {
+        group->absence = std::make_shared<EpisodeId>();
+        m_raised.push_back({group->since, group->since + m_rules.absent});
+    }
+    m_newest = std::max(m_newest, time);
+}
+
+std::vector<FoundAbsence> Replay::takeRaised() {
+    return std::exchange(m_raised, {});
+}
+
+std::optional<std::int64_t> Replay::timeOf(const std::string& stamp) {
+    return localTime(stamp.c_str());
+}
+
 Replay::Values Replay::valuesOf(const zrm_rmlogent_data_t& row) {
     const char* const bytes = reinterpret_cast<const char*>(&row);
     m_values->read(layout(), bytes, LogEntry::ofThisThread);
@@ -181,6 +239,12 @@ std::vector<EndedEpisode> Replay::takeEnded() {
 }
 
 std::vector<EndedEpisode> Replay::takeLasting() {
+    if (m_absence) {
+        for (const AbsenceJudge::Group& group : m_absence->absent()) {
+            endAbsence(group, m_newest);
+        }
+        return takeEnded();
+    }
     m_judge->takeOver([](const Episode&) { return true; }, m_ended);
     return takeEnded();
 }

@@ -3,6 +3,7 @@
 
 #include "host/config/HostConfig.h"
 #include "host/framework/RowLayout.h"
+#include "host/situations/AbsenceJudge.h"
 #include "host/situations/EpisodeJudge.h"
 #include "host/situations/JudgedValues.h"
 
@@ -30,6 +31,15 @@ struct JudgedEntry {
     bool hasEpisode = false;
     std::int64_t first = 0; ///< seconds since 1970
     std::uint64_t count = 0;
+    /// Of a situation with `absent`: for how long entries had been missing when this one ended
+    /// that, in seconds.
+    std::optional<std::int64_t> absence = std::nullopt;
+};
+
+/// An absence that would have raised an event. Times are in seconds since 1970.
+struct FoundAbsence {
+    std::int64_t seen = 0;   ///< the last entry before it, or when waiting began
+    std::int64_t raised = 0; ///< the time of the event
 };
 
 /// By what a matching entry is judged, beside its time.
@@ -67,8 +77,10 @@ public:
     /// The columns of the rows.
     const RowLayout& layout() const { return *m_layout; }
 
-    /// Whether the host judges groups, episodes or pauses.
-    bool isJudged() const noexcept { return m_judge.has_value(); }
+    /// Whether the host judges groups, episodes, pauses or absences.
+    bool isJudged() const noexcept { return m_values.has_value(); }
+    /// Whether it is the absence of entries that raises events.
+    bool isOfAbsence() const noexcept { return m_rules.absent > 0; }
 
     /// Both thresholds are in force.
     bool hasThresholds() const noexcept;
@@ -92,7 +104,20 @@ public:
     std::vector<EndedEpisode> takeEnded();
     /// Those that have not. Nothing is judged after it.
     std::vector<EndedEpisode> takeLasting();
-    std::uint64_t droppedGroups() const noexcept { return m_judge->droppedGroups(); }
+    std::uint64_t droppedGroups() const noexcept {
+        return m_absence ? m_absence->droppedGroups() : m_judge->droppedGroups();
+    }
+
+    // With isOfAbsence(). Times are in seconds since 1970.
+
+    /// Entries are expected from this time on. Before anything is judged.
+    void beginAt(std::int64_t time);
+    /// Nothing more has come until this time.
+    void endAt(std::int64_t time);
+    /// What was raised since the last call, oldest first.
+    std::vector<FoundAbsence> takeRaised();
+    /// A 16-character local time; none if it is not a time.
+    static std::optional<std::int64_t> timeOf(const std::string& stamp);
     std::vector<GroupValue> groupValues(std::string_view key) const;
 
 private:
@@ -100,10 +125,15 @@ private:
     struct Surroundings;
     Verdict take();
     void judgeGroup(std::int64_t time, const Values& values, Verdict& verdict);
+    void judgeAbsence(std::int64_t time, const Values& values, Verdict& verdict);
+    void endAbsence(const AbsenceJudge::Group& group, std::int64_t time);
 
     const JudgementConfig m_rules;
     std::optional<JudgedValues> m_values; ///< only if the host judges
     std::optional<EpisodeJudge> m_judge;
+    std::optional<AbsenceJudge> m_absence; ///< in its place
+    std::int64_t m_newest = 0;             ///< of the entries that it has judged
+    std::vector<FoundAbsence> m_raised;
     std::vector<EndedEpisode> m_ended;
     std::unique_ptr<Surroundings> m_surroundings;
     std::unique_ptr<Request> m_request;

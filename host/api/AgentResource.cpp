@@ -8,13 +8,13 @@
 #include "host/delivery/Delivery.h"
 #include "host/diagnose/LogWarnings.h"
 #include "host/diagnose/LogWatch.h"
+#include "host/events/AgentNode.h"
 #include "host/framework/TraceControl.h"
 #include "host/history/HistoryReader.h"
 #include "host/http/JsonFields.h"
 #include "host/http/QueryFields.h"
 #include "host/http/RequestRefused.h"
 #include "host/http/Router.h"
-#include "host/silences/AgentNode.h"
 
 #include <chrono>
 #include <string>

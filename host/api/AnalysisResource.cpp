@@ -217,15 +217,19 @@ AnalysisResource::Explained AnalysisResource::explainEvent(JsonFields& fields) {
     Subject wanted = subject(fields, event->situation);
     fields.refuseUnknown();
     const bool isOwn = isNamed && wanted.situation.name == event->situation;
+    const bool isOfAbsence = wanted.situation.judgement.absent > 0;
     const TraceSilence silence;
     Explainer explainer(std::move(wanted.situation), wanted.isStopped, m_entries);
     requireOpen(explainer.isOpen());
     Explainer::EventEntry entry{id, isOwn, {}};
     if (!StoredRow::fill(entry.row, explainer.layout(), event->json)) {
-        throw RequestRefused(409,
-                             "no entry raised this event, so there is none to explain: ask for the "
-                             "event that raised the episode",
-                             "event");
+        throw RequestRefused(
+            409,
+            isOfAbsence ? "no entry raised this event, but their absence: ask for the last "
+                          "entries of the log"
+                        : "no entry raised this event, so there is none to explain: ask "
+                          "for the event that raised the episode",
+            "event");
     }
     entry.text = StoredRow::entryText(event->json);
     entry.fields = StoredRow::entryFields(event->json);

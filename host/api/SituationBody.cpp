@@ -57,6 +57,7 @@ SituationText SituationBody::text(JsonFields& fields, const std::string& name) {
     text.judgement.then = fields.optionalText("then");
     text.judgement.resolveAfter = fields.optionalText("resolve_after");
     text.judgement.cooldown = fields.optionalText("cooldown");
+    text.judgement.absent = fields.optionalText("absent");
     fields.refuseUnknown();
     if (text.log) {
         checkLog(fields, *text.log);

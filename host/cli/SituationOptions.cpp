@@ -118,6 +118,8 @@ void SituationOptions::addTo(CLI::App& command) {
     addMember("resolve_after", m_resolveAfter, "TIME",
               "Raise one event per episode, which ends when nothing has come for this long");
     addMember("cooldown", m_cooldown, "TIME", "Raise at most one event within this time");
+    addMember("absent", m_absent, "TIME",
+              "Raise one event when no such entry has come for this long; the next resolves it");
 }
 
 bool SituationOptions::areGiven() const {

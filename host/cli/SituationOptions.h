@@ -57,6 +57,7 @@ private:
     std::string m_then;
     std::string m_resolveAfter;
     std::string m_cooldown;
+    std::string m_absent;
 };
 
 } // namespace zrm::host

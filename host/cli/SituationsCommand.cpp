@@ -56,6 +56,7 @@ std::string factsOf(const Json& situation, const Terminal& terminal) {
     facts.add("then", JsonText::text(situation, "then"));
     facts.add("resolve after", JsonText::text(situation, "resolve_after"));
     facts.add("cooldown", JsonText::text(situation, "cooldown"));
+    facts.add("absent", JsonText::text(situation, "absent"));
     const std::string context = JsonText::text(situation, "context");
     facts.add("context", context == "0" ? "" : context);
     facts.add("runbook", JsonText::text(situation, "runbook"));

@@ -10,8 +10,8 @@
 namespace zrm::host {
 
 /// What the host decides about the entries that meet a situation's conditions, where `group_by`,
-/// `distinct`, `then`, `resolve_after` or `cooldown` ask for more than the table of entries does.
-/// Durations are in seconds.
+/// `distinct`, `then`, `resolve_after`, `cooldown` or `absent` ask for more than the table of
+/// entries does. Durations are in seconds.
 struct JudgementConfig {
     static constexpr std::size_t usualGroups = 10'000;
 
@@ -27,13 +27,16 @@ struct JudgementConfig {
     std::int64_t resolveAfter = 0;     ///< an episode ends this long after its last entry;
                                        ///< 0: there are no episodes
     std::int64_t cooldown = 0;         ///< of a group after an event; 0: none
+    std::int64_t absent = 0;           ///< an event when no entry has come for so long; 0: never.
+                                       ///< Then there is nothing of the above but groups.
     std::string resolveAfterText = {}; ///< as the operator has written it
     std::string cooldownText = {};
+    std::string absentText = {};
 
     /// Whether the host judges at all.
     bool isUsed() const noexcept {
         return !groupBy.empty() || !distinct.empty() || !then.empty() || resolveAfter > 0 ||
-               cooldown > 0;
+               cooldown > 0 || absent > 0;
     }
     std::string_view thenName() const noexcept {
         return std::string_view(then).substr(0, then.find('='));

@@ -4,6 +4,7 @@
 #include "host/config/EntryNames.h"
 
 #include <algorithm>
+#include <utility>
 
 namespace zrm::host {
 
@@ -81,11 +82,30 @@ void checkThen(const JudgementText& text, const JudgementConfig& rules, const En
         return;
     }
     checkName("then", text.then->substr(0, sign), names, problems);
-    if (rules.frequency == 0 || rules.period == 0) {
+    if (!text.absent && (rules.frequency == 0 || rules.period == 0)) {
         problems.push_back({"has no effect without frequency and period",
                             "add how many entries come before: frequency = \">= 5\" and "
                             "period = \"10m\"",
                             "then"});
+    }
+}
+
+/// What says when entries raise an event says nothing about entries that do not come.
+void checkAbsence(const JudgementText& text, const JudgementConfig& rules, Problems& problems) {
+    if (!text.absent) {
+        return;
+    }
+    for (const auto& [field, isGiven] :
+         {std::pair("frequency", rules.frequency > 0 || rules.period > 0),
+          std::pair("distinct", text.distinct.has_value()),
+          std::pair("then", text.then.has_value()),
+          std::pair("resolve_after", text.resolveAfter.has_value()),
+          std::pair("cooldown", text.cooldown.has_value())}) {
+        if (isGiven) {
+            problems.push_back({"has no effect with absent, which raises one event when no entry "
+                                "has come and resolves it with the next entry",
+                                "leave one of the two out, or write a second situation", field});
+        }
     }
 }
 
@@ -101,6 +121,8 @@ JudgementConfig JudgementRules::check(const JudgementText& text, std::vector<Con
     rules.cooldown = durationOf("cooldown", text.cooldown, problems);
     rules.resolveAfterText = text.resolveAfter.value_or("");
     rules.cooldownText = text.cooldown.value_or("");
+    rules.absent = durationOf("absent", text.absent, problems);
+    rules.absentText = text.absent.value_or("");
     if (rules.isUsed()) {
         std::erase_if(conditions, [&rules](const Condition& condition) {
             const bool isThreshold = isThresholdColumn(condition.column);
@@ -115,14 +137,15 @@ JudgementConfig JudgementRules::check(const JudgementText& text, std::vector<Con
     rules.maxGroups = static_cast<std::size_t>(std::clamp<std::int64_t>(
         text.maxGroups.value_or(JudgementConfig::usualGroups), 1, mostGroups));
     checkThen(text, rules, names, problems);
+    checkAbsence(text, rules, problems);
     if (text.distinct) {
         checkName("distinct", *text.distinct, names, problems);
-        if (rules.frequency == 0 || rules.period == 0) {
+        if (!text.absent && (rules.frequency == 0 || rules.period == 0)) {
             problems.push_back({"has no effect without frequency and period",
                                 "add frequency = \">= 5\" and period = \"60s\"", "distinct"});
         }
     }
-    if (text.resolveAfter && text.cooldown) {
+    if (!text.absent && text.resolveAfter && text.cooldown) {
         problems.push_back({"has no effect with resolve_after, which raises one event per episode",
                             "leave one of the two out", "cooldown"});
     }

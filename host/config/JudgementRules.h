@@ -21,6 +21,7 @@ struct JudgementText {
     std::optional<std::string> then = std::nullopt;
     std::optional<std::string> resolveAfter = std::nullopt;
     std::optional<std::string> cooldown = std::nullopt;
+    std::optional<std::string> absent = std::nullopt;
 };
 
 /// The rules of groups and episodes as operators write them. Stateless.

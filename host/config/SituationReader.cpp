@@ -71,6 +71,7 @@ SituationConfig SituationReader::read(const toml::table& table, const std::strin
     text.judgement.then = fields.text("then");
     text.judgement.resolveAfter = fields.text("resolve_after");
     text.judgement.cooldown = fields.text("cooldown");
+    text.judgement.absent = fields.text("absent");
 
     auto [situation, problems] = SituationValidator::check(text, m_patterns.ofNext());
     bool isNamed = true;

@@ -250,6 +250,10 @@ SituationValidator::Verdict SituationValidator::check(const SituationText& text,
     for (Problem& problem : ofJudgement) {
         problems.push_back({std::move(problem)});
     }
+    if (text.judgement.absent && situation.context > 0) {
+        problems.push_back({{"has no effect with absent, whose events have no entry",
+                             "leave one of the two out", "context"}});
+    }
     return verdict;
 }
 

@@ -1,6 +1,6 @@
 #include "host/delivery/QueueSource.h"
 
-#include "host/silences/AgentNode.h"
+#include "host/events/AgentNode.h"
 #include "host/silences/Silences.h"
 
 #include <utility>

@@ -64,9 +64,11 @@ struct StoredEpisode {
     std::string log;
     std::string node;
     std::vector<GroupValue> group;
-    std::vector<GroupValue> values;   ///< as in EventJudgement
-    std::int64_t raised = 0;          ///< milliseconds since 1970, UTC
-    std::int64_t last = 0;            ///< of a pause: time of its entry, in seconds since 1970
+    std::vector<GroupValue> values; ///< as in EventJudgement
+    std::int64_t raised = 0;        ///< milliseconds since 1970, UTC
+    // Of the event that raised it, in seconds since 1970.
+    std::int64_t first = 0;
+    std::int64_t last = 0;            ///< of a pause: time of its entry
     std::vector<EpisodeShare> shares; ///< of each log; without the episode's id
 };
 

@@ -217,7 +217,7 @@ void PositionBook::makeCurrent(std::shared_ptr<PositionBook> book) {
 }
 
 PositionBook::PositionBook(const PositionValues& stored, bool isKept)
-    : m_isKept(isKept), m_paths(stored.paths) {
+    : m_isKept(isKept), m_paths(stored.paths), m_expected(isKept) {
     for (const PositionValue& value : stored.logs) {
         m_logs.emplace(value.log, std::make_shared<FollowedLog>(value.log, value.position));
     }
@@ -385,6 +385,7 @@ bool PositionBook::isFollowed(std::string_view log) const {
 
 void PositionBook::forgetSaved() {
     m_paths.forgetSaved();
+    m_expected.forgetSaved();
     const std::lock_guard guard(m_mutex);
     for (const auto& [name, log] : m_logs) {
         log->forgetSaved();

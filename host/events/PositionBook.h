@@ -3,6 +3,7 @@
 
 #include "framework/LogPositions.h"
 #include "host/events/Episode.h"
+#include "host/events/ExpectedGroups.h"
 #include "host/events/WatchedPaths.h"
 
 #include <atomic>
@@ -180,6 +181,9 @@ public:
     WatchedPaths& paths() noexcept { return m_paths; }
     const WatchedPaths& paths() const noexcept { return m_paths; }
 
+    /// The groups from which entries are expected.
+    ExpectedGroups& expected() noexcept { return m_expected; }
+
     /// The queue that takes events, from its creation on; null before and after. It outlives the
     /// logs' threads.
     void setQueue(EventQueue* queue);
@@ -208,6 +212,7 @@ public:
 private:
     const bool m_isKept;
     WatchedPaths m_paths;
+    ExpectedGroups m_expected;
     std::atomic<EventQueue*> m_queue{nullptr};
     std::atomic<bool> m_isClosed{false};
     mutable std::mutex m_mutex; ///< guards the maps

@@ -135,9 +135,10 @@ std::vector<StoredEpisode> EpisodeTable::open(Database& database) {
     Statement shares(database,
                      "SELECT log, count, first, last FROM episode_logs WHERE episode = ?");
     Statement rows(
-        database, "SELECT id, state = 'pause', situation, severity, definition, log,"
-                  " node, groups, raised, last, text_values FROM episodes WHERE state <> 'resolved'"
-                  " ORDER BY id");
+        database,
+        "SELECT id, state = 'pause', situation, severity, definition, log,"
+        " node, groups, raised, last, text_values, first FROM episodes WHERE state <> 'resolved'"
+        " ORDER BY id");
     while (rows.step()) {
         StoredEpisode& episode = episodes.emplace_back();
         episode.id = static_cast<std::uint64_t>(rows.integer(0));
@@ -151,6 +152,7 @@ std::vector<StoredEpisode> EpisodeTable::open(Database& database) {
         episode.raised = rows.integer(8);
         episode.last = rows.integer(9);
         episode.values = valuesOf(rows.text(10));
+        episode.first = rows.integer(11);
         shares.bind(1, episode.id);
         while (shares.step()) {
             episode.shares.push_back({nullptr, std::string(shares.text(0)),

@@ -126,6 +126,7 @@ History::History(const HistoryConfig& config, std::unique_ptr<HistoryDirectory> 
                m_silences) {
     m_silences.storeWith([this](const Silence& silence) { return keep(silence); });
     m_positions->setEpisodes(m_file.openEpisodes());
+    m_positions->expected().load(m_file.expected());
 }
 
 History::~History() {

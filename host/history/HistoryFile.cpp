@@ -51,8 +51,9 @@ std::optional<std::int64_t> timeOfOldest(const std::vector<EventTable::Moment>& 
 
 HistoryFile::HistoryFile(const std::string& path)
     : m_database(path, Database::Use::WRITE), m_labels(prepare(m_database)), m_events(m_database),
-      m_cursors(m_database), m_positions(m_database), m_episodes(m_database), m_rates(m_database),
-      m_rhythms(m_database), m_silences(m_database), m_files(path), m_oldest(m_events.oldest()),
+      m_cursors(m_database), m_positions(m_database), m_episodes(m_database),
+      m_expected(m_database), m_rates(m_database), m_rhythms(m_database), m_silences(m_database),
+      m_files(path), m_oldest(m_events.oldest()),
       m_newest(std::max(m_events.newest(), static_cast<std::uint64_t>(m_database.number(
                                                "SELECT max(event) FROM origin")))) {
     m_labels.removeUnused();
@@ -163,6 +164,10 @@ std::vector<std::string> HistoryFile::removeOldPositions(std::int64_t time) {
     std::vector<std::string> logs;
     inTransaction([&] { logs = m_positions.removeNotedBefore(time); });
     return logs;
+}
+
+void HistoryFile::keepExpected(const ExpectedValues& values) {
+    inTransaction([&] { m_expected.keep(values); });
 }
 
 void HistoryFile::keepSilences(const std::vector<Silence>& silences) {

@@ -7,6 +7,7 @@
 #include "host/history/EpisodeTable.h"
 #include "host/history/EventBatch.h"
 #include "host/history/EventTable.h"
+#include "host/history/ExpectedTable.h"
 #include "host/history/LabelTable.h"
 #include "host/history/OpenFiles.h"
 #include "host/history/PositionTable.h"
@@ -67,6 +68,10 @@ public:
     /// returns their names. Also removes the paths last watched before it.
     std::vector<std::string> removeOldPositions(std::int64_t time);
 
+    /// The groups from which entries are expected.
+    void keepExpected(const ExpectedValues& values);
+    ExpectedValues expected() { return ExpectedTable::read(m_database); }
+
     /// Stores silences. One that is there keeps its count of events, which store adds to.
     void keepSilences(const std::vector<Silence>& silences);
     /// The silence of an event; 0: none, or there is no such event.
@@ -110,6 +115,7 @@ private:
     CursorTable m_cursors;
     PositionTable m_positions;
     EpisodeTable m_episodes;
+    ExpectedTable m_expected;
     RateTable m_rates;
     RhythmTable m_rhythms;
     SilenceTable m_silences;

@@ -84,6 +84,14 @@ void HistoryWriter::storePositions(bool isLast) {
     }
 }
 
+void HistoryWriter::storeExpected(bool isLast) {
+    ExpectedGroups& expected = m_positions.expected();
+    if (const ExpectedValues values = expected.unsaved(isLast); !values.isEmpty()) {
+        m_file->keepExpected(values);
+        expected.saved(values);
+    }
+}
+
 /// The positions of logs that are followed stay new; the others expire as events do.
 void HistoryWriter::tendPositions() {
     m_positions.renewFollowed();
@@ -116,6 +124,7 @@ void HistoryWriter::housekeep(bool idle) {
         } else {
             storePositions();
         }
+        storeExpected();
         if (m_silences.areTooManyExpired()) {
             tendSilences();
         }

@@ -2,8 +2,8 @@
 
 #include "base/TraceScope.h"
 #include "host/base/Say.h"
+#include "host/events/AgentNode.h"
 #include "host/history/Schema.h"
-#include "host/silences/AgentNode.h"
 
 #include <algorithm>
 #include <cinttypes>
@@ -300,6 +300,7 @@ void HistoryWriter::storeRest() {
     const bool stored = attempt([&] {
         storeCursors();
         storePositions(true);
+        storeExpected(true);
         storeEntries();
     });
     if (!stored) {

@@ -91,6 +91,7 @@ private:
     void storeCursors();
     void tendCursors();
     void storePositions(bool isLast = false);
+    void storeExpected(bool isLast = false);
     void tendPositions();
     void storeEntries();
     void tendSilences();

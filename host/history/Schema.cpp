@@ -10,7 +10,7 @@ namespace {
 
 /// Each entry upgrades the previous version to the version of its position in the table. Published
 /// entries never change; a new version is a new entry.
-constexpr std::array<const char*, 13> steps = {
+constexpr std::array<const char*, 14> steps = {
     // 1: events. Labels intern what many events share; one narrow index serves all filters on them,
     // and the marks narrow a time window, so that storing an event costs one row and one index
     // entry.
@@ -87,6 +87,13 @@ constexpr std::array<const char*, 13> steps = {
     "ALTER TABLE episodes ADD COLUMN note TEXT NOT NULL DEFAULT '';",
     // 13: what the text of an episode's end says of the entry that raised it.
     "ALTER TABLE episodes ADD COLUMN text_values TEXT NOT NULL DEFAULT '{}';",
+    // 14: the groups from which situations expect entries, when each had its last one, by the
+    // watched time (milliseconds in which an agent ran) and by the clock (seconds since 1970), and
+    // the watched time.
+    "CREATE TABLE expected_groups (situation TEXT NOT NULL, key BLOB NOT NULL,"
+    " definition INTEGER NOT NULL, seen INTEGER NOT NULL, since INTEGER NOT NULL,"
+    " log TEXT NOT NULL, node TEXT NOT NULL, PRIMARY KEY (situation, key)) WITHOUT ROWID;"
+    "CREATE TABLE watched_time (id INTEGER PRIMARY KEY, milliseconds INTEGER NOT NULL);",
 };
 
 } // namespace

@@ -95,6 +95,9 @@ std::int64_t LiveJudge::definitionOf(const SituationConfig& config) {
     if (!rules.then.empty()) {
         add("then " + rules.then);
     }
+    if (rules.absent > 0) {
+        add("absent " + std::to_string(rules.absent));
+    }
     return static_cast<std::int64_t>(XXH3_64bits(text.data(), text.size()));
 }
 
@@ -247,19 +250,20 @@ bool LiveJudge::isOver(Episode& episode, std::int64_t now, std::int64_t judgedUn
                         [](const auto& share) { return share->isNoted.load(); });
 }
 
-void LiveJudge::tick(std::int64_t now) {
+unsigned LiveJudge::tick(std::int64_t now) {
     const std::lock_guard guard(m_mutex);
     noteShares();
     const bool isDue = m_judge.episodes() > 0 &&
                        (now >= m_nextLook ||
                         m_judge.earliestLast() <= now / second - m_config.judgement.resolveAfter);
     if (!isDue) {
-        return;
+        return 0;
     }
     m_nextLook = now + longestLook;
     const std::int64_t judgedUntil = PositionBook::current()->judgedUntil(m_config.log);
     m_judge.takeOver([&](Episode& episode) { return isOver(episode, now, judgedUntil); }, m_ended);
     pushResolved();
+    return 0; // what it has raised came with entries
 }
 
 /// Hands over what logs without positions have added to episodes.

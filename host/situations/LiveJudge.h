@@ -6,6 +6,7 @@
 #include "host/framework/RowLayout.h"
 #include "host/situations/EpisodeJudge.h"
 #include "host/situations/JudgedValues.h"
+#include "host/situations/SituationJudge.h"
 #include "host/situations/TextRenderer.h"
 
 #include <cstddef>
@@ -19,39 +20,19 @@
 
 namespace zrm::host {
 
-/// How many groups and episodes a situation has now.
-struct JudgeCounts {
-    std::size_t episodes = 0; ///< that last
-    std::size_t groups = 0;
-    std::uint64_t droppedGroups = 0; ///< that made room for others since the situation was opened
-};
-
-/// Judges the rows of one situation while the agent runs, and raises and resolves its events. Any
-/// thread; rows come on the threads of the logs.
-class LiveJudge {
+/// Judges the groups and episodes of one situation while the agent runs.
+class LiveJudge : public SituationJudge {
 public:
     /// Continues with the episodes that an earlier run has left. The queue outlives the object.
     LiveJudge(const SituationConfig& config, std::shared_ptr<const SituationLabel> label,
               EventQueue& queue);
-    LiveJudge(const LiveJudge&) = delete;
-    LiveJudge& operator=(const LiveJudge&) = delete;
 
-    /// Judges a row that meets the conditions. Returns the number of events that it has raised;
-    /// none when the queue is closed.
-    std::optional<unsigned> judge(const RowLayout& layout, const char* row);
-
-    /// Counts a row that an earlier run has judged.
-    void recount(const RowLayout& layout, const char* row);
-    /// For how long before a log's position entries are counted again, in seconds.
-    std::int64_t earlierPeriod() const noexcept { return m_config.judgement.period; }
-
-    /// Resolves the episodes that are over at this time: milliseconds since 1970, UTC.
-    void tick(std::int64_t now);
-
-    /// Resolves every episode, since the situation ends.
-    void resolveAll(const std::string& reason);
-
-    JudgeCounts counts() const;
+    std::optional<unsigned> judge(const RowLayout& layout, const char* row) override;
+    void recount(const RowLayout& layout, const char* row) override;
+    std::int64_t earlierPeriod() const noexcept override { return m_config.judgement.period; }
+    unsigned tick(std::int64_t now) override;
+    void resolveAll(const std::string& reason) override;
+    JudgeCounts counts() const override;
 
     /// A hash of what decides when episodes begin and end.
     static std::int64_t definitionOf(const SituationConfig& config);

@@ -7,6 +7,8 @@
 #include "host/base/TimeText.h"
 #include "host/events/RowText.h"
 #include "host/framework/Status.h"
+#include "host/situations/LiveAbsence.h"
+#include "host/situations/LiveJudge.h"
 
 #include <algorithm>
 #include <chrono>
@@ -61,14 +63,26 @@ std::shared_ptr<const SituationLabel> labelOf(const SituationConfig& config) {
     return std::make_shared<const SituationLabel>(std::move(label));
 }
 
+/// Null if the table's thresholds decide.
+std::unique_ptr<SituationJudge> judgeOf(const SituationConfig& config,
+                                        const std::shared_ptr<const SituationLabel>& label,
+                                        EventQueue& queue) {
+    if (config.judgement.absent > 0) {
+        return std::make_unique<LiveAbsence>(config, label, queue);
+    }
+    if (!config.judgement.isUsed()) {
+        return nullptr;
+    }
+    return std::make_unique<LiveJudge>(config, label, queue);
+}
+
 } // namespace
 
 Situation::Situation(SituationConfig config, TableManager& entries, EventQueue& queue,
                      std::shared_ptr<SituationCounts> counts)
     : m_config(std::move(config)), m_label(labelOf(m_config)), m_queue(queue),
       m_counts(std::move(counts)), m_context(m_config.log, m_config.context), m_texts(m_config),
-      m_judge(m_config.judgement.isUsed() ? std::make_unique<LiveJudge>(m_config, m_label, queue)
-                                          : nullptr),
+      m_judge(judgeOf(m_config, m_label, queue)),
       m_request(std::in_place, entries, detailOf(m_config), static_cast<RowReceiver&>(*this),
                 &m_counts->requests) {
     TraceScope trace(anchor);
@@ -157,8 +171,9 @@ void Situation::receiveEarlier(const ctreq& request, const char* row) {
 }
 
 void Situation::tick(std::int64_t now) {
-    if (m_judge != nullptr) {
-        m_judge->tick(now);
+    // Rows of a situation that raises something here raise nothing, so that nobody else counts.
+    if (const unsigned raised = m_judge == nullptr ? 0 : m_judge->tick(now); raised > 0) {
+        m_counts->countRaised(raised, now);
     }
 }
 

@@ -7,7 +7,7 @@
 #include "host/framework/Request.h"
 #include "host/framework/RowLayout.h"
 #include "host/situations/EntryValue.h"
-#include "host/situations/LiveJudge.h"
+#include "host/situations/SituationJudge.h"
 #include "host/situations/TextRenderer.h"
 
 #include <atomic>
@@ -68,11 +68,12 @@ public:
     /// No more rows come. Waits until no other thread works on one. By the thread that opened it.
     void close() { m_request.reset(); }
 
-    /// Resolves the episodes that are over at this time: milliseconds since 1970, UTC. Any thread.
+    /// Raises and resolves what is due at this time: milliseconds since 1970, UTC. One thread at a
+    /// time.
     void tick(std::int64_t now);
     /// Resolves every episode. Any thread.
     void resolveAll(const std::string& reason);
-    /// Whether the situation has groups, episodes or pauses.
+    /// Whether the situation has groups, episodes, pauses or absences.
     bool isJudged() const noexcept { return m_judge != nullptr; }
     JudgeCounts judgeCounts() const { return isJudged() ? m_judge->counts() : JudgeCounts(); }
 
@@ -94,7 +95,7 @@ private:
     const TextRenderer m_texts;
     // Used under the table manager's lock.
     EntryReading m_reading;
-    const std::unique_ptr<LiveJudge> m_judge; ///< null: the table's thresholds decide
+    const std::unique_ptr<SituationJudge> m_judge; ///< null: the table's thresholds decide
     std::once_flag m_isLaidOut;
     std::optional<RowLayout> m_layout; ///< of the rows
     std::optional<Request> m_request;  ///< last member: rows may arrive during its construction

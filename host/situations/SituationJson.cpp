@@ -47,7 +47,8 @@ Json SituationJson::definition(const SituationConfig& situation) {
     for (const auto& [key, value] :
          {std::pair("distinct", &judgement.distinct), std::pair("then", &judgement.then),
           std::pair("resolve_after", &judgement.resolveAfterText),
-          std::pair("cooldown", &judgement.cooldownText)}) {
+          std::pair("cooldown", &judgement.cooldownText),
+          std::pair("absent", &judgement.absentText)}) {
         if (!value->empty()) {
             object[key] = *value;
         }

@@ -3,6 +3,7 @@
 #include "base/TraceScope.h"
 #include "host/base/TimeText.h"
 #include "host/events/PositionBook.h"
+#include "host/situations/LiveJudge.h"
 
 #include <utility>
 
@@ -123,7 +124,7 @@ void SituationRunner::work() {
     }
 }
 
-/// Resolves what is over.
+/// Raises and resolves what is due.
 void SituationRunner::tick() {
     const std::int64_t now = WallClock::now();
     for (const auto& [key, slot] : m_slots) {
@@ -135,6 +136,7 @@ void SituationRunner::tick() {
         for (const StoredEpisode& episode : PositionBook::current()->takeEpisodes(std::nullopt)) {
             LiveJudge::resolve(m_queue, episode, wasRemoved);
         }
+        PositionBook::current()->expected().forgetLeft();
         m_hasLeftEpisodes = false;
     }
 }

@@ -96,6 +96,7 @@ SituationStore::Made madeFrom(const json& object, PatternBudget& patterns) {
     text.judgement.then = optionalText(object, "then");
     text.judgement.resolveAfter = optionalText(object, "resolve_after");
     text.judgement.cooldown = optionalText(object, "cooldown");
+    text.judgement.absent = optionalText(object, "absent");
     SituationStore::Made made;
     made.isStopped = object.at("stopped").get<bool>();
     auto [config, problems] = SituationValidator::check(text, patterns.ofNext());

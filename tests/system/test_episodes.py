@@ -317,6 +317,8 @@ def test_a_history_from_before_episodes_goes_on(agent):
         history.execute("DROP TABLE episodes")
         history.execute("DROP TABLE episode_logs")
         history.execute("DROP TABLE rhythms")
+        history.execute("DROP TABLE expected_groups")
+        history.execute("DROP TABLE watched_time")
         history.execute("PRAGMA user_version = 9")
     bruteforce(agent)
     agent.start()

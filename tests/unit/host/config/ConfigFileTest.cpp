@@ -138,7 +138,7 @@ keep_days = 30
             "zrm.toml:9: sink.rotate: unknown key; the keys here are type, name, path",
             "zrm.toml:12: situation.threshold: unknown key; the keys here are name, text, "
             "severity, log, when, frequency, period, context, runbook, labels, group_by, "
-            "max_groups, distinct, then, resolve_after, cooldown",
+            "max_groups, distinct, then, resolve_after, cooldown, absent",
             "zrm.toml:13: histories: unknown key; the keys here are state_directory, agent, "
             "http, history, formats, rules, sink, log, situation, use"));
 }

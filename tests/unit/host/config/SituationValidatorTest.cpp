@@ -143,6 +143,34 @@ TEST(SituationValidator, RefusesRulesOfGroupsAndEpisodesThatHaveNoEffect) {
     EXPECT_THAT(fieldsWith({.resolveAfter = "1m", .cooldown = "1m"}), ElementsAre("cooldown"));
 }
 
+TEST(SituationValidator, AbsenceIsADurationAndGroupsAreItsOnlyCompany) {
+    const auto fieldsWith = [](const JudgementText& judgement, bool hasFrequency = false) {
+        SituationText text = named("a");
+        text.judgement = judgement;
+        if (hasFrequency) {
+            text.frequency = ">= 5";
+            text.period = "60s";
+        }
+        return fieldsOf(text);
+    };
+    EXPECT_THAT(fieldsWith({.absent = "1h"}), IsEmpty());
+    EXPECT_THAT(fieldsWith({.groupBy = {"ENTRYSYS"}, .maxGroups = 5, .absent = "1h"}), IsEmpty());
+    EXPECT_THAT(fieldsWith({.absent = "often"}), ElementsAre("absent"));
+    EXPECT_THAT(fieldsWith({.absent = "0s"}), ElementsAre("absent"));
+    EXPECT_THAT(fieldsWith({.absent = "1h"}, true), ElementsAre("frequency"));
+    EXPECT_THAT(fieldsWith({.distinct = "ENTRYSYS", .absent = "1h"}), ElementsAre("distinct"));
+    EXPECT_THAT(fieldsWith({.then = "ENTRYSYS=a", .absent = "1h"}), ElementsAre("then"));
+    EXPECT_THAT(fieldsWith({.resolveAfter = "1m", .cooldown = "1m", .absent = "1h"}),
+                ElementsAre("resolve_after", "cooldown"));
+    SituationText text = named("a");
+    text.judgement.absent = "1h";
+    text.context = 3;
+    EXPECT_THAT(fieldsOf(text), ElementsAre("context"));
+    text.context = 0;
+    text.when = {"FREQTHRESH >= 5", "PERIODTHRS = 60"};
+    EXPECT_THAT(fieldsOf(text), ElementsAre("frequency"));
+}
+
 TEST(SituationValidator, OnlyANameIsRequired) {
     const auto [situation, problems] = SituationValidator::check(named("a"));
     EXPECT_THAT(problems, IsEmpty());

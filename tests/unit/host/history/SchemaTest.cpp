@@ -76,7 +76,8 @@ TEST_F(SchemaTest, CreatesTheTablesOfANewFile) {
     EXPECT_EQ(versionOf(database), Schema::version);
     for (const char* const table :
          {"events", "labels", "logs", "marks", "origin", "cursors", "minutes", "rates",
-          "log_positions", "watched_paths", "silences", "episodes", "episode_logs", "rhythms"}) {
+          "log_positions", "watched_paths", "silences", "episodes", "episode_logs", "rhythms",
+          "expected_groups", "watched_time"}) {
         EXPECT_TRUE(hasTable(database, table)) << table;
     }
     Schema::bringUpToDate(database);
