@@ -1,5 +1,6 @@
 #include "host/config/SituationValidator.h"
 
+#include "host/config/BuiltInSituations.h"
 #include "host/config/ConditionParser.h"
 #include "host/config/EventExtras.h"
 #include "host/config/TextTemplate.h"
@@ -43,6 +44,14 @@ void checkName(const std::optional<std::string>& name, Problems& problems) {
                              "write 1 to " + inBytes(SituationValidator::longestName) +
                                  " without control characters, and not . or ..",
                              "name"}});
+    }
+}
+
+/// Their episodes and silences would be confused.
+void checkNotBuiltIn(const std::string& name, Problems& problems) {
+    if (BuiltInSituations::contain(name)) {
+        problems.push_back({{"'" + name + "' is the name of a situation of the agent itself",
+                             "choose another name", "name"}});
     }
 }
 
@@ -230,6 +239,7 @@ SituationValidator::Verdict SituationValidator::check(const SituationText& text,
     situation.frequency = text.frequency;
     situation.period = text.period;
     checkName(text.name, problems);
+    checkNotBuiltIn(situation.name, problems);
     checkText(situation.text, problems);
     checkSeverity(situation.severity, problems);
     if (text.log) {

@@ -1,6 +1,7 @@
 #include "host/diagnose/LogStates.h"
 
 #include "base/TraceScope.h"
+#include "host/config/BuiltInSituations.h"
 #include "logs/FollowSettings.h"
 
 #include <algorithm>
@@ -61,6 +62,12 @@ int percent(std::int64_t part, std::int64_t whole) {
 
 } // namespace
 
+const char* LogState::situationOf(Kind kind) noexcept {
+    return kind == Kind::QUIET  ? BuiltInSituations::quiet
+           : kind == Kind::DEAD ? BuiltInSituations::dead
+                                : BuiltInSituations::unparsed;
+}
+
 LogStates::LogStates(std::map<std::string, std::vector<SilentHour>> rhythms)
     : m_kept(std::move(rhythms)) {}
 
@@ -70,6 +77,7 @@ void LogStates::judge(std::vector<LogLedgerView>& logs, Clock::time_point now, s
         watched.isSeen = false;
     }
     const std::int64_t local = localTime(wall);
+    m_states.clear();
     for (LogLedgerView& log : logs) {
         if (log.follow && log.settings) {
             judge(log, now, local);
@@ -109,18 +117,33 @@ void LogStates::judge(LogLedgerView& log, Clock::time_point now, std::int64_t lo
     judgeFile(log, watched, now);
 }
 
+/// Where the operator has not asked for it, nobody hears of it.
+void LogStates::addState(const LogLedgerView& log, LogState::Kind kind, std::optional<bool> holds,
+                         seconds since, const std::string& text) {
+    if (log.settings->quiet) {
+        m_states.push_back({log.log, kind, holds, since, text});
+    }
+}
+
 void LogStates::judgeFile(LogLedgerView& log, Watched& watched, Clock::time_point now) {
     if (!isWithoutFile(*log.follow)) {
         watched.deadSince.reset();
+        addState(log, LogState::Kind::DEAD, false);
         return;
     }
     if (!watched.deadSince) {
         watched.deadSince = now;
     }
     if (now - *watched.deadSince < longestAbsence) {
+        addState(log, LogState::Kind::DEAD, std::nullopt);
         return;
     }
     log.health = LogHealth::dead;
+    addState(
+        log, LogState::Kind::DEAD, true, since(*watched.deadSince, now),
+        "The log has no file that can be read: " +
+            (log.follow->problem.empty() ? "it is " + log.follow->state : log.follow->problem) +
+            '.');
     if (log.settings->quiet && log.follow->state == "missing") {
         log.warnings.push_back(
             {"dead", 0, "No file has had this log's name for a while. The agent waits for one."});
@@ -141,11 +164,15 @@ void LogStates::judgeLines(LogLedgerView& log, Watched& watched, Clock::time_poi
              percent(watched.windowRows, watched.windowLines) >= healthyPercent);
         watched.isUnparsed = wasHealthy && share < unparsedPercent;
         watched.unparsedPercent = share;
+        watched.isParsed = share >= unparsedPercent;
         watched.windowBegin = now;
         watched.windowLines = log.lines;
         watched.windowRows = log.rows;
     }
-    if (watched.isUnparsed) {
+    if (!watched.isUnparsed) {
+        addState(log, LogState::Kind::UNPARSED,
+                 watched.isParsed ? std::optional(false) : std::nullopt);
+    } else {
         log.health = LogHealth::unparsed;
         log.warnings.push_back(
             {"unparsed", 0,
@@ -153,6 +180,7 @@ void LogStates::judgeLines(LogLedgerView& log, Watched& watched, Clock::time_poi
                  "% of the latest lines match the log's format, and most lines before them did. "
                  "What writes the log may have changed its format; 'zrmctl logs " +
                  log.log + "' shows lines that do not match."});
+        addState(log, LogState::Kind::UNPARSED, true, parsedWindow, log.warnings.back().text);
     }
 }
 
@@ -172,9 +200,12 @@ void LogStates::judgeSilence(LogLedgerView& log, Watched& watched, Clock::time_p
     const seconds silence = since(watched.silentSince, now);
     const std::optional<seconds> limit =
         rule.isLearned ? watched.rhythm.limitAt(local) : rule.after;
-    if (!limit) {
-        log.health = LogHealth::learning;
-    } else if (silence >= *limit) {
+    // Without an entry in this run, the silence of an earlier one may go on.
+    const auto isOver = log.lastEntry ? std::optional(false) : std::nullopt;
+    if (!limit || silence < *limit) {
+        log.health = limit ? log.health : LogHealth::learning;
+        addState(log, LogState::Kind::QUIET, isOver);
+    } else {
         log.health = LogHealth::quiet;
         log.warnings.push_back(
             {"quiet", 0,
@@ -183,6 +214,7 @@ void LogStates::judgeSilence(LogLedgerView& log, Watched& watched, Clock::time_p
                       ? "At this time of the week it is quiet after " + duration(*limit) +
                             ", by the weeks before."
                       : "The configuration expects one every " + duration(*limit) + '.')});
+        addState(log, LogState::Kind::QUIET, true, silence, log.warnings.back().text);
     }
 }
 

@@ -5,6 +5,7 @@
 #include "host/events/LogRhythm.h"
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <map>
 #include <optional>
@@ -12,6 +13,20 @@
 #include <vector>
 
 namespace zrm::host {
+
+/// What is known of one state of a log whose table has `quiet`.
+struct LogState {
+    enum class Kind : unsigned char { QUIET, DEAD, UNPARSED };
+    static constexpr std::size_t kinds = 3; ///< how many there are
+    /// The name of the situation that it raises.
+    static const char* situationOf(Kind kind) noexcept;
+
+    std::string log; ///< full path, UTF-8
+    Kind kind;
+    std::optional<bool> holds;     ///< none: this run cannot say yet
+    std::chrono::seconds since{0}; ///< for how long it has held
+    std::string text = {};         ///< what is the matter, if it holds
+};
 
 /// Watches how the ledgers of followed logs move: which log is quiet though it should have entries,
 /// whose lines no longer fit their format, and which has had no file for a while. Time passes by
@@ -35,6 +50,9 @@ public:
     /// be called every few seconds. `wall` is in milliseconds since 1970.
     void judge(std::vector<LogLedgerView>& logs, Clock::time_point now, std::int64_t wall);
 
+    /// The states of the logs whose tables have `quiet`, as judged last.
+    const std::vector<LogState>& states() const noexcept { return m_states; }
+
     /// What was learned since the last call, to be kept.
     std::vector<LogSilence> takeLearned();
 
@@ -48,19 +66,23 @@ private:
         std::int64_t windowLines = 0; ///< of the ledger when the window began
         std::int64_t windowRows = 0;
         bool isUnparsed = false;
+        bool isParsed = false; ///< most of the latest lines
         int unparsedPercent = 0;
         bool isSeen = true; ///< in this call
     };
 
     void judge(LogLedgerView& log, Clock::time_point now, std::int64_t local);
-    static void judgeFile(LogLedgerView& log, Watched& watched, Clock::time_point now);
-    static void judgeLines(LogLedgerView& log, Watched& watched, Clock::time_point now);
-    static void judgeSilence(LogLedgerView& log, Watched& watched, Clock::time_point now,
-                             std::int64_t local);
+    void judgeFile(LogLedgerView& log, Watched& watched, Clock::time_point now);
+    void judgeLines(LogLedgerView& log, Watched& watched, Clock::time_point now);
+    void judgeSilence(LogLedgerView& log, Watched& watched, Clock::time_point now,
+                      std::int64_t local);
+    void addState(const LogLedgerView& log, LogState::Kind kind, std::optional<bool> holds,
+                  std::chrono::seconds since = {}, const std::string& text = "");
     Watched& watched(const LogLedgerView& log, Clock::time_point now);
 
     std::map<std::string, std::vector<SilentHour>> m_kept; ///< of logs not seen yet
     std::map<std::string, Watched> m_logs;
+    std::vector<LogState> m_states;
 };
 
 } // namespace zrm::host

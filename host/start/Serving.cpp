@@ -96,6 +96,7 @@ std::unique_ptr<Serving> Serving::begin(const HostConfig& config, TableManager& 
 Serving::Serving(const HostConfig& config, TableManager& entries, const ctreq& request,
                  const RowLayout& layout, Watchdog& watchdog, OpenedHistory history)
     : m_watchdog(watchdog), m_delivery(config, layout, request.rowSize, std::move(history)),
+      m_stateEvents(m_delivery.queue(), Clock::now()),
       m_situations(entries, m_delivery.queue(), config.stateDirectory + "/situations.json"),
       m_http(m_router) {
     if (History* const history = m_delivery.history()) {
@@ -116,6 +117,7 @@ void Serving::tick() {
     m_watch.tick(Clock::now(), [this] {
         std::vector<LogLedgerView> logs = LogLedgers::read();
         m_states.judge(logs, Clock::now(), WallClock::now());
+        m_stateEvents.judge(m_states.states(), Clock::now(), WallClock::now());
         return logs;
     });
     if (m_entries) {

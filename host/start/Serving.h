@@ -5,6 +5,7 @@
 #include "host/base/Say.h"
 #include "host/config/HostConfig.h"
 #include "host/delivery/Delivery.h"
+#include "host/diagnose/LogStateEvents.h"
 #include "host/diagnose/LogStates.h"
 #include "host/diagnose/LogWatch.h"
 #include "host/history/EntryRecorder.h"
@@ -84,6 +85,7 @@ private:
     Delivery m_delivery;
     Descriptors m_descriptors;
     LogStates m_states;                     ///< used by the main thread
+    LogStateEvents m_stateEvents;           ///< the same
     std::optional<EntryRecorder> m_entries; ///< none: the history is off
     SituationSet m_situations;
     ConfigReload m_reload;

@@ -171,6 +171,13 @@ TEST(SituationValidator, AbsenceIsADurationAndGroupsAreItsOnlyCompany) {
     EXPECT_THAT(fieldsOf(text), ElementsAre("frequency"));
 }
 
+TEST(SituationValidator, NamesOfTheAgentsOwnSituationsAreTaken) {
+    for (const char* const name : {"log-quiet", "log-dead", "log-unparsed"}) {
+        EXPECT_THAT(fieldsOf(named(name)), ElementsAre("name")) << name;
+    }
+    EXPECT_THAT(fieldsOf(named("log-quieter")), IsEmpty());
+}
+
 TEST(SituationValidator, OnlyANameIsRequired) {
     const auto [situation, problems] = SituationValidator::check(named("a"));
     EXPECT_THAT(problems, IsEmpty());

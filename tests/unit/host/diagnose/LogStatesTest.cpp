@@ -50,6 +50,16 @@ protected:
 
     static constexpr std::int64_t wallStart = 1'760'000'000'000;
 
+    /// What is known of a state now.
+    std::optional<bool> holds(LogState::Kind kind) const {
+        for (const LogState& state : m_states.states()) {
+            if (state.kind == kind) {
+                return state.holds;
+            }
+        }
+        return std::nullopt;
+    }
+
     LogStates m_states;
     const std::shared_ptr<FollowSettings> m_settings = std::make_shared<FollowSettings>();
     LogLedgerView m_log;
@@ -73,6 +83,46 @@ TEST_F(LogStatesTest, ALogIsQuietAfterTheConfiguredTime) {
     entry();
     EXPECT_EQ(after(5s), LogHealth::ok);
     EXPECT_EQ(after(599s), LogHealth::ok) << "counted from that entry";
+}
+
+TEST_F(LogStatesTest, StatesAreKnownOfLogsThatAskForThem) {
+    after(0s);
+    EXPECT_THAT(m_states.states(), IsEmpty());
+    m_settings->quiet.after = 10min;
+    m_log.lastEntry.reset();
+    after(1s);
+    EXPECT_EQ(m_states.states().size(), LogState::kinds);
+    EXPECT_EQ(holds(LogState::Kind::QUIET), std::nullopt) << "an earlier silence may go on";
+    EXPECT_EQ(holds(LogState::Kind::UNPARSED), std::nullopt);
+    EXPECT_EQ(holds(LogState::Kind::DEAD), false);
+    after(10min);
+    EXPECT_EQ(holds(LogState::Kind::QUIET), true);
+    EXPECT_EQ(m_states.states()[0].since, 600s);
+    EXPECT_THAT(m_states.states()[0].text, HasSubstr("no entries for 10 minutes"));
+    m_log.lastEntry = 2;
+    after(1s);
+    EXPECT_EQ(holds(LogState::Kind::QUIET), false);
+    m_log.follow->state = "missing";
+    after(29s);
+    EXPECT_EQ(holds(LogState::Kind::DEAD), std::nullopt);
+    after(30s);
+    EXPECT_EQ(holds(LogState::Kind::DEAD), true);
+}
+
+TEST_F(LogStatesTest, LinesAreUnparsedUntilMostMatchAgain) {
+    m_settings->quiet.after = 24h;
+    const auto lines = [&](std::int64_t matching, std::int64_t all) {
+        m_log.lines += all;
+        m_log.rows += matching;
+        after(10min);
+        return holds(LogState::Kind::UNPARSED);
+    };
+    after(0s);
+    EXPECT_EQ(lines(0, 100), std::nullopt) << "an earlier run may have found it so";
+    EXPECT_EQ(lines(900, 900), false);
+    EXPECT_EQ(lines(0, 100), true);
+    EXPECT_EQ(lines(0, 100), true);
+    EXPECT_EQ(lines(100, 100), false);
 }
 
 TEST_F(LogStatesTest, SilenceIsNotJudgedUnlessAskedFor) {
