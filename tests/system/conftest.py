@@ -406,3 +406,30 @@ def serving(agent):
         return log, Api(agent)
 
     return start
+
+
+@pytest.fixture(scope="session")
+def clock_library(tmp_path_factory):
+    library = tmp_path_factory.mktemp("preload") / "clock.so"
+    source = Path(__file__).with_name("clock.c")
+    subprocess.run(["cc", "-shared", "-fPIC", "-o", library, source, "-ldl"], check=True)
+    return library
+
+
+@pytest.fixture
+def clock(clock_library):
+    """Gives an agent a wall clock of its own; returns the file with the seconds that it is ahead."""
+
+    def prepare(agent):
+        offset = agent.directory / "offset"
+        offset.write_text("0")
+        agent.environment.update(
+            {
+                "LD_PRELOAD": str(clock_library),
+                "CLOCK_OFFSET": str(offset),
+                "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
+            }
+        )
+        return offset
+
+    return prepare

@@ -4,7 +4,6 @@ import gzip
 import os
 import re
 import sqlite3
-import subprocess
 import sys
 from contextlib import closing
 from pathlib import Path
@@ -76,25 +75,9 @@ def test_a_history_without_positions_is_taken_over(agent):
 # ---------------------------------------------------------------------- the clock
 
 
-@pytest.fixture(scope="session")
-def clock(tmp_path_factory):
-    library = tmp_path_factory.mktemp("preload") / "clock.so"
-    source = Path(__file__).with_name("clock.c")
-    subprocess.run(["cc", "-shared", "-fPIC", "-o", library, source, "-ldl"], check=True)
-    return library
-
-
 @pytest.mark.slow
 def test_a_clock_that_is_set_back_neither_stops_nor_repeats_entries(agent, clock):
-    offset = agent.directory / "offset"
-    offset.write_text("0")
-    agent.environment.update(
-        {
-            "LD_PRELOAD": str(clock),
-            "CLOCK_OFFSET": str(offset),
-            "ASAN_OPTIONS": "verify_asan_link_order=0:" + os.environ.get("ASAN_OPTIONS", ""),
-        }
-    )
+    offset = clock(agent)
     log = followed(agent)
     agent.start()
     agent.wait_open(log)
