@@ -146,3 +146,22 @@ def test_a_situation_of_any_log_is_explained_and_edited(page, agent):
     page.wait_text("Log it comes from")
     page.choose("Log", str(auth))
     until(lambda: "Log it comes from" not in page.text(), "the log of the line to go")
+
+
+def test_groups_are_kept_when_a_situation_is_edited_and_absence_is_set(page, agent):
+    auth, _ = logs_agent(agent)
+    page.on(agent)
+    body = {"name": "grouped", "text": "", "severity": "minor", "log": str(auth), "group_by": ["ENTRYSYS"], "max_groups": 7}
+    assert page.api.request("POST", "/api/v1/situations", body)[0] == 201
+    page.open("situations?edit=grouped")
+    page.heading("Edit grouped")
+    page.type("Missed after", "soon")
+    page.wait_text("'soon' is not a duration")
+    page.type("Missed after", "25h")
+    page.wait_text("Would have been raised 0 times in the last 24 hours")
+    page.click("Save changes")
+    page.heading("grouped")
+    page.wait_text("raised when none has come for 25h")
+    page.wait_text("ENTRYSYS")
+    stored = page.api.request("GET", "/api/v1/situations/grouped")[2]
+    assert (stored["absent"], stored["group_by"], stored["max_groups"]) == ("25h", ["ENTRYSYS"], 7)

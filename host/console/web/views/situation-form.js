@@ -20,16 +20,7 @@ const BLANK = {
   labels: {},
 };
 // Not edited here, and not to be lost.
-const KEPT = [
-  "labels",
-  "group_by",
-  "max_groups",
-  "distinct",
-  "then",
-  "resolve_after",
-  "cooldown",
-  "absent",
-];
+const KEPT = ["labels", "group_by", "max_groups", "distinct", "then", "resolve_after", "cooldown"];
 const ANY = "*"; // no log has this path
 const UNITS = [
   ["s", "seconds"],
@@ -106,6 +97,16 @@ class Form {
         }),
         "How many earlier lines of the log an event keeps, for logs of [[log]]",
       ),
+      absent: field(
+        "Missed after",
+        h("input", {
+          value: situation.absent || "",
+          autocomplete: "off",
+          placeholder: "1h",
+          oninput: changed,
+        }),
+        "Raise it when no such entry has come for this long, rather than for each entry",
+      ),
       severity: field("Severity", select(SEVERITIES, situation.severity, { onchange: changed })),
       log: field(
         "Log",
@@ -150,6 +151,7 @@ class Form {
           h("div", { className: "fields" }, this.fields.log, this.fields.severity),
           this.conditions.element,
           this.repeats.element,
+          h("div", { className: "fields" }, this.fields.absent),
           h("div", { className: "fields" }, this.fields.context, this.fields.runbook),
           this.problem,
           h(
@@ -229,7 +231,7 @@ class Form {
   }
 
   get definition() {
-    const { name, text, severity, log, context, runbook } = this.fields;
+    const { name, text, severity, log, context, runbook, absent } = this.fields;
     return {
       name: name.control.value.trim(),
       text: text.control.value,
@@ -239,6 +241,7 @@ class Form {
       ...this.repeats.value,
       context: Number(context.control.value),
       runbook: runbook.control.value.trim() || null,
+      absent: absent.control.value.trim() || null,
       ...this.kept,
     };
   }

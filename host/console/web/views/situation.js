@@ -109,6 +109,14 @@ class SituationPage {
   }
 }
 
+const JUDGED = [
+  ["group_by", "Judged apart"],
+  ["distinct", "Counted"],
+  ["then", "Raised by"],
+  ["resolve_after", "Over after"],
+  ["cooldown", "Pause"],
+];
+
 function definition(situation) {
   const { counts } = situation;
   const pairs = [
@@ -125,8 +133,14 @@ function definition(situation) {
       "Frequency",
       situation.frequency
         ? `raised by ${frequencyText(situation.frequency, situation.period)}`
-        : "every match is raised",
+        : situation.absent
+          ? `raised when none has come for ${situation.absent}`
+          : "every match is raised",
     ],
+    ...JUDGED.filter(([key]) => situation[key]).map(([key, name]) => [
+      name,
+      [situation[key]].flat().join(", "),
+    ]),
     ["Entries before it", situation.context || "none"],
     ...(situation.runbook ? [["Runbook", link(situation.runbook)]] : []),
     ...Object.entries(situation.labels ?? {}).map(([name, value]) => [`Label ${name}`, value]),
