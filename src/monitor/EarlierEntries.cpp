@@ -1,5 +1,7 @@
 #include "monitor/EarlierEntries.h"
 
+#include "monitor/Interruption.h"
+
 #include <algorithm>
 #include <cstdlib>
 #include <ctime>
@@ -63,8 +65,13 @@ private:
 
 void EarlierEntries::read(Generation& file, std::int64_t offset, std::int64_t period,
                           const TimeOf& timeOf, const Take& take) {
-    findParts(file, offset, period, timeOf);
-    const auto end = std::chrono::steady_clock::now() + patience;
+    const auto begin = std::chrono::steady_clock::now();
+    {
+        const Interruption inTime(
+            [begin] { return std::chrono::steady_clock::now() - begin > patience / 2; });
+        findParts(file, offset, period, timeOf);
+    }
+    const auto end = begin + patience;
     int entries = 0;
     const auto takeInTime = [&](char* entry, std::string_view text) {
         return take(entry, text) &&
@@ -116,6 +123,10 @@ bool EarlierEntries::addPart(Generation& file, std::int64_t to, std::int64_t per
     }
     if (!m_periodBegin) {
         m_periodBegin = newestTime(file, to, timeOf) - period;
+    }
+    if (!file.verify()) {
+        m_unread.push_back(file.path());
+        return false;
     }
     std::int64_t from = 0;
     bool isFound = false;

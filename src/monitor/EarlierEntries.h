@@ -45,9 +45,13 @@ public:
     /// What these files have behind the positions is left out: it was not judged yet.
     void leaveOutLate(LatePositions late) { m_late = std::move(late); }
     /// Gives the entries of `file` before the offset, and those of older generations before them,
-    /// oldest first. There may be further entries before the period among them.
+    /// oldest first. There may be further entries before the period among them. Compressed files
+    /// are checked first, and left out if they are damaged.
     void read(Generation& file, std::int64_t offset, std::int64_t period, const TimeOf& timeOf,
               const Take& take);
+
+    /// Compressed files that were left out: damaged, or too large to be checked in time.
+    const std::vector<std::string>& unread() const noexcept { return m_unread; }
 
 private:
     /// A range of a file.
@@ -75,6 +79,7 @@ private:
     std::optional<std::int64_t> m_periodBegin; ///< the period follows this time
     std::int64_t m_room = mostBytes;           ///< bytes that may still be read
     LatePositions m_late;
+    std::vector<std::string> m_unread;
 };
 
 } // namespace zrm

@@ -75,30 +75,40 @@ void LogFile::recount(FileFollower& follower, std::size_t recordLength) {
     if (period == 0) {
         return;
     }
-    zrm_rmlogent_data_t* const row = ownRow();
-    const TRC1_Silence silence; // the earlier run has traced it
-    EarlierEntry current(*this, recordLength == 0);
-    const LogEntry::Offer offer(current);
     EarlierEntries earlier(fileNameLocal(), followSettings()->rotatedTo, recordLength,
                            followSettings()->join.value.get());
     if (const auto position = follower.position()) {
         earlier.leaveOutLate(position->late);
     }
-    earlier.read(
-        place->file, place->offset, period,
-        [&](char* entry, std::string_view text) {
-            current.begin(text);
-            return formatEntryAsRow(entry, row, nullptr) == 0
-                       ? m_clock.rangeOf(lastEntryMoment, row->entrytime)
-                       : std::nullopt;
-        },
-        [&](char* entry, std::string_view text) {
-            current.begin(text);
-            if (formatEntryAsRow(entry, row, nullptr) == 0) {
-                countEarlier(*row);
-            }
-            return monitorStatus() == MONITOR_RUNNING;
-        });
+    zrm_rmlogent_data_t* const row = ownRow();
+    EarlierEntry current(*this, recordLength == 0);
+    const LogEntry::Offer offer(current);
+    {
+        const TRC1_Silence silence; // the earlier run has traced it
+        earlier.read(
+            place->file, place->offset, period,
+            [&](char* entry, std::string_view text) {
+                current.begin(text);
+                return formatEntryAsRow(entry, row, nullptr) == 0
+                           ? m_clock.rangeOf(lastEntryMoment, row->entrytime)
+                           : std::nullopt;
+            },
+            [&](char* entry, std::string_view text) {
+                current.begin(text);
+                if (formatEntryAsRow(entry, row, nullptr) == 0) {
+                    countEarlier(*row);
+                }
+                return monitorStatus() == MONITOR_RUNNING;
+            });
+    }
+    if (monitorStatus() != MONITOR_RUNNING) {
+        return; // interrupted
+    }
+    for (const std::string& file : earlier.unread()) {
+        trace.error()("Entries of %s in %s are not counted again for thresholds: the file is "
+                      "damaged, or too large to be checked in time.",
+                      fileNameLocal(), file.c_str());
+    }
 }
 
 } // namespace zrm

@@ -2,6 +2,7 @@
 
 #include "FakeCompression.h"
 #include "TestJoin.h"
+#include "monitor/Interruption.h"
 #include "support/TemporaryDirectory.h"
 
 #include <gmock/gmock.h>
@@ -47,6 +48,7 @@ protected:
             entries.emplace_back(text);
             return entries.size() != m_most;
         });
+        m_unread = earlier.unread();
         return entries;
     }
     /// Writes a file and makes it older than those written before.
@@ -65,6 +67,7 @@ protected:
     }
 
     const FakeCompression m_compression;
+    std::vector<std::string> m_unread;
     TemporaryDirectory m_directory;
     LatePositions m_late;
     std::size_t m_most = 0;
@@ -131,6 +134,22 @@ TEST_F(EarlierEntriesTest, ReadsCompressedGenerationsAndNoFileTwice) {
     write("log.5.gz", "GZ8 not read\n");
     EXPECT_THAT(read("log", 6, 60),
                 ElementsAre("7 older", "99 x", "100 y", "101 a", "102 b", "103 c"));
+}
+
+TEST_F(EarlierEntriesTest, LeavesOutCompressedGenerationsThatAreDamaged) {
+    write("log", "103 c\n");
+    write("log.1.gz", "GZ101 a\n102 wrong\n\x01");
+    write("log.2.gz", "GZ99 x\n100 y\n");
+    EXPECT_THAT(read("log", 6, 60), ElementsAre("99 x", "100 y", "103 c"));
+    EXPECT_THAT(m_unread, ElementsAre(m_directory.file("log.1.gz")));
+}
+
+TEST_F(EarlierEntriesTest, LeavesOutCompressedGenerationsThatCannotBeCheckedBeforeAStop) {
+    write("log", "103 c\n");
+    write("log.1.gz", "GZ" + lines(1, 200'000));
+    const Interruption stop([] { return true; });
+    EXPECT_THAT(read("log", 6, 60), ElementsAre("103 c"));
+    EXPECT_THAT(m_unread, ElementsAre(m_directory.file("log.1.gz")));
 }
 
 TEST_F(EarlierEntriesTest, EndsWhenToldTo) {
