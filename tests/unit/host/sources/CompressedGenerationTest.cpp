@@ -94,6 +94,8 @@ class GzipGenerationTest : public CompressedGenerationFixture, public testing::T
 
 class XzGenerationTest : public CompressedGenerationFixture, public testing::Test {};
 
+class ZstdGenerationTest : public CompressedGenerationFixture, public testing::Test {};
+
 TEST_P(CompressedGenerationTest, GivesTheContents) {
     for (const std::size_t count : {std::size_t{1}, std::size_t{10'000}}) {
         const std::string contents = lines(count);
@@ -230,6 +232,31 @@ TEST_P(CompressedGenerationTest, WhatIsNotCompressedIsRefused) {
         write(contents);
         EXPECT_EQ(open(), nullptr);
     }
+}
+
+/// Two lines as they are, in one block. `checksum`: of the contents, empty if there is none.
+std::string zstdFile(const std::string& contents, const std::string& checksum) {
+    std::string file = "\x28\xb5\x2f\xfd";
+    file += checksum.empty() ? '\x00' : '\x04';
+    file += '\x58'; // the window
+    file += static_cast<char>(1 | contents.size() << 3);
+    return file + '\0' + '\0' + contents + checksum;
+}
+
+TEST_F(ZstdGenerationTest, DamageShowsOnlyIfThereIsAChecksum) {
+    const std::string checksum = "\xe6\xa6\x0e\x40"; // as zstd makes it
+    const auto contents = [this](const std::string& bytes) {
+        write(bytes);
+        std::ptrdiff_t end = -1;
+        const auto reader = open();
+        const std::string text = reader ? readAll(*reader, end) : "";
+        return end == 0 ? text : "damaged";
+    };
+    EXPECT_EQ(contents(zstdFile("one\ntwo\n", checksum)), "one\ntwo\n");
+    EXPECT_EQ(contents(zstdFile("one\ntwX\n", checksum)), "damaged");
+    EXPECT_EQ(contents(zstdFile("one\ntwo\n", "")), "one\ntwo\n");
+    EXPECT_EQ(contents(zstdFile("one\ntwX\n", "")), "one\ntwX\n");
+    EXPECT_EQ(contents(zstdFile("one\ntwo\n", "").substr(0, 12)), "damaged") << "cut off";
 }
 
 /// A file that asks for a dictionary of 1 GiB.
