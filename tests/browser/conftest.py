@@ -199,6 +199,14 @@ class Page:
         self.scheme("light")
         self.size(1280)
 
+    def cells_fit(self):
+        """No cell of a table is cut or covers the next one where the page is narrow."""
+        self.size(360)
+        self.settle()
+        cut = "return [...document.querySelectorAll('.cards td')].filter((td) => td.scrollWidth > td.clientWidth + 1)"
+        assert self.run(f"{cut}.map((td) => td.textContent)") == []
+        self.size(1280)
+
     def console_errors(self):
         """What the browser complained of: refused scripts and styles, exceptions."""
         entries = self.driver.get_log("browser")

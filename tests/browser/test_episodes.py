@@ -23,6 +23,7 @@ def test_an_open_episode_is_acknowledged_and_that_is_withdrawn(page, agent, fast
     (row,) = page.rows("Episodes")
     assert "Acknowledged" in row and "anna, " in row
     page.pictures("episodes")
+    page.cells_fit()
     page.click("Withdraw the acknowledgement of episode 1")
     page.click("Withdraw", "//dialog")
     page.wait_text("Open")

@@ -42,6 +42,7 @@ def test_an_event_is_silenced_and_those_after_it_are_grey_with_the_reason(page, 
     count = re.compile(rf"\s1\s+{re.escape(WHY)}")
     until(lambda: any(map(count.search, page.rows("Silences"))), "the count of one event")
     page.pictures("silences")
+    page.cells_fit()
     page.open("events")
     page.wait_text("203.0.113.2")
     assert [row.text for row in page.all(".windowed-row.silenced") if "203.0.113.2" in row.text]

@@ -17,10 +17,14 @@ const COLUMNS = [
   { label: "State", className: "fit lead" },
   { label: "Severity", className: "fit" },
   { label: "Situation", className: "wide break" },
-  { label: "Since", className: "fit" },
+  { label: "Since", className: "fit whole" },
   { label: "Entries", className: "num" },
   { label: "Acknowledged", className: "wide break" },
-  { label: "Actions", className: "fit last", head: h("span", { className: "unseen" }, "Actions") },
+  {
+    label: "Actions",
+    className: "fit last whole",
+    head: h("span", { className: "unseen" }, "Actions"),
+  },
 ];
 
 const groupText = (group) =>
@@ -64,9 +68,13 @@ class EpisodesPage {
     const state = this.state.value;
     try {
       const answer = await get(withQuery("/api/v1/episodes", { state }));
-      if (state === this.state.value) this.#draw(answer);
+      const content = JSON.stringify([state, answer]);
+      // Buttons stay while nothing is new: somebody may be using them.
+      if (state !== this.state.value || content === this.drawn) return;
+      this.#draw(answer);
+      this.drawn = content;
     } catch (error) {
-      if (!this.isDrawn)
+      if (!this.drawn)
         fill(
           this.list,
           error.status === 409
@@ -81,7 +89,6 @@ class EpisodesPage {
   }
 
   #draw({ episodes, next }) {
-    this.isDrawn = true;
     const focused = this.list.contains(document.activeElement)
       ? document.activeElement.dataset.key
       : null;

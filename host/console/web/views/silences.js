@@ -16,7 +16,7 @@ const WHO = "zrm-who"; // the name that was typed last, for the next time
 const COLUMNS = [
   { label: "State", className: "fit lead" },
   { label: "Matches", className: "wide break" },
-  { label: "Until", className: "fit" },
+  { label: "Until", className: "fit whole" },
   { label: "Events", className: "num" },
   { label: "Who and why", className: "wide break" },
   { label: "Actions", className: "fit last", head: h("span", { className: "unseen" }, "Actions") },
