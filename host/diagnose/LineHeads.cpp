@@ -126,7 +126,8 @@ bool isLoggerName(std::string_view text) {
 bool isBeforeName(const Line& line, std::size_t at) {
     const auto isAside = [](const LineToken& token) {
         return token.kind == Kind::mark || token.kind == Kind::bracket ||
-               token.kind == Kind::number || (token.text[0] >= '0' && token.text[0] <= '9');
+               token.kind == Kind::number || token.kind == Kind::letter ||
+               token.kind == Kind::level || (token.text[0] >= '0' && token.text[0] <= '9');
     };
     while (at < line.size() && isAside(line[at])) {
         ++at;
@@ -258,7 +259,8 @@ private:
         }
         switch (token.kind) {
         case Kind::mark:
-            return std::string_view(":-=|,;/\t>])!.").find(token.mark) != std::string_view::npos &&
+            return std::string_view(":-=|,;/\t>])!.*~").find(token.mark) !=
+                       std::string_view::npos &&
                    (isPart(most) || (at > 0 && (*head.lines.front())[at - 1].blanks == 0));
         case Kind::bracket:
             return isPart(isFirst && token.mark == '[' &&
@@ -276,7 +278,8 @@ private:
         case Kind::severity:
         case Kind::number:
         case Kind::path:
-            return isPart(isFirst && isLoggerName(token.text) ? few : most);
+            return isPart(isFirst && (isLoggerName(token.text) || isPlace(token.text)) ? few
+                                                                                       : most);
         case Kind::pair:
         case Kind::quoted:
             return isPart(most);
@@ -351,7 +354,7 @@ private:
             // Pairs are often lined up behind a message.
             const bool isBeforeText = at + 1 < line->size() && (*line)[at + 1].kind != Kind::pair;
             wide += (*line)[at].blanks > 1 && isBeforeText ? 1 : 0;
-            constexpr std::string_view delimiters = "|\t;-";
+            constexpr std::string_view delimiters = "|\t;-,";
             marked += at + 1 < line->size() && (*line)[at + 1].kind == Kind::mark &&
                               delimiters.find((*line)[at + 1].mark) != std::string_view::npos
                           ? 1

@@ -87,6 +87,12 @@ private:
         }
         take(Kind::time, length);
         m_hasTime = true;
+        // 2026-11-19 10:00:00;INFO;text: a few columns, of which the first shows what is between.
+        constexpr std::string_view delimiters = ",;|";
+        const bool isDelimited = m_delimiter == '\0' && m_open.empty() && m_rest.size() > 1 &&
+                                 delimiters.find(m_rest[0]) != std::string_view::npos &&
+                                 isLetter(m_rest[1]);
+        m_delimiter = isDelimited ? m_rest[0] : m_delimiter;
         // 10:00:00:INFO:name: every column ends with a colon.
         m_hasColons = m_rest.size() > 1 && m_rest[0] == ':' && isLetter(m_rest[1]);
         return true;
@@ -266,7 +272,7 @@ private:
         if (takeTag(word)) {
             return;
         }
-        constexpr std::string_view single = "-|,;/]>:.!)=\"";
+        constexpr std::string_view single = "-|,;/]>:.!)=*~\"";
         const bool isBehindLevel = word[0] == '/' && !m_tokens.empty() &&
                                    m_tokens.back().kind == Kind::level &&
                                    m_tokens.back().blanks == 0;
@@ -337,9 +343,9 @@ private:
         return std::ranges::find(m_tokens, Kind::level, &LineToken::kind) != m_tokens.end();
     }
 
+    /// "->", "--", "***" and the like.
     static bool isArrow(std::string_view word) {
-        return word == "->" || word == "=>" || word == "::" || word == ">>" || word == "--" ||
-               word == "-->" || word == "==>";
+        return word.size() > 1 && word.find_first_not_of("-=>*~:") == std::string_view::npos;
     }
 
     static Kind kindOf(std::string_view word, bool hasColon) {
@@ -360,7 +366,7 @@ private:
 
     std::string_view m_rest;
     const TimePattern& m_times;
-    const char m_delimiter;
+    char m_delimiter;
     std::vector<LineToken> m_tokens;
     std::string m_open; ///< the characters that close what was opened
     bool m_hasTime = false;

@@ -100,6 +100,9 @@ TEST(FormatProposal, FindsColumnsBetweenTabsBarsAndSemicolons) {
               "INFO|io.shop.Cart|no room");
     EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 | INFO | shop.cart:reserve:77 - no room"}),
               "INFO|shop.cart:reserve:77|no room");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00,INFO,cart,a, b", "2026-11-19 10:00:01,WARN,net,c"}),
+              "WARN|net|c");
+    EXPECT_EQ(columnsOf({"19.11.2026 10:00:00;ERROR;no room"}), "ERROR||no room");
     EXPECT_EQ(columnsOf({"2026-11-19 10:00:00;WARN;4711;shop.cart;no room"}),
               "WARN|shop.cart|no room");
 }
@@ -198,6 +201,9 @@ TEST(FormatProposal, FindsLevelsBetweenOtherMarks) {
               "DEBUG|nsHttp|Handler::Init");
     EXPECT_EQ(columnsOf({"2026-11-19T10:00:00 [vm:api:INFO:src/main.rs:117] running"}),
               "INFO|api|running");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 *** WARNING *** retrying"}), "WARNING||retrying");
+    EXPECT_EQ(columnsOf({"2026-11-19 10:00:00 8509 2 I database: no such table"}),
+              "INFO|database|no such table");
     EXPECT_EQ(columnsOf({"ERROR - 2026-11-19 10:00:00 --> page not found"}),
               "ERROR||page not found");
 }
