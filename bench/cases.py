@@ -26,6 +26,14 @@ KIND_LINE = {"syslog": ";N ;S", "user": USER_FORMAT, "accounting": ";N ;A"}
 # The keys of the [[log]] table of kinds that have no line in the log configuration.
 KIND_TABLE = {"access": 'format = "nginx-access"', "json": 'type = "json"'}
 FIELD_ONE_PERCENT = {"when": ["field.status >= 500"]}
+GROUPS = {
+    "when": ["ENTRYDESC matches 'customer (?P<customer>[0-9]+)'"],
+    "group_by": ["customer"],
+    "max_groups": 100_000,
+    "frequency": ">= 1000000",
+    "period": "60s",
+    "resolve_after": "15m",
+}
 SOURCES = ["app", "cron", "nginx", "kernel", "sshd"]
 
 
@@ -57,6 +65,7 @@ THROUGHPUT = [
     ("syslog, 1 situation, none match", "syslog", lambda log, _: situations(1, log, NEVER), 0, None),
     ("syslog, 1 situation, 1% match", "syslog", lambda log, _: situations(1, log, ONE_PERCENT), 0.01, 6e6),
     ("user log, 8 fields, 1% match", "user", lambda log, _: situations(1, log, USER_ONE_PERCENT), 0.01, 3e6),
+    ("user log, all match, 99,991 groups", "user", lambda log, _: situations(1, log, GROUPS), 0, None),
     ("syslog, 100 situations, none match", "syslog", lambda log, _: situations(100, log, NEVER), 0, 1e6),
     ("syslog, 100 situations, 20 search each line", "syslog", lambda log, _: searching(log), 0, None),
     ("syslog, 99 of 100 on other logs", "syslog", others, 0, 4e6),

@@ -19,6 +19,7 @@ namespace {
 
 constexpr long perSecond = 1000;
 constexpr long perMatch = 100;
+constexpr long customers = 99991; // a prime number, so that all take turns, far from each other
 
 constexpr std::array<std::string_view, 4> sources = {"app[1402]", "cron[77]", "nginx[901]",
                                                      "kernel"};
@@ -41,7 +42,7 @@ void writeUserLine(long number, const char* stamp) {
     const bool fails = number % perMatch == perMatch - 1;
     std::printf("%s %s order %07ld of customer %06ld %s after %ld ms on worker %ld, attempt 1, "
                 "queue main\n",
-                stamp, fails ? "ERROR" : "INFO", number, number % 99991,
+                stamp, fails ? "ERROR" : "INFO", number, number * 40503 % customers,
                 fails ? "payment refused" : "payment accepted", number % 97 + 100, number % 8);
 }
 
