@@ -9,22 +9,18 @@ ExpectedGroups::ExpectedGroups(bool isKept, std::function<Clock::time_point()> c
 
 void ExpectedGroups::load(ExpectedValues stored) {
     const std::lock_guard guard(m_mutex);
-    m_before = m_saved = stored.watched;
+    m_saved = stored.watched;
+    std::int64_t before = stored.watched;
     for (const ExpectedGroup& group : stored.groups) {
-        m_before = std::max(m_before, group.seen); // it may have been stored after the time
+        before = std::max(before, group.seen); // it may have been stored after the time
     }
+    m_before.store(before, std::memory_order_relaxed);
     m_stored = std::move(stored.groups);
 }
 
-/// With m_mutex held.
-std::int64_t ExpectedGroups::watchedNow() const {
-    return m_before +
-           std::chrono::duration_cast<std::chrono::milliseconds>(m_clock() - m_begin).count();
-}
-
 std::int64_t ExpectedGroups::watched() const {
-    const std::lock_guard guard(m_mutex);
-    return watchedNow();
+    return m_before.load(std::memory_order_relaxed) +
+           std::chrono::duration_cast<std::chrono::milliseconds>(m_clock() - m_begin).count();
 }
 
 std::vector<ExpectedGroup> ExpectedGroups::take(const std::string& situation,
@@ -83,7 +79,7 @@ ExpectedValues ExpectedGroups::unsaved(bool isLast) const {
         values.groups.push_back(group);
     }
     values.forgotten = m_forgotten;
-    const std::int64_t now = watchedNow();
+    const std::int64_t now = watched();
     const bool isDue = isLast || now - m_saved >= storedEvery || !m_changed.empty();
     values.watched = m_isUsed && isDue ? now : 0;
     return values;

@@ -1,6 +1,7 @@
 #ifndef ZRM_HOST_EXPECTED_GROUPS_H
 #define ZRM_HOST_EXPECTED_GROUPS_H
 
+#include <atomic>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -54,7 +55,7 @@ public:
     /// What an earlier run has stored. Before anything else.
     void load(ExpectedValues stored);
 
-    /// Milliseconds.
+    /// Milliseconds. Takes no lock: every entry that is expected asks for it.
     std::int64_t watched() const;
 
     /// The groups that an earlier run has stored of a situation with this definition, once. Those
@@ -78,14 +79,13 @@ public:
 
 private:
     using Key = std::pair<std::string, std::string>; ///< situation and key
-    std::int64_t watchedNow() const;
-
     const bool m_isKept;
     const std::function<Clock::time_point()> m_clock;
     const Clock::time_point m_begin;
 
+    std::atomic<std::int64_t> m_before{0}; ///< watched by earlier runs
+
     mutable std::mutex m_mutex;          ///< guards what follows
-    std::int64_t m_before = 0;           ///< watched by earlier runs
     std::int64_t m_saved = 0;            ///< the watched time that is stored
     bool m_isUsed = false;               ///< there are groups, so that the watched time matters
     std::vector<ExpectedGroup> m_stored; ///< of an earlier run, not taken yet
