@@ -42,6 +42,9 @@ public:
     std::optional<EntrySource::Remark> takeRemark() override;
 
     bool read(EntryColumns& columns) override;
+    std::string_view reason() const noexcept override {
+        return m_reader ? m_reader->reason() : std::string_view();
+    }
     std::string_view text() const noexcept override { return m_entries.text(); }
     bool isTextCut() const noexcept override { return m_entries.isCut(); }
     void readFields(EntryFields& fields) override {

@@ -31,6 +31,8 @@ public:
         /// Fills the columns, which are empty before the call. False if the entry does not fit the
         /// format in which it should be. Call it once per entry.
         virtual bool read(EntryColumns& columns) = 0;
+        /// Why the entry does not fit it, as a clause. Valid until the next entry.
+        virtual std::string_view reason() const noexcept { return {}; }
         /// The whole text, or the first EntryKeep::longestText bytes of a longer one.
         virtual std::string_view text() const noexcept = 0;
         virtual bool isTextCut() const noexcept = 0;

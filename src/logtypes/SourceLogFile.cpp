@@ -198,6 +198,10 @@ bool SourceLogFile::makeRow(EntrySource::Entry& entry, EntryStamp& stamp,
     return trace.result(ColumnsRow::fill(columns, found, stamp, nullptr));
 }
 
+std::string_view SourceLogFile::rejectionReason() const noexcept {
+    return m_reading == nullptr ? std::string_view() : m_reading->reason();
+}
+
 /// Reads the source backwards.
 struct SourceLogFile::Report {
     std::unique_ptr<EntrySource::Past> past;

@@ -6,6 +6,7 @@
 #include "monitor/LogFile.h"
 
 #include <string>
+#include <string_view>
 
 namespace zrm {
 
@@ -33,6 +34,7 @@ public:
     /// entry does not fit the source's format. Log's thread only.
     long formatEntryAsRow(char* entry, void* row, void* context) override;
     void processLogData() override;
+    std::string_view rejectionReason() const noexcept override;
 
     /// Makes a row of an entry. False if the entry does not fit the source's format. Any thread;
     /// the entry and `stamp` are its own.

@@ -35,6 +35,14 @@ def is_alive(process):
         return False
 
 
+def test_the_ledger_says_why_a_line_does_not_fit(runner):
+    command = ["sh", "-c", 'echo "no object"; echo \'{"msg":"fits"}\'; exec sleep 1000']
+    agent = runner(command, name="app", format="json")
+    assert descriptions(agent.wait_events(1)) == ["fits"]
+    (rejected,) = wait_until(lambda: ledger_of(agent, "app")["rejected"], "the rejected line")
+    assert (rejected["line"], rejected["reason"]) == ("no object", "It is not a JSON object.")
+
+
 def test_each_line_is_an_entry_of_the_present(runner):
     agent = runner(["sh", "-c", "echo one; echo 'two  2'; exec sleep 1000"], name="kernel")
     events = agent.wait_events(2)
