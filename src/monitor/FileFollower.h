@@ -194,7 +194,7 @@ private:
 
     bool begin();
     void beginFirst(std::unique_ptr<Generation> named);
-    void noteOlder();
+    void noteOlder(bool isEmpty);
     void takeUp(const LogPosition& stored, std::unique_ptr<Generation> named);
     void takeUpLate(const LogPosition& stored, const Generation* named);
     bool takeUpLate(const LogPosition& left, const std::string& path);

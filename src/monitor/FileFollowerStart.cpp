@@ -44,9 +44,7 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
     }
     member.from = isFromEnd ? status.size : member.from;
     m_modified = status.modified;
-    if (status.size == 0) {
-        noteOlder();
-    }
+    noteOlder(status.size == 0);
     m_position = positionOf(member.file->identity(), member.from, member.tail);
     m_position.modified = m_modified;
     m_hasPosition = true;
@@ -54,11 +52,12 @@ void FileFollower::beginFirst(std::unique_ptr<Generation> named) {
 }
 
 /// A writer that still has the file before this one open writes to it later than this one was made.
-void FileFollower::noteOlder() {
+/// `isEmpty`: this one, in which a truncation is not seen then.
+void FileFollower::noteOlder(bool isEmpty) {
     for (const GenerationFile& file : generations()) {
         noteModified(file.modified);
-        if (file.size == 0) {
-            continue; // whatever it gets is written from now on
+        if (!isEmpty || file.size == 0) {
+            continue; // what an empty file gets is written from now on
         }
         Older older{file.identity, file.isCompressed};
         if (const auto opened = file.isCompressed ? nullptr : Generation::open(file.path)) {

@@ -87,6 +87,21 @@ TEST_F(TruncatedFileTest, IsContinuedInACopyAlsoIfItHasReplacedAnotherFile) {
     EXPECT_EQ(m_ledger.losses(), 0);
 }
 
+TEST_F(FileFollowerTest, AGenerationFromBeforeTheFirstStartIsNotReadLater) {
+    age(m_path, 60);
+    age(file("app.log.1"), 30, "older, but written later\n");
+    append("a\n");
+    age(m_path, 60);
+    m_options.fromBeginning = true;
+    begin();
+    EXPECT_EQ(look(), "old\na\n");
+    const auto stored = m_follower->position();
+    fs::remove(m_path);
+    append("b\n");
+    begin(stored);
+    EXPECT_EQ(looks(3), "b\n");
+}
+
 TEST_F(FileFollowerTest, AGenerationThatWasEmptyAtFirstIsWatchedForLateLines) {
     look();
     append("a\n");
