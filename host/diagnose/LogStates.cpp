@@ -52,8 +52,23 @@ seconds since(LogStates::Clock::time_point begin, LogStates::Clock::time_point n
     return std::chrono::duration_cast<seconds>(now - begin);
 }
 
-bool isWithoutFile(const FollowView& follow) {
-    return follow.state == "missing" || follow.state == "not a file" || !follow.problem.empty();
+bool hasNoFile(const FollowView& follow) {
+    return follow.state == "missing" || follow.state == "waiting";
+}
+
+/// A log that never had a file may belong to a program that is not installed: only where silence
+/// matters does it matter, too.
+bool isWithoutFile(const LogLedgerView& log) {
+    const FollowView& follow = *log.follow;
+    return follow.state == "missing" || follow.state == "not a file" || !follow.problem.empty() ||
+           (log.settings->quiet && hasNoFile(follow));
+}
+
+std::string reasonOf(const FollowView& follow) {
+    if (!follow.problem.empty()) {
+        return follow.problem;
+    }
+    return hasNoFile(follow) ? "no file has its name" : "it is " + follow.state;
 }
 
 int percent(std::int64_t part, std::int64_t whole) {
@@ -126,7 +141,7 @@ void LogStates::addState(const LogLedgerView& log, LogState::Kind kind, std::opt
 }
 
 void LogStates::judgeFile(LogLedgerView& log, Watched& watched, Clock::time_point now) {
-    if (!isWithoutFile(*log.follow)) {
+    if (!isWithoutFile(log)) {
         watched.deadSince.reset();
         addState(log, LogState::Kind::DEAD, false);
         return;
@@ -139,12 +154,9 @@ void LogStates::judgeFile(LogLedgerView& log, Watched& watched, Clock::time_poin
         return;
     }
     log.health = LogHealth::dead;
-    addState(
-        log, LogState::Kind::DEAD, true, since(*watched.deadSince, now),
-        "The log has no file that can be read: " +
-            (log.follow->problem.empty() ? "it is " + log.follow->state : log.follow->problem) +
-            '.');
-    if (log.settings->quiet && log.follow->state == "missing") {
+    addState(log, LogState::Kind::DEAD, true, since(*watched.deadSince, now),
+             "The log has no file that can be read: " + reasonOf(*log.follow) + '.');
+    if (log.settings->quiet && hasNoFile(*log.follow)) {
         log.warnings.push_back(
             {"dead", 0, "No file has had this log's name for a while. The agent waits for one."});
     }

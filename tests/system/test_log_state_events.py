@@ -7,6 +7,7 @@ import pytest
 from api import Api
 from conftest import syslog_line, wait_until
 from test_episodes import followed, stored, wait_stored
+from test_ledger import ledger_of
 
 
 def test_a_quiet_log_is_an_episode_that_outlasts_a_kill(agent):
@@ -37,10 +38,18 @@ def test_a_quiet_log_is_an_episode_that_outlasts_a_kill(agent):
 
 
 @pytest.mark.slow
-def test_a_log_without_a_file_is_dead_until_there_is_one(agent):
+@pytest.mark.parametrize("is_there", (True, False))
+def test_a_log_without_a_file_is_dead_until_there_is_one(agent, is_there):
     log = followed(agent, quiet="1h")
-    agent.start()
-    log.path.unlink()
+    if is_there:
+        agent.listen = "127.0.0.1:0"
+        agent.start()
+        agent.api = Api(agent)
+        wait_until(lambda: ledger_of(agent, log)["follow"]["state"] == "reading", "the file to be read")
+        log.path.unlink()
+    else:
+        log.path.unlink()
+        agent.start()
     (raised,) = wait_stored(agent, 1)
     assert raised["situation"] == "log-dead" and "no file that can be read" in raised["text"]
     log.path.write_text(syslog_line("again"))

@@ -26,7 +26,7 @@ protected:
     LogStatesTest() {
         m_log.log = "/var/log/a";
         m_log.settings = m_settings;
-        m_log.follow.emplace().state = "waiting";
+        m_log.follow.emplace().state = "reading";
         m_log.lastEntry = 1;
     }
 
@@ -171,6 +171,19 @@ TEST_F(LogStatesTest, ALogWithoutAFileIsDeadAfterAWhile) {
     EXPECT_EQ(after(1s), LogHealth::ok);
     m_log.follow->state = "missing";
     EXPECT_EQ(after(1s), LogHealth::ok) << "counted anew";
+}
+
+TEST_F(LogStatesTest, ALogThatNeverHadAFileIsDeadOnlyWhereItsSilenceMatters) {
+    m_log.follow->state = "waiting";
+    after(0s);
+    EXPECT_EQ(after(30s), LogHealth::ok);
+    m_settings->quiet.after = 10h;
+    after(0s);
+    EXPECT_EQ(after(29s), LogHealth::ok);
+    EXPECT_EQ(after(1s), LogHealth::dead);
+    EXPECT_THAT(kinds(), ElementsAre("dead"));
+    EXPECT_EQ(holds(LogState::Kind::DEAD), true);
+    EXPECT_THAT(m_states.states().back().text, HasSubstr("no file has its name"));
 }
 
 TEST_F(LogStatesTest, ALogThatCannotBeReadIsDead) {
